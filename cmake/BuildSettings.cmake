@@ -1,0 +1,36 @@
+# How every target of the project is compiled: the language, the warnings, the sanitizers, and
+# the tools that make a build faster where the machine has them.
+
+set(CMAKE_CXX_STANDARD 20)
+set(CMAKE_CXX_STANDARD_REQUIRED ON)
+set(CMAKE_CXX_EXTENSIONS OFF)
+set(CMAKE_CXX_VISIBILITY_PRESET hidden)
+set(CMAKE_VISIBILITY_INLINES_HIDDEN ON)
+set(CMAKE_POSITION_INDEPENDENT_CODE ON)
+set(CMAKE_EXPORT_COMPILE_COMMANDS ON)
+set(CMAKE_LIBRARY_OUTPUT_DIRECTORY ${PROJECT_BINARY_DIR}/lib)
+set(CMAKE_RUNTIME_OUTPUT_DIRECTORY ${PROJECT_BINARY_DIR}/bin)
+if(NOT CMAKE_BUILD_TYPE)
+  set(CMAKE_BUILD_TYPE Release)
+endif()
+
+find_package(Threads REQUIRED)
+
+add_compile_options(-Wall -Wextra -Wpedantic -Wshadow -Wnon-virtual-dtor -Woverloaded-virtual
+                    -Wcast-qual -Werror)
+if(VEXG_SANITIZE)
+  add_compile_options(-fsanitize=${VEXG_SANITIZE} -fno-sanitize-recover=all
+                      -fno-omit-frame-pointer -g1)
+  add_link_options(-fsanitize=${VEXG_SANITIZE})
+endif()
+
+find_program(VEXG_CCACHE ccache)
+if(VEXG_CCACHE AND NOT CMAKE_CXX_COMPILER_LAUNCHER)
+  # The cache is shared between checkouts, and precompiled headers need their times ignored.
+  set(CMAKE_CXX_COMPILER_LAUNCHER ${CMAKE_COMMAND} -E env CCACHE_BASEDIR=${PROJECT_SOURCE_DIR}
+      CCACHE_NOHASHDIR=1 CCACHE_SLOPPINESS=pch_defines,time_macros ${VEXG_CCACHE})
+endif()
+find_program(VEXG_MOLD mold)
+if(VEXG_MOLD)
+  add_link_options(-fuse-ld=mold)
+endif()

@@ -1,0 +1,13 @@
+#pragma once
+
+#include "platform/export.h"
+
+namespace lumo::platform {
+
+/// Seconds of a clock that never goes back, from an unspecified origin.
+VEXG_EXPORT double MonotonicSeconds();
+
+/// Seconds of processor time that this process has used so far, on all its threads.
+VEXG_EXPORT double ProcessCpuSeconds();
+
+}  // namespace lumo::platform
