@@ -13,8 +13,12 @@ double ReadClock(clockid_t clock) {
 
 }  // namespace
 
-double MonotonicSeconds() { return ReadClock(CLOCK_MONOTONIC); }
+double MonotonicSeconds() {
+  return ReadClock(CLOCK_MONOTONIC);
+}
 
-double ProcessCpuSeconds() { return ReadClock(CLOCK_PROCESS_CPUTIME_ID); }
+double ProcessCpuSeconds() {
+  return ReadClock(CLOCK_PROCESS_CPUTIME_ID);
+}
 
 }  // namespace lumo::platform

@@ -7,8 +7,12 @@ namespace {
 
 constexpr char32_t kReplacement = 0xFFFD;
 
-constexpr bool IsContinuation(unsigned char byte) { return (byte & 0xC0) == 0x80; }
-constexpr bool IsSurrogate(char32_t point) { return point >= 0xD800 && point <= 0xDFFF; }
+constexpr bool IsContinuation(unsigned char byte) {
+  return (byte & 0xC0) == 0x80;
+}
+constexpr bool IsSurrogate(char32_t point) {
+  return point >= 0xD800 && point <= 0xDFFF;
+}
 
 /// Takes the code point at the head of `bytes`, or one byte as U+FFFD, off `bytes`.
 char32_t TakeUtf8(std::string_view& bytes) {
@@ -34,8 +38,8 @@ char32_t TakeUtf8(std::string_view& bytes) {
 /// Takes the code point at the head of `units`, or a lone surrogate as U+FFFD, off `units`.
 char32_t TakeUtf16(std::u16string_view& units) {
   const char32_t first = units[0];
-  const bool pair = first >= 0xD800 && first <= 0xDBFF && units.size() > 1 &&
-                    units[1] >= 0xDC00 && units[1] <= 0xDFFF;
+  const bool pair = first >= 0xD800 && first <= 0xDBFF && units.size() > 1 && units[1] >= 0xDC00 &&
+                    units[1] <= 0xDFFF;
   const char32_t second = pair ? units[1] : 0;
   units.remove_prefix(pair ? 2 : 1);
   if (pair) return 0x10000 + ((first - 0xD800) << 10) + (second - 0xDC00);

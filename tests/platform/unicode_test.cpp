@@ -4,11 +4,14 @@ namespace lumo::platform {
 namespace {
 
 TEST(Unicode, ConvertsBothWays) {
-  const struct { const char* utf8; const char16_t* utf16; } cases[] = {
+  const struct {
+    const char* utf8;
+    const char16_t* utf16;
+  } cases[] = {
       {"", u""},
       {"plain", u"plain"},
       {"\xC3\xA9\xE2\x82\xAC", u"\u00e9\u20ac"},
-      {"\xF0\x9F\x9B\xB0", u"\U0001F6F0"},           // outside the base plane: a surrogate pair
+      {"\xF0\x9F\x9B\xB0", u"\U0001F6F0"},  // outside the base plane: a surrogate pair
       {"\xEF\xBF\xBF\xF4\x8F\xBF\xBF", u"\uffff\U0010ffff"},
   };
   for (const auto& c : cases) {
@@ -18,7 +21,11 @@ TEST(Unicode, ConvertsBothWays) {
 }
 
 TEST(Unicode, ReplacesWhatIsNotWellFormed) {
-  const struct { const char* name; std::string_view bytes; std::u16string want; } cases[] = {
+  const struct {
+    const char* name;
+    std::string_view bytes;
+    std::u16string want;
+  } cases[] = {
       {"stray continuation", "a\x80z", u"a\ufffdz"},
       {"breaks off at the end", "a\xE2\x82", u"a\ufffd\ufffd"},
       {"breaks off before text", "\xE2\x82z", u"\ufffd\ufffdz"},
@@ -30,7 +37,9 @@ TEST(Unicode, ReplacesWhatIsNotWellFormed) {
   for (const auto& c : cases) EXPECT_EQ(Utf8ToUtf16(c.bytes), c.want) << c.name;
 
   const char16_t lone[] = {u'a', 0xD83D, u'b', 0xDC00, 0xD800};
-  EXPECT_EQ(Utf16ToUtf8({lone, 5}), "a\xEF\xBF\xBD" "b\xEF\xBF\xBD\xEF\xBF\xBD");
+  EXPECT_EQ(Utf16ToUtf8({lone, 5}),
+            "a\xEF\xBF\xBD"
+            "b\xEF\xBF\xBD\xEF\xBF\xBD");
 }
 
 // The conversions never read behind the view: the byte there would complete the sequence.

@@ -1,0 +1,61 @@
+#pragma once
+
+#include "foundation/containers.h"
+
+namespace lumo {
+
+/// Key of a Context: case-sensitive text.
+struct ContextKey {
+  String text;
+  friend bool operator<(const ContextKey& a, const ContextKey& b) { return a.text < b.text; }
+};
+
+/// Value of a Context.
+struct ContextValue {
+  String text;
+};
+
+/// Texts under keys. A missing key reads as the empty text.
+class VEXG_EXPORT Context : public Object {
+ public:
+  static const unsigned TypeCode;
+  Context();
+  bool IsA(unsigned typeCode) const override;
+
+  /// The entry of `key`, made empty when it is missing: the way to write and to read.
+  ContextValue& operator[](const ContextKey& key) { return values_[key]; }
+
+  /// The value of kWorkingDirectory, or the empty text; adds no entry.
+  String WorkingDirectory() const;
+
+  unsigned GetCount() const { return values_.GetCount(); }
+
+  /// A directory for temporary data; used in a local Context, not in the environment.
+  static const ContextKey kWorkingDirectory;
+
+ private:
+  Map<ContextKey, ContextValue> values_;
+};
+
+/// What a host tells the library about its surroundings. It is filled before the first operation
+/// and only read after that.
+/// Threads: no lock. Reading a key that the host left out makes it, so a host sets all keys first.
+class VEXG_EXPORT Environment : public Object {
+ public:
+  static const unsigned TypeCode;
+  bool IsA(unsigned typeCode) const override;
+
+  static const ContextKey kBinDirectory;   ///< the host's binaries
+  static const ContextKey kXmlDirectory;   ///< XML files; read by nothing in the library
+  static const ContextKey kPeDirectory;    ///< coordinate system data
+  static const ContextKey kGdalDirectory;  ///< GDAL data
+  static const ContextKey kMdfDirectory;   ///< metadata definition files
+};
+
+/// The object behind the process-wide environment.
+class VEXG_EXPORT EnvironmentImpl : public Context {};
+
+/// The one environment of the process, made at the first call and never destroyed.
+VEXG_EXPORT EnvironmentImpl& GetGlobalEnvironmentImpl();
+
+}  // namespace lumo

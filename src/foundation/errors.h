@@ -1,0 +1,142 @@
+#pragma once
+
+#include "foundation/error_state.h"
+
+namespace lumo {
+
+// The error classes of the library. Each has a static `Code`, taken at load, by which a caller that
+// wants the reason of a failure compares: object.GetErrorState().code == ObjectErrorIO::Code.
+
+/// An allocation of a container or an array failed.
+struct VEXG_EXPORT ObjectErrorOutOfMemory : ObjectError {
+  ObjectErrorOutOfMemory() : ObjectError(Code) {}
+  static const unsigned Code;
+};
+
+/// An object whose constructor could not complete is used.
+struct VEXG_EXPORT ObjectErrorNotConstructed : ObjectError {
+  ObjectErrorNotConstructed() : ObjectError(Code) {}
+  static const unsigned Code;
+};
+
+/// Reading or writing a file, an XML document or a buffer failed.
+struct VEXG_EXPORT ObjectErrorIO : ObjectError {
+  ObjectErrorIO() : ObjectError(Code) {}
+  static const unsigned Code;
+};
+
+/// A piece of asynchronous work could not be run.
+struct VEXG_EXPORT AsyncErrorExecuteFailed : ObjectError {
+  AsyncErrorExecuteFailed() : ObjectError(Code) {}
+  static const unsigned Code;
+};
+
+/// An input check of a command failed, or its body gave up.
+struct VEXG_EXPORT CommandErrorFail : ObjectError {
+  CommandErrorFail() : ObjectError(Code) {}
+  static const unsigned Code;
+};
+
+/// A parallel body found its data unusable.
+struct VEXG_EXPORT ParallelError : ObjectError {
+  ParallelError() : ObjectError(Code) {}
+  static const unsigned Code;
+};
+
+/// A read, a write or a parallel loop of a pipeline stage failed.
+struct VEXG_EXPORT TaskError : ObjectError {
+  TaskError() : ObjectError(Code) {}
+  static const unsigned Code;
+};
+
+/// A task got arguments of the wrong number or type.
+struct VEXG_EXPORT TaskErrorBadArgs : ObjectError {
+  TaskErrorBadArgs() : ObjectError(Code) {}
+  static const unsigned Code;
+};
+
+/// A task got parameters that it could not use.
+struct VEXG_EXPORT TaskErrorBadParams : ObjectError {
+  TaskErrorBadParams() : ObjectError(Code) {}
+  static const unsigned Code;
+};
+
+/// An argument list could not grow.
+struct VEXG_EXPORT ArgListError : ObjectError {
+  ArgListError() : ObjectError(Code) {}
+  static const unsigned Code;
+};
+
+/// An array operation met an array that is not valid.
+struct VEXG_EXPORT ArrayErrorInvalidArray : ObjectError {
+  ArrayErrorInvalidArray() : ObjectError(Code) {}
+  static const unsigned Code;
+};
+
+/// The window of a file-backed buffer can't be allocated.
+struct VEXG_EXPORT BufferErrorBadBuffer : ObjectError {
+  BufferErrorBadBuffer() : ObjectError(Code) {}
+  static const unsigned Code;
+};
+
+/// The header block of a file-backed buffer can't be allocated.
+struct VEXG_EXPORT BufferErrorBadHeader : ObjectError {
+  BufferErrorBadHeader() : ObjectError(Code) {}
+  static const unsigned Code;
+};
+
+/// The file of a buffer holds no full header, or it could not be written.
+struct VEXG_EXPORT BufferWarningNoHeaderData : ObjectWarning {
+  BufferWarningNoHeaderData() : ObjectWarning(Code) {}
+  static const unsigned Code;
+};
+
+/// A write was tried on a read-only buffer.
+struct VEXG_EXPORT BufferWarningReadOnly : ObjectWarning {
+  BufferWarningReadOnly() : ObjectWarning(Code) {}
+  static const unsigned Code;
+};
+
+/// A region attribute record could not be laid out.
+struct VEXG_EXPORT RegionAttributeErrorBadAllocation : ObjectError {
+  RegionAttributeErrorBadAllocation() : ObjectError(Code) {}
+  static const unsigned Code;
+};
+
+/// A polygon can't be used.
+struct VEXG_EXPORT PolygonErrorBadPolygon : ObjectError {
+  PolygonErrorBadPolygon() : ObjectError(Code) {}
+  static const unsigned Code;
+};
+
+/// A matrix to invert is singular.
+struct VEXG_EXPORT MatrixErrorSingular : ObjectError {
+  MatrixErrorSingular() : ObjectError(Code) {}
+  static const unsigned Code;
+};
+
+/// The dimensions of matrices do not fit.
+struct VEXG_EXPORT MatirxErrorBadDims : ObjectError {
+  MatirxErrorBadDims() : ObjectError(Code) {}
+  static const unsigned Code;
+};
+
+/// The data connection server has no thread for a call.
+struct VEXG_EXPORT DcSrvErrorNoThread : ObjectError {
+  DcSrvErrorNoThread() : ObjectError(Code) {}
+  static const unsigned Code;
+};
+
+/// A raster reader dispatch has no valid reader.
+struct VEXG_EXPORT RasterReaderErrorInvalid : ObjectError {
+  RasterReaderErrorInvalid() : ObjectError(Code) {}
+  static const unsigned Code;
+};
+
+/// A vector reader dispatch has no valid reader.
+struct VEXG_EXPORT VectorReaderErrorInvalid : ObjectError {
+  VectorReaderErrorInvalid() : ObjectError(Code) {}
+  static const unsigned Code;
+};
+
+}  // namespace lumo

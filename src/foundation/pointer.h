@@ -1,0 +1,145 @@
+#pragma once
+
+#include <atomic>
+#include <cstddef>
+#include <functional>
+#include <type_traits>
+
+#include "foundation/object.h"
+
+namespace lumo {
+
+/// What the Pointers to one object share. An empty Pointer has one too, with a null object.
+struct ControlBlock {
+  std::atomic<unsigned> count{1};  ///< Pointers that share this block
+  void* object = nullptr;          ///< address of the object's root base, see PointerRoot
+  bool noDelete = false;           ///< the object belongs to somebody else
+  void (*destroy)(void*) = nullptr;
+};
+
+namespace detail {
+
+/// The base class under which a ControlBlock keeps the address of a T, so that Pointers to any two
+/// classes of one family can share a block: Object or ErrorState where T has it, else the
+/// `PointerRoot` that the family names in its root class, else T itself.
+template <typename T>
+auto FindPointerRoot() {
+  if constexpr (std::is_base_of_v<Object, T>) {
+    return std::type_identity<Object>();
+  } else if constexpr (std::is_base_of_v<ErrorState, T>) {
+    return std::type_identity<ErrorState>();
+  } else if constexpr (requires { typename T::PointerRoot; }) {
+    return std::type_identity<typename T::PointerRoot>();
+  } else {
+    return std::type_identity<T>();
+  }
+}
+
+template <typename T>
+using PointerRoot = typename decltype(FindPointerRoot<T>())::type;
+
+}  // namespace detail
+
+/// The shared pointer of the library: a counted reference to an object that is deleted, through
+/// its virtual destructor, with the last Pointer that shares it. There are no weak references.
+///
+/// Two Pointers made from one raw pointer do not know of each other; sharing goes through copying.
+/// `XPtr` stands for Pointer<X>.
+///
+/// Ownership: a raw pointer given to the constructor changes hands, unless `noDelete` is set, which
+///            wraps an object that belongs to somebody else and outlives the Pointer.
+/// Threads:   only the count is protected. Copies may live on different threads; one Pointer may
+///            not be assigned on one thread while another uses it.
+template <typename T>
+class Pointer {
+ public:
+  Pointer() : block_(new ControlBlock) {}
+  Pointer(std::nullptr_t) : Pointer() {}
+  explicit Pointer(T* object, bool noDelete = false) : block_(MakeBlock(object, noDelete)) {}
+  Pointer(const Pointer& other) : block_(other.block_) { ++block_->count; }
+
+  /// Shares the object of a Pointer to another class when it is a T: known at compile time for a
+  /// class derived from T, else asked by IsA. Otherwise, or when `other` is null, empty.
+  template <typename U>
+  requires(!std::is_same_v<T, U>) Pointer(const Pointer<U>& other) : block_(ShareOrEmpty(other)) {}
+
+  virtual ~Pointer() { Release(); }
+
+  Pointer& operator=(const Pointer& other) {
+    if (this == &other) return *this;
+    ControlBlock* const shared = other.block_;
+    ++shared->count;  // before the release, which may destroy `other` itself
+    Release();
+    block_ = shared;
+    return *this;
+  }
+
+  /// Lets go of what is held and takes over `object`, as the constructor does.
+  void Reset(T* object = nullptr, bool noDelete = false) {
+    ControlBlock* const fresh = MakeBlock(object, noDelete);
+    Release();
+    block_ = fresh;
+  }
+
+  bool IsNull() const { return block_->object == nullptr; }
+  explicit operator bool() const { return !IsNull(); }
+
+  T* Get() const { return static_cast<T*>(static_cast<detail::PointerRoot<T>*>(block_->object)); }
+  T* operator->() const { return Get(); }
+  T& operator*() const { return *Get(); }
+
+  /// How many Pointers share the object at this moment.
+  unsigned GetCount() const { return block_->count; }
+
+  /// By the address of the control block: Pointers that share are equal.
+  friend bool operator==(const Pointer& a, const Pointer& b) { return a.block_ == b.block_; }
+  friend bool operator<(const Pointer& a, const Pointer& b) {
+    return std::less<ControlBlock*>()(a.block_, b.block_);
+  }
+
+ private:
+  template <typename U>
+  friend class Pointer;
+
+  static ControlBlock* MakeBlock(T* object, bool noDelete) {
+    using Root = detail::PointerRoot<T>;
+    Root* const root = object;
+    try {
+      auto* const block = new ControlBlock;
+      block->object = root;
+      block->noDelete = noDelete;
+      block->destroy = [](void* held) { delete static_cast<Root*>(held); };
+      return block;
+    } catch (...) {
+      if (!noDelete) delete root;
+      throw;
+    }
+  }
+
+  template <typename U>
+  static ControlBlock* ShareOrEmpty(const Pointer<U>& other) {
+    static_assert(std::is_same_v<detail::PointerRoot<T>, detail::PointerRoot<U>>,
+                  "the classes do not belong to one family");
+    bool fits = !other.IsNull();
+    if constexpr (!std::is_base_of_v<T, U>) {
+      static_assert(&T::TypeCode != &Object::TypeCode, "the class has no type code of its own");
+      fits = fits && other->IsA(T::TypeCode);
+    }
+    if (!fits) return new ControlBlock;
+    ++other.block_->count;
+    return other.block_;
+  }
+
+  void Release() {
+    if (block_->count != 0 && --block_->count != 0) return;
+    if (block_->object != nullptr && !block_->noDelete) block_->destroy(block_->object);
+    delete block_;
+    block_ = nullptr;
+  }
+
+  ControlBlock* block_;
+};
+
+using ObjectPtr = Pointer<Object>;
+
+}  // namespace lumo
