@@ -1,11 +1,13 @@
 #include "foundation/text_form.h"
 
+#include <charconv>
 #include <istream>
 #include <iterator>
 #include <limits>
 #include <locale>
 #include <ostream>
 #include <string>
+#include <string_view>
 
 namespace lumo {
 namespace {
@@ -84,7 +86,22 @@ bool detail::ReadFloating(std::istream& in, T& value) {
   return true;
 }
 
+template <typename T>
+void detail::WriteFloating(std::ostream& out, T value) {
+  constexpr std::streamsize kDefaultPrecision = 6;
+  if (out.precision() != kDefaultPrecision || (out.flags() & std::ios::floatfield) != 0) {
+    out << value;
+    return;
+  }
+  char digits[32];
+  const auto end =
+      std::to_chars(std::begin(digits), std::end(digits), value, std::chars_format::general).ptr;
+  out << std::string_view(digits, static_cast<std::size_t>(end - digits));
+}
+
 template VEXG_EXPORT bool detail::ReadFloating(std::istream&, float&);
+template VEXG_EXPORT void detail::WriteFloating(std::ostream&, float);
+template VEXG_EXPORT void detail::WriteFloating(std::ostream&, double);
 template VEXG_EXPORT bool detail::ReadFloating(std::istream&, double&);
 
 }  // namespace lumo

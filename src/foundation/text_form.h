@@ -37,6 +37,8 @@ VEXG_EXPORT std::ostringstream MakeTextWriter();
 namespace detail {
 template <typename T>
 VEXG_EXPORT bool ReadFloating(std::istream& in, T& value);
+template <typename T>
+VEXG_EXPORT void WriteFloating(std::ostream& out, T value);
 }  // namespace detail
 
 /// Reads one number by the stream's own number reading. Integers of 8 bits are numbers here, not
@@ -63,10 +65,14 @@ bool ReadNumber(std::istream& in, T& value) {
   }
 }
 
-/// Writes one number in the stream's form; integers of 8 bits as numbers.
+/// Writes one number in the stream's form; integers of 8 bits as numbers. A floating value gets, in
+/// the stream's default notation, the fewest digits that read back to the same value, unless the
+/// stream has a precision or a notation of its own.
 template <typename T>
 void WriteNumber(std::ostream& out, T value) {
-  if constexpr (sizeof(T) == 1 && !std::is_same_v<T, bool>) {
+  if constexpr (std::is_floating_point_v<T>) {
+    detail::WriteFloating(out, value);
+  } else if constexpr (sizeof(T) == 1 && !std::is_same_v<T, bool>) {
     out << static_cast<int>(value);
   } else {
     out << value;

@@ -1,0 +1,63 @@
+#pragma once
+
+#include <span>
+#include <vector>
+
+#include "platform/export.h"
+
+namespace lumo {
+
+/// What a command needs of an input before it runs.
+enum class Presence { kRequired, kOptional };
+
+/// How the text of an input or output is to be read.
+enum class ValueKind {
+  kText,
+  kURI,
+  kBoolean,
+  kInteger,
+  kNumber,
+  kWord,
+  kTextList,
+  kIntegerArray,
+  kNumberArray,
+  kRectangle,
+  kPalette,
+};
+
+/// The name of a kind and its text form, for people.
+struct ValueKindText {
+  const char* name;
+  const char* form;
+};
+VEXG_EXPORT ValueKindText Describe(ValueKind kind);
+
+/// One input of a command. Texts are single lines.
+struct InputDeclaration {
+  const char* name;
+  Presence presence;
+  ValueKind kind;
+  const char* meaning;
+  const char* unit = "";  ///< unit of a number; empty for none
+};
+
+/// One output of a command.
+struct OutputDeclaration {
+  const char* name;
+  ValueKind kind;
+  const char* meaning;
+  const char* unit = "";
+  bool returned = true;  ///< stands in the result document too
+};
+
+/// What a command says of itself, once: the input checks, the lists of commands, the help, the
+/// completion of the shell and the reference document are all made from it.
+struct CommandDeclaration {
+  const char* name;                      ///< class name, and key in the registry
+  const char* group;                     ///< heading under which lists show it
+  const char* meaning;                   ///< one line
+  std::vector<InputDeclaration> inputs;  ///< in the order in which they are checked
+  std::vector<OutputDeclaration> outputs;
+};
+
+}  // namespace lumo

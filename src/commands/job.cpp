@@ -1,0 +1,15 @@
+#include "commands/job.h"
+
+namespace lumo {
+
+Job::~Job() {
+  if (!ipc.IsNull()) ipc->progress->Update(1.0);
+}
+
+void Job::Clear() {
+  commands.Clear();
+  commandIndex.Clear();
+  unknown.Clear();
+}
+
+}  // namespace lumo

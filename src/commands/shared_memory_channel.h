@@ -1,0 +1,91 @@
+#pragma once
+
+#include <memory>
+
+#include "foundation/run_controls.h"
+
+namespace lumo {
+
+namespace platform {
+class SharedMemoryBlock;
+}
+
+/// A view of a block of named memory that another process made and owns.
+class VEXG_EXPORT SharedMemory {
+ public:
+  SharedMemory(const String& name, unsigned size);
+  virtual ~SharedMemory();
+  SharedMemory(const SharedMemory&) = delete;
+  SharedMemory& operator=(const SharedMemory&) = delete;
+
+  /// Opens the block; a view that is open already is closed first.
+  /// @return false when there is no such block, or it is smaller than the size asked for.
+  bool Open();
+
+  /// First byte of the view; null when it isn't open.
+  unsigned char* GetData() const;
+  const String& GetName() const { return name_; }
+  unsigned GetSize() const { return size_; }
+
+ private:
+  String name_;
+  unsigned size_;
+  std::unique_ptr<platform::SharedMemoryBlock> block_;
+};
+
+/// A SharedMemory that is opened when it is made.
+class VEXG_EXPORT ConnectSharedMemory : public SharedMemory {
+ public:
+  ConnectSharedMemory(const String& name, unsigned size) : SharedMemory(name, size) { Open(); }
+};
+
+/// An abort flag and a progress report in a block of named memory, through which another process
+/// watches a job. The flag is one byte, 1 for abort; the progress is a 32-bit float. Exists for
+/// flags of type bool and unsigned char with a progress of type float.
+///
+/// A block that can't be opened, an offset outside it, a progress offset that is no multiple of 4,
+/// or a flag inside the progress value leave the channel unusable: its flag and report are then its
+/// own and nobody sees them.
+template <typename A, typename P>
+class SHMIPC : public IPC {
+ public:
+  /// @param size            bytes of the block.
+  /// @param abortOffset     byte at which the flag stands.
+  /// @param progressOffset  byte at which the progress stands.
+  SHMIPC(const String& name, unsigned size, unsigned abortOffset, unsigned progressOffset = 0)
+      : memory_(name, size), usable_(Fits(abortOffset, progressOffset)) {
+    if (!usable_) return;
+    unsigned char* const data = memory_.GetData();
+    progress = ProgressReportPtr(
+        new ExternalProgressReport<P>(reinterpret_cast<P*>(data + progressOffset)));
+    abort = AbortFlagPtr(new ExternalAbortFlag<A>(reinterpret_cast<A*>(data + abortOffset)));
+  }
+
+  bool IsUsable() const { return usable_; }
+
+ private:
+  bool Fits(unsigned abortOffset, unsigned progressOffset) const {
+    const bool inside = abortOffset < memory_.GetSize() && memory_.GetSize() >= sizeof(P) &&
+                        progressOffset <= memory_.GetSize() - sizeof(P);
+    const bool apart = abortOffset < progressOffset || abortOffset >= progressOffset + sizeof(P);
+    return memory_.GetData() != nullptr && inside && apart && progressOffset % alignof(P) == 0;
+  }
+
+  ConnectSharedMemory memory_;
+  bool usable_;
+};
+
+/// The channel with the progress at byte 0 and the abort flag in the last byte of the block.
+class VEXG_EXPORT ORVAIPC : public SHMIPC<unsigned char, float> {
+ public:
+  ORVAIPC(const String& name, unsigned size) : SHMIPC(name, size, size - 1) {}
+};
+
+/// An ORVAIPC of fixed size.
+class VEXG_EXPORT TQFProcessIPC : public ORVAIPC {
+ public:
+  static constexpr unsigned kSize = 1034;
+  explicit TQFProcessIPC(const String& name) : ORVAIPC(name, kSize) {}
+};
+
+}  // namespace lumo

@@ -1,0 +1,105 @@
+#pragma once
+
+#include <span>
+#include <string_view>
+#include <type_traits>
+
+#include "foundation/array.h"
+#include "foundation/scalar.h"
+#include "foundation/text_form.h"
+
+// The text forms of command inputs and outputs. Every value travels as the text of a
+// Scalar<String>; what one side formats, the other reads back to the same value.
+//
+//   String         all of the text, trimmed         bool      0 or 1
+//   URI            [text] and a blank               numbers   the stream's form
+//   Array<String>  pieces joined by |               Array<T>  rank:extent extent [a b c] and a
+//   blank enumerations   one word                         others    their operator<< and operator>>
+
+namespace lumo {
+
+/// One word of an enumeration. An enumeration with a text form has a function
+/// `std::span<const EnumWord<E>> WordsOf(E)` in its own namespace.
+template <typename E>
+struct EnumWord {
+  const char* word;
+  E value;
+};
+
+/// The text of the Scalar<String> at `object`; null when there is none.
+VEXG_EXPORT const String* FindText(const ObjectPtr& object);
+
+/// A Scalar<String> that holds `text`.
+VEXG_EXPORT ObjectPtr MakeText(const String& text);
+
+namespace detail {
+
+VEXG_EXPORT Array<String> SplitAtBars(const String& text);
+VEXG_EXPORT String JoinWithBars(const Array<String>& pieces);
+
+template <typename E>
+E ReadEnumWord(std::istream& in) {
+  const std::string text = ReadWordText(in).ToUTF8();
+  for (const EnumWord<E>& entry : WordsOf(E())) {
+    if (text == entry.word) return entry.value;
+  }
+  return E();
+}
+
+}  // namespace detail
+
+/// Reads a value of type T from its text form. A text that holds no such value gives T(); a word
+/// that the enumeration lacks gives its value 0.
+template <typename T>
+T ParseValue(const String& text) {
+  std::istringstream in = MakeTextReader(text);
+  if constexpr (std::is_same_v<T, String>) {
+    return ReadWholeText(in);
+  } else if constexpr (std::is_same_v<T, URI>) {
+    return URI(ReadBracketedText(in));
+  } else if constexpr (std::is_same_v<T, Array<String>>) {
+    return detail::SplitAtBars(text);
+  } else if constexpr (std::is_enum_v<T>) {
+    return detail::ReadEnumWord<T>(in);
+  } else if constexpr (std::is_arithmetic_v<T>) {
+    T value;
+    ReadNumber(in, value);
+    return value;
+  } else {
+    T value{};
+    in >> value;
+    return value;
+  }
+}
+
+/// The text form of `value`.
+template <typename T>
+String FormatValue(const T& value) {
+  std::ostringstream out = MakeTextWriter();
+  if constexpr (std::is_same_v<T, String>) {
+    return value;
+  } else if constexpr (std::is_same_v<T, URI>) {
+    WriteBracketedText(out, value);
+  } else if constexpr (std::is_same_v<T, Array<String>>) {
+    return detail::JoinWithBars(value);
+  } else if constexpr (std::is_enum_v<T>) {
+    for (const EnumWord<T>& entry : WordsOf(T())) {
+      if (entry.value == value) return entry.word;
+    }
+    return {};
+  } else if constexpr (std::is_arithmetic_v<T>) {
+    WriteNumber(out, value);
+  } else {
+    out << value;
+  }
+  return String(out.str());
+}
+
+/// The value in the text at `object`; T() when it isn't a Scalar<String>.
+template <typename T>
+T ReadValue(const ObjectPtr& object) {
+  const String* const text = FindText(object);
+  return text != nullptr ? ParseValue<T>(*text) : T();
+}
+
+}  // namespace lumo

@@ -1,0 +1,74 @@
+#pragma once
+
+#include "foundation/containers.h"
+#include "foundation/pointer.h"
+
+namespace lumo {
+
+/// Limits on the documents that are parsed. A document beyond them counts as not well formed.
+inline constexpr unsigned kMaxXMLBytes = 64U << 20;
+inline constexpr unsigned kMaxXMLDepth = 1000;
+inline constexpr unsigned kMaxXMLAttributes = 10000;  ///< of one element
+
+/// Reads an XML document and hands its events to the operations that a derived class overrides.
+///
+/// A document with a DOCTYPE is refused before anything in it is expanded, and nothing outside the
+/// document is ever opened.
+/// Failure: ObjectErrorIO for an empty text, one that is not well formed or one beyond the limits.
+///          What was seen before the fault has had its effect.
+/// Threads: used by one thread.
+class VEXG_EXPORT XMLSimpleParser : public ErrorState {
+ public:
+  virtual void StartDocument() {}
+  virtual void EndDocument() {}
+  virtual void StartElement(const String& /*name*/, const Map<String, String>& /*attributes*/) {}
+  virtual void EndElement(const String& /*name*/) {}
+  virtual void Characters(const String& /*text*/) {}
+
+  void Parse(const String& document);
+
+  /// What was wrong with the document and where, in one line; empty when nothing was.
+  const String& GetFault() const { return fault_; }
+
+ private:
+  void SetFault(const String& fault);
+
+  String fault_;
+};
+
+class XMLElement;
+using XMLElementPtr = Pointer<XMLElement>;
+
+/// A node of an XML tree: name, attributes, text and children in order.
+class VEXG_EXPORT XMLElement {
+ public:
+  using PointerRoot = XMLElement;
+
+  explicit XMLElement(const String& elementName) : name(elementName) {}
+  virtual ~XMLElement() = default;
+
+  /// Adds a child at the end; this element owns it.
+  XMLElement* AddChild(const String& childName);
+
+  String name;
+  Map<String, String> attributes;
+  String text;  ///< written when its length is not 0
+  Deque<XMLElementPtr> children;
+};
+
+/// The root of a document to write; it has neither attributes nor text.
+struct XMLDocumentRoot {
+  String name;
+  Deque<XMLElementPtr> children;
+};
+
+/// Writes a tree as an XML document in UTF-8, on one line. A character that XML can't carry is
+/// written as U+FFFD.
+/// Failure: ObjectErrorIO and an empty text, for a name that XML does not allow among others.
+/// Threads: used by one thread.
+class VEXG_EXPORT XMLSimpleWriter : public ErrorState {
+ public:
+  String Write(const XMLDocumentRoot& root);
+};
+
+}  // namespace lumo

@@ -1,0 +1,19 @@
+#pragma once
+
+#include <shared_mutex>
+
+namespace lumo {
+
+/// Holds the XML library ready for the length of one parse or write. The library is made ready when
+/// libvexg is loaded and ended when it is unloaded; work that comes later is refused.
+class XMLRuntime {
+ public:
+  XMLRuntime();
+  bool IsReady() const { return ready_; }
+
+ private:
+  std::shared_lock<std::shared_mutex> lock_;
+  bool ready_;
+};
+
+}  // namespace lumo

@@ -1,0 +1,33 @@
+#include "platform/module.h"
+
+#include <dlfcn.h>
+
+namespace lumo::platform {
+
+Module Module::Load(const std::string& path, std::string* fault) {
+  Module module;
+  module.handle_ = dlopen(path.c_str(), RTLD_NOW | RTLD_LOCAL);
+  if (module.handle_ == nullptr && fault != nullptr) {
+    const char* const why = dlerror();
+    *fault = why != nullptr ? why : path;
+  }
+  return module;
+}
+
+void* Module::FindSymbol(const char* name) const {
+  return handle_ != nullptr ? dlsym(handle_, name) : nullptr;
+}
+
+std::string ModuleFileName(const std::string& name) {
+  return "lib" + name + ".so";
+}
+
+std::string LibraryDirectory() {
+  Dl_info info{};
+  if (dladdr(reinterpret_cast<const void*>(&ModuleFileName), &info) == 0) return {};
+  const std::string path = info.dli_fname;
+  const std::size_t slash = path.rfind('/');
+  return slash != std::string::npos ? path.substr(0, slash) : std::string();
+}
+
+}  // namespace lumo::platform

@@ -1,0 +1,43 @@
+#pragma once
+
+#include <cstddef>
+#include <memory>
+#include <string>
+
+#include "platform/export.h"
+
+namespace lumo::platform {
+
+/// A mapped view of a block of named memory. It stands in the system's table of names (on Linux
+/// /dev/shm), where a block is found by its name without a leading slash.
+///
+/// Threads: the bytes are shared with other processes; access to them is the user's to order.
+class VEXG_EXPORT SharedMemoryBlock {
+ public:
+  /// Opens a block that exists, for reading and writing.
+  /// @param name  UTF-8; 1 to 255 bytes, without "/" or NUL.
+  /// @param size  bytes to map, at least 1. The block may be larger.
+  /// @return null when there is no such block, it is smaller than `size`, or it can't be mapped.
+  static std::unique_ptr<SharedMemoryBlock> Open(const std::string& name, std::size_t size);
+
+  /// Makes a block of zeros that only this user can open, and removes its name when destroyed.
+  /// @return null when the name is taken or not allowed, or memory is short.
+  static std::unique_ptr<SharedMemoryBlock> Create(const std::string& name, std::size_t size);
+
+  ~SharedMemoryBlock();
+  SharedMemoryBlock(const SharedMemoryBlock&) = delete;
+  SharedMemoryBlock& operator=(const SharedMemoryBlock&) = delete;
+
+  unsigned char* GetData() const { return data_; }
+  std::size_t GetSize() const { return size_; }
+
+ private:
+  SharedMemoryBlock(unsigned char* data, std::size_t size, std::string ownedPath)
+      : data_(data), size_(size), ownedPath_(std::move(ownedPath)) {}
+
+  unsigned char* data_;
+  std::size_t size_;
+  std::string ownedPath_;  // removed at the end; empty for a block of somebody else
+};
+
+}  // namespace lumo::platform
