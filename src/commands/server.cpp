@@ -130,6 +130,11 @@ void PipeServerDispatch::Stop() {
   PipeClient(name_).Shutdown();
 }
 
+void PipeServerDispatch::EndNow() {
+  RequestStop();
+  pipe_.StopListening();
+}
+
 ServerDispatch& GetServerDispatch(const String& name) {
   static auto& dispatch = *new PipeServerDispatch(name);
   return dispatch;

@@ -62,6 +62,9 @@ class VEXG_EXPORT PipeServerDispatch : public ServerDispatch {
   void Run() override;
   void Stop() override;
 
+  /// Ends the thread from within the process, where Stop would go through the pipe.
+  void EndNow();
+
  private:
   bool StartServer(int clientProcess, String& serverName);
 
