@@ -1,8 +1,7 @@
 #include <commands/job_parser.h>
 #include <commands/job_result.h>
-#include <foundation/library.h>
-
 #include <cstdio>
+#include <foundation/library.h>
 
 namespace {
 
