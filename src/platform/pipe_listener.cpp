@@ -3,12 +3,13 @@
 #include <algorithm>
 #include <atomic>
 #include <cerrno>
+#include <compare>
 #include <cstring>
 #include <fcntl.h>
 #include <list>
-#include <map>
 #include <mutex>
 #include <poll.h>
+#include <set>
 #include <sys/file.h>
 #include <sys/socket.h>
 #include <sys/stat.h>
@@ -28,6 +29,18 @@ ino_t FileNumber(const std::string& path) {
   return lstat(path.c_str(), &status) == 0 ? status.st_ino : 0;
 }
 
+/// A socket in the file system, which is told from one that has taken its place.
+struct PipeFile {
+  std::string path;
+  ino_t number = 0;
+
+  friend auto operator<=>(const PipeFile&, const PipeFile&) = default;
+
+  void Remove() const {
+    if (FileNumber(path) == number) unlink(path.c_str());
+  }
+};
+
 /// The pipes that this process has, for the end of the process.
 class OwnPipes {
  public:
@@ -36,33 +49,25 @@ class OwnPipes {
     return pipes;
   }
 
-  void Add(const std::string& path) {
+  void Add(const PipeFile& pipe) {
     const std::lock_guard lock(mutex_);
-    pipes_[path] = FileNumber(path);
+    pipes_.insert(pipe);
   }
 
-  void Remove(const std::string& path) {
+  void Remove(const PipeFile& pipe) {
     const std::lock_guard lock(mutex_);
-    const auto at = pipes_.find(path);
-    if (at == pipes_.end()) return;
-    Unlink(*at);
-    pipes_.erase(at);
+    if (pipes_.erase(pipe) != 0) pipe.Remove();
   }
 
   void RemoveAll() {
     const std::lock_guard lock(mutex_);
-    for (const auto& pipe : pipes_) Unlink(pipe);
+    for (const PipeFile& pipe : pipes_) pipe.Remove();
     pipes_.clear();
   }
 
  private:
-  /// Leaves alone what another server has put in the place of a stopped one.
-  static void Unlink(const std::pair<const std::string, ino_t>& pipe) {
-    if (FileNumber(pipe.first) == pipe.second) unlink(pipe.first.c_str());
-  }
-
   std::mutex mutex_;
-  std::map<std::string, ino_t> pipes_;
+  std::set<PipeFile> pipes_;
 };
 
 /// A descriptor in reserve: when the process has none left, it is spent on taking a client off the
@@ -153,7 +158,7 @@ FileDescriptor TakeName(const std::string& path, PipeFault& fault) {
 }  // namespace
 
 struct PipeListener::Impl {
-  std::string path;
+  PipeFile file;
   FileDescriptor socket;
   FileDescriptor watched;  // a process whose end ends the waiting
   std::atomic<bool> stopped{false};
@@ -171,18 +176,19 @@ struct PipeListener::Impl {
 PipeListener::PipeListener(std::unique_ptr<Impl> impl) : impl_(std::move(impl)) {}
 
 PipeListener::~PipeListener() {
-  OwnPipes::Get().Remove(impl_->path);
+  OwnPipes::Get().Remove(impl_->file);
 }
 
 std::unique_ptr<PipeListener> PipeListener::Open(const std::string& name, PipeFault& fault) {
   auto impl = std::make_unique<Impl>();
-  impl->path = PipePath(name);
+  impl->file.path = PipePath(name);
   fault = PipeFault::kBadName;
-  if (impl->path.empty()) return nullptr;
+  if (impl->file.path.empty()) return nullptr;
   SpareDescriptor::Get();  // taken while there is one
-  impl->socket = TakeName(impl->path, fault);
+  impl->socket = TakeName(impl->file.path, fault);
   if (!impl->socket.IsOpen()) return nullptr;
-  OwnPipes::Get().Add(impl->path);
+  impl->file.number = FileNumber(impl->file.path);
+  OwnPipes::Get().Add(impl->file);
   return std::unique_ptr<PipeListener>(new PipeListener(std::move(impl)));
 }
 

@@ -48,15 +48,17 @@ std::string ReadFile(const std::string& file) {
   std::ifstream opened;
   if (file != "-") {
     opened.open(file, std::ios::binary);
-    if (!opened)
-      throw HostError(kExitUsage, file + ": can't be opened; name a file, or - for standard input");
+    if (!opened) {
+      throw HostError(kExitUsage,
+                      file + ": can't be opened; name a file, or - for standard input");
+    }
   }
   std::istream& in = file != "-" ? opened : std::cin;
-  std::string text{std::istreambuf_iterator<char>(in), std::istreambuf_iterator<char>()};
-  if (in.bad() || (file != "-" && text.empty() && !opened.eof())) {
-    throw HostError(kExitUsage, file + ": can't be read");
+  try {
+    return {std::istreambuf_iterator<char>(in), std::istreambuf_iterator<char>()};
+  } catch (const std::ios::failure&) {  // a directory, for example
+    throw HostError(kExitUsage, file + ": can't be read; name a file, or - for standard input");
   }
-  return text;
 }
 
 Document::Document(const String& text, const std::string& source) {

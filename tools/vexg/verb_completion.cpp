@@ -60,7 +60,7 @@ const VerbRegistration registration(
     "completion", "Prints a script with which a shell completes command lines", [](CLI::App& app) {
       const auto shell = std::make_shared<std::string>();
       app.add_option("shell", *shell, "The shell")->check(CLI::IsMember({"bash"}))->required();
-      return VerbRegistration::Work([&app] {
+      return VerbRegistration::Work([&app, shell] {
         std::cout << BashScript(*app.get_parent());
         return int{kExitSuccess};
       });

@@ -25,7 +25,7 @@ int Help(CLI::App& app, const std::string& name) {
   if (verbs.empty()) {
     throw HostError(kExitUsage, "there is no command \"" + name + "\"; see vexg commands");
   }
-  std::cout << verbs.front()->help();
+  std::cout << verbs.front()->help(app.get_parent()->get_name());
   return kExitSuccess;
 }
 
