@@ -4,15 +4,13 @@
 #include <atomic>
 #include <cctype>
 #include <mutex>
+#include <proj_experimental.h>
 #include <string_view>
 #include <unordered_map>
 
-#include <proj_experimental.h>
-
 #include "description.h"
-#include "proj_context.h"
-
 #include "georef/coordsys_log.h"
+#include "proj_context.h"
 
 namespace lumo::pe {
 namespace {
@@ -39,8 +37,7 @@ PjPtr CreateFromCode(PJ_CONTEXT* context, const std::string& text) {
 PjPtr CreateAny(PJ_CONTEXT* context, const std::string& given) {
   const std::size_t start = given.find_first_not_of(" \t\r\n");
   if (start == std::string::npos || given.find('\0') != std::string::npos) return nullptr;
-  const std::string text =
-      given.substr(start, given.find_last_not_of(" \t\r\n") - start + 1);
+  const std::string text = given.substr(start, given.find_last_not_of(" \t\r\n") - start + 1);
   if (text.find('[') != std::string::npos) {
     return PjPtr(proj_create_from_wkt(context, text.c_str(), nullptr, nullptr, nullptr));
   }
@@ -114,8 +111,8 @@ void FillHorizontal(PJ_CONTEXT* context, const Horizontal& parts, Definition& ma
   made.geodeticText = ToWkt(context, geodetic.get(), PJ_WKT2_2019);
   made.datumText = made.geodeticText;
   if (parts.hub != nullptr && parts.transform != nullptr) {
-    const PjPtr bound(proj_crs_create_bound_crs(context, geodetic.get(), parts.hub.get(),
-                                                parts.transform.get()));
+    const PjPtr bound(
+        proj_crs_create_bound_crs(context, geodetic.get(), parts.hub.get(), parts.transform.get()));
     if (bound != nullptr) made.datumText = ToWkt(context, bound.get(), PJ_WKT2_2019);
   }
   if (made.mapText.empty() || made.datumText.empty()) return;

@@ -1,8 +1,7 @@
 #pragma once
 
-#include "proj_context.h"
-
 #include "georef/coordsys_info.h"
+#include "proj_context.h"
 
 namespace lumo::pe {
 

@@ -1,9 +1,8 @@
 #include <filesystem>
 
+#include "georef/coordsys_log.h"
 #include "proj_context.h"
 #include "proj_coordsys.h"
-
-#include "georef/coordsys_log.h"
 
 // The four functions of the plug-in contract. No exception leaves them.
 

@@ -2,9 +2,8 @@
 
 #include <functional>
 #include <memory>
-#include <string>
-
 #include <proj.h>
+#include <string>
 
 namespace lumo::pe {
 
@@ -19,8 +18,8 @@ void SetDataDirectory(const std::string& directory);
 /// The PROJ context of the calling thread, without network access; lives as long as the thread.
 PJ_CONTEXT* ThreadContext();
 
-/// A compiled transform that the calling thread keeps under `key`; made by `make` at first use. Null
-/// when it can't be made, which is kept too.
+/// A compiled transform that the calling thread keeps under `key`; made by `make` at first use.
+/// Null when it can't be made, which is kept too.
 PJ* CachedTransform(const std::string& key, const std::function<PjPtr(PJ_CONTEXT*)>& make);
 
 }  // namespace lumo::pe

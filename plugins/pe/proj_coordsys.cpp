@@ -5,9 +5,8 @@
 #include <cstdio>
 #include <cstring>
 
-#include "proj_context.h"
-
 #include "georef/coordsys_log.h"
+#include "proj_context.h"
 
 namespace lumo::pe {
 namespace {

@@ -1,7 +1,6 @@
 #pragma once
 
 #include "definition.h"
-
 #include "georef/coordsys_impl.h"
 
 namespace lumo::pe {

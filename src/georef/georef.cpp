@@ -58,8 +58,8 @@ Array<double> ExtentSamples(unsigned samples, unsigned lines) {
 bool GeoRef::IsEqual(const GeoRefPtr& other, std::uint32_t flags) const {
   if (other.IsNull() || type_ != other->type_) return false;
   if (Differ(rotation_, other->rotation_)) return false;
-  if ((flags & kSkipPixelSize) == 0 && (Differ(pixelSizeX_, other->pixelSizeX_) ||
-                                        Differ(pixelSizeY_, other->pixelSizeY_))) {
+  if ((flags & kSkipPixelSize) == 0 &&
+      (Differ(pixelSizeX_, other->pixelSizeX_) || Differ(pixelSizeY_, other->pixelSizeY_))) {
     return false;
   }
   if ((flags & kSkipTiePoint) == 0 &&

@@ -329,8 +329,7 @@ void RpcGeoRef::SetGroundCoordinateSystem(const CoordSys& coordSys) {
 
 void RpcGeoRef::Write(std::ostream& out) const {
   WriteNumbers(out, std::bit_cast<RpcValues>(rpc_));
-  const double subset[] = {sampleOffset_, lineOffset_, sampleScale_, lineScale_,
-                           demHeightOffset_};
+  const double subset[] = {sampleOffset_, lineOffset_, sampleScale_, lineScale_, demHeightOffset_};
   WriteNumbers(out, subset);
   cache_.Write(out);
   if (!dem_.IsNull()) out << dem_->GetURI().ToUTF8();

@@ -174,8 +174,7 @@ TEST(RpcGeoRef, PartsAndResamplingsMoveThePixels) {
   EXPECT_NEAR(x, 70, 1e-3);
   EXPECT_NEAR(y, 80, 1e-3);
   EXPECT_EQ(part->Samples(), 100U);
-  const GeoRefPtr half =
-      part->ResampledGeoRef(part->PixelSizeX() * 2, part->PixelSizeY() * 2);
+  const GeoRefPtr half = part->ResampledGeoRef(part->PixelSizeX() * 2, part->PixelSizeY() * 2);
   EXPECT_TRUE(half->MapToPixel(mapX, mapY, x, y));
   EXPECT_NEAR(x, 35, 1e-3);
   EXPECT_NEAR(y, 40, 1e-3);

@@ -77,8 +77,8 @@ void Compare(const PeerCase& c, bool forward) {
   ASSERT_TRUE(forward ? here.MapToMap(points, there) : there.MapToMap(points, here));
   double worst = 0;
   for (unsigned i = 0; i < want.size(); ++i) {
-    worst = std::max({worst, std::abs(points[2 * i] - want[i][0]),
-                      std::abs(points[2 * i + 1] - want[i][1])});
+    worst = std::max(
+        {worst, std::abs(points[2 * i] - want[i][0]), std::abs(points[2 * i + 1] - want[i][1])});
   }
   EXPECT_LT(worst, forward ? 1e-4 : 1e-9);
 }
