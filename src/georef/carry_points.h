@@ -17,4 +17,8 @@ namespace lumo {
 bool CarryPoints(Array<double>& points, const CoordSys& from, const CoordSys& to,
                  const std::function<Array<double>()>& extent);
 
+/// Gives both coordinates of every point that is not finite the value HUGE_VAL. For models that go
+/// on computing with points that could not be carried.
+void MarkUncarried(Array<double>& points);
+
 }  // namespace lumo

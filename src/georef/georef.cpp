@@ -76,11 +76,7 @@ bool GeoRef::PixelToPixel(Array<double>& points, const GeoRef& other) const {
   if (!coordSys_.IsEqual(other.coordSys_)) carried = MapToMap(points, other) && carried;
   const bool placed = other.MapToPixel(points);
   if (!placed || carried) return placed;
-  for (unsigned i = 0; i < points.GetCount(); i += 2) {
-    if (std::isfinite(points[i]) && std::isfinite(points[i + 1])) continue;
-    points[i] = HUGE_VAL;
-    points[i + 1] = HUGE_VAL;
-  }
+  MarkUncarried(points);
   return false;
 }
 

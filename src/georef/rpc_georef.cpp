@@ -71,6 +71,8 @@ unsigned Truncated(double value) {
 
 }  // namespace
 
+const unsigned RpcGeoRef::TypeCode = kRpc;
+
 RpcGeoRef::RpcGeoRef() {
   type_ = kRpc;
   groundCoordSys_.SetGeographic();
@@ -135,6 +137,7 @@ bool RpcGeoRef::MapToPixel(Array<double>& points) const {
       ground[2 * (first + i) + 1] = (block.line[i] - lineOffset_) * lineScale_;
     }
   }
+  if (!carried) MarkUncarried(ground);
   PutPairs(ground, heights, points);
   return carried;
 }

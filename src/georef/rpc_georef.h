@@ -45,7 +45,7 @@ struct RpcCoefficients {
 /// numbers.
 class VEXG_EXPORT RpcGeoRef : public GeoRef {
  public:
-  static constexpr unsigned TypeCode = kRpc;
+  static const unsigned TypeCode;
 
   RpcGeoRef();
 

@@ -102,8 +102,12 @@ class VEXG_EXPORT Metadata : public Object {
   bool Read(const String& path, Reader&& reader) const {
     const std::lock_guard handle(handleMutex_);
     const MutexLock lock = store_->Lock();
-    const MetadataObject* const object = store_->Find(path);
-    return object != nullptr && reader(*object);
+    try {
+      const MetadataObject* const object = store_->Find(path);
+      return object != nullptr && reader(*object);
+    } catch (...) {  // memory failed
+      return false;
+    }
   }
   template <typename Make>
   bool Put(const String& path, Make&& make) {

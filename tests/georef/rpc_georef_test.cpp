@@ -200,6 +200,12 @@ TEST(RpcGeoRef, ProjectsIntoItsCoordinateSystem) {
   EXPECT_TRUE(model->MapToPixel(mapX, mapY, backX, backY));
   EXPECT_NEAR(backX, 100, 1e-3);
   EXPECT_NEAR(backY, 120, 1e-3);
+  double values[] = {mapX, mapY, 1e30, 1e30};
+  Array<double> points(values, ArrayDims(2, 2));
+  EXPECT_FALSE(model->MapToPixel(points));
+  EXPECT_NEAR(values[0], 100, 1e-3);
+  EXPECT_EQ(values[2], HUGE_VAL);
+  EXPECT_EQ(values[3], HUGE_VAL);
 }
 
 TEST(RpcGeoRef, BadInputEndsAndShows) {

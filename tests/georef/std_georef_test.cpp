@@ -4,15 +4,12 @@
 
 #include "commands/value_text.h"
 #include "georef/std_rpc_georef.h"
+#include "support/coordsys_support.h"
 
 namespace lumo {
 namespace {
 
-CoordSys Make(const char* text) {
-  CoordSys system;
-  EXPECT_TRUE(system.SetFromString(text)) << text;
-  return system;
-}
+using test::MakeCoordSys;
 
 StdGeoRef Grid(double size, double mapX, double mapY) {
   StdGeoRef grid;
@@ -102,7 +99,7 @@ TEST(StdGeoRef, ClampsTheEdgesOfAGeographicGrid) {
   double x = 0, y = 0;
   world.PixelToMap(10, 6, x, y);
   EXPECT_GT(x, 180);  // no coordinate system: no clamp
-  world.SetCoordinateSystem(Make("EPSG:4326"));
+  world.SetCoordinateSystem(MakeCoordSys("EPSG:4326"));
   world.PixelToMap(10, 6, x, y);
   EXPECT_EQ(x, 180);
   EXPECT_EQ(y, -90);
@@ -129,7 +126,7 @@ TEST(StdGeoRef, ExtentAndCenterLatitudeFollowTheFields) {
   EXPECT_EQ(extent[2], 503000);
   EXPECT_EQ(extent[3], 4500000);
   EXPECT_EQ(grid.CenterLatitude(), 0.0);  // no coordinate system
-  grid.SetCoordinateSystem(Make("EPSG:32618"));
+  grid.SetCoordinateSystem(MakeCoordSys("EPSG:32618"));
   EXPECT_NEAR(grid.CenterLatitude(), 40.6435, 1e-3);
   grid.SetPixelSize(60, 60);
   EXPECT_EQ(grid.MapExtent()[2], 506000);
@@ -172,8 +169,8 @@ TEST(StdGeoRef, EqualityHonoursFlagsAndTolerance) {
 TEST(StdGeoRef, CarriesPixelsBetweenCoordinateSystems) {
   StdGeoRef utm = Grid(30, 500000, 4500000);
   StdGeoRef geographic = Grid(0.001, -76, 42);
-  utm.SetCoordinateSystem(Make("EPSG:32618"));
-  geographic.SetCoordinateSystem(Make("EPSG:4326"));
+  utm.SetCoordinateSystem(MakeCoordSys("EPSG:32618"));
+  geographic.SetCoordinateSystem(MakeCoordSys("EPSG:4326"));
   utm.SetDimensions(10, 10);
   geographic.SetDimensions(10, 10);
   double xy[] = {0, 0};
@@ -199,7 +196,7 @@ TEST(GeoRefText, HasTheFormAndReadsBackBitForBit) {
             "0.0000000000000000e+00 0.0000000000000000e+00 0 0 0.0000000000000000e+00 | ");
   for (const char* system : {"", "EPSG:4326", "EPSG:32618", "+proj=utm +zone=3 +ellps=intl"}) {
     SCOPED_TRACE(system);
-    if (*system != 0) grid.SetCoordinateSystem(Make(system));
+    if (*system != 0) grid.SetCoordinateSystem(MakeCoordSys(system));
     const String text = FormatValue(GeoRefPtr(grid.Clone()));
     const auto back = ParseValue<GeoRefPtr>(text);
     ASSERT_FALSE(back.IsNull());
@@ -211,7 +208,7 @@ TEST(GeoRefText, HasTheFormAndReadsBackBitForBit) {
 
 TEST(GeoRefText, CutAnywhereIsNoModel) {
   StdRpcGeoRef model;
-  model.SetCoordinateSystem(Make("EPSG:32618"));
+  model.SetCoordinateSystem(MakeCoordSys("EPSG:32618"));
   const std::string whole = FormatValue(GeoRefPtr(model.Clone())).ToUTF8();
   ASSERT_FALSE(ParseValue<GeoRefPtr>(whole).IsNull());
   // The last bar ends the form.

@@ -7,16 +7,13 @@
 
 #include "georef/coordsys_factory.h"
 #include "georef/std_georef.h"
+#include "support/coordsys_support.h"
 #include "support/peer_program.h"
 
 namespace lumo {
 namespace {
 
-CoordSys Make(const char* text) {
-  CoordSys system;
-  EXPECT_TRUE(system.SetFromString(text)) << text;
-  return system;
-}
+using test::MakeCoordSys;
 
 std::vector<std::array<double, 3>> RandomPoints(double west, double south, double east,
                                                 double north) {
@@ -64,8 +61,8 @@ void Compare(const PeerCase& c, bool forward) {
   }
 
   StdGeoRef here, there;
-  here.SetCoordinateSystem(Make("EPSG:4326"));
-  there.SetCoordinateSystem(Make(c.system));
+  here.SetCoordinateSystem(MakeCoordSys("EPSG:4326"));
+  there.SetCoordinateSystem(MakeCoordSys(c.system));
   here.SetTieMap(c.west, c.north);
   here.SetPixelSize((c.east - c.west) / 100, (c.north - c.south) / 100);
   here.SetDimensions(100, 100);
@@ -106,16 +103,16 @@ TEST(ProjectionPlugin, ReadsEveryDialectAsOneSystem) {
       "PARAMETER[\"latitude_of_origin\",0],PARAMETER[\"central_meridian\",-75],"
       "PARAMETER[\"scale_factor\",0.9996],PARAMETER[\"false_easting\",500000],"
       "PARAMETER[\"false_northing\",0],UNIT[\"metre\",1]]";
-  const CoordSys code = Make("EPSG:32618");
+  const CoordSys code = MakeCoordSys("EPSG:32618");
   for (const char* text : {esri, wkt1, "+proj=utm +zone=18 +datum=WGS84", " epsg:32618\n"}) {
     SCOPED_TRACE(text);
-    const CoordSys other = Make(text);
+    const CoordSys other = MakeCoordSys(text);
     EXPECT_TRUE(code.IsEqual(other));
     EXPECT_TRUE(code.SameDatum(other));
     EXPECT_EQ(other.Type(), 2);
     String written;
     other.ToString(written);
-    const CoordSys again = Make(written.GetUTF8());
+    const CoordSys again = MakeCoordSys(written.GetUTF8());
     String rewritten;
     again.ToString(rewritten);
     EXPECT_EQ(rewritten.ToUTF8(), written.ToUTF8());
@@ -123,7 +120,7 @@ TEST(ProjectionPlugin, ReadsEveryDialectAsOneSystem) {
 }
 
 TEST(ProjectionPlugin, FillsTheDescription) {
-  const CoordSys grid = Make("EPSG:27700");
+  const CoordSys grid = MakeCoordSys("EPSG:27700");
   const CoordSysInfo& info = *grid.Info();
   EXPECT_EQ(info.name.ToUTF8(), "British_National_Grid");
   EXPECT_EQ(info.datumName.ToUTF8(), "D_OSGB_1936");
@@ -142,7 +139,7 @@ TEST(ProjectionPlugin, FillsTheDescription) {
                {"EPSG:32618", "Meter", 0, 9001, 1.0},
                {"EPSG:2225", "Foot_US", 0, 9003, 0.3048006096012192}};
   for (const auto& unit : units) {
-    const CoordSys system = Make(unit.text);
+    const CoordSys system = MakeCoordSys(unit.text);
     EXPECT_EQ(system.Info()->unitName.ToUTF8(), unit.unit);
     EXPECT_EQ(system.Info()->unitKind, unit.kind);
     EXPECT_EQ(system.Info()->unitCode, unit.code);
@@ -164,8 +161,8 @@ TEST(ProjectionPlugin, TellsSystemsApart) {
   };
   for (const auto& c : cases) {
     SCOPED_TRACE(std::string(c.a) + " " + c.b);
-    EXPECT_EQ(Make(c.a).IsEqual(Make(c.b)), c.equal);
-    EXPECT_EQ(Make(c.a).SameDatum(Make(c.b)), c.sameDatum);
+    EXPECT_EQ(MakeCoordSys(c.a).IsEqual(MakeCoordSys(c.b)), c.equal);
+    EXPECT_EQ(MakeCoordSys(c.a).SameDatum(MakeCoordSys(c.b)), c.sameDatum);
   }
 }
 
@@ -183,8 +180,8 @@ TEST(ProjectionPlugin, RefusesWhatIsNoSystem) {
 
 TEST(ProjectionPlugin, MarksPointsThatCanNotBeCarried) {
   StdGeoRef geographic, projected;
-  geographic.SetCoordinateSystem(Make("EPSG:4326"));
-  projected.SetCoordinateSystem(Make("EPSG:3857"));
+  geographic.SetCoordinateSystem(MakeCoordSys("EPSG:4326"));
+  projected.SetCoordinateSystem(MakeCoordSys("EPSG:3857"));
   double xy[] = {10, 50, 10, 91, NAN, 50, 11, 51};
   Array<double> points(xy, ArrayDims(4, 2));
   EXPECT_FALSE(geographic.MapToMap(points, projected));
@@ -193,7 +190,7 @@ TEST(ProjectionPlugin, MarksPointsThatCanNotBeCarried) {
   EXPECT_TRUE(std::isfinite(xy[6]));
   // A local system has no place on Earth.
   StdGeoRef local;
-  local.SetCoordinateSystem(Make("LOCAL_CS[\"here\",UNIT[\"m\",1]]"));
+  local.SetCoordinateSystem(MakeCoordSys("LOCAL_CS[\"here\",UNIT[\"m\",1]]"));
   double one[] = {10, 50};
   Array<double> point(one, ArrayDims(1, 2));
   EXPECT_FALSE(geographic.MapToMap(point, local));
@@ -201,7 +198,7 @@ TEST(ProjectionPlugin, MarksPointsThatCanNotBeCarried) {
 }
 
 TEST(ProjectionPlugin, GeographicPositionsAreDegreesFromGreenwich) {
-  const CoordSys paris = Make("EPSG:4807");  // grads from Paris
+  const CoordSys paris = MakeCoordSys("EPSG:4807");  // grads from Paris
   double longitude = 0, latitude = 0;
   paris.MapToGeo(0, 50, longitude, latitude);
   EXPECT_NEAR(longitude, 2.5969213 * 0.9, 1e-9);
@@ -209,8 +206,8 @@ TEST(ProjectionPlugin, GeographicPositionsAreDegreesFromGreenwich) {
 }
 
 TEST(ProjectionPlugin, ServesManyThreads) {
-  const CoordSys utm = Make("EPSG:32618");
-  const CoordSys grid = Make("EPSG:27700");
+  const CoordSys utm = MakeCoordSys("EPSG:32618");
+  const CoordSys grid = MakeCoordSys("EPSG:27700");
   std::vector<std::thread> threads;
   std::atomic<int> wrong{0};
   for (int t = 0; t < 4; ++t) {
