@@ -52,8 +52,9 @@ class VEXG_EXPORT Job {
 
 /// Runs all commands of `job` and returns when the last has retired. A command starts once all that
 /// it depends on have retired, whether they succeeded or not; of those that may start the first in
-/// the document goes first. A job of one command runs on the calling thread; in a job of more, each
-/// command has a thread of its own. One for which the system gives no thread ends as failed.
+/// the document goes first. A job of one command runs on the calling thread; in a job of more, all
+/// that may run at once do so on threads of their own, and one whose command has ended goes on with
+/// the next that may start. A command for which the system gives no thread ends as failed.
 /// @return true.
 VEXG_EXPORT bool RunJob(Job& job);
 

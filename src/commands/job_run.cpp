@@ -49,7 +49,7 @@ struct JobRun {
   JobFinisher finisher;
 };
 
-/// The thread of one command.
+/// The thread of a command, and of those that may start when it has ended.
 class JobExecutorThread : public SimpleThread {
  public:
   JobExecutorThread(std::shared_ptr<JobRun> run, CommandDescriptor* descriptor)
@@ -57,7 +57,10 @@ class JobExecutorThread : public SimpleThread {
 
   void Run() override {
     SetRunning();
-    run_->Execute(descriptor_);
+    // What this command held up runs here, rather than on a thread that has to be made first.
+    for (CommandDescriptor* next = descriptor_; next != nullptr; next = run_->starter.TryNext()) {
+      run_->Execute(next);
+    }
   }
 
  private:
@@ -87,8 +90,9 @@ void JobVariables::TakeOutputs(const CommandDescriptor& descriptor, ParameterMap
   }
 }
 
-void JobVariables::Clear() {
+void JobVariables::Close() {
   const std::lock_guard lock(mutex_);
+  over_ = true;
   variables_.Clear();
 }
 
@@ -110,16 +114,21 @@ JobStarter::JobStarter(Job& job, JobVariables& variables)
 CommandDescriptor* JobStarter::Next() {
   CommandDescriptor* ready = nullptr;
   variables_.WaitUntil([&] {
-    ready = FindReady();
+    ready = TakeReady();
     return ready != nullptr || AllStarted();
   });
-  if (ready != nullptr) ready->command->SetState(CommandState::kStarted);
   return ready;
 }
 
-CommandDescriptor* JobStarter::FindReady() const {
+CommandDescriptor* JobStarter::TryNext() {
+  return variables_.WhileRunning([this] { return TakeReady(); });
+}
+
+/// Under the lock, so that a command is handed out once.
+CommandDescriptor* JobStarter::TakeReady() {
   for (const CommandDescriptorPtr& descriptor : job_.commands) {
     if (descriptor->command->GetState() == CommandState::kCreated && IsReady(*descriptor)) {
+      descriptor->command->SetState(CommandState::kStarted);
       return descriptor.Get();
     }
   }
@@ -161,7 +170,7 @@ bool RunJob(Job& job) {
     }
   }
   run->variables.WaitUntil([&] { return AllRetired(job); });
-  run->variables.Clear();
+  run->variables.Close();
   return true;
 }
 

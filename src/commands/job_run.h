@@ -25,11 +25,19 @@ class JobVariables {
   /// Stores the outputs of `descriptor`; a result that the command did not give is stored empty.
   void TakeOutputs(const CommandDescriptor& descriptor, ParameterMap& results);
 
-  /// Lets go of all objects, at the end of the run.
-  void Clear();
+  /// Ends the run: lets go of all objects.
+  void Close();
 
   /// Sets the state of the command to retired, and wakes the waiters.
   void Retire(Command& command);
+
+  /// Gives what `look` gives, which runs under the lock; null once the run is over, when the job
+  /// may be gone.
+  template <typename Look>
+  CommandDescriptor* WhileRunning(Look look) {
+    const std::lock_guard lock(mutex_);
+    return over_ ? nullptr : look();
+  }
 
   /// Blocks until `done` gives true, which is asked at the start and after each retirement.
   template <typename Done>
@@ -42,6 +50,7 @@ class JobVariables {
   std::mutex mutex_;
   std::condition_variable retired_;
   Map<String, ObjectPtr> variables_;
+  bool over_ = false;
 };
 
 /// The first stage of a run: hands out the commands as what they depend on retires.
@@ -54,8 +63,11 @@ class JobStarter : public IPipelineReader<CommandDescriptor> {
   /// to started; null when all have been handed out.
   CommandDescriptor* Next() override;
 
+  /// As Next, without waiting: null also when no command may run yet.
+  CommandDescriptor* TryNext();
+
  private:
-  CommandDescriptor* FindReady() const;
+  CommandDescriptor* TakeReady();
   bool AllStarted() const;
 
   Job& job_;
