@@ -29,14 +29,17 @@ class Documents(PipeTest):
         self.assertEqual(without_times(run("run", "-", stdin=job)[1]), without_times(result))
 
     def test_the_first_job_of_the_readme_runs(self):
-        two_commands, first_job = blocks("README.md", "sh")
+        two_commands, first_job, transform = blocks("README.md", "sh")
         for line in two_commands.splitlines():
             self.assertTrue(os.access(SOURCE / line.split()[0], os.X_OK), line)
-        script = "set -e\n" + first_job.replace("build/release", str(BUILD)) + "wait\n"
+        script = "set -e\n" + first_job.replace("build/release", str(BUILD)) + "wait\n" + transform
         shell = subprocess.run(["bash", "-c", script], cwd=SOURCE, capture_output=True, text=True, timeout=60)
         self.assertEqual(shell.returncode, 0, shell.stderr)
         self.assertEqual(shell.stdout.count("<JobResult>"), 2)
         self.assertEqual(shell.stdout.count('"Sum": "45"'), 1)
+        longitude, latitude = map(float, shell.stdout.splitlines()[-1].split())
+        self.assertAlmostEqual(longitude, -(34 + 54 / 60 + 58.20 / 3600), 5)  # of the scene's corner, as gdalinfo has it
+        self.assertAlmostEqual(latitude, -(7 + 56 / 60 + 59.36 / 3600), 5)
 
     def test_programs_compile(self):
         compiler = os.environ["VEXG_CXX"]
