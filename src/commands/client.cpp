@@ -26,7 +26,7 @@ bool PipeClient::Connect() {
 }
 
 void PipeClient::Disconnect() {
-  if (!IsConnected() || !serverPipe_->ConnectWithin(patience_)) return;
+  if (serverPipe_.IsNull() || !serverPipe_->ConnectWithin(patience_)) return;
   serverPipe_->Write(kQuitWord);
   serverPipe_.Reset();
 }
