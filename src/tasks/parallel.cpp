@@ -74,8 +74,7 @@ template <typename I>
 void RunParallelFor(IParallelFor<I>& loop, unsigned grain, const AbortFlag* abort) {
   if (loop.Begin() >= loop.End()) return;
   const tbb::blocked_range<I> range(loop.Begin(), loop.End(), std::max(grain, 1U));
-  tbb::this_task_arena::isolate(
-      [&] { tbb::parallel_for(range, TBBParallelFor<I>{&loop, abort}); });
+  tbb::this_task_arena::isolate([&] { tbb::parallel_for(range, TBBParallelFor<I>{&loop, abort}); });
 }
 
 template <typename I>
@@ -84,8 +83,9 @@ void RunParallelFor2(IParallelFor2<I>& loop, unsigned grain, const AbortFlag* ab
   const unsigned step = std::max(grain, 1U);
   const tbb::blocked_range2d<I> range(loop.Begin0(), loop.End0(), step, loop.Begin1(), loop.End1(),
                                       step);
-  tbb::this_task_arena::isolate(
-      [&] { tbb::parallel_for(range, TBBParallelFor2<I>{&loop, abort}); });
+  tbb::this_task_arena::isolate([&] {
+    tbb::parallel_for(range, TBBParallelFor2<I>{&loop, abort});
+  });
 }
 
 template <typename I>
@@ -96,8 +96,9 @@ void RunParallelFor3(IParallelFor3<I>& loop, const AbortFlag* abort) {
   }
   const tbb::blocked_range3d<I> range(loop.Begin0(), loop.End0(), loop.Begin1(), loop.End1(),
                                       loop.Begin2(), loop.End2());
-  tbb::this_task_arena::isolate(
-      [&] { tbb::parallel_for(range, TBBParallelFor3<I>{&loop, abort}); });
+  tbb::this_task_arena::isolate([&] {
+    tbb::parallel_for(range, TBBParallelFor3<I>{&loop, abort});
+  });
 }
 
 void detail::InvokeBoth(WorkRef first, WorkRef second) {

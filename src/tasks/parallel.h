@@ -146,8 +146,7 @@ namespace detail {
 class WorkRef {
  public:
   template <typename F>
-  WorkRef(F& work)
-      : object_(&work), call_([](void* object) { (*static_cast<F*>(object))(); }) {}
+  WorkRef(F& work) : object_(&work), call_([](void* object) { (*static_cast<F*>(object))(); }) {}
   void operator()() const { call_(object_); }
 
  private:

@@ -53,8 +53,10 @@ bool BasicProcess::AddTask(unsigned index, const TaskDescriptor& descriptor) {
     }
     tasks_ = std::move(longer);
   }
-  for (const ArgID id : descriptor.GetTokenArgs()) tokenArgCount_ = std::max(tokenArgCount_, id + 1);
-  for (const ArgID id : descriptor.GetSetupArgs()) setupArgCount_ = std::max(setupArgCount_, id + 1);
+  for (const ArgID id : descriptor.GetTokenArgs())
+    tokenArgCount_ = std::max(tokenArgCount_, id + 1);
+  for (const ArgID id : descriptor.GetSetupArgs())
+    setupArgCount_ = std::max(setupArgCount_, id + 1);
   tasks_[index] = descriptor;
   return true;
 }

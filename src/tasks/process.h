@@ -129,8 +129,7 @@ class ProcessInitializer;
 class ProcessTask;
 class ProcessTerminator;
 
-extern template class VEXG_EXPORT
-    CustomProcess<ProcessInitializer, ProcessTask, ProcessTerminator>;
+extern template class VEXG_EXPORT CustomProcess<ProcessInitializer, ProcessTask, ProcessTerminator>;
 
 /// A chain of tasks through which tokens flow. Each task works on one token at a time, in order;
 /// different tasks work on different tokens at once. Memory stays bounded by the tokens in flight,

@@ -30,9 +30,7 @@ TaskToken* ProcessInitializer::Next() {
 
 ProcessTask::ProcessTask(BasicProcess& process, const TaskDescriptor& descriptor,
                          const ArgList& args)
-    : process_(process),
-      descriptor_(descriptor),
-      list_(descriptor.GetTokenArgs().GetCount()) {
+    : process_(process), descriptor_(descriptor), list_(descriptor.GetTokenArgs().GetCount()) {
   if (!descriptor_.IsUsable()) return;
   const Array<ArgID>& setupArgs = descriptor_.GetSetupArgs();
   ArgList setup(setupArgs.GetCount());
