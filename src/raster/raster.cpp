@@ -25,30 +25,30 @@ template <typename T>
 const unsigned Raster<T>::TypeCode =
     GloballyUniqueObjectTypeCode(String("Raster<" + DataTypeName(kDataTypeOf<T>).ToUTF8() + ">"));
 
-template class VEXG_EXPORT Raster<std::uint8_t>;
-template class VEXG_EXPORT Raster<std::int8_t>;
-template class VEXG_EXPORT Raster<std::uint16_t>;
-template class VEXG_EXPORT Raster<std::int16_t>;
-template class VEXG_EXPORT Raster<std::uint32_t>;
-template class VEXG_EXPORT Raster<std::int32_t>;
-template class VEXG_EXPORT Raster<float>;
-template class VEXG_EXPORT Raster<double>;
-template class VEXG_EXPORT Raster<std::uint64_t>;
-template class VEXG_EXPORT Raster<std::int64_t>;
-template class VEXG_EXPORT Raster<Complex<float>>;
-template class VEXG_EXPORT Raster<Complex<double>>;
+template class Raster<std::uint8_t>;
+template class Raster<std::int8_t>;
+template class Raster<std::uint16_t>;
+template class Raster<std::int16_t>;
+template class Raster<std::uint32_t>;
+template class Raster<std::int32_t>;
+template class Raster<float>;
+template class Raster<double>;
+template class Raster<std::uint64_t>;
+template class Raster<std::int64_t>;
+template class Raster<Complex<float>>;
+template class Raster<Complex<double>>;
 
-template class VEXG_EXPORT RasterView<std::uint8_t>;
-template class VEXG_EXPORT RasterView<std::int8_t>;
-template class VEXG_EXPORT RasterView<std::uint16_t>;
-template class VEXG_EXPORT RasterView<std::int16_t>;
-template class VEXG_EXPORT RasterView<std::uint32_t>;
-template class VEXG_EXPORT RasterView<std::int32_t>;
-template class VEXG_EXPORT RasterView<float>;
-template class VEXG_EXPORT RasterView<double>;
-template class VEXG_EXPORT RasterView<std::uint64_t>;
-template class VEXG_EXPORT RasterView<std::int64_t>;
-template class VEXG_EXPORT RasterView<Complex<float>>;
-template class VEXG_EXPORT RasterView<Complex<double>>;
+template class RasterView<std::uint8_t>;
+template class RasterView<std::int8_t>;
+template class RasterView<std::uint16_t>;
+template class RasterView<std::int16_t>;
+template class RasterView<std::uint32_t>;
+template class RasterView<std::int32_t>;
+template class RasterView<float>;
+template class RasterView<double>;
+template class RasterView<std::uint64_t>;
+template class RasterView<std::int64_t>;
+template class RasterView<Complex<float>>;
+template class RasterView<Complex<double>>;
 
 }  // namespace lumo

@@ -136,17 +136,17 @@ template <typename T>
 const unsigned RasterIterator<T>::TypeCode = GloballyUniqueObjectTypeCode(
     String("RasterIterator<" + DataTypeName(kDataTypeOf<T>).ToUTF8() + ">"));
 
-template class VEXG_EXPORT RasterIterator<std::uint8_t>;
-template class VEXG_EXPORT RasterIterator<std::int8_t>;
-template class VEXG_EXPORT RasterIterator<std::uint16_t>;
-template class VEXG_EXPORT RasterIterator<std::int16_t>;
-template class VEXG_EXPORT RasterIterator<std::uint32_t>;
-template class VEXG_EXPORT RasterIterator<std::int32_t>;
-template class VEXG_EXPORT RasterIterator<float>;
-template class VEXG_EXPORT RasterIterator<double>;
-template class VEXG_EXPORT RasterIterator<std::uint64_t>;
-template class VEXG_EXPORT RasterIterator<std::int64_t>;
-template class VEXG_EXPORT RasterIterator<Complex<float>>;
-template class VEXG_EXPORT RasterIterator<Complex<double>>;
+template class RasterIterator<std::uint8_t>;
+template class RasterIterator<std::int8_t>;
+template class RasterIterator<std::uint16_t>;
+template class RasterIterator<std::int16_t>;
+template class RasterIterator<std::uint32_t>;
+template class RasterIterator<std::int32_t>;
+template class RasterIterator<float>;
+template class RasterIterator<double>;
+template class RasterIterator<std::uint64_t>;
+template class RasterIterator<std::int64_t>;
+template class RasterIterator<Complex<float>>;
+template class RasterIterator<Complex<double>>;
 
 }  // namespace lumo

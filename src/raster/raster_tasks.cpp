@@ -2,43 +2,43 @@
 
 namespace lumo {
 
-template class VEXG_EXPORT TilePool<std::uint8_t>;
-template class VEXG_EXPORT TilePool<std::int8_t>;
-template class VEXG_EXPORT TilePool<std::uint16_t>;
-template class VEXG_EXPORT TilePool<std::int16_t>;
-template class VEXG_EXPORT TilePool<std::uint32_t>;
-template class VEXG_EXPORT TilePool<std::int32_t>;
-template class VEXG_EXPORT TilePool<float>;
-template class VEXG_EXPORT TilePool<double>;
-template class VEXG_EXPORT TilePool<std::uint64_t>;
-template class VEXG_EXPORT TilePool<std::int64_t>;
-template class VEXG_EXPORT TilePool<Complex<float>>;
-template class VEXG_EXPORT TilePool<Complex<double>>;
+template class TilePool<std::uint8_t>;
+template class TilePool<std::int8_t>;
+template class TilePool<std::uint16_t>;
+template class TilePool<std::int16_t>;
+template class TilePool<std::uint32_t>;
+template class TilePool<std::int32_t>;
+template class TilePool<float>;
+template class TilePool<double>;
+template class TilePool<std::uint64_t>;
+template class TilePool<std::int64_t>;
+template class TilePool<Complex<float>>;
+template class TilePool<Complex<double>>;
 
-template class VEXG_EXPORT RasterReadTask<std::uint8_t>;
-template class VEXG_EXPORT RasterReadTask<std::int8_t>;
-template class VEXG_EXPORT RasterReadTask<std::uint16_t>;
-template class VEXG_EXPORT RasterReadTask<std::int16_t>;
-template class VEXG_EXPORT RasterReadTask<std::uint32_t>;
-template class VEXG_EXPORT RasterReadTask<std::int32_t>;
-template class VEXG_EXPORT RasterReadTask<float>;
-template class VEXG_EXPORT RasterReadTask<double>;
-template class VEXG_EXPORT RasterReadTask<std::uint64_t>;
-template class VEXG_EXPORT RasterReadTask<std::int64_t>;
-template class VEXG_EXPORT RasterReadTask<Complex<float>>;
-template class VEXG_EXPORT RasterReadTask<Complex<double>>;
+template class RasterReadTask<std::uint8_t>;
+template class RasterReadTask<std::int8_t>;
+template class RasterReadTask<std::uint16_t>;
+template class RasterReadTask<std::int16_t>;
+template class RasterReadTask<std::uint32_t>;
+template class RasterReadTask<std::int32_t>;
+template class RasterReadTask<float>;
+template class RasterReadTask<double>;
+template class RasterReadTask<std::uint64_t>;
+template class RasterReadTask<std::int64_t>;
+template class RasterReadTask<Complex<float>>;
+template class RasterReadTask<Complex<double>>;
 
-template class VEXG_EXPORT RasterWriteTask<std::uint8_t>;
-template class VEXG_EXPORT RasterWriteTask<std::int8_t>;
-template class VEXG_EXPORT RasterWriteTask<std::uint16_t>;
-template class VEXG_EXPORT RasterWriteTask<std::int16_t>;
-template class VEXG_EXPORT RasterWriteTask<std::uint32_t>;
-template class VEXG_EXPORT RasterWriteTask<std::int32_t>;
-template class VEXG_EXPORT RasterWriteTask<float>;
-template class VEXG_EXPORT RasterWriteTask<double>;
-template class VEXG_EXPORT RasterWriteTask<std::uint64_t>;
-template class VEXG_EXPORT RasterWriteTask<std::int64_t>;
-template class VEXG_EXPORT RasterWriteTask<Complex<float>>;
-template class VEXG_EXPORT RasterWriteTask<Complex<double>>;
+template class RasterWriteTask<std::uint8_t>;
+template class RasterWriteTask<std::int8_t>;
+template class RasterWriteTask<std::uint16_t>;
+template class RasterWriteTask<std::int16_t>;
+template class RasterWriteTask<std::uint32_t>;
+template class RasterWriteTask<std::int32_t>;
+template class RasterWriteTask<float>;
+template class RasterWriteTask<double>;
+template class RasterWriteTask<std::uint64_t>;
+template class RasterWriteTask<std::int64_t>;
+template class RasterWriteTask<Complex<float>>;
+template class RasterWriteTask<Complex<double>>;
 
 }  // namespace lumo

@@ -148,28 +148,28 @@ template <typename T>
 const unsigned Tile<T>::TypeCode =
     GloballyUniqueObjectTypeCode(String("Tile<" + DataTypeName(kDataTypeOf<T>).ToUTF8() + ">"));
 
-template class VEXG_EXPORT Tile<std::uint8_t>;
-template class VEXG_EXPORT Tile<std::int8_t>;
-template class VEXG_EXPORT Tile<std::uint16_t>;
-template class VEXG_EXPORT Tile<std::int16_t>;
-template class VEXG_EXPORT Tile<std::uint32_t>;
-template class VEXG_EXPORT Tile<std::int32_t>;
-template class VEXG_EXPORT Tile<float>;
-template class VEXG_EXPORT Tile<double>;
-template class VEXG_EXPORT Tile<std::uint64_t>;
-template class VEXG_EXPORT Tile<std::int64_t>;
-template class VEXG_EXPORT Tile<Complex<float>>;
-template class VEXG_EXPORT Tile<Complex<double>>;
+template class Tile<std::uint8_t>;
+template class Tile<std::int8_t>;
+template class Tile<std::uint16_t>;
+template class Tile<std::int16_t>;
+template class Tile<std::uint32_t>;
+template class Tile<std::int32_t>;
+template class Tile<float>;
+template class Tile<double>;
+template class Tile<std::uint64_t>;
+template class Tile<std::int64_t>;
+template class Tile<Complex<float>>;
+template class Tile<Complex<double>>;
 
-template class VEXG_EXPORT TileFromTemplate<std::uint8_t>;
-template class VEXG_EXPORT TileFromTemplate<std::int8_t>;
-template class VEXG_EXPORT TileFromTemplate<std::uint16_t>;
-template class VEXG_EXPORT TileFromTemplate<std::int16_t>;
-template class VEXG_EXPORT TileFromTemplate<std::uint32_t>;
-template class VEXG_EXPORT TileFromTemplate<std::int32_t>;
-template class VEXG_EXPORT TileFromTemplate<float>;
-template class VEXG_EXPORT TileFromTemplate<double>;
+template class TileFromTemplate<std::uint8_t>;
+template class TileFromTemplate<std::int8_t>;
+template class TileFromTemplate<std::uint16_t>;
+template class TileFromTemplate<std::int16_t>;
+template class TileFromTemplate<std::uint32_t>;
+template class TileFromTemplate<std::int32_t>;
+template class TileFromTemplate<float>;
+template class TileFromTemplate<double>;
 
-template class VEXG_EXPORT TileFromTemplateBorder<double>;
+template class TileFromTemplateBorder<double>;
 
 }  // namespace lumo
