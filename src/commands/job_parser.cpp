@@ -7,27 +7,6 @@ namespace {
 
 using Attributes = Map<String, String>;
 
-bool IsChannel(const String& element) {
-  return element == "SHMIPC" || element == "ORVAIPC" || element == "TQFProcessIPC";
-}
-
-/// Keeps `channel`, and tells in `usable` whether it can be used.
-template <typename Channel>
-IPCPtr Keep(Channel* channel, bool& usable) {
-  usable = channel->IsUsable();
-  return IPCPtr(channel);
-}
-
-IPCPtr MakeChannel(const String& element, const Attributes& attributes, bool& usable) {
-  const auto number = [&](const char* name) { return ParseValue<unsigned>(attributes.Find(name)); };
-  const String& name = attributes.Find("Name");
-  if (element == "TQFProcessIPC") return Keep(new TQFProcessIPC(name), usable);
-  if (element == "ORVAIPC") return Keep(new ORVAIPC(name, number("Size")), usable);
-  return Keep(new SHMIPC<bool, float>(name, number("Size"), number("AbortOffset"),
-                                      number("ProgressOffset")),
-              usable);
-}
-
 void MergeInto(Attributes& target, const Attributes& source) {
   for (const auto& [name, value] : source) target[name] = value;
 }
@@ -41,8 +20,8 @@ void JobParser::StartElement(const String& name, const Attributes& attributes) {
     job_.Clear();
   } else if (name == "Command") {
     StartCommand(attributes);
-  } else if (IsChannel(name)) {
-    channel_ = MakeChannel(name, attributes, channelUsable_);
+  } else if (IsChannelElement(name)) {
+    channel_ = OpenChannel(name, attributes);
   } else if (!current_.IsNull()) {
     if (name == "Input") MergeInto(current_->inputs, attributes);
     if (name == "Output") MergeInto(current_->outputs, attributes);
@@ -53,7 +32,7 @@ void JobParser::StartElement(const String& name, const Attributes& attributes) {
 void JobParser::EndElement(const String& name) {
   if (name == "Command") {
     EndCommand();
-  } else if (IsChannel(name)) {
+  } else if (IsChannelElement(name)) {
     EndChannel();
   }
 }
@@ -89,10 +68,7 @@ void JobParser::AddDependency(const String& name) {
   }
 }
 
-// A channel without memory under it must not be used: the job then keeps its own flag and report.
 void JobParser::EndChannel() {
-  if (channel_.IsNull()) return;
-  if (!channelUsable_) channel_.Reset();
   job_.ipc = channel_;
   if (!job_.ipc.IsNull()) job_.ipc->progress->Update(0.0);
   channel_.Reset();

@@ -26,7 +26,6 @@ class VEXG_EXPORT JobParser : public XMLSimpleParser {
   Job& job_;
   CommandDescriptorPtr current_;
   IPCPtr channel_;
-  bool channelUsable_ = false;
 };
 
 }  // namespace lumo

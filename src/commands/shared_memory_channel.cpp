@@ -1,8 +1,18 @@
 #include "commands/shared_memory_channel.h"
 
+#include "commands/value_text.h"
 #include "platform/shared_memory.h"
 
 namespace lumo {
+namespace {
+
+template <typename Channel>
+IPCPtr KeepUsable(Channel* channel) {
+  const IPCPtr owner(channel);
+  return channel->IsUsable() ? owner : IPCPtr();
+}
+
+}  // namespace
 
 SharedMemory::SharedMemory(const String& name, unsigned size) : name_(name), size_(size) {}
 
@@ -16,6 +26,19 @@ bool SharedMemory::Open() {
 
 unsigned char* SharedMemory::GetData() const {
   return block_ != nullptr ? block_->GetData() : nullptr;
+}
+
+bool IsChannelElement(const String& element) {
+  return element == "SHMIPC" || element == "ORVAIPC" || element == "TQFProcessIPC";
+}
+
+IPCPtr OpenChannel(const String& element, const Map<String, String>& attributes) {
+  const auto number = [&](const char* name) { return ParseValue<unsigned>(attributes.Find(name)); };
+  const String& name = attributes.Find("Name");
+  if (element == "TQFProcessIPC") return KeepUsable(new TQFProcessIPC(name));
+  if (element == "ORVAIPC") return KeepUsable(new ORVAIPC(name, number("Size")));
+  return KeepUsable(new SHMIPC<bool, float>(name, number("Size"), number("AbortOffset"),
+                                            number("ProgressOffset")));
 }
 
 }  // namespace lumo

@@ -2,6 +2,7 @@
 
 #include <memory>
 
+#include "foundation/containers.h"
 #include "foundation/run_controls.h"
 
 namespace lumo {
@@ -87,5 +88,12 @@ class VEXG_EXPORT TQFProcessIPC : public ORVAIPC {
   static constexpr unsigned kSize = 1034;
   explicit TQFProcessIPC(const String& name) : ORVAIPC(name, kSize) {}
 };
+
+/// True for the elements of a job document that name a channel: SHMIPC, ORVAIPC, TQFProcessIPC.
+VEXG_EXPORT bool IsChannelElement(const String& element);
+
+/// Opens the channel that such an element names. A missing attribute reads as 0, or as no name.
+/// @return empty when the channel is unusable, so that nobody touches it.
+VEXG_EXPORT IPCPtr OpenChannel(const String& element, const Map<String, String>& attributes);
 
 }  // namespace lumo

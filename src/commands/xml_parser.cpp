@@ -71,6 +71,7 @@ class IsolatedParser : public xercesc::SAXParser {
     setDisableDefaultEntityResolution(true);
     setDocumentHandler(&handler);
     setErrorHandler(&handler);
+    setDTDHandler(&handler);  // without one, doctypeDecl is never called
   }
 
  protected:

@@ -1,8 +1,7 @@
 #include "platform/debug_output.h"
 
-#include <unistd.h>
-
 #include <cerrno>
+#include <unistd.h>
 
 namespace lumo::platform {
 

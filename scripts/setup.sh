@@ -1,0 +1,35 @@
+# Installs the packages of packages.txt that are missing, as root or through sudo. Sourced by ./demo
+# and ./test.
+
+missing_packages() {
+  local package
+  grep -v '^#' scripts/packages.txt | while read -r package; do
+    dpkg-query -W -f '${Status}' "$package" 2>/dev/null | grep -q 'ok installed' || echo "$package"
+  done
+}
+
+install_packages() {
+  local missing run=()
+  missing=$(missing_packages | tr '\n' ' ')
+  [[ -z $missing ]] && return
+  if ((EUID != 0)); then
+    if ! command -v sudo >/dev/null; then
+      echo "These packages are missing, and installing them takes root: $missing" >&2
+      return 1
+    fi
+    run=(sudo)
+  fi
+  echo "Installing packages: $missing"
+  "${run[@]}" apt-get update -qq
+  # shellcheck disable=SC2086  # the list is words
+  "${run[@]}" env DEBIAN_FRONTEND=noninteractive apt-get install -y -qq --no-install-recommends \
+    $missing >/dev/null
+}
+
+# Configures and builds one preset; a second call does only what has changed.
+build() {
+  local preset=$1
+  echo "Building ($preset)"
+  [[ -f build/$preset/build.ninja ]] || cmake --preset "$preset" >/dev/null
+  cmake --build --preset "$preset"
+}

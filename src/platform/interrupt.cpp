@@ -1,0 +1,69 @@
+#include "platform/interrupt.h"
+
+#include <poll.h>
+#include <signal.h>
+#include <sys/eventfd.h>
+#include <sys/signalfd.h>
+#include <thread>
+
+#include "platform/file_descriptor.h"
+
+namespace lumo::platform {
+namespace {
+
+sigset_t InterruptSignals() {
+  sigset_t signals;
+  sigemptyset(&signals);
+  sigaddset(&signals, SIGINT);
+  sigaddset(&signals, SIGTERM);
+  return signals;
+}
+
+/// Ends the process the way `signal` does by itself.
+void DieOf(int signal) {
+  ::signal(signal, SIG_DFL);
+  raise(signal);
+  const sigset_t signals = InterruptSignals();
+  pthread_sigmask(SIG_UNBLOCK, &signals, nullptr);
+}
+
+}  // namespace
+
+struct InterruptWatch::Impl {
+  std::function<void()> onInterrupt;
+  sigset_t before{};
+  FileDescriptor signals;
+  FileDescriptor end;
+  std::thread thread;
+
+  void Run() {
+    bool told = false;
+    while (true) {
+      pollfd entries[] = {{signals.Get(), POLLIN, 0}, {end.Get(), POLLIN, 0}};
+      if (poll(entries, 2, -1) < 0) continue;
+      if (entries[1].revents != 0) return;
+      signalfd_siginfo info{};
+      if (read(signals.Get(), &info, sizeof info) != sizeof info) continue;
+      if (told) DieOf(static_cast<int>(info.ssi_signo));
+      told = true;
+      onInterrupt();
+    }
+  }
+};
+
+InterruptWatch::InterruptWatch(std::function<void()> onInterrupt) : impl_(new Impl) {
+  impl_->onInterrupt = std::move(onInterrupt);
+  const sigset_t signals = InterruptSignals();
+  pthread_sigmask(SIG_BLOCK, &signals, &impl_->before);
+  impl_->signals = FileDescriptor(signalfd(-1, &signals, SFD_CLOEXEC));
+  impl_->end = FileDescriptor(eventfd(0, EFD_CLOEXEC));
+  impl_->thread = std::thread([impl = impl_.get()] { impl->Run(); });
+}
+
+InterruptWatch::~InterruptWatch() {
+  eventfd_write(impl_->end.Get(), 1);
+  impl_->thread.join();
+  pthread_sigmask(SIG_SETMASK, &impl_->before, nullptr);
+}
+
+}  // namespace lumo::platform

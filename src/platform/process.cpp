@@ -1,0 +1,31 @@
+#include "platform/process.h"
+
+#include <sys/ioctl.h>
+#include <sys/resource.h>
+#include <unistd.h>
+
+namespace lumo::platform {
+
+bool ErrorOutputIsTerminal() {
+  return isatty(STDERR_FILENO) == 1;
+}
+
+unsigned TerminalColumns() {
+  constexpr unsigned kUsual = 80;
+  winsize size{};
+  const bool told = ioctl(STDERR_FILENO, TIOCGWINSZ, &size) == 0 && size.ws_col != 0;
+  return told ? size.ws_col : kUsual;
+}
+
+void RaiseDescriptorLimit() {
+  rlimit limit{};
+  if (getrlimit(RLIMIT_NOFILE, &limit) != 0) return;
+  limit.rlim_cur = limit.rlim_max;
+  setrlimit(RLIMIT_NOFILE, &limit);
+}
+
+int ProcessNumber() {
+  return getpid();
+}
+
+}  // namespace lumo::platform

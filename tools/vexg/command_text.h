@@ -1,0 +1,21 @@
+#pragma once
+
+#include <string>
+
+namespace lumo {
+struct CommandDeclaration;
+}
+
+namespace lumo::host {
+
+// What the registered commands declare, in the forms that people and programs read.
+
+std::string CommandsAsList();      ///< a line each, by group
+std::string CommandsAsNames();     ///< a name each, for the completion of a shell
+std::string CommandsAsJson();      ///< everything, as an array of objects
+std::string CommandsAsMarkdown();  ///< everything, as a document
+
+/// All about one command.
+std::string CommandAsHelp(const CommandDeclaration& command);
+
+}  // namespace lumo::host

@@ -1,0 +1,93 @@
+#include <algorithm>
+#include <exception>
+#include <iostream>
+#include <map>
+
+#include <CLI/CLI.hpp>
+
+#include "foundation/library.h"
+#include "platform/debug_output.h"
+#include "platform/module.h"
+#include "verb.h"
+
+namespace lumo::host {
+namespace {
+
+struct Verb {
+  const char* summary;
+  VerbRegistration::Setup setup;
+};
+
+std::map<std::string, Verb>& Verbs() {
+  static std::map<std::string, Verb> verbs;
+  return verbs;
+}
+
+/// Loads libraries of commands; what they hold registers itself.
+void LoadLibraries(const std::vector<std::string>& files) {
+  for (const std::string& file : files) {
+    // A bare name is a file of the working directory here, as everywhere on the command line.
+    const std::string path = file.find('/') == std::string::npos ? "./" + file : file;
+    std::string fault;
+    if (!platform::Module::Load(path, &fault).IsLoaded()) {
+      throw HostError(kExitUsage, "can't load the library " + file + ": " + fault);
+    }
+  }
+}
+
+std::string OneLine(std::string text) {
+  std::replace(text.begin(), text.end(), '\n', ' ');
+  return text;
+}
+
+int Run(int argc, char** argv) {
+  CLI::App app("Processing core for remote-sensing images: runs jobs of named commands.", "vexg");
+  app.set_version_flag("--version", std::string("vexg ") + GetLibraryVersion());
+  app.require_subcommand(1);
+  app.fallthrough();
+  std::vector<std::string> libraries;
+  app.add_option("--load", libraries, "A library of commands to load first; may come again")
+      ->type_name("FILE")
+      ->allow_extra_args(false);
+
+  std::map<const CLI::App*, VerbRegistration::Work> works;
+  for (const auto& [name, verb] : Verbs()) {
+    CLI::App* const sub = app.add_subcommand(name, verb.summary);
+    works[sub] = verb.setup(*sub);
+  }
+  try {
+    app.parse(argc, argv);
+  } catch (const CLI::ParseError& error) {
+    if (error.get_exit_code() == 0) return app.exit(error);  // help or version
+    throw HostError(kExitUsage, OneLine(error.what()) + "; see vexg --help");
+  }
+  LoadLibraries(libraries);
+  VEXInit();
+  const int code = works.at(app.get_subcommands().front())();
+  if (!std::cout.flush()) throw HostError(kExitFailed, "standard output can't be written");
+  return code;
+}
+
+}  // namespace
+
+VerbRegistration::VerbRegistration(const char* name, const char* summary, Setup setup) {
+  Verbs()[name] = {summary, setup};
+}
+
+void Say(const std::string& line) {
+  platform::DebugOutput("vexg: " + line + "\n");
+}
+
+}  // namespace lumo::host
+
+int main(int argc, char** argv) {
+  try {
+    return lumo::host::Run(argc, argv);
+  } catch (const lumo::host::HostError& error) {
+    lumo::host::Say(error.what());
+    return error.code;
+  } catch (const std::exception& error) {
+    lumo::host::Say(error.what());
+    return lumo::host::kExitFailed;
+  }
+}

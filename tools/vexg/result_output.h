@@ -1,0 +1,58 @@
+#pragma once
+
+#include <fstream>
+#include <optional>
+#include <string>
+
+#include "document.h"
+
+namespace CLI {
+class App;
+}
+
+namespace lumo::host {
+
+/// Where a text goes: standard output, or a file that is whole once it is there.
+class Output {
+ public:
+  /// @param file  "-" or "" for standard output. Throws HostError when the file can't be made, so
+  ///              that nothing is run in vain.
+  explicit Output(const std::string& file);
+  /// Removes what was not finished.
+  ~Output();
+  Output(const Output&) = delete;
+  Output& operator=(const Output&) = delete;
+
+  /// Writes all of it. Throws HostError.
+  void Write(const std::string& text);
+
+ private:
+  std::string file_;
+  std::string unfinished_;
+  std::ofstream stream_;
+};
+
+/// The options of a verb that runs a job, and what it does before and after.
+struct JobOptions {
+  std::string file;
+  std::string output = "-";
+  std::string progress = "auto";
+  bool json = false;
+  bool quiet = false;
+
+  void AddTo(CLI::App& app);
+};
+
+/// Reads the job document of the options. Throws HostError when it isn't well formed. One without
+/// any Command is answered with a bare result; see ExitCodeOf.
+Document ReadJob(const JobOptions& options, String& text);
+
+/// Writes the result document, or the same as JSON:
+/// {"commands": [{"name", "result", "wall", "cpu", "usage", "return": {name: value}}]}.
+void WriteResult(const String& resultDocument, bool json, Output& output);
+
+/// Says which commands of the job left no trace in its result, as their IDs are unknown.
+/// @return how the program ends: success, a failed or unknown command, or a job without any.
+int ExitCodeOf(const Document& job, const String& resultDocument);
+
+}  // namespace lumo::host

@@ -1,0 +1,24 @@
+#pragma once
+
+#include <string>
+
+#include "commands/client.h"
+
+namespace CLI {
+class App;
+}
+
+namespace lumo::host {
+
+inline constexpr const char* kDefaultServer = "vexg";
+
+/// Which server a verb talks to, and how long it waits for one.
+struct ServerOptions {
+  std::string name = kDefaultServer;
+  bool noWait = false;
+
+  void AddNoWait(CLI::App& app);
+  double Patience() const { return noWait ? 0.0 : PipeClient::kPatience; }
+};
+
+}  // namespace lumo::host

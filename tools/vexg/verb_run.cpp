@@ -1,0 +1,51 @@
+#include <memory>
+
+#include <CLI/CLI.hpp>
+
+#include "commands/job_parser.h"
+#include "commands/job_result.h"
+#include "platform/interrupt.h"
+#include "progress_view.h"
+#include "result_output.h"
+#include "verb.h"
+
+namespace lumo::host {
+namespace {
+
+void SayWhyCommandsFailed(const Job& job) {
+  for (const CommandDescriptorPtr& descriptor : job.commands) {
+    const Command& command = *descriptor->command;
+    if (command.GetResult() != CommandResult::kFailed) continue;
+    const std::string reason = command.GetReason().ToUTF8();
+    Say("command \"" + descriptor->name.ToUTF8() + "\" (" + descriptor->id.ToUTF8() + ") failed" +
+        (reason.empty() ? "" : ": " + reason));
+  }
+}
+
+int RunJobFile(const JobOptions& options) {
+  String text;
+  const Document document = ReadJob(options, text);
+  Output output(options.output);
+  Job job;
+  JobParser(job).Parse(text);
+  {
+    const platform::InterruptWatch interrupts([&] { job.GetIPC().abort->Set(true); });
+    const ProgressView view(job.GetIPC().progress,
+                            ChooseProgressStyle(options.progress, options.quiet));
+    RunJob(job);
+  }
+  SayWhyCommandsFailed(job);
+  const String result = JobResultWriter(job).Write();
+  WriteResult(result, options.json, output);
+  return ExitCodeOf(document, result);
+}
+
+const VerbRegistration registration(
+    "run", "Runs a job document in this process and prints its result", [](CLI::App& app) {
+      const auto options = std::make_shared<JobOptions>();
+      options->AddTo(app);
+      return VerbRegistration::Work([options] { return RunJobFile(*options); });
+    });
+
+}  // namespace
+}  // namespace lumo::host
