@@ -28,7 +28,7 @@ bool Context::IsA(unsigned typeCode) const {
 }
 
 String Context::WorkingDirectory() const {
-  return values_.Find(kWorkingDirectory).text;
+  return Find(kWorkingDirectory);
 }
 
 bool Environment::IsA(unsigned typeCode) const {

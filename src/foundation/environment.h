@@ -25,6 +25,9 @@ class VEXG_EXPORT Context : public Object {
   /// The entry of `key`, made empty when it is missing: the way to write and to read.
   ContextValue& operator[](const ContextKey& key) { return values_[key]; }
 
+  /// The text under `key`, or the empty text; adds no entry.
+  String Find(const ContextKey& key) const { return values_.Find(key).text; }
+
   /// The value of kWorkingDirectory, or the empty text; adds no entry.
   String WorkingDirectory() const;
 

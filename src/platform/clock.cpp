@@ -21,4 +21,14 @@ double ProcessCpuSeconds() {
   return ReadClock(CLOCK_PROCESS_CPUTIME_ID);
 }
 
+std::string LocalDateText() {
+  const time_t now = time(nullptr);
+  tm local{};
+  localtime_r(&now, &local);
+  char text[64] = {};  // a year beyond four digits fits
+  if (asctime_r(&local, text) == nullptr) return {};
+  const std::string date(text);
+  return date.substr(0, date.find('\n'));
+}
+
 }  // namespace lumo::platform

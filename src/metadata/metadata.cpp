@@ -1,0 +1,147 @@
+#include "metadata/metadata.h"
+
+#include <algorithm>
+
+#include "foundation/type_code.h"
+
+namespace lumo {
+namespace {
+
+constexpr const char* kPrivateMark = "/private/";
+
+/// "/a/b/" for any way of writing the path.
+String FullPath(const String& path) {
+  String full("/");
+  for (const String& name : SplitMetadataPath(path)) full += name + "/";
+  return full;
+}
+
+bool AddNames(const MetadataContainer& container, const String& path, bool isPrivate,
+              List<String>& names) {
+  bool added = true;
+  for (const auto& [name, child] : container.GetChildren()) {
+    const String childPath = path + name + "/";
+    if (const auto* const inner = dynamic_cast<const MetadataContainer*>(child.get())) {
+      added = AddNames(*inner, childPath, isPrivate, names) && added;
+    } else if ((childPath.Find(kPrivateMark) != String::kNotFound) == isPrivate) {
+      added = names.PushBack(childPath) && added;
+    }
+  }
+  return added;
+}
+
+/// A store with a copy of the tree, and a lock of its own.
+LockableMetadataImplPtr CopyOf(const LockableMetadataImpl& store) {
+  return LockableMetadataImplPtr(new LockableMetadataImpl(store));
+}
+
+}  // namespace
+
+const unsigned Metadata::TypeCode = GloballyUniqueObjectTypeCode("Metadata");
+
+Metadata::Metadata() : store_(new LockableMetadataImpl) {}
+
+Metadata::Metadata(const Metadata& other) : Object(other), store_(other.Share()) {}
+
+Metadata& Metadata::operator=(const Metadata& other) {
+  if (this == &other) return *this;
+  Object::operator=(other);
+  const LockableMetadataImplPtr shared = other.Share();
+  const std::lock_guard handle(handleMutex_);
+  store_ = shared;
+  return *this;
+}
+
+LockableMetadataImplPtr Metadata::Share() const {
+  const std::lock_guard handle(handleMutex_);
+  return store_;
+}
+
+bool Metadata::IsA(unsigned typeCode) const {
+  return typeCode == TypeCode || Object::IsA(typeCode);
+}
+
+/// Runs `work` on a store that no other Metadata shares.
+template <typename Work>
+bool Metadata::Write(Work&& work) {
+  const std::lock_guard handle(handleMutex_);
+  const LockableMetadataImplPtr shared = store_;  // keeps it, and its lock, for this call
+  const MutexLock lock = shared->Lock();
+  constexpr unsigned kOwn = 2;  // store_ and shared
+  if (shared.GetCount() > kOwn) {
+    LockableMetadataImplPtr own = CopyOf(*shared);
+    if (!work(*own)) return false;
+    store_ = own;
+    return true;
+  }
+  return work(*store_);
+}
+
+bool Metadata::Open(const Array<String>& connectionStrings) {
+  if (connectionStrings.GetCount() == 0) return true;
+  const bool anyEmpty = std::any_of(connectionStrings.begin(), connectionStrings.end(),
+                                    [](const String& text) { return text.GetLength() == 0; });
+  return !anyEmpty && connectionStrings[0] == "EMPTY";
+}
+
+bool Metadata::Exists(const String& path) const {
+  return Read(path, [](const MetadataObject& object) {
+    return object.TypeCode() != MetadataContainer::kTypeCode;
+  });
+}
+
+void Metadata::Remove(const String& path) {
+  try {
+    if (Read(path, [](const MetadataObject&) { return true; })) {
+      Write([&](MetadataContainer& store) { return store.Remove(path); });
+    }
+  } catch (...) {
+    SetErrorState(ObjectErrorOutOfMemory());
+  }
+}
+
+bool Metadata::SetUndefined(const String& path, std::uint32_t count) {
+  return Put(path, [&] {
+    return std::make_unique<MetadataUndefined>(std::vector<UndefinedCount>{{count}});
+  });
+}
+
+bool Metadata::PutValue(const String& path, std::unique_ptr<MetadataObject> value) {
+  return Write([&](MetadataContainer& store) { return store.Put(path, std::move(value)); });
+}
+
+bool Metadata::GetProperties(const String& path, MetadataProperties& properties) const {
+  return Read(path, [&](const MetadataObject& object) {
+    properties.typeName = object.TypeName();
+    properties.typeCode = object.TypeCode();
+    properties.count = object.Count();
+    properties.isArray = object.Dims(properties.rows, properties.columns);
+    return true;
+  });
+}
+
+void Metadata::CollectNames(const String& path, bool isPrivate, List<String>& names) const {
+  const std::lock_guard handle(handleMutex_);
+  const MutexLock lock = store_->Lock();
+  const String full = FullPath(path);
+  const MetadataObject* const start = full.GetLength() == 1 ? store_.Get() : store_->Find(path);
+  if (const auto* const container = dynamic_cast<const MetadataContainer*>(start)) {
+    AddNames(*container, full, isPrivate, names);
+  }
+}
+
+void Metadata::GetNames(const String& path, List<String>& names) const {
+  CollectNames(path, false, names);
+}
+
+void Metadata::GetNamesPrivate(const String& path, List<String>& names) const {
+  CollectNames(path, true, names);
+}
+
+String Metadata::Describe(const String& path) const {
+  const std::lock_guard handle(handleMutex_);
+  const MutexLock lock = store_->Lock();
+  return store_->Describe(path);
+}
+
+}  // namespace lumo
