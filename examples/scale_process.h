@@ -8,21 +8,26 @@
 
 namespace lumo::example {
 
-/// output = gain[band] * input + offset[band] for a stretch of pixels with all their bands; 0 where
-/// the state says that a pixel is not valid.
-template <typename TIn, typename TOut>
+/// What is done with a scaled value by default: nothing.
+struct Keep {
+  double operator()(double value) const { return value; }
+};
+
+/// output = Op(gain[band] * input + offset[band]) for a stretch of pixels with all their bands; 0
+/// where the state says that a pixel is not valid.
+template <typename Op, typename TIn, typename TOut>
 void ScalePixels(const TIn* in, const unsigned char* state, TOut* out, std::size_t pixels,
                  unsigned bands, const double* gains, const double* offsets) {
   for (std::size_t pixel = 0; pixel < pixels; ++pixel) {
     for (unsigned b = 0; b < bands; ++b, ++in, ++state, ++out) {
-      const double value = gains[b] * static_cast<double>(*in) + offsets[b];
+      const double value = Op()(gains[b] * static_cast<double>(*in) + offsets[b]);
       *out = (*state & PixelValueState::NotValid) == 0 ? static_cast<TOut>(value) : TOut();
     }
   }
 }
 
-/// The loop over the lines of one tile: output = gain[band] * input + offset[band].
-template <typename TIn, typename TOut>
+/// The loop over the lines of one tile: output = Op(gain[band] * input + offset[band]).
+template <typename TIn, typename TOut, typename Op>
 class ScaleLoop final : public ArrayParallelFor {
  public:
   ScaleLoop(const Tile<TIn>& input, const Array<double>& gains, const Array<double>& offsets,
@@ -40,9 +45,9 @@ class ScaleLoop final : public ArrayParallelFor {
     if (Failed()) return;
     for (unsigned y = begin; y < end; ++y) {
       const std::size_t at = input_.Offset(0, y);
-      ScalePixels(input_.PixelArray().GetData() + at, input_.StateArray().GetData() + at,
-                  output_.PixelArray().GetData() + at, input_.Width(), input_.Bands(),
-                  gains_.GetData(), offsets_.GetData());
+      ScalePixels<Op>(input_.PixelArray().GetData() + at, input_.StateArray().GetData() + at,
+                      output_.PixelArray().GetData() + at, input_.Width(), input_.Bands(),
+                      gains_.GetData(), offsets_.GetData());
     }
   }
 
@@ -55,7 +60,7 @@ class ScaleLoop final : public ArrayParallelFor {
 
 /// The stage between: takes the tile in slot 0 and puts the scaled one in its place. Setup
 /// arguments: gains and offsets, arrays of double with an element for each band.
-template <typename TIn, typename TOut>
+template <typename TIn, typename TOut, typename Op = Keep>
 class ScaleTask final : public ConcurrentTask {
  public:
   explicit ScaleTask(ArgList& setup)
@@ -78,7 +83,7 @@ class ScaleTask final : public ConcurrentTask {
       std::copy_n(input->StateArray().begin(), input->StateArray().GetCount(),
                   output->StateArray().begin());
     }
-    ScaleLoop<TIn, TOut> loop(*input, *gains_, *offsets_, *output);
+    ScaleLoop<TIn, TOut, Op> loop(*input, *gains_, *offsets_, *output);
     RunParallelFor(loop, 0, GetAbortFlag());
     if (loop.HasError()) {
       SetErrorState(TaskError());
@@ -94,7 +99,7 @@ class ScaleTask final : public ConcurrentTask {
 };
 
 /// Scales a raster into another of the same size, tile by tile.
-template <typename TIn, typename TOut>
+template <typename TIn, typename TOut, typename Op = Keep>
 class ScaleProcess final : public ProcessBuilder<Process> {
  public:
   ScaleProcess(const RasterIteratorPtr<TIn>& input, const Pointer<Array<double>>& gains,
@@ -128,7 +133,7 @@ class ScaleProcess final : public ProcessBuilder<Process> {
   }
 
   ManagedTask<RasterReadTask<TIn>> read_;
-  ManagedTask<ScaleTask<TIn, TOut>> scale_;
+  ManagedTask<ScaleTask<TIn, TOut, Op>> scale_;
   ManagedTask<RasterWriteTask<TOut>> write_;
 };
 
