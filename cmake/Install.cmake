@@ -4,7 +4,8 @@ include(CMakePackageConfigHelpers)
 install(TARGETS vexg EXPORT vexgTargets
         LIBRARY DESTINATION ${CMAKE_INSTALL_LIBDIR})
 install(DIRECTORY ${PROJECT_SOURCE_DIR}/src/ DESTINATION ${CMAKE_INSTALL_INCLUDEDIR}/vexg
-        FILES_MATCHING PATTERN "*.h" PATTERN "*_impl.h" EXCLUDE)
+        FILES_MATCHING PATTERN "*.h" PATTERN "*_impl.h" EXCLUDE
+        REGEX "platform/(file_descriptor|message_frame|pipe_directory).h" EXCLUDE)
 install(EXPORT vexgTargets NAMESPACE vexg:: DESTINATION ${CMAKE_INSTALL_LIBDIR}/cmake/vexg)
 
 configure_package_config_file(${PROJECT_SOURCE_DIR}/cmake/vexgConfig.cmake.in
@@ -14,5 +15,7 @@ write_basic_package_version_file(${PROJECT_BINARY_DIR}/vexgConfigVersion.cmake
 install(FILES ${PROJECT_BINARY_DIR}/vexgConfig.cmake ${PROJECT_BINARY_DIR}/vexgConfigVersion.cmake
         DESTINATION ${CMAKE_INSTALL_LIBDIR}/cmake/vexg)
 
+# Relative, so that the tree can be moved.
+file(RELATIVE_PATH VEXG_PREFIX_FROM_PKGCONFIG /prefix/${CMAKE_INSTALL_LIBDIR}/pkgconfig /prefix)
 configure_file(${PROJECT_SOURCE_DIR}/cmake/vexg.pc.in ${PROJECT_BINARY_DIR}/vexg.pc @ONLY)
 install(FILES ${PROJECT_BINARY_DIR}/vexg.pc DESTINATION ${CMAKE_INSTALL_LIBDIR}/pkgconfig)

@@ -19,6 +19,8 @@ NamedPipe::NamedPipe(const String& name)
 NamedPipe::~NamedPipe() = default;
 
 bool NamedPipe::Create() {
+  const MutexLock lock = Lock();
+  if (stopped_) return false;
   if (listener_ != nullptr) return true;
   listener_ = platform::PipeListener::Open(name_.ToUTF8(), fault_);
   return listener_ != nullptr;
@@ -30,6 +32,8 @@ bool NamedPipe::Listen() {
 }
 
 void NamedPipe::StopListening() {
+  const MutexLock lock = Lock();
+  stopped_ = true;
   if (listener_ != nullptr) listener_->Stop();
 }
 

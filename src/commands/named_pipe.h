@@ -47,7 +47,7 @@ class VEXG_EXPORT NamedPipe : public Lockable {
   ///         that EndWithClient watches.
   bool Listen();
 
-  /// Server side: has Listen give false from now on.
+  /// Server side: has Create and Listen give false from now on.
   void StopListening();
 
   /// Server side: the process of the client that Listen gave.
@@ -78,6 +78,7 @@ class VEXG_EXPORT NamedPipe : public Lockable {
   String name_;
   String fullName_;
   bool connected_ = false;
+  bool stopped_ = false;  // with the making of listener_ under the lock
   platform::PipeFault fault_{};
   std::unique_ptr<platform::PipeListener> listener_;      // server side
   std::unique_ptr<platform::PipeConnection> connection_;  // client side

@@ -17,4 +17,12 @@ bool CarryPoints(Array<double>& points, const CoordSys& from, const CoordSys& to
   return std::all_of(points.begin(), points.end(), [](double v) { return std::isfinite(v); });
 }
 
+void MarkUncarried(Array<double>& points) {
+  for (unsigned i = 0; i + 1 < points.GetCount(); i += 2) {
+    if (std::isfinite(points[i]) && std::isfinite(points[i + 1])) continue;
+    points[i] = HUGE_VAL;
+    points[i + 1] = HUGE_VAL;
+  }
+}
+
 }  // namespace lumo

@@ -63,10 +63,10 @@ class VEXG_EXPORT CoordSys {
   /// A number of its own for each handle of the process.
   std::uint32_t Identifier() const { return identifier_; }
 
-  /// Converts a pair of lengths, such as a pixel size, between two units of kMapUnits. Between linear
-  /// and angular units the radii of curvature of WGS 84 at `latitude` count, in degrees (Snyder, Map
-  /// Projections: A Working Manual, 1987, equations 4-18 to 4-21). An unknown code passes the values
-  /// through.
+  /// Converts a pair of lengths, such as a pixel size, between two units of kMapUnits. Between
+  /// linear and angular units the radii of curvature of WGS 84 at `latitude` count, in degrees
+  /// (Snyder, Map Projections: A Working Manual, 1987, equations 4-18 to 4-21). An unknown code
+  /// passes the values through.
   static void ConvertUnits(double x, double y, std::int32_t fromCode, std::int32_t toCode,
                            double& outX, double& outY, double latitude);
 
@@ -83,7 +83,7 @@ class VEXG_EXPORT CoordSys {
 struct MapUnit {
   const char* name;
   const char* displayName;
-  double factor;  ///< to metres, or to degrees
+  double factor;      ///< to metres, or to degrees
   std::int32_t kind;  ///< 0 linear, 1 angular
   std::int32_t code;  ///< of the EPSG registry; from 109001 on, of the projection engine
 };

@@ -39,34 +39,29 @@ String PluginDirectory(const String& preferred) {
 
 bool CoordSysFuncPtrs::LoadFuncPtrs(const String& directory) {
   if (directory.GetLength() == 0) {
-    LogCoordSys(CoordSysLog::kErrors,
-                      "CoordSysFuncPtrs::LoadFuncPtrs - error invalid path.");
+    LogCoordSys(CoordSysLog::kErrors, "CoordSysFuncPtrs::LoadFuncPtrs - error invalid path.");
     return false;
   }
   const std::string path = directory.ToUTF8() + "/" + platform::ModuleFileName("vexpe");
   module_ = platform::Module::Load(path);
   if (!module_.IsLoaded()) {
-    LogCoordSys(CoordSysLog::kErrors,
-                      "CoordSysFuncPtrs::LoadFuncPtrs - error loading vexpe dll.");
+    LogCoordSys(CoordSysLog::kErrors, "CoordSysFuncPtrs::LoadFuncPtrs - error loading vexpe dll.");
     return false;
   }
   auto* const initialize = module_.Find<void(String&, String&)>("Esri_Pe_Initialize");
-  auto* const fromString =
-      module_.Find<CoordSysImpl*(const String&)>("Esri_Pe_CreateFromString");
+  auto* const fromString = module_.Find<CoordSysImpl*(const String&)>("Esri_Pe_CreateFromString");
   auto* const fromCode = module_.Find<CoordSysImpl*(int)>("Esri_Pe_CreateFromCode");
   auto* const release = module_.Find<int(CoordSysImpl*)>("Esri_Pe_Release");
-  if (initialize == nullptr || fromString == nullptr || fromCode == nullptr ||
-      release == nullptr) {
+  if (initialize == nullptr || fromString == nullptr || fromCode == nullptr || release == nullptr) {
     LogCoordSys(CoordSysLog::kErrors,
-                      "CoordSysFuncPtrs::LoadFuncPtrs - error did not find vexpe function.");
+                "CoordSysFuncPtrs::LoadFuncPtrs - error did not find vexpe function.");
     return false;
   }
   fp_Esri_Pe_Initialize = initialize;
   fp_Esri_Pe_CreateFromString = fromString;
   fp_Esri_Pe_CreateFromCode = fromCode;
   fp_Esri_Pe_Release = release;
-  LogCoordSys(CoordSysLog::kErrors, "CoordSysFuncPtrs::LoadFuncPtrs - %s loaded.",
-                    path.c_str());
+  LogCoordSys(CoordSysLog::kErrors, "CoordSysFuncPtrs::LoadFuncPtrs - %s loaded.", path.c_str());
   return true;
 }
 
@@ -84,11 +79,10 @@ bool CoordSysFactory::Init() {
   String peDirectory = ReadEnvironment(Environment::kPeDirectory);
   String gdalDirectory = ReadEnvironment(Environment::kGdalDirectory);
   MakeCoordSysLog(peDirectory);
-  LogCoordSys(
-      CoordSysLog::kErrors,
-      ";-----------------------------------------------------------------------------");
+  LogCoordSys(CoordSysLog::kErrors,
+              ";-----------------------------------------------------------------------------");
   LogCoordSys(CoordSysLog::kErrors, "CoordSysFactory::Init - pedata directory (%s).",
-                    peDirectory.GetUTF8());
+              peDirectory.GetUTF8());
   if (!functions_.LoadFuncPtrs(PluginDirectory(binDirectory))) return false;
   fp_Esri_Pe_Initialize(peDirectory, gdalDirectory);
   return true;

@@ -16,7 +16,8 @@ VEXG_EXPORT extern int (*fp_Esri_Pe_Release)(CoordSysImpl* impl);
 class VEXG_EXPORT CoordSysFuncPtrs {
  public:
   /// Loads the plug-in from `directory`. The globals are set only when all four are there.
-  /// @return false, with a line in the log, when the directory is empty, the plug-in can't be loaded
+  /// @return false, with a line in the log, when the directory is empty, the plug-in can't be
+  /// loaded
   ///         or a function is missing.
   bool LoadFuncPtrs(const String& directory);
 

@@ -26,8 +26,8 @@ struct CoordSysInfo {
   String primeMeridianText{"0.0"};
   double primeMeridian = 0;  ///< degrees east of Greenwich
   String unitName{"Meter"};
-  double unitFactor = 1.0;     ///< to metres, or to degrees for an angular unit
-  std::int32_t unitKind = 0;   ///< 0 linear, 1 angular
+  double unitFactor = 1.0;    ///< to metres, or to degrees for an angular unit
+  std::int32_t unitKind = 0;  ///< 0 linear, 1 angular
   std::int32_t unitCode = 9001;
   String text{""};
   double parameters[kParameterCount] = {};

@@ -12,25 +12,26 @@ namespace lumo {
 
 /// The log of the coordinate system layer, shared by the library and the projection plug-in. The
 /// control file pelog.txt in the projection data directory switches it; it is made, all off, when
-/// missing. Lines go to standard error, to two files of about 500,000 bytes that alternate, or both.
+/// missing. Lines go to standard error, to two files of about 500,000 bytes that alternate, or
+/// both.
 ///
 /// Threads: any operation from any thread; the log has a lock of its own.
 /// Failure: files that can't be made or written mean no log lines, and nothing else.
 class VEXG_EXPORT CoordSysLog {
  public:
   // Levels of log lines.
-  static constexpr std::uint32_t kFirstTransform = 0x1;     ///< first geographic transform
-  static constexpr std::uint32_t kAllTransforms = 0x2;      ///< all geographic transforms
-  static constexpr std::uint32_t kTransformTexts = 0x4;     ///< texts of both systems
-  static constexpr std::uint32_t kTransformValues = 0x8;    ///< first values in and out
-  static constexpr std::uint32_t kOverrides = 0x10;         ///< overrides of transforms and datums
-  static constexpr std::uint32_t kTransformUsed = 0x20;     ///< the transform that was chosen
-  static constexpr std::uint32_t kTransformExtent = 0x40;   ///< its bounding box
-  static constexpr std::uint32_t kReprojection = 0x200;     ///< core reprojection values
-  static constexpr std::uint32_t kSystems = 0x400;          ///< a system is fetched or deleted
-  static constexpr std::uint32_t kGeographicMade = 0x800;   ///< a geographic system is made
-  static constexpr std::uint32_t kProjectedMade = 0x1000;   ///< a projected system is made
-  static constexpr std::uint32_t kErrors = 0x2000;          ///< errors
+  static constexpr std::uint32_t kFirstTransform = 0x1;    ///< first geographic transform
+  static constexpr std::uint32_t kAllTransforms = 0x2;     ///< all geographic transforms
+  static constexpr std::uint32_t kTransformTexts = 0x4;    ///< texts of both systems
+  static constexpr std::uint32_t kTransformValues = 0x8;   ///< first values in and out
+  static constexpr std::uint32_t kOverrides = 0x10;        ///< overrides of transforms and datums
+  static constexpr std::uint32_t kTransformUsed = 0x20;    ///< the transform that was chosen
+  static constexpr std::uint32_t kTransformExtent = 0x40;  ///< its bounding box
+  static constexpr std::uint32_t kReprojection = 0x200;    ///< core reprojection values
+  static constexpr std::uint32_t kSystems = 0x400;         ///< a system is fetched or deleted
+  static constexpr std::uint32_t kGeographicMade = 0x800;  ///< a geographic system is made
+  static constexpr std::uint32_t kProjectedMade = 0x1000;  ///< a projected system is made
+  static constexpr std::uint32_t kErrors = 0x2000;         ///< errors
 
   /// Makes the log for the projection data directory `directory`.
   /// @return null when the directory does not exist.

@@ -58,8 +58,8 @@ Array<double> ExtentSamples(unsigned samples, unsigned lines) {
 bool GeoRef::IsEqual(const GeoRefPtr& other, std::uint32_t flags) const {
   if (other.IsNull() || type_ != other->type_) return false;
   if (Differ(rotation_, other->rotation_)) return false;
-  if ((flags & kSkipPixelSize) == 0 && (Differ(pixelSizeX_, other->pixelSizeX_) ||
-                                        Differ(pixelSizeY_, other->pixelSizeY_))) {
+  if ((flags & kSkipPixelSize) == 0 &&
+      (Differ(pixelSizeX_, other->pixelSizeX_) || Differ(pixelSizeY_, other->pixelSizeY_))) {
     return false;
   }
   if ((flags & kSkipTiePoint) == 0 &&
@@ -76,11 +76,7 @@ bool GeoRef::PixelToPixel(Array<double>& points, const GeoRef& other) const {
   if (!coordSys_.IsEqual(other.coordSys_)) carried = MapToMap(points, other) && carried;
   const bool placed = other.MapToPixel(points);
   if (!placed || carried) return placed;
-  for (unsigned i = 0; i < points.GetCount(); i += 2) {
-    if (std::isfinite(points[i]) && std::isfinite(points[i + 1])) continue;
-    points[i] = HUGE_VAL;
-    points[i + 1] = HUGE_VAL;
-  }
+  MarkUncarried(points);
   return false;
 }
 

@@ -26,8 +26,8 @@ struct MapRect {
 ///
 /// Pixel coordinates are real numbers, x along the line and y down, (0, 0) the upper left corner of
 /// the first pixel of an affine model. Map coordinates are easting and northing, or longitude and
-/// latitude, in the unit of the coordinate system. A points array has x and y of a point next to one
-/// another, dimensions (points, 2).
+/// latitude, in the unit of the coordinate system. A points array has x and y of a point next to
+/// one another, dimensions (points, 2).
 ///
 /// Threads:   conversions may run on many threads at once once SetDimensions has filled the caches;
 ///            a thread that changes the model must be alone.
@@ -84,8 +84,8 @@ class VEXG_EXPORT GeoRef {
   /// The model of the raster with pixels of another size, in map units.
   virtual GeoRefPtr ResampledGeoRef(double pixelSizeX, double pixelSizeY) const = 0;
 
-  /// Writes the fields in their text form, without the word for the type; numbers have 17 digits, so
-  /// that they read back to the same bits.
+  /// Writes the fields in their text form, without the word for the type; numbers have 17 digits,
+  /// so that they read back to the same bits.
   virtual void Write(std::ostream& out) const;
 
   /// Reads what Write writes. A text that breaks off or holds no numbers fails the stream, and the

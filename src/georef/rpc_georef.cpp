@@ -71,6 +71,8 @@ unsigned Truncated(double value) {
 
 }  // namespace
 
+const unsigned RpcGeoRef::TypeCode = kRpc;
+
 RpcGeoRef::RpcGeoRef() {
   type_ = kRpc;
   groundCoordSys_.SetGeographic();
@@ -135,6 +137,7 @@ bool RpcGeoRef::MapToPixel(Array<double>& points) const {
       ground[2 * (first + i) + 1] = (block.line[i] - lineOffset_) * lineScale_;
     }
   }
+  if (!carried) MarkUncarried(ground);
   PutPairs(ground, heights, points);
   return carried;
 }
@@ -329,8 +332,7 @@ void RpcGeoRef::SetGroundCoordinateSystem(const CoordSys& coordSys) {
 
 void RpcGeoRef::Write(std::ostream& out) const {
   WriteNumbers(out, std::bit_cast<RpcValues>(rpc_));
-  const double subset[] = {sampleOffset_, lineOffset_, sampleScale_, lineScale_,
-                           demHeightOffset_};
+  const double subset[] = {sampleOffset_, lineOffset_, sampleScale_, lineScale_, demHeightOffset_};
   WriteNumbers(out, subset);
   cache_.Write(out);
   if (!dem_.IsNull()) out << dem_->GetURI().ToUTF8();

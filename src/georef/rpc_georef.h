@@ -35,9 +35,9 @@ struct RpcCoefficients {
 /// The rational polynomial camera model: ground to pixel by a quotient of cubic polynomials, pixel
 /// to ground by iteration. It may follow an elevation model.
 ///
-/// Points arrays may also have dimensions (points, 3), where the third column is a height in metres:
-/// PixelToMap starts from it, and both directions leave there the height that they used. Without it
-/// the height is that of the elevation model, else HEIGHT_OFF.
+/// Points arrays may also have dimensions (points, 3), where the third column is a height in
+/// metres: PixelToMap starts from it, and both directions leave there the height that they used.
+/// Without it the height is that of the elevation model, else HEIGHT_OFF.
 ///
 /// PixelToMap: where the rounds at one height run out, the last estimate stands; where those that
 /// follow the terrain do, the point is (LONG_OFF, LAT_OFF). A point that is not a number, or at
@@ -45,7 +45,7 @@ struct RpcCoefficients {
 /// numbers.
 class VEXG_EXPORT RpcGeoRef : public GeoRef {
  public:
-  static constexpr unsigned TypeCode = kRpc;
+  static const unsigned TypeCode;
 
   RpcGeoRef();
 

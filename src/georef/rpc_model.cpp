@@ -13,8 +13,8 @@ constexpr int kMostRounds = 50;
 
 /// The 20 terms in RPC00B order, of normalised longitude l, latitude p and height h.
 [[gnu::always_inline]] inline double Sum(const double* c, double l, double p, double h) {
-  return c[0] + c[1] * l + c[2] * p + c[3] * h + c[4] * (l * p) + c[5] * (l * h) +
-         c[6] * (p * h) + c[7] * (l * l) + c[8] * (p * p) + c[9] * (h * h) + c[10] * (p * l * h) +
+  return c[0] + c[1] * l + c[2] * p + c[3] * h + c[4] * (l * p) + c[5] * (l * h) + c[6] * (p * h) +
+         c[7] * (l * l) + c[8] * (p * p) + c[9] * (h * h) + c[10] * (p * l * h) +
          c[11] * (l * l * l) + c[12] * (l * p * p) + c[13] * (l * h * h) + c[14] * (l * l * p) +
          c[15] * (p * p * p) + c[16] * (p * h * h) + c[17] * (l * l * h) + c[18] * (p * p * h) +
          c[19] * (h * h * h);

@@ -9,6 +9,8 @@
 
 namespace lumo {
 
+const unsigned StdGeoRef::TypeCode = kStd;
+
 /// The fields that a conversion needs. The body of each loop stands in it, so that the array form,
 /// which is compiled for vectors, and the form for one point are the same arithmetic.
 struct StdGeoRef::Affine {

@@ -7,7 +7,7 @@ namespace lumo {
 /// An affine grid: pixels of one size, a tie point, and a rotation about it.
 class VEXG_EXPORT StdGeoRef : public GeoRef {
  public:
-  static constexpr unsigned TypeCode = kStd;
+  static const unsigned TypeCode;
 
   StdGeoRef() { type_ = kStd; }
 

@@ -2,6 +2,8 @@
 
 namespace lumo {
 
+const unsigned StdRpcGeoRef::TypeCode = kStdRpc;
+
 StdRpcGeoRef::StdRpcGeoRef() {
   type_ = kStdRpc;
   rpc_.type_ = kStdRpc;

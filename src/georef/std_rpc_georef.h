@@ -8,7 +8,7 @@ namespace lumo {
 /// An affine grid, by which it converts, that also carries the camera model of the raster.
 class VEXG_EXPORT StdRpcGeoRef : public StdGeoRef {
  public:
-  static constexpr unsigned TypeCode = kStdRpc;
+  static const unsigned TypeCode;
 
   StdRpcGeoRef();
 

@@ -16,18 +16,16 @@ String FullPath(const String& path) {
   return full;
 }
 
-bool AddNames(const MetadataContainer& container, const String& path, bool isPrivate,
+void AddNames(const MetadataContainer& container, const String& path, bool isPrivate,
               List<String>& names) {
-  bool added = true;
   for (const auto& [name, child] : container.GetChildren()) {
     const String childPath = path + name + "/";
     if (const auto* const inner = dynamic_cast<const MetadataContainer*>(child.get())) {
-      added = AddNames(*inner, childPath, isPrivate, names) && added;
+      AddNames(*inner, childPath, isPrivate, names);
     } else if ((childPath.Find(kPrivateMark) != String::kNotFound) == isPrivate) {
-      added = names.PushBack(childPath) && added;
+      names.PushBack(childPath);
     }
   }
-  return added;
 }
 
 /// A store with a copy of the tree, and a lock of its own.
@@ -123,11 +121,13 @@ bool Metadata::GetProperties(const String& path, MetadataProperties& properties)
 void Metadata::CollectNames(const String& path, bool isPrivate, List<String>& names) const {
   const std::lock_guard handle(handleMutex_);
   const MutexLock lock = store_->Lock();
-  const String full = FullPath(path);
-  const MetadataObject* const start = full.GetLength() == 1 ? store_.Get() : store_->Find(path);
-  if (const auto* const container = dynamic_cast<const MetadataContainer*>(start)) {
-    AddNames(*container, full, isPrivate, names);
-  }
+  detail::Guarded(names, [&] {
+    const String full = FullPath(path);
+    const MetadataObject* const start = full.GetLength() == 1 ? store_.Get() : store_->Find(path);
+    if (const auto* const container = dynamic_cast<const MetadataContainer*>(start)) {
+      AddNames(*container, full, isPrivate, names);
+    }
+  });
 }
 
 void Metadata::GetNames(const String& path, List<String>& names) const {

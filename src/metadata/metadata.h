@@ -18,17 +18,16 @@ using LockableMetadataImplPtr = Pointer<LockableMetadataImpl>;
 
 /// What stands at a path of a Metadata.
 struct MetadataProperties {
-  String typeName;         ///< the type word; "container" for a container
+  String typeName;  ///< the type word; "container" for a container
   unsigned typeCode = 0;
-  unsigned count = 0;      ///< elements, or children of a container
-  bool isArray = false;    ///< rows and columns are set
+  unsigned count = 0;    ///< elements, or children of a container
+  bool isArray = false;  ///< rows and columns are set
   unsigned rows = 0;
   unsigned columns = 0;
 };
 
 template <typename T>
-concept MetadataScalar =
-    std::is_same_v<T, std::uint8_t> || std::is_same_v<T, std::int16_t> ||
+concept MetadataScalar = std::is_same_v<T, std::uint8_t> || std::is_same_v<T, std::int16_t> ||
     std::is_same_v<T, std::int32_t> || std::is_same_v<T, float> || std::is_same_v<T, double> ||
     std::is_same_v<T, String> || std::is_same_v<T, std::uint16_t> ||
     std::is_same_v<T, std::uint32_t> || std::is_same_v<T, std::int64_t> ||
@@ -72,8 +71,8 @@ class VEXG_EXPORT Metadata : public Object {
   /// Stores a value of unknown type of which only a size is known.
   bool SetUndefined(const String& path, std::uint32_t count);
 
-  /// Stores the elements of an array of rank 1, or of rank 2 as rows and columns. False for an array
-  /// of another rank or without elements.
+  /// Stores the elements of an array of rank 1, or of rank 2 as rows and columns. False for an
+  /// array of another rank or without elements.
   template <MetadataScalar T>
   bool SetArray(const String& path, const Array<T>& array);
 
@@ -103,8 +102,12 @@ class VEXG_EXPORT Metadata : public Object {
   bool Read(const String& path, Reader&& reader) const {
     const std::lock_guard handle(handleMutex_);
     const MutexLock lock = store_->Lock();
-    const MetadataObject* const object = store_->Find(path);
-    return object != nullptr && reader(*object);
+    try {
+      const MetadataObject* const object = store_->Find(path);
+      return object != nullptr && reader(*object);
+    } catch (...) {  // memory failed
+      return false;
+    }
   }
   template <typename Make>
   bool Put(const String& path, Make&& make) {

@@ -26,30 +26,78 @@ void WriteLeft(std::ostream& out, const String& text, unsigned width) {
 
 }  // namespace
 
-bool MetadataObject::Get(UndefinedCount&, unsigned) const { return false; }
-bool MetadataObject::Get(std::int8_t&, unsigned) const { return false; }
-bool MetadataObject::Get(String&, unsigned) const { return false; }
-bool MetadataObject::Get(double&, unsigned) const { return false; }
-bool MetadataObject::Get(float&, unsigned) const { return false; }
-bool MetadataObject::Get(std::uint64_t&, unsigned) const { return false; }
-bool MetadataObject::Get(std::int64_t&, unsigned) const { return false; }
-bool MetadataObject::Get(std::uint32_t&, unsigned) const { return false; }
-bool MetadataObject::Get(std::int32_t&, unsigned) const { return false; }
-bool MetadataObject::Get(std::uint16_t&, unsigned) const { return false; }
-bool MetadataObject::Get(std::int16_t&, unsigned) const { return false; }
-bool MetadataObject::Get(std::uint8_t&, unsigned) const { return false; }
-bool MetadataObject::Get(std::vector<UndefinedCount>&) const { return false; }
-bool MetadataObject::Get(std::vector<std::int8_t>&) const { return false; }
-bool MetadataObject::Get(std::vector<String>&) const { return false; }
-bool MetadataObject::Get(std::vector<double>&) const { return false; }
-bool MetadataObject::Get(std::vector<float>&) const { return false; }
-bool MetadataObject::Get(std::vector<std::uint64_t>&) const { return false; }
-bool MetadataObject::Get(std::vector<std::int64_t>&) const { return false; }
-bool MetadataObject::Get(std::vector<std::uint32_t>&) const { return false; }
-bool MetadataObject::Get(std::vector<std::int32_t>&) const { return false; }
-bool MetadataObject::Get(std::vector<std::uint16_t>&) const { return false; }
-bool MetadataObject::Get(std::vector<std::int16_t>&) const { return false; }
-bool MetadataObject::Get(std::vector<std::uint8_t>&) const { return false; }
+bool MetadataObject::Get(UndefinedCount&, unsigned) const {
+  return false;
+}
+bool MetadataObject::Get(std::int8_t&, unsigned) const {
+  return false;
+}
+bool MetadataObject::Get(String&, unsigned) const {
+  return false;
+}
+bool MetadataObject::Get(double&, unsigned) const {
+  return false;
+}
+bool MetadataObject::Get(float&, unsigned) const {
+  return false;
+}
+bool MetadataObject::Get(std::uint64_t&, unsigned) const {
+  return false;
+}
+bool MetadataObject::Get(std::int64_t&, unsigned) const {
+  return false;
+}
+bool MetadataObject::Get(std::uint32_t&, unsigned) const {
+  return false;
+}
+bool MetadataObject::Get(std::int32_t&, unsigned) const {
+  return false;
+}
+bool MetadataObject::Get(std::uint16_t&, unsigned) const {
+  return false;
+}
+bool MetadataObject::Get(std::int16_t&, unsigned) const {
+  return false;
+}
+bool MetadataObject::Get(std::uint8_t&, unsigned) const {
+  return false;
+}
+bool MetadataObject::Get(std::vector<UndefinedCount>&) const {
+  return false;
+}
+bool MetadataObject::Get(std::vector<std::int8_t>&) const {
+  return false;
+}
+bool MetadataObject::Get(std::vector<String>&) const {
+  return false;
+}
+bool MetadataObject::Get(std::vector<double>&) const {
+  return false;
+}
+bool MetadataObject::Get(std::vector<float>&) const {
+  return false;
+}
+bool MetadataObject::Get(std::vector<std::uint64_t>&) const {
+  return false;
+}
+bool MetadataObject::Get(std::vector<std::int64_t>&) const {
+  return false;
+}
+bool MetadataObject::Get(std::vector<std::uint32_t>&) const {
+  return false;
+}
+bool MetadataObject::Get(std::vector<std::int32_t>&) const {
+  return false;
+}
+bool MetadataObject::Get(std::vector<std::uint16_t>&) const {
+  return false;
+}
+bool MetadataObject::Get(std::vector<std::int16_t>&) const {
+  return false;
+}
+bool MetadataObject::Get(std::vector<std::uint8_t>&) const {
+  return false;
+}
 
 bool MetadataObject::Dims(unsigned& rows, unsigned& columns) const {
   rows = rows_;

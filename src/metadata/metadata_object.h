@@ -19,11 +19,11 @@ struct UndefinedCount {
 template <typename T>
 struct MetadataTypeOf;
 
-#define VEXG_METADATA_TYPE(T, typeWord, typeCode)     \
-  template <>                                         \
-  struct MetadataTypeOf<T> {                          \
-    static constexpr const char* kWord = typeWord;    \
-    static constexpr unsigned kCode = typeCode;       \
+#define VEXG_METADATA_TYPE(T, typeWord, typeCode)  \
+  template <>                                      \
+  struct MetadataTypeOf<T> {                       \
+    static constexpr const char* kWord = typeWord; \
+    static constexpr unsigned kCode = typeCode;    \
   }
 VEXG_METADATA_TYPE(UndefinedCount, "undefined", 0);
 VEXG_METADATA_TYPE(std::uint8_t, "uchar", 1);

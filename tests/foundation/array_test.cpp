@@ -61,19 +61,30 @@ TEST(Array, ChangesShapeOnlyInsideForeignMemory) {
   EXPECT_EQ(copy[0], 1);
 }
 
-TEST(Array, IsEmptyAndInvalidWhenMemoryFails) {
-  for (const ArrayDims& dims : {ArrayDims(65536, 65536), ArrayDims(0xFFFFFFF0U, 1)}) {
-    Array<Array<double>> array(ArrayDims(3));
-    if (dims.count != ArrayDims::kTooMany &&
-        sizeof(Array<double>) * std::uint64_t{dims.count} < std::uint64_t{1} << 37) {
-      continue;
-    }
-    EXPECT_FALSE(array.Resize(dims));
-    EXPECT_FALSE(array.IsValid());
-    EXPECT_EQ(array.GetErrorState().code, ObjectErrorOutOfMemory::Code);
-    EXPECT_EQ(array.GetCount(), 0U);
-    EXPECT_EQ(array.GetCapacity(), 0U);
+/// An element that finds no memory beyond the first few.
+struct Scarce {
+  static inline int left = 0;
+  Scarce() {
+    if (left-- == 0) throw std::bad_alloc();
   }
+};
+
+template <typename T>
+void ExpectLosesAll(Array<T>& array, const ArrayDims& dims) {
+  EXPECT_FALSE(array.Resize(dims));
+  EXPECT_FALSE(array.IsValid());
+  EXPECT_EQ(array.GetErrorState().code, ObjectErrorOutOfMemory::Code);
+  EXPECT_EQ(array.GetCount(), 0U);
+  EXPECT_EQ(array.GetCapacity(), 0U);
+}
+
+TEST(Array, IsEmptyAndInvalidWhenMemoryFails) {
+  Scarce::left = 10;
+  Array<Scarce> scarce(ArrayDims(3));
+  ASSERT_TRUE(scarce.IsValid());
+  ExpectLosesAll(scarce, ArrayDims(20));
+  Array<double> huge(ArrayDims(3));
+  ExpectLosesAll(huge, ArrayDims(65536, 65536));  // more than the count can hold
 }
 
 TEST(Array, HasATextForm) {

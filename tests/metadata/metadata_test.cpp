@@ -128,8 +128,7 @@ TEST(Metadata, DescribeHasFixedColumns) {
   const std::string blanks(100, ' ');
   const std::string want = "/box/n/" + blanks.substr(0, 73) + "    = (uchar        1)" +
                            blanks.substr(0, 47) + " = 7\n" + "/m/" + blanks.substr(0, 77) +
-                           "    = (double      2,2)" + blanks.substr(0, 47) +
-                           " = 0.1, 2, 3, 4\n";
+                           "    = (double      2,2)" + blanks.substr(0, 47) + " = 0.1, 2, 3, 4\n";
   EXPECT_EQ(metadata.Describe().ToUTF8(), want);
 }
 

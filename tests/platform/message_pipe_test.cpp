@@ -1,6 +1,7 @@
 #include "platform/message_pipe.h"
 
 #include <fcntl.h>
+#include <latch>
 #include <sys/resource.h>
 #include <sys/socket.h>
 #include <sys/stat.h>
@@ -249,6 +250,13 @@ TEST_F(MessagePipe, SurvivesRunningOutOfDescriptors) {
   ASSERT_NE(listener, nullptr);
   std::vector<std::unique_ptr<RawClient>> waiting;
   for (int i = 0; i < 3; ++i) waiting.push_back(std::make_unique<RawClient>("a"));
+  std::string message;
+  bool ended = false;
+  std::latch limited(1);  // a thread can't be started without descriptors under every sanitizer
+  std::thread server([&] {
+    limited.wait();
+    ended = !listener->Wait(message);
+  });
   rlimit before{};
   ASSERT_EQ(getrlimit(RLIMIT_NOFILE, &before), 0);
   const int next = dup(0);
@@ -256,9 +264,7 @@ TEST_F(MessagePipe, SurvivesRunningOutOfDescriptors) {
   rlimit none = before;
   none.rlim_cur = static_cast<rlim_t>(next);
   ASSERT_EQ(setrlimit(RLIMIT_NOFILE, &none), 0);
-  std::string message;
-  bool ended = false;
-  std::thread server([&] { ended = !listener->Wait(message); });
+  limited.count_down();
   for (const auto& client : waiting) EXPECT_TRUE(client->IsClosed());
   ASSERT_EQ(setrlimit(RLIMIT_NOFILE, &before), 0);
   const auto client = PipeConnection::Connect("a", 0.0);

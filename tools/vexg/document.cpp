@@ -49,8 +49,7 @@ std::string ReadFile(const std::string& file) {
   if (file != "-") {
     opened.open(file, std::ios::binary);
     if (!opened) {
-      throw HostError(kExitUsage,
-                      file + ": can't be opened; name a file, or - for standard input");
+      throw HostError(kExitUsage, file + ": can't be opened; name a file, or - for standard input");
     }
   }
   std::istream& in = file != "-" ? opened : std::cin;

@@ -37,7 +37,9 @@ int Serve(const std::string& name, bool quiet) {
       dispatch.EndNow();
       AbortServedJobs();
     });
-    if (!dispatch.Open()) throw HostError(kExitFailed, WhyNot(dispatch.GetFault(), name));
+    if (!dispatch.Open() && !dispatch.StopRequested()) {
+      throw HostError(kExitFailed, WhyNot(dispatch.GetFault(), name));
+    }
     if (!quiet) Say("serving \"" + name + "\"; end it with vexg stop " + name + " or Ctrl-C");
     dispatch.Run();
     WaitServedJobs();

@@ -1,0 +1,70 @@
+#include "proj_context.h"
+
+#include <mutex>
+#include <unordered_map>
+#include <vector>
+
+#include "georef/coordsys_log.h"
+
+namespace lumo::pe {
+namespace {
+
+constexpr std::size_t kMostTransforms = 128;  // a thread keeps
+
+std::mutex gDirectoryMutex;
+std::string gDirectory;
+
+void LogFromProj(void*, int, const char* text) {
+  LogCoordSys(CoordSysLog::kErrors, "%s", text);
+}
+
+/// What a thread keeps. The transforms go before the context that they belong to.
+struct ThreadState {
+  ThreadState() : context(proj_context_create()) {
+    proj_context_set_enable_network(context, 0);
+    proj_context_use_proj4_init_rules(context, 1);
+    proj_log_func(context, nullptr, LogFromProj);
+    const std::lock_guard lock(gDirectoryMutex);
+    if (gDirectory.empty()) return;
+    // The standard places stay in the list behind the directory.
+    const PJ_INFO info = proj_info();
+    std::vector<const char*> paths{gDirectory.c_str()};
+    for (std::size_t i = 0; i < info.path_count; ++i) paths.push_back(info.paths[i]);
+    proj_context_set_search_paths(context, static_cast<int>(paths.size()), paths.data());
+  }
+  ~ThreadState() {
+    transforms.clear();
+    proj_context_destroy(context);
+  }
+  ThreadState(const ThreadState&) = delete;
+  ThreadState& operator=(const ThreadState&) = delete;
+
+  PJ_CONTEXT* context;
+  std::unordered_map<std::string, PjPtr> transforms;
+};
+
+ThreadState& State() {
+  thread_local ThreadState state;
+  return state;
+}
+
+}  // namespace
+
+void SetDataDirectory(const std::string& directory) {
+  const std::lock_guard lock(gDirectoryMutex);
+  gDirectory = directory;
+}
+
+PJ_CONTEXT* ThreadContext() {
+  return State().context;
+}
+
+PJ* CachedTransform(const std::string& key, const std::function<PjPtr(PJ_CONTEXT*)>& make) {
+  ThreadState& state = State();
+  const auto at = state.transforms.find(key);
+  if (at != state.transforms.end()) return at->second.get();
+  if (state.transforms.size() >= kMostTransforms) state.transforms.clear();
+  return state.transforms.emplace(key, make(state.context)).first->second.get();
+}
+
+}  // namespace lumo::pe

@@ -1,0 +1,38 @@
+# Installs the build into an empty directory and builds a project outside against it, with the CMake
+# package and with pkg-config.
+#   cmake -DBUILD=... -DSOURCE=... -DCXX=... -P install_test.cmake
+set(prefix ${BUILD}/install-test/prefix)
+file(REMOVE_RECURSE ${BUILD}/install-test)
+
+function(run)
+  execute_process(COMMAND ${ARGN} OUTPUT_VARIABLE output ERROR_VARIABLE output RESULT_VARIABLE code)
+  if(NOT code EQUAL 0)
+    message(FATAL_ERROR "${ARGN}\n${output}")
+  endif()
+  set(output "${output}" PARENT_SCOPE)
+endfunction()
+
+function(expect_success program)
+  run(${program})
+  if(NOT output STREQUAL "Success\n")
+    message(FATAL_ERROR "${program} printed ${output}")
+  endif()
+endfunction()
+
+run(${CMAKE_COMMAND} --install ${BUILD} --prefix ${prefix})
+run(${CMAKE_COMMAND} -G Ninja -S ${SOURCE}/tests/install/consumer -B ${BUILD}/install-test/consumer
+    -DCMAKE_PREFIX_PATH=${prefix} -DCMAKE_CXX_COMPILER=${CXX})
+run(${CMAKE_COMMAND} --build ${BUILD}/install-test/consumer)
+expect_success(${BUILD}/install-test/consumer/consumer)
+
+file(GLOB_RECURSE package ${prefix}/*/vexg.pc)
+get_filename_component(packages ${package} DIRECTORY)
+get_filename_component(libraries ${packages} DIRECTORY)
+set(ENV{PKG_CONFIG_PATH} ${packages})
+run(pkg-config --cflags --libs vexg)
+separate_arguments(flags UNIX_COMMAND "${output}")
+run(${CXX} ${SOURCE}/tests/install/consumer/main.cpp -o ${BUILD}/install-test/by-pkg-config ${flags}
+    -Wl,-rpath,${libraries})
+expect_success(${BUILD}/install-test/by-pkg-config)
+
+run(${prefix}/bin/vexg --version)
