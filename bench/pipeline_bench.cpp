@@ -101,7 +101,7 @@ struct Scaling {
 
   template <typename Op>
   bool Chain() {
-    constexpr unsigned kBudget = 1U << 17;
+    constexpr unsigned kBudget = 1U << 20;
     const RasterIteratorPtr<std::int16_t> input(
         new RasterIteratorWide<std::int16_t>(from, 0, kBudget));
     const RasterIteratorPtr<float> output(new RasterIterator<float>(to, input->Dimensions()));
