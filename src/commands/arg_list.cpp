@@ -7,6 +7,10 @@ ArgList::ArgList(unsigned count) : arguments_(ArrayDims(count)) {
     SetErrorState(ArgListError());
     return;
   }
+  Clear();
+}
+
+void ArgList::Clear() {
   const ObjectPtr empty;
   for (Argument& argument : arguments_) argument.object = empty;
 }

@@ -31,6 +31,9 @@ class VEXG_EXPORT ArgList : public ErrorState {
   /// The object at `index`; empty when there is none, or `index` is behind the end.
   ObjectPtr Get(unsigned index) const;
 
+  /// Lets go of every object; the count stays.
+  void Clear();
+
   unsigned GetCount() const { return arguments_.GetCount(); }
 
  private:

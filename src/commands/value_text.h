@@ -19,7 +19,9 @@
 namespace lumo {
 
 /// One word of an enumeration. An enumeration with a text form has a function
-/// `std::span<const EnumWord<E>> WordsOf(E)` in its own namespace.
+/// `std::span<const EnumWord<E>> WordsOf(E)` in its own namespace. Two more functions there are
+/// optional: `E UnknownValueOf(E)`, what a word that is not in the list reads as (0 without it), and
+/// `const char* UnknownWordOf(E)`, how a value that is not in the list is written (as no text).
 template <typename E>
 struct EnumWord {
   const char* word;
@@ -43,13 +45,17 @@ E ReadEnumWord(std::istream& in) {
   for (const EnumWord<E>& entry : WordsOf(E())) {
     if (text == entry.word) return entry.value;
   }
-  return E();
+  if constexpr (requires { UnknownValueOf(E()); }) {
+    return UnknownValueOf(E());
+  } else {
+    return E();
+  }
 }
 
 }  // namespace detail
 
 /// Reads a value of type T from its text form. A text that holds no such value gives T(); a word
-/// that the enumeration lacks gives its value 0.
+/// that the enumeration lacks gives its UnknownValueOf.
 template <typename T>
 T ParseValue(const String& text) {
   std::istringstream in = MakeTextReader(text);
@@ -86,7 +92,11 @@ String FormatValue(const T& value) {
     for (const EnumWord<T>& entry : WordsOf(T())) {
       if (entry.value == value) return entry.word;
     }
-    return {};
+    if constexpr (requires { UnknownWordOf(T()); }) {
+      return UnknownWordOf(T());
+    } else {
+      return {};
+    }
   } else if constexpr (std::is_arithmetic_v<T>) {
     WriteNumber(out, value);
   } else {

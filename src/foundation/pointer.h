@@ -17,6 +17,20 @@ struct ControlBlock {
   void (*destroy)(void*) = nullptr;
 };
 
+/// Base of the classes whose objects can give out a Pointer to themselves, as work does that another
+/// thread is to keep alive: Pointer<T>::ShareOwner(*this) shares the object that a Pointer owns.
+class SelfPointing {
+ public:
+  SelfPointing() = default;
+  SelfPointing(const SelfPointing&) {}  // a copy has an owner of its own
+  SelfPointing& operator=(const SelfPointing&) { return *this; }
+
+ private:
+  template <typename T>
+  friend class Pointer;
+  ControlBlock* owner_ = nullptr;  // of the Pointers that own this object
+};
+
 namespace detail {
 
 /// The base class under which a ControlBlock keeps the address of a T, so that Pointers to any two
@@ -62,6 +76,17 @@ class Pointer {
   /// class derived from T, else asked by IsA. Otherwise, or when `other` is null, empty.
   template <typename U>
   requires(!std::is_same_v<T, U>) Pointer(const Pointer<U>& other) : block_(ShareOrEmpty(other)) {}
+
+  /// Shares the object that holds `self` with the Pointers that own it, which were made from a
+  /// class derived from SelfPointing. Empty when none owns it: on the stack, or wrapped.
+  static Pointer ShareOwner(const SelfPointing& self) {
+    Pointer shared;
+    if (self.owner_ == nullptr) return shared;
+    ++self.owner_->count;
+    shared.Release();
+    shared.block_ = self.owner_;
+    return shared;
+  }
 
   virtual ~Pointer() { Release(); }
 
@@ -109,6 +134,9 @@ class Pointer {
       block->object = root;
       block->noDelete = noDelete;
       block->destroy = [](void* held) { delete static_cast<Root*>(held); };
+      if constexpr (std::is_base_of_v<SelfPointing, T>) {
+        if (object != nullptr && !noDelete) object->SelfPointing::owner_ = block;
+      }
       return block;
     } catch (...) {
       if (!noDelete) delete root;

@@ -1,0 +1,321 @@
+#include "raster/interleave.h"
+
+#include <algorithm>
+#include <array>
+#include <cstdint>
+#include <cstring>
+#include <utility>
+
+namespace lumo {
+namespace {
+
+// A change of interleave is a transposition of pixels by bands, once for the block (BSQ) or once
+// for each line (BIL). It is done in squares of N by N elements that fit the vector registers, N
+// being what 16 bytes hold, and in runs of pixels whose part of both blocks fits the first cache.
+
+template <typename E>
+inline constexpr std::size_t kLanes = 16 / sizeof(E);
+
+/// 16 bytes of E in a vector register.
+template <typename E>
+struct Register {
+  using Lanes [[gnu::vector_size(16)]] = E;
+  Lanes lanes;
+
+  void Load(const E* from) { std::memcpy(&lanes, from, sizeof(lanes)); }
+  void Store(E* to) const { std::memcpy(to, &lanes, sizeof(lanes)); }
+};
+
+/// kLanes rows of kLanes elements.
+template <typename E>
+using Square = std::array<Register<E>, kLanes<E>>;
+
+/// The lower (kHalf 0) or upper (kHalf 1) halves of both, lane by lane in turn.
+template <typename E, std::size_t kHalf, std::size_t... I>
+Register<E> Zip(const Register<E>& a, const Register<E>& b, std::index_sequence<I...>) {
+  constexpr std::size_t kStart = kHalf * kLanes<E> / 2;
+  return {__builtin_shufflevector(a.lanes, b.lanes, (kStart + I / 2 + I % 2 * kLanes<E>)...)};
+}
+
+/// Transposes a square in registers. Zipping the two halves of the rows, once for each bit of the
+/// row number, takes element (i, j) to (j, i).
+template <typename E>
+[[gnu::always_inline]] inline void Transpose(Square<E>& rows) {
+  constexpr std::size_t kN = kLanes<E>;
+  constexpr auto kIndices = std::make_index_sequence<kN>();
+#pragma GCC unroll 4
+  for (std::size_t round = 1; round < kN; round *= 2) {
+    Square<E> zipped;
+#pragma GCC unroll 8
+    for (std::size_t i = 0; i < kN / 2; ++i) {
+      zipped[2 * i] = Zip<E, 0>(rows[i], rows[i + kN / 2], kIndices);
+      zipped[2 * i + 1] = Zip<E, 1>(rows[i], rows[i + kN / 2], kIndices);
+    }
+    rows = zipped;
+  }
+}
+
+/// A matrix of elements: `rows` by `columns`, a row `stride` elements behind the one before.
+template <typename E>
+struct Matrix {
+  E* data;
+  std::size_t stride;
+  E* At(std::size_t row, std::size_t column) const { return data + row * stride + column; }
+};
+
+/// Columns [first, first + kWidth) of N pixels into rows of bands. Reads N columns, also where only
+/// kWidth are wanted.
+template <typename E, std::size_t kWidth>
+void SplitSquare(const Matrix<const E>& pixels, const Matrix<E>& bands, std::size_t pixel,
+                 std::size_t first) {
+  Square<E> square;
+#pragma GCC unroll 16
+  for (std::size_t i = 0; i < kLanes<E>; ++i) square[i].Load(pixels.At(pixel + i, first));
+  Transpose<E>(square);
+#pragma GCC unroll 16
+  for (std::size_t i = 0; i < kWidth; ++i) square[i].Store(bands.At(first + i, pixel));
+}
+
+/// Rows [first, first + kWidth) of bands into columns of N pixels. Writes N columns, also where
+/// only kWidth are wanted: what is written too much is the start of the next pixel, written after.
+template <typename E, std::size_t kWidth>
+void JoinSquare(const Matrix<const E>& bands, const Matrix<E>& pixels, std::size_t pixel,
+                std::size_t first) {
+  Square<E> square;
+#pragma GCC unroll 16
+  for (std::size_t i = 0; i < kLanes<E>; ++i) {
+    if (i < kWidth) {
+      square[i].Load(bands.At(first + i, pixel));
+    } else {
+      square[i] = Register<E>();
+    }
+  }
+  Transpose<E>(square);
+#pragma GCC unroll 16
+  for (std::size_t i = 0; i < kLanes<E>; ++i) square[i].Store(pixels.At(pixel + i, first));
+}
+
+/// Calls one of the square functions for a width from 1 to N that is known only now.
+template <typename E, typename F>
+void ForWidth(std::size_t width, const F& call) {
+  [&]<std::size_t... W>(std::index_sequence<W...>) {
+    (void)((width == W + 1 && (call(std::integral_constant<std::size_t, W + 1>()), true)) || ...);
+  }
+  (std::make_index_sequence<kLanes<E>>());
+}
+
+/// How many pixels to take in one run: as many as leave room in the first cache for a row of each.
+template <typename E>
+std::size_t RunLength(std::size_t bands) {
+  constexpr std::size_t kCacheBytes = 16 * 1024;
+  constexpr std::size_t kLineBytes = 64;
+  const std::size_t fits = kCacheBytes / (bands * sizeof(E));
+  const std::size_t step = std::max(kLanes<E>, kLineBytes / sizeof(E));
+  return std::max(fits / step, std::size_t{1}) * step;
+}
+
+/// Pixel by pixel, for what the squares leave over.
+template <typename E>
+void SplitPlain(const Matrix<const E>& pixels, const Matrix<E>& bands, std::size_t from,
+                std::size_t to, std::size_t bandCount) {
+  for (std::size_t band = 0; band < bandCount; ++band) {
+    for (std::size_t pixel = from; pixel < to; ++pixel) {
+      *bands.At(band, pixel) = *pixels.At(pixel, band);
+    }
+  }
+}
+
+template <typename E>
+void JoinPlain(const Matrix<const E>& bands, const Matrix<E>& pixels, std::size_t from,
+               std::size_t to, std::size_t bandCount) {
+  for (std::size_t pixel = from; pixel < to; ++pixel) {
+    for (std::size_t band = 0; band < bandCount; ++band) {
+      *pixels.At(pixel, band) = *bands.At(band, pixel);
+    }
+  }
+}
+
+/// Where the squares of fewer than N bands end: they reach behind their last pixel, and must not
+/// reach behind the block.
+template <typename E>
+std::size_t NarrowPixels(std::size_t pixels, std::size_t bands) {
+  constexpr std::size_t kN = kLanes<E>;
+  const std::size_t over = (kN - 1) / bands;  // pixels that a square reaches behind
+  return pixels < kN + over ? 0 : (pixels - over) / kN * kN;
+}
+
+/// Calls `square(pixel, first)` so that squares of N pixels by N bands cover everything. The last
+/// ones of a row and of a column are moved back to end with it, and do some elements once more.
+template <typename E, typename F>
+void ForSquares(std::size_t pixelCount, std::size_t bandCount, const F& square) {
+  constexpr std::size_t kN = kLanes<E>;
+  const std::size_t run = RunLength<E>(bandCount);
+  for (std::size_t start = 0; start < pixelCount; start += run) {
+    const std::size_t end = std::min(start + run, pixelCount);
+    for (std::size_t band = 0; band < bandCount; band += kN) {
+      const std::size_t first = std::min(band, bandCount - kN);
+      for (std::size_t pixel = start; pixel < end; pixel += kN) {
+        square(std::min(pixel, pixelCount - kN), first);
+      }
+    }
+  }
+}
+
+/// `pixels` by `bands` into `bands` by `pixels`.
+template <typename E>
+void Split(const E* from, E* to, std::size_t pixelCount, std::size_t bandCount) {
+  constexpr std::size_t kN = kLanes<E>;
+  const Matrix<const E> pixels{from, bandCount};
+  const Matrix<E> bands{to, pixelCount};
+  if (bandCount >= kN && pixelCount >= kN) {
+    ForSquares<E>(pixelCount, bandCount, [&](std::size_t pixel, std::size_t first) {
+      SplitSquare<E, kN>(pixels, bands, pixel, first);
+    });
+    return;
+  }
+  const std::size_t whole = bandCount < kN ? NarrowPixels<E>(pixelCount, bandCount) : 0;
+  ForWidth<E>(bandCount, [&](auto width) {
+    for (std::size_t pixel = 0; pixel < whole; pixel += kN) {
+      SplitSquare<E, width>(pixels, bands, pixel, 0);
+    }
+  });
+  SplitPlain(pixels, bands, whole, pixelCount, bandCount);
+}
+
+/// `bands` by `pixels` into `pixels` by `bands`.
+template <typename E>
+void Join(const E* from, E* to, std::size_t pixelCount, std::size_t bandCount) {
+  constexpr std::size_t kN = kLanes<E>;
+  const Matrix<const E> bands{from, pixelCount};
+  const Matrix<E> pixels{to, bandCount};
+  if (bandCount >= kN && pixelCount >= kN) {
+    ForSquares<E>(pixelCount, bandCount, [&](std::size_t pixel, std::size_t first) {
+      JoinSquare<E, kN>(bands, pixels, pixel, first);
+    });
+    return;
+  }
+  const std::size_t whole = bandCount < kN ? NarrowPixels<E>(pixelCount, bandCount) : 0;
+  ForWidth<E>(bandCount, [&](auto width) {
+    for (std::size_t pixel = 0; pixel < whole; pixel += kN) {
+      JoinSquare<E, width>(bands, pixels, pixel, 0);
+    }
+  });
+  JoinPlain(bands, pixels, whole, pixelCount, bandCount);
+}
+
+/// Elements too large for a square of registers.
+struct Element16 {
+  std::uint64_t halves[2];
+};
+template <>
+inline constexpr std::size_t kLanes<Element16> = 1;
+
+template <>
+void Split(const Element16* from, Element16* to, std::size_t pixelCount, std::size_t bandCount) {
+  const Matrix<const Element16> pixels{from, bandCount};
+  const Matrix<Element16> bands{to, pixelCount};
+  const std::size_t run = RunLength<Element16>(bandCount);
+  for (std::size_t start = 0; start < pixelCount; start += run) {
+    SplitPlain(pixels, bands, start, std::min(start + run, pixelCount), bandCount);
+  }
+}
+
+template <>
+void Join(const Element16* from, Element16* to, std::size_t pixelCount, std::size_t bandCount) {
+  JoinPlain<Element16>({from, pixelCount}, {to, bandCount}, 0, pixelCount, bandCount);
+}
+
+/// BIL to BSQ and back: whole rows change places.
+void MoveRows(const std::byte* from, std::byte* to, std::size_t slow, std::size_t fast,
+              std::size_t rowBytes) {
+  for (std::size_t i = 0; i < slow; ++i) {
+    for (std::size_t j = 0; j < fast; ++j) {
+      std::memcpy(to + (j * slow + i) * rowBytes, from + (i * fast + j) * rowBytes, rowBytes);
+    }
+  }
+}
+
+template <typename E>
+void Convert(const E* from, Interleave fromOrder, E* to, Interleave toOrder, std::size_t samples,
+             std::size_t lines, std::size_t bands) {
+  const bool split = fromOrder == Interleave::BIP;
+  const bool wholeBlock = (split ? toOrder : fromOrder) == Interleave::BSQ;
+  const std::size_t pixels = wholeBlock ? samples * lines : samples;
+  const std::size_t blocks = wholeBlock ? 1 : lines;
+  for (std::size_t block = 0; block < blocks; ++block) {
+    const std::size_t offset = block * pixels * bands;
+    if (split) {
+      Split<E>(from + offset, to + offset, pixels, bands);
+    } else {
+      Join<E>(from + offset, to + offset, pixels, bands);
+    }
+  }
+}
+
+template <typename E>
+void Convert(const void* from, Interleave fromOrder, void* to, Interleave toOrder,
+             std::size_t samples, std::size_t lines, std::size_t bands) {
+  Convert(static_cast<const E*>(from), fromOrder, static_cast<E*>(to), toOrder, samples, lines,
+          bands);
+}
+
+bool IsInterleave(Interleave interleave) {
+  return interleave >= Interleave::None && interleave <= Interleave::BSQ;
+}
+
+}  // namespace
+
+ArrayDims BlockDims(Interleave interleave, unsigned samples, unsigned lines, unsigned bands) {
+  switch (interleave) {
+    case Interleave::None:
+      return ArrayDims(lines, samples);
+    case Interleave::BIP:
+      return ArrayDims(lines, samples, bands);
+    case Interleave::BIL:
+      return ArrayDims(lines, bands, samples);
+    case Interleave::BSQ:
+      return ArrayDims(bands, lines, samples);
+  }
+  return {};
+}
+
+bool ConvertInterleave(const void* from, Interleave fromOrder, void* to, Interleave toOrder,
+                       std::size_t samples, std::size_t lines, std::size_t bands,
+                       std::size_t elementBytes) {
+  if (!IsInterleave(fromOrder) || !IsInterleave(toOrder)) return false;
+  const bool none = fromOrder == Interleave::None || toOrder == Interleave::None;
+  if (none && bands > 1) return false;
+  constexpr std::array<std::size_t, 5> kSizes{1, 2, 4, 8, 16};
+  if (std::ranges::find(kSizes, elementBytes) == kSizes.end()) return false;
+  if (samples == 0 || lines == 0 || bands == 0) return true;
+
+  if (fromOrder == toOrder || bands == 1) {
+    std::memcpy(to, from, samples * lines * bands * elementBytes);
+  } else if (fromOrder == Interleave::BIL && toOrder == Interleave::BSQ) {
+    MoveRows(static_cast<const std::byte*>(from), static_cast<std::byte*>(to), lines, bands,
+             samples * elementBytes);
+  } else if (fromOrder == Interleave::BSQ && toOrder == Interleave::BIL) {
+    MoveRows(static_cast<const std::byte*>(from), static_cast<std::byte*>(to), bands, lines,
+             samples * elementBytes);
+  } else {
+    switch (elementBytes) {
+      case 1:
+        Convert<std::uint8_t>(from, fromOrder, to, toOrder, samples, lines, bands);
+        break;
+      case 2:
+        Convert<std::uint16_t>(from, fromOrder, to, toOrder, samples, lines, bands);
+        break;
+      case 4:
+        Convert<std::uint32_t>(from, fromOrder, to, toOrder, samples, lines, bands);
+        break;
+      case 8:
+        Convert<std::uint64_t>(from, fromOrder, to, toOrder, samples, lines, bands);
+        break;
+      default:
+        Convert<Element16>(from, fromOrder, to, toOrder, samples, lines, bands);
+    }
+  }
+  return true;
+}
+
+}  // namespace lumo

@@ -1,0 +1,25 @@
+#pragma once
+
+#include <cstddef>
+
+#include "raster/raster_enums.h"
+
+namespace lumo {
+
+/// The shape of the array of a pixel block: its axes in the order of the interleave, slowest first.
+/// Without an interleave only lines and samples. An interleave that doesn't exist gives rank 0.
+VEXG_EXPORT ArrayDims BlockDims(Interleave interleave, unsigned samples, unsigned lines,
+                                unsigned bands);
+
+/// Copies a block of samples by lines by bands elements from one order of its axes into another.
+/// The blocks have no gaps and do not overlap. The same call serves pixels and state bytes.
+///
+/// Without an interleave a block has one band, and is the same in every order.
+/// @param elementBytes  1, 2, 4, 8 or 16.
+/// @return false, with nothing written, for another element size, an interleave that doesn't exist,
+///         or more than one band without an interleave.
+VEXG_EXPORT bool ConvertInterleave(const void* from, Interleave fromOrder, void* to,
+                                   Interleave toOrder, std::size_t samples, std::size_t lines,
+                                   std::size_t bands, std::size_t elementBytes);
+
+}  // namespace lumo

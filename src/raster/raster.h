@@ -1,0 +1,177 @@
+#pragma once
+
+#include "foundation/async.h"
+#include "foundation/color.h"
+#include "foundation/sub_rect.h"
+#include "raster/band_values.h"
+#include "raster/tile_dimensions.h"
+
+namespace lumo {
+
+struct PyramidDef;
+struct RasterDef;
+
+/// A grid of Samples() by Lines() by Bands() pixels of one type, evaluated when somebody asks: what
+/// is known of it without its pixel type. Bands are numbered from 0.
+///
+/// Nothing is computed until a block is asked for with Raster<T>::GetSubRect. A source reads or
+/// holds pixels; a view asks the raster that it stands on and changes the answer.
+///
+/// Ownership: held by BasicRasterPtr and RasterPtr<T>, and never copied. A view shares its parent,
+///            which does not know it.
+/// Threads:   every operation may be called on any thread, at the same time.
+/// Failure:   operations give false, 0 or empty. A raster that could not be made has IsValid()
+///            false.
+class VEXG_EXPORT BasicRaster : public Object {
+ public:
+  static const unsigned TypeCode;
+
+  BasicRaster() = default;
+  BasicRaster(const BasicRaster&) = delete;
+  BasicRaster& operator=(const BasicRaster&) = delete;
+
+  bool IsA(unsigned typeCode) const override;
+
+  /// The code of the pixel type, see pixel_types.h.
+  virtual unsigned DataType() const = 0;
+  /// True when PutSubRect can succeed.
+  virtual bool CanWrite() const = 0;
+  /// The description of this raster as it shows itself.
+  virtual RasterDef GetRasterDef() const = 0;
+
+  /// True when a pyramid of any kind can be read.
+  virtual bool PyramidExists() const = 0;
+  virtual PyramidDef GetPyramidDef() const = 0;
+  /// Starts to build a pyramid. Empty when none could be started.
+  virtual AsyncPtr PyramidBuild(const PyramidDef& def, const lumo::TileDimensions& tiles,
+                                const AsyncCallbackPtr& callback) = 0;
+  /// The build that runs now; empty when none does.
+  virtual AsyncPtr PyramidAsync() const = 0;
+  virtual bool PyramidDelete() = 0;
+  /// Builds what is out of date.
+  virtual bool PyramidRefresh() = 0;
+
+  /// True when all statistics of `mask`, bits of StatsMask, are at hand without reading pixels.
+  virtual bool StatsExist(unsigned band, unsigned mask) const = 0;
+  /// Starts to compute statistics in the current mode. Empty when that could not be started.
+  virtual AsyncPtr StatsBuild(const IPC& ipc) = 0;
+  /// The computation that runs now; empty when none does.
+  virtual AsyncPtr StatsAsync() const = 0;
+  virtual void SetStatsMode(lumo::StatsMode mode) = 0;
+  virtual lumo::StatsMode StatsMode() const = 0;
+  /// Stores the statistics through the data source.
+  virtual bool WriteStats() = 0;
+
+  // Statistics of the valid pixels of a band, computed when they are not at hand. 0 on a failure.
+  virtual double Mean(unsigned band, const IPC& ipc) = 0;
+  virtual double Std(unsigned band, const IPC& ipc) = 0;  ///< of a sample: divided by n - 1
+  virtual double Sum(unsigned band, const IPC& ipc) = 0;
+  virtual double Sum2(unsigned band, const IPC& ipc) = 0;  ///< sum of the squares
+  virtual double RMS(unsigned band, const IPC& ipc) = 0;
+  // Between two bands; need StatsMode::kExtended.
+  virtual double SumXY(unsigned band, unsigned otherBand, const IPC& ipc) = 0;
+  virtual double Cov(unsigned band, unsigned otherBand, const IPC& ipc) = 0;
+
+  /// The histogram run that goes on now; empty when none does.
+  virtual AsyncPtr HistogramAsync() const = 0;
+  virtual bool WriteHistogram() = 0;
+
+  virtual unsigned Samples() const = 0;  ///< pixels of a line
+  virtual unsigned Lines() const = 0;
+  virtual unsigned Bands() const = 0;
+
+  virtual bool HasNoDataValue(unsigned band) const = 0;
+  virtual bool HasPalette(unsigned band) const = 0;
+  /// The colour table of a band; empty when it has none.
+  virtual PalettePtr Palette(unsigned band) const = 0;
+  virtual bool WritePalette(unsigned band, const PalettePtr& palette) = 0;
+  virtual bool DeletePalette(unsigned band) = 0;
+
+  /// Sets the preferred blocks, of a raster that has a use for it.
+  virtual void SetTileDimensions(const lumo::TileDimensions& tiles) = 0;
+  /// The native blocks of the source: width and height, the rest 0.
+  virtual lumo::TileDimensions TileDimensions() const = 0;
+
+ protected:
+  /// The default identifier under the name of a class: "{name}@" and the address.
+  URI DefaultURI(const char* className) const;
+};
+
+using BasicRasterPtr = Pointer<BasicRaster>;
+
+template <typename T>
+class Raster;
+template <typename T>
+using RasterPtr = Pointer<Raster<T>>;
+
+/// A raster of pixel type T, one of TwelveTypes.
+template <typename T>
+class Raster : public BasicRaster {
+ public:
+  static const unsigned TypeCode;
+
+  bool IsA(unsigned typeCode) const override {
+    return typeCode == TypeCode || BasicRaster::IsA(typeCode);
+  }
+  unsigned DataType() const override { return kDataTypeOf<T>; }
+
+  /// A raster of a reduced level: each level halves samples and lines. Empty when there is none.
+  virtual RasterPtr<T> PyramidLevel(unsigned level) = 0;
+  /// As PyramidLevel, but only from a pyramid that the library keeps in a file of its own.
+  virtual RasterPtr<T> StoredPyramidLevel(unsigned level) = 0;
+
+  /// Enters known statistics of one band by hand.
+  virtual void SetBandStats(const RasterBandStats<T>& stats) = 0;
+  /// What is at hand, without computing.
+  virtual RasterBandStats<T> BandStats(unsigned band) const = 0;
+  /// How many valid pixels were counted; 0 for a raster that does not count them.
+  virtual std::uint64_t PixelCount(unsigned /*band*/, const IPC& /*ipc*/) { return 0; }
+  virtual T Min(unsigned band, const IPC& ipc) = 0;
+  virtual T Max(unsigned band, const IPC& ipc) = 0;
+
+  /// Enters a known histogram by hand.
+  virtual void SetBandHistogram(const RasterBandHistogram<T>& histogram) = 0;
+  /// All the histograms at hand for the band.
+  virtual Array<RasterBandHistogram<T>> BandHistogram(unsigned band) const = 0;
+  // Start to compute histograms of the values from `lower` to `upper`, both inclusive. Empty when
+  // that could not be started.
+  virtual AsyncPtr HistogramByBinSize(T lower, T upper, double binSize,
+                                      const Array<unsigned>& bands, HistogramSign sign,
+                                      const IPC& ipc) = 0;
+  virtual AsyncPtr HistogramByBinCount(T lower, T upper, unsigned binCount,
+                                       const Array<unsigned>& bands, HistogramSign sign,
+                                       const IPC& ipc) = 0;
+  virtual AsyncPtr HistogramAllBands(T lower, T upper, unsigned binCount, HistogramSign sign,
+                                     const IPC& ipc) = 0;
+
+  virtual T NoDataValue(unsigned band) const = 0;
+
+  /// Reads a block: the one way by which pixels travel.
+  /// @param rect    pixels of this raster; the caller stays within Samples() by Lines().
+  /// @param bands   in the order wanted; one may come twice.
+  /// @param pixels  [out] resized to BlockDims of the block.
+  /// @param state   [out] same shape, bits of PixelValueState; 0 is a valid pixel.
+  /// @return false unless the whole block was delivered; the arrays then mean nothing.
+  virtual bool GetSubRect(const SubRect& rect, const Array<unsigned>& bands, Interleave interleave,
+                          Array<T>& pixels, Array<unsigned char>& state) = 0;
+
+  /// Writes a block; arguments as for GetSubRect, with `state` as the caller holds it, which a
+  /// raster may ignore. @return false unless the whole block was taken.
+  virtual bool PutSubRect(const SubRect& rect, const Array<unsigned>& bands, Interleave interleave,
+                          Array<T>& pixels, Array<unsigned char>& state) = 0;
+};
+
+extern template class VEXG_EXPORT Raster<std::uint8_t>;
+extern template class VEXG_EXPORT Raster<std::int8_t>;
+extern template class VEXG_EXPORT Raster<std::uint16_t>;
+extern template class VEXG_EXPORT Raster<std::int16_t>;
+extern template class VEXG_EXPORT Raster<std::uint32_t>;
+extern template class VEXG_EXPORT Raster<std::int32_t>;
+extern template class VEXG_EXPORT Raster<float>;
+extern template class VEXG_EXPORT Raster<double>;
+extern template class VEXG_EXPORT Raster<std::uint64_t>;
+extern template class VEXG_EXPORT Raster<std::int64_t>;
+extern template class VEXG_EXPORT Raster<Complex<float>>;
+extern template class VEXG_EXPORT Raster<Complex<double>>;
+
+}  // namespace lumo

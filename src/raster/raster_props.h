@@ -1,0 +1,33 @@
+#pragma once
+
+#include "raster/raster_iterator.h"
+
+namespace lumo {
+
+/// What a process needs to know of its input without keeping the raster: its size, and the grid of
+/// an iterator on it.
+class VEXG_EXPORT RasterProps : public Object {
+ public:
+  static const unsigned TypeCode;
+
+  RasterProps(const BasicRaster& raster, const BasicRasterIterator& iterator)
+      : samples(raster.Samples()),
+        lines(raster.Lines()),
+        bands(raster.Bands()),
+        columns(iterator.Columns()),
+        rows(iterator.Rows()),
+        tiles(iterator.Dimensions()) {}
+
+  bool IsA(unsigned typeCode) const override;
+
+  unsigned samples;
+  unsigned lines;
+  unsigned bands;
+  unsigned columns;  ///< tiles in a row of the grid
+  unsigned rows;
+  TileDimensions tiles;
+};
+
+using RasterPropsPtr = Pointer<RasterProps>;
+
+}  // namespace lumo

@@ -1,0 +1,90 @@
+#pragma once
+
+#include <vector>
+
+#include "raster/raster_iterator.h"
+#include "tasks/task.h"
+
+namespace lumo {
+
+/// Tiles that are used again: a tile is free when nobody but the pool holds it any more. It keeps
+/// as many as were in use at once, which in a process are the tokens in flight. Threads: one user;
+/// the tiles may be let go on any thread.
+template <typename T>
+class TilePool {
+ public:
+  /// A tile that nobody else holds; its size and contents are those of its last use.
+  TilePtr<T> Take();
+
+ private:
+  std::vector<TilePtr<T>> tiles_;
+};
+
+/// The first stage of a process over a raster: reads the tiles row by row, left to right, and gives
+/// one in slot 0. Setup arguments: the iterator. Exists for TwelveTypes.
+template <typename T>
+class RasterReadTask final : public SequentialTask {
+ public:
+  explicit RasterReadTask(ArgList& setup);
+  bool Execute(ArgList& args) override;
+
+ private:
+  RasterIteratorPtr<T> iterator_;
+  std::uint64_t tileCount_ = 0;
+  std::uint64_t nextTile_ = 0;
+  unsigned columns_ = 0;
+  TilePool<T> pool_;
+};
+
+/// The last stage of a process that makes a raster: writes the tile in slot 0 at its index. Setup
+/// arguments: the iterator. Exists for TwelveTypes.
+template <typename T>
+class RasterWriteTask final : public SequentialTask {
+ public:
+  explicit RasterWriteTask(ArgList& setup);
+  bool Execute(ArgList& args) override;
+
+ private:
+  RasterIteratorPtr<T> iterator_;
+};
+
+extern template class VEXG_EXPORT TilePool<std::uint8_t>;
+extern template class VEXG_EXPORT TilePool<std::int8_t>;
+extern template class VEXG_EXPORT TilePool<std::uint16_t>;
+extern template class VEXG_EXPORT TilePool<std::int16_t>;
+extern template class VEXG_EXPORT TilePool<std::uint32_t>;
+extern template class VEXG_EXPORT TilePool<std::int32_t>;
+extern template class VEXG_EXPORT TilePool<float>;
+extern template class VEXG_EXPORT TilePool<double>;
+extern template class VEXG_EXPORT TilePool<std::uint64_t>;
+extern template class VEXG_EXPORT TilePool<std::int64_t>;
+extern template class VEXG_EXPORT TilePool<Complex<float>>;
+extern template class VEXG_EXPORT TilePool<Complex<double>>;
+
+extern template class VEXG_EXPORT RasterReadTask<std::uint8_t>;
+extern template class VEXG_EXPORT RasterReadTask<std::int8_t>;
+extern template class VEXG_EXPORT RasterReadTask<std::uint16_t>;
+extern template class VEXG_EXPORT RasterReadTask<std::int16_t>;
+extern template class VEXG_EXPORT RasterReadTask<std::uint32_t>;
+extern template class VEXG_EXPORT RasterReadTask<std::int32_t>;
+extern template class VEXG_EXPORT RasterReadTask<float>;
+extern template class VEXG_EXPORT RasterReadTask<double>;
+extern template class VEXG_EXPORT RasterReadTask<std::uint64_t>;
+extern template class VEXG_EXPORT RasterReadTask<std::int64_t>;
+extern template class VEXG_EXPORT RasterReadTask<Complex<float>>;
+extern template class VEXG_EXPORT RasterReadTask<Complex<double>>;
+
+extern template class VEXG_EXPORT RasterWriteTask<std::uint8_t>;
+extern template class VEXG_EXPORT RasterWriteTask<std::int8_t>;
+extern template class VEXG_EXPORT RasterWriteTask<std::uint16_t>;
+extern template class VEXG_EXPORT RasterWriteTask<std::int16_t>;
+extern template class VEXG_EXPORT RasterWriteTask<std::uint32_t>;
+extern template class VEXG_EXPORT RasterWriteTask<std::int32_t>;
+extern template class VEXG_EXPORT RasterWriteTask<float>;
+extern template class VEXG_EXPORT RasterWriteTask<double>;
+extern template class VEXG_EXPORT RasterWriteTask<std::uint64_t>;
+extern template class VEXG_EXPORT RasterWriteTask<std::int64_t>;
+extern template class VEXG_EXPORT RasterWriteTask<Complex<float>>;
+extern template class VEXG_EXPORT RasterWriteTask<Complex<double>>;
+
+}  // namespace lumo

@@ -1,0 +1,186 @@
+#pragma once
+
+#include "foundation/containers.h"
+#include "raster/pixel_types.h"
+#include "raster/raster_enums.h"
+#include "raster/tile_dimensions.h"
+
+namespace lumo {
+
+/// Two coordinates of a tile: x and y, or column and row.
+using TilePosition = std::pair<unsigned, unsigned>;
+
+/// A block of pixels with a state byte for each pixel and band, pixel-interleaved, with optional
+/// borders around it: what is known of it without its pixel type.
+///
+/// Tile coordinates count from the first pixel inside the borders; in a border they are below 0, or
+/// from Width() and Height() on. Access by coordinates has no bounds check.
+///
+/// Threads: a tile belongs to one thread at a time; parts of one may be worked on in parallel.
+/// Failure: a tile that could not be sized is empty, with ObjectErrorNotConstructed stored.
+class VEXG_EXPORT BasicTile : public Object {
+ public:
+  static const unsigned TypeCode;
+  bool IsA(unsigned typeCode) const override;
+
+  virtual unsigned Width() const { return dimensions_.width; }
+  virtual unsigned Height() const { return dimensions_.height; }
+  virtual unsigned Bands() const { return dimensions_.bands; }
+  virtual unsigned BorderLeft() const { return dimensions_.borderLeft; }
+  virtual unsigned BorderRight() const { return dimensions_.borderRight; }
+  virtual unsigned BorderTop() const { return dimensions_.borderTop; }
+  virtual unsigned BorderBottom() const { return dimensions_.borderBottom; }
+  virtual unsigned BorderClamp() const { return dimensions_.borderClamp; }
+
+  /// The first pixel inside the borders, in raster coordinates.
+  virtual void SetOrigin(const TilePosition& origin) { origin_ = origin; }
+  virtual TilePosition Origin() const { return origin_; }
+  /// Column and row in the grid of the iterator.
+  virtual void SetIndex(const TilePosition& index) { index_ = index; }
+  virtual TilePosition Index() const { return index_; }
+
+  /// Sizes the tile: states become 0, pixels keep whatever the storage holds. Storage is used again
+  /// where it is large enough.
+  /// @return false for a width, height or band count of 0, or a size that can't be had.
+  virtual bool Resize(unsigned width, unsigned height, unsigned bands, unsigned left,
+                      unsigned right, unsigned top, unsigned bottom);
+  virtual bool Resize(unsigned width, unsigned height, unsigned bands, unsigned border);
+  virtual bool Resize(unsigned width, unsigned height, unsigned bands);
+  virtual bool Resize(const TileDimensions& dimensions);
+  virtual TileDimensions Dimensions() const { return dimensions_; }
+
+  // For each bit of the state: set in every band (true without bands), in some band, in one band;
+  // and its changes.
+  virtual bool AllNoData(int x, int y) const;
+  virtual bool AnyNoData(int x, int y) const;
+  virtual bool IsNoData(int x, int y, unsigned band) const;
+  virtual void SetNoData(int x, int y, unsigned band, bool on);
+  virtual void SetNoDataAll(int x, int y, bool on);
+  virtual bool AllMasked(int x, int y) const;
+  virtual bool AnyMasked(int x, int y) const;
+  virtual bool IsMasked(int x, int y, unsigned band) const;
+  virtual void SetMasked(int x, int y, unsigned band, bool on);
+  virtual void SetMaskedAll(int x, int y, bool on);
+  virtual bool AllOutsideROI(int x, int y) const;
+  virtual bool AnyOutsideROI(int x, int y) const;
+  virtual bool IsOutsideROI(int x, int y, unsigned band) const;
+  virtual void SetOutsideROI(int x, int y, unsigned band, bool on);
+  virtual void SetOutsideROIAll(int x, int y, bool on);
+
+  /// The state bytes, in the shape of the pixels.
+  virtual const Array<unsigned char>& StateArray() const { return state_; }
+  virtual Array<unsigned char>& StateArray() { return state_; }
+  virtual void SetPixelState(int x, int y, unsigned band, unsigned char state) {
+    state_[Offset(x, y) + band] = state;
+  }
+  virtual unsigned char PixelState(int x, int y, unsigned band) const {
+    return state_[Offset(x, y) + band];
+  }
+
+  /// Pixels of a whole row, borders included.
+  std::size_t FullWidth() const {
+    return std::size_t{dimensions_.width} + dimensions_.borderLeft + dimensions_.borderRight;
+  }
+  std::size_t FullHeight() const {
+    return std::size_t{dimensions_.height} + dimensions_.borderTop + dimensions_.borderBottom;
+  }
+  /// Where band 0 of pixel (x, y) stands among the pixels and the states.
+  std::size_t Offset(std::int64_t x, std::int64_t y) const {
+    const auto full = static_cast<std::int64_t>(FullWidth());
+    return static_cast<std::size_t>((dimensions_.borderTop + y) * full + dimensions_.borderLeft +
+                                    x) *
+           dimensions_.bands;
+  }
+
+ protected:
+  BasicTile() = default;
+  /// Sizes the pixels; the tile does the rest.
+  virtual bool ResizePixels(const ArrayDims& dims) = 0;
+
+ private:
+  bool Size(const TileDimensions& dimensions);
+
+  TilePosition origin_;
+  TilePosition index_;
+  TileDimensions dimensions_;
+  Array<unsigned char> state_;
+};
+
+/// A block of pixels of type T, one of TwelveTypes. Its storage is an array of lines by samples by
+/// bands, borders included.
+template <typename T>
+class Tile : public BasicTile {
+ public:
+  static const unsigned TypeCode;
+
+  /// An empty tile, to be sized by whoever fills it.
+  Tile() = default;
+  explicit Tile(const TileDimensions& dimensions) { BasicTile::Resize(dimensions); }
+
+  bool IsA(unsigned typeCode) const override {
+    return typeCode == TypeCode || BasicTile::IsA(typeCode);
+  }
+
+  Array<T>& PixelArray() { return pixels_; }
+  const Array<T>& PixelArray() const { return pixels_; }
+
+  T& Pixel(int x, int y, unsigned band) { return pixels_[Offset(x, y) + band]; }
+  const T& Pixel(int x, int y, unsigned band) const { return pixels_[Offset(x, y) + band]; }
+
+ protected:
+  bool ResizePixels(const ArrayDims& dims) final { return pixels_.Resize(dims); }
+
+ private:
+  Array<T> pixels_;
+};
+
+template <typename T>
+using TilePtr = Pointer<Tile<T>>;
+
+/// A tile made in the shape of another one of any pixel type. Its pixels are whatever the storage
+/// holds. Exists for EightTypes.
+template <typename T>
+class TileFromTemplate final : public Tile<T> {
+ public:
+  /// The same dimensions, states and index.
+  explicit TileFromTemplate(const BasicTile& shape);
+  /// The same dimensions but `bands` bands. A state bit of a pixel, borders included, is set in
+  /// every band when it is set in some band of `shape`.
+  TileFromTemplate(const BasicTile& shape, unsigned bands);
+};
+
+/// A tile of one band for neighbourhood work: the width and height of another, with borders of its
+/// own, which reach no further than the other's. A state bit is set when it is set in some band
+/// there. Exists for double.
+template <typename T>
+class TileFromTemplateBorder final : public Tile<T> {
+ public:
+  TileFromTemplateBorder(const BasicTile& shape, unsigned left, unsigned right, unsigned top,
+                         unsigned bottom);
+};
+
+extern template class VEXG_EXPORT Tile<std::uint8_t>;
+extern template class VEXG_EXPORT Tile<std::int8_t>;
+extern template class VEXG_EXPORT Tile<std::uint16_t>;
+extern template class VEXG_EXPORT Tile<std::int16_t>;
+extern template class VEXG_EXPORT Tile<std::uint32_t>;
+extern template class VEXG_EXPORT Tile<std::int32_t>;
+extern template class VEXG_EXPORT Tile<float>;
+extern template class VEXG_EXPORT Tile<double>;
+extern template class VEXG_EXPORT Tile<std::uint64_t>;
+extern template class VEXG_EXPORT Tile<std::int64_t>;
+extern template class VEXG_EXPORT Tile<Complex<float>>;
+extern template class VEXG_EXPORT Tile<Complex<double>>;
+
+extern template class VEXG_EXPORT TileFromTemplate<std::uint8_t>;
+extern template class VEXG_EXPORT TileFromTemplate<std::int8_t>;
+extern template class VEXG_EXPORT TileFromTemplate<std::uint16_t>;
+extern template class VEXG_EXPORT TileFromTemplate<std::int16_t>;
+extern template class VEXG_EXPORT TileFromTemplate<std::uint32_t>;
+extern template class VEXG_EXPORT TileFromTemplate<std::int32_t>;
+extern template class VEXG_EXPORT TileFromTemplate<float>;
+extern template class VEXG_EXPORT TileFromTemplate<double>;
+
+extern template class VEXG_EXPORT TileFromTemplateBorder<double>;
+
+}  // namespace lumo

@@ -1,0 +1,119 @@
+#include "tasks/parallel.h"
+
+#include <oneapi/tbb/blocked_range.h>
+#include <oneapi/tbb/blocked_range2d.h>
+#include <oneapi/tbb/blocked_range3d.h>
+#include <oneapi/tbb/parallel_for.h>
+#include <oneapi/tbb/parallel_invoke.h>
+#include <oneapi/tbb/task_arena.h>
+
+namespace lumo {
+namespace {
+
+/// Hands [begin, end) to `body` piece by piece, with a look at `abort` before each. A piece is at
+/// most 1/256 of the whole range, whatever part of it this is.
+template <typename I, typename F>
+void InPieces(I begin, I end, std::int64_t whole, const AbortFlag* abort, const F& body) {
+  if (abort == nullptr) {
+    body(begin, end);
+    return;
+  }
+  constexpr std::int64_t kPieces = 256;
+  const std::int64_t step = (whole + kPieces - 1) / kPieces;
+  for (std::int64_t at = begin; at < end && !abort->IsSet(); at += step) {
+    body(static_cast<I>(at), static_cast<I>(std::min<std::int64_t>(at + step, end)));
+  }
+}
+
+/// What oneTBB sees of a loop over one dimension.
+template <typename I>
+struct TBBParallelFor {
+  IParallelFor<I>* loop;
+  const AbortFlag* abort;
+
+  void operator()(const tbb::blocked_range<I>& range) const {
+    InPieces(range.begin(), range.end(), std::int64_t{loop->End()} - loop->Begin(), abort,
+             [this](I begin, I end) { loop->Body(begin, end); });
+  }
+};
+
+/// What oneTBB sees of a loop over two dimensions: rows are dimension 0, columns dimension 1.
+template <typename I>
+struct TBBParallelFor2 {
+  IParallelFor2<I>* loop;
+  const AbortFlag* abort;
+
+  void operator()(const tbb::blocked_range2d<I>& range) const {
+    const auto& r0 = range.rows();
+    const auto& r1 = range.cols();
+    InPieces(r1.begin(), r1.end(), std::int64_t{loop->End1()} - loop->Begin1(), abort,
+             [&](I begin, I end) { loop->Body(r0.begin(), r0.end(), begin, end); });
+  }
+};
+
+/// What oneTBB sees of a loop over three dimensions: pages, rows and columns are 0, 1 and 2.
+template <typename I>
+struct TBBParallelFor3 {
+  IParallelFor3<I>* loop;
+  const AbortFlag* abort;
+
+  void operator()(const tbb::blocked_range3d<I>& range) const {
+    const auto& r0 = range.pages();
+    const auto& r1 = range.rows();
+    const auto& r2 = range.cols();
+    InPieces(r1.begin(), r1.end(), std::int64_t{loop->End1()} - loop->Begin1(), abort,
+             [&](I begin, I end) {
+               loop->Body(r0.begin(), r0.end(), begin, end, r2.begin(), r2.end());
+             });
+  }
+};
+
+}  // namespace
+
+template <typename I>
+void RunParallelFor(IParallelFor<I>& loop, unsigned grain, const AbortFlag* abort) {
+  if (loop.Begin() >= loop.End()) return;
+  const tbb::blocked_range<I> range(loop.Begin(), loop.End(), std::max(grain, 1U));
+  tbb::this_task_arena::isolate([&] { tbb::parallel_for(range, TBBParallelFor<I>{&loop, abort}); });
+}
+
+template <typename I>
+void RunParallelFor2(IParallelFor2<I>& loop, unsigned grain, const AbortFlag* abort) {
+  if (loop.Begin0() >= loop.End0() || loop.Begin1() >= loop.End1()) return;
+  const unsigned step = std::max(grain, 1U);
+  const tbb::blocked_range2d<I> range(loop.Begin0(), loop.End0(), step, loop.Begin1(), loop.End1(),
+                                      step);
+  tbb::this_task_arena::isolate([&] {
+    tbb::parallel_for(range, TBBParallelFor2<I>{&loop, abort});
+  });
+}
+
+template <typename I>
+void RunParallelFor3(IParallelFor3<I>& loop, const AbortFlag* abort) {
+  if (loop.Begin0() >= loop.End0() || loop.Begin1() >= loop.End1() ||
+      loop.Begin2() >= loop.End2()) {
+    return;
+  }
+  const tbb::blocked_range3d<I> range(loop.Begin0(), loop.End0(), loop.Begin1(), loop.End1(),
+                                      loop.Begin2(), loop.End2());
+  tbb::this_task_arena::isolate([&] {
+    tbb::parallel_for(range, TBBParallelFor3<I>{&loop, abort});
+  });
+}
+
+void detail::InvokeBoth(WorkRef first, WorkRef second) {
+  tbb::parallel_invoke(first, second);
+}
+
+void detail::Isolated(WorkRef work) {
+  tbb::this_task_arena::isolate(work);
+}
+
+template VEXG_EXPORT void RunParallelFor(IParallelFor<unsigned>&, unsigned, const AbortFlag*);
+template VEXG_EXPORT void RunParallelFor(IParallelFor<int>&, unsigned, const AbortFlag*);
+template VEXG_EXPORT void RunParallelFor2(IParallelFor2<unsigned>&, unsigned, const AbortFlag*);
+template VEXG_EXPORT void RunParallelFor2(IParallelFor2<int>&, unsigned, const AbortFlag*);
+template VEXG_EXPORT void RunParallelFor3(IParallelFor3<unsigned>&, const AbortFlag*);
+template VEXG_EXPORT void RunParallelFor3(IParallelFor3<int>&, const AbortFlag*);
+
+}  // namespace lumo

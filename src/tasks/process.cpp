@@ -1,0 +1,122 @@
+#include "tasks/process.h"
+
+#include <algorithm>
+#include <limits>
+#include <memory>
+#include <new>
+#include <vector>
+
+#include "tasks/pipeline_impl.h"
+#include "tasks/process_stages.h"
+
+namespace lumo {
+
+const AbortFlag* Task::GetAbortFlag() const {
+  return process_ != nullptr ? process_->GetIPC().abort.Get() : nullptr;
+}
+
+TaskDescriptor::TaskDescriptor(TaskFactory* factory, const Array<ArgID>& tokenArgs,
+                               const Array<ArgID>& setupArgs)
+    : factory_(factory), tokenArgs_(tokenArgs), setupArgs_(setupArgs) {
+  CheckArrays();
+}
+
+TaskDescriptor::TaskDescriptor(const TaskDescriptor& other)
+    : ErrorState(other),
+      factory_(other.factory_),
+      tokenArgs_(other.tokenArgs_),
+      setupArgs_(other.setupArgs_) {
+  CheckArrays();
+}
+
+TaskDescriptor& TaskDescriptor::operator=(const TaskDescriptor& other) {
+  ErrorState::operator=(other);
+  factory_ = other.factory_;
+  tokenArgs_ = other.tokenArgs_;
+  setupArgs_ = other.setupArgs_;
+  CheckArrays();
+  return *this;
+}
+
+void TaskDescriptor::CheckArrays() {
+  if (!tokenArgs_.IsValid() || !setupArgs_.IsValid()) SetErrorState(ObjectErrorNotConstructed());
+}
+
+bool BasicProcess::AddTask(unsigned index, const TaskDescriptor& descriptor) {
+  if (!descriptor.IsUsable()) return false;
+  if (index >= GetTaskCount()) {
+    // Resizing in place would lose the stages when memory runs out.
+    Array<TaskDescriptor> longer(tasks_);
+    if (index == ArrayDims::kTooMany || !longer.IsValid() || !longer.Resize(ArrayDims(index + 1))) {
+      SetErrorState(ObjectErrorOutOfMemory());
+      return false;
+    }
+    tasks_ = std::move(longer);
+  }
+  for (const ArgID id : descriptor.GetTokenArgs())
+    tokenArgCount_ = std::max(tokenArgCount_, id + 1);
+  for (const ArgID id : descriptor.GetSetupArgs())
+    setupArgCount_ = std::max(setupArgCount_, id + 1);
+  tasks_[index] = descriptor;
+  return true;
+}
+
+bool BasicProcess::ShouldStop() const {
+  const MutexLock lock = Lock();
+  return stop_ || ipc_.abort->IsSet();
+}
+
+bool BasicProcess::HasFailed() const {
+  const MutexLock lock = Lock();
+  return failed_;
+}
+
+void BasicProcess::TokenEnded(bool valid, bool error) {
+  const MutexLock lock = Lock();
+  if (error) failed_ = true;
+  if (error || !valid) stop_ = true;
+  if (stop_ || totalTokens_ == 0) return;
+  ++done_;
+  ipc_.progress->Update(
+      std::min(1.0, static_cast<double>(done_) / static_cast<double>(totalTokens_)));
+}
+
+void BasicProcess::BeginRun() {
+  const MutexLock lock = Lock();
+  stop_ = false;
+  failed_ = false;
+  done_ = 0;
+  ipc_.progress->Update(0.0);
+}
+
+template <typename Initializer, typename Stage, typename Terminator>
+bool CustomProcess<Initializer, Stage, Terminator>::Run(ArgList& args) {
+  // A chain whose stages could not be placed has nothing that would ever end it.
+  if (args.GetCount() < GetSetupArgCount() || GetTaskCount() == 0) return false;
+  try {
+    std::vector<std::unique_ptr<Stage>> stages;
+    std::vector<ISimplePipelineProcess<TaskToken>*> chain;
+    stages.reserve(GetTaskCount());
+    chain.reserve(GetTaskCount());
+    for (const TaskDescriptor& descriptor : Tasks()) {
+      stages.push_back(std::make_unique<Stage>(*this, descriptor, args));
+      chain.push_back(stages.back().get());
+    }
+    TokenPool pool(GetTokenArgCount());
+    Initializer initializer(*this, pool);
+    Terminator terminator(*this, pool);
+    BeginRun();
+    const bool ran = RunPipeline<TaskToken>(initializer, chain, terminator, GetTaskCount());
+    return ran && !HasFailed();
+  } catch (const std::bad_alloc&) {
+    SetErrorState(ObjectErrorOutOfMemory());
+    return false;
+  }
+}
+
+template bool RunPipeline(IPipelineReader<TaskToken>&,
+                          std::span<ISimplePipelineProcess<TaskToken>* const>,
+                          IPipelineWriter<TaskToken>&, unsigned);
+template class CustomProcess<ProcessInitializer, ProcessTask, ProcessTerminator>;
+
+}  // namespace lumo

@@ -1,0 +1,143 @@
+#pragma once
+
+#include <cstdint>
+
+#include "foundation/locks.h"
+#include "tasks/task.h"
+
+namespace lumo {
+
+/// How a process makes one stage: which task, which arguments of the run its constructor receives,
+/// and which slots of a token its Execute sees.
+///
+/// Ownership: refers to the factory, which outlives the process.
+/// Failure: after a copy for which there was no memory the copy holds ObjectErrorNotConstructed.
+class VEXG_EXPORT TaskDescriptor : public ErrorState {
+ public:
+  TaskDescriptor() = default;
+  /// @param tokenArgs  slots of the token, in the order of the list that Execute receives.
+  /// @param setupArgs  arguments of the run, in the order of the list for the task's constructor.
+  TaskDescriptor(TaskFactory* factory, const Array<ArgID>& tokenArgs,
+                 const Array<ArgID>& setupArgs);
+  TaskDescriptor(const TaskDescriptor& other);
+  TaskDescriptor& operator=(const TaskDescriptor& other);
+
+  /// True when a task can be made: a factory that is ready, and no error.
+  bool IsUsable() const { return !HasError() && factory_ != nullptr && factory_->IsReady(); }
+
+  TaskFactory* GetFactory() const { return factory_; }
+  const Array<ArgID>& GetTokenArgs() const { return tokenArgs_; }
+  const Array<ArgID>& GetSetupArgs() const { return setupArgs_; }
+
+ private:
+  void CheckArrays();
+
+  TaskFactory* factory_ = nullptr;
+  Array<ArgID> tokenArgs_;
+  Array<ArgID> setupArgs_;
+};
+
+/// The unit that flows through a process: the values of one block of work, usually a tile.
+struct TaskToken {
+  explicit TaskToken(unsigned argCount) : args(argCount) {}
+
+  unsigned sequence = 0;  ///< 1 for the first token of a run
+  ArgList args;
+  bool valid = true;   ///< false: no stage is to work on it any more
+  bool error = false;  ///< a stage failed on it
+};
+
+/// What all processes have: their stages, the counts of their arguments, and the state of a run.
+///
+/// Threads: one thread runs it; the stages ask and tell its state from any worker, under its lock.
+class VEXG_EXPORT BasicProcess : public ErrorState, public Lockable {
+ public:
+  explicit BasicProcess(const String& name, const IPC& ipc = {}) : name_(name), ipc_(ipc) {}
+  virtual ~BasicProcess() = default;
+  BasicProcess(const BasicProcess&) = delete;
+  BasicProcess& operator=(const BasicProcess&) = delete;
+
+  /// Runs the chain to its end on this thread. @return false when a stage failed.
+  virtual bool Run(ArgList& args) = 0;
+
+  /// Places a stage. Positions between that are never filled make a chain whose first token fails.
+  /// @return false, with no change, for a descriptor that isn't usable; false with
+  ///         ObjectErrorOutOfMemory stored when the table can't grow.
+  bool AddTask(unsigned index, const TaskDescriptor& descriptor);
+
+  /// The next free argument of the run, from 0.
+  ArgID TakeSetupArg() { return nextSetupArg_++; }
+  /// The next free slot of a token, from 0.
+  ArgID TakeTokenArg() { return nextTokenArg_++; }
+
+  const String& GetName() const { return name_; }
+  unsigned GetTaskCount() const { return tasks_.GetCount(); }
+  unsigned GetTokenArgCount() const { return tokenArgCount_; }
+  unsigned GetSetupArgCount() const { return setupArgCount_; }
+  const IPC& GetIPC() const { return ipc_; }
+
+  /// How many tokens a run will make, which gives it progress; 0 when it isn't known.
+  void SetTotalTokens(std::uint64_t tokens) { totalTokens_ = tokens; }
+  std::uint64_t GetTotalTokens() const { return totalTokens_; }
+
+  /// True when no more tokens are to be made and no stage is to do more work: at the end of the
+  /// data, after a failure, or when the abort flag is set.
+  bool ShouldStop() const;
+  /// Called where a token ends: stops the run for one that isn't valid, fails it for one in error,
+  /// and reports progress for one that was done.
+  void TokenEnded(bool valid, bool error);
+  /// True when a stage failed.
+  bool HasFailed() const;
+
+ protected:
+  /// Clears the state of the run before, and reports progress 0.
+  void BeginRun();
+
+  Array<TaskDescriptor>& Tasks() { return tasks_; }
+
+ private:
+  String name_;
+  Array<TaskDescriptor> tasks_;
+  unsigned tokenArgCount_ = 0;
+  unsigned setupArgCount_ = 0;
+  ArgID nextSetupArg_ = 0;
+  ArgID nextTokenArg_ = 0;
+  std::uint64_t totalTokens_ = 0;
+  IPC ipc_;
+
+  // The state of a run, under the lock.
+  bool stop_ = false;
+  bool failed_ = false;
+  std::uint64_t done_ = 0;
+};
+
+/// A process on three collaborators: Initializer makes the tokens, Stage runs one task, Terminator
+/// takes the tokens back. Exists for those of Process.
+template <typename Initializer, typename Stage, typename Terminator>
+class CustomProcess : public BasicProcess {
+ public:
+  using BasicProcess::BasicProcess;
+
+  /// Makes the tasks, runs the pipeline with as many tokens in flight as there are stages, and
+  /// destroys the tasks. An abort is no failure: the caller looks at the flag.
+  /// @param args  the arguments of the run. False, with no error stored, when they are too few.
+  /// An exception of a task comes out here.
+  bool Run(ArgList& args) override;
+};
+
+class ProcessInitializer;
+class ProcessTask;
+class ProcessTerminator;
+
+extern template class VEXG_EXPORT CustomProcess<ProcessInitializer, ProcessTask, ProcessTerminator>;
+
+/// A chain of tasks through which tokens flow. Each task works on one token at a time, in order;
+/// different tasks work on different tokens at once. Memory stays bounded by the tokens in flight,
+/// which are as many as there are tasks.
+class VEXG_EXPORT Process final
+    : public CustomProcess<ProcessInitializer, ProcessTask, ProcessTerminator> {
+ public:
+  using CustomProcess::CustomProcess;
+};
+
+}  // namespace lumo

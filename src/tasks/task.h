@@ -1,0 +1,105 @@
+#pragma once
+
+#include <new>
+
+#include "commands/arg_list.h"
+#include "foundation/run_controls.h"
+
+namespace lumo {
+
+class BasicProcess;
+
+/// One stage's work in a Process: the object that does it for every token, one after the other.
+///
+/// A derived class takes its objects from the list of setup arguments in its constructor, and
+/// stores TaskErrorBadParams when they are too few or unusable; a task in error fails the first
+/// token that reaches it.
+///
+/// Threads: Execute never overlaps with itself, so a task needs no lock for its own fields. It runs
+///          on any worker, and beside the other stages' tasks; what it shares with them is to be
+///          safe for that.
+class VEXG_EXPORT Task : public ErrorState {
+ public:
+  virtual ~Task() = default;
+  Task(const Task&) = delete;
+  Task& operator=(const Task&) = delete;
+
+  /// Works on one token.
+  /// @param args  the values of the token that the stage is bound to. What is put into a slot goes
+  ///              back to the token.
+  /// @return true when the token is done. False without an error in this task is the end of the
+  ///         data: no more tokens are made. False with an error fails the whole process.
+  ///
+  /// A body that takes long looks at IsAborted() once a row, and returns early when it is set; what
+  /// it returns is then of no consequence.
+  virtual bool Execute(ArgList& args) = 0;
+
+  bool IsValid() const { return !HasError(); }
+  const String& GetName() const { return name_; }
+  /// True when the body runs parallel loops inside. For readers: the pipeline treats both alike.
+  bool IsConcurrent() const { return concurrent_; }
+
+  /// The process that runs this task, and owns it meanwhile; null outside a run.
+  BasicProcess* GetProcess() const { return process_; }
+  void SetProcess(BasicProcess* process) { process_ = process; }
+
+  /// True when the run was asked to abort.
+  bool IsAborted() const { return GetAbortFlag() != nullptr && GetAbortFlag()->IsSet(); }
+  /// The flag that aborts the run, for a parallel loop inside the body; null outside a run.
+  const AbortFlag* GetAbortFlag() const;
+
+ protected:
+  Task(const char* name, bool concurrent) : name_(name), concurrent_(concurrent) {}
+
+ private:
+  String name_;
+  bool concurrent_;
+  BasicProcess* process_ = nullptr;
+};
+
+/// A task whose body is plain code.
+class VEXG_EXPORT SequentialTask : public Task {
+ protected:
+  explicit SequentialTask(const char* name) : Task(name, false) {}
+};
+
+/// A task whose body runs parallel loops over its tile.
+class VEXG_EXPORT ConcurrentTask : public Task {
+ protected:
+  explicit ConcurrentTask(const char* name) : Task(name, true) {}
+};
+
+/// Makes and destroys one kind of task.
+class VEXG_EXPORT TaskFactory {
+ public:
+  virtual bool IsReady() = 0;
+  /// @return a task that Destroy takes back; null when there is no memory for it.
+  virtual Task* Create(ArgList& setupArgs) = 0;
+  /// @return whether the task was valid; false for null.
+  virtual bool Destroy(Task* task) = 0;
+  virtual ~TaskFactory() = default;
+};
+
+/// The factory of T, which is made from a list of setup arguments. A process class holds one for
+/// each of its stages, so that it lives as long as the process that refers to it.
+template <typename T>
+class ManagedTask final : public TaskFactory {
+ public:
+  bool IsReady() override { return true; }
+
+  Task* Create(ArgList& setupArgs) override {
+    try {
+      return new T(setupArgs);
+    } catch (const std::bad_alloc&) {
+      return nullptr;
+    }
+  }
+
+  bool Destroy(Task* task) override {
+    const bool valid = task != nullptr && task->IsValid();
+    delete task;
+    return valid;
+  }
+};
+
+}  // namespace lumo

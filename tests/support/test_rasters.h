@@ -1,0 +1,167 @@
+#pragma once
+
+#include <algorithm>
+#include <atomic>
+#include <chrono>
+#include <mutex>
+#include <thread>
+#include <type_traits>
+#include <vector>
+
+#include "raster/interleave.h"
+#include "raster/raster_view.h"
+
+namespace lumo {
+
+/// The value of a ramp's pixel, which tells its place as far as T can hold it.
+template <typename T>
+T RampValue(std::uint64_t sample, std::uint64_t line, std::uint64_t band) {
+  const std::uint64_t value = sample + 1000 * line + 1'000'000 * band;
+  if constexpr (std::is_arithmetic_v<T>) {
+    return static_cast<T>(value);
+  } else {
+    using Part = decltype(T().real);
+    return {static_cast<Part>(value), static_cast<Part>(band)};
+  }
+}
+
+/// A source for tests: has a size, and no statistics, pyramid or anything else.
+template <typename T>
+class TestRaster : public RasterView<T> {
+ public:
+  TestRaster(unsigned samples, unsigned lines, unsigned bands)
+      : samples_(samples), lines_(lines), bands_(bands) {}
+
+  bool IsValid() const override { return Object::IsValid(); }
+  unsigned Samples() const override { return samples_; }
+  unsigned Lines() const override { return lines_; }
+  unsigned Bands() const override { return bands_; }
+  RasterDef GetRasterDef() const override {
+    RasterDef def;
+    def.samples = samples_;
+    def.lines = lines_;
+    def.bands = bands_;
+    def.dataType = kDataTypeOf<T>;
+    def.tileHeight = tileHeight;
+    return def;
+  }
+  T NoDataValue(unsigned band) const override { return RampValue<T>(77, 0, band); }
+
+  unsigned tileHeight = 0;  // of the description
+
+ private:
+  unsigned samples_;
+  unsigned lines_;
+  unsigned bands_;
+};
+
+/// A ramp that is computed when it is read, so that it may have any size; and that fails, dawdles
+/// or raises an abort flag where it is told to.
+template <typename T>
+class RampRaster final : public TestRaster<T> {
+ public:
+  using TestRaster<T>::TestRaster;
+
+  bool GetSubRect(const SubRect& rect, const Array<unsigned>& bands, Interleave interleave,
+                  Array<T>& pixels, Array<unsigned char>& state) override {
+    const unsigned read = reads++;
+    std::this_thread::sleep_for(delay);
+    if (read == abortAtRead) abort->Set(true);
+    if (read == failAtRead || rect.right >= this->Samples() || rect.bottom >= this->Lines()) {
+      return false;
+    }
+    const auto width = static_cast<unsigned>(rect.Width());
+    const auto height = static_cast<unsigned>(rect.Height());
+    const ArrayDims dims = BlockDims(interleave, width, height, bands.GetCount());
+    if (!pixels.Resize(dims) || !state.Resize(dims)) return false;
+    std::vector<T> bip;
+    bip.reserve(pixels.GetCount());
+    for (unsigned line = rect.top; line <= rect.bottom; ++line)
+      for (unsigned sample = rect.left; sample <= rect.right; ++sample)
+        for (const unsigned band : bands) bip.push_back(RampValue<T>(sample, line, band));
+    std::fill(state.begin(), state.end(), static_cast<unsigned char>(0));
+    return ConvertInterleave(bip.data(), Interleave::BIP, pixels.GetData(), interleave, width,
+                             height, bands.GetCount(), sizeof(T));
+  }
+
+  static constexpr unsigned kNever = 0xFFFFFFFF;
+  std::atomic<unsigned> reads{0};
+  unsigned failAtRead = kNever;
+  unsigned abortAtRead = kNever;
+  AbortFlagPtr abort;
+  std::chrono::microseconds delay{0};
+};
+
+/// Pixels and states in memory, pixel-interleaved, that can be read and written in BIP.
+template <typename T>
+class MemoryTestRaster final : public TestRaster<T> {
+ public:
+  MemoryTestRaster(unsigned samples, unsigned lines, unsigned bands)
+      : TestRaster<T>(samples, lines, bands),
+        pixels(std::size_t{samples} * lines * bands),
+        states(pixels.size()) {}
+
+  bool CanWrite() const override { return true; }
+
+  bool GetSubRect(const SubRect& rect, const Array<unsigned>& bands, Interleave interleave,
+                  Array<T>& block, Array<unsigned char>& state) override {
+    const ArrayDims dims = BlockDims(Interleave::BIP, static_cast<unsigned>(rect.Width()),
+                                     static_cast<unsigned>(rect.Height()), bands.GetCount());
+    if (interleave != Interleave::BIP || !block.Resize(dims) || !state.Resize(dims)) return false;
+    Move(rect, bands, [&](std::size_t at, std::size_t inBlock, std::size_t count) {
+      std::copy_n(&pixels[at], count, &block[inBlock]);
+      std::copy_n(&states[at], count, &state[inBlock]);
+    });
+    return true;
+  }
+
+  bool PutSubRect(const SubRect& rect, const Array<unsigned>& bands, Interleave interleave,
+                  Array<T>& block, Array<unsigned char>& state) override {
+    if (interleave != Interleave::BIP || rect.right >= this->Samples()) return false;
+    Move(rect, bands, [&](std::size_t at, std::size_t inBlock, std::size_t count) {
+      std::copy_n(&block[inBlock], count, &pixels[at]);
+      std::copy_n(&state[inBlock], count, &states[at]);
+    });
+    return true;
+  }
+
+  std::size_t At(std::size_t sample, std::size_t line, std::size_t band) const {
+    return (line * this->Samples() + sample) * this->Bands() + band;
+  }
+
+  std::vector<T> pixels;
+  std::vector<unsigned char> states;
+
+ private:
+  /// Calls `move(place here, place in the block, elements)` for stretches that lie together.
+  template <typename F>
+  void Move(const SubRect& rect, const Array<unsigned>& bands, const F& move) {
+    bool inOrder = bands.GetCount() == this->Bands();
+    for (unsigned i = 0; i < bands.GetCount(); ++i) inOrder = inOrder && bands[i] == i;
+    std::size_t inBlock = 0;
+    for (std::size_t line = rect.top; line <= rect.bottom; ++line) {
+      if (inOrder) {
+        const std::size_t count = rect.Width() * bands.GetCount();
+        move(At(rect.left, line, 0), inBlock, count);
+        inBlock += count;
+        continue;
+      }
+      for (std::size_t sample = rect.left; sample <= rect.right; ++sample)
+        for (const unsigned band : bands) move(At(sample, line, band), inBlock++, 1);
+    }
+  }
+};
+
+template <typename T>
+Pointer<RampRaster<T>> MakeRamp(unsigned samples, unsigned lines, unsigned bands) {
+  return Pointer<RampRaster<T>>(new RampRaster<T>(samples, lines, bands));
+}
+
+template <typename T>
+Array<T> MakeArray(const std::vector<T>& values) {
+  Array<T> array{ArrayDims(static_cast<unsigned>(values.size()))};
+  std::copy(values.begin(), values.end(), array.begin());
+  return array;
+}
+
+}  // namespace lumo
