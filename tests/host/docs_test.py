@@ -45,7 +45,7 @@ class Documents(PipeTest):
         compiler = os.environ["VEXG_CXX"]
         for document in sorted(SOURCE.glob("docs/*.md")):
             for program in blocks(document, "cpp"):
-                if "int main" in program:
+                if "#include" in program:
                     source = program
                 else:
                     includes = ['"foundation/library.h"', '"commands/job_parser.h"', '"commands/job_result.h"']
