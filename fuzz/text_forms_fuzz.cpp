@@ -6,6 +6,9 @@
 
 #include "commands/value_text.h"
 #include "foundation/color.h"
+#include "foundation/sub_rect.h"
+#include "raster/band_values.h"
+#include "raster/tile_dimensions.h"
 
 namespace {
 
@@ -41,5 +44,11 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
   ReadWriteRead<Array<signed char>>(text);
   ReadWriteRead<Array<std::uint64_t>>(text);
   ReadPalette(text);
+  ReadWriteRead<lumo::SubRect>(text);
+  ReadWriteRead<lumo::TileDimensions>(text);
+  ReadWriteRead<lumo::PyramidType>(text);
+  ReadWriteRead<lumo::RasterBandStats<float>>(text);
+  ReadWriteRead<lumo::RasterBandHistogram<std::uint8_t>>(text);
+  ReadWriteRead<lumo::RasterBandHistogram<double>>(text);
   return 0;
 }
