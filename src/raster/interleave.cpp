@@ -132,6 +132,10 @@ void Split(const E* from, E* to, std::size_t pixelCount, std::size_t bandCount) 
   const Matrix<const E> pixels{from, bandCount};
   const Matrix<E> bands{to, pixelCount};
   if (RunNarrow<NarrowSplit, E>(pixels, bands, pixelCount, bandCount)) return;
+  if (pixelCount >= 2 * kN && bandCount >= kN && HasWideRegisters()) {
+    TransposeWide(pixels, bands, pixelCount, bandCount);
+    return;
+  }
   if (bandCount >= kN && pixelCount >= kN) {
     ForSquares<E>(pixelCount, bandCount, [&](std::size_t pixel, std::size_t first) {
       SplitSquare<E, kN>(pixels, bands, pixel, first);
@@ -154,6 +158,10 @@ void Join(const E* from, E* to, std::size_t pixelCount, std::size_t bandCount) {
   const Matrix<const E> bands{from, pixelCount};
   const Matrix<E> pixels{to, bandCount};
   if (RunNarrow<NarrowJoin, E>(bands, pixels, pixelCount, bandCount)) return;
+  if (bandCount >= 2 * kN && pixelCount >= kN && HasWideRegisters()) {
+    TransposeWide(bands, pixels, bandCount, pixelCount);
+    return;
+  }
   if (bandCount >= kN && pixelCount >= kN) {
     ForSquares<E>(pixelCount, bandCount, [&](std::size_t pixel, std::size_t first) {
       JoinSquare<E, kN>(bands, pixels, pixel, first);

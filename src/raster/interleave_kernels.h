@@ -21,10 +21,10 @@ namespace {
 template <typename E>
 inline constexpr std::size_t kLanes = 16 / sizeof(E);
 
-/// 16 bytes of E in a vector register.
-template <typename E>
+/// A vector register of E.
+template <typename E, std::size_t kBytes = 16>
 struct Register {
-  using Lanes [[gnu::vector_size(16)]] = E;
+  using Lanes [[gnu::vector_size(kBytes)]] = E;
   Lanes lanes;
 
   void Load(const E* from) { std::memcpy(&lanes, from, sizeof(lanes)); }
@@ -39,57 +39,66 @@ constexpr std::size_t Log2(std::size_t power) {
   return std::bit_width(power) - 1;
 }
 
-/// The lower (kHalf 0) or upper (kHalf 1) halves of both, lane by lane in turn.
-template <typename E, std::size_t kHalf, std::size_t... I>
-Register<E> Zip(const Register<E>& a, const Register<E>& b, std::index_sequence<I...>) {
-  constexpr std::size_t kStart = kHalf * kLanes<E> / 2;
-  return {__builtin_shufflevector(a.lanes, b.lanes, (kStart + I / 2 + I % 2 * kLanes<E>)...)};
+/// The lower (kHalf 0) or upper (kHalf 1) halves of both, lane by lane in turn. Of wider registers
+/// each 16 bytes for themselves.
+template <std::size_t kHalf, typename E, std::size_t kBytes>
+[[gnu::always_inline]] inline void Zip(const Register<E, kBytes>& a, const Register<E, kBytes>& b,
+                                       Register<E, kBytes>& out) {
+  constexpr std::size_t kN = kLanes<E>;
+  constexpr std::size_t kAll = kBytes / sizeof(E);
+  [&]<std::size_t... I>(std::index_sequence<I...>) __attribute__((always_inline)) {
+    out.lanes = __builtin_shufflevector(
+        a.lanes, b.lanes, (I / kN * kN + kHalf * kN / 2 + I % kN / 2 + I % 2 * kAll)...);
+  }
+  (std::make_index_sequence<kAll>());
 }
 
 /// The even (kOdd 0) or odd (kOdd 1) lanes of both, one after the other.
-template <typename E, std::size_t kOdd, std::size_t... I>
-Register<E> Unzip(const Register<E>& a, const Register<E>& b, std::index_sequence<I...>) {
-  return {__builtin_shufflevector(a.lanes, b.lanes, (2 * I + kOdd)...)};
+template <std::size_t kOdd, typename E>
+[[gnu::always_inline]] inline void Unzip(const Register<E>& a, const Register<E>& b,
+                                         Register<E>& out) {
+  [&]<std::size_t... I>(std::index_sequence<I...>) __attribute__((always_inline)) {
+    out.lanes = __builtin_shufflevector(a.lanes, b.lanes, (2 * I + kOdd)...);
+  }
+  (std::make_index_sequence<kLanes<E>>());
 }
 
 /// The perfect shuffle of all lanes of an even number of registers, `kRounds` times: those of the
-/// first half and those of the second in turn. Lane x goes to 2x modulo (number of lanes - 1).
-template <typename E, std::size_t kRounds, std::size_t kCount>
-[[gnu::always_inline]] inline void ZipRounds(std::array<Register<E>, kCount>& rows) {
-  constexpr auto kIndices = std::make_index_sequence<kLanes<E>>();
+/// first half and those of the second in turn. Lane x goes to 2x modulo (number of lanes - 1), so
+/// that Log2(N) rounds take pixels of kCount bands into rows of bands.
+template <std::size_t kRounds, typename R, std::size_t kCount>
+[[gnu::always_inline]] inline void ZipRounds(std::array<R, kCount>& rows) {
 #pragma GCC unroll 4
   for (std::size_t round = 0; round < kRounds; ++round) {
-    std::array<Register<E>, kCount> zipped;
+    std::array<R, kCount> zipped;
 #pragma GCC unroll 8
     for (std::size_t i = 0; i < kCount / 2; ++i) {
-      zipped[2 * i] = Zip<E, 0>(rows[i], rows[i + kCount / 2], kIndices);
-      zipped[2 * i + 1] = Zip<E, 1>(rows[i], rows[i + kCount / 2], kIndices);
+      Zip<0>(rows[i], rows[i + kCount / 2], zipped[2 * i]);
+      Zip<1>(rows[i], rows[i + kCount / 2], zipped[2 * i + 1]);
     }
     rows = zipped;
   }
 }
 
 /// The way back from ZipRounds. Cheap for elements of 4 bytes and more.
-template <typename E, std::size_t kRounds, std::size_t kCount>
-[[gnu::always_inline]] inline void UnzipRounds(std::array<Register<E>, kCount>& rows) {
-  constexpr auto kIndices = std::make_index_sequence<kLanes<E>>();
+template <std::size_t kRounds, typename R, std::size_t kCount>
+[[gnu::always_inline]] inline void UnzipRounds(std::array<R, kCount>& rows) {
 #pragma GCC unroll 4
   for (std::size_t round = 0; round < kRounds; ++round) {
-    std::array<Register<E>, kCount> unzipped;
+    std::array<R, kCount> unzipped;
 #pragma GCC unroll 8
     for (std::size_t i = 0; i < kCount / 2; ++i) {
-      unzipped[i] = Unzip<E, 0>(rows[2 * i], rows[2 * i + 1], kIndices);
-      unzipped[i + kCount / 2] = Unzip<E, 1>(rows[2 * i], rows[2 * i + 1], kIndices);
+      Unzip<0>(rows[2 * i], rows[2 * i + 1], unzipped[i]);
+      Unzip<1>(rows[2 * i], rows[2 * i + 1], unzipped[i + kCount / 2]);
     }
     rows = unzipped;
   }
 }
 
-/// Transposes a square in registers: the shuffle, once for each bit of the row number, takes
-/// element (i, j) to (j, i).
+/// Transposes a square in registers.
 template <typename E>
 [[gnu::always_inline]] inline void Transpose(Square<E>& rows) {
-  ZipRounds<E, Log2(kLanes<E>)>(rows);
+  ZipRounds<Log2(kLanes<E>)>(rows);
 }
 
 /// A matrix of elements: `rows` by `columns`, a row `stride` elements behind the one before.
@@ -202,7 +211,6 @@ template <typename E>
 [[gnu::target("ssse3")]] void JoinSix(const Matrix<const E>& bands, const Matrix<E>& pixels,
                                       std::size_t pixelCount) {
   constexpr std::size_t kN = kLanes<E>;
-  constexpr auto kIndices = std::make_index_sequence<kN>();
   for (std::size_t start = 0; start < pixelCount; start += kN) {
     const std::size_t pixel = std::min(start, pixelCount - kN);
     std::array<Register<E>, 6> rows;
@@ -211,8 +219,8 @@ template <typename E>
     std::array<Register<E>, 3> high;
 #pragma GCC unroll 3
     for (std::size_t i = 0; i < 3; ++i) {
-      low[i] = Zip<E, 0>(rows[2 * i], rows[2 * i + 1], kIndices);
-      high[i] = Zip<E, 1>(rows[2 * i], rows[2 * i + 1], kIndices);
+      Zip<0>(rows[2 * i], rows[2 * i + 1], low[i]);
+      Zip<1>(rows[2 * i], rows[2 * i + 1], high[i]);
     }
     ShuffleThree<2 * sizeof(E), true>(low);
     ShuffleThree<2 * sizeof(E), true>(high);
@@ -221,8 +229,62 @@ template <typename E>
   }
 }
 
+inline bool HasWideRegisters() {
+  static const bool has = __builtin_cpu_supports("avx2");
+  return has;
+}
+
+/// Transposes 2N rows of N columns: two squares, one in the lower and one in the upper halves of
+/// registers of 32 bytes.
+template <typename E>
+[[gnu::target("avx2"), gnu::always_inline]] inline void TransposeTwoSquares(
+    const Matrix<const E>& from, const Matrix<E>& to, std::size_t row, std::size_t column) {
+  constexpr std::size_t kN = kLanes<E>;
+  std::array<Register<E, 32>, kN> rows;
+#pragma GCC unroll 16
+  for (std::size_t i = 0; i < kN; ++i) {
+    Register<E> lower;
+    Register<E> upper;
+    lower.Load(from.At(row + i, column));
+    upper.Load(from.At(row + kN + i, column));
+    [&]<std::size_t... I>(std::index_sequence<I...>) __attribute__((always_inline)) {
+      rows[i].lanes = __builtin_shufflevector(lower.lanes, upper.lanes, I...);
+    }
+    (std::make_index_sequence<2 * kN>());
+  }
+  ZipRounds<Log2(kN)>(rows);
+#pragma GCC unroll 16
+  for (std::size_t i = 0; i < kN; ++i) rows[i].Store(to.At(column + i, row));
+}
+
+/// Transposes a matrix of 2N rows by N columns or more, in tiles with sides of a cache line. What
+/// goes last in a row or a column is moved back to end with it, and does some elements once more.
+template <typename E>
+[[gnu::target("avx2")]] void TransposeWide(const Matrix<const E>& from, const Matrix<E>& to,
+                                           std::size_t rows, std::size_t columns) {
+  constexpr std::size_t kN = kLanes<E>;
+  constexpr std::size_t kTile = 64 / sizeof(E);
+  for (std::size_t top = 0; top < rows; top += kTile) {
+    const std::size_t bottom = std::min(top + kTile, rows);
+    for (std::size_t left = 0; left < columns; left += kTile) {
+      const std::size_t right = std::min(left + kTile, columns);
+      for (std::size_t row = top; row < bottom; row += 2 * kN) {
+        for (std::size_t column = left; column < right; column += kN) {
+          TransposeTwoSquares(from, to, std::min(row, rows - 2 * kN),
+                              std::min(column, columns - kN));
+        }
+      }
+    }
+  }
+}
+
 #else
 
+inline bool HasWideRegisters() {
+  return false;
+}
+template <typename E>
+void TransposeWide(const Matrix<const E>&, const Matrix<E>&, std::size_t, std::size_t) {}
 inline bool HasByteShuffle() {
   return false;
 }
@@ -245,7 +307,7 @@ struct NarrowSplit {
       ForPixels<E>(pixelCount, [&](std::size_t pixel) {
         std::array<Register<E>, kWidth> rows;
         LoadAll(rows, pixels.At(pixel, 0), kN);
-        ZipRounds<E, Log2(kN)>(rows);
+        ZipRounds<Log2(kN)>(rows);
         StoreAll(rows, bands.At(0, pixel), bands.stride);
       });
       return true;
@@ -269,9 +331,9 @@ struct NarrowJoin {
         std::array<Register<E>, kWidth> rows;
         LoadAll(rows, bands.At(0, pixel), bands.stride);
         if constexpr (kZips) {
-          ZipRounds<E, Log2(kWidth)>(rows);
+          ZipRounds<Log2(kWidth)>(rows);
         } else {
-          UnzipRounds<E, Log2(kN)>(rows);
+          UnzipRounds<Log2(kN)>(rows);
         }
         StoreAll(rows, pixels.At(pixel, 0), kN);
       });
