@@ -132,7 +132,7 @@ void Split(const E* from, E* to, std::size_t pixelCount, std::size_t bandCount) 
   const Matrix<const E> pixels{from, bandCount};
   const Matrix<E> bands{to, pixelCount};
   if (RunNarrow<NarrowSplit, E>(pixels, bands, pixelCount, bandCount)) return;
-  if (pixelCount >= 2 * kN && bandCount >= kN && HasWideRegisters()) {
+  if (pixelCount >= 2 * kN && bandCount >= kN && HasAvx2()) {
     TransposeWide(pixels, bands, pixelCount, bandCount);
     return;
   }
@@ -158,7 +158,7 @@ void Join(const E* from, E* to, std::size_t pixelCount, std::size_t bandCount) {
   const Matrix<const E> bands{from, pixelCount};
   const Matrix<E> pixels{to, bandCount};
   if (RunNarrow<NarrowJoin, E>(bands, pixels, pixelCount, bandCount)) return;
-  if (bandCount >= 2 * kN && pixelCount >= kN && HasWideRegisters()) {
+  if (bandCount >= 2 * kN && pixelCount >= kN && HasAvx2()) {
     TransposeWide(bands, pixels, bandCount, pixelCount);
     return;
   }

@@ -135,8 +135,9 @@ template <typename E, std::size_t kCount>
 
 #if defined(__x86_64__)
 
-inline bool HasByteShuffle() {
-  static const bool has = __builtin_cpu_supports("ssse3");
+/// Whether the machine has the kernels from here on.
+inline bool HasAvx2() {
+  static const bool has = __builtin_cpu_supports("avx2");
   return has;
 }
 
@@ -165,7 +166,7 @@ inline constexpr ThreeMasks kThreeMasks = MakeThreeMasks(kBytes, kJoin);
 
 /// Transposes N pixels of 3 bands in registers.
 template <std::size_t kBytes, bool kJoin, typename E>
-[[gnu::target("ssse3"), gnu::always_inline]] inline void ShuffleThree(
+[[gnu::target("avx2"), gnu::always_inline]] inline void ShuffleThree(
     std::array<Register<E>, 3>& rows) {
   __m128i in[3];
   std::memcpy(&in, &rows, sizeof(in));
@@ -181,8 +182,8 @@ template <std::size_t kBytes, bool kJoin, typename E>
 }
 
 template <typename E>
-[[gnu::target("ssse3")]] void SplitThree(const Matrix<const E>& pixels, const Matrix<E>& bands,
-                                         std::size_t pixelCount) {
+[[gnu::target("avx2")]] void SplitThree(const Matrix<const E>& pixels, const Matrix<E>& bands,
+                                        std::size_t pixelCount) {
   constexpr std::size_t kN = kLanes<E>;
   for (std::size_t start = 0; start < pixelCount; start += kN) {
     const std::size_t pixel = std::min(start, pixelCount - kN);
@@ -194,8 +195,8 @@ template <typename E>
 }
 
 template <typename E>
-[[gnu::target("ssse3")]] void JoinThree(const Matrix<const E>& bands, const Matrix<E>& pixels,
-                                        std::size_t pixelCount) {
+[[gnu::target("avx2")]] void JoinThree(const Matrix<const E>& bands, const Matrix<E>& pixels,
+                                       std::size_t pixelCount) {
   constexpr std::size_t kN = kLanes<E>;
   for (std::size_t start = 0; start < pixelCount; start += kN) {
     const std::size_t pixel = std::min(start, pixelCount - kN);
@@ -208,8 +209,8 @@ template <typename E>
 
 /// Six bands as three of pairs.
 template <typename E>
-[[gnu::target("ssse3")]] void JoinSix(const Matrix<const E>& bands, const Matrix<E>& pixels,
-                                      std::size_t pixelCount) {
+[[gnu::target("avx2")]] void JoinSix(const Matrix<const E>& bands, const Matrix<E>& pixels,
+                                     std::size_t pixelCount) {
   constexpr std::size_t kN = kLanes<E>;
   for (std::size_t start = 0; start < pixelCount; start += kN) {
     const std::size_t pixel = std::min(start, pixelCount - kN);
@@ -229,11 +230,6 @@ template <typename E>
   }
 }
 
-inline bool HasWideRegisters() {
-  static const bool has = __builtin_cpu_supports("avx2");
-  return has;
-}
-
 /// Transposes 2N rows of N columns: two squares, one in the lower and one in the upper halves of
 /// registers of 32 bytes.
 template <typename E>
@@ -243,14 +239,11 @@ template <typename E>
   std::array<Register<E, 32>, kN> rows;
 #pragma GCC unroll 16
   for (std::size_t i = 0; i < kN; ++i) {
-    Register<E> lower;
-    Register<E> upper;
-    lower.Load(from.At(row + i, column));
-    upper.Load(from.At(row + kN + i, column));
-    [&]<std::size_t... I>(std::index_sequence<I...>) __attribute__((always_inline)) {
-      rows[i].lanes = __builtin_shufflevector(lower.lanes, upper.lanes, I...);
-    }
-    (std::make_index_sequence<2 * kN>());
+    const void* lower = from.At(row + i, column);
+    const void* upper = from.At(row + kN + i, column);
+    const __m256i both =
+        _mm256_loadu2_m128i(static_cast<const __m128i*>(upper), static_cast<const __m128i*>(lower));
+    std::memcpy(&rows[i], &both, sizeof(both));
   }
   ZipRounds<Log2(kN)>(rows);
 #pragma GCC unroll 16
@@ -280,14 +273,11 @@ template <typename E>
 
 #else
 
-inline bool HasWideRegisters() {
+inline bool HasAvx2() {
   return false;
 }
 template <typename E>
 void TransposeWide(const Matrix<const E>&, const Matrix<E>&, std::size_t, std::size_t) {}
-inline bool HasByteShuffle() {
-  return false;
-}
 template <typename E>
 void SplitThree(const Matrix<const E>&, const Matrix<E>&, std::size_t) {}
 template <typename E>
@@ -312,8 +302,8 @@ struct NarrowSplit {
       });
       return true;
     } else if constexpr (kWidth == 3 && sizeof(E) <= 2) {
-      if (HasByteShuffle()) SplitThree(pixels, bands, pixelCount);
-      return HasByteShuffle();
+      if (HasAvx2()) SplitThree(pixels, bands, pixelCount);
+      return HasAvx2();
     }
     return false;
   }
@@ -339,11 +329,11 @@ struct NarrowJoin {
       });
       return true;
     } else if constexpr (kWidth == 3 && sizeof(E) <= 2) {
-      if (HasByteShuffle()) JoinThree(bands, pixels, pixelCount);
-      return HasByteShuffle();
+      if (HasAvx2()) JoinThree(bands, pixels, pixelCount);
+      return HasAvx2();
     } else if constexpr (kWidth == 6 && sizeof(E) <= 2) {
-      if (HasByteShuffle()) JoinSix(bands, pixels, pixelCount);
-      return HasByteShuffle();
+      if (HasAvx2()) JoinSix(bands, pixels, pixelCount);
+      return HasAvx2();
     }
     return false;
   }
