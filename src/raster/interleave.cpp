@@ -14,6 +14,7 @@ namespace {
 // A change of interleave is a transposition of pixels by bands, once for the block (BSQ) or once
 // for each line (BIL). It is done in squares of N by N elements that fit the vector registers, N
 // being what 16 bytes hold, and in runs of pixels whose part of both blocks fits the first cache.
+// The commonest few bands and, where the machine can, the many bands have quicker kernels.
 
 /// Columns [first, first + kWidth) of N pixels into rows of bands. Reads N columns, also where only
 /// kWidth are wanted.
@@ -113,8 +114,8 @@ void ForSquares(std::size_t pixelCount, std::size_t bandCount, const F& square) 
   }
 }
 
-/// Fewer bands than N, or 6, each register full of them.
-/// @return false, with nothing done, where there is no such kernel.
+/// Takes the kernel made for just this number of bands.
+/// @return false, with nothing done, where there is none.
 template <template <typename, std::size_t> typename Kernel, typename E, typename From, typename To>
 bool RunNarrow(const From& from, const To& to, std::size_t pixelCount, std::size_t bandCount) {
   constexpr std::size_t kN = kLanes<E>;

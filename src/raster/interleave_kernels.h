@@ -164,7 +164,7 @@ constexpr ThreeMasks MakeThreeMasks(std::size_t bytes, bool join) {
 template <std::size_t kBytes, bool kJoin>
 inline constexpr ThreeMasks kThreeMasks = MakeThreeMasks(kBytes, kJoin);
 
-/// Transposes N pixels of 3 bands in registers.
+/// Transposes N pixels of 3 bands in registers, elements having `kBytes`, or, with `kJoin`, back.
 template <std::size_t kBytes, bool kJoin, typename E>
 [[gnu::target("avx2"), gnu::always_inline]] inline void ShuffleThree(
     std::array<Register<E>, 3>& rows) {
@@ -237,17 +237,18 @@ template <typename E>
     const Matrix<const E>& from, const Matrix<E>& to, std::size_t row, std::size_t column) {
   constexpr std::size_t kN = kLanes<E>;
   std::array<Register<E, 32>, kN> rows;
+  const E* lower = from.At(row, column);
+  const E* upper = from.At(row + kN, column);
 #pragma GCC unroll 16
-  for (std::size_t i = 0; i < kN; ++i) {
-    const void* lower = from.At(row + i, column);
-    const void* upper = from.At(row + kN + i, column);
-    const __m256i both =
-        _mm256_loadu2_m128i(static_cast<const __m128i*>(upper), static_cast<const __m128i*>(lower));
+  for (std::size_t i = 0; i < kN; ++i, lower += from.stride, upper += from.stride) {
+    const __m256i both = _mm256_loadu2_m128i(reinterpret_cast<const __m128i*>(upper),
+                                             reinterpret_cast<const __m128i*>(lower));
     std::memcpy(&rows[i], &both, sizeof(both));
   }
   ZipRounds<Log2(kN)>(rows);
+  E* out = to.At(column, row);
 #pragma GCC unroll 16
-  for (std::size_t i = 0; i < kN; ++i) rows[i].Store(to.At(column + i, row));
+  for (std::size_t i = 0; i < kN; ++i, out += to.stride) rows[i].Store(out);
 }
 
 /// Transposes a matrix of 2N rows by N columns or more, in tiles with sides of a cache line. What
