@@ -6,62 +6,15 @@
 #include <cstring>
 #include <utility>
 
+#include "raster/interleave_kernels.h"
+
 namespace lumo {
 namespace {
 
 // A change of interleave is a transposition of pixels by bands, once for the block (BSQ) or once
 // for each line (BIL). It is done in squares of N by N elements that fit the vector registers, N
 // being what 16 bytes hold, and in runs of pixels whose part of both blocks fits the first cache.
-
-template <typename E>
-inline constexpr std::size_t kLanes = 16 / sizeof(E);
-
-/// 16 bytes of E in a vector register.
-template <typename E>
-struct Register {
-  using Lanes [[gnu::vector_size(16)]] = E;
-  Lanes lanes;
-
-  void Load(const E* from) { std::memcpy(&lanes, from, sizeof(lanes)); }
-  void Store(E* to) const { std::memcpy(to, &lanes, sizeof(lanes)); }
-};
-
-/// kLanes rows of kLanes elements.
-template <typename E>
-using Square = std::array<Register<E>, kLanes<E>>;
-
-/// The lower (kHalf 0) or upper (kHalf 1) halves of both, lane by lane in turn.
-template <typename E, std::size_t kHalf, std::size_t... I>
-Register<E> Zip(const Register<E>& a, const Register<E>& b, std::index_sequence<I...>) {
-  constexpr std::size_t kStart = kHalf * kLanes<E> / 2;
-  return {__builtin_shufflevector(a.lanes, b.lanes, (kStart + I / 2 + I % 2 * kLanes<E>)...)};
-}
-
-/// Transposes a square in registers. Zipping the two halves of the rows, once for each bit of the
-/// row number, takes element (i, j) to (j, i).
-template <typename E>
-[[gnu::always_inline]] inline void Transpose(Square<E>& rows) {
-  constexpr std::size_t kN = kLanes<E>;
-  constexpr auto kIndices = std::make_index_sequence<kN>();
-#pragma GCC unroll 4
-  for (std::size_t round = 1; round < kN; round *= 2) {
-    Square<E> zipped;
-#pragma GCC unroll 8
-    for (std::size_t i = 0; i < kN / 2; ++i) {
-      zipped[2 * i] = Zip<E, 0>(rows[i], rows[i + kN / 2], kIndices);
-      zipped[2 * i + 1] = Zip<E, 1>(rows[i], rows[i + kN / 2], kIndices);
-    }
-    rows = zipped;
-  }
-}
-
-/// A matrix of elements: `rows` by `columns`, a row `stride` elements behind the one before.
-template <typename E>
-struct Matrix {
-  E* data;
-  std::size_t stride;
-  E* At(std::size_t row, std::size_t column) const { return data + row * stride + column; }
-};
+// The commonest few bands and, where the machine can, the many bands have quicker kernels.
 
 /// Columns [first, first + kWidth) of N pixels into rows of bands. Reads N columns, also where only
 /// kWidth are wanted.
@@ -161,12 +114,29 @@ void ForSquares(std::size_t pixelCount, std::size_t bandCount, const F& square) 
   }
 }
 
+/// Takes the kernel made for just this number of bands.
+/// @return false, with nothing done, where there is none.
+template <template <typename, std::size_t> typename Kernel, typename E, typename From, typename To>
+bool RunNarrow(const From& from, const To& to, std::size_t pixelCount, std::size_t bandCount) {
+  constexpr std::size_t kN = kLanes<E>;
+  if (pixelCount < kN) return false;
+  return [&]<std::size_t... W>(std::index_sequence<W...>) {
+    return ((bandCount == W && Kernel<E, W>::Run(from, to, pixelCount)) || ...);
+  }
+  (std::index_sequence<2, 3, 4, 6, 8>());
+}
+
 /// `pixels` by `bands` into `bands` by `pixels`.
 template <typename E>
 void Split(const E* from, E* to, std::size_t pixelCount, std::size_t bandCount) {
   constexpr std::size_t kN = kLanes<E>;
   const Matrix<const E> pixels{from, bandCount};
   const Matrix<E> bands{to, pixelCount};
+  if (RunNarrow<NarrowSplit, E>(pixels, bands, pixelCount, bandCount)) return;
+  if (pixelCount >= 2 * kN && bandCount >= kN && HasAvx2()) {
+    TransposeWide(pixels, bands, pixelCount, bandCount);
+    return;
+  }
   if (bandCount >= kN && pixelCount >= kN) {
     ForSquares<E>(pixelCount, bandCount, [&](std::size_t pixel, std::size_t first) {
       SplitSquare<E, kN>(pixels, bands, pixel, first);
@@ -188,6 +158,11 @@ void Join(const E* from, E* to, std::size_t pixelCount, std::size_t bandCount) {
   constexpr std::size_t kN = kLanes<E>;
   const Matrix<const E> bands{from, pixelCount};
   const Matrix<E> pixels{to, bandCount};
+  if (RunNarrow<NarrowJoin, E>(bands, pixels, pixelCount, bandCount)) return;
+  if (bandCount >= 2 * kN && pixelCount >= kN && HasAvx2()) {
+    TransposeWide(bands, pixels, bandCount, pixelCount);
+    return;
+  }
   if (bandCount >= kN && pixelCount >= kN) {
     ForSquares<E>(pixelCount, bandCount, [&](std::size_t pixel, std::size_t first) {
       JoinSquare<E, kN>(bands, pixels, pixel, first);

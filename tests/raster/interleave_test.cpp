@@ -26,14 +26,19 @@ constexpr Interleave kOrders[] = {Interleave::None, Interleave::BIP, Interleave:
 
 TEST(Interleave, PutsEveryElementWhereTheOrderOfTheAxesSays) {
   std::mt19937 random(3);
-  const std::size_t shapes[][3] = {{1, 1, 1},   {5, 3, 2},  {17, 2, 3},  {33, 3, 4},   {19, 5, 6},
-                                   {64, 2, 15}, {7, 9, 16}, {40, 2, 17}, {23, 3, 200}, {300, 2, 3},
-                                   {1, 50, 7},  {2, 1, 33}, {31, 4, 1}};
+  const std::size_t shapes[][3] = {
+      {1, 1, 1},    {5, 3, 2},    {17, 2, 3},  {33, 3, 4},  {19, 5, 6}, {64, 2, 15}, {7, 9, 16},
+      {40, 2, 17},  {23, 3, 200}, {300, 2, 3}, {1, 50, 7},  {2, 1, 33}, {31, 4, 1},  {15, 1, 3},
+      {16, 1, 3},   {17, 3, 6},   {47, 2, 2},  {16, 1, 4},  {50, 1, 8}, {131, 2, 6}, {67, 2, 64},
+      {70, 1, 131}, {31, 2, 32},  {33, 1, 31}, {16, 2, 35}, {4, 2, 8},  {3, 3, 3}};
   for (const auto& [samples, lines, bands] : shapes) {
     for (const std::size_t bytes : {1, 2, 4, 8, 16}) {
       const std::size_t count = samples * lines * bands;
-      std::vector<unsigned char> from(count * bytes);
-      for (unsigned char& byte : from) byte = static_cast<unsigned char>(random());
+      // One element in front, so that nothing lies on a boundary of 16 bytes; none behind, so that
+      // ASan sees a step outside.
+      std::vector<unsigned char> source((count + 1) * bytes);
+      const unsigned char* from = source.data() + bytes;
+      for (unsigned char& byte : source) byte = static_cast<unsigned char>(random());
       for (const Interleave fromOrder : kOrders) {
         for (const Interleave toOrder : kOrders) {
           SCOPED_TRACE(testing::Message()
@@ -41,9 +46,9 @@ TEST(Interleave, PutsEveryElementWhereTheOrderOfTheAxesSays) {
                        << static_cast<int>(fromOrder) << " to " << static_cast<int>(toOrder));
           const bool possible =
               bands == 1 || (fromOrder != Interleave::None && toOrder != Interleave::None);
-          std::vector<unsigned char> to(count * bytes);  // exact, so that ASan sees a step outside
-          ASSERT_EQ(ConvertInterleave(from.data(), fromOrder, to.data(), toOrder, samples, lines,
-                                      bands, bytes),
+          std::vector<unsigned char> result((count + 1) * bytes);
+          unsigned char* to = result.data() + bytes;
+          ASSERT_EQ(ConvertInterleave(from, fromOrder, to, toOrder, samples, lines, bands, bytes),
                     possible);
           if (!possible) continue;
           for (std::size_t b = 0; b < bands; ++b)
