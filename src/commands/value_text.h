@@ -20,8 +20,8 @@ namespace lumo {
 
 /// One word of an enumeration. An enumeration with a text form has a function
 /// `std::span<const EnumWord<E>> WordsOf(E)` in its own namespace. Two more functions there are
-/// optional: `E UnknownValueOf(E)`, what a word that is not in the list reads as (0 without it), and
-/// `const char* UnknownWordOf(E)`, how a value that is not in the list is written (as no text).
+/// optional: `E UnknownValueOf(E)`, what a word that is not in the list reads as (0 without it),
+/// and `const char* UnknownWordOf(E)`, how a value that is not in the list is written (as no text).
 template <typename E>
 struct EnumWord {
   const char* word;

@@ -17,8 +17,9 @@ struct ControlBlock {
   void (*destroy)(void*) = nullptr;
 };
 
-/// Base of the classes whose objects can give out a Pointer to themselves, as work does that another
-/// thread is to keep alive: Pointer<T>::ShareOwner(*this) shares the object that a Pointer owns.
+/// Base of the classes whose objects can give out a Pointer to themselves, as work does that
+/// another thread is to keep alive: Pointer<T>::ShareOwner(*this) shares the object that a Pointer
+/// owns.
 class SelfPointing {
  public:
   SelfPointing() = default;

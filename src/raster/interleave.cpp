@@ -6,7 +6,7 @@
 #include <cstring>
 #include <utility>
 
-#include "raster/interleave_kernels.h"
+#include "raster/interleave_impl.h"
 
 namespace lumo {
 namespace {

@@ -332,7 +332,7 @@ struct NarrowJoin {
     } else if constexpr (kWidth == 3 && sizeof(E) <= 2) {
       if (HasAvx2()) JoinThree(bands, pixels, pixelCount);
       return HasAvx2();
-    } else if constexpr (kWidth == 6 && sizeof(E) <= 2) {
+    } else if constexpr (kWidth == 6 && sizeof(E) == 1) {
       if (HasAvx2()) JoinSix(bands, pixels, pixelCount);
       return HasAvx2();
     }
