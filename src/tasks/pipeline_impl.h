@@ -3,6 +3,7 @@
 #include <algorithm>
 
 #include <oneapi/tbb/parallel_pipeline.h>
+#include <oneapi/tbb/task.h>
 #include <oneapi/tbb/task_arena.h>
 
 #include "foundation/library.h"
@@ -70,7 +71,14 @@ bool RunPipeline(IPipelineReader<T>& reader, std::span<ISimplePipelineProcess<T>
     chain = chain & tbb::make_filter<T*, T*>(processor.Mode(), processor);
   }
   const auto whole = chain & tbb::make_filter<T*, void>(kInOrder, TBBRPWWriter<T>(writer));
-  tbb::this_task_arena::isolate([&] { tbb::parallel_pipeline(maxTokens, whole); });
+  const auto run = [&] { tbb::parallel_pipeline(maxTokens, whole); };
+  // Inside a stage or a loop of another run, the wait must take up nothing of that. Elsewhere there
+  // is nothing but this pipeline, and the wait helps with the loops of its stages.
+  if (tbb::task::current_context() != nullptr) {
+    tbb::this_task_arena::isolate(run);
+  } else {
+    run();
+  }
   return true;
 }
 
