@@ -44,7 +44,7 @@ class VEXG_EXPORT NamedPipe : public Lockable {
   /// Server side: ends the exchange before and waits for the next client, which has come once its
   /// message is there as a whole. Clients that are silent or slow keep nobody else waiting.
   /// @return false when the name can't be had, after StopListening, and at the end of the process
-  ///         that EndWithClient watches.
+  ///         that EndWithProcess watches.
   bool Listen();
 
   /// Server side: has Create and Listen give false from now on.

@@ -2,6 +2,7 @@
 
 import os
 import pathlib
+import resource
 import socket
 import struct
 import threading
@@ -113,9 +114,6 @@ class Protocol(PipeTest):
 
 class WithoutDescriptors(PipeTest):
     def test_running_out_of_them_refuses_clients_and_kills_nothing(self):
-        import resource
-
-        soft, hard = resource.getrlimit(resource.RLIMIT_NOFILE)
         self.serve(preexec_fn=lambda: resource.setrlimit(resource.RLIMIT_NOFILE, (40, 40)))
         held = []
         for _ in range(60):
@@ -139,7 +137,6 @@ class WithoutDescriptors(PipeTest):
         for pipe in held:
             pipe.close()
         self.assertEqual(vexg_client.Client("test").submit(SUM)["s"]["Result"], "Success")
-        del soft, hard
 
 
 if __name__ == "__main__":
