@@ -1,5 +1,7 @@
 #include "commands/arg_list.h"
 
+#include "foundation/grow_array.h"
+
 namespace lumo {
 
 ArgList::ArgList(unsigned count) : arguments_(ArrayDims(count)) {
@@ -17,14 +19,9 @@ void ArgList::Clear() {
 
 bool ArgList::Set(unsigned index, const ObjectPtr& object) {
   if (object.IsNull()) return false;
-  if (index >= GetCount()) {
-    // Resizing in place would lose the list when memory runs out.
-    Array<Argument> longer(arguments_);
-    if (index == ArrayDims::kTooMany || !longer.IsValid() || !longer.Resize(ArrayDims(index + 1))) {
-      SetErrorState(ArgListError());
-      return false;
-    }
-    arguments_ = std::move(longer);
+  if (!GrowToHold(arguments_, index)) {
+    SetErrorState(ArgListError());
+    return false;
   }
   arguments_[index].object = object;
   return object->IsA(Object::TypeCode);

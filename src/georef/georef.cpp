@@ -126,6 +126,18 @@ void GeoRef::SetCoordinateSystem(const CoordSys& coordSys) {
   Changed();
 }
 
+void GeoRef::Changed() {
+  if (samples_ == 0 || lines_ == 0) return;
+  MapExtent(true);
+  CenterLatitude(true);
+}
+
+Array<double> GeoRef::CachedExtent(GeoRefCache& cache, bool force) const {
+  if (force) cache.SetExtent({});
+  if (!cache.HasExtent() && samples_ != 0 && lines_ != 0) cache.SetExtent(SampleExtent());
+  return cache.ExtentArray();
+}
+
 bool GeoRef::ConvertRect(MapRect& rect, bool (*convert)(const GeoRef&, Array<double>&),
                          const GeoRef& model) {
   double corners[] = {rect.minX, rect.minY, rect.maxX, rect.maxY};

@@ -12,6 +12,7 @@
 namespace lumo {
 
 class GeoRef;
+class GeoRefCache;
 using GeoRefPtr = Pointer<GeoRef>;
 
 /// A rectangle in map units, or in pixels where a model converts it.
@@ -123,8 +124,12 @@ class VEXG_EXPORT GeoRef {
   GeoRef(const GeoRef&) = default;
   GeoRef& operator=(const GeoRef&) = default;
 
-  /// Called when a field has changed.
-  virtual void Changed() = 0;
+  /// Called when a field has changed: fills the caches again when the size is known.
+  void Changed();
+
+  /// The extent in `cache`, computed first when it isn't there.
+  /// @param force  forget what was computed before.
+  Array<double> CachedExtent(GeoRefCache& cache, bool force) const;
 
   /// The shared parts of the conversions: a rectangle, or a point, as an array of points.
   static bool ConvertRect(MapRect& rect, bool (*convert)(const GeoRef&, Array<double>&),

@@ -261,12 +261,6 @@ void RpcGeoRef::SetDimensions(unsigned samples, unsigned lines) {
   pixelSizeY_ = (extent.maxY - extent.minY) / lines;
 }
 
-void RpcGeoRef::Changed() {
-  if (samples_ == 0 || lines_ == 0) return;
-  MapExtent(true);
-  CenterLatitude(true);
-}
-
 double RpcGeoRef::CenterLatitude(bool) const {
   double x = 0, y = 0;
   PixelToMap(samples_ / 2, lines_ / 2, x, y);
@@ -276,9 +270,7 @@ double RpcGeoRef::CenterLatitude(bool) const {
 
 Array<double> RpcGeoRef::MapExtent(bool force) const {
   if (rpc_.lineOffset == RpcCoefficients::kNeverSet) return cache_.ExtentArray();
-  if (force) cache_.SetExtent({});
-  if (!cache_.HasExtent() && samples_ != 0 && lines_ != 0) cache_.SetExtent(SampleExtent());
-  return cache_.ExtentArray();
+  return CachedExtent(cache_, force);
 }
 
 GeoRefPtr RpcGeoRef::SubRectGeoRef(const SubRect& rect) const {

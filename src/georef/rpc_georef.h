@@ -86,8 +86,6 @@ class VEXG_EXPORT RpcGeoRef : public GeoRef {
   void SetGroundCoordinateSystem(const CoordSys& coordSys);
 
  protected:
-  void Changed() override;
-
  private:
   friend class StdRpcGeoRef;
   class Inverse;

@@ -124,12 +124,6 @@ void StdGeoRef::SetDimensions(unsigned samples, unsigned lines) {
   Changed();
 }
 
-void StdGeoRef::Changed() {
-  if (samples_ == 0 || lines_ == 0) return;
-  MapExtent(true);
-  CenterLatitude(true);
-}
-
 double StdGeoRef::CenterLatitude(bool force) const {
   constexpr double kDefaultLatitude = 40.0;
   if (force) cache_.SetCenterLatitude(GeoRefCache::kNoLatitude);
@@ -148,9 +142,7 @@ double StdGeoRef::CenterLatitude(bool force) const {
 }
 
 Array<double> StdGeoRef::MapExtent(bool force) const {
-  if (force) cache_.SetExtent({});
-  if (!cache_.HasExtent() && samples_ != 0 && lines_ != 0) cache_.SetExtent(SampleExtent());
-  return cache_.ExtentArray();
+  return CachedExtent(cache_, force);
 }
 
 GeoRefPtr StdGeoRef::SubRectGeoRef(const SubRect& rect) const {

@@ -28,8 +28,6 @@ class VEXG_EXPORT StdGeoRef : public GeoRef {
   void Read(std::istream& in) override;
 
  protected:
-  void Changed() override;
-
  private:
   /// The model as one affine map; the tie pixel is taken off before and the clamps come after it.
   struct Affine;

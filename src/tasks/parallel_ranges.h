@@ -6,10 +6,11 @@
 
 namespace lumo {
 
-/// A loop over 0 to count.
-class ArrayParallelFor : public IParallelFor<unsigned>, public ParallelResult {
+/// The range 0 to count, for a loop, a reduction or a scan of one dimension.
+template <typename Interface>
+class CountedRange : public Interface, public ParallelResult {
  public:
-  explicit ArrayParallelFor(unsigned count) : count_(count) {}
+  explicit CountedRange(unsigned count) : count_(count) {}
   unsigned Begin() const override { return 0; }
   unsigned End() const override { return count_; }
 
@@ -17,10 +18,17 @@ class ArrayParallelFor : public IParallelFor<unsigned>, public ParallelResult {
   unsigned count_;
 };
 
-/// A loop over 0 to each count.
-class ArrayParallelFor2 : public IParallelFor2<unsigned>, public ParallelResult {
+using ArrayParallelFor = CountedRange<IParallelFor<unsigned>>;
+template <typename R>
+using ArrayParallelReduce = CountedRange<IParallelReduce<R, unsigned>>;
+template <typename R>
+using ArrayParallelScan = CountedRange<IParallelScan<R, unsigned>>;
+
+/// The ranges 0 to each count, for a loop or a reduction of two dimensions.
+template <typename Interface>
+class CountedRange2 : public Interface, public ParallelResult {
  public:
-  ArrayParallelFor2(unsigned count0, unsigned count1) : count0_(count0), count1_(count1) {}
+  CountedRange2(unsigned count0, unsigned count1) : count0_(count0), count1_(count1) {}
   unsigned Begin0() const override { return 0; }
   unsigned Begin1() const override { return 0; }
   unsigned End0() const override { return count0_; }
@@ -30,6 +38,10 @@ class ArrayParallelFor2 : public IParallelFor2<unsigned>, public ParallelResult 
   unsigned count0_;
   unsigned count1_;
 };
+
+using ArrayParallelFor2 = CountedRange2<IParallelFor2<unsigned>>;
+template <typename R>
+using ArrayParallelReduce2 = CountedRange2<IParallelReduce2<R, unsigned>>;
 
 /// A loop over 0 to each count.
 class ArrayParallelFor3 : public IParallelFor3<unsigned>, public ParallelResult {
@@ -64,45 +76,6 @@ class RangeParallelFor2 : public IParallelFor2<int>, public ParallelResult {
   int end0_;
   int begin1_;
   int end1_;
-};
-
-/// A reduction over 0 to count.
-template <typename R>
-class ArrayParallelReduce : public IParallelReduce<R, unsigned>, public ParallelResult {
- public:
-  explicit ArrayParallelReduce(unsigned count) : count_(count) {}
-  unsigned Begin() const override { return 0; }
-  unsigned End() const override { return count_; }
-
- private:
-  unsigned count_;
-};
-
-/// A reduction over 0 to each count.
-template <typename R>
-class ArrayParallelReduce2 : public IParallelReduce2<R, unsigned>, public ParallelResult {
- public:
-  ArrayParallelReduce2(unsigned count0, unsigned count1) : count0_(count0), count1_(count1) {}
-  unsigned Begin0() const override { return 0; }
-  unsigned Begin1() const override { return 0; }
-  unsigned End0() const override { return count0_; }
-  unsigned End1() const override { return count1_; }
-
- private:
-  unsigned count0_;
-  unsigned count1_;
-};
-
-/// A scan over 0 to count.
-template <typename R>
-class ArrayParallelScan : public IParallelScan<R, unsigned>, public ParallelResult {
- public:
-  explicit ArrayParallelScan(unsigned count) : count_(count) {}
-  unsigned Begin() const override { return 0; }
-  unsigned End() const override { return count_; }
-
- private:
-  unsigned count_;
 };
 
 }  // namespace lumo

@@ -6,6 +6,7 @@
 #include <new>
 #include <vector>
 
+#include "foundation/grow_array.h"
 #include "tasks/pipeline_impl.h"
 #include "tasks/process_stages.h"
 
@@ -44,14 +45,9 @@ void TaskDescriptor::CheckArrays() {
 
 bool BasicProcess::AddTask(unsigned index, const TaskDescriptor& descriptor) {
   if (!descriptor.IsUsable()) return false;
-  if (index >= GetTaskCount()) {
-    // Resizing in place would lose the stages when memory runs out.
-    Array<TaskDescriptor> longer(tasks_);
-    if (index == ArrayDims::kTooMany || !longer.IsValid() || !longer.Resize(ArrayDims(index + 1))) {
-      SetErrorState(ObjectErrorOutOfMemory());
-      return false;
-    }
-    tasks_ = std::move(longer);
+  if (!GrowToHold(tasks_, index)) {
+    SetErrorState(ObjectErrorOutOfMemory());
+    return false;
   }
   for (const ArgID id : descriptor.GetTokenArgs())
     tokenArgCount_ = std::max(tokenArgCount_, id + 1);

@@ -102,7 +102,7 @@ TEST(ParallelLoops, LeaveOutTheRestAfterAnAbort) {
   EXPECT_LT(line.visited, 150'000U);
 
   struct Sum : ArrayParallelReduce<double> {
-    Sum() : ArrayParallelReduce(1000) {}
+    Sum() : ArrayParallelReduce<double>(1000) {}
     double Identity() override { return 0; }
     void Join(double& left, const double& right) override { left += right; }
     double Accumulate(unsigned begin, unsigned end) override { return end - begin; }
@@ -135,7 +135,7 @@ TEST(ParallelLoops, LetExceptionsOutAndReportFailures) {
 /// Sums doubles whose sum depends on the order of the additions.
 struct RoundingSum : ArrayParallelReduce2<double> {
   RoundingSum(unsigned columns, unsigned rows, const std::vector<double>& v)
-      : ArrayParallelReduce2(columns, rows), values(v) {}
+      : ArrayParallelReduce2<double>(columns, rows), values(v) {}
   double Identity() override { return 0; }
   void Join(double& left, const double& right) override { left += right; }
   double Accumulate(unsigned b0, unsigned e0, unsigned b1, unsigned e1) override {
@@ -175,7 +175,7 @@ TEST(ParallelReduce, GivesTheSameBitsForAnyNumberOfThreads) {
 
 TEST(ParallelReduce, JoinsLeftToRight) {
   struct Text : ArrayParallelReduce<std::string> {
-    Text() : ArrayParallelReduce(500) {}
+    Text() : ArrayParallelReduce<std::string>(500) {}
     std::string Identity() override { return {}; }
     void Join(std::string& left, const std::string& right) override { left += right; }
     std::string Accumulate(unsigned begin, unsigned end) override {
@@ -199,7 +199,7 @@ TEST(ParallelReduce, JoinsLeftToRight) {
 
 TEST(ParallelScan, WritesPrefixSums) {
   struct Prefix : ArrayParallelScan<long> {
-    explicit Prefix(unsigned count) : ArrayParallelScan(count), out(count) {}
+    explicit Prefix(unsigned count) : ArrayParallelScan<long>(count), out(count) {}
     long Identity() override { return 0; }
     void Join(long& sum, const long& right) override { sum += right; }
     void Assign(long& sum, const long& value) override { sum = value; }
