@@ -2,6 +2,8 @@
 
 #include <exception>
 
+#include "commands/catalog.h"
+#include "foundation/fault.h"
 #include "foundation/library.h"
 #include "platform/clock.h"
 
@@ -40,6 +42,7 @@ ParameterMap& Command::Run(const ParameterMap& inputs, const IPC& ipc) {
     result_ = CommandResult::kAborted;
   } else {
     state_ = CommandState::kRunning;
+    TakeFault();
     result_ = ExecuteGuarded();
   }
   ipc_.progress->Update(1.0);
@@ -117,10 +120,19 @@ CommandResult Command::Succeed() {
 }
 
 CommandResult Command::Fail(const String& reason) {
-  if (reason_.GetLength() == 0) reason_ = reason;
+  const String told = TakeFault();
+  if (reason_.GetLength() == 0) reason_ = reason.GetLength() != 0 ? reason : told;
   SetErrorState(CommandErrorFail());
   state_ = CommandState::kFinished;
   return CommandResult::kFailed;
+}
+
+void Command::CatalogAdd(const ObjectPtr& object) {
+  catalog::Add(object);
+}
+
+ObjectPtr Command::CatalogFind(const URI& uri) {
+  return catalog::Find(uri);
 }
 
 Map<String, CommandFactory*>& GetCommandRegistry() {

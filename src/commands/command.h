@@ -114,9 +114,15 @@ class VEXG_EXPORT Command : public ErrorState {
     Result(name) = MakeText(FormatValue(value));
   }
 
+  /// Adds an object to the catalog, see catalog::Add.
+  static void CatalogAdd(const ObjectPtr& object);
+  /// The object of the catalog, or empty.
+  static ObjectPtr CatalogFind(const URI& uri);
+
   /// Ends the work: state kFinished, result kSuccess.
   CommandResult Succeed();
-  /// Gives up: stores CommandErrorFail, state kFinished, result kFailed. The first reason stays.
+  /// Gives up: stores CommandErrorFail, state kFinished, result kFailed. The first reason stays; a
+  /// call without one takes the fault text of the thread.
   CommandResult Fail(const String& reason = {});
 
   /// The abort flag and progress report of the run in progress.

@@ -175,4 +175,8 @@ MapRect GeoRef::SampleExtent() const {
   return extent;
 }
 
+GeoRefPtr CloneOf(const GeoRefPtr& source) {
+  return source.IsNull() ? GeoRefPtr() : GeoRefPtr(source->Clone());
+}
+
 }  // namespace lumo

@@ -156,6 +156,9 @@ class VEXG_EXPORT GeoRef {
   double rotation_ = 0;  // degrees
 };
 
+/// A copy of its own of what `source` holds; empty when that is.
+VEXG_EXPORT GeoRefPtr CloneOf(const GeoRefPtr& source);
+
 /// The text form: the word "Std", "Rpc" or "StdRpc", a blank, and what Write gives. A null pointer
 /// is "Unknown ".
 VEXG_EXPORT std::ostream& operator<<(std::ostream& out, const GeoRef& geoRef);

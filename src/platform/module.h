@@ -21,6 +21,9 @@ class VEXG_EXPORT Module {
 
   bool IsLoaded() const { return handle_ != nullptr; }
 
+  /// The system's handle of the library; null when it isn't loaded.
+  void* Handle() const { return handle_; }
+
   /// The function that the library exports under `name`, null when there is none.
   template <typename Function>
   Function* Find(const char* name) const {

@@ -1,13 +1,6 @@
 #include "raster/raster_def.h"
 
 namespace lumo {
-namespace {
-
-GeoRefPtr CloneOf(const GeoRefPtr& source) {
-  return source.IsNull() ? GeoRefPtr() : GeoRefPtr(source->Clone());
-}
-
-}  // namespace
 
 RasterDef::RasterDef(const RasterDef& other)
     : noData(other.noData),

@@ -1,0 +1,87 @@
+#include "data/dc_srv.h"
+
+#include <exception>
+
+#include "data/data_manager.h"
+#include "foundation/errors.h"
+#include "foundation/fault.h"
+
+namespace lumo {
+namespace {
+
+class DcSrvCmdExit final : public DcSrvCmd {
+ public:
+  DcSrvCmdExit() : DcSrvCmd(0, "DcSrvCmdExit") {}
+  void Execute(DcSrvContext& context) override { context.exit = true; }
+};
+
+/// Holds the data manager of the thread.
+struct LocalManagerScope {
+  LocalManagerScope() { GetLocalDataManager(); }
+  ~LocalManagerScope() { FreeLocalDataManager(); }
+};
+
+}  // namespace
+
+bool DcSrv::Start() {
+  const std::lock_guard lock(mutex_);
+  if (thread_ != nullptr) return true;
+  thread_ = std::make_unique<Thread>();
+  if (thread_->Start([this] { Serve(queue_); })) return true;
+  thread_.reset();
+  SetErrorState(DcSrvErrorNoThread());
+  return false;
+}
+
+bool DcSrv::Stop() {
+  const std::lock_guard lock(mutex_);
+  if (thread_ == nullptr) return false;
+  DcSrvCmdExit exit;
+  Execute(exit);
+  thread_.reset();
+  return true;
+}
+
+void DcSrv::Execute(DcSrvCmd& cmd) {
+  queue_.Push(&cmd);
+  {
+    std::unique_lock lock(cmd.mutex_);
+    cmd.replied_.wait(lock, [&] { return cmd.done_; });
+  }
+  if (cmd.fault_.GetLength() != 0) SetFault(cmd.fault_);
+}
+
+void DcSrv::Serve(MTQueue<DcSrvCmd*>& queue) {
+  DcSrvCmd* last = nullptr;
+  {
+    const LocalManagerScope manager;
+    DcSrvContext context;
+    while (!context.exit) {
+      queue.Pop(last);
+      Run(*last, context);
+      if (!context.exit) Reply(*last);
+    }
+  }
+  Reply(*last);  // nothing of the source is touched after this
+}
+
+void DcSrv::Run(DcSrvCmd& cmd, DcSrvContext& context) {
+  TakeFault();
+  try {
+    cmd.Execute(context);
+  } catch (const std::exception& thrown) {
+    SetFault(std::string(cmd.name_) + ": " + thrown.what());
+  } catch (...) {
+    SetFault(std::string(cmd.name_) + ": gave up without a reason");
+  }
+  cmd.fault_ = TakeFault();
+}
+
+void DcSrv::Reply(DcSrvCmd& cmd) {
+  // Told under the lock: the caller may destroy the command as soon as it is let in.
+  const std::lock_guard lock(cmd.mutex_);
+  cmd.done_ = true;
+  cmd.replied_.notify_one();
+}
+
+}  // namespace lumo

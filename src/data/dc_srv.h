@@ -1,0 +1,71 @@
+#pragma once
+
+#include <condition_variable>
+#include <mutex>
+
+#include "data/data_connection.h"
+#include "foundation/thread.h"
+
+namespace lumo {
+
+/// What lives on the thread of a source: the one connection of the plug-in.
+struct DcSrvContext {
+  bool exit = false;
+  DataConnectionPtr conn;
+};
+
+/// A call into a source, handed to the source's thread and waited for. It lives on the stack of the
+/// caller.
+class VEXG_EXPORT DcSrvCmd {
+ public:
+  /// @param name  outlives the command.
+  DcSrvCmd(std::int32_t code, const char* name) : code_(code), name_(name) {}
+  virtual ~DcSrvCmd() = default;
+
+  /// The call; runs on the source's thread.
+  virtual void Execute(DcSrvContext& context) = 0;
+
+  std::int32_t Code() const { return code_; }
+  const char* Name() const { return name_; }
+
+ private:
+  friend class DcSrv;
+
+  const std::int32_t code_;
+  const char* const name_;
+  std::mutex mutex_;
+  std::condition_variable replied_;
+  bool done_ = false;  // the reply
+  String fault_;       // what the thread told while it ran this
+};
+
+/// The thread of one open source, and the queue by which calls reach it. All calls into a plug-in's
+/// connection run here, one at a time and in the order of the queue.
+///
+/// Threads: any number of threads may Execute. A plug-in that is being called must not wait for its
+///          own source: that call would queue behind the running one for ever.
+class VEXG_EXPORT DcSrv : public ErrorState {
+ public:
+  /// Starts the thread unless it runs. False, with DcSrvErrorNoThread stored, when the system gives
+  /// none.
+  bool Start();
+
+  /// Ends the thread: its connection and its data manager are gone when this returns. False when
+  /// there is no thread.
+  bool Stop();
+
+  /// Runs `cmd` on the thread and waits for it. An exception out of the plug-in ends there. The
+  /// fault text of the call becomes this thread's. Start must have succeeded.
+  void Execute(DcSrvCmd& cmd);
+
+ private:
+  static void Serve(MTQueue<DcSrvCmd*>& queue);
+  static void Run(DcSrvCmd& cmd, DcSrvContext& context);
+  static void Reply(DcSrvCmd& cmd);
+
+  MTQueue<DcSrvCmd*> queue_;
+  std::unique_ptr<Thread> thread_;
+  std::mutex mutex_;  // guards the start and the stop
+};
+
+}  // namespace lumo

@@ -1,0 +1,135 @@
+#include <exception>
+#include <filesystem>
+#include <vector>
+
+#include "data/data_manager.h"
+#include "data/mt_connection.h"
+#include "foundation/fault.h"
+
+namespace lumo {
+namespace {
+
+/// What `call` gives; its default, with the fault told, when the plug-in throws.
+template <typename Call>
+auto Guarded(Call&& call) -> decltype(call()) {
+  try {
+    return call();
+  } catch (const std::exception& thrown) {
+    SetFault(std::string("the plug-in failed: ") + thrown.what());
+  } catch (...) {
+    SetFault("the plug-in failed without a reason");
+  }
+  return {};
+}
+
+DataConnectionPtr TryConnect(DataConnectionFactory& factory, const Array<String>& connStrings,
+                             const GeoRefPtr& geoRef, const MetadataPtr& metadata) {
+  return Guarded([&] { return factory.Connect(connStrings, geoRef, metadata); });
+}
+
+/// The factories that recognise the source, in the order of the table.
+std::vector<DataConnectionFactory*> FindWilling(const Array<String>& connStrings) {
+  std::vector<DataConnectionFactory*> willing;
+  for (std::uint32_t row = 0; row < kFormatCount; ++row) {
+    LoadFormat(row);
+    DataConnectionFactory* const factory = GetFactory(gCdfFormatRecords[row]);
+    if (factory == nullptr) continue;
+    if (Guarded([&] { return factory->CanConnect(connStrings); })) willing.push_back(factory);
+  }
+  return willing;
+}
+
+/// Why no format recognises a source, in one line.
+String DescribeUnrecognised(const Array<String>& connStrings) {
+  if (connStrings.GetCount() == 0) return "no source named";
+  const std::string name = connStrings[0].ToUTF8();
+  std::error_code fault;
+  const auto status = std::filesystem::status(name, fault);
+  if (fault && status.type() != std::filesystem::file_type::not_found) {
+    return name + ": " + fault.message();
+  }
+  if (!std::filesystem::exists(status)) return name + ": no such file";
+  if (std::filesystem::is_directory(status)) return name + ": is a directory in no known format";
+  if (std::filesystem::is_regular_file(status) && std::filesystem::file_size(name, fault) == 0) {
+    return name + ": the file is empty";
+  }
+  return name + ": in no known format";
+}
+
+template <typename Proxy>
+DataConnectionPtr ConnectProxy(const Array<String>& connStrings, const GeoRefPtr& geoRef,
+                               const MetadataPtr& metadata) {
+  const DataConnectionPtr proxy(new Proxy);
+  return proxy->Connect(connStrings, geoRef, metadata) ? proxy : DataConnectionPtr();
+}
+
+}  // namespace
+
+DataConnectionPtr MtDataConnectionFactory::ConnectDirect(const Array<String>& connStrings,
+                                                         const GeoRefPtr& geoRef,
+                                                         const MetadataPtr& metadata) {
+  const String name = FindFormatName(connStrings);
+  if (name.GetLength() != 0) {
+    DataConnectionFactory* const factory = FactoryForFormat(name);
+    if (factory == nullptr) return {};
+    return TryConnect(*factory, connStrings, geoRef, metadata);
+  }
+  const std::vector<DataConnectionFactory*> willing = FindWilling(connStrings);
+  TakeFault();  // of rows that don't load: they are none of this source's
+  if (willing.empty()) SetFault(DescribeUnrecognised(connStrings));
+  if (willing.size() == 1) {
+    const DataConnectionPtr made = TryConnect(*willing.front(), connStrings, geoRef, metadata);
+    if (made) return made;
+  }
+  for (DataConnectionFactory* const factory : willing) {
+    const DataConnectionPtr made = TryConnect(*factory, connStrings, geoRef, MetadataPtr());
+    if (made) return made;
+  }
+  return {};
+}
+
+DataConnectionPtr MtDataConnectionFactory::CreateRasterDirect(const Array<String>& connStrings,
+                                                              const RasterDef& def) {
+  Array<String> rest;
+  RemoveFormatNames(connStrings, rest);
+  DataConnectionFactory* const factory = FactoryForFormat(def.format);
+  if (factory == nullptr) return {};
+  return Guarded([&] { return factory->CreateRaster(rest, def); });
+}
+
+DataConnectionPtr MtDataConnectionFactory::CreateVectorDirect(const Array<String>& connStrings,
+                                                              const VectorDef& def) {
+  Array<String> rest;
+  RemoveFormatNames(connStrings, rest);
+  DataConnectionFactory* const factory = FactoryForFormat(def.format);
+  if (factory == nullptr) return {};
+  return Guarded([&] { return factory->CreateVector(rest, def); });
+}
+
+DataConnectionPtr MtDataConnectionFactory::Connect(const Array<String>& connStrings,
+                                                   const GeoRefPtr& geoRef,
+                                                   const MetadataPtr& metadata) {
+  const FormatRecord* const record = FindFormat(FindFormatName(connStrings));
+  std::int32_t kind = record != nullptr ? record->kind : 0;
+  if (kind == 0) {
+    const DataConnectionPtr probe = ConnectDirect(connStrings, geoRef, metadata);
+    if (!probe) return {};
+    kind = Guarded([&] { return probe->DataSourceType(); });
+  }
+  switch (static_cast<DataSourceKind>(kind)) {
+    case DataSourceKind::kRaster:
+      return ConnectProxy<MtRasterDataConnection>(connStrings, geoRef, metadata);
+    case DataSourceKind::kVector:
+      return ConnectProxy<MtVectorDataConnection>(connStrings, geoRef, metadata);
+    default:
+      return {};
+  }
+}
+
+DataConnectionPtr MtDataConnectionFactory::CreateRaster(const Array<String>& connStrings,
+                                                        const RasterDef& def) {
+  const RasterDataConnectionPtr proxy(new MtRasterDataConnection);
+  return proxy->CreateRaster(connStrings, def) ? DataConnectionPtr(proxy) : DataConnectionPtr();
+}
+
+}  // namespace lumo

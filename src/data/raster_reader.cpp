@@ -1,0 +1,18 @@
+#include "data/raster_reader_impl.h"
+
+namespace lumo {
+
+template class RasterReader<std::uint8_t>;
+template class RasterReader<std::int8_t>;
+template class RasterReader<std::uint16_t>;
+template class RasterReader<std::int16_t>;
+template class RasterReader<std::uint32_t>;
+template class RasterReader<std::int32_t>;
+template class RasterReader<float>;
+template class RasterReader<double>;
+template class RasterReader<std::uint64_t>;
+template class RasterReader<std::int64_t>;
+template class RasterReader<Complex<float>>;
+template class RasterReader<Complex<double>>;
+
+}  // namespace lumo

@@ -1,0 +1,161 @@
+#pragma once
+
+#include <tuple>
+
+#include "data/data_connection.h"
+#include "foundation/color.h"
+#include "foundation/errors.h"
+#include "foundation/sub_rect.h"
+#include "raster/band_values.h"
+#include "raster/tile_dimensions.h"
+
+namespace lumo {
+
+/// What can be asked of a raster source without its pixel type. Level 0 is the source itself, each
+/// further one a stored reduction. See data_connection.h for threads and failure.
+class VEXG_EXPORT BasicRasterReader {
+ public:
+  using PointerRoot = BasicRasterReader;
+
+  /// The reader is usable.
+  virtual bool OpBool() = 0;
+  /// The plug-in's own number for this kind of reader; nothing here reads it.
+  virtual std::int32_t ReaderType() = 0;
+  virtual lumo::RasterDef RasterDef() = 0;
+  virtual unsigned Samples(unsigned level) = 0;
+  virtual unsigned Lines(unsigned level) = 0;
+  virtual unsigned Bands() = 0;
+
+  virtual std::int32_t PyramidType() = 0;              ///< a lumo::PyramidType
+  virtual std::int32_t PyramidResamplingMethod() = 0;  ///< a lumo::PyramidResamplingMethod
+  virtual std::int32_t PyramidLevelMin() = 0;
+  virtual std::int32_t PyramidLevelMax() = 0;
+  virtual bool PyramidExists() = 0;
+  /// Makes the levels `levelMin` to `levelMax` inside the source.
+  virtual bool PyramidBuild(std::int32_t resamplingMethod, std::int32_t levelMin,
+                            std::int32_t levelMax, const TileDimensions& tiles) = 0;
+  virtual bool PyramidRebuild() = 0;
+  virtual bool PyramidDelete() = 0;
+  virtual bool PyramidRefresh() = 0;
+
+  /// The statistics that the source can keep, bits of lumo::StatsMask.
+  virtual std::int32_t StatsMask() = 0;
+  /// True when the source holds statistics of the band now.
+  virtual bool StatsExist(unsigned band) = 0;
+  virtual bool CanWriteStats() = 0;
+  virtual bool CanWriteHistogram() = 0;
+
+  virtual bool HasNoDataValue(unsigned band) = 0;
+  /// True for a source that takes its no-data values from another one, as a pyramid file does.
+  virtual bool CanInheritNoDataValues() = 0;
+  virtual void InheritNoDataValues(const lumo::RasterDef& from) = 0;
+
+  virtual bool HasPalette(unsigned band) = 0;
+  virtual lumo::Palette Palette(unsigned band) = 0;
+  virtual bool WritePalette(unsigned band, const lumo::Palette& palette) = 0;
+  virtual bool DeletePalette(unsigned band) = 0;
+
+  virtual bool CanWritePixels(unsigned level) = 0;
+
+  virtual ~BasicRasterReader() = default;
+};
+
+/// The face of a raster source for pixel type T, one of TwelveTypes.
+template <typename T>
+class RasterReader : public BasicRasterReader {
+ public:
+  /// @param connection  the owner, which outlives the reader.
+  explicit RasterReader(RasterDataConnection* connection) : connection_(connection) {}
+
+  virtual RasterDataConnection* Connection() { return connection_; }
+
+  virtual RasterBandStats<T> ReadStats(unsigned band) = 0;
+  virtual bool WriteStats(const Array<RasterBandStats<T>>& stats) = 0;
+  /// The stored histograms of a band; none when the source keeps none.
+  virtual Array<RasterBandHistogram<T>> Histogram(unsigned band) = 0;
+  virtual bool WriteHistogram(const Array<RasterBandHistogram<T>>& histograms) = 0;
+
+  virtual T NoDataValue(unsigned band) = 0;
+
+  /// Reads a block in the source's own interleave, the one of RasterDef().
+  /// @param left,top,width,height  in pixels of the level, inside it.
+  /// @param bands   in the order wanted; one may come twice.
+  /// @param pixels  width * height * bands elements of the caller, all of which are filled.
+  /// @param state   as many bytes, 0 on entry; bits of PixelValueState are set where pixels are not
+  ///                valid.
+  virtual bool ReadPixels(unsigned left, unsigned top, unsigned width, unsigned height,
+                          const Array<unsigned>& bands, unsigned level, T* pixels,
+                          unsigned char* state) = 0;
+  /// Writes a block; arguments as for ReadPixels. `state` may be ignored.
+  virtual bool WritePixels(unsigned left, unsigned top, unsigned width, unsigned height,
+                           const Array<unsigned>& bands, unsigned level, const T* pixels,
+                           const unsigned char* state) = 0;
+
+  /// Reads a block in any interleave.
+  /// @param rect    corners inclusive, in pixels of the level, inside it.
+  /// @param pixels  [out] resized to BlockDims of the block.
+  /// @param state   [out] same shape.
+  /// @return false, with the arrays cleared or partly filled, when the source fails, an array can't
+  ///         be sized or there is no such interleave.
+  bool ReadBlock(const SubRect& rect, const Array<unsigned>& bands, unsigned level,
+                 Interleave interleave, Array<T>& pixels, Array<unsigned char>& state);
+
+  /// Writes a block that the caller holds in any interleave; arguments as for ReadBlock.
+  bool WriteBlock(const SubRect& rect, const Array<unsigned>& bands, unsigned level,
+                  Interleave interleave, const Array<T>& pixels, const Array<unsigned char>& state);
+
+ protected:
+  RasterDataConnection* connection_;
+};
+
+template <typename T>
+using RasterReaderPtr = Pointer<RasterReader<T>>;
+
+/// Holds the one typed reader of a source.
+/// Failure: one without a reader has RasterReaderErrorInvalid stored, and type code 0.
+class VEXG_EXPORT RasterReaderDispatch : public ErrorState {
+ public:
+  RasterReaderDispatch() { SetErrorState(RasterReaderErrorInvalid()); }
+
+  template <typename T>
+  explicit RasterReaderDispatch(const RasterReaderPtr<T>& reader)
+      : basic_(reader), dataType_(reader ? kDataTypeOf<T> : 0) {
+    std::get<RasterReaderPtr<T>>(readers_) = reader;
+    if (!reader) SetErrorState(RasterReaderErrorInvalid());
+  }
+
+  /// Code of the pixel type of the reader; 0 when there is none.
+  unsigned DataType() const { return dataType_; }
+
+  /// The reader, when it is one of pixel type T; else empty.
+  template <typename T>
+  const RasterReaderPtr<T>& Get() const {
+    return std::get<RasterReaderPtr<T>>(readers_);
+  }
+
+  /// The reader whatever its type; empty when there is none.
+  const Pointer<BasicRasterReader>& GetBasic() const { return basic_; }
+
+ private:
+  template <typename... Ts>
+  static std::tuple<RasterReaderPtr<Ts>...> NoReaders(TypeList<Ts...>);
+
+  decltype(NoReaders(TwelveTypes{})) readers_;  // at most one is not empty
+  Pointer<BasicRasterReader> basic_;            // the same one
+  unsigned dataType_ = 0;
+};
+
+extern template class VEXG_EXPORT RasterReader<std::uint8_t>;
+extern template class VEXG_EXPORT RasterReader<std::int8_t>;
+extern template class VEXG_EXPORT RasterReader<std::uint16_t>;
+extern template class VEXG_EXPORT RasterReader<std::int16_t>;
+extern template class VEXG_EXPORT RasterReader<std::uint32_t>;
+extern template class VEXG_EXPORT RasterReader<std::int32_t>;
+extern template class VEXG_EXPORT RasterReader<float>;
+extern template class VEXG_EXPORT RasterReader<double>;
+extern template class VEXG_EXPORT RasterReader<std::uint64_t>;
+extern template class VEXG_EXPORT RasterReader<std::int64_t>;
+extern template class VEXG_EXPORT RasterReader<Complex<float>>;
+extern template class VEXG_EXPORT RasterReader<Complex<double>>;
+
+}  // namespace lumo

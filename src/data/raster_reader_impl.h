@@ -1,0 +1,90 @@
+#pragma once
+
+#include <algorithm>
+
+#include "data/raster_reader.h"
+#include "raster/interleave.h"
+
+namespace lumo {
+
+namespace detail {
+
+/// Gives an array the shape of a block, with every element zero.
+template <typename E>
+bool SizeBlock(Array<E>& block, Interleave interleave, const SubRect& rect, unsigned bands) {
+  const ArrayDims dims = BlockDims(interleave, rect.Width(), rect.Height(), bands);
+  if (!block.Resize(dims) || block.GetCount() != dims.count) return false;
+  std::fill_n(block.GetData(), block.GetCount(), E());
+  return true;
+}
+
+inline bool IsInterleave(Interleave interleave) {
+  return interleave >= Interleave::None && interleave <= Interleave::BSQ;
+}
+
+/// A block without an interleave has one band, whatever is asked for.
+inline Array<unsigned> BandsOfBlock(const Array<unsigned>& bands, Interleave interleave) {
+  Array<unsigned> kept(bands);
+  if (interleave == Interleave::None && kept.GetCount() > 1) kept.Resize(ArrayDims(1));
+  return kept;
+}
+
+}  // namespace detail
+
+template <typename T>
+bool RasterReader<T>::ReadBlock(const SubRect& rect, const Array<unsigned>& bands, unsigned level,
+                                Interleave interleave, Array<T>& pixels,
+                                Array<unsigned char>& state) {
+  const unsigned width = rect.Width(), height = rect.Height();
+  if (!detail::IsInterleave(interleave) || bands.GetCount() == 0) return false;
+  const Array<unsigned> wanted = detail::BandsOfBlock(bands, interleave);
+  const unsigned count = wanted.GetCount();
+  if (!detail::SizeBlock(pixels, interleave, rect, count) ||
+      !detail::SizeBlock(state, interleave, rect, count)) {
+    return false;
+  }
+  const Interleave native = RasterDef().interleave;
+  if (native == interleave || count == 1) {
+    return ReadPixels(rect.left, rect.top, width, height, wanted, level, pixels.GetData(),
+                      state.GetData());
+  }
+  Array<T> nativePixels;
+  Array<unsigned char> nativeState;
+  return detail::SizeBlock(nativePixels, native, rect, count) &&
+         detail::SizeBlock(nativeState, native, rect, count) &&
+         ReadPixels(rect.left, rect.top, width, height, wanted, level, nativePixels.GetData(),
+                    nativeState.GetData()) &&
+         ConvertInterleave(nativePixels.GetData(), native, pixels.GetData(), interleave, width,
+                           height, count, sizeof(T)) &&
+         ConvertInterleave(nativeState.GetData(), native, state.GetData(), interleave, width,
+                           height, count, 1);
+}
+
+template <typename T>
+bool RasterReader<T>::WriteBlock(const SubRect& rect, const Array<unsigned>& bands, unsigned level,
+                                 Interleave interleave, const Array<T>& pixels,
+                                 const Array<unsigned char>& state) {
+  const unsigned width = rect.Width(), height = rect.Height();
+  if (!detail::IsInterleave(interleave) || bands.GetCount() == 0) return false;
+  const Array<unsigned> given = detail::BandsOfBlock(bands, interleave);
+  const unsigned count = given.GetCount();
+  const std::uint64_t elements = std::uint64_t{width} * height * count;
+  if (pixels.GetCount() < elements || state.GetCount() < elements) return false;
+  const Interleave native = RasterDef().interleave;
+  if (native == interleave || count == 1) {
+    return WritePixels(rect.left, rect.top, width, height, given, level, pixels.GetData(),
+                       state.GetData());
+  }
+  Array<T> nativePixels;
+  Array<unsigned char> nativeState;
+  return detail::SizeBlock(nativePixels, native, rect, count) &&
+         detail::SizeBlock(nativeState, native, rect, count) &&
+         ConvertInterleave(pixels.GetData(), interleave, nativePixels.GetData(), native, width,
+                           height, count, sizeof(T)) &&
+         ConvertInterleave(state.GetData(), interleave, nativeState.GetData(), native, width,
+                           height, count, 1) &&
+         WritePixels(rect.left, rect.top, width, height, given, level, nativePixels.GetData(),
+                     nativeState.GetData());
+}
+
+}  // namespace lumo

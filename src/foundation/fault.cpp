@@ -1,0 +1,20 @@
+#include "foundation/fault.h"
+
+#include <utility>
+
+namespace lumo {
+namespace {
+
+thread_local String tFault;
+
+}  // namespace
+
+void SetFault(const String& text) {
+  tFault = text;
+}
+
+String TakeFault() {
+  return std::exchange(tFault, String());
+}
+
+}  // namespace lumo
