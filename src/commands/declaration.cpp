@@ -26,6 +26,14 @@ ValueKindText Describe(ValueKind kind) {
       return {"rectangle", "left top right bottom, inclusive"};
     case ValueKind::kPalette:
       return {"palette", "count [(name r g b a null) ...] and a blank"};
+    case ValueKind::kBooleanArray:
+      return {"boolean array", "rank:extents [0s and 1s] and a blank"};
+    case ValueKind::kTiles:
+      return {"tiles", "width height bands left right top bottom, then Invariable or Variable"};
+    case ValueKind::kGeoRef:
+      return {"geo-reference", "as told in georeferencing.md"};
+    case ValueKind::kPaletteArray:
+      return {"palette array", "rank:extents [palettes] and a blank"};
   }
   return {"", ""};
 }

@@ -23,6 +23,10 @@ enum class ValueKind {
   kNumberArray,
   kRectangle,
   kPalette,
+  kBooleanArray,
+  kTiles,
+  kGeoRef,
+  kPaletteArray,
 };
 
 /// The name of a kind and its text form, for people.

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <atomic>
 #include <tuple>
 
 #include "data/data_connection.h"
@@ -91,6 +92,9 @@ class RasterReader : public BasicRasterReader {
                            const Array<unsigned>& bands, unsigned level, const T* pixels,
                            const unsigned char* state) = 0;
 
+  /// The interleave of RasterDef(), which is asked for once.
+  Interleave NativeInterleave();
+
   /// Reads a block in any interleave.
   /// @param rect    corners inclusive, in pixels of the level, inside it.
   /// @param pixels  [out] resized to BlockDims of the block.
@@ -106,6 +110,10 @@ class RasterReader : public BasicRasterReader {
 
  protected:
   RasterDataConnection* connection_;
+
+ private:
+  static constexpr std::int32_t kNotAsked = -2;
+  std::atomic<std::int32_t> nativeInterleave_{kNotAsked};
 };
 
 template <typename T>

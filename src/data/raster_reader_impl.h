@@ -32,6 +32,16 @@ inline Array<unsigned> BandsOfBlock(const Array<unsigned>& bands, Interleave int
 }  // namespace detail
 
 template <typename T>
+Interleave RasterReader<T>::NativeInterleave() {
+  std::int32_t native = nativeInterleave_;
+  if (native == kNotAsked) {
+    native = static_cast<std::int32_t>(RasterDef().interleave);
+    nativeInterleave_ = native;
+  }
+  return static_cast<Interleave>(native);
+}
+
+template <typename T>
 bool RasterReader<T>::ReadBlock(const SubRect& rect, const Array<unsigned>& bands, unsigned level,
                                 Interleave interleave, Array<T>& pixels,
                                 Array<unsigned char>& state) {
@@ -43,7 +53,7 @@ bool RasterReader<T>::ReadBlock(const SubRect& rect, const Array<unsigned>& band
       !detail::SizeBlock(state, interleave, rect, count)) {
     return false;
   }
-  const Interleave native = RasterDef().interleave;
+  const Interleave native = NativeInterleave();
   if (native == interleave || count == 1) {
     return ReadPixels(rect.left, rect.top, width, height, wanted, level, pixels.GetData(),
                       state.GetData());
@@ -70,7 +80,7 @@ bool RasterReader<T>::WriteBlock(const SubRect& rect, const Array<unsigned>& ban
   const unsigned count = given.GetCount();
   const std::uint64_t elements = std::uint64_t{width} * height * count;
   if (pixels.GetCount() < elements || state.GetCount() < elements) return false;
-  const Interleave native = RasterDef().interleave;
+  const Interleave native = NativeInterleave();
   if (native == interleave || count == 1) {
     return WritePixels(rect.left, rect.top, width, height, given, level, pixels.GetData(),
                        state.GetData());

@@ -21,6 +21,16 @@ struct Complex {
   friend bool operator==(const Complex&, const Complex&) = default;
 };
 
+/// Writes "(real,imaginary)", the stream form of the standard library's complex numbers.
+template <typename T>
+std::ostream& operator<<(std::ostream& out, const Complex<T>& value) {
+  out << '(';
+  WriteNumber(out, value.real);
+  out << ',';
+  WriteNumber(out, value.imag);
+  return out << ')';
+}
+
 /// The shape of an array: up to eight dimensions, the last the fastest in storage.
 struct VEXG_EXPORT ArrayDims {
   static constexpr unsigned kMaxRank = 8;

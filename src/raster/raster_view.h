@@ -72,6 +72,8 @@ class RasterView : public Raster<T> {
 
  protected:
   const RasterPtr<T>& Parent() const { return parent_; }
+  /// Lets go of the parent, as a destructor does that needs it closed.
+  void ResetParent() { parent_ = RasterPtr<T>(); }
 
  private:
   template <typename Call>

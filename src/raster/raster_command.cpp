@@ -1,0 +1,25 @@
+#include "raster/raster_command.h"
+
+#include "foundation/fault.h"
+
+namespace lumo {
+
+BasicRasterPtr RasterCommand::FindRaster(const char* name) const {
+  const URI uri = Read<URI>(name);
+  const BasicRasterPtr raster(CatalogFind(uri));
+  if (raster && raster->IsValid()) return raster;
+  SetFault(std::string(name) + ": no open raster [" + uri.ToUTF8() + "]");
+  return {};
+}
+
+bool RasterCommand::CheckBands(const BasicRaster& raster, const Array<unsigned>& bands) {
+  for (const unsigned band : bands) {
+    if (band < raster.Bands()) continue;
+    SetFault("band " + std::to_string(band) + ": the raster has " + std::to_string(raster.Bands()) +
+             ", counted from 0");
+    return false;
+  }
+  return bands.IsValid();
+}
+
+}  // namespace lumo

@@ -1,0 +1,83 @@
+#include "raster/raster_command.h"
+
+namespace lumo {
+namespace {
+
+const InputDeclaration kUri{"URI", Presence::kRequired, ValueKind::kURI, "the raster"};
+const InputDeclaration kBands{"Bands", Presence::kRequired, ValueKind::kIntegerArray,
+                              "the bands, from 0"};
+
+const CommandDeclaration kGet{
+    "GetRasterPaletteCommand",
+    "Palettes",
+    "Gives the colour tables of bands.",
+    {kUri, kBands},
+    {{"Palettes", ValueKind::kPaletteArray, "one for each band given; empty where it has none"}}};
+
+class GetRasterPaletteCommand final : public RasterCommand {
+  CommandResult Execute() override {
+    if (!CheckInputs()) return Fail();
+    const BasicRasterPtr raster = FindRaster();
+    if (!raster) return Fail();
+    const auto bands = Read<Array<unsigned>>("Bands");
+    if (!CheckBands(*raster, bands)) return Fail("Bands is not an integer array");
+    Array<Palette> palettes(bands.GetDims());
+    for (unsigned i = 0; i < bands.GetCount(); ++i) {
+      const PalettePtr palette = raster->Palette(bands[i]);
+      if (palette) palettes[i] = *palette;
+    }
+    Write("Palettes", palettes);
+    return Succeed();
+  }
+};
+
+const CommandFactoryT<GetRasterPaletteCommand> getFactory(kGet);
+
+const CommandDeclaration kSet{
+    "SetRasterPaletteCommand",
+    "Palettes",
+    "Stores the colour table of a band through the data source.",
+    {kUri,
+     {"Band", Presence::kRequired, ValueKind::kInteger, "the band, from 0"},
+     {"Palette", Presence::kRequired, ValueKind::kPalette, "the colour table"}},
+    {{"Return", ValueKind::kBoolean, "the source took it"}}};
+
+class SetRasterPaletteCommand final : public RasterCommand {
+  CommandResult Execute() override {
+    if (!CheckInputs()) return Fail();
+    const BasicRasterPtr raster = FindRaster();
+    if (!raster) return Fail();
+    const auto band = Read<unsigned>("Band");
+    if (band >= raster->Bands()) return Fail("Band is not a band of the raster");
+    Write("Return", raster->WritePalette(band, PalettePtr(new Palette(Read<Palette>("Palette")))));
+    return Succeed();
+  }
+};
+
+const CommandFactoryT<SetRasterPaletteCommand> setFactory(kSet);
+
+const CommandDeclaration kDelete{
+    "DeleteRasterPaletteCommand",
+    "Palettes",
+    "Takes the colour tables of bands away from the data source.",
+    {kUri, kBands},
+    {{"Return", ValueKind::kBooleanArray, "for each band given: it has none any more"}}};
+
+class DeleteRasterPaletteCommand final : public RasterCommand {
+  CommandResult Execute() override {
+    if (!CheckInputs()) return Fail();
+    const BasicRasterPtr raster = FindRaster();
+    if (!raster) return Fail();
+    const auto bands = Read<Array<unsigned>>("Bands");
+    if (!CheckBands(*raster, bands)) return Fail("Bands is not an integer array");
+    Array<bool> deleted(bands.GetDims());
+    for (unsigned i = 0; i < bands.GetCount(); ++i) deleted[i] = raster->DeletePalette(bands[i]);
+    Write("Return", deleted);
+    return Succeed();
+  }
+};
+
+const CommandFactoryT<DeleteRasterPaletteCommand> deleteFactory(kDelete);
+
+}  // namespace
+}  // namespace lumo

@@ -1,0 +1,69 @@
+#include "views/catalog_raster_ref.h"
+
+#include "commands/catalog.h"
+#include "data/data_manager.h"
+#include "foundation/fault.h"
+#include "views/reader_raster.h"
+
+namespace lumo {
+
+BasicRasterPtr MakeReaderRaster(const DataConnectionPtr& connection,
+                                const DataConnectionPtr& pyramidConnection) {
+  const RasterDataConnectionPtr source(connection);
+  if (!source) {
+    if (connection) SetFault(connection->URI().ToUTF8() + ": the source is no raster");
+    return {};
+  }
+  const RasterReaderDispatchPtr dispatch = source->RasterReaderDispatch();
+  const RasterDataConnectionPtr pyramid(pyramidConnection);
+  const RasterReaderDispatchPtr pyramidDispatch =
+      pyramid ? pyramid->RasterReaderDispatch() : RasterReaderDispatchPtr();
+  BasicRasterPtr made;
+  if (dispatch) {
+    DispatchType(TwelveTypes{}, dispatch->DataType(), [&]<typename T>() {
+      const RasterReaderPtr<T> pyramidReader =
+          pyramidDispatch ? pyramidDispatch->Get<T>() : RasterReaderPtr<T>();
+      if (pyramid && !pyramidReader) return false;
+      made.Reset(new ReaderRaster<T>(dispatch->Get<T>(), source, pyramidReader, pyramid));
+      return true;
+    });
+  }
+  if (!made) {
+    SetFault(source->URI().ToUTF8() + (pyramidConnection
+                                           ? ": the pyramid has another pixel type"
+                                           : ": the pixel type of the source can't be read"));
+  }
+  return made;
+}
+
+CatalogRasterRef::CatalogRasterRef(const BasicRasterPtr& raster, bool releaseOnDestroy)
+    : releaseOnDestroy_(releaseOnDestroy) {
+  Enter(raster);
+}
+
+CatalogRasterRef::CatalogRasterRef(const Array<String>& connStrings, const GeoRefPtr& geoRef,
+                                   const MetadataPtr& metadata, bool useProxy,
+                                   bool releaseOnDestroy)
+    : releaseOnDestroy_(releaseOnDestroy) {
+  DataManager& manager = GetGlobalDataManager();
+  DataConnectionPtr connection = useProxy ? manager.Connect(connStrings, geoRef, metadata)
+                                          : manager.ConnectDirect(connStrings, geoRef, metadata);
+  if (!connection) return;
+  BasicRasterPtr raster(catalog::Find(connection->URI()));
+  if (!raster) raster = MakeReaderRaster(connection);
+  manager.ReleaseConnection(connection);
+  Enter(raster);
+}
+
+CatalogRasterRef::~CatalogRasterRef() {
+  if (releaseOnDestroy_) catalog::Remove(raster_);
+}
+
+void CatalogRasterRef::Enter(const BasicRasterPtr& raster) {
+  if (!raster) return;
+  raster_ = raster;
+  dataType_ = raster->DataType();
+  catalog::Add(raster);
+}
+
+}  // namespace lumo

@@ -1,0 +1,45 @@
+#pragma once
+
+#include "data/data_connection.h"
+#include "raster/raster.h"
+
+namespace lumo {
+
+/// Holds an open raster while code works with it, and its place in the catalog: making one adds 1
+/// to the raster's count there.
+class VEXG_EXPORT CatalogRasterRef {
+ public:
+  /// Adds `raster` to the catalog, unless it is empty.
+  /// @param releaseOnDestroy  take the count back when this goes.
+  CatalogRasterRef(const BasicRasterPtr& raster, bool releaseOnDestroy);
+
+  /// Opens a source. One that the catalog knows already gives the raster that stands there, and
+  /// what `geoRef` and `metadata` say has no effect then.
+  /// @param useProxy  open it on a thread of its own, as all code does whose raster outlives the
+  ///                  call; else on this thread.
+  CatalogRasterRef(const Array<String>& connStrings, const GeoRefPtr& geoRef,
+                   const MetadataPtr& metadata, bool useProxy, bool releaseOnDestroy);
+
+  ~CatalogRasterRef();
+  CatalogRasterRef(const CatalogRasterRef&) = delete;
+  CatalogRasterRef& operator=(const CatalogRasterRef&) = delete;
+
+  /// The raster; empty when there is none, with the fault text told.
+  const BasicRasterPtr& Raster() const { return raster_; }
+  /// Code of its pixel type; 0 when there is no raster.
+  unsigned DataType() const { return dataType_; }
+
+ private:
+  void Enter(const BasicRasterPtr& raster);
+
+  bool releaseOnDestroy_;
+  unsigned dataType_ = 0;
+  BasicRasterPtr raster_;
+};
+
+/// The raster on an open source, and on the pyramid file of that source when there is one. Empty,
+/// with the fault text told, when a source is no raster or the pixel types differ.
+VEXG_EXPORT BasicRasterPtr MakeReaderRaster(const DataConnectionPtr& connection,
+                                            const DataConnectionPtr& pyramidConnection = {});
+
+}  // namespace lumo

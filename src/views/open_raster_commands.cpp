@@ -1,0 +1,90 @@
+#include "commands/catalog.h"
+#include "data/data_manager.h"
+#include "foundation/fault.h"
+#include "views/publish_raster.h"
+
+namespace lumo {
+namespace {
+
+const CommandDeclaration kOpen{
+    "OpenRasterCommand",
+    "Rasters",
+    "Opens a raster source. One that is open already is shared.",
+    {{"ConnStr", Presence::kRequired, ValueKind::kTextList,
+      "the source: a file, with or without the key of its format"},
+     {"PyramidConnStr", Presence::kOptional, ValueKind::kTextList,
+      "a pyramid file that belongs to it"},
+     {"GeoRef", Presence::kOptional, ValueKind::kGeoRef, "in place of the source's own"}},
+    PublishedOutputs()};
+
+class OpenRasterCommand final : public PublishCommand {
+  CommandResult Execute() override {
+    if (!CheckInputs()) return Fail();
+    GeoRefPtr geoRef;
+    if (HasInput("GeoRef")) {
+      geoRef = Read<GeoRefPtr>("GeoRef");
+      if (!geoRef) return Fail("GeoRef makes no geo-reference");
+    }
+    const auto connStrings = Read<Array<String>>("ConnStr");
+    const auto pyramidStrings = Read<Array<String>>("PyramidConnStr");
+    if (pyramidStrings.GetCount() != 0) return OpenWithPyramid(connStrings, pyramidStrings, geoRef);
+    const CatalogRasterRef opened(connStrings, geoRef, MetadataPtr(), true, false);
+    return Publish(opened);
+  }
+
+  CommandResult OpenWithPyramid(const Array<String>& connStrings,
+                                const Array<String>& pyramidStrings, const GeoRefPtr& geoRef) {
+    DataManager& manager = GetGlobalDataManager();
+    const DataConnectionPtr source = manager.Connect(connStrings, geoRef, MetadataPtr());
+    if (!source) return Fail();
+    const DataConnectionPtr pyramid = manager.Connect(pyramidStrings, GeoRefPtr(), MetadataPtr());
+    if (!pyramid) return Fail();
+    BasicRasterPtr raster(catalog::Find(source->URI()));
+    if (!raster) raster = MakeReaderRaster(source, pyramid);
+    return Publish(CatalogRasterRef(raster, false));
+  }
+};
+
+const CommandFactoryT<OpenRasterCommand> openFactory(kOpen);
+
+const CommandDeclaration kAccess{"AccessRasterCommand",
+                                 "Rasters",
+                                 "Adds one to the opens of an open raster.",
+                                 {{"SrcURI", Presence::kRequired, ValueKind::kURI, "the raster"}},
+                                 PublishedOutputs()};
+
+class AccessRasterCommand final : public PublishCommand {
+  CommandResult Execute() override {
+    if (!CheckInputs()) return Fail();
+    const BasicRasterPtr raster = FindRaster("SrcURI");
+    if (!raster) return Fail();
+    return Publish(CatalogRasterRef(raster, false));
+  }
+};
+
+const CommandFactoryT<AccessRasterCommand> accessFactory(kAccess);
+
+/// Lets go of one open of whatever object; one that isn't there is no failure.
+class CloseCommand final : public Command {
+  CommandResult Execute() override {
+    if (!CheckInputs()) return Fail();
+    catalog::Release(Read<URI>("URI"));
+    return Succeed();
+  }
+};
+
+const InputDeclaration kClosed{"URI", Presence::kRequired, ValueKind::kURI,
+                               "what to close; nothing happens when it isn't open"};
+const CommandDeclaration kCloseRaster{
+    "CloseRasterCommand", "Rasters", "Takes one from the opens of a raster.", {kClosed}, {}};
+const CommandDeclaration kCloseMask{
+    "CloseRasterMaskCommand", "Rasters", "Takes one from the opens of a mask.", {kClosed}, {}};
+const CommandDeclaration kCloseMetadata{
+    "CloseMetadataCommand", "Metadata", "Takes one from the opens of metadata.", {kClosed}, {}};
+
+const CommandFactoryT<CloseCommand> closeRasterFactory(kCloseRaster);
+const CommandFactoryT<CloseCommand> closeMaskFactory(kCloseMask);
+const CommandFactoryT<CloseCommand> closeMetadataFactory(kCloseMetadata);
+
+}  // namespace
+}  // namespace lumo

@@ -1,0 +1,26 @@
+#pragma once
+
+#include <vector>
+
+#include "raster/raster_command.h"
+#include "views/catalog_raster_ref.h"
+
+namespace lumo {
+
+/// Base of the commands that put a raster into the catalog and give its URI and DataType.
+class VEXG_EXPORT PublishCommand : public RasterCommand {
+ protected:
+  /// Gives the raster that was entered, when there is a valid one; else takes it out again and
+  /// fails with the fault text.
+  CommandResult Publish(const CatalogRasterRef& entered);
+
+  /// Enters a raster with count 1 and gives it.
+  CommandResult Publish(const BasicRasterPtr& raster) {
+    return Publish(CatalogRasterRef(raster, false));
+  }
+};
+
+/// The outputs of a PublishCommand.
+VEXG_EXPORT std::vector<OutputDeclaration> PublishedOutputs();
+
+}  // namespace lumo

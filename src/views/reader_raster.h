@@ -1,0 +1,92 @@
+#pragma once
+
+#include <mutex>
+
+#include "data/raster_reader.h"
+#include "raster/raster_view.h"
+
+namespace lumo {
+
+/// The raster that stands on a data source. Exists for TwelveTypes.
+///
+/// It turns the operations of a raster into calls of a reader, in whatever interleave is asked for.
+/// A second reader, when there is one, stands on a pyramid that the library keeps in a file of its
+/// own; where it has something it goes first.
+///
+/// Ownership: shares both connections, which stay open as long as the raster lives. The readers
+///            belong to them.
+/// Threads:   every operation may run on many threads at once; one block is transferred at a time.
+/// Failure:   without a reader, operations give false, 0 or empty; those that a source refuses have
+///            the fault text told.
+template <typename T>
+class ReaderRaster final : public RasterView<T> {
+ public:
+  /// @param pyramidReader  may be empty, and then so is `pyramidConnection`. A source that is a
+  ///                       pyramid file itself is its own.
+  ReaderRaster(const RasterReaderPtr<T>& reader, const RasterDataConnectionPtr& connection,
+               const RasterReaderPtr<T>& pyramidReader = {},
+               const RasterDataConnectionPtr& pyramidConnection = {});
+  ~ReaderRaster() override;
+
+  URI GetURI() const override;
+  bool IsValid() const override { return Object::IsValid(); }
+  bool CanWrite() const override;
+  RasterDef GetRasterDef() const override;
+
+  bool PyramidExists() const override;
+  PyramidDef GetPyramidDef() const override;
+  bool PyramidDelete() override;
+  bool PyramidRefresh() override;
+
+  bool StatsExist(unsigned band, unsigned mask) const override;
+  RasterBandStats<T> BandStats(unsigned band) const override;
+
+  unsigned Samples() const override { return samples_; }
+  unsigned Lines() const override { return lines_; }
+  unsigned Bands() const override { return bands_; }
+  lumo::TileDimensions TileDimensions() const override { return tiles_; }
+
+  bool HasNoDataValue(unsigned band) const override;
+  T NoDataValue(unsigned band) const override;
+  bool HasPalette(unsigned band) const override;
+  PalettePtr Palette(unsigned band) const override;
+  bool WritePalette(unsigned band, const PalettePtr& palette) override;
+  bool DeletePalette(unsigned band) override;
+
+  bool GetSubRect(const SubRect& rect, const Array<unsigned>& bands, Interleave interleave,
+                  Array<T>& pixels, Array<unsigned char>& state) override;
+  bool PutSubRect(const SubRect& rect, const Array<unsigned>& bands, Interleave interleave,
+                  Array<T>& pixels, Array<unsigned char>& state) override;
+
+ private:
+  template <typename Call>
+  bool AnyReader(const Call& call) const;
+  bool Holds(const SubRect& rect, const Array<unsigned>& bands) const;
+
+  // The connections go last: they own the readers.
+  RasterDataConnectionPtr connection_;
+  RasterDataConnectionPtr pyramidConnection_;
+  RasterReaderPtr<T> reader_;
+  RasterReaderPtr<T> pyramidReader_;
+  URI uri_;
+  unsigned samples_ = 0;  // sizes never change while a source is open
+  unsigned lines_ = 0;
+  unsigned bands_ = 0;
+  lumo::TileDimensions tiles_;
+  std::mutex pixelLock_;
+};
+
+extern template class VEXG_EXPORT ReaderRaster<std::uint8_t>;
+extern template class VEXG_EXPORT ReaderRaster<std::int8_t>;
+extern template class VEXG_EXPORT ReaderRaster<std::uint16_t>;
+extern template class VEXG_EXPORT ReaderRaster<std::int16_t>;
+extern template class VEXG_EXPORT ReaderRaster<std::uint32_t>;
+extern template class VEXG_EXPORT ReaderRaster<std::int32_t>;
+extern template class VEXG_EXPORT ReaderRaster<float>;
+extern template class VEXG_EXPORT ReaderRaster<double>;
+extern template class VEXG_EXPORT ReaderRaster<std::uint64_t>;
+extern template class VEXG_EXPORT ReaderRaster<std::int64_t>;
+extern template class VEXG_EXPORT ReaderRaster<Complex<float>>;
+extern template class VEXG_EXPORT ReaderRaster<Complex<double>>;
+
+}  // namespace lumo

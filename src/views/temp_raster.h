@@ -1,0 +1,69 @@
+#pragma once
+
+#include <string>
+
+#include "foundation/environment.h"
+#include "raster/raster_view.h"
+
+namespace lumo {
+
+/// Takes the first file name that isn't in use: directory, prefix, a number of four digits from
+/// 0000, extension. The file is made, empty, so that nobody else takes the name.
+/// @param directory  the system's directory of temporary files when it is empty or doesn't exist.
+/// @param prefix     "cdftmp" when empty.
+/// @param extension  ".tmp" when empty; gets a "." in front when it has none.
+/// @return no text, with the fault told, when all 10,000 names are in use, or none can be made.
+VEXG_EXPORT String TempFileName(const String& directory, const String& prefix,
+                                const String& extension);
+
+/// A raster in a temporary file of the library's own format, which is deleted with the raster. A
+/// crash leaves the file behind. Exists for EightTypes.
+///
+/// Threads: as the reader raster underneath.
+/// Failure: IsValid() is false when the file could not be made, with the fault text told.
+template <typename T>
+class TempRaster final : public RasterView<T> {
+ public:
+  /// @param context  its WorkingDirectory() is where the file lies.
+  /// @param def      the raster's size, bands, no-data values and geo-reference; pixels lie BIP.
+  TempRaster(const Context& context, const RasterDef& def);
+  TempRaster(const Context& context, unsigned samples, unsigned lines, unsigned bands,
+             const GeoRefPtr& geoRef);
+  TempRaster(unsigned samples, unsigned lines, unsigned bands, const GeoRefPtr& geoRef);
+  ~TempRaster() override;
+
+  URI GetURI() const override;
+  bool IsValid() const override { return valid_ && Object::IsValid(); }
+
+  // What is computed of a temporary raster is not stored with it.
+  bool WriteStats() override { return false; }
+  bool WriteHistogram() override { return false; }
+
+  /// Whether the file outlives the raster; it doesn't unless this is set.
+  void SetKeepFile(bool keep) { keepFile_ = keep; }
+  /// The file; no text when it could not be made.
+  const String& FileName() const { return fileName_; }
+
+ private:
+  struct Made {
+    String fileName;
+    RasterPtr<T> raster;
+  };
+  static Made Make(const Context& context, RasterDef def);
+  explicit TempRaster(const Made& made);
+
+  String fileName_;
+  bool valid_ = false;
+  bool keepFile_ = false;
+};
+
+extern template class VEXG_EXPORT TempRaster<std::uint8_t>;
+extern template class VEXG_EXPORT TempRaster<std::int8_t>;
+extern template class VEXG_EXPORT TempRaster<std::uint16_t>;
+extern template class VEXG_EXPORT TempRaster<std::int16_t>;
+extern template class VEXG_EXPORT TempRaster<std::uint32_t>;
+extern template class VEXG_EXPORT TempRaster<std::int32_t>;
+extern template class VEXG_EXPORT TempRaster<float>;
+extern template class VEXG_EXPORT TempRaster<double>;
+
+}  // namespace lumo
