@@ -114,9 +114,9 @@ class ScaleProcess final : public ProcessBuilder<Process> {
     const ArgID tile = process.TakeTokenArg();
 
     const bool placed =
-        process.AddTask(0, TaskDescriptor(&read_, List({tile}), List({inputId}))) &&
-        process.AddTask(1, TaskDescriptor(&scale_, List({tile}), List({gainsId, offsetsId}))) &&
-        process.AddTask(2, TaskDescriptor(&write_, List({tile}), List({outputId})));
+        process.AddTask(0, TaskDescriptor(&read_, ArgIDs({tile}), ArgIDs({inputId}))) &&
+        process.AddTask(1, TaskDescriptor(&scale_, ArgIDs({tile}), ArgIDs({gainsId, offsetsId}))) &&
+        process.AddTask(2, TaskDescriptor(&write_, ArgIDs({tile}), ArgIDs({outputId})));
     SetArg(gainsId, gains);
     SetArg(offsetsId, offsets);
     SetArg(inputId, input);
@@ -126,12 +126,6 @@ class ScaleProcess final : public ProcessBuilder<Process> {
   }
 
  private:
-  static Array<ArgID> List(std::initializer_list<ArgID> ids) {
-    Array<ArgID> list{ArrayDims(static_cast<unsigned>(ids.size()))};
-    std::copy(ids.begin(), ids.end(), list.begin());
-    return list;
-  }
-
   ManagedTask<RasterReadTask<TIn>> read_;
   ManagedTask<ScaleTask<TIn, TOut, Op>> scale_;
   ManagedTask<RasterWriteTask<TOut>> write_;

@@ -6,6 +6,7 @@
 #include <new>
 #include <vector>
 
+#include "foundation/fault.h"
 #include "foundation/grow_array.h"
 #include "tasks/pipeline_impl.h"
 #include "tasks/process_stages.h"
@@ -14,6 +15,12 @@ namespace lumo {
 
 const AbortFlag* Task::GetAbortFlag() const {
   return process_ != nullptr ? process_->GetIPC().abort.Get() : nullptr;
+}
+
+Array<ArgID> ArgIDs(std::initializer_list<ArgID> ids) {
+  Array<ArgID> list{ArrayDims(static_cast<unsigned>(ids.size()))};
+  std::copy(ids.begin(), ids.end(), list.begin());
+  return list;
 }
 
 TaskDescriptor::TaskDescriptor(TaskFactory* factory, const Array<ArgID>& tokenArgs,
@@ -67,6 +74,16 @@ bool BasicProcess::HasFailed() const {
   return failed_;
 }
 
+void BasicProcess::KeepFault(const String& fault) {
+  const MutexLock lock = Lock();
+  if (fault_.GetLength() == 0) fault_ = fault;
+}
+
+String BasicProcess::GetFault() const {
+  const MutexLock lock = Lock();
+  return fault_;
+}
+
 void BasicProcess::TokenEnded(bool valid, bool error) {
   const MutexLock lock = Lock();
   if (error) failed_ = true;
@@ -81,6 +98,7 @@ void BasicProcess::BeginRun() {
   const MutexLock lock = Lock();
   stop_ = false;
   failed_ = false;
+  fault_ = String();
   done_ = 0;
   ipc_.progress->Update(0.0);
 }
@@ -103,7 +121,10 @@ bool CustomProcess<Initializer, Stage, Terminator>::Run(ArgList& args) {
     Terminator terminator(*this, pool);
     BeginRun();
     const bool ran = RunPipeline<TaskToken>(initializer, chain, terminator, GetTaskCount());
-    return ran && !HasFailed();
+    if (ran && !HasFailed()) return true;
+    const String fault = GetFault();
+    if (fault.GetLength() != 0) SetFault(fault);
+    return false;
   } catch (const std::bad_alloc&) {
     SetErrorState(ObjectErrorOutOfMemory());
     return false;

@@ -1,11 +1,15 @@
 #pragma once
 
 #include <cstdint>
+#include <initializer_list>
 
 #include "foundation/locks.h"
 #include "tasks/task.h"
 
 namespace lumo {
+
+/// The list of argument ids that a TaskDescriptor takes.
+VEXG_EXPORT Array<ArgID> ArgIDs(std::initializer_list<ArgID> ids);
 
 /// How a process makes one stage: which task, which arguments of the run its constructor receives,
 /// and which slots of a token its Execute sees.
@@ -88,6 +92,11 @@ class VEXG_EXPORT BasicProcess : public ErrorState, public Lockable {
   void TokenEnded(bool valid, bool error);
   /// True when a stage failed.
   bool HasFailed() const;
+  /// Keeps the fault text of a stage that failed, which worked on a thread of its own. The first
+  /// one stays; Run tells it on its thread.
+  void KeepFault(const String& fault);
+  /// The fault text of the last run; no text when there was none.
+  String GetFault() const;
 
  protected:
   /// Clears the state of the run before, and reports progress 0.
@@ -108,6 +117,7 @@ class VEXG_EXPORT BasicProcess : public ErrorState, public Lockable {
   // The state of a run, under the lock.
   bool stop_ = false;
   bool failed_ = false;
+  String fault_;
   std::uint64_t done_ = 0;
 };
 

@@ -35,6 +35,9 @@ class ProcessBuilder : public Async, public SelfPointing {
 
   unsigned GetRunMode() const { return runMode_; }
 
+  /// Why the last run failed, in words, as far as a stage told it.
+  String GetFault() const { return process_.GetFault(); }
+
   /// The work itself, for whoever starts it.
   void Execute() override;
 

@@ -1,5 +1,7 @@
 #include "tasks/process_stages.h"
 
+#include "foundation/fault.h"
+
 namespace lumo {
 
 TaskToken* TokenPool::Take(unsigned sequence) {
@@ -71,6 +73,7 @@ void ProcessTask::Execute(TaskToken& token) {
   } else {
     token.valid = false;
     token.error = task_->HasError();
+    if (token.error) process_.KeepFault(TakeFault());
   }
   list_.Clear();
 }
