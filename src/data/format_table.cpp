@@ -1,5 +1,6 @@
 #include "data/format_table.h"
 
+#include <algorithm>
 #include <atomic>
 #include <exception>
 #include <filesystem>
@@ -114,6 +115,12 @@ FormatRecord* FindFormat(const String& name) {
     if (record.name == name) return &record;
   }
   return nullptr;
+}
+
+Array<String> ConnStrings(std::initializer_list<String> pieces) {
+  Array<String> strings{ArrayDims(static_cast<unsigned>(pieces.size()))};
+  std::copy(pieces.begin(), pieces.end(), strings.begin());
+  return strings;
 }
 
 String FindFormatName(const Array<String>& connStrings) {

@@ -1,6 +1,7 @@
 #pragma once
 
 #include <cstdint>
+#include <initializer_list>
 
 #include "foundation/array.h"
 
@@ -38,6 +39,9 @@ using CreateDataConnectionFactoryFunction = DataConnectionFactory*(FormatRecord*
 
 // Connection strings are arrays: a piece either equals a format's key exactly, or is for the
 // plug-in.
+
+/// The array of these pieces.
+VEXG_EXPORT Array<String> ConnStrings(std::initializer_list<String> pieces);
 
 /// The first piece, in the order of the array, that is a format's key; no text when none is.
 VEXG_EXPORT String FindFormatName(const Array<String>& connStrings);

@@ -1,5 +1,6 @@
 #include "data/mt_connection.h"
 
+#include "data/access_policy.h"
 #include "data/data_manager.h"
 #include "data/dc_srv_call.h"
 #include "data/mt_raster_reader_impl.h"
@@ -166,6 +167,7 @@ VectorDef MtVectorDataConnection::VectorDef() {
 bool MtVectorDataConnection::CreateVector(const Array<String>& connStrings,
                                           const lumo::VectorDef& def) {
   ForgetReaders();
+  if (!MayUseSource(connStrings, true)) return false;
   return detail::CallServer(Server(), 45, "DcSrvCmdDcrCreateVector", false,
                             [&](DcSrvContext& context, bool& result) {
                               result = Replace(context, [&](DataManager& manager) {

@@ -2,6 +2,7 @@
 #include <filesystem>
 #include <vector>
 
+#include "data/access_policy.h"
 #include "data/data_manager.h"
 #include "data/mt_connection.h"
 #include "foundation/fault.h"
@@ -31,6 +32,7 @@ DataConnectionPtr TryConnect(DataConnectionFactory& factory, const Array<String>
 std::vector<DataConnectionFactory*> FindWilling(const Array<String>& connStrings) {
   std::vector<DataConnectionFactory*> willing;
   for (std::uint32_t row = 0; row < kFormatCount; ++row) {
+    if (!MayUseFormat(gCdfFormatRecords[row])) continue;
     LoadFormat(row);
     DataConnectionFactory* const factory = GetFactory(gCdfFormatRecords[row]);
     if (factory == nullptr) continue;
@@ -109,6 +111,7 @@ DataConnectionPtr MtDataConnectionFactory::CreateVectorDirect(const Array<String
 DataConnectionPtr MtDataConnectionFactory::Connect(const Array<String>& connStrings,
                                                    const GeoRefPtr& geoRef,
                                                    const MetadataPtr& metadata) {
+  if (!MayUseSource(connStrings, false)) return {};
   const FormatRecord* const record = FindFormat(FindFormatName(connStrings));
   std::int32_t kind = record != nullptr ? record->kind : 0;
   if (kind == 0) {
@@ -128,6 +131,9 @@ DataConnectionPtr MtDataConnectionFactory::Connect(const Array<String>& connStri
 
 DataConnectionPtr MtDataConnectionFactory::CreateRaster(const Array<String>& connStrings,
                                                         const RasterDef& def) {
+  const FormatRecord* const format = FindFormat(def.format);
+  if (format != nullptr && !MayUseFormat(*format)) return {};
+  if (!MayUseSource(connStrings, true)) return {};
   const RasterDataConnectionPtr proxy(new MtRasterDataConnection);
   return proxy->CreateRaster(connStrings, def) ? DataConnectionPtr(proxy) : DataConnectionPtr();
 }

@@ -61,6 +61,8 @@ class CopyRasterCommand final : public RasterCommand {
     const bool copied = DispatchType(TwelveTypes{}, source->DataType(), [&]<typename T>() {
       return Copied<T>(RasterPtr<T>(source), RasterPtr<T>(target), bands);
     });
+    // A half copy never passes for a whole one.
+    if (GetIPC().abort->IsSet()) return Fail("the copy was aborted");
     return copied ? Succeed() : Fail("the pixels could not be copied");
   }
 

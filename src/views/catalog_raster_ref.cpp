@@ -1,6 +1,7 @@
 #include "views/catalog_raster_ref.h"
 
 #include "commands/catalog.h"
+#include "data/access_policy.h"
 #include "data/data_manager.h"
 #include "foundation/fault.h"
 #include "views/reader_raster.h"
@@ -45,6 +46,7 @@ CatalogRasterRef::CatalogRasterRef(const Array<String>& connStrings, const GeoRe
                                    const MetadataPtr& metadata, bool useProxy,
                                    bool releaseOnDestroy)
     : releaseOnDestroy_(releaseOnDestroy) {
+  if (!MayUseSource(connStrings, false)) return;
   DataManager& manager = GetGlobalDataManager();
   DataConnectionPtr connection = useProxy ? manager.Connect(connStrings, geoRef, metadata)
                                           : manager.ConnectDirect(connStrings, geoRef, metadata);

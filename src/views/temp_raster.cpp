@@ -1,5 +1,6 @@
 #include <cstdio>
 
+#include "data/access_policy.h"
 #include "foundation/fault.h"
 #include "views/temp_raster_impl.h"
 
@@ -11,6 +12,8 @@ constexpr unsigned kNames = 10000;
 std::string TempDirectory(const String& wanted) {
   std::error_code fault;
   std::string directory = wanted.ToUTF8();
+  const std::vector<std::string> roots = GetAccessPolicy().roots;
+  if (directory.empty() && !roots.empty()) directory = roots.front();
   if (directory.empty() || !std::filesystem::is_directory(directory, fault)) {
     directory = std::filesystem::temp_directory_path(fault).string();
   }
@@ -37,6 +40,7 @@ String TempFileName(const String& directory, const String& prefix, const String&
     std::snprintf(digits, sizeof(digits), "%04u", i);
     std::string name = start;
     name.append(digits).append(end);
+    if (i == 0 && !MayUseSource(ConnStrings({name}), true)) return {};
     std::FILE* const file = std::fopen(name.c_str(), "wbx");
     if (file != nullptr) {
       std::fclose(file);

@@ -32,11 +32,8 @@ typename TempRaster<T>::Made TempRaster<T>::Make(const Context& context, RasterD
   Made made;
   made.fileName = TempFileName(context.WorkingDirectory(), "tmpraster", "");
   if (made.fileName.GetLength() == 0) return made;
-  Array<String> connStrings(ArrayDims(2));
-  connStrings[0] = def.format;
-  connStrings[1] = made.fileName;
-  made.raster =
-      RasterPtr<T>(MakeReaderRaster(GetGlobalDataManager().CreateRaster(connStrings, def)));
+  made.raster = RasterPtr<T>(MakeReaderRaster(
+      GetGlobalDataManager().CreateRaster(ConnStrings({def.format, made.fileName}), def)));
   return made;
 }
 

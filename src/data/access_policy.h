@@ -1,0 +1,44 @@
+#pragma once
+
+#include <string>
+#include <vector>
+
+#include "data/format_table.h"
+
+namespace lumo {
+
+/// What sources may be opened and made. The default allows everything, as suits a program that does
+/// what its user says; a server that takes jobs from others sets a narrower one.
+struct AccessPolicy {
+  /// Folders that hold all sources, outputs and temporary files, links resolved; none: no limit.
+  std::vector<std::string> roots;
+  bool network = true;       ///< formats and names that reach over the network
+  bool virtualFiles = true;  ///< names of files inside other files, or that stand for no file
+  bool memory = true;        ///< names of memory addresses
+  bool indirect = true;      ///< formats whose files name further files to read
+};
+
+/// Takes over a policy for the process, before the first source is opened. False, with the fault
+/// text told and nothing changed, when a root is no directory.
+VEXG_EXPORT bool SetAccessPolicy(const AccessPolicy& policy);
+
+/// The policy in force, its roots resolved.
+VEXG_EXPORT AccessPolicy GetAccessPolicy();
+
+/// True when sources of the format may be opened and made; else tells the fault.
+VEXG_EXPORT bool MayUseFormat(const FormatRecord& format);
+
+/// While one lives, this thread may open the library's own blocks of memory, whatever the policy.
+class VEXG_EXPORT OwnMemoryScope {
+ public:
+  OwnMemoryScope();
+  ~OwnMemoryScope();
+  OwnMemoryScope(const OwnMemoryScope&) = delete;
+  OwnMemoryScope& operator=(const OwnMemoryScope&) = delete;
+};
+
+/// True when all the pieces of a source's name may be used; else tells the fault.
+/// @param making  the source is to be made: it need not exist, its folder has to.
+VEXG_EXPORT bool MayUseSource(const Array<String>& connStrings, bool making);
+
+}  // namespace lumo
