@@ -67,9 +67,7 @@ class DynamicRasterStats : public ErrorState {
   using Entries = std::vector<RasterBandStats<T>>;
 
   bool CheckRunning() const;
-  bool Start(const IPC& ipc) const;
   const RasterBandStats<T>* FindEntry(unsigned band, unsigned mask) const;
-  void Compute(const IPC& ipc);
   template <typename Value>
   auto Get(unsigned band, unsigned bit, const IPC& ipc, const Value& value);
 
