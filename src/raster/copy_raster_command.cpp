@@ -55,7 +55,7 @@ class CopyRasterCommand final : public RasterCommand {
     }
     Array<unsigned> bands = AllBands(*source);
     if (HasInput("Bands")) bands = Read<Array<unsigned>>("Bands");
-    if (!CheckBands(*source, bands)) return Fail("Bands is not an integer array");
+    if (!CheckBands(*source, bands)) return FailTold("Bands is not an integer array");
     if (bands.GetCount() != target->Bands()) return Fail("the numbers of bands differ");
 
     const bool copied = DispatchType(TwelveTypes{}, source->DataType(), [&]<typename T>() {
@@ -63,7 +63,7 @@ class CopyRasterCommand final : public RasterCommand {
     });
     // A half copy never passes for a whole one.
     if (GetIPC().abort->IsSet()) return Fail("the copy was aborted");
-    return copied ? Succeed() : Fail("the pixels could not be copied");
+    return copied ? Succeed() : FailTold("the pixels could not be copied");
   }
 
   template <typename T>
