@@ -127,11 +127,6 @@ CommandResult Command::Fail(const String& reason) {
   return CommandResult::kFailed;
 }
 
-CommandResult Command::FailTold(const String& otherwise) {
-  const String told = TakeFault();
-  return Fail(told.GetLength() != 0 ? told : otherwise);
-}
-
 void Command::CatalogAdd(const ObjectPtr& object) {
   catalog::Add(object);
 }

@@ -124,8 +124,6 @@ class VEXG_EXPORT Command : public ErrorState {
   /// Gives up: stores CommandErrorFail, state kFinished, result kFailed. The first reason stays; a
   /// call without one takes the fault text of the thread.
   CommandResult Fail(const String& reason = {});
-  /// Fail with the fault text of the thread, or with `otherwise` when none was told.
-  CommandResult FailTold(const String& otherwise);
 
   /// The abort flag and progress report of the run in progress.
   const IPC& GetIPC() const { return ipc_; }

@@ -49,8 +49,8 @@ class MtConnection : public Base {
   bool running_;
 };
 
-extern template class MtConnection<RasterDataConnection>;
-extern template class MtConnection<VectorDataConnection>;
+extern template class VEXG_EXPORT MtConnection<RasterDataConnection>;
+extern template class VEXG_EXPORT MtConnection<VectorDataConnection>;
 
 /// A raster source on a thread of its own.
 class VEXG_EXPORT MtRasterDataConnection final : public MtConnection<RasterDataConnection> {

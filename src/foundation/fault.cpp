@@ -17,4 +17,9 @@ String TakeFault() {
   return std::exchange(tFault, String());
 }
 
+String TakeFaultOr(const char* otherwise) {
+  const String told = TakeFault();
+  return told.GetLength() != 0 ? told : String(otherwise);
+}
+
 }  // namespace lumo

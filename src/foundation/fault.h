@@ -15,4 +15,7 @@ VEXG_EXPORT void SetFault(const String& text);
 /// Takes the text off the thread; no text when nothing was told since the last call.
 VEXG_EXPORT String TakeFault();
 
+/// TakeFault, or `otherwise` when nothing was told.
+VEXG_EXPORT String TakeFaultOr(const char* otherwise);
+
 }  // namespace lumo

@@ -1,3 +1,4 @@
+#include "foundation/fault.h"
 #include "raster/raster_command.h"
 #include "raster/raster_tasks.h"
 #include "tasks/process_builder.h"
@@ -55,7 +56,7 @@ class CopyRasterCommand final : public RasterCommand {
     }
     Array<unsigned> bands = AllBands(*source);
     if (HasInput("Bands")) bands = Read<Array<unsigned>>("Bands");
-    if (!CheckBands(*source, bands)) return FailTold("Bands is not an integer array");
+    if (!CheckBands(*source, bands)) return Fail();
     if (bands.GetCount() != target->Bands()) return Fail("the numbers of bands differ");
 
     const bool copied = DispatchType(TwelveTypes{}, source->DataType(), [&]<typename T>() {
@@ -63,7 +64,7 @@ class CopyRasterCommand final : public RasterCommand {
     });
     // A half copy never passes for a whole one.
     if (GetIPC().abort->IsSet()) return Fail("the copy was aborted");
-    return copied ? Succeed() : FailTold("the pixels could not be copied");
+    return copied ? Succeed() : Fail(TakeFaultOr("the pixels could not be copied"));
   }
 
   template <typename T>

@@ -13,13 +13,17 @@ BasicRasterPtr RasterCommand::FindRaster(const char* name) const {
 }
 
 bool RasterCommand::CheckBands(const BasicRaster& raster, const Array<unsigned>& bands) {
+  if (!bands.IsValid() || bands.GetCount() == 0) {
+    SetFault(bands.IsValid() ? "no band is named" : "the bands are no integer array");
+    return false;
+  }
   for (const unsigned band : bands) {
     if (band < raster.Bands()) continue;
     SetFault("band " + std::to_string(band) + ": the raster has " + std::to_string(raster.Bands()) +
              ", counted from 0");
     return false;
   }
-  return bands.IsValid();
+  return true;
 }
 
 }  // namespace lumo

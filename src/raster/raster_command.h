@@ -18,7 +18,7 @@ class VEXG_EXPORT RasterCommand : public Command {
     return RasterPtr<T>(FindRaster(name));
   }
 
-  /// True when every band of the array is one of the raster; else tells the fault.
+  /// True when the array names bands, all of them the raster's; else tells the fault.
   static bool CheckBands(const BasicRaster& raster, const Array<unsigned>& bands);
 };
 

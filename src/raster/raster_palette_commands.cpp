@@ -20,7 +20,7 @@ class GetRasterPaletteCommand final : public RasterCommand {
     const BasicRasterPtr raster = FindRaster();
     if (!raster) return Fail();
     const auto bands = Read<Array<unsigned>>("Bands");
-    if (!CheckBands(*raster, bands)) return FailTold("Bands is not an integer array");
+    if (!CheckBands(*raster, bands)) return Fail();
     Array<Palette> palettes(bands.GetDims());
     for (unsigned i = 0; i < bands.GetCount(); ++i) {
       const PalettePtr palette = raster->Palette(bands[i]);
@@ -69,7 +69,7 @@ class DeleteRasterPaletteCommand final : public RasterCommand {
     const BasicRasterPtr raster = FindRaster();
     if (!raster) return Fail();
     const auto bands = Read<Array<unsigned>>("Bands");
-    if (!CheckBands(*raster, bands)) return FailTold("Bands is not an integer array");
+    if (!CheckBands(*raster, bands)) return Fail();
     Array<bool> deleted(bands.GetDims());
     for (unsigned i = 0; i < bands.GetCount(); ++i) deleted[i] = raster->DeletePalette(bands[i]);
     Write("Return", deleted);

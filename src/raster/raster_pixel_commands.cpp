@@ -34,7 +34,7 @@ class BlockCommand : public RasterCommand {
       const RasterPtr<T> typed(raster);
       return typed && Transferred(*typed, transfer);
     });
-    return moved ? Succeed() : FailTold("the block could not be moved");
+    return moved ? Succeed() : Fail(TakeFaultOr("the block could not be moved"));
   }
 
  private:
@@ -66,10 +66,7 @@ class BlockCommand : public RasterCommand {
   template <typename T>
   static bool CheckBlock(const Raster<T>& raster, const SubRect& rect,
                          const Array<unsigned>& bands) {
-    if (!CheckBands(raster, bands) || bands.GetCount() == 0) {
-      if (bands.GetCount() == 0) SetFault("Bands names no band");
-      return false;
-    }
+    if (!CheckBands(raster, bands)) return false;
     if (rect.right < raster.Samples() && rect.bottom < raster.Lines()) return true;
     SetFault("SubRect reaches over the raster's " + std::to_string(raster.Samples()) + " by " +
              std::to_string(raster.Lines()) + " pixels");
