@@ -20,6 +20,8 @@ class FileDescriptor {
 
   bool IsOpen() const { return descriptor_ >= 0; }
   int Get() const { return descriptor_; }
+  /// Hands the file to the caller.
+  int Release() { return std::exchange(descriptor_, -1); }
   void Close() {
     if (descriptor_ >= 0) close(descriptor_);
     descriptor_ = -1;

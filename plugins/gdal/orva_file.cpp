@@ -1,0 +1,196 @@
+#include "orva_file.h"
+
+#include <filesystem>
+
+#include "data/format_table.h"
+#include "foundation/fault.h"
+
+namespace lumo::orva {
+namespace {
+
+using platform::RandomAccessFile;
+
+/// Beyond this no header is read or written: 200 bands with histograms of 65536 bins fit.
+constexpr std::uint64_t kMaxHeaderBytes = 256 << 20;
+
+/// Reads a header file.
+bool LoadText(const std::string& path, std::string& text, std::string& fault) {
+  const auto file = RandomAccessFile::Open(path, RandomAccessFile::Access::kRead, &fault);
+  std::uint64_t bytes = 0;
+  if (file == nullptr || !file->GetSize(bytes, &fault)) return false;
+  if (bytes > kMaxHeaderBytes) {
+    fault = path + ": line 1: too large for a header";
+    return false;
+  }
+  text.resize(bytes);
+  return file->Read(0, text.data(), text.size(), &fault);
+}
+
+void RemoveFile(const std::string& path) {
+  std::error_code ignored;
+  std::filesystem::remove(path, ignored);
+}
+
+}  // namespace
+
+bool File::Fail(const std::string& fault) const {
+  // A new raster lies beside its place at first; its user knows only the place.
+  const std::string shown = pixels_ != nullptr ? pixels_->Path() : path_;
+  SetFault(fault.starts_with(shown) ? path_ + fault.substr(shown.size()) : fault);
+  return false;
+}
+
+bool File::LoadHeader(Header& header) const {
+  const std::string headerPath = HeaderPath(path_);
+  std::string text, fault;
+  if (!LoadText(headerPath, text, fault)) return Fail(fault);
+  return ParseHeader(text, header, fault) || Fail(headerPath + ": " + fault);
+}
+
+std::unique_ptr<File> File::Open(const std::string& path) {
+  std::unique_ptr<File> file(new File(path));
+  if (!file->LoadHeader(file->header_)) return nullptr;
+  std::string fault;
+  file->pixels_ = RandomAccessFile::Open(path, RandomAccessFile::Access::kUpdate);
+  file->canWrite_ = file->pixels_ != nullptr;
+  if (!file->canWrite_) {
+    file->pixels_ = RandomAccessFile::Open(path, RandomAccessFile::Access::kRead, &fault);
+  }
+  std::uint64_t bytes = 0;
+  if (file->pixels_ == nullptr || !file->pixels_->GetSize(bytes, &fault)) {
+    file->Fail(fault);
+    return nullptr;
+  }
+  const std::uint64_t needed = file->header_.FileBytes();
+  if (bytes < needed) {
+    const HeaderText::Entry* const lines = file->header_.text.Find("lines");
+    file->Fail(HeaderPath(path) + ": line " + std::to_string(lines->line) + ": the pixels take " +
+               std::to_string(needed) + " bytes, the file has " + std::to_string(bytes));
+    return nullptr;
+  }
+  return file;
+}
+
+std::unique_ptr<File> File::Create(const std::string& path, const RasterDef& def) {
+  std::unique_ptr<File> file(new File(path));
+  file->failed_ = true;
+  std::string fault;
+  if (!MakeHeader(def, file->header_, fault)) {
+    file->Fail(path + ": " + fault);
+    return nullptr;
+  }
+  std::error_code missing;
+  if (std::filesystem::exists(path, missing) && !std::filesystem::is_regular_file(path, missing)) {
+    file->Fail(path + ": not a file");
+    return nullptr;
+  }
+  file->replaces_ =
+      std::filesystem::exists(path, missing) || std::filesystem::exists(HeaderPath(path), missing);
+  file->pixels_ = RandomAccessFile::Create(
+      file->replaces_ ? platform::TemporaryPathBeside(path) : path, &fault);
+  file->isNew_ = file->pixels_ != nullptr;
+  if (!file->isNew_ || !file->pixels_->SetSize(file->header_.FileBytes(), &fault)) {
+    file->Fail(fault);
+    return nullptr;
+  }
+  file->canWrite_ = true;
+  file->failed_ = false;
+  return file;
+}
+
+bool File::Close() {
+  if (!isNew_) return true;
+  isNew_ = false;
+  if (failed_) {
+    Discard();
+    return false;
+  }
+  if (!pixels_->HasName()) return true;  // its user deleted it
+  if (Publish()) return true;
+  Discard();
+  return false;
+}
+
+/// The new header is on the disk, under another name, before anything old goes; and at no moment
+/// does a header stand over pixels that are not its own.
+bool File::Publish() {
+  std::string fault;
+  const std::string headerPath = HeaderPath(path_);
+  const std::string newHeader = platform::TemporaryPathBeside(headerPath);
+  if (!pixels_->Flush(&fault) ||
+      !platform::WriteNewFile(newHeader, header_.text.Format(), &fault)) {
+    return Fail(fault);
+  }
+  const std::string oldHeader = platform::TemporaryPathBeside(headerPath);
+  const bool hadHeader = replaces_ && platform::RenameFile(headerPath, oldHeader);
+  const bool placed = !replaces_ || platform::RenameFile(pixels_->Path(), path_, &fault);
+  const bool done = placed && platform::RenameFile(newHeader, headerPath, &fault);
+  if (!done) RemoveFile(newHeader);
+  if (hadHeader && placed) RemoveFile(oldHeader);
+  if (hadHeader && !placed) platform::RenameFile(oldHeader, headerPath);
+  return done || Fail(fault);
+}
+
+void File::Discard() {
+  if (pixels_->HasName()) RemoveFile(pixels_->Path());
+}
+
+bool File::Read(std::uint64_t offset, std::span<const platform::FilePiece> pieces) const {
+  std::string fault;
+  return pixels_->Read(offset, pieces, &fault) || Fail(fault);
+}
+
+bool File::Write(std::uint64_t offset, std::span<const platform::ConstFilePiece> pieces) {
+  std::string fault;
+  if (pixels_->Write(offset, pieces, &fault)) return true;
+  failed_ = true;
+  return Fail(fault);
+}
+
+bool File::ChangeHeader(const std::function<bool(Header&)>& change) {
+  if (!canWrite_) return Fail(path_ + ": opened for reading only");
+  if (!isNew_ && !pixels_->HasName()) return Fail(path_ + ": replaced since it was opened");
+  Header header = header_;
+  if (!isNew_ && !LoadHeader(header)) return false;
+  const std::string before = header.text.Format();
+  if (!change(header)) return false;
+  const std::string text = header.text.Format();
+  std::string fault;
+  if (text.size() > kMaxHeaderBytes) return Fail(HeaderPath(path_) + ": too much for a header");
+  if (!isNew_ && text != before && !platform::ReplaceFile(HeaderPath(path_), text, &fault)) {
+    return Fail(fault);
+  }
+  header_.text = std::move(header.text);
+  return true;
+}
+
+std::string FindPath(const Array<String>& connStrings) {
+  Array<String> rest;
+  RemoveFormatNames(connStrings, rest);
+  std::string path = rest.GetCount() == 1 ? rest[0].ToUTF8() : std::string();
+  constexpr std::string_view kSuffix = ".hdr";
+  if (path.size() > kSuffix.size() && path.ends_with(kSuffix)) {
+    path.resize(path.size() - kSuffix.size());
+  }
+  if (path.empty()) {
+    SetFault("ORVA: the connection strings don't name one file");
+    return {};
+  }
+  std::error_code fault;
+  const std::string absolute = std::filesystem::weakly_canonical(path, fault).string();
+  if (fault) SetFault(path + ": " + fault.message());
+  return fault ? std::string() : absolute;
+}
+
+bool HasHeader(const std::string& path) {
+  const auto file = RandomAccessFile::Open(HeaderPath(path), RandomAccessFile::Access::kRead);
+  char start[5] = {};
+  std::uint64_t bytes = 0;
+  if (file == nullptr || !file->GetSize(bytes) || bytes < sizeof start ||
+      !file->Read(0, start, sizeof start)) {
+    return false;
+  }
+  return std::string_view(start, 4) == "ORVA" && (start[4] == '\n' || start[4] == '\r');
+}
+
+}  // namespace lumo::orva

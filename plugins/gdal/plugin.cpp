@@ -1,0 +1,8 @@
+#include "data/data_connection.h"
+#include "orva_factory.h"
+
+/// The entry point of the plug-in.
+extern "C" VEXG_EXPORT lumo::DataConnectionFactory* CreateDataConnectionFactory(
+    lumo::FormatRecord* record) {
+  return record->name == "ORVA" ? lumo::MakeOrvaFactory(*record) : nullptr;
+}

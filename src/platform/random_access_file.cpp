@@ -1,0 +1,188 @@
+#include "platform/random_access_file.h"
+
+#include <algorithm>
+#include <atomic>
+#include <cerrno>
+#include <climits>
+#include <cstdio>
+#include <fcntl.h>
+#include <sys/stat.h>
+#include <sys/uio.h>
+#include <system_error>
+#include <unistd.h>
+
+#include "platform/file_descriptor.h"
+
+namespace lumo::platform {
+namespace {
+
+bool Fail(std::string* fault, const std::string& path, const std::string& what) {
+  if (fault != nullptr) *fault = path + ": " + what;
+  return false;
+}
+
+bool FailBySystem(std::string* fault, const std::string& path, int error) {
+  return Fail(fault, path, std::generic_category().message(error));
+}
+
+template <typename Call>
+auto RetryInterrupted(Call&& call) {
+  auto result = call();
+  while (result < 0 && errno == EINTR) result = call();
+  return result;
+}
+
+/// Only files whose bytes stand at places.
+bool IsRegular(int descriptor) {
+  struct stat status {};
+  return fstat(descriptor, &status) == 0 && S_ISREG(status.st_mode);
+}
+
+iovec Vector(const FilePiece& piece) {
+  return {piece.data, piece.bytes};
+}
+iovec Vector(const ConstFilePiece& piece) {
+  return {const_cast<void*>(piece.data), piece.bytes};
+}
+
+/// Takes `moved` bytes off the front of the vectors; gives the first that has some left.
+iovec* Advance(iovec* at, const iovec* end, std::size_t moved) {
+  for (; at != end && moved >= at->iov_len; ++at) moved -= at->iov_len;
+  if (at != end) {
+    at->iov_base = static_cast<char*>(at->iov_base) + moved;
+    at->iov_len -= moved;
+  }
+  return at;
+}
+
+/// Moves all pieces by as many calls of preadv or pwritev as it takes.
+/// @param call  (vectors, count, place), as the system's.
+/// @return 0, the system's number for what went wrong, or kEnded.
+constexpr int kEnded = -1;
+template <typename Piece, typename Call>
+int Transfer(std::uint64_t offset, std::span<const Piece> pieces, Call&& call) {
+  iovec vectors[IOV_MAX];
+  while (!pieces.empty()) {
+    const std::size_t count = std::min<std::size_t>(pieces.size(), IOV_MAX);
+    std::transform(pieces.begin(), pieces.begin() + static_cast<std::ptrdiff_t>(count), vectors,
+                   [](const Piece& piece) { return Vector(piece); });
+    pieces = pieces.subspan(count);
+    const iovec* const end = vectors + count;
+    for (iovec* at = Advance(vectors, end, 0); at != end;) {
+      if (offset > static_cast<std::uint64_t>(INT64_MAX)) return EFBIG;
+      const ssize_t moved = RetryInterrupted(
+          [&] { return call(at, static_cast<int>(end - at), static_cast<off_t>(offset)); });
+      if (moved < 0) return errno;
+      if (moved == 0) return kEnded;
+      offset += static_cast<std::uint64_t>(moved);
+      at = Advance(at, end, static_cast<std::size_t>(moved));
+    }
+  }
+  return 0;
+}
+
+}  // namespace
+
+std::unique_ptr<RandomAccessFile> RandomAccessFile::Open(const std::string& path, Access access,
+                                                         std::string* fault) {
+  const int mode = (access == Access::kRead ? O_RDONLY : O_RDWR) | O_CLOEXEC | O_NONBLOCK;
+  FileDescriptor file(RetryInterrupted([&] { return open(path.c_str(), mode); }));
+  if (!file.IsOpen()) {
+    FailBySystem(fault, path, errno);
+    return nullptr;
+  }
+  if (!IsRegular(file.Get())) {
+    Fail(fault, path, "not a file");
+    return nullptr;
+  }
+  return std::unique_ptr<RandomAccessFile>(new RandomAccessFile(path, file.Release()));
+}
+
+std::unique_ptr<RandomAccessFile> RandomAccessFile::Create(const std::string& path,
+                                                           std::string* fault) {
+  constexpr mode_t kReadableByAll = 0666;  // less what the process masks
+  constexpr int kMode = O_RDWR | O_CREAT | O_EXCL | O_CLOEXEC;
+  FileDescriptor file(RetryInterrupted([&] { return open(path.c_str(), kMode, kReadableByAll); }));
+  if (!file.IsOpen()) {
+    FailBySystem(fault, path, errno);
+    return nullptr;
+  }
+  return std::unique_ptr<RandomAccessFile>(new RandomAccessFile(path, file.Release()));
+}
+
+RandomAccessFile::~RandomAccessFile() {
+  close(descriptor_);
+}
+
+bool RandomAccessFile::Read(std::uint64_t offset, std::span<const FilePiece> pieces,
+                            std::string* fault) const {
+  const int error = Transfer(offset, pieces, [this](const iovec* at, int count, off_t place) {
+    return preadv(descriptor_, at, count, place);
+  });
+  if (error == kEnded) return Fail(fault, path_, "the file is too short");
+  return error == 0 || FailBySystem(fault, path_, error);
+}
+
+bool RandomAccessFile::Write(std::uint64_t offset, std::span<const ConstFilePiece> pieces,
+                             std::string* fault) {
+  const int error = Transfer(offset, pieces, [this](const iovec* at, int count, off_t place) {
+    return pwritev(descriptor_, at, count, place);
+  });
+  return error == 0 || FailBySystem(fault, path_, error == kEnded ? ENOSPC : error);
+}
+
+bool RandomAccessFile::GetSize(std::uint64_t& bytes, std::string* fault) const {
+  struct stat status {};
+  if (fstat(descriptor_, &status) != 0) return FailBySystem(fault, path_, errno);
+  bytes = static_cast<std::uint64_t>(status.st_size);
+  return true;
+}
+
+bool RandomAccessFile::SetSize(std::uint64_t bytes, std::string* fault) {
+  if (bytes > static_cast<std::uint64_t>(INT64_MAX)) return FailBySystem(fault, path_, EFBIG);
+  const auto cut = [&] { return ftruncate(descriptor_, static_cast<off_t>(bytes)); };
+  return RetryInterrupted(cut) == 0 || FailBySystem(fault, path_, errno);
+}
+
+bool RandomAccessFile::Flush(std::string* fault) {
+  return RetryInterrupted([this] { return fsync(descriptor_); }) == 0 ||
+         FailBySystem(fault, path_, errno);
+}
+
+bool RandomAccessFile::HasName() const {
+  struct stat mine {
+  }, named{};
+  return fstat(descriptor_, &mine) == 0 && stat(path_.c_str(), &named) == 0 &&
+         mine.st_dev == named.st_dev && mine.st_ino == named.st_ino;
+}
+
+bool RenameFile(const std::string& from, const std::string& to, std::string* fault) {
+  return std::rename(from.c_str(), to.c_str()) == 0 || FailBySystem(fault, to, errno);
+}
+
+std::string TemporaryPathBeside(const std::string& path) {
+  static std::atomic<unsigned> count{0};
+  return path + "." + std::to_string(getpid()) + "-" + std::to_string(count++) + ".tmp";
+}
+
+bool WriteNewFile(const std::string& path, std::string_view content, std::string* fault) {
+  const auto file = RandomAccessFile::Create(path, fault);
+  if (file == nullptr) return false;
+  if (file->Write(0, content.data(), content.size(), fault) && file->Flush(fault)) return true;
+  std::remove(path.c_str());
+  return false;
+}
+
+bool ReplaceFile(const std::string& path, std::string_view content, std::string* fault) {
+  const std::string temporary = TemporaryPathBeside(path);
+  std::string why;
+  const bool written = WriteNewFile(temporary, content, &why);
+  if (written && RenameFile(temporary, path, &why)) return true;
+  if (written) std::remove(temporary.c_str());
+  if (fault != nullptr) {  // the temporary path would tell nobody anything
+    *fault = why.starts_with(temporary) ? path + why.substr(temporary.size()) : why;
+  }
+  return false;
+}
+
+}  // namespace lumo::platform

@@ -1,0 +1,105 @@
+#pragma once
+
+#include <cstddef>
+#include <cstdint>
+#include <memory>
+#include <span>
+#include <string>
+#include <string_view>
+
+#include "platform/export.h"
+
+namespace lumo::platform {
+
+/// A stretch of memory that takes part in a transfer.
+struct FilePiece {
+  void* data;
+  std::size_t bytes;
+};
+struct ConstFilePiece {
+  const void* data;
+  std::size_t bytes;
+};
+
+/// An open file that is read and written at any place. Nothing is buffered here.
+///
+/// Threads: any number of threads may transfer at once; what they do to one place is theirs to
+///          order.
+/// Failure: false or null, and one line in `fault`, where that isn't null: "path: what". A transfer
+///          that fails half way may have moved some of its bytes.
+class VEXG_EXPORT RandomAccessFile {
+ public:
+  enum class Access {
+    kRead,
+    kUpdate,  ///< reading and writing
+  };
+
+  /// Opens a regular file that exists.
+  /// @param path  UTF-8.
+  static std::unique_ptr<RandomAccessFile> Open(const std::string& path, Access access,
+                                                std::string* fault = nullptr);
+
+  /// Makes an empty file and opens it for kUpdate. Fails where there is one already.
+  static std::unique_ptr<RandomAccessFile> Create(const std::string& path,
+                                                  std::string* fault = nullptr);
+
+  ~RandomAccessFile();
+  RandomAccessFile(const RandomAccessFile&) = delete;
+  RandomAccessFile& operator=(const RandomAccessFile&) = delete;
+
+  const std::string& Path() const { return path_; }
+
+  /// Reads from `offset` into one piece after the other. A file that ends before is a failure.
+  bool Read(std::uint64_t offset, std::span<const FilePiece> pieces,
+            std::string* fault = nullptr) const;
+  bool Read(std::uint64_t offset, void* data, std::size_t bytes,
+            std::string* fault = nullptr) const {
+    const FilePiece piece{data, bytes};
+    return Read(offset, std::span(&piece, 1), fault);
+  }
+
+  /// Writes one piece after the other from `offset` on. The file grows where it must.
+  bool Write(std::uint64_t offset, std::span<const ConstFilePiece> pieces,
+             std::string* fault = nullptr);
+  bool Write(std::uint64_t offset, const void* data, std::size_t bytes,
+             std::string* fault = nullptr) {
+    const ConstFilePiece piece{data, bytes};
+    return Write(offset, std::span(&piece, 1), fault);
+  }
+
+  bool GetSize(std::uint64_t& bytes, std::string* fault = nullptr) const;
+
+  /// Cuts the file, or lets it grow by zeros that take no room on the disk.
+  bool SetSize(std::uint64_t bytes, std::string* fault = nullptr);
+
+  /// Returns when what was written is on the disk.
+  bool Flush(std::string* fault = nullptr);
+
+  /// False when the file was deleted, or replaced by another, since it was opened.
+  bool HasName() const;
+
+ private:
+  RandomAccessFile(std::string path, int descriptor)
+      : path_(std::move(path)), descriptor_(descriptor) {}
+
+  const std::string path_;
+  const int descriptor_;
+};
+
+/// Makes a file that holds `content`, on the disk when this returns; none when it fails.
+VEXG_EXPORT bool WriteNewFile(const std::string& path, std::string_view content,
+                              std::string* fault = nullptr);
+
+/// Puts a file with `content` at `path`, in one step that other programs see whole or not at all,
+/// and that a crash of the machine doesn't tear. What stood there stays when it fails.
+VEXG_EXPORT bool ReplaceFile(const std::string& path, std::string_view content,
+                             std::string* fault = nullptr);
+
+/// A path beside `path` that nobody else uses, for a file that is to take its place.
+VEXG_EXPORT std::string TemporaryPathBeside(const std::string& path);
+
+/// Gives the file `from` the path `to`, in place of what stood there.
+VEXG_EXPORT bool RenameFile(const std::string& from, const std::string& to,
+                            std::string* fault = nullptr);
+
+}  // namespace lumo::platform
