@@ -213,17 +213,19 @@ bool ReaderRaster<T>::WriteStats() {
 template <typename T>
 Array<RasterBandHistogram<T>> ReaderRaster<T>::BandHistogram(unsigned band) const {
   Array<RasterBandHistogram<T>> merged;
-  const auto join = [&](const Array<RasterBandHistogram<T>>& histograms) {
-    for (const RasterBandHistogram<T>& histogram : histograms) {
-      const bool counts = histogram.band == band && histogram.source != StatsSource::kUnknown;
-      if (!counts || std::find(merged.begin(), merged.end(), histogram) != merged.end()) continue;
-      const unsigned at = merged.GetCount();
-      if (merged.Resize(ArrayDims(at + 1))) merged[at] = histogram;
-    }
-  };
-  if (pyramidReader_) join(pyramidReader_->Histogram(band));
-  join(ComputedRaster<T>::BandHistogram(band));
-  if (reader_) join(reader_->Histogram(band));
+  if constexpr (std::is_arithmetic_v<T>) {  // complex numbers have none
+    const auto join = [&](const Array<RasterBandHistogram<T>>& histograms) {
+      for (const RasterBandHistogram<T>& histogram : histograms) {
+        const bool counts = histogram.band == band && histogram.source != StatsSource::kUnknown;
+        if (!counts || std::find(merged.begin(), merged.end(), histogram) != merged.end()) continue;
+        const unsigned at = merged.GetCount();
+        if (merged.Resize(ArrayDims(at + 1))) merged[at] = histogram;
+      }
+    };
+    if (pyramidReader_) join(pyramidReader_->Histogram(band));
+    join(ComputedRaster<T>::BandHistogram(band));
+    if (reader_) join(reader_->Histogram(band));
+  }
   return merged;
 }
 
