@@ -26,7 +26,10 @@ bool Reader<T>::Change(F&& change) {
   BandValues<T> changed;
   const bool stored = file_.ChangeHeader([&](Header& header) {
     std::string fault;
-    if (!changed.Read(header, fault)) return Fail(fault.c_str());
+    if (!changed.Read(header, fault)) {
+      SetFault(HeaderPath(file_.Path()) + ": " + fault);
+      return false;
+    }
     change(changed);
     changed.Write(header.text);
     return true;
@@ -93,7 +96,8 @@ bool Reader<T>::WriteHistogram(const Array<RasterBandHistogram<T>>& histograms) 
   if (!kHasStats) return Fail("complex pixels have no histograms");
   for (const RasterBandHistogram<T>& histogram : histograms) {
     if (histogram.band >= Bands()) return Fail("a histogram of a band that isn't there");
-    if (histogram.counts.GetCount() != histogram.binCount) return Fail("a histogram without counts");
+    if (histogram.counts.GetCount() != histogram.binCount)
+      return Fail("a histogram without counts");
   }
   return Change([&](BandValues<T>& values) {
     values.histograms.assign(histograms.begin(), histograms.end());

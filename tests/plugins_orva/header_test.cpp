@@ -142,6 +142,22 @@ TEST(OrvaHeader, TakesHandWrittenForms) {
   EXPECT_EQ(def.noData, (std::map<unsigned, double>{{0, 1}, {2, 20}}));
 }
 
+TEST(OrvaHeader, TheExampleOfTheDocumentOpens) {
+  const std::string document = ReadFile(VEXG_SOURCE_DIR "/docs/file-formats.md");
+  const std::size_t begin = document.find("ORVA\nsamples");
+  ASSERT_NE(begin, std::string::npos);
+  const HeaderCase files;
+  files.WriteHeader(document.substr(begin, document.find("```", begin) - begin));
+  std::filesystem::resize_file(files.path, 349U * 352 * 3 * 2);
+  const auto source = files.Open();
+  ASSERT_TRUE(source) << TakeFault().ToUTF8();
+  double x = 0, y = 0;
+  ASSERT_TRUE(source->RasterDef().geoRef);
+  ASSERT_TRUE(source->RasterDef().geoRef->PixelToMap(349, 352, x, y));
+  EXPECT_NEAR(x, 298722.8, 1e-6);  // its map points say so
+  EXPECT_NEAR(y, 9110728.8, 1e-6);
+}
+
 TEST(OrvaHeader, FoundByItsFirstLineUnderBothNames) {
   const HeaderCase files;
   files.WriteHeader(files.scene.Header("Byte"));
