@@ -9,6 +9,7 @@
 #include "common/messages.h"
 #include "foundation/fault.h"
 #include "gdal_georef.h"
+#include "gdal_side_file.h"
 #include "gdal_types.h"
 #include "platform/random_access_file.h"
 
@@ -90,7 +91,7 @@ bool DiffersByBand(const RasterDef& def) {
   if (def.noData.size() != def.bands) return true;
   const double first = def.noData.begin()->second;
   for (const auto& [band, value] : def.noData) {
-    if (value != first && !(value != value && first != first)) return true;
+    if (!IsSameNumber(value, first)) return true;
   }
   return false;
 }
@@ -173,6 +174,9 @@ bool NewRaster::CheckTarget() const {
   }
   const PixelType type = PixelTypeOf(def_.dataType);
   if (type.type == GDT_Unknown) return Fail("no raster can have this pixel type");
+  if (driver_ == "JPEG" && type.type != GDT_Byte) {
+    return Fail("the format holds bytes only");  // of 16 bits GDAL would keep 12
+  }
   if (type.isSignedByte && !HoldsSignedBytes(GDALGetDriverByName(driver_.c_str()))) {
     return Fail("the format can't hold signed bytes");
   }
@@ -186,27 +190,32 @@ bool NewRaster::CheckTarget() const {
 }
 
 /// Makes a raster of a few pixels in GDAL's memory: the driver itself says what it can't hold.
-bool NewRaster::TryTheFormat() const {
+bool NewRaster::TryTheFormat() {
   if (!FindMaker(driver_)->isCopied) return true;
+  std::string fault;
+  if (TrySample(fault)) return true;
+  isBare_ = true;
+  return (def_.geoRef && TrySample(fault)) || Fail(fault);
+}
+
+bool NewRaster::TrySample(std::string& fault) const {
   const Messages messages;
+  fault = "the format can't hold such pixels";
   constexpr int kSide = 32;
-  const PixelType type = PixelTypeOf(def_.dataType);
+  const GDALDataType type = PixelTypeOf(def_.dataType).type;
   const DatasetPtr sample(GDALCreate(GDALGetDriverByName("MEM"), "", kSide, kSide,
-                                     static_cast<int>(def_.bands), type.type, nullptr));
+                                     static_cast<int>(def_.bands), type, nullptr));
+  if (sample == nullptr || !Describe(sample.get())) return false;
   const std::string name = "/vsimem/vexg" + fs::path(temporary_).filename().string();
-  CPLStringList options = OptionsOf(*FindMaker(driver_));
-  const DatasetPtr copy(sample == nullptr
-                            ? nullptr
-                            : GDALCreateCopy(GDALGetDriverByName(driver_.c_str()), name.c_str(),
-                                             sample.get(), TRUE, options.List(), nullptr, nullptr));
+  DatasetPtr copy = CopyTo(name, sample.get());
   const bool fits = copy != nullptr && !messages.HasError() &&
                     GDALGetRasterCount(copy.get()) == static_cast<int>(def_.bands) &&
-                    GDALGetRasterDataType(GDALGetRasterBand(copy.get(), 1)) == type.type;
-  if (copy != nullptr) GDALDeleteDataset(GDALGetDriverByName(driver_.c_str()), name.c_str());
+                    GDALGetRasterDataType(GDALGetRasterBand(copy.get(), 1)) == type;
+  copy.reset();
   VSIUnlink(name.c_str());
-  if (fits) return true;
-  const std::string what = messages.Text();
-  return Fail(what.empty() ? "the format can't hold such pixels" : what);
+  for (const char* const suffix : kSideFiles) VSIUnlink((name + suffix).c_str());
+  if (messages.HasError()) fault = messages.Text();
+  return fits;
 }
 
 DatasetPtr NewRaster::MakeDirectly() const {
@@ -245,11 +254,12 @@ DatasetPtr NewRaster::MakeForCopy() {
   return dataset;
 }
 
-/// Gives a new dataset all but its pixels.
+/// Gives a new dataset all but its pixels, as far as the format has room for it.
 bool NewRaster::Describe(GDALDatasetH dataset) const {
+  if (isBare_) return true;
   if (def_.geoRef && !WriteGeoRef(dataset, *def_.geoRef)) return false;
   const bool isTiff = GDALGetDatasetDriver(dataset) == GDALGetDriverByName("GTiff");
-  // A TIFF file has room for one value; see NoteNoDataByBand.
+  // A TIFF file has room for one value.
   return (isTiff && DiffersByBand(def_)) || SetNoData(dataset, def_);
 }
 
@@ -265,28 +275,28 @@ bool NewRaster::Finish(DatasetPtr dataset) {
     dataset.reset();
     if (messages.HasError()) return Fail(messages.Text());
   }
-  return NoteNoDataByBand() && IsWhole() && TakePlace();
+  return WriteBeside() && IsWhole() && TakePlace();
+}
+
+DatasetPtr NewRaster::CopyTo(const std::string& name, GDALDatasetH dataset) const {
+  CPLStringList options = OptionsOf(*FindMaker(driver_));
+  return DatasetPtr(GDALCreateCopy(GDALGetDriverByName(driver_.c_str()), name.c_str(), dataset,
+                                   TRUE, options.List(), nullptr, nullptr));
 }
 
 bool NewRaster::CopyToFormat(DatasetPtr dataset) const {
   const Messages messages;
-  CPLStringList options = OptionsOf(*FindMaker(driver_));
-  DatasetPtr copy(GDALCreateCopy(GDALGetDriverByName(driver_.c_str()), temporary_.c_str(),
-                                 dataset.get(), TRUE, options.List(), nullptr, nullptr));
-  const bool made = copy != nullptr;
+  DatasetPtr copy = CopyTo(temporary_, dataset.get());
+  const bool isMade = copy != nullptr;
   copy.reset();
-  dataset.reset();
-  return (made && !messages.HasError()) || Fail(messages.Text());
+  return (isMade && !messages.HasError()) || Fail(messages.Text());
 }
 
-/// Values that differ by band go beside the file, where GDAL keeps what a format has no room for.
-bool NewRaster::NoteNoDataByBand() const {
-  if (driver_ != "GTiff" || !DiffersByBand(def_)) return true;
+/// What the format has no room for.
+bool NewRaster::WriteBeside() const {
   const Messages messages;
-  DatasetPtr dataset(GDALOpen(temporary_.c_str(), GA_ReadOnly));
-  if (dataset == nullptr || !SetNoData(dataset.get(), def_)) return Fail(messages.Text());
-  dataset.reset();
-  return (!messages.HasError() && !messages.HasWarning()) || Fail(messages.Text());
+  const bool isSet = CompleteBeside(temporary_, driver_, def_);
+  return (isSet && !messages.HasError() && !messages.HasWarning()) || Fail(messages.Text());
 }
 
 /// Opens the file once more and reads its last pixel: not every driver reports a disk that is full.

@@ -37,12 +37,14 @@ class NewRaster {
  private:
   NewRaster(std::string driver, const std::string& path, const RasterDef& def);
   bool CheckTarget() const;
-  bool TryTheFormat() const;
+  bool TryTheFormat();
+  bool TrySample(std::string& fault) const;
   DatasetPtr MakeDirectly() const;
   DatasetPtr MakeForCopy();
   bool Describe(GDALDatasetH dataset) const;
   bool CopyToFormat(DatasetPtr dataset) const;
-  bool NoteNoDataByBand() const;
+  DatasetPtr CopyTo(const std::string& name, GDALDatasetH dataset) const;
+  bool WriteBeside() const;
   bool IsWhole() const;
   bool TakePlace() const;
   std::string Shown(const std::string& text) const;
@@ -53,6 +55,7 @@ class NewRaster {
   const RasterDef def_;
   const std::string temporary_;  // of the format, beside the place
   std::string scratch_;          // the TIFF file that the copy is made from
+  bool isBare_ = false;          // the format refuses the geo-reference
   bool isDoomed_ = false;
 };
 

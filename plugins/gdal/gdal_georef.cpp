@@ -1,13 +1,9 @@
 #include "gdal_georef.h"
 
 #include <algorithm>
-#include <array>
 #include <cmath>
-#include <cpl_string.h>
 #include <cstdio>
 #include <gdal_alg.h>
-#include <limits>
-#include <map>
 #include <string>
 
 #include "common/coordsys.h"
@@ -16,14 +12,12 @@
 namespace lumo::gdal {
 namespace {
 
-using Transform = std::array<double, 6>;
-
 /// Pixel size and rotation of a grid; see StdGeoRef for their meaning.
 struct GridAxes {
   double sizeX, sizeY, degrees;
 };
 
-GridAxes AxesOf(const Transform& t) {
+GridAxes AxesOf(const GridTransform& t) {
   if (t[2] == 0 && t[4] == 0) return {t[1], -t[5], 0};
   const double angle = std::atan2(t[4], t[1]);
   // The second axis is at right angles to the first, either way round.
@@ -31,26 +25,26 @@ GridAxes AxesOf(const Transform& t) {
           angle / StdGeoRef::kRadiansPerDegree};
 }
 
-Transform TransformOf(const StdGeoRef& model) {
+GridTransform TransformOf(const StdGeoRef& model) {
   const double angle = model.Rotation() * StdGeoRef::kRadiansPerDegree;
   const double cosine = model.Rotation() == 0 ? 1 : std::cos(angle);
   const double sine = model.Rotation() == 0 ? 0 : std::sin(angle);
-  Transform t{0, cosine * model.PixelSizeX(), sine * model.PixelSizeY(),
-              0, sine * model.PixelSizeX(),   -cosine * model.PixelSizeY()};
+  GridTransform t{0, cosine * model.PixelSizeX(), sine * model.PixelSizeY(),
+                  0, sine * model.PixelSizeX(),   -cosine * model.PixelSizeY()};
   t[0] = model.TieMapX() - model.TiePixelX() * t[1] - model.TiePixelY() * t[2];
   t[3] = model.TieMapY() - model.TiePixelX() * t[4] - model.TiePixelY() * t[5];
   return t;
 }
 
 /// Fills a grid. False when it would be off by more than a hundredth of a pixel somewhere.
-bool FillGrid(const Transform& t, unsigned samples, unsigned lines, StdGeoRef& grid) {
+bool FillGrid(const GridTransform& t, unsigned samples, unsigned lines, StdGeoRef& grid) {
   const GridAxes axes = AxesOf(t);
   const bool isUsable = std::all_of(t.begin(), t.end(), [](double v) { return std::isfinite(v); });
   if (!isUsable || axes.sizeX == 0 || axes.sizeY == 0) return false;
   grid.SetPixelSize(axes.sizeX, axes.sizeY);
   grid.SetRotation(axes.degrees);
   grid.SetTieMap(t[0], t[3]);
-  const Transform made = TransformOf(grid);
+  const GridTransform made = TransformOf(grid);
   const double offX = (made[1] - t[1]) * samples + (made[2] - t[2]) * lines;
   const double offY = (made[4] - t[4]) * samples + (made[5] - t[5]) * lines;
   constexpr double kTolerance = 0.01;
@@ -59,7 +53,7 @@ bool FillGrid(const Transform& t, unsigned samples, unsigned lines, StdGeoRef& g
 }
 
 bool ReadGrid(GDALDatasetH dataset, StdGeoRef& grid) {
-  Transform t{};
+  GridTransform t{};
   return GDALGetGeoTransform(dataset, t.data()) == CE_None &&
          FillGrid(t, static_cast<unsigned>(GDALGetRasterXSize(dataset)),
                   static_cast<unsigned>(GDALGetRasterYSize(dataset)), grid);
@@ -102,34 +96,14 @@ std::string Numbers(const RpcCoefficients::Polynomial& polynomial) {
   return text;
 }
 
-/// The origin and the factors of a subset go into the offsets and scales of samples and lines.
-bool WriteCamera(GDALDatasetH dataset, const RpcGeoRef& camera) {
-  const RpcCoefficients& rpc = camera.Coefficients();
-  if (rpc.lineOffset == RpcCoefficients::kNeverSet) return true;
-  const std::map<std::string, std::string> items = {
-      {"LINE_OFF", Number((rpc.lineOffset - camera.LineOffset()) * camera.LineScale())},
-      {"SAMP_OFF", Number((rpc.sampleOffset - camera.SampleOffset()) * camera.SampleScale())},
-      {"LAT_OFF", Number(rpc.latitudeOffset)},
-      {"LONG_OFF", Number(rpc.longitudeOffset)},
-      {"HEIGHT_OFF", Number(rpc.heightOffset)},
-      {"LINE_SCALE", Number(rpc.lineScale * camera.LineScale())},
-      {"SAMP_SCALE", Number(rpc.sampleScale * camera.SampleScale())},
-      {"LAT_SCALE", Number(rpc.latitudeScale)},
-      {"LONG_SCALE", Number(rpc.longitudeScale)},
-      {"HEIGHT_SCALE", Number(rpc.heightScale)},
-      {"LINE_NUM_COEFF", Numbers(rpc.lineNumerator)},
-      {"LINE_DEN_COEFF", Numbers(rpc.lineDenominator)},
-      {"SAMP_NUM_COEFF", Numbers(rpc.sampleNumerator)},
-      {"SAMP_DEN_COEFF", Numbers(rpc.sampleDenominator)},
-  };
-  CPLStringList list;
-  for (const auto& [name, value] : items) list.SetNameValue(name.c_str(), value.c_str());
-  return GDALSetMetadata(dataset, list.List(), "RPC") == CE_None;
-}
-
-bool WriteGrid(GDALDatasetH dataset, const StdGeoRef& grid) {
-  Transform t = TransformOf(grid);
-  return GDALSetGeoTransform(dataset, t.data()) == CE_None;
+/// The camera in a model; null when it has none.
+const RpcGeoRef* CameraOf(const GeoRef& model) {
+  const auto* const both = dynamic_cast<const StdRpcGeoRef*>(&model);
+  const auto* const camera =
+      both != nullptr ? &both->Rpc() : dynamic_cast<const RpcGeoRef*>(&model);
+  const bool isSet =
+      camera != nullptr && camera->Coefficients().lineOffset != RpcCoefficients::kNeverSet;
+  return isSet ? camera : nullptr;
 }
 
 bool WriteCoordSys(GDALDatasetH dataset, const CoordSys& system) {
@@ -155,14 +129,46 @@ GeoRefPtr ReadGeoRef(GDALDatasetH dataset) {
   return owner;
 }
 
-bool WriteGeoRef(GDALDatasetH dataset, const GeoRef& model) {
+bool GridOf(const GeoRef& model, GridTransform& transform) {
   const auto* const grid = dynamic_cast<const StdGeoRef*>(&model);
-  if (const auto* const both = dynamic_cast<const StdRpcGeoRef*>(&model)) {
-    if (!WriteCamera(dataset, both->Rpc())) return false;
-  } else if (const auto* const camera = dynamic_cast<const RpcGeoRef*>(&model)) {
-    return WriteCamera(dataset, *camera);
+  if (grid != nullptr) transform = TransformOf(*grid);
+  return grid != nullptr;
+}
+
+/// The origin and the factors of a subset go into the offsets and scales of samples and lines.
+CPLStringList CameraItemsOf(const GeoRef& model) {
+  CPLStringList list;
+  const RpcGeoRef* const camera = CameraOf(model);
+  if (camera == nullptr) return list;
+  const RpcCoefficients& rpc = camera->Coefficients();
+  const std::pair<const char*, std::string> items[] = {
+      {"LINE_OFF", Number((rpc.lineOffset - camera->LineOffset()) * camera->LineScale())},
+      {"SAMP_OFF", Number((rpc.sampleOffset - camera->SampleOffset()) * camera->SampleScale())},
+      {"LAT_OFF", Number(rpc.latitudeOffset)},
+      {"LONG_OFF", Number(rpc.longitudeOffset)},
+      {"HEIGHT_OFF", Number(rpc.heightOffset)},
+      {"LINE_SCALE", Number(rpc.lineScale * camera->LineScale())},
+      {"SAMP_SCALE", Number(rpc.sampleScale * camera->SampleScale())},
+      {"LAT_SCALE", Number(rpc.latitudeScale)},
+      {"LONG_SCALE", Number(rpc.longitudeScale)},
+      {"HEIGHT_SCALE", Number(rpc.heightScale)},
+      {"LINE_NUM_COEFF", Numbers(rpc.lineNumerator)},
+      {"LINE_DEN_COEFF", Numbers(rpc.lineDenominator)},
+      {"SAMP_NUM_COEFF", Numbers(rpc.sampleNumerator)},
+      {"SAMP_DEN_COEFF", Numbers(rpc.sampleDenominator)},
+  };
+  for (const auto& [name, value] : items) list.SetNameValue(name, value.c_str());
+  return list;
+}
+
+bool WriteGeoRef(GDALDatasetH dataset, const GeoRef& model) {
+  CPLStringList camera = CameraItemsOf(model);
+  if (camera.Count() != 0 && GDALSetMetadata(dataset, camera.List(), "RPC") != CE_None) {
+    return false;
   }
-  return grid != nullptr && WriteGrid(dataset, *grid) &&
+  GridTransform transform{};
+  if (!GridOf(model, transform)) return true;
+  return GDALSetGeoTransform(dataset, transform.data()) == CE_None &&
          WriteCoordSys(dataset, model.CoordinateSystem());
 }
 

@@ -1,5 +1,7 @@
 #pragma once
 
+#include <array>
+#include <cpl_string.h>
 #include <gdal.h>
 
 #include "georef/georef.h"
@@ -11,8 +13,17 @@ namespace lumo::gdal {
 /// none.
 GeoRefPtr ReadGeoRef(GDALDatasetH dataset);
 
-/// Gives a new raster the model. False when GDAL refuses; it has then said why. An elevation model
-/// stays behind.
+/// GDAL's six numbers of an affine grid.
+using GridTransform = std::array<double, 6>;
+
+/// The grid of a model. False when it has none.
+bool GridOf(const GeoRef& model, GridTransform& transform);
+
+/// The camera of a model, as GDAL's items of the domain "RPC"; none when it has no camera. An
+/// elevation model stays behind.
+CPLStringList CameraItemsOf(const GeoRef& model);
+
+/// Gives a new raster the model. False when GDAL refuses; it has then said why.
 bool WriteGeoRef(GDALDatasetH dataset, const GeoRef& model);
 
 }  // namespace lumo::gdal

@@ -1,6 +1,9 @@
 #include "common/coordsys.h"
 
+#include <algorithm>
 #include <cpl_conv.h>
+#include <iterator>
+#include <ogr_spatialref.h>
 #include <string>
 
 namespace lumo::gdal {
@@ -21,8 +24,15 @@ std::string WriteWkt(OGRSpatialReferenceH reference, const char* form) {
 CoordSys ReadCoordSys(OGRSpatialReferenceH reference) {
   CoordSys system;
   if (reference == nullptr) return system;
+  OGRSpatialReference plain(*OGRSpatialReference::FromHandle(reference));
+  double shift[7] = {};
+  const bool hasShift = plain.GetTOWGS84(shift) == OGRERR_NONE;
+  const auto isZero = [](double value) { return value == 0; };
+  if (hasShift && std::all_of(std::begin(shift), std::end(shift), isZero)) {
+    plain.StripTOWGS84IfKnownDatum();
+  }
   for (const char* const form : {"WKT2_2019", "WKT1_GDAL", "WKT1_ESRI"}) {
-    const std::string wkt = WriteWkt(reference, form);
+    const std::string wkt = WriteWkt(OGRSpatialReference::ToHandle(&plain), form);
     if (!wkt.empty() && system.SetFromString(String(wkt))) break;
   }
   return system;

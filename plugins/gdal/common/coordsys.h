@@ -7,7 +7,8 @@
 namespace lumo::gdal {
 
 /// The coordinate system that GDAL's object describes; empty for null, and where no plug-in reads
-/// it.
+/// it. A transform to WGS 84 that changes nothing, as some formats always have it, is dropped where
+/// the datum is known.
 CoordSys ReadCoordSys(OGRSpatialReferenceH reference);
 
 /// GDAL's object for a coordinate system, which the caller releases with OSRRelease; null for the
