@@ -1,8 +1,9 @@
 #include "data/data_connection.h"
+#include "gdal_factory.h"
 #include "orva_factory.h"
 
 /// The entry point of the plug-in.
 extern "C" VEXG_EXPORT lumo::DataConnectionFactory* CreateDataConnectionFactory(
     lumo::FormatRecord* record) {
-  return record->name == "ORVA" ? lumo::MakeOrvaFactory(*record) : nullptr;
+  return record->driver == "ORVA" ? lumo::MakeOrvaFactory(*record) : lumo::MakeGdalFactory(*record);
 }

@@ -14,8 +14,6 @@ const unsigned StdGeoRef::TypeCode = kStd;
 /// The fields that a conversion needs. The body of each loop stands in it, so that the array form,
 /// which is compiled for vectors, and the form for one point are the same arithmetic.
 struct StdGeoRef::Affine {
-  static constexpr double kRadiansPerDegree = 0.0174532923847437;  // as single precision has it
-
   explicit Affine(const StdGeoRef& model)
       : sizeX(model.pixelSizeX_),
         sizeY(model.pixelSizeY_),

@@ -8,6 +8,8 @@ namespace lumo {
 class VEXG_EXPORT StdGeoRef : public GeoRef {
  public:
   static const unsigned TypeCode;
+  /// What the rotation is multiplied by: pi / 180 as single precision has it.
+  static constexpr double kRadiansPerDegree = 0.0174532923847437;
 
   StdGeoRef() { type_ = kStd; }
 

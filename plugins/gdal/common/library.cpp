@@ -1,0 +1,47 @@
+#include "common/library.h"
+
+#include <cpl_conv.h>
+#include <gdal.h>
+#include <map>
+#include <mutex>
+
+#include "common/messages.h"
+#include "foundation/environment.h"
+
+namespace lumo::gdal {
+namespace {
+
+/// GDAL's names for what the table calls otherwise, the best first.
+const std::map<std::string, std::vector<std::string>> kDriverNames = {
+    {"JPEG2000", {"JP2OpenJPEG", "JPEG2000"}},
+    {"HDF5Image", {"HDF5Image", "HDF5"}},
+    {"CEOS", {"CEOS", "SAR_CEOS"}},
+    {"Shapefile", {"ESRI Shapefile"}},
+};
+
+}  // namespace
+
+void StartGdal() {
+  static std::once_flag started;
+  std::call_once(started, [] {
+    const Messages messages;
+    const std::string data = GetGlobalEnvironmentImpl().Find(Environment::kGdalDirectory).ToUTF8();
+    if (!data.empty()) CPLSetConfigOption("GDAL_DATA", data.c_str());
+    GDALAllRegister();
+  });
+}
+
+Format FindDrivers(const FormatRecord& record) {
+  StartGdal();
+  Format format{record.name.ToUTF8(), {}};
+  const std::string driver = record.driver.ToUTF8();
+  const auto row = kDriverNames.find(driver);
+  const auto names = row != kDriverNames.end() ? row->second : std::vector{driver};
+  for (const std::string& name : names) {
+    if (GDALGetDriverByName(name.c_str()) != nullptr) format.drivers.push_back(name);
+  }
+  if (format.drivers.empty()) FailWith(format.key, "this GDAL has no driver " + names.front());
+  return format;
+}
+
+}  // namespace lumo::gdal

@@ -1,0 +1,49 @@
+#include "common/messages.h"
+
+#include <algorithm>
+#include <cpl_error.h>
+
+#include "foundation/fault.h"
+
+namespace lumo::gdal {
+
+struct Messages::Handler {
+  static void CPL_STDCALL Take(CPLErr severity, CPLErrorNum, const char* text) {
+    auto* const messages = static_cast<Messages*>(CPLGetErrorHandlerUserData());
+    if (severity != CE_Warning && severity != CE_Failure && severity != CE_Fatal) return;
+    std::string& line = severity == CE_Warning ? messages->warning_ : messages->error_;
+    line = text;
+    std::replace(line.begin(), line.end(), '\n', ' ');
+  }
+};
+
+Messages::Messages() {
+  CPLPushErrorHandlerEx(Handler::Take, this);
+}
+
+Messages::~Messages() {
+  CPLPopErrorHandler();
+  CPLErrorReset();
+}
+
+bool Messages::Fail(const std::string& name, const char* otherwise) const {
+  // GDAL itself puts the name in front of some messages.
+  const std::string& text = Text();
+  if (text.starts_with(name + ": ")) {
+    SetFault(text);
+    return false;
+  }
+  return FailWith(name, text.empty() ? otherwise : text);
+}
+
+void Messages::Clear() {
+  error_.clear();
+  warning_.clear();
+}
+
+bool FailWith(const std::string& name, const std::string& what) {
+  SetFault(std::string(name).append(": ").append(what));
+  return false;
+}
+
+}  // namespace lumo::gdal

@@ -1,0 +1,126 @@
+#include "common/source.h"
+
+#include <algorithm>
+#include <cctype>
+#include <filesystem>
+#include <string_view>
+
+#include "common/messages.h"
+#include "data/file_uri.h"
+
+namespace lumo::gdal {
+namespace {
+
+namespace fs = std::filesystem;
+
+constexpr std::string_view kSubdataset = "SUBDATASET=";
+
+/// The form in which GDAL takes lists of names; it ends with a null.
+std::vector<const char*> ListOf(const std::vector<std::string>& texts) {
+  std::vector<const char*> list;
+  for (const std::string& text : texts) list.push_back(text.c_str());
+  list.push_back(nullptr);
+  return list;
+}
+
+bool IsOption(std::string_view piece) {
+  const auto equals = piece.find('=');
+  return equals != piece.npos && equals != 0 &&
+         std::all_of(piece.begin(), piece.begin() + static_cast<std::ptrdiff_t>(equals),
+                     [](unsigned char c) { return std::isalnum(c) || c == '_'; });
+}
+
+/// True when a file, or a directory, has the name.
+bool FileExists(const std::string& name) {
+  std::error_code fault;
+  return fs::exists(name, fault);
+}
+
+/// The strings of a source in one text, the file's path resolved.
+URI MakeURI(const Source& source, const std::vector<std::string>& pieces) {
+  if (pieces.size() == 1 && source.isFile) return FileURI(source.name);
+  std::string text = source.isFile ? PathOfFileURI(FileURI(source.name)) : source.name;
+  for (std::size_t i = 1; i < pieces.size(); ++i) text.append("|").append(pieces[i]);
+  for (std::size_t at = 0; (at = text.find(']', at)) != text.npos;) text.replace(at, 1, "%5D");
+  return URI(String(text));
+}
+
+/// GDAL's name of a raster inside an open file; empty, with the fault told, when it holds no such.
+std::string FindSubdataset(GDALDatasetH dataset, const Source& source, std::string wanted) {
+  std::vector<std::string> names;
+  for (int i = 1;; ++i) {
+    const std::string key = "SUBDATASET_" + std::to_string(i) + "_NAME";
+    const char* const name = GDALGetMetadataItem(dataset, key.c_str(), "SUBDATASETS");
+    if (name == nullptr) break;
+    names.emplace_back(name);
+    if (names.back().ends_with(wanted) || std::to_string(i) == wanted) return names.back();
+  }
+  std::string what = "holds " + std::to_string(names.size()) + " rasters, but none ";
+  what.append(wanted).append("; name one by SUBDATASET=");
+  FailWith(source.name, what);
+  return {};
+}
+
+DatasetPtr OpenName(const std::string& name, const Source& source, const Format& format,
+                    unsigned openFlags) {
+  const Messages messages;
+  const auto drivers = ListOf(format.drivers);
+  const auto options = ListOf(source.openOptions);
+  DatasetPtr dataset(GDALOpenEx(name.c_str(), openFlags | GDAL_OF_VERBOSE_ERROR, drivers.data(),
+                                options.data(), nullptr));
+  if (dataset == nullptr) messages.Fail(source.name, "GDAL can't open it");
+  return dataset;
+}
+
+}  // namespace
+
+bool ParseSource(const Array<String>& connStrings, Source& source) {
+  Array<String> rest;
+  source.hasKey = SplitConnStr(connStrings, rest).GetLength() != 0;
+  std::vector<std::string> pieces;
+  for (const String& piece : rest) pieces.push_back(piece.ToUTF8());
+  if (pieces.empty() || pieces[0].empty()) return FailWith("GDAL", "no source named");
+  source.isFile = FileExists(pieces[0]);
+  source.name = pieces[0];
+  for (std::size_t i = 1; i < pieces.size(); ++i) {
+    if (pieces[i].starts_with(kSubdataset)) {
+      source.subdataset = pieces[i].substr(kSubdataset.size());
+    } else if (IsOption(pieces[i])) {
+      source.openOptions.push_back(pieces[i]);
+    } else {
+      return FailWith(pieces[i], "neither an option NAME=VALUE nor a format");
+    }
+  }
+  std::error_code fault;
+  if (source.isFile) source.name = fs::absolute(source.name, fault).string();
+  source.uri = MakeURI(source, pieces);
+  return true;
+}
+
+bool ParseTarget(Source& source) {
+  if (!source.subdataset.empty() || !source.openOptions.empty()) {
+    return FailWith(source.name, "a new file is named by its path alone");
+  }
+  std::error_code fault;
+  const fs::path resolved = fs::weakly_canonical(fs::absolute(source.name), fault);
+  if (fault) return FailWith(source.name, fault.message());
+  if (!source.name.starts_with("/vsi")) source.name = resolved.string();
+  source.uri = FileURI(source.name);
+  return true;
+}
+
+bool IsOfFormat(const Source& source, const Format& format, unsigned openFlags) {
+  if (!source.isFile && !source.hasKey) return false;
+  const Messages messages;
+  const auto drivers = ListOf(format.drivers);
+  return GDALIdentifyDriverEx(source.name.c_str(), openFlags, drivers.data(), nullptr) != nullptr;
+}
+
+DatasetPtr OpenDataset(const Source& source, const Format& format, unsigned openFlags) {
+  DatasetPtr dataset = OpenName(source.name, source, format, openFlags);
+  if (dataset == nullptr || source.subdataset.empty()) return dataset;
+  const std::string inner = FindSubdataset(dataset.get(), source, source.subdataset);
+  return inner.empty() ? nullptr : OpenName(inner, source, format, openFlags);
+}
+
+}  // namespace lumo::gdal

@@ -1,0 +1,126 @@
+#include "gdal_band_values.h"
+
+#include <algorithm>
+#include <climits>
+#include <cmath>
+#include <cpl_conv.h>
+#include <cpl_string.h>
+#include <cstdio>
+#include <memory>
+#include <string>
+#include <vector>
+
+namespace lumo::gdal {
+namespace {
+
+constexpr const char* kMin = "STATISTICS_MINIMUM";
+constexpr const char* kMax = "STATISTICS_MAXIMUM";
+constexpr const char* kMean = "STATISTICS_MEAN";
+constexpr const char* kStd = "STATISTICS_STDDEV";
+constexpr const char* kApproximate = "STATISTICS_APPROXIMATE";
+
+std::string Item(GDALRasterBandH band, const char* name) {
+  const char* const value = GDALGetMetadataItem(band, name, nullptr);
+  return value != nullptr ? value : "";
+}
+
+/// The colour's own name when it has one in the table.
+String NameOf(std::uint8_t r, std::uint8_t g, std::uint8_t b, std::uint8_t a) {
+  const std::uint32_t value =
+      r | std::uint32_t{g} << 8 | std::uint32_t{b} << 16 | std::uint32_t{a} << 24;
+  for (const NamedColor& color : kNamedColors) {
+    if (color.value == value && !color.isNull) return color.name;
+  }
+  char text[8];
+  std::snprintf(text, sizeof text, "#%02x%02x%02x", r, g, b);
+  return text;
+}
+
+struct ColorTableDeleter {
+  void operator()(void* table) const { GDALDestroyColorTable(table); }
+};
+
+}  // namespace
+
+std::optional<StoredStats> ReadStoredStats(GDALRasterBandH band) {
+  StoredStats stats{Item(band, kMin), Item(band, kMax), Item(band, kMean), Item(band, kStd)};
+  const bool isWhole =
+      !stats.min.empty() && !stats.max.empty() && !stats.mean.empty() && !stats.std.empty();
+  // Statistics of a sample of the pixels are not those of the band.
+  if (!isWhole || CPLTestBool(Item(band, kApproximate).c_str())) return std::nullopt;
+  return stats;
+}
+
+bool WriteStoredStats(GDALRasterBandH band, const StoredStats& stats) {
+  const std::pair<const char*, const char*> items[] = {
+      {kMin, stats.min.c_str()},
+      {kMax, stats.max.c_str()},
+      {kMean, stats.mean.c_str()},
+      {kStd, stats.std.c_str()},
+  };
+  for (const auto& [name, value] : items) {
+    if (GDALSetMetadataItem(band, name, value, nullptr) != CE_None) return false;
+  }
+  for (const char* const name : {kApproximate, "STATISTICS_VALID_PERCENT"}) {
+    if (!Item(band, name).empty()) GDALSetMetadataItem(band, name, nullptr, nullptr);
+  }
+  return true;
+}
+
+std::optional<StoredHistogram> ReadStoredHistogram(GDALRasterBandH band) {
+  StoredHistogram histogram;
+  int bins = 0;
+  GUIntBig* counts = nullptr;
+  const CPLErr result = GDALGetDefaultHistogramEx(band, &histogram.lowEdge, &histogram.highEdge,
+                                                  &bins, &counts, FALSE, nullptr, nullptr);
+  const std::unique_ptr<GUIntBig, decltype(&VSIFree)> owner(counts, &VSIFree);
+  const bool isUsable =
+      result == CE_None && counts != nullptr && bins > 0 && histogram.highEdge > histogram.lowEdge;
+  if (!isUsable || !histogram.counts.Resize(ArrayDims(static_cast<unsigned>(bins)))) {
+    return std::nullopt;
+  }
+  std::copy_n(counts, bins, histogram.counts.begin());
+  return histogram;
+}
+
+bool WriteStoredHistogram(GDALRasterBandH band, const StoredHistogram& histogram) {
+  std::vector<GUIntBig> counts(histogram.counts.begin(), histogram.counts.end());
+  return GDALSetDefaultHistogramEx(band, histogram.lowEdge, histogram.highEdge,
+                                   static_cast<int>(counts.size()), counts.data()) == CE_None;
+}
+
+bool HasPalette(GDALRasterBandH band) {
+  GDALColorTableH const table = GDALGetRasterColorTable(band);
+  return table != nullptr && GDALGetColorEntryCount(table) > 0;
+}
+
+Palette ReadPalette(GDALRasterBandH band) {
+  Palette palette;
+  GDALColorTableH const table = GDALGetRasterColorTable(band);
+  const int count = table != nullptr ? GDALGetColorEntryCount(table) : 0;
+  for (int i = 0; i < count; ++i) {
+    GDALColorEntry entry{};
+    GDALGetColorEntryAsRGB(table, i, &entry);
+    const auto part = [](short value) {
+      return static_cast<std::uint8_t>(std::clamp<short>(value, 0, UCHAR_MAX));
+    };
+    const std::uint8_t r = part(entry.c1), g = part(entry.c2), b = part(entry.c3),
+                       a = part(entry.c4);
+    palette.Append(Color(NameOf(r, g, b, a), r, g, b, a));
+  }
+  return palette;
+}
+
+bool WritePalette(GDALRasterBandH band, const Palette* palette) {
+  if (palette == nullptr) return GDALSetRasterColorTable(band, nullptr) == CE_None;
+  const std::unique_ptr<void, ColorTableDeleter> table(GDALCreateColorTable(GPI_RGB));
+  Palette copy(*palette);
+  for (unsigned i = 0; i < palette->GetCount(); ++i) {
+    const Color& color = *copy.At(i);
+    const GDALColorEntry entry{color.r, color.g, color.b, color.a};
+    GDALSetColorEntry(table.get(), static_cast<int>(i), &entry);
+  }
+  return GDALSetRasterColorTable(band, table.get()) == CE_None;
+}
+
+}  // namespace lumo::gdal

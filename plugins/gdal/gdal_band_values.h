@@ -1,0 +1,41 @@
+#pragma once
+
+#include <gdal.h>
+#include <optional>
+#include <string>
+
+#include "foundation/array.h"
+#include "foundation/color.h"
+
+namespace lumo::gdal {
+
+// What a band carries beside its pixels: GDAL's numbers and ours.
+
+/// A band's statistics as GDAL keeps them, as text so that whole numbers stay exact.
+struct StoredStats {
+  std::string min, max, mean, std;
+};
+
+/// Those that the source holds, of all its pixels; none are computed.
+std::optional<StoredStats> ReadStoredStats(GDALRasterBandH band);
+bool WriteStoredStats(GDALRasterBandH band, const StoredStats& stats);
+
+/// A band's histogram as GDAL keeps it: bins of one width between two edges.
+struct StoredHistogram {
+  double lowEdge = 0;
+  double highEdge = 0;
+  Array<unsigned long long> counts;
+};
+
+/// The one that the source holds; none is computed.
+std::optional<StoredHistogram> ReadStoredHistogram(GDALRasterBandH band);
+bool WriteStoredHistogram(GDALRasterBandH band, const StoredHistogram& histogram);
+
+/// The colour table of a band, empty when it has none. A colour is called by its name in the table
+/// of named colours, else "#rrggbb".
+Palette ReadPalette(GDALRasterBandH band);
+bool HasPalette(GDALRasterBandH band);
+/// @param palette  null takes the colour table away.
+bool WritePalette(GDALRasterBandH band, const Palette* palette);
+
+}  // namespace lumo::gdal

@@ -1,0 +1,49 @@
+#include "gdal_connection.h"
+
+#include "common/messages.h"
+#include "gdal_metadata.h"
+#include "gdal_reader.h"
+
+namespace lumo::gdal {
+
+bool Connection::Connect(const Array<String>& connStrings, const GeoRefPtr& geoRef,
+                         const MetadataPtr& metadata) {
+  Disconnect();
+  Source source;
+  if (!ParseSource(connStrings, source)) return false;
+  raster_ = OpenRaster::Open(format_, source);
+  if (raster_ == nullptr) return false;
+  lumo::RasterDef def = raster_->Describe();
+  if (geoRef) def.SetGeoRef(geoRef);
+  def.metadata = metadata ? *metadata : ReadMetadata(raster_->Dataset());
+  return MakeReader(connStrings, source, def);
+}
+
+bool Connection::CreateRaster(const Array<String>& connStrings, const lumo::RasterDef& def) {
+  Disconnect();
+  Source source;
+  if (!ParseSource(connStrings, source) || !ParseTarget(source)) return false;
+  raster_ = OpenRaster::Create(format_, source, def);
+  if (raster_ == nullptr) return false;
+  lumo::RasterDef made = raster_->Describe();
+  made.noData = def.noData;
+  made.SetGeoRef(def.geoRef);
+  made.metadata = def.metadata;
+  return MakeReader(ConnStrings({String(format_.key), String(source.name)}), source, made);
+}
+
+bool Connection::MakeReader(const Array<String>& connStrings, const Source& source,
+                            const lumo::RasterDef& def) {
+  return DispatchType(TwelveTypes{}, def.dataType, [&]<typename T>() {
+    SetOpened(connStrings, source.uri, RasterReaderPtr<T>(new Reader<T>(this, *raster_, def)));
+    return true;
+  });
+}
+
+void Connection::Disconnect() {
+  PlainRasterConnection::Disconnect();
+  if (raster_ != nullptr) raster_->Close();
+  raster_.reset();
+}
+
+}  // namespace lumo::gdal

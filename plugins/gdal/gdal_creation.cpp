@@ -1,0 +1,344 @@
+#include "gdal_creation.h"
+
+#include <climits>
+#include <cpl_string.h>
+#include <cpl_vsi.h>
+#include <filesystem>
+#include <set>
+
+#include "common/messages.h"
+#include "foundation/fault.h"
+#include "gdal_georef.h"
+#include "gdal_types.h"
+#include "platform/random_access_file.h"
+
+namespace lumo::gdal {
+namespace {
+
+namespace fs = std::filesystem;
+
+/// Up to this size a raster that is to be copied waits in memory.
+constexpr std::uint64_t kMaxBytesInMemory = 64 << 20;
+
+/// How the formats that can be made are made. What isn't here is only read: the drivers of GDAL
+/// that are left out make a file that differs from what was written.
+struct Maker {
+  const char* driver;
+  bool isCopied;        ///< written in one go
+  const char* options;  ///< separated by blanks; those that keep every value
+};
+constexpr Maker kMakers[] = {
+    {"GTiff", false, "BIGTIFF=IF_SAFER"},
+    {"HFA", false, ""},
+    {"BMP", true, ""},
+    {"NITF", true, ""},
+    {"PNG", true, ""},
+    {"GIF", true, ""},
+    {"JPEG", true, "QUALITY=95"},  // the one format here that loses something
+    {"JP2OpenJPEG", true, "QUALITY=100 REVERSIBLE=YES YCBCR420=NO"},
+};
+
+const Maker* FindMaker(const std::string& driver) {
+  for (const Maker& maker : kMakers) {
+    if (driver == maker.driver) return &maker;
+  }
+  return nullptr;
+}
+
+/// Files that belong to a raster by their name alone, and tell of its pixels.
+constexpr const char* kSideFiles[] = {".aux.xml", ".ovr", ".msk"};
+
+bool Exists(const std::string& path) {
+  std::error_code fault;
+  return fs::exists(path, fault);
+}
+
+void Remove(const std::string& path) {
+  std::error_code ignored;
+  fs::remove(path, ignored);
+}
+
+/// With the extension at the end, since drivers choose by it.
+std::string TemporaryPath(const std::string& path) {
+  return platform::TemporaryPathBeside(path) + fs::path(path).extension().string();
+}
+
+std::uint64_t BytesOf(const RasterDef& def) {
+  return std::uint64_t{def.samples} * def.lines * def.bands * DataTypeBytes(def.dataType);
+}
+
+CPLStringList OptionsOf(const Maker& maker) {
+  return CPLStringList(CSLTokenizeString2(maker.options, " ", 0), TRUE);
+}
+
+void AddLayout(const RasterDef& def, CPLStringList& options) {
+  const bool byPixel = def.interleave == Interleave::BIP || def.interleave == Interleave::BIL;
+  options.SetNameValue("INTERLEAVE", byPixel ? "PIXEL" : "BAND");
+  if (def.tileWidth <= 1 || def.tileHeight <= 1) return;
+  static constexpr unsigned kStep = 16, kMaxTile = 4096;  // sides are multiples of 16
+  const auto side = [](unsigned size) {
+    return std::to_string((std::min(size, kMaxTile) + kStep - 1) / kStep * kStep);
+  };
+  options.SetNameValue("TILED", "YES");
+  options.SetNameValue("BLOCKXSIZE", side(def.tileWidth).c_str());
+  options.SetNameValue("BLOCKYSIZE", side(def.tileHeight).c_str());
+}
+
+/// True when not all bands have the same no-data value.
+bool DiffersByBand(const RasterDef& def) {
+  if (def.noData.empty()) return false;
+  if (def.noData.size() != def.bands) return true;
+  const double first = def.noData.begin()->second;
+  for (const auto& [band, value] : def.noData) {
+    if (value != first && !(value != value && first != first)) return true;
+  }
+  return false;
+}
+
+bool SetNoData(GDALDatasetH dataset, const RasterDef& def) {
+  for (const auto& [band, value] : def.noData) {
+    if (band >= def.bands) continue;
+    const GDALRasterBandH target = GDALGetRasterBand(dataset, static_cast<int>(band) + 1);
+    CPLErr result = CE_None;
+    if (def.dataType == kDataTypeOf<std::int64_t>) {
+      result = GDALSetRasterNoDataValueAsInt64(target, static_cast<std::int64_t>(value));
+    } else if (def.dataType == kDataTypeOf<std::uint64_t>) {
+      result = GDALSetRasterNoDataValueAsUInt64(target, static_cast<std::uint64_t>(value));
+    } else {
+      result = GDALSetRasterNoDataValue(target, value);
+    }
+    if (result != CE_None) return false;
+  }
+  return true;
+}
+
+bool HoldsSignedBytes(GDALDriverH driver) {
+  const char* const list = GDALGetMetadataItem(driver, GDAL_DMD_CREATIONOPTIONLIST, nullptr);
+  return list != nullptr && std::string(list).find("SIGNEDBYTE") != std::string::npos;
+}
+
+}  // namespace
+
+NewRaster::NewRaster(std::string driver, const std::string& path, const RasterDef& def)
+    : driver_(std::move(driver)), path_(path), def_(def), temporary_(TemporaryPath(path)) {}
+
+NewRaster::~NewRaster() {
+  for (const std::string& path : {temporary_, scratch_}) {
+    if (path.empty()) continue;
+    Remove(path);
+    for (const char* const suffix : kSideFiles) Remove(path + suffix);
+    Remove(fs::path(path).replace_extension(".ige").string());
+  }
+}
+
+/// GDAL's words name the temporary file; the user knows only the place.
+std::string NewRaster::Shown(const std::string& text) const {
+  std::string shown = text;
+  const std::string name = fs::path(temporary_).filename().string();
+  for (const auto& [from, to] :
+       {std::pair(temporary_, path_), std::pair(name, fs::path(path_).filename().string())}) {
+    for (std::size_t at = 0; (at = shown.find(from, at)) != shown.npos; at += to.size()) {
+      shown.replace(at, from.size(), to);
+    }
+  }
+  return shown;
+}
+
+bool NewRaster::Fail(const std::string& what) const {
+  return FailWith(path_, Shown(what.empty() ? "GDAL gave no reason" : what));
+}
+
+std::unique_ptr<NewRaster> NewRaster::Begin(const Format& format, const std::string& path,
+                                            const RasterDef& def, DatasetPtr& dataset) {
+  const std::string& driver = format.drivers.front();
+  std::unique_ptr<NewRaster> made(new NewRaster(driver, path, def));
+  if (FindMaker(driver) == nullptr) {
+    made->Fail("rasters of the format " + format.key + " are only read");
+    return nullptr;
+  }
+  if (!made->CheckTarget() || !made->TryTheFormat()) return nullptr;
+  dataset = FindMaker(driver)->isCopied ? made->MakeForCopy() : made->MakeDirectly();
+  if (dataset == nullptr) return nullptr;
+  return made;
+}
+
+/// Says no to what can't end well, before anything is made.
+bool NewRaster::CheckTarget() const {
+  std::error_code fault;
+  if (path_.starts_with("/vsi")) return Fail("a raster can't be made under a virtual name");
+  if (Exists(path_) && !fs::is_regular_file(path_, fault)) return Fail("not a file");
+  if (def_.samples == 0 || def_.lines == 0 || def_.bands == 0 || def_.samples > INT_MAX ||
+      def_.lines > INT_MAX || def_.bands > USHRT_MAX) {
+    return Fail("no raster can have this size");
+  }
+  const PixelType type = PixelTypeOf(def_.dataType);
+  if (type.type == GDT_Unknown) return Fail("no raster can have this pixel type");
+  if (type.isSignedByte && !HoldsSignedBytes(GDALGetDriverByName(driver_.c_str()))) {
+    return Fail("the format can't hold signed bytes");
+  }
+  std::string why;
+  if (!platform::WriteNewFile(temporary_, "", &why)) {
+    SetFault(Shown(why));
+    return false;
+  }
+  Remove(temporary_);
+  return true;
+}
+
+/// Makes a raster of a few pixels in GDAL's memory: the driver itself says what it can't hold.
+bool NewRaster::TryTheFormat() const {
+  if (!FindMaker(driver_)->isCopied) return true;
+  const Messages messages;
+  constexpr int kSide = 32;
+  const PixelType type = PixelTypeOf(def_.dataType);
+  const DatasetPtr sample(GDALCreate(GDALGetDriverByName("MEM"), "", kSide, kSide,
+                                     static_cast<int>(def_.bands), type.type, nullptr));
+  const std::string name = "/vsimem/vexg" + fs::path(temporary_).filename().string();
+  CPLStringList options = OptionsOf(*FindMaker(driver_));
+  const DatasetPtr copy(sample == nullptr
+                            ? nullptr
+                            : GDALCreateCopy(GDALGetDriverByName(driver_.c_str()), name.c_str(),
+                                             sample.get(), TRUE, options.List(), nullptr, nullptr));
+  const bool fits = copy != nullptr && !messages.HasError() &&
+                    GDALGetRasterCount(copy.get()) == static_cast<int>(def_.bands) &&
+                    GDALGetRasterDataType(GDALGetRasterBand(copy.get(), 1)) == type.type;
+  if (copy != nullptr) GDALDeleteDataset(GDALGetDriverByName(driver_.c_str()), name.c_str());
+  VSIUnlink(name.c_str());
+  if (fits) return true;
+  const std::string what = messages.Text();
+  return Fail(what.empty() ? "the format can't hold such pixels" : what);
+}
+
+DatasetPtr NewRaster::MakeDirectly() const {
+  const Messages messages;
+  const PixelType type = PixelTypeOf(def_.dataType);
+  CPLStringList options = OptionsOf(*FindMaker(driver_));
+  if (type.isSignedByte) options.SetNameValue("PIXELTYPE", "SIGNEDBYTE");
+  if (driver_ == "GTiff") AddLayout(def_, options);
+  DatasetPtr dataset(GDALCreate(GDALGetDriverByName(driver_.c_str()), temporary_.c_str(),
+                                static_cast<int>(def_.samples), static_cast<int>(def_.lines),
+                                static_cast<int>(def_.bands), type.type, options.List()));
+  if (dataset == nullptr || !Describe(dataset.get())) {
+    Fail(messages.Text());
+    return nullptr;
+  }
+  return dataset;
+}
+
+DatasetPtr NewRaster::MakeForCopy() {
+  const Messages messages;
+  const PixelType type = PixelTypeOf(def_.dataType);
+  const bool inMemory = BytesOf(def_) <= kMaxBytesInMemory;
+  CPLStringList options;
+  options.SetNameValue("INTERLEAVE", def_.interleave == Interleave::BIP ? "PIXEL" : "BAND");
+  if (!inMemory) {
+    options.SetNameValue("BIGTIFF", "IF_SAFER");
+    scratch_ = platform::TemporaryPathBeside(path_);
+  }
+  DatasetPtr dataset(GDALCreate(GDALGetDriverByName(inMemory ? "MEM" : "GTiff"), scratch_.c_str(),
+                                static_cast<int>(def_.samples), static_cast<int>(def_.lines),
+                                static_cast<int>(def_.bands), type.type, options.List()));
+  if (dataset == nullptr || !Describe(dataset.get())) {
+    Fail(messages.Text());
+    return nullptr;
+  }
+  return dataset;
+}
+
+/// Gives a new dataset all but its pixels.
+bool NewRaster::Describe(GDALDatasetH dataset) const {
+  if (def_.geoRef && !WriteGeoRef(dataset, *def_.geoRef)) return false;
+  const bool isTiff = GDALGetDatasetDriver(dataset) == GDALGetDriverByName("GTiff");
+  // A TIFF file has room for one value; see NoteNoDataByBand.
+  return (isTiff && DiffersByBand(def_)) || SetNoData(dataset, def_);
+}
+
+bool NewRaster::Finish(DatasetPtr dataset) {
+  if (isDoomed_) {
+    dataset.reset();
+    return Fail("not made, since some of its pixels could not be written");
+  }
+  const Messages messages;
+  if (FindMaker(driver_)->isCopied) {
+    if (!CopyToFormat(std::move(dataset))) return false;
+  } else {
+    dataset.reset();
+    if (messages.HasError()) return Fail(messages.Text());
+  }
+  return NoteNoDataByBand() && IsWhole() && TakePlace();
+}
+
+bool NewRaster::CopyToFormat(DatasetPtr dataset) const {
+  const Messages messages;
+  CPLStringList options = OptionsOf(*FindMaker(driver_));
+  DatasetPtr copy(GDALCreateCopy(GDALGetDriverByName(driver_.c_str()), temporary_.c_str(),
+                                 dataset.get(), TRUE, options.List(), nullptr, nullptr));
+  const bool made = copy != nullptr;
+  copy.reset();
+  dataset.reset();
+  return (made && !messages.HasError()) || Fail(messages.Text());
+}
+
+/// Values that differ by band go beside the file, where GDAL keeps what a format has no room for.
+bool NewRaster::NoteNoDataByBand() const {
+  if (driver_ != "GTiff" || !DiffersByBand(def_)) return true;
+  const Messages messages;
+  DatasetPtr dataset(GDALOpen(temporary_.c_str(), GA_ReadOnly));
+  if (dataset == nullptr || !SetNoData(dataset.get(), def_)) return Fail(messages.Text());
+  dataset.reset();
+  return (!messages.HasError() && !messages.HasWarning()) || Fail(messages.Text());
+}
+
+/// Opens the file once more and reads its last pixel: not every driver reports a disk that is full.
+bool NewRaster::IsWhole() const {
+  const Messages messages;
+  const char* const drivers[] = {driver_.c_str(), nullptr};
+  const DatasetPtr dataset(GDALOpenEx(temporary_.c_str(), GDAL_OF_RASTER | GDAL_OF_VERBOSE_ERROR,
+                                      drivers, nullptr, nullptr));
+  if (dataset == nullptr) return Fail(messages.Text());
+  const auto samples = static_cast<int>(def_.samples), lines = static_cast<int>(def_.lines);
+  if (GDALGetRasterXSize(dataset.get()) != samples || GDALGetRasterYSize(dataset.get()) != lines ||
+      GDALGetRasterCount(dataset.get()) != static_cast<int>(def_.bands) ||
+      GDALGetRasterDataType(GDALGetRasterBand(dataset.get(), 1)) !=
+          PixelTypeOf(def_.dataType).type) {
+    return Fail("the format can't hold such a raster");
+  }
+  for (int band = 1; band <= static_cast<int>(def_.bands); ++band) {
+    double pixel[2];
+    if (GDALRasterIO(GDALGetRasterBand(dataset.get(), band), GF_Read, samples - 1, lines - 1, 1, 1,
+                     pixel, 1, 1, GDT_CFloat64, 0, 0) != CE_None) {
+      return Fail(messages.Text());
+    }
+  }
+  return true;
+}
+
+/// The new file comes onto the disk before the old one goes.
+bool NewRaster::TakePlace() const {
+  std::string why;
+  const auto file = platform::RandomAccessFile::Open(
+      temporary_, platform::RandomAccessFile::Access::kUpdate, &why);
+  if (file == nullptr || !file->Flush(&why)) return Fail(why);
+  if (driver_ == "HFA") {  // the names of further files stand inside
+    const Messages messages;
+    GDALDriverH const driver = GDALGetDriverByName(driver_.c_str());
+    if (GDALRenameDataset(driver, path_.c_str(), temporary_.c_str()) != CE_None) {
+      return Fail(messages.Text());
+    }
+  } else if (!platform::RenameFile(temporary_, path_, &why)) {
+    SetFault(Shown(why));
+    return false;
+  }
+  // What the older file had beside it tells of other pixels.
+  for (const char* const suffix : kSideFiles) {
+    if (!Exists(temporary_ + suffix)) {
+      if (driver_ != "HFA") Remove(path_ + suffix);
+    } else if (!platform::RenameFile(temporary_ + suffix, path_ + suffix, &why)) {
+      SetFault(Shown(why));
+      return false;
+    }
+  }
+  return true;
+}
+
+}  // namespace lumo::gdal

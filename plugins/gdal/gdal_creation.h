@@ -1,0 +1,59 @@
+#pragma once
+
+#include <memory>
+#include <string>
+
+#include "common/source.h"
+#include "raster/raster_def.h"
+
+namespace lumo::gdal {
+
+/// A raster that is being made.
+///
+/// It lies beside its place under a temporary name and takes the place, of an older file if there
+/// is one, when it is finished: what breaks before leaves nothing, and the older file as it was.
+/// Formats that are written in one go, from the first pixel to the last, are first made as
+/// something else: in memory, or as a TIFF file beside the place. Failure: false or null, with the
+/// fault told.
+class NewRaster {
+ public:
+  /// Whether the format can hold such a raster is found out here.
+  /// @param path     absolute.
+  /// @param dataset  [out] takes the pixels.
+  static std::unique_ptr<NewRaster> Begin(const Format& format, const std::string& path,
+                                          const RasterDef& def, DatasetPtr& dataset);
+
+  /// Deletes what lies beside the place.
+  ~NewRaster();
+  NewRaster(const NewRaster&) = delete;
+  NewRaster& operator=(const NewRaster&) = delete;
+
+  /// From now on the raster can't be finished: something of it is lost.
+  void Doom() { isDoomed_ = true; }
+
+  /// Closes the dataset and puts the raster at its place.
+  bool Finish(DatasetPtr dataset);
+
+ private:
+  NewRaster(std::string driver, const std::string& path, const RasterDef& def);
+  bool CheckTarget() const;
+  bool TryTheFormat() const;
+  DatasetPtr MakeDirectly() const;
+  DatasetPtr MakeForCopy();
+  bool Describe(GDALDatasetH dataset) const;
+  bool CopyToFormat(DatasetPtr dataset) const;
+  bool NoteNoDataByBand() const;
+  bool IsWhole() const;
+  bool TakePlace() const;
+  std::string Shown(const std::string& text) const;
+  bool Fail(const std::string& what) const;
+
+  const std::string driver_;
+  const std::string path_;
+  const RasterDef def_;
+  const std::string temporary_;  // of the format, beside the place
+  std::string scratch_;          // the TIFF file that the copy is made from
+  bool isDoomed_ = false;
+};
+
+}  // namespace lumo::gdal

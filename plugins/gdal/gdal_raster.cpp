@@ -1,0 +1,326 @@
+#include "gdal_raster.h"
+
+#include <algorithm>
+#include <cmath>
+#include <filesystem>
+
+#include "common/messages.h"
+#include "foundation/fault.h"
+#include "gdal_creation.h"
+#include "gdal_georef.h"
+#include "gdal_masks.h"
+#include "gdal_types.h"
+#include "platform/random_access_file.h"
+
+namespace lumo::gdal {
+namespace {
+
+/// Strides of a block in an interleave, in bytes.
+struct Strides {
+  Strides(Interleave interleave, const BlockPlace& place, GSpacing element) {
+    const GSpacing width = place.width, height = place.height, bands = place.bands.GetCount();
+    switch (interleave) {
+      case Interleave::BIP:
+        pixel = bands * element, line = width * pixel, band = element;
+        break;
+      case Interleave::BIL:
+        pixel = element, band = width * element, line = bands * band;
+        break;
+      default:
+        pixel = element, line = width * element, band = height * line;
+        break;
+    }
+  }
+  GSpacing pixel, line, band;
+};
+
+Interleave ReadInterleave(GDALDatasetH dataset) {
+  const char* const word = GDALGetMetadataItem(dataset, "INTERLEAVE", "IMAGE_STRUCTURE");
+  const std::string text = word != nullptr ? word : "";
+  // With one band all are the same.
+  if (GDALGetRasterCount(dataset) == 1) return Interleave::BSQ;
+  return text == "PIXEL" ? Interleave::BIP : text == "LINE" ? Interleave::BIL : Interleave::BSQ;
+}
+
+/// The number n of a reduction by 2^n; 0 when it is none.
+unsigned LevelOfSize(const RasterLevel& full, unsigned samples, unsigned lines) {
+  if (samples == 0 || lines == 0) return 0;
+  for (unsigned level = 1; level < 31; ++level) {
+    const auto fits = [&](unsigned whole, unsigned reduced) {
+      const unsigned down = whole >> level;
+      const bool isExact = (down << level) == whole;
+      return reduced == std::max(down, 1U) || reduced == down + (isExact ? 0 : 1);
+    };
+    if (fits(full.samples, samples) && fits(full.lines, lines)) return level;
+  }
+  return 0;
+}
+
+unsigned SizeOf(int size) {
+  return static_cast<unsigned>(std::max(size, 0));
+}
+
+/// Overview `index` of every band; without bands when the bands don't all have one of this size.
+RasterLevel OverviewOf(const RasterLevel& full, int index) {
+  RasterLevel level;
+  for (const GDALRasterBandH band : full.bands) {
+    const GDALRasterBandH overview =
+        index < GDALGetOverviewCount(band) ? GDALGetOverview(band, index) : nullptr;
+    const unsigned samples = overview != nullptr ? SizeOf(GDALGetRasterBandXSize(overview)) : 0;
+    const unsigned lines = overview != nullptr ? SizeOf(GDALGetRasterBandYSize(overview)) : 0;
+    if (samples == 0 || (level.samples != 0 && level.samples != samples) ||
+        (level.lines != 0 && level.lines != lines)) {
+      return {};
+    }
+    level.samples = samples;
+    level.lines = lines;
+    level.bands.push_back(overview);
+  }
+  GDALDatasetH const owner = GDALGetBandDataset(level.bands.front());
+  if (owner == nullptr || SizeOf(GDALGetRasterXSize(owner)) != level.samples ||
+      SizeOf(GDALGetRasterYSize(owner)) != level.lines) {
+    return level;
+  }
+  for (std::size_t i = 0; i < level.bands.size(); ++i) {
+    const auto number = static_cast<int>(i + 1);
+    if (GDALGetRasterCount(owner) < number || GDALGetRasterBand(owner, number) != level.bands[i]) {
+      return level;
+    }
+  }
+  level.dataset = owner;
+  return level;
+}
+
+bool DriverUpdates(const Format& format) {
+  GDALDriverH const driver = GDALGetDriverByName(format.drivers.front().c_str());
+  const char* const creates = GDALGetMetadataItem(driver, GDAL_DCAP_CREATE, nullptr);
+  return creates != nullptr && std::string(creates) == "YES";
+}
+
+}  // namespace
+
+OpenRaster::OpenRaster(const Format& format, const Source& source)
+    : format_(format), source_(source) {}
+
+OpenRaster::~OpenRaster() {
+  Close();
+}
+
+std::unique_ptr<OpenRaster> OpenRaster::Open(const Format& format, const Source& source) {
+  std::unique_ptr<OpenRaster> raster(new OpenRaster(format, source));
+  return raster->TakeDataset(OpenDataset(source, format, GDAL_OF_RASTER)) ? std::move(raster)
+                                                                          : nullptr;
+}
+
+std::unique_ptr<OpenRaster> OpenRaster::Create(const Format& format, const Source& source,
+                                               const RasterDef& def) {
+  std::unique_ptr<OpenRaster> raster(new OpenRaster(format, source));
+  DatasetPtr dataset;
+  raster->newRaster_ = NewRaster::Begin(format, source.name, def, dataset);
+  if (raster->newRaster_ == nullptr) return nullptr;
+  raster->isUpdated_ = true;
+  raster->canWrite_ = Answer::kYes;
+  if (raster->TakeDataset(std::move(dataset))) return raster;
+  raster->newRaster_->Doom();
+  return nullptr;
+}
+
+bool OpenRaster::TakeDataset(DatasetPtr dataset) {
+  const Messages messages;
+  dataset_ = std::move(dataset);
+  levels_.clear();
+  if (dataset_ == nullptr) return false;
+  dataType_ = CommonDataType(dataset_.get(), Name());
+  if (dataType_ == 0) return false;
+  interleave_ = ReadInterleave(dataset_.get());
+  FindLevels();
+  return true;
+}
+
+void OpenRaster::FindLevels() {
+  levels_.clear();
+  RasterLevel& full = levels_[0];
+  full.dataset = dataset_.get();
+  full.samples = SizeOf(GDALGetRasterXSize(full.dataset));
+  full.lines = SizeOf(GDALGetRasterYSize(full.dataset));
+  for (int i = 1; i <= GDALGetRasterCount(full.dataset); ++i) {
+    full.bands.push_back(GDALGetRasterBand(full.dataset, i));
+  }
+  std::map<unsigned, RasterLevel> reduced;
+  const int count = GDALGetOverviewCount(full.bands.front());
+  for (int i = 0; i < count; ++i) {
+    RasterLevel level = OverviewOf(full, i);
+    const unsigned number = LevelOfSize(full, level.samples, level.lines);
+    if (number != 0) reduced.try_emplace(number, std::move(level));
+  }
+  for (auto& [number, level] : reduced) {
+    const unsigned last = levels_.rbegin()->first;
+    if (last != 0 && number != last + 1) break;
+    levels_.emplace(number, std::move(level));
+  }
+}
+
+bool OpenRaster::Close() {
+  if (dataset_ == nullptr) return true;
+  levels_.clear();
+  const std::unique_ptr<NewRaster> made = std::move(newRaster_);
+  if (made != nullptr) return made->Finish(std::move(dataset_));
+  const Messages messages;
+  dataset_.reset();
+  // What was only read has nothing to lose.
+  return !isUpdated_ || !messages.HasError() || messages.Fail(Name());
+}
+
+const RasterLevel* OpenRaster::FindLevel(unsigned level) const {
+  const auto at = levels_.find(level);
+  return at != levels_.end() ? &at->second : nullptr;
+}
+
+RasterDef OpenRaster::Describe() const {
+  const Messages messages;
+  RasterDef def;
+  const RasterLevel& full = levels_.at(0);
+  def.samples = full.samples;
+  def.lines = full.lines;
+  def.bands = Bands();
+  def.interleave = interleave_;
+  def.dataType = dataType_;
+  def.format = String(format_.key);
+  int width = 0, height = 0;
+  GDALGetBlockSize(full.bands.front(), &width, &height);
+  // Blocks of whole lines are no tiles, however many lines they have.
+  const bool isTiled = SizeOf(width) != full.samples && height > 1;
+  def.tileWidth = SizeOf(width);
+  def.tileHeight = isTiled ? SizeOf(height) : 1;
+  def.SetGeoRef(ReadGeoRef(full.dataset));
+  return def;
+}
+
+bool OpenRaster::CanWrite() {
+  if (canWrite_ == Answer::kUnknown) {
+    const bool can = source_.isFile && DriverUpdates(format_) &&
+                     platform::RandomAccessFile::Open(
+                         Name(), platform::RandomAccessFile::Access::kUpdate) != nullptr;
+    canWrite_ = can ? Answer::kYes : Answer::kNo;
+  }
+  return canWrite_ == Answer::kYes;
+}
+
+bool OpenRaster::OpenForUpdate() {
+  if (isUpdated_) return true;
+  if (!CanWrite()) return FailWith(Name(), "can't be written");
+  levels_.clear();
+  dataset_.reset();
+  isUpdated_ = TakeDataset(OpenDataset(source_, format_, GDAL_OF_RASTER | GDAL_OF_UPDATE));
+  if (isUpdated_) return true;
+  canWrite_ = Answer::kNo;
+  const String fault = TakeFault();
+  TakeDataset(OpenDataset(source_, format_, GDAL_OF_RASTER));
+  SetFault(fault);
+  return false;
+}
+
+const RasterLevel* OpenRaster::CheckPlace(const BlockPlace& place) const {
+  const RasterLevel* const level = FindLevel(place.level);
+  if (level == nullptr) {
+    FailWith(Name(), "has no level " + std::to_string(place.level));
+    return nullptr;
+  }
+  const bool isInside =
+      place.width != 0 && place.height != 0 && place.bands.GetCount() != 0 &&
+      std::uint64_t{place.left} + place.width <= level->samples &&
+      std::uint64_t{place.top} + place.height <= level->lines &&
+      std::all_of(place.bands.begin(), place.bands.end(), [&](unsigned b) { return HasBand(b); });
+  if (isInside) return level;
+  FailWith(Name(), "the block asked for isn't inside the raster");
+  return nullptr;
+}
+
+bool OpenRaster::Transfer(GDALRWFlag direction, const BlockPlace& place, void* pixels) const {
+  const RasterLevel* const level = CheckPlace(place);
+  if (level == nullptr) return false;
+  const Messages messages;
+  const GDALDataType type = PixelTypeOf(dataType_).type;
+  const Strides strides(interleave_, place, GDALGetDataTypeSizeBytes(type));
+  const auto at = [](unsigned number) { return static_cast<int>(number); };
+  CPLErr result = CE_None;
+  if (level->dataset != nullptr) {
+    std::vector<int> numbers;
+    for (const unsigned band : place.bands) numbers.push_back(at(band) + 1);
+    result = GDALDatasetRasterIOEx(
+        level->dataset, direction, at(place.left), at(place.top), at(place.width), at(place.height),
+        pixels, at(place.width), at(place.height), type, at(place.bands.GetCount()), numbers.data(),
+        strides.pixel, strides.line, strides.band, nullptr);
+  }
+  for (unsigned i = 0; level->dataset == nullptr && result == CE_None && i < place.bands.GetCount();
+       ++i) {
+    void* const first = static_cast<char*>(pixels) + strides.band * i;
+    result = GDALRasterIOEx(level->bands[place.bands[i]], direction, at(place.left), at(place.top),
+                            at(place.width), at(place.height), first, at(place.width),
+                            at(place.height), type, strides.pixel, strides.line, nullptr);
+  }
+  // Some drivers report a read that broke off by a message alone.
+  if (result == CE_None && !messages.HasError()) return true;
+  return messages.Fail(Name(), direction == GF_Read ? "can't be read" : "can't be written");
+}
+
+bool OpenRaster::Read(const BlockPlace& place, void* pixels) const {
+  return Transfer(GF_Read, place, pixels);
+}
+
+bool OpenRaster::Write(const BlockPlace& place, const void* pixels) {
+  if (place.level != 0) return FailWith(Name(), "a reduced level can't be written");
+  if (CheckPlace(place) == nullptr || !OpenForUpdate()) return false;
+  if (newRaster_ == nullptr) ForgetStatistics(place.bands);
+  // GDAL only reads what it is given to write.
+  if (Transfer(GF_Write, place, const_cast<void*>(pixels))) return true;
+  if (newRaster_ != nullptr) newRaster_->Doom();
+  return false;
+}
+
+void OpenRaster::ForgetStatistics(const Array<unsigned>& bands) {
+  for (const unsigned band : bands) {
+    if (GDALGetMetadataItem(Band(band), "STATISTICS_MINIMUM", nullptr) == nullptr) continue;
+    for (const char* const name :
+         {"STATISTICS_MINIMUM", "STATISTICS_MAXIMUM", "STATISTICS_MEAN", "STATISTICS_STDDEV",
+          "STATISTICS_APPROXIMATE", "STATISTICS_VALID_PERCENT"}) {
+      GDALSetMetadataItem(Band(band), name, nullptr, nullptr);
+    }
+  }
+}
+
+bool OpenRaster::ReadMasks(const BlockPlace& place, unsigned char* state) const {
+  const RasterLevel* const level = CheckPlace(place);
+  if (level == nullptr) return false;
+  const Messages messages;
+  const Masks masks(*level, place.bands);
+  if (!masks.IsNeeded()) return true;
+  const Strides strides(interleave_, place, 1);
+  return masks.Apply(place, strides.pixel, strides.line, strides.band, state) ||
+         messages.Fail(Name(), "the mask can't be read");
+}
+
+bool OpenRaster::BuildOverviews(const char* method, unsigned levelMin, unsigned levelMax) {
+  if (newRaster_ != nullptr) return FailWith(Name(), "a raster that is being made has no levels");
+  std::vector<int> factors;
+  for (unsigned level = std::max(levelMin, 1U); level <= std::min(levelMax, 30U); ++level) {
+    factors.push_back(1 << level);
+  }
+  if (factors.empty()) return FailWith(Name(), "no levels asked for");
+  const Messages messages;
+  const CPLErr result = GDALBuildOverviews(dataset_.get(), method, static_cast<int>(factors.size()),
+                                           factors.data(), 0, nullptr, nullptr, nullptr);
+  GDALFlushCache(dataset_.get());
+  FindLevels();
+  return (result == CE_None && !messages.HasError()) || messages.Fail(Name());
+}
+
+bool OpenRaster::DeleteOverviews() {
+  const Messages messages;
+  const CPLErr result =
+      GDALBuildOverviews(dataset_.get(), "NONE", 0, nullptr, 0, nullptr, nullptr, nullptr);
+  FindLevels();
+  return result == CE_None || messages.Fail(Name());
+}
+
+}  // namespace lumo::gdal

@@ -1,0 +1,98 @@
+#pragma once
+
+#include <map>
+#include <memory>
+
+#include "common/source.h"
+#include "raster/raster_def.h"
+
+namespace lumo::gdal {
+
+class NewRaster;
+
+/// A block of pixels: where it lies in the raster, and in the caller's memory.
+struct BlockPlace {
+  unsigned left, top, width, height;  ///< in pixels of the level
+  const Array<unsigned>& bands;
+  unsigned level;
+};
+
+/// One resolution of a raster, the whole or a reduced one.
+struct RasterLevel {
+  unsigned samples = 0;
+  unsigned lines = 0;
+  std::vector<GDALRasterBandH> bands;
+  GDALDatasetH dataset = nullptr;  ///< that has just these bands; null when there is none
+};
+
+/// A raster that GDAL holds open: all that does not depend on the pixel type.
+///
+/// An existing one is opened for reading. The first operation that changes its pixels opens it
+/// again for writing, so that a file which is only read is neither changed nor asked for rights
+/// that it doesn't give.
+/// Failure: false or null, with the fault told.
+class OpenRaster {
+ public:
+  static std::unique_ptr<OpenRaster> Open(const Format& format, const Source& source);
+  static std::unique_ptr<OpenRaster> Create(const Format& format, const Source& source,
+                                            const RasterDef& def);
+  ~OpenRaster();
+  OpenRaster(const OpenRaster&) = delete;
+  OpenRaster& operator=(const OpenRaster&) = delete;
+
+  /// Lets go of the raster; a new one gets its name then. False when something of it is lost.
+  bool Close();
+
+  GDALDatasetH Dataset() const { return dataset_.get(); }
+  GDALRasterBandH Band(unsigned band) const { return levels_.at(0).bands[band]; }
+  const std::string& Name() const { return source_.name; }
+  const std::string& FormatKey() const { return format_.key; }
+  unsigned DataType() const { return dataType_; }  ///< code
+  unsigned Bands() const { return static_cast<unsigned>(levels_.at(0).bands.size()); }
+  bool IsNew() const { return newRaster_ != nullptr; }
+  lumo::Interleave Interleave() const { return interleave_; }
+
+  /// The levels that can be read, by number: 0, and a range without gaps of those reductions by
+  /// powers of two that the source holds.
+  const std::map<unsigned, RasterLevel>& Levels() const { return levels_; }
+  const RasterLevel* FindLevel(unsigned level) const;
+  bool HasBand(unsigned band) const { return band < Bands(); }
+
+  /// What the source says of itself, without no-data values and metadata.
+  RasterDef Describe() const;
+
+  /// True when the format and the file let pixels be changed. Opens nothing with GDAL.
+  bool CanWrite();
+  /// Opens the raster for writing unless it is.
+  bool OpenForUpdate();
+
+  /// Carries a block to the caller's memory, in the raster's interleave.
+  bool Read(const BlockPlace& place, void* pixels) const;
+  bool Write(const BlockPlace& place, const void* pixels);
+
+  /// Sets state bits where a mask or an alpha band of the source excludes pixels.
+  bool ReadMasks(const BlockPlace& place, unsigned char* state) const;
+
+  bool BuildOverviews(const char* method, unsigned levelMin, unsigned levelMax);
+  bool DeleteOverviews();
+
+ private:
+  OpenRaster(const Format& format, const Source& source);
+  bool TakeDataset(DatasetPtr dataset);
+  void FindLevels();
+  bool Transfer(GDALRWFlag direction, const BlockPlace& place, void* pixels) const;
+  const RasterLevel* CheckPlace(const BlockPlace& place) const;
+  void ForgetStatistics(const Array<unsigned>& bands);
+
+  Format format_;
+  Source source_;
+  DatasetPtr dataset_;
+  std::unique_ptr<NewRaster> newRaster_;
+  unsigned dataType_ = 0;
+  lumo::Interleave interleave_ = lumo::Interleave::BSQ;
+  std::map<unsigned, RasterLevel> levels_;
+  bool isUpdated_ = false;  // open for writing
+  enum class Answer { kUnknown, kNo, kYes } canWrite_ = Answer::kUnknown;
+};
+
+}  // namespace lumo::gdal

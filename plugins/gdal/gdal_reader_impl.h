@@ -1,0 +1,388 @@
+#pragma once
+
+#include <algorithm>
+#include <charconv>
+#include <cmath>
+#include <cpl_conv.h>
+#include <cpl_string.h>
+#include <limits>
+
+#include "common/messages.h"
+#include "gdal_band_values.h"
+#include "gdal_reader.h"
+#include "raster/no_data_marker.h"
+
+namespace lumo::gdal {
+
+namespace detail {
+
+/// A number as a pixel value; nothing when T hasn't got it, so that no pixel can hold it.
+template <typename T>
+std::optional<T> ToPixel(double value) {
+  if constexpr (std::is_integral_v<T>) {
+    // The bounds as doubles that are exact: the least value, and one above the greatest.
+    const double low = static_cast<double>(std::numeric_limits<T>::min());
+    const double end = std::ldexp(1.0, std::numeric_limits<T>::digits);
+    if (!(value >= low && value < end) || value != std::trunc(value)) return std::nullopt;
+    return static_cast<T>(value);
+  } else if constexpr (std::is_same_v<T, float>) {
+    // Texts of the greatest float are often a little above it.
+    constexpr double kMax = std::numeric_limits<float>::max();
+    if (std::isfinite(value) && std::abs(value) > kMax) {
+      if (std::abs(value) > kMax * (1 + 1e-7)) return std::nullopt;
+      return static_cast<float>(std::copysign(kMax, value));
+    }
+    return static_cast<float>(value);
+  } else if constexpr (std::is_same_v<T, double>) {
+    return value;
+  } else {
+    const auto real = ToPixel<decltype(T::real)>(value);
+    return real ? std::optional<T>(T{*real, 0}) : std::nullopt;
+  }
+}
+
+/// The no-data value of a band. 64-bit numbers don't pass through doubles.
+template <typename T>
+std::optional<T> ReadNoData(GDALRasterBandH band) {
+  int has = FALSE;
+  const auto whole = [&](auto value) -> std::optional<T> {
+    if constexpr (std::is_integral_v<T>) {
+      if (std::in_range<T>(value)) return static_cast<T>(value);
+      return std::nullopt;
+    } else {
+      return ToPixel<T>(static_cast<double>(value));
+    }
+  };
+  switch (GDALGetRasterDataType(band)) {
+    case GDT_Int64: {
+      const std::int64_t value = GDALGetRasterNoDataValueAsInt64(band, &has);
+      return has ? whole(value) : std::nullopt;
+    }
+    case GDT_UInt64: {
+      const std::uint64_t value = GDALGetRasterNoDataValueAsUInt64(band, &has);
+      return has ? whole(value) : std::nullopt;
+    }
+    default: {
+      const double value = GDALGetRasterNoDataValue(band, &has);
+      return has ? ToPixel<T>(value) : std::nullopt;
+    }
+  }
+}
+
+/// A number out of a text, as a pixel value.
+template <typename T>
+std::optional<T> ParsePixel(const std::string& text) {
+  if constexpr (std::is_integral_v<T>) {
+    T whole{};
+    const auto [end, fault] = std::from_chars(text.data(), text.data() + text.size(), whole);
+    if (fault == std::errc() && end == text.data() + text.size()) return whole;
+  }
+  return ToPixel<T>(CPLAtof(text.c_str()));
+}
+
+template <typename T>
+std::string PrintPixel(T value) {
+  if constexpr (std::is_integral_v<T>) {
+    return std::to_string(value);
+  } else {
+    char text[40];
+    CPLsnprintf(text, sizeof text, "%.17g", static_cast<double>(value));
+    return text;
+  }
+}
+
+/// Our histogram from GDAL's. A bin holds its lower edge, not its upper one.
+template <typename T>
+RasterBandHistogram<T> FromStored(unsigned band, const StoredHistogram& stored) {
+  RasterBandHistogram<T> histogram;
+  histogram.band = band;
+  histogram.source = StatsSource::kNative;
+  histogram.binCount = stored.counts.GetCount();
+  histogram.binSize = (stored.highEdge - stored.lowEdge) / histogram.binCount;
+  histogram.counts = stored.counts;
+  double low = stored.lowEdge, high = stored.highEdge;
+  if constexpr (std::is_integral_v<T>) {
+    low = std::max(std::ceil(low), static_cast<double>(std::numeric_limits<T>::min()));
+    high = std::min(std::ceil(high) - 1, static_cast<double>(std::numeric_limits<T>::max()));
+  }
+  histogram.min = ToPixel<T>(low).value_or(std::numeric_limits<T>::lowest());
+  histogram.max = ToPixel<T>(high).value_or(std::numeric_limits<T>::max());
+  return histogram;
+}
+
+template <typename T>
+StoredHistogram ToStored(const RasterBandHistogram<T>& histogram) {
+  StoredHistogram stored;
+  stored.lowEdge = static_cast<double>(histogram.min);
+  double width = histogram.binSize;
+  if constexpr (std::is_integral_v<T>) {
+    stored.lowEdge -= 0.5;
+    if (histogram.source != StatsSource::kNative) width = std::trunc(width);  // as it was counted
+  }
+  stored.highEdge = stored.lowEdge + width * histogram.binCount;
+  stored.counts = histogram.counts;
+  return stored;
+}
+
+/// What GDAL calls a way of reducing.
+inline const char* ResamplingName(std::int32_t method) {
+  switch (static_cast<lumo::PyramidResamplingMethod>(method)) {
+    case lumo::PyramidResamplingMethod::kLinear:
+      return "BILINEAR";
+    case lumo::PyramidResamplingMethod::kCubic:
+      return "CUBIC";
+    case lumo::PyramidResamplingMethod::kMajority:
+      return "MODE";
+    default:
+      return "NEAREST";
+  }
+}
+
+}  // namespace detail
+
+template <typename T>
+Reader<T>::Reader(RasterDataConnection* connection, OpenRaster& raster, const lumo::RasterDef& def)
+    : PlainRasterReader<T>(connection), raster_(raster), def_(def) {
+  for (unsigned band = 0; band < raster.Bands(); ++band) {
+    if (!raster.IsNew()) {
+      noData_.push_back(detail::ReadNoData<T>(raster.Band(band)));
+      continue;
+    }
+    const auto at = def.noData.find(band);
+    noData_.push_back(at != def.noData.end() ? detail::ToPixel<T>(at->second) : std::nullopt);
+  }
+  def_.noData.clear();
+  for (unsigned band = 0; band < noData_.size(); ++band) {
+    const std::optional<T>& value = noData_[band];
+    if (!value) continue;
+    if constexpr (std::is_arithmetic_v<T>) {
+      def_.noData[band] = static_cast<double>(*value);
+    } else {
+      def_.noData[band] = static_cast<double>(value->real);
+    }
+  }
+}
+
+template <typename T>
+unsigned Reader<T>::Samples(unsigned level) {
+  const RasterLevel* const found = raster_.FindLevel(level);
+  return found != nullptr ? found->samples : 0;
+}
+
+template <typename T>
+unsigned Reader<T>::Lines(unsigned level) {
+  const RasterLevel* const found = raster_.FindLevel(level);
+  return found != nullptr ? found->lines : 0;
+}
+
+template <typename T>
+std::int32_t Reader<T>::PyramidType() {
+  const auto type = PyramidExists() ? lumo::PyramidType::kDriver : lumo::PyramidType::kNone;
+  return static_cast<std::int32_t>(type);
+}
+
+template <typename T>
+std::int32_t Reader<T>::PyramidResamplingMethod() {
+  return PyramidExists() ? builtMethod_ : 0;
+}
+
+template <typename T>
+std::int32_t Reader<T>::PyramidLevelMin() {
+  return PyramidExists() ? static_cast<std::int32_t>(std::next(raster_.Levels().begin())->first)
+                         : 0;
+}
+
+template <typename T>
+std::int32_t Reader<T>::PyramidLevelMax() {
+  return static_cast<std::int32_t>(raster_.Levels().rbegin()->first);
+}
+
+template <typename T>
+bool Reader<T>::PyramidBuild(std::int32_t resamplingMethod, std::int32_t levelMin,
+                             std::int32_t levelMax, const TileDimensions&) {
+  if (levelMin < 0 || levelMax < levelMin) return FailWith(raster_.Name(), "no levels asked for");
+  if (!raster_.BuildOverviews(detail::ResamplingName(resamplingMethod),
+                              static_cast<unsigned>(levelMin), static_cast<unsigned>(levelMax))) {
+    return false;
+  }
+  builtMethod_ = resamplingMethod;
+  return true;
+}
+
+template <typename T>
+bool Reader<T>::PyramidRebuild() {
+  if (!PyramidExists()) return FailWith(raster_.Name(), "has no reduced levels");
+  TileDimensions tiles{};
+  return PyramidBuild(builtMethod_, PyramidLevelMin(), PyramidLevelMax(), tiles);
+}
+
+template <typename T>
+bool Reader<T>::PyramidDelete() {
+  return raster_.DeleteOverviews();
+}
+
+template <typename T>
+std::int32_t Reader<T>::StatsMask() {
+  using lumo::StatsMask;
+  return kHasStats ? StatsMask::Min | StatsMask::Max | StatsMask::Mean | StatsMask::Std
+                   : StatsMask::None;
+}
+
+template <typename T>
+bool Reader<T>::StatsExist(unsigned band) {
+  return ReadStats(band).mask != lumo::StatsMask::None;
+}
+
+template <typename T>
+RasterBandStats<T> Reader<T>::ReadStats(unsigned band) {
+  RasterBandStats<T> stats;
+  if constexpr (kHasStats) {
+    if (!raster_.HasBand(band)) return stats;
+    const auto stored = ReadStoredStats(raster_.Band(band));
+    const auto min = stored ? detail::ParsePixel<T>(stored->min) : std::nullopt;
+    const auto max = stored ? detail::ParsePixel<T>(stored->max) : std::nullopt;
+    if (!min || !max) return stats;
+    stats.band = band;
+    stats.mask = static_cast<unsigned>(StatsMask());
+    stats.min = *min;
+    stats.max = *max;
+    stats.mean = CPLAtof(stored->mean.c_str());
+    stats.std = CPLAtof(stored->std.c_str());
+    // GDAL keeps no count. Where nothing can be left out it is known all the same.
+    if (std::is_integral_v<T> && (GDALGetMaskFlags(raster_.Band(band)) & GMF_ALL_VALID) != 0) {
+      stats.pixelCount = std::uint64_t{def_.samples} * def_.lines;
+    }
+  }
+  return stats;
+}
+
+template <typename T>
+bool Reader<T>::WriteStats(const Array<RasterBandStats<T>>& stats) {
+  if constexpr (kHasStats) {
+    const Messages messages;
+    for (const RasterBandStats<T>& band : stats) {
+      const auto whole = static_cast<unsigned>(StatsMask());
+      if (!raster_.HasBand(band.band) || (band.mask & whole) != whole) continue;
+      const StoredStats stored{detail::PrintPixel(band.min), detail::PrintPixel(band.max),
+                               detail::PrintPixel(band.mean), detail::PrintPixel(band.std)};
+      if (!WriteStoredStats(raster_.Band(band.band), stored)) return messages.Fail(raster_.Name());
+    }
+    return FlushBandValues();
+  }
+  return false;
+}
+
+template <typename T>
+Array<RasterBandHistogram<T>> Reader<T>::Histogram(unsigned band) {
+  Array<RasterBandHistogram<T>> histograms;
+  if constexpr (kHasStats) {
+    if (!raster_.HasBand(band)) return histograms;
+    const Messages messages;
+    const auto stored = ReadStoredHistogram(raster_.Band(band));
+    if (stored && histograms.Resize(ArrayDims(1))) {
+      histograms[0] = detail::FromStored<T>(band, *stored);
+    }
+  }
+  return histograms;
+}
+
+template <typename T>
+bool Reader<T>::WriteHistogram(const Array<RasterBandHistogram<T>>& histograms) {
+  if constexpr (kHasStats) {
+    std::vector<const RasterBandHistogram<T>*> chosen(raster_.Bands());
+    std::vector<bool> isAskedFor(raster_.Bands());
+    for (const RasterBandHistogram<T>& histogram : histograms) {
+      if (!raster_.HasBand(histogram.band) || histogram.source == StatsSource::kUnknown) continue;
+      isAskedFor[histogram.band] = true;
+      if (histogram.sign != HistogramSign::kBoth || histogram.binCount == 0) continue;
+      // One that was counted goes before the one that the source holds already.
+      const RasterBandHistogram<T>*& choice = chosen[histogram.band];
+      if (choice == nullptr || choice->source == StatsSource::kNative) choice = &histogram;
+    }
+    const Messages messages;
+    for (unsigned band = 0; band < raster_.Bands(); ++band) {
+      if (!isAskedFor[band]) continue;
+      if (chosen[band] == nullptr) {
+        return FailWith(raster_.Name(), "only histograms of both signs can be stored");
+      }
+      if (!WriteStoredHistogram(raster_.Band(band), detail::ToStored(*chosen[band]))) {
+        return messages.Fail(raster_.Name());
+      }
+    }
+    return FlushBandValues();
+  }
+  return false;
+}
+
+/// Brings what was set onto the disk; GDAL reports as a warning that it could not.
+template <typename T>
+bool Reader<T>::FlushBandValues() {
+  const Messages messages;
+  GDALFlushCache(raster_.Dataset());
+  return (!messages.HasError() && !messages.HasWarning()) || messages.Fail(raster_.Name());
+}
+
+template <typename T>
+bool Reader<T>::HasNoDataValue(unsigned band) {
+  return band < noData_.size() && noData_[band].has_value();
+}
+
+template <typename T>
+T Reader<T>::NoDataValue(unsigned band) {
+  return HasNoDataValue(band) ? *noData_[band] : T();
+}
+
+template <typename T>
+bool Reader<T>::HasPalette(unsigned band) {
+  return raster_.HasBand(band) && gdal::HasPalette(raster_.Band(band));
+}
+
+template <typename T>
+lumo::Palette Reader<T>::Palette(unsigned band) {
+  return HasPalette(band) ? ReadPalette(raster_.Band(band)) : lumo::Palette();
+}
+
+template <typename T>
+bool Reader<T>::WritePalette(unsigned band, const lumo::Palette& palette) {
+  return ChangePalette(band, &palette);
+}
+
+template <typename T>
+bool Reader<T>::DeletePalette(unsigned band) {
+  return ChangePalette(band, nullptr);
+}
+
+/// Into the file when it can be written, else beside it.
+template <typename T>
+bool Reader<T>::ChangePalette(unsigned band, const lumo::Palette* palette) {
+  if (!raster_.HasBand(band)) return FailWith(raster_.Name(), "has no such band");
+  if (raster_.CanWrite() && !raster_.OpenForUpdate()) return false;
+  const Messages messages;
+  if (!gdal::WritePalette(raster_.Band(band), palette)) return messages.Fail(raster_.Name());
+  if (!FlushBandValues()) return false;
+  return HasPalette(band) == (palette != nullptr) ||
+         FailWith(raster_.Name(), "the format keeps no such palette");
+}
+
+template <typename T>
+bool Reader<T>::ReadPixels(unsigned left, unsigned top, unsigned width, unsigned height,
+                           const Array<unsigned>& bands, unsigned level, T* pixels,
+                           unsigned char* state) {
+  const BlockPlace place{left, top, width, height, bands, level};
+  if (!raster_.Read(place, pixels)) return false;
+  std::vector<std::optional<T>> values;
+  for (const unsigned band : bands) values.push_back(noData_[band]);
+  const NoDataMarker<T> marker(std::move(values), raster_.Interleave(), width, height);
+  const std::uint64_t count = std::uint64_t{width} * height * bands.GetCount();
+  if (marker.IsNeeded()) marker.Mark(0, count, pixels, state);
+  return raster_.ReadMasks(place, state);
+}
+
+template <typename T>
+bool Reader<T>::WritePixels(unsigned left, unsigned top, unsigned width, unsigned height,
+                            const Array<unsigned>& bands, unsigned level, const T* pixels,
+                            const unsigned char*) {
+  return raster_.Write({left, top, width, height, bands, level}, pixels);
+}
+
+}  // namespace lumo::gdal
