@@ -80,6 +80,15 @@ void OutputFile::Begin(std::uint64_t bytes) {
   folder_ = folder;
 }
 
+std::string OutputFile::InUsersWords(std::string message) const {
+  const std::string work = GetWorkName();
+  for (std::size_t at = 0; (at = message.find(work, at)) != std::string::npos;) {
+    message.replace(at, work.size(), shown_);
+    at += shown_.size();
+  }
+  return message;
+}
+
 /// Throws when `place` holds a file that is not this output's to replace.
 void OutputFile::CheckSideFile(const fs::path& place) const {
   std::error_code fault;

@@ -36,6 +36,9 @@ class OutputFile {
   /// What the user calls it.
   const std::string& GetShownName() const { return shown_; }
 
+  /// A message in which the working name stands, with the name of the user in its place.
+  std::string InUsersWords(std::string message) const;
+
   /// Gives the file, and what was made beside it, their names. Throws HostError when the file isn't
   /// there, or when a file beside it would take the place of one that is.
   void Commit();

@@ -90,6 +90,7 @@ std::vector<BandPalette> ReadPalettes(JobSession& session, const String& raster,
 }
 
 constexpr const char* kCopyStep = "copy";
+constexpr const char* kCloseStep = "close.target";
 
 /// The copying as a whole: opens the source, stands views on it, makes the copy and closes all.
 /// @param target  the file to make.
@@ -128,7 +129,7 @@ JobDraft MakeDraft(const Options& options, const Plan& plan, const std::string& 
   JobWriterCommand& copy = draft.Step(kCopyStep, "CopyRasterCommand");
   copy.AddVariableInput("SrcURI", shown);
   copy.AddVariableInput("DstURI", "$target");
-  draft.Close("close.target", "$target");
+  draft.Close(kCloseStep, "$target");
   for (auto raster = opened.rbegin(); raster != opened.rend(); ++raster) {
     draft.Close("close." + raster->ToUTF8().substr(1), *raster);
   }
@@ -153,6 +154,11 @@ bool SameNoData(const RasterInfo& a, const RasterInfo& b) {
     if (values[band] != others[band] && !bothNaN) return false;
   }
   return true;
+}
+
+std::uint64_t PixelBytes(const Plan& plan, const RasterInfo& info) {
+  return std::uint64_t{plan.rect.Width()} * plan.rect.Height() * plan.bands.GetCount() *
+         DataTypeBytes(info.dataType);
 }
 
 /// Opens the copy and looks at it: throws when it is another raster, and says what the format did
@@ -200,6 +206,21 @@ Plan MakePlan(JobSession& session, const Options& options, const String& raster,
   return plan;
 }
 
+/// Makes the copy in the output's folder. Throws what went wrong.
+void MakeCopy(JobSession& session, const Options& options, const Plan& plan,
+              const OutputFile& output) {
+  const JobDraft draft = MakeDraft(options, plan, output.GetWorkName());
+  JobResults results;
+  {
+    const ProgressView view(CopyProgress(session, draft), options.job.GetProgressStyle());
+    results = session.Run(draft);
+  }
+  const String fault = results.Find(kCloseStep).returns.Find("Fault");
+  if (fault.GetLength() != 0) throw HostError(kExitFailed, fault.ToUTF8());
+  CheckCopy(session, options, plan, output, ReadInfo(results, "shown"));
+  session.CheckInterrupt();
+}
+
 int Copy(const Options& options) {
   ChooseFormat(options);
   OutputFile output(options.output, options.overwrite, {options.source.file});
@@ -216,17 +237,12 @@ int Copy(const Options& options) {
     std::cout << MakeDraft(options, plan, output.GetName()).Write().ToUTF8() << '\n';
     return kExitSuccess;
   }
-  const std::uint64_t bytes = std::uint64_t{plan.rect.Width()} * plan.rect.Height() *
-                              plan.bands.GetCount() * DataTypeBytes(info.dataType);
-  output.Begin(Compresses(plan.format) ? 0 : bytes);
-  const JobDraft draft = MakeDraft(options, plan, output.GetWorkName());
-  JobResults results;
-  {
-    const ProgressView view(CopyProgress(session, draft), options.job.GetProgressStyle());
-    results = session.Run(draft);
+  output.Begin(Compresses(plan.format) ? 0 : PixelBytes(plan, info));
+  try {
+    MakeCopy(session, options, plan, output);
+  } catch (const HostError& error) {
+    throw HostError(error.code, output.InUsersWords(error.what()));
   }
-  CheckCopy(session, options, plan, output, ReadInfo(results, "shown"));
-  session.CheckInterrupt();
   output.Commit();
   return kExitSuccess;
 }
