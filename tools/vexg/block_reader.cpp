@@ -77,10 +77,6 @@ std::vector<SubRect> CutIntoBlocks(const RasterInfo& info, const SubRect& rect, 
   return blocks;
 }
 
-std::string BlockMemoryName() {
-  return "vexg-block-" + std::to_string(platform::ProcessNumber());
-}
-
 void BlockMemory::Make(std::uint64_t count) {
   const unsigned pixelBytes = FittingSize(count * elementBytes_);
   const unsigned stateBytes = FittingSize(count);
@@ -95,9 +91,9 @@ void BlockMemory::Make(std::uint64_t count) {
   }
 }
 
-void BlockMemory::AddStep(JobDraft& draft, const std::string& step, const char* id,
-                          const String& raster, const BlockRequest& block) const {
-  JobWriterCommand& command = draft.Step(step, id);
+void BlockMemory::AddStep(JobDraft& draft, const std::string& step, const String& raster,
+                          const BlockRequest& block) const {
+  JobWriterCommand& command = draft.Step(step, "GetRasterSubRectCommand");
   command.AddInput("URI", raster);
   command.AddInput("SubRect", block.rect);
   command.AddInput("Bands", block.bands);
@@ -113,21 +109,41 @@ BlockReader::BlockReader(JobSession& session, const String& raster, const Raster
     : session_(session),
       raster_(raster),
       shown_(shown),
-      memory_(BlockMemoryName(), DataTypeBytes(info.dataType)) {}
+      memory_("vexg-block-" + std::to_string(platform::ProcessNumber()),
+              DataTypeBytes(info.dataType)) {}
 
 void BlockReader::Read(const BlockRequest& block) {
   session_.CheckInterrupt();
   memory_.Make(block.GetCount());
   JobDraft draft;
-  memory_.AddStep(draft, "block", "GetRasterSubRectCommand", raster_, block);
-  CheckBlock(session_.Run(draft), "block", shown_);
-}
-
-void CheckBlock(const JobResults& results, const std::string& step, const std::string& shown) {
-  const Map<String, String>& returns = results.Find(String(step)).returns;
+  memory_.AddStep(draft, "block", raster_, block);
+  const JobResults results = session_.Run(draft);
+  const Map<String, String>& returns = results.Find("block").returns;
   if (ParseValue<bool>(returns.Find("Return"))) return;
   const std::string fault = returns.Find("Fault").ToUTF8();
-  throw HostError(kExitFailed, fault.empty() ? shown + ": the pixels could not be moved" : fault);
+  throw HostError(kExitFailed, fault.empty() ? shown_ + ": the pixels can't be read" : fault);
+}
+
+void BlockReader::ReadAll(const std::vector<SubRect>& blocks, const Array<unsigned>& bands,
+                          Interleave interleave, ProgressStyle style,
+                          const std::function<void(const SubRect&)>& take) {
+  const ProgressReportPtr progress(new StandardProgressReport);
+  const ProgressView view(progress, style);
+  for (std::size_t i = 0; i < blocks.size(); ++i) {
+    Read({blocks[i], bands, interleave});
+    take(blocks[i]);
+    progress->Update(static_cast<double>(i + 1) / static_cast<double>(blocks.size()));
+  }
+}
+
+void AddBlockSteps(JobDraft& draft, const String& raster, const RasterInfo& info,
+                   const Array<unsigned>& bands, Interleave interleave,
+                   const std::vector<SubRect>& blocks) {
+  for (std::size_t i = 0; i < blocks.size(); ++i) {
+    const std::string step = "block" + std::to_string(i);
+    const BlockMemory memory("vexg-" + step, DataTypeBytes(info.dataType));
+    memory.AddStep(draft, step, raster, {blocks[i], bands, interleave});
+  }
 }
 
 }  // namespace lumo::host

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <functional>
 #include <memory>
 #include <vector>
 
@@ -18,7 +19,7 @@ inline constexpr std::uint64_t kBlockBudget = 8U << 20;
 std::vector<SubRect> CutIntoBlocks(const RasterInfo& info, const SubRect& rect, unsigned bands,
                                    bool wholeLines);
 
-/// A block to move between a raster and named memory.
+/// A block to read.
 struct BlockRequest {
   SubRect rect;
   Array<unsigned> bands;
@@ -39,10 +40,9 @@ class BlockMemory {
   /// Makes room for a block. Throws HostError when the system has none.
   void Make(std::uint64_t count);
 
-  /// Adds a command that moves a block: GetRasterSubRectCommand or PutRasterSubRectCommand. The
-  /// memory needs not be there yet.
+  /// Adds a command that reads a block. The memory needs not be there yet.
   /// @param raster  a variable or URI.
-  void AddStep(JobDraft& draft, const std::string& step, const char* id, const String& raster,
+  void AddStep(JobDraft& draft, const std::string& step, const String& raster,
                const BlockRequest& block) const;
 
   unsigned char* GetPixels() const { return pixels_->GetData(); }
@@ -66,9 +66,13 @@ class BlockReader {
   /// Reads a block; what was read before is gone. Throws HostError.
   void Read(const BlockRequest& block);
 
+  /// Reads blocks and calls `take` after each, with the progress of it all on show.
+  void ReadAll(const std::vector<SubRect>& blocks, const Array<unsigned>& bands,
+               Interleave interleave, ProgressStyle style,
+               const std::function<void(const SubRect&)>& take);
+
   const unsigned char* GetPixels() const { return memory_.GetPixels(); }
   const unsigned char* GetStates() const { return memory_.GetStates(); }
-  BlockMemory& GetMemory() { return memory_; }
 
  private:
   JobSession& session_;
@@ -77,10 +81,11 @@ class BlockReader {
   BlockMemory memory_;
 };
 
-/// Name of the memory of this program's blocks.
-std::string BlockMemoryName();
-
-/// Throws HostError when a step of AddStep says that its block was not moved.
-void CheckBlock(const JobResults& results, const std::string& step, const std::string& shown);
+/// Adds commands that read blocks, each into memory of its own, "vexg-block0-pixels" and so on; for
+/// a document that somebody else runs, who makes the memory.
+/// @param raster  a variable or URI.
+void AddBlockSteps(JobDraft& draft, const String& raster, const RasterInfo& info,
+                   const Array<unsigned>& bands, Interleave interleave,
+                   const std::vector<SubRect>& blocks);
 
 }  // namespace lumo::host

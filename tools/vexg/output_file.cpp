@@ -18,25 +18,42 @@ std::string LastFault() {
   return code != 0 ? std::generic_category().message(code) : "the system does not say why";
 }
 
+/// The absolute path, with the links of all but its last part resolved.
+fs::path InResolvedFolder(const fs::path& path) {
+  std::error_code fault;
+  const fs::path absolute = fs::absolute(path).lexically_normal();
+  return fs::weakly_canonical(absolute.parent_path(), fault) / absolute.filename();
+}
+
 }  // namespace
 
 OutputFile::OutputFile(const std::string& file, bool overwrite,
                        const std::vector<std::string>& inputs)
-    : shown_(file), target_(fs::absolute(file)), overwrite_(overwrite), inputs_(inputs) {
+    : shown_(file), target_(fs::absolute(file)), overwrite_(overwrite) {
   std::error_code fault;
   if (!target_.has_filename()) Refuse("is no name of a file");
   if (!fs::is_directory(target_.parent_path(), fault)) {
     Refuse("there is no folder " + target_.parent_path().string());
   }
-  for (const std::string& input : inputs_) {
-    if (fs::equivalent(target_, input, fault)) Refuse("is the input; nothing was run");
-  }
+  for (const std::string& input : inputs) RefuseInput(input);
   const fs::file_status status = fs::status(target_, fault);
   if (fs::is_directory(status)) Refuse("is a folder");
   if (fs::exists(status) && !fs::is_regular_file(status)) Refuse("is no file that can be replaced");
   if (fs::exists(fs::symlink_status(target_, fault)) && !overwrite_) {
     Refuse("is there already; give --overwrite to replace it");
   }
+}
+
+void OutputFile::RefuseInput(const std::string& input) {
+  std::error_code fault;
+  const fs::path source = InResolvedFolder(input);
+  const fs::path target = InResolvedFolder(target_);
+  const bool goesWithIt =
+      fs::exists(target, fault) && target.string().rfind(source.string() + ".", 0) == 0;
+  if (target == source || goesWithIt || fs::equivalent(target, source, fault)) {
+    Refuse("is a file of the input, or another output; nothing was run");
+  }
+  inputs_.push_back(source.string());
 }
 
 OutputFile::~OutputFile() {
@@ -63,12 +80,21 @@ void OutputFile::Begin(std::uint64_t bytes) {
   folder_ = folder;
 }
 
+std::string OutputFile::InUsersWords(std::string message) const {
+  const std::string work = GetWorkName();
+  for (std::size_t at = 0; (at = message.find(work, at)) != std::string::npos;) {
+    message.replace(at, work.size(), shown_);
+    at += shown_.size();
+  }
+  return message;
+}
+
 /// Throws when `place` holds a file that is not this output's to replace.
 void OutputFile::CheckSideFile(const fs::path& place) const {
   std::error_code fault;
   if (!fs::exists(fs::symlink_status(place, fault))) return;
   for (const std::string& input : inputs_) {
-    const fs::path source = fs::absolute(input);
+    const fs::path source(input);
     const bool isBeside = fs::equivalent(source.parent_path(), place.parent_path(), fault);
     if (isBeside && place.stem() == source.stem()) {
       Refuse(place.string() +

@@ -21,6 +21,11 @@ class OutputFile {
   OutputFile(const OutputFile&) = delete;
   OutputFile& operator=(const OutputFile&) = delete;
 
+  /// Throws HostError when the output would be `input`, or a file that goes with it. The
+  /// constructor asks this of the inputs that it gets; what a raster's source turns out to be comes
+  /// later.
+  void RefuseInput(const std::string& input);
+
   /// Makes the folder. Throws HostError when the disk has less room than `bytes`.
   void Begin(std::uint64_t bytes);
 
@@ -30,6 +35,9 @@ class OutputFile {
   std::string GetName() const { return target_.string(); }
   /// What the user calls it.
   const std::string& GetShownName() const { return shown_; }
+
+  /// A message in which the working name stands, with the name of the user in its place.
+  std::string InUsersWords(std::string message) const;
 
   /// Gives the file, and what was made beside it, their names. Throws HostError when the file isn't
   /// there, or when a file beside it would take the place of one that is.
@@ -44,7 +52,7 @@ class OutputFile {
   const std::string shown_;
   const std::filesystem::path target_;  // absolute
   const bool overwrite_;
-  const std::vector<std::string> inputs_;
+  std::vector<std::string> inputs_;
   std::filesystem::path folder_;  // empty before Begin
 };
 

@@ -6,6 +6,7 @@
 #include <CLI/CLI.hpp>
 #include <fmt/format.h>
 
+#include "data/file_uri.h"
 #include "data/format_table.h"
 #include "raster/pixel_types.h"
 #include "verb.h"
@@ -66,6 +67,10 @@ void AddOpen(JobDraft& draft, const std::string& name, const SourceOptions& sour
   draft.Open(name, "OpenRasterCommand").AddInput("ConnStr", ConnStringsOf(source));
 }
 
+std::string PathOf(const String& uri) {
+  return PathOfFileURI(ParseValue<URI>(uri));
+}
+
 void AddQuery(JobDraft& draft, const std::string& name, const String& raster) {
   draft.Step(name + ".query", "ExtendedQueryRasterCommand").AddInput("URI", raster);
   draft.Step(name + ".georef", "GetRasterGeoRefCommand").AddInput("URI", raster);
@@ -95,6 +100,10 @@ RasterInfo ReadInfo(const JobResults& results, const std::string& name) {
   }
   if (info.geoRef) info.geoRef->SetDimensions(info.samples, info.lines);
   return info;
+}
+
+Interleave ParseInterleave(const std::string& word) {
+  return word == "bsq" ? Interleave::BSQ : word == "bil" ? Interleave::BIL : Interleave::BIP;
 }
 
 SubRect ParseRect(const std::string& text, const RasterInfo& info) {

@@ -49,6 +49,10 @@ struct RasterInfo {
 /// Adds the command that opens a source, into the variable "$" name.
 void AddOpen(JobDraft& draft, const std::string& name, const SourceOptions& source);
 
+/// The file behind an open raster.
+/// @param uri  as a command gives it.
+std::string PathOf(const String& uri);
+
 /// Adds the commands that ask a raster what it is.
 /// @param name    stands in front of the names of the commands.
 /// @param raster  a variable or URI.
@@ -56,6 +60,9 @@ void AddQuery(JobDraft& draft, const std::string& name, const String& raster);
 
 /// What the commands of AddQuery said. Throws HostError for what can't be.
 RasterInfo ReadInfo(const JobResults& results, const std::string& name);
+
+/// The order that "bip", "bil" or "bsq" names.
+Interleave ParseInterleave(const std::string& word);
 
 /// The rectangle "left,top,right,bottom", all of the raster for no text. Throws HostError for one
 /// that isn't inside.

@@ -159,7 +159,7 @@ const VerbRegistration registration(
     "formats", "Lists the formats of files, and which of them can be read and written here",
     [](CLI::App& app) {
       const auto options = std::make_shared<Options>();
-      app.footer("Example: vexg formats --json");
+      app.footer("Example: vexg formats --json\n");
       app.add_flag("--json", options->json, "As JSON");
       options->job.AddTo(app);
       return VerbRegistration::Work([options] { return ListFormats(*options); });

@@ -245,7 +245,7 @@ const VerbRegistration registration(
       app.footer(
           "With --json, one file gives an object and several give a list of them; no-data values "
           "are a list with null for a band that has none, and \"nan\" or \"inf\" as a text.\n"
-          "Example: vexg info --json scene.tif");
+          "Example: vexg info --json scene.tif\n");
       app.add_option("files", options->files, "The rasters")->type_name("FILE")->required();
       app.add_flag("--json", options->json, "As JSON");
       options->source.AddFormatTo(app);

@@ -30,10 +30,6 @@ bool EndsWith(const std::string& name, const char* ending) {
   return std::filesystem::path(name).extension() == ending;
 }
 
-Interleave InterleaveOf(const std::string& word) {
-  return word == "bsq" ? Interleave::BSQ : word == "bil" ? Interleave::BIL : Interleave::BIP;
-}
-
 /// What is read of a raster, and how it lies in the output.
 struct Request {
   RasterInfo info;
@@ -108,12 +104,7 @@ JobDraft OpenDraft(const Options& options) {
 /// runs it makes.
 void PrintJob(const Options& options, const Request& request, const std::vector<SubRect>& blocks) {
   JobDraft draft = OpenDraft(options);
-  for (std::size_t i = 0; i < blocks.size(); ++i) {
-    const std::string step = "block" + std::to_string(i);
-    const BlockMemory memory("vexg-" + step, DataTypeBytes(request.info.dataType));
-    memory.AddStep(draft, step, "GetRasterSubRectCommand", "$raster",
-                   {blocks[i], request.bands, request.interleave});
-  }
+  AddBlockSteps(draft, "$raster", request.info, request.bands, request.interleave, blocks);
   draft.Close("close", "$raster");
   std::cout << draft.Write().ToUTF8() << '\n';
 }
@@ -123,55 +114,79 @@ std::unique_ptr<PixelSink> MakeSink(const OutputFile& output, const Request& req
   return std::make_unique<NpySink>(output, request, request.info.dataType);
 }
 
-int Read(const Options& options) {
-  const bool isPng = EndsWith(options.output, ".png");
-  if (!isPng && !EndsWith(options.output, ".npy")) {
-    throw HostError(kExitUsage, options.output + ": the output is named .npy or .png");
-  }
-  OutputFile output(options.output, options.overwrite, {options.source.file});
-  std::optional<OutputFile> mask;
-  if (!options.mask.empty())
-    mask.emplace(options.mask, options.overwrite, std::vector{options.source.file});
-
-  JobSession session(options.job);
-  const JobResults opened = session.Run(OpenDraft(options));
-  Request request{ReadInfo(opened, "raster"), {}, {}, InterleaveOf(options.interleave)};
+Request MakeRequest(const Options& options, const JobResults& opened, bool isPng) {
+  Request request{ReadInfo(opened, "raster"), {}, {}, ParseInterleave(options.interleave)};
   request.rect = ParseRect(options.rect, request.info);
   request.bands = ParseBands(options.bands, request.info);
   if (isPng) {
     CheckPng(options, request);
     request.interleave = Interleave::BIP;
   }
+  return request;
+}
+
+/// The second output of --mask.
+class MaskOutput {
+ public:
+  explicit MaskOutput(const Options& options) {
+    if (options.mask.empty()) return;
+    output_.emplace(options.mask, options.overwrite,
+                    std::vector{options.source.file, options.output});
+  }
+
+  void RefuseInput(const std::string& input) {
+    if (output_) output_->RefuseInput(input);
+  }
+  void Begin(const Request& request) {
+    if (!output_) return;
+    constexpr unsigned kByte = kDataTypeOf<std::uint8_t>;
+    output_->Begin(NpyWriter::GetBytes(kByte, request.rect, request.bands.GetCount()));
+    sink_.emplace(*output_, request, kByte);
+  }
+  void Write(const SubRect& rect, const unsigned char* states) {
+    if (sink_) sink_->Write(rect, states);
+  }
+  void Commit() {
+    if (!sink_) return;
+    sink_->Close();
+    output_->Commit();
+  }
+
+ private:
+  std::optional<OutputFile> output_;
+  std::optional<NpySink> sink_;
+};
+
+int Read(const Options& options) {
+  const bool isPng = EndsWith(options.output, ".png");
+  if (!isPng && !EndsWith(options.output, ".npy")) {
+    throw HostError(kExitUsage, options.output + ": the output is named .npy or .png");
+  }
+  OutputFile output(options.output, options.overwrite, {options.source.file});
+  MaskOutput mask(options);
+  JobSession session(options.job);
+  const JobResults opened = session.Run(OpenDraft(options));
+  const String raster = opened.Find("raster").returns.Find("URI");
+  output.RefuseInput(PathOf(raster));
+  mask.RefuseInput(PathOf(raster));
+  const Request request = MakeRequest(options, opened, isPng);
   const std::vector<SubRect> blocks =
       CutIntoBlocks(request.info, request.rect, request.bands.GetCount(), isPng);
   if (options.job.printJob) {
     PrintJob(options, request, blocks);
     return kExitSuccess;
   }
-
   output.Begin(request.GetBytes());
+  mask.Begin(request);
   const std::unique_ptr<PixelSink> pixels = MakeSink(output, request, isPng);
-  std::unique_ptr<PixelSink> states;
-  if (mask) {
-    mask->Begin(
-        NpyWriter::GetBytes(kDataTypeOf<std::uint8_t>, request.rect, request.bands.GetCount()));
-    states = std::make_unique<NpySink>(*mask, request, kDataTypeOf<std::uint8_t>);
-  }
-  BlockReader reader(session, opened.Find("raster").returns.Find("URI"), request.info,
-                     options.source.file);
-  const ProgressReportPtr progress(new StandardProgressReport);
-  {
-    const ProgressView view(progress, options.job.GetProgressStyle());
-    for (std::size_t i = 0; i < blocks.size(); ++i) {
-      reader.Read({blocks[i], request.bands, request.interleave});
-      pixels->Write(blocks[i], reader.GetPixels());
-      if (states) states->Write(blocks[i], reader.GetStates());
-      progress->Update(static_cast<double>(i + 1) / static_cast<double>(blocks.size()));
-    }
-  }
+  BlockReader reader(session, raster, request.info, options.source.file);
+  reader.ReadAll(blocks, request.bands, request.interleave, options.job.GetProgressStyle(),
+                 [&](const SubRect& block) {
+                   pixels->Write(block, reader.GetPixels());
+                   mask.Write(block, reader.GetStates());
+                 });
   pixels->Close();
-  if (states) states->Close();
-  if (mask) mask->Commit();
+  mask.Commit();
   output.Commit();
   return kExitSuccess;
 }
@@ -183,7 +198,7 @@ const VerbRegistration registration(
           "The array has the axes (lines, samples, bands), or those of --interleave: bil (lines, "
           "bands, samples), bsq (bands, lines, samples). A PNG holds Byte or UInt16 pixels of 1 to "
           "4 bands as they are.\n"
-          "Example: vexg read scene.tif --rect 0,0,99,49 --bands 2,1,0 -o part.npy");
+          "Example: vexg read scene.tif --rect 0,0,99,49 --bands 2,1,0 -o part.npy\n");
       options->source.AddTo(app);
       app.add_option("-o,--output", options->output, "The .npy or .png file")
           ->type_name("OUT")

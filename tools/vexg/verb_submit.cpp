@@ -43,7 +43,7 @@ const VerbRegistration registration(
     "submit", "Has a server run a job document and prints its result", [](CLI::App& app) {
       const auto options = std::make_shared<JobOptions>();
       const auto server = std::make_shared<ServerOptions>();
-      app.footer("Example: vexg submit --server vexg --progress=bar job.xml");
+      app.footer("Example: vexg submit --server vexg --progress=bar job.xml\n");
       options->AddTo(app);
       app.add_option("--server", server->name, "Name of the server")->capture_default_str();
       server->AddNoWait(app);
