@@ -6,7 +6,7 @@ import pathlib
 import struct
 import unittest
 
-from support import DATA, FolderTest, PipeTest, gdal_pixels, needs_data, needs_gdal, start
+from support import DATA, FolderTest, PipeTest, gdal_pixels, needs_data, needs_gdal
 from vexg_client import Client
 
 class Block:
@@ -28,17 +28,12 @@ class Block:
 class Pixels(PipeTest, FolderTest):
     def setUp(self):
         super().setUp()
-        self.server = start("serve", "--quiet", "pixels")
+        self.serve("pixels")
         self.client = Client("pixels")
+        self.addCleanup(self.client.close)
         self.blocks = [Block(f"vexg-pixels-{os.getpid()}", 4 * 3 * 2 * 2), Block(f"vexg-states-{os.getpid()}", 4 * 3 * 2)]
-
-    def tearDown(self):
         for block in self.blocks:
-            block.close()
-        self.client.close()
-        self.server.terminate()
-        self.server.wait()
-        super().tearDown()
+            self.addCleanup(block.close)
 
     def move(self, command, uri, rect):
         pixels, states = self.blocks
