@@ -116,9 +116,8 @@ TEST(GdalLayouts, MasksExcludePixelsOfEveryLevel) {
     CPLSetConfigOption("GDAL_TIFF_INTERNAL_MASK", "YES");
     const char* const options[] = {"INTERLEAVE=PIXEL", "TILED=YES", "COMPRESS=DEFLATE",
                                    c.alpha ? "ALPHA=YES" : nullptr, nullptr};
-    GDALDatasetH const file =
-        GDALCreate(GDALGetDriverByName("GTiff"), path.c_str(), 300, 260, c.alpha ? 4 : 2, GDT_Byte,
-                   const_cast<char**>(options));
+    GDALDatasetH const file = GDALCreate(GDALGetDriverByName("GTiff"), path.c_str(), 300, 260,
+                                         c.alpha ? 4 : 2, GDT_Byte, const_cast<char**>(options));
     for (int band = 1; band <= 2; ++band) GDALFillRaster(GDALGetRasterBand(file, band), 50, 0);
     if (!c.alpha) GDALCreateDatasetMaskBand(file, GMF_PER_DATASET);
     GDALRasterBandH const mask =
