@@ -1,6 +1,8 @@
 #pragma once
 
 #include <cstring>
+#include <memory>
+#include <vector>
 
 #include "stats/extended_raster_stats.h"
 #include "stats/raster_stats_impl.h"
@@ -28,14 +30,17 @@ class ExtendedRasterStats<T>::PairSums {
   /// Starts a group of `count` pixels.
   void Begin(std::size_t count) {
     count_ = count;
-    planes_.resize(count * bands_);
+    if (count * bands_ > room_) {
+      room_ = count * bands_;
+      planes_ = std::make_unique_for_overwrite<Value[]>(room_);
+    }
     partial_ = false;
     groupCounts_.assign(bands_, count);
     groupSums_.assign(bands_, 0);
   }
 
   void SetBand(unsigned band, const SummedPlane<T>& plane) {
-    Value* const values = planes_.data() + band * count_;
+    Value* const values = planes_.get() + band * count_;
     groupCounts_[band] = plane.valid.count;
     if (plane.valid.count == 0) {
       std::fill_n(values, count_, Value(0));
@@ -97,7 +102,7 @@ class ExtendedRasterStats<T>::PairSums {
  private:
   std::size_t Square() const { return std::size_t{bands_} * bands_; }
   std::size_t At(unsigned i, unsigned j) const { return std::size_t{i} * bands_ + j; }
-  const Value* Plane(unsigned band) const { return planes_.data() + band * count_; }
+  const Value* Plane(unsigned band) const { return planes_.get() + band * count_; }
   const Value* Weights(unsigned band) const { return weights_.data() + band * count_; }
 
   /// The weights of a band, to be written; those of the bands without any are 1.
@@ -162,7 +167,8 @@ class ExtendedRasterStats<T>::PairSums {
   // The group at hand.
   std::size_t count_ = 0;
   bool partial_ = false;
-  std::vector<Value> planes_;
+  std::size_t room_ = 0;
+  std::unique_ptr<Value[]> planes_;
   std::vector<Value> weights_;
   std::vector<std::size_t> groupCounts_;
   std::vector<Sum> groupSums_;
