@@ -109,7 +109,7 @@ bool TryToMake(JobSession& session, const Format& format, const fs::path& folder
     if (error.code == kExitNoServer) throw;
     return false;
   }
-  return format.key == "MemoryRaster" || !fs::is_empty(folder);
+  return !fs::is_empty(folder);
 }
 
 nlohmann::ordered_json AsJson(const std::vector<Format>& formats) {
