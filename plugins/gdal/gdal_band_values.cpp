@@ -47,7 +47,8 @@ std::optional<StoredStats> ReadStoredStats(GDALRasterBandH band) {
   const bool isWhole =
       !stats.min.empty() && !stats.max.empty() && !stats.mean.empty() && !stats.std.empty();
   // Statistics of a sample of the pixels are not those of the band.
-  if (!isWhole || CPLTestBool(Item(band, kApproximate).c_str())) return std::nullopt;
+  const std::string approximate = Item(band, kApproximate);
+  if (!isWhole || (!approximate.empty() && CPLTestBool(approximate.c_str()))) return std::nullopt;
   return stats;
 }
 

@@ -9,6 +9,7 @@
 #include "gdal_creation.h"
 #include "gdal_georef.h"
 #include "gdal_masks.h"
+#include "gdal_open.h"
 #include "gdal_types.h"
 #include "platform/random_access_file.h"
 
@@ -108,8 +109,8 @@ OpenRaster::~OpenRaster() {
 
 std::unique_ptr<OpenRaster> OpenRaster::Open(const Format& format, const Source& source) {
   std::unique_ptr<OpenRaster> raster(new OpenRaster(format, source));
-  return raster->TakeDataset(OpenDataset(source, format, GDAL_OF_RASTER)) ? std::move(raster)
-                                                                          : nullptr;
+  return raster->TakeDataset(OpenToRead(format, source, raster->isThreaded_)) ? std::move(raster)
+                                                                              : nullptr;
 }
 
 std::unique_ptr<OpenRaster> OpenRaster::Create(const Format& format, const Source& source,
@@ -209,13 +210,14 @@ bool OpenRaster::CanWrite() {
 bool OpenRaster::OpenForUpdate() {
   if (isUpdated_) return true;
   if (!CanWrite()) return FailWith(Name(), "can't be written");
+  isThreaded_ = false;
   levels_.clear();
   dataset_.reset();
   isUpdated_ = TakeDataset(OpenDataset(source_, format_, GDAL_OF_RASTER | GDAL_OF_UPDATE));
   if (isUpdated_) return true;
   canWrite_ = Answer::kNo;
   const String fault = TakeFault();
-  TakeDataset(OpenDataset(source_, format_, GDAL_OF_RASTER));
+  TakeDataset(OpenToRead(format_, source_, isThreaded_));
   SetFault(fault);
   return false;
 }
@@ -244,7 +246,10 @@ bool OpenRaster::Transfer(GDALRWFlag direction, const BlockPlace& place, void* p
   const Strides strides(interleave_, place, GDALGetDataTypeSizeBytes(type));
   const auto at = [](unsigned number) { return static_cast<int>(number); };
   CPLErr result = CE_None;
-  if (level->dataset != nullptr) {
+  // Several bands of a file that keeps them one by one: GDAL 3.6 mixes them up on its threads.
+  const bool isWhole =
+      level->dataset != nullptr && !(isThreaded_ && interleave_ != lumo::Interleave::BIP);
+  if (isWhole) {
     std::vector<int> numbers;
     for (const unsigned band : place.bands) numbers.push_back(at(band) + 1);
     result = GDALDatasetRasterIOEx(
@@ -252,7 +257,7 @@ bool OpenRaster::Transfer(GDALRWFlag direction, const BlockPlace& place, void* p
         pixels, at(place.width), at(place.height), type, at(place.bands.GetCount()), numbers.data(),
         strides.pixel, strides.line, strides.band, nullptr);
   }
-  for (unsigned i = 0; level->dataset == nullptr && result == CE_None && i < place.bands.GetCount();
+  for (unsigned i = 0; !isWhole && result == CE_None && i < place.bands.GetCount();
        ++i) {
     void* const first = static_cast<char*>(pixels) + strides.band * i;
     result = GDALRasterIOEx(level->bands[place.bands[i]], direction, at(place.left), at(place.top),
@@ -264,8 +269,13 @@ bool OpenRaster::Transfer(GDALRWFlag direction, const BlockPlace& place, void* p
   return messages.Fail(Name(), direction == GF_Read ? "can't be read" : "can't be written");
 }
 
-bool OpenRaster::Read(const BlockPlace& place, void* pixels) const {
-  return Transfer(GF_Read, place, pixels);
+bool OpenRaster::Read(const BlockPlace& place, void* pixels) {
+  if (Transfer(GF_Read, place, pixels)) return true;
+  if (!isThreaded_ || CheckPlace(place) == nullptr) return false;
+  // What a thread of GDAL has to say reaches nobody. Without them it says it here.
+  isThreaded_ = false;
+  return TakeDataset(OpenDataset(source_, format_, GDAL_OF_RASTER)) &&
+         Transfer(GF_Read, place, pixels);
 }
 
 bool OpenRaster::Write(const BlockPlace& place, const void* pixels) {

@@ -67,7 +67,7 @@ class OpenRaster {
   bool OpenForUpdate();
 
   /// Carries a block to the caller's memory, in the raster's interleave.
-  bool Read(const BlockPlace& place, void* pixels) const;
+  bool Read(const BlockPlace& place, void* pixels);
   bool Write(const BlockPlace& place, const void* pixels);
 
   /// Sets state bits where a mask or an alpha band of the source excludes pixels.
@@ -91,7 +91,8 @@ class OpenRaster {
   unsigned dataType_ = 0;
   lumo::Interleave interleave_ = lumo::Interleave::BSQ;
   std::map<unsigned, RasterLevel> levels_;
-  bool isUpdated_ = false;  // open for writing
+  bool isUpdated_ = false;   // open for writing
+  bool isThreaded_ = false;  // GDAL decodes on threads of its own
   enum class Answer { kUnknown, kNo, kYes } canWrite_ = Answer::kUnknown;
 };
 

@@ -359,9 +359,9 @@ bool Reader<T>::ChangePalette(unsigned band, const lumo::Palette* palette) {
   if (raster_.CanWrite() && !raster_.OpenForUpdate()) return false;
   const Messages messages;
   if (!gdal::WritePalette(raster_.Band(band), palette)) return messages.Fail(raster_.Name());
-  if (!FlushBandValues()) return false;
-  return HasPalette(band) == (palette != nullptr) ||
-         FailWith(raster_.Name(), "the format keeps no such palette");
+  if (HasPalette(band) == (palette != nullptr)) return FlushBandValues();
+  if (palette != nullptr) gdal::WritePalette(raster_.Band(band), nullptr);
+  return FailWith(raster_.Name(), "the format keeps no such palette");
 }
 
 template <typename T>

@@ -17,7 +17,8 @@ namespace lumo {
 ///         other or the formula, with nothing written; or when a read or a write failed. An aborted
 ///         run is true, and what was written stays.
 template <typename TIn, typename TOut>
-bool Calibrate(const char* name, const CalibrationFormula& formula, const RasterPtr<TIn>& source,
-               const RasterPtr<TOut>& target, const IPC& ipc);
+VEXG_EXPORT bool Calibrate(const char* name, const CalibrationFormula& formula,
+                           const RasterPtr<TIn>& source, const RasterPtr<TOut>& target,
+                           const IPC& ipc);
 
 }  // namespace lumo

@@ -33,7 +33,7 @@ class CalculateRasterHistogramCommand final : public RasterCommand {
       return Fail("neither BinCount, nor BinSize and Bands are given");
     }
     const auto bands = Read<Array<unsigned>>("Bands");
-    if (!CheckBands(*raster, bands)) return Fail(FaultOr("Bands is not an integer array"));
+    if (HasInput("Bands") && !CheckBands(*raster, bands)) return Fail();
     AsyncPtr run;
     const bool typed = DispatchType(TenTypes{}, raster->DataType(), [&]<typename T>() {
       const RasterPtr<T> source(raster);

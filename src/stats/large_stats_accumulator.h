@@ -49,6 +49,10 @@ struct LargeStatsAccumulator {
   /// Takes in what another one has seen. No sample is to be added afterwards.
   void Merge(const LargeStatsAccumulator& other) {
     if (other.count == 0) return;
+    if (count == 0) {
+      *this = other;
+      return;
+    }
     const auto n1 = static_cast<double>(count);
     const auto n2 = static_cast<double>(other.count);
     const double n = n1 + n2;
@@ -93,6 +97,10 @@ struct LargeStatsAccumulator2 : LargeStatsAccumulator<T> {
 
   void Merge(const LargeStatsAccumulator2& other) {
     if (other.count == 0) return;
+    if (this->count == 0) {
+      *this = other;
+      return;
+    }
     const auto n1 = static_cast<double>(this->count);
     const auto n2 = static_cast<double>(other.count);
     const double n = n1 + n2;

@@ -248,7 +248,7 @@ class Server(PipeTest, CopyTest):
             self.fails(1, words + (" are" if words != "network" else ""), "info", *source, "--server", "strict")
         self.stop()
         self.serve("open", *(part for what in ("network", "virtual", "memory", "indirect") for part in ("--allow", what)))
-        self.fine("info", packed, "--server", "open")
+        self.fine("info", packed, "--input-format", "TIFF", "--server", "open")
         for _, _, source in cases[1:2] + cases[3:]:
             code, _, err = run("info", *map(str, source), "--server", "open")
             self.assertEqual(code, 1)

@@ -255,7 +255,8 @@ TEST(GdalCreation, KeepsTheCamera) {
       ASSERT_TRUE(read);
       ASSERT_EQ(read->GetType(), model->GetType());
       const auto* const readBoth = dynamic_cast<const StdRpcGeoRef*>(read.Get());
-      const GeoRef& readCamera = readBoth != nullptr ? static_cast<const GeoRef&>(readBoth->Rpc()) : *read;
+      const GeoRef& readCamera =
+          readBoth != nullptr ? static_cast<const GeoRef&>(readBoth->Rpc()) : *read;
       for (const auto& ground :
            {std::array{12.5632, 41.8902, 95.0}, std::array{12.5645, 41.8913, 300.0}}) {
         Array<double> want{ArrayDims(1, 3)}, got{ArrayDims(1, 3)};

@@ -97,7 +97,9 @@ class StepProgress final : public ProgressReport {
  public:
   /// @param step  position of the command, of `steps`.
   StepProgress(const ProgressReportPtr& job, std::size_t step, std::size_t steps)
-      : job_(job), step_(static_cast<double>(step)), steps_(static_cast<double>(steps)) {}
+      : job_(job), step_(static_cast<double>(step)), steps_(static_cast<double>(steps)) {
+    job_->Update(0.0);  // what it shows is of the job before
+  }
   double GetProgress() const override { return job_->GetProgress() * steps_ - step_; }
 
  private:

@@ -170,7 +170,7 @@ std::string GeoRefAsText(const RasterInfo& info) {
   text += fmt::format("  system         {}\n", !name.empty()     ? name
                                                : !system.empty() ? system
                                                                  : "none");
-  text += fmt::format("  pixel size     {} {}\n", geoRef.PixelSizeX(), geoRef.PixelSizeY());
+  text += fmt::format("  pixel size     {:.10g} {:.10g}\n", geoRef.PixelSizeX(), geoRef.PixelSizeY());
   if (geoRef.GetType() != GeoRef::kRpc) {
     text += fmt::format("  tie point      pixel {} {} at {} {}\n", geoRef.TiePixelX(),
                         geoRef.TiePixelY(), geoRef.TieMapX(), geoRef.TieMapY());

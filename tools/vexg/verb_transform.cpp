@@ -186,12 +186,24 @@ GeoRefPtr ReadGeoRef(const TransformOptions& options) {
   throw HostError(kExitFailed, options.source.file + ": has no geo-reference");
 }
 
+/// True for a model whose way from the map to pixels is exact for square pixels only.
+bool IsRotatedOblong(const GeoRef& geoRef) {
+  return geoRef.GetType() == GeoRef::kStd && geoRef.Rotation() != 0 &&
+         std::abs(geoRef.PixelSizeX() - geoRef.PixelSizeY()) > 1e-9 * std::abs(geoRef.PixelSizeX());
+}
+
 std::unique_ptr<Carrier> MakeCarrier(const TransformOptions& options) {
   if (options.source.file.empty()) {
     return std::make_unique<SystemCarrier>(ReadSystem("--from", options.from),
                                            ReadSystem("--to", options.to));
   }
-  return std::make_unique<RasterCarrier>(ReadGeoRef(options), options.inverse);
+  const GeoRefPtr geoRef = ReadGeoRef(options);
+  if (options.inverse && IsRotatedOblong(*geoRef)) {
+    throw HostError(kExitFailed, options.source.file +
+                                     ": --inverse: the grid is rotated and its pixels are not "
+                                     "square; the model has no exact way back to pixels");
+  }
+  return std::make_unique<RasterCarrier>(geoRef, options.inverse);
 }
 
 /// Throws for options that don't go together.

@@ -19,14 +19,21 @@ const std::map<std::string, std::vector<std::string>> kDriverNames = {
     {"Shapefile", {"ESRI Shapefile"}},
 };
 
+/// Threads of GDAL's own speak to the process's handler, which by default writes to the standard
+/// error stream. A handler that a host has set stays.
+void Silence() {
+  const CPLErrorHandler before = CPLSetErrorHandler(CPLQuietErrorHandler);
+  if (before != nullptr && before != CPLDefaultErrorHandler) CPLSetErrorHandler(before);
+}
+
 }  // namespace
 
 void StartGdal() {
   static std::once_flag started;
   std::call_once(started, [] {
-    const Messages messages;
     const std::string data = GetGlobalEnvironmentImpl().Find(Environment::kGdalDirectory).ToUTF8();
     if (!data.empty()) CPLSetConfigOption("GDAL_DATA", data.c_str());
+    Silence();
     GDALAllRegister();
   });
 }
