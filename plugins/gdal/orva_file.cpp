@@ -147,16 +147,19 @@ bool File::Write(std::uint64_t offset, std::span<const platform::ConstFilePiece>
   return Fail(fault);
 }
 
-bool File::ChangeHeader(const std::function<void(HeaderText&)>& change) {
+bool File::ChangeHeader(const std::function<bool(Header&)>& change) {
   if (!canWrite_) return Fail(path_ + ": opened for reading only");
   if (!isNew_ && !pixels_->HasName()) return Fail(path_ + ": replaced since it was opened");
   Header header = header_;
   if (!isNew_ && !LoadHeader(header)) return false;
-  change(header.text);
+  const std::string before = header.text.Format();
+  if (!change(header)) return false;
   const std::string text = header.text.Format();
   std::string fault;
   if (text.size() > kMaxHeaderBytes) return Fail(HeaderPath(path_) + ": too much for a header");
-  if (!isNew_ && !platform::ReplaceFile(HeaderPath(path_), text, &fault)) return Fail(fault);
+  if (!isNew_ && text != before && !platform::ReplaceFile(HeaderPath(path_), text, &fault)) {
+    return Fail(fault);
+  }
   header_.text = std::move(header.text);
   return true;
 }

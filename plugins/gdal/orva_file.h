@@ -39,9 +39,10 @@ class File {
   /// A failure to write dooms a new raster.
   bool Write(std::uint64_t offset, std::span<const platform::ConstFilePiece> pieces);
 
-  /// Lets `change` change the header. That of a raster which has one is read again before, since
-  /// another connection may have written it, and is written.
-  bool ChangeHeader(const std::function<void(HeaderText&)>& change);
+  /// Lets `change` change the text of a header, unless it gives false, with SetFault. The header of
+  /// a raster which has one is read again before, since another connection may have written it, and
+  /// is written when it has changed.
+  bool ChangeHeader(const std::function<bool(Header&)>& change);
 
  private:
   explicit File(std::string path) : path_(std::move(path)) {}

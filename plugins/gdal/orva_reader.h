@@ -68,12 +68,14 @@ class Reader final : public RasterReader<T> {
   const FlatLayout& Layout() const { return file_.GetHeader().layout; }
   bool Fail(const char* what) const;
   bool RefusePyramid() const { return Fail("no pyramid is kept in this format"); }
-  bool Store(BandValues<T> values);
+  template <typename F>
+  bool Change(F&& change);
   bool DropStats();
 
   File& file_;
   BandValues<T> values_;
   std::map<unsigned, T> noData_;
+  bool hasWrittenPixels_ = false;
 };
 
 }  // namespace lumo::orva

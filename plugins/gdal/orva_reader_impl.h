@@ -19,20 +19,33 @@ bool Reader<T>::Fail(const char* what) const {
   return false;
 }
 
-/// Puts values into the header, and keeps them when that has worked.
+/// Lets `change` change the values that the header has now, and keeps them when they are stored.
 template <typename T>
-bool Reader<T>::Store(BandValues<T> values) {
-  if (!file_.ChangeHeader([&](HeaderText& text) { values.Write(text); })) return false;
-  values_ = std::move(values);
-  return true;
+template <typename F>
+bool Reader<T>::Change(F&& change) {
+  BandValues<T> changed;
+  const bool stored = file_.ChangeHeader([&](Header& header) {
+    std::string fault;
+    if (!changed.Read(header, fault)) {
+      SetFault(HeaderPath(file_.Path()) + ": " + fault);
+      return false;
+    }
+    change(changed);
+    changed.Write(header.text);
+    return true;
+  });
+  if (stored) values_ = std::move(changed);
+  return stored;
 }
 
 template <typename T>
 bool Reader<T>::DropStats() {
-  if (values_.stats.empty() && values_.histograms.empty()) return true;
-  BandValues<T> left;
-  left.palettes = values_.palettes;
-  return Store(std::move(left));
+  if (hasWrittenPixels_ && values_.stats.empty() && values_.histograms.empty()) return true;
+  hasWrittenPixels_ = Change([](BandValues<T>& values) {
+    values.stats.clear();
+    values.histograms.clear();
+  });
+  return hasWrittenPixels_;
 }
 
 template <typename T>
@@ -51,16 +64,18 @@ RasterBandStats<T> Reader<T>::ReadStats(unsigned band) {
 template <typename T>
 bool Reader<T>::WriteStats(const Array<RasterBandStats<T>>& stats) {
   if (!kHasStats) return Fail("complex pixels have no statistics");
-  BandValues<T> changed = values_;
   for (const RasterBandStats<T>& band : stats) {
     if (band.band >= Bands()) return Fail("statistics of a band that isn't there");
-    if (band.mask == 0) {
-      changed.stats.erase(band.band);
-    } else {
-      changed.stats[band.band] = band;
-    }
   }
-  return Store(std::move(changed));
+  return Change([&](BandValues<T>& values) {
+    for (const RasterBandStats<T>& band : stats) {
+      if (band.mask == StatsMask::None) {
+        values.stats.erase(band.band);
+      } else {
+        values.stats[band.band] = band;
+      }
+    }
+  });
 }
 
 template <typename T>
@@ -79,14 +94,14 @@ Array<RasterBandHistogram<T>> Reader<T>::Histogram(unsigned band) {
 template <typename T>
 bool Reader<T>::WriteHistogram(const Array<RasterBandHistogram<T>>& histograms) {
   if (!kHasStats) return Fail("complex pixels have no histograms");
-  BandValues<T> changed = values_;
-  changed.histograms.assign(histograms.begin(), histograms.end());
-  for (const RasterBandHistogram<T>& histogram : changed.histograms) {
+  for (const RasterBandHistogram<T>& histogram : histograms) {
     if (histogram.band >= Bands()) return Fail("a histogram of a band that isn't there");
     if (histogram.counts.GetCount() != histogram.binCount)
       return Fail("a histogram without counts");
   }
-  return Store(std::move(changed));
+  return Change([&](BandValues<T>& values) {
+    values.histograms.assign(histograms.begin(), histograms.end());
+  });
 }
 
 template <typename T>
@@ -105,15 +120,12 @@ template <typename T>
 bool Reader<T>::WritePalette(unsigned band, const lumo::Palette& palette) {
   if (band >= Bands()) return Fail("a palette of a band that isn't there");
   if (palette.GetCount() == 0) return DeletePalette(band);
-  BandValues<T> changed = values_;
-  changed.palettes[band] = palette;
-  return Store(std::move(changed));
+  return Change([&](BandValues<T>& values) { values.palettes[band] = palette; });
 }
 
 template <typename T>
 bool Reader<T>::DeletePalette(unsigned band) {
-  BandValues<T> changed = values_;
-  return changed.palettes.erase(band) == 0 || Store(std::move(changed));
+  return Change([&](BandValues<T>& values) { values.palettes.erase(band); });
 }
 
 template <typename T>

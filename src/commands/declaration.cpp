@@ -34,6 +34,8 @@ ValueKindText Describe(ValueKind kind) {
       return {"geo-reference", "as told in georeferencing.md"};
     case ValueKind::kPaletteArray:
       return {"palette array", "rank:extents [palettes] and a blank"};
+    case ValueKind::kURIArray:
+      return {"URI array", "rank:extents [[text] [text] ] and a blank"};
   }
   return {"", ""};
 }

@@ -27,6 +27,7 @@ enum class ValueKind {
   kTiles,
   kGeoRef,
   kPaletteArray,
+  kURIArray,
 };
 
 /// The name of a kind and its text form, for people.

@@ -10,6 +10,7 @@ void Job::Clear() {
   commands.Clear();
   commandIndex.Clear();
   unknown.Clear();
+  tellsReasons = false;
 }
 
 }  // namespace lumo

@@ -46,6 +46,7 @@ class VEXG_EXPORT Job {
   Deque<CommandDescriptorPtr> commands;  ///< in document order
   Map<String, unsigned> commandIndex;    ///< name to position in `commands`
   List<UnknownCommand> unknown;          ///< in document order
+  bool tellsReasons = false;             ///< the result document says why commands failed
   IPCPtr ipc;                            ///< empty when the document named none that can be used
   IPC defaultIpc;
 };

@@ -22,6 +22,8 @@ void JobParser::StartElement(const String& name, const Attributes& attributes) {
     StartCommand(attributes);
   } else if (IsChannelElement(name)) {
     channel_ = OpenChannel(name, attributes);
+  } else if (name == "Reasons") {
+    job_.tellsReasons = true;
   } else if (!current_.IsNull()) {
     if (name == "Input") MergeInto(current_->inputs, attributes);
     if (name == "Output") MergeInto(current_->outputs, attributes);

@@ -7,7 +7,8 @@ namespace lumo {
 
 /// Fills a Job from a job document. Elements that it doesn't know are passed over, and their
 /// children are looked at in their place. A Command whose ID the registry doesn't know is dropped
-/// with its children, and noted in the job's list of unknown commands.
+/// with its children, and noted in the job's list of unknown commands. An element Reasons asks the
+/// result document to say why commands failed.
 ///
 /// A document that breaks off leaves what it had named so far in the job.
 class VEXG_EXPORT JobParser : public XMLSimpleParser {

@@ -6,7 +6,7 @@
 namespace lumo {
 namespace {
 
-XMLElementPtr DescribeCommand(CommandDescriptor& descriptor) {
+XMLElementPtr DescribeCommand(CommandDescriptor& descriptor, bool tellReason) {
   auto* const element = new JobResultWriterValue;
   const XMLElementPtr owner(element);
   Command& command = *descriptor.command;
@@ -17,6 +17,8 @@ XMLElementPtr DescribeCommand(CommandDescriptor& descriptor) {
   element->attributes["Wall"] = FormatDuration(end.wall - start.wall);
   element->attributes["CPU"] = FormatDuration(end.cpu - start.cpu);
   element->attributes["Usage"] = "0";
+  const String& reason = command.GetReason();
+  if (tellReason && reason.GetLength() != 0) element->attributes["Reason"] = reason;
 
   Map<String, String> returns;
   command.GetReturns(returns);
@@ -51,7 +53,7 @@ String JobResultWriter::Write() {
   XMLDocumentRoot root;
   root.name = "JobResult";
   for (const CommandDescriptorPtr& descriptor : job_.commands) {
-    root.children.PushBack(DescribeCommand(*descriptor));
+    root.children.PushBack(DescribeCommand(*descriptor, job_.tellsReasons));
   }
   XMLSimpleWriter writer;
   const String text = writer.Write(root);
@@ -66,6 +68,7 @@ void JobResultParser::StartElement(const String& name, const Map<String, String>
     current_.cpu = attributes.Find("CPU");
     current_.wall = attributes.Find("Wall");
     current_.usage = attributes.Find("Usage");
+    current_.reason = attributes.Find("Reason");
     current_.returns.Clear();
   } else if (name == "Return") {
     for (const auto& [returnName, value] : attributes) current_.returns[returnName] = value;

@@ -12,6 +12,7 @@ struct JobResult {
   String cpu;   ///< processor time, see FormatDuration
   String wall;  ///< wall-clock time
   String usage;
+  String reason;  ///< why it failed; only where the job asked for reasons
 };
 
 /// A duration as a whole number with its unit behind it: "850us", "12ms", "3s", "2min", "1hr". The

@@ -32,16 +32,6 @@ std::recursive_mutex& LoadMutex() {
   return mutex;
 }
 
-const String& LibraryName(const FormatRecord& record) {
-#if defined(_WIN32)
-  return record.windowsLibrary;
-#elif defined(__APPLE__)
-  return record.macLibrary;
-#else
-  return record.linuxLibrary;
-#endif
-}
-
 /// Loads a plug-in from the first place that holds its file.
 platform::Module LoadLibraryFile(const std::string& name, std::string& fault) {
   const String binDirectory = GetGlobalEnvironmentImpl().Find(Environment::kBinDirectory);
@@ -109,6 +99,16 @@ FormatRecord gCdfFormatRecords[kFormatCount] = {
 };
 
 const std::uint32_t gCdfFormatRecordCount = kFormatCount;
+
+const String& LibraryName(const FormatRecord& record) {
+#if defined(_WIN32)
+  return record.windowsLibrary;
+#elif defined(__APPLE__)
+  return record.macLibrary;
+#else
+  return record.linuxLibrary;
+#endif
+}
 
 FormatRecord* FindFormat(const String& name) {
   for (FormatRecord& record : gCdfFormatRecords) {

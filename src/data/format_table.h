@@ -40,6 +40,9 @@ using CreateDataConnectionFactoryFunction = DataConnectionFactory*(FormatRecord*
 // Connection strings are arrays: a piece either equals a format's key exactly, or is for the
 // plug-in.
 
+/// File name of the plug-in of a row on this system.
+VEXG_EXPORT const String& LibraryName(const FormatRecord& record);
+
 /// The array of these pieces.
 VEXG_EXPORT Array<String> ConnStrings(std::initializer_list<String> pieces);
 

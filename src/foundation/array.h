@@ -31,6 +31,17 @@ std::ostream& operator<<(std::ostream& out, const Complex<T>& value) {
   return out << ')';
 }
 
+/// Reads what operator<< writes.
+template <typename T>
+std::istream& operator>>(std::istream& in, Complex<T>& value) {
+  SkipPast(in, '(');
+  ReadNumber(in, value.real);
+  SkipPast(in, ',');
+  ReadNumber(in, value.imag);
+  SkipPast(in, ')');
+  return in;
+}
+
 /// The shape of an array: up to eight dimensions, the last the fastest in storage.
 struct VEXG_EXPORT ArrayDims {
   static constexpr unsigned kMaxRank = 8;

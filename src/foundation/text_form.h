@@ -25,6 +25,16 @@ VEXG_EXPORT String ReadBracketedText(std::istream& in);
 /// Writes the bracketed form: "[" text "] ".
 VEXG_EXPORT void WriteBracketedText(std::ostream& out, const String& text);
 
+/// An identifier in the bracketed form, as the elements of an array have it.
+inline std::ostream& operator<<(std::ostream& out, const URI& uri) {
+  WriteBracketedText(out, uri);
+  return out;
+}
+inline std::istream& operator>>(std::istream& in, URI& uri) {
+  uri = URI(ReadBracketedText(in));
+  return in;
+}
+
 /// Skips characters up to and past the next `mark`; a stream that ends stops the skip.
 VEXG_EXPORT void SkipPast(std::istream& in, char mark);
 

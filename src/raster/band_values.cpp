@@ -243,5 +243,9 @@ template VEXG_EXPORT std::ostream& operator<<(std::ostream&,
 template VEXG_EXPORT std::istream& operator>>(std::istream&, RasterBandHistogram<std::int64_t>&);
 template VEXG_EXPORT bool operator==(const RasterBandHistogram<std::int64_t>&,
                                      const RasterBandHistogram<std::int64_t>&);
+template VEXG_EXPORT bool operator==(const RasterBandHistogram<Complex<float>>&,
+                                     const RasterBandHistogram<Complex<float>>&);
+template VEXG_EXPORT bool operator==(const RasterBandHistogram<Complex<double>>&,
+                                     const RasterBandHistogram<Complex<double>>&);
 
 }  // namespace lumo

@@ -15,14 +15,32 @@ struct Element {
   unsigned char bytes[kBytes];
 };
 
-/// Copies `count` elements of each of `pixels` pixels; in one of the blocks they stand at `bands`.
-template <std::size_t kBytes, typename Move>
+/// Calls `move(place in the span, place in the block)` for `kCount` elements of each pixel, so many
+/// as the bands chosen. Their number is known to the compiler, which unrolls the inner loop.
+template <std::size_t kCount, typename Move>
+void ForEachOfSome(std::uint64_t pixels, std::size_t stride, const std::vector<unsigned>& bands,
+                   unsigned lowBand, Move&& move) {
+  std::size_t offsets[kCount];
+  for (std::size_t k = 0; k < kCount; ++k) offsets[k] = bands[k] - lowBand;
+  for (std::uint64_t i = 0; i < pixels; ++i)
+    for (std::size_t k = 0; k < kCount; ++k) move(i * stride + offsets[k], i * kCount + k);
+}
+
+template <typename Move>
 void ForEachElement(std::uint64_t pixels, std::size_t stride, const std::vector<unsigned>& bands,
                     unsigned lowBand, Move&& move) {
   const std::size_t count = bands.size();
-  if (count == 1) {  // the first band of the span
-    for (std::uint64_t i = 0; i < pixels; ++i) move(i * stride, i);
-    return;
+  switch (count) {
+    case 1:
+      return ForEachOfSome<1>(pixels, stride, bands, lowBand, move);
+    case 2:
+      return ForEachOfSome<2>(pixels, stride, bands, lowBand, move);
+    case 3:
+      return ForEachOfSome<3>(pixels, stride, bands, lowBand, move);
+    case 4:
+      return ForEachOfSome<4>(pixels, stride, bands, lowBand, move);
+    default:
+      break;
   }
   for (std::uint64_t i = 0; i < pixels; ++i)
     for (std::size_t k = 0; k < count; ++k) move(i * stride + (bands[k] - lowBand), i * count + k);
@@ -150,22 +168,20 @@ std::uint64_t FlatBlock::BlockBegin(std::uint64_t row) const {
 void FlatBlock::PickBands(std::uint64_t row, const void* span, void* elements,
                           unsigned elementBytes) const {
   ForElementBytes(elementBytes, [&]<std::size_t kBytes>() {
-    const auto* const from = static_cast<const Element<kBytes>*>(span);
-    auto* const to = static_cast<Element<kBytes>*>(elements);
-    ForEachElement<kBytes>(
-        RowPixels(row), layout_.bands, bands_, lowBand_,
-        [=](std::size_t inSpan, std::size_t inBlock) { to[inBlock] = from[inSpan]; });
+    const auto* const __restrict from = static_cast<const Element<kBytes>*>(span);
+    auto* const __restrict to = static_cast<Element<kBytes>*>(elements);
+    ForEachElement(RowPixels(row), layout_.bands, bands_, lowBand_,
+                   [=](std::size_t inSpan, std::size_t inBlock) { to[inBlock] = from[inSpan]; });
   });
 }
 
 void FlatBlock::PlaceBands(std::uint64_t row, const void* elements, void* span,
                            unsigned elementBytes) const {
   ForElementBytes(elementBytes, [&]<std::size_t kBytes>() {
-    const auto* const from = static_cast<const Element<kBytes>*>(elements);
-    auto* const to = static_cast<Element<kBytes>*>(span);
-    ForEachElement<kBytes>(
-        RowPixels(row), layout_.bands, bands_, lowBand_,
-        [=](std::size_t inSpan, std::size_t inBlock) { to[inSpan] = from[inBlock]; });
+    const auto* const __restrict from = static_cast<const Element<kBytes>*>(elements);
+    auto* const __restrict to = static_cast<Element<kBytes>*>(span);
+    ForEachElement(RowPixels(row), layout_.bands, bands_, lowBand_,
+                   [=](std::size_t inSpan, std::size_t inBlock) { to[inSpan] = from[inBlock]; });
   });
 }
 

@@ -21,13 +21,27 @@ bool IsSame(Complex<T> a, Complex<T> b) {
   return IsSame(a.real, b.real) && (IsSame(a.imag, b.imag) || b.real != b.real);
 }
 
+// The arrays don't overlap, which the compiler has to be told of bytes.
+
 template <typename T>
-void MarkRun(T value, std::uint64_t count, const T* pixels, unsigned char* state) {
+void MarkRun(T value, std::uint64_t count, const T* __restrict pixels,
+             unsigned char* __restrict state) {
   for (std::uint64_t i = 0; i < count; ++i) {
-    state[i] = static_cast<unsigned char>(state[i] |
-                                          (IsSame(pixels[i], value) ? PixelValueState::NoData : 0));
+    state[i] = static_cast<unsigned char>(state[i] | (IsSame(pixels[i], value) ? 1 : 0));
   }
 }
+
+/// The same with a value and a bit of its own for each element.
+template <typename T>
+void MarkEach(const T* __restrict values, const unsigned char* __restrict bits, std::uint64_t count,
+              const T* __restrict pixels, unsigned char* __restrict state) {
+  for (std::uint64_t i = 0; i < count; ++i) {
+    state[i] =
+        static_cast<unsigned char>(state[i] | ((IsSame(pixels[i], values[i]) ? 1 : 0) & bits[i]));
+  }
+}
+
+static_assert(PixelValueState::NoData == 1);
 
 }  // namespace
 
@@ -76,10 +90,7 @@ void NoDataMarker<T>::MarkPattern(std::uint64_t first, std::uint64_t count, cons
   const unsigned char* const bits = patternBits_.data() + phase;
   for (std::uint64_t done = 0; done < count; done += patternLength_) {
     const std::uint64_t here = std::min(count - done, patternLength_);
-    for (std::uint64_t i = 0; i < here; ++i) {
-      const bool same = IsSame(pixels[done + i], values[i]);
-      state[done + i] = static_cast<unsigned char>(state[done + i] | (same ? bits[i] : 0));
-    }
+    MarkEach(values, bits, here, pixels + done, state + done);
   }
 }
 

@@ -71,6 +71,42 @@ TileDimensions SmartTiles(const BasicRaster* raster, std::size_t elementBytes, u
                                                : WideTiles(raster, elementBytes, budget, border);
 }
 
+TileDimensions StreamTiles(const BasicRaster* raster, std::size_t elementBytes, unsigned budget,
+                           unsigned bands) {
+  if (raster == nullptr || raster->Samples() == 0 || raster->Lines() == 0) return {};
+  const RasterDef def = raster->GetRasterDef();
+  const std::uint64_t pixelBytes = std::max<std::uint64_t>(elementBytes * bands, 1);
+  const std::uint64_t pixels = std::max<std::uint64_t>(budget / pixelBytes, 1);
+  const std::uint64_t samples = raster->Samples();
+  const std::uint64_t lines = raster->Lines();
+
+  // A block of the source that is far over the budget is read in parts: there may be none better.
+  constexpr std::uint64_t kMostOver = 16;
+  std::uint64_t stepX = 1;
+  std::uint64_t stepY = 1;
+  if (def.tileHeight > 1 && def.tileWidth != 0) {
+    const std::uint64_t tileX = std::min<std::uint64_t>(def.tileWidth, samples);
+    const std::uint64_t tileY = std::min<std::uint64_t>(def.tileHeight, lines);
+    if (tileX * tileY <= kMostOver * pixels) {
+      stepX = tileX;
+      stepY = tileY;
+    }
+  }
+  const auto steps = [](std::uint64_t room, std::uint64_t step) {
+    return std::max<std::uint64_t>(room / step, 1) * step;
+  };
+  const std::uint64_t width = std::min(steps(pixels / stepY, stepX), samples);
+  const std::uint64_t height =
+      width < samples ? stepY : std::min(steps(pixels / samples, stepY), lines);
+  return AllBands(*raster, static_cast<unsigned>(width), static_cast<unsigned>(height), 0);
+}
+
+Interleave StreamOrder(const BasicRaster* raster) {
+  if (raster == nullptr) return Interleave::BIP;
+  const Interleave order = raster->GetRasterDef().interleave;
+  return order == Interleave::None ? Interleave::BIP : order;
+}
+
 const unsigned BasicRasterIterator::TypeCode = GloballyUniqueObjectTypeCode("BasicRasterIterator");
 
 bool BasicRasterIterator::IsA(unsigned typeCode) const {

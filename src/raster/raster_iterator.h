@@ -28,9 +28,17 @@ VEXG_EXPORT TileDimensions WideTiles(const BasicRaster* raster, std::size_t elem
 /// Squares that fill the budget: at least one pixel.
 VEXG_EXPORT TileDimensions SquareTiles(const BasicRaster* raster, std::size_t elementBytes,
                                        unsigned budget, unsigned border);
+/// The blocks in which a whole raster is read once: rows of the source's true tiles, or of its
+/// lines, as many as fill the budget; at least one tile, or a part of a line. Without borders.
+/// @param bands  how many bands are read.
+VEXG_EXPORT TileDimensions StreamTiles(const BasicRaster* raster, std::size_t elementBytes,
+                                       unsigned budget, unsigned bands);
 /// SquareTiles for a raster whose source is stored in true tiles, else WideTiles.
 VEXG_EXPORT TileDimensions SmartTiles(const BasicRaster* raster, std::size_t elementBytes,
                                       unsigned budget, unsigned border);
+
+/// The order of the axes that costs the source least: its own, or BIP when it has none.
+VEXG_EXPORT Interleave StreamOrder(const BasicRaster* raster);
 
 /// Cuts a raster into a grid of tiles: what is known of it without the pixel type.
 class VEXG_EXPORT BasicRasterIterator : public Object {
@@ -47,6 +55,8 @@ class VEXG_EXPORT BasicRasterIterator : public Object {
   virtual unsigned BandCount() const { return bands_.GetCount(); }
   /// The bands of the raster that a tile has, in its order.
   virtual const Array<unsigned>& Bands() const { return bands_; }
+  /// The order of the axes in which tiles are read: BIP, unless a derived class says otherwise.
+  Interleave Order() const { return order_; }
 
  protected:
   /// The shape of the tile at a grid position, and what of the raster it takes.
@@ -72,6 +82,7 @@ class VEXG_EXPORT BasicRasterIterator : public Object {
   bool Place(unsigned column, unsigned row, Placement& placement) const;
 
   lumo::BorderMode borderMode_ = lumo::BorderMode::kNoDataValue;
+  Interleave order_ = Interleave::BIP;  // of tiles without borders
 
  private:
   const BasicRaster* grid_ = nullptr;  // held by the derived class
@@ -193,6 +204,28 @@ class RasterIteratorSmart final : public RasterIterator<T> {
       : RasterIterator<T>(raster, SmartTiles(raster.Get(), sizeof(T), budget, border)) {}
   RasterIteratorSmart(const RasterPtr<T>& raster, const Array<unsigned>& bands)
       : RasterIterator<T>(raster, SmartTiles(raster.Get(), sizeof(T), kTileBudget, 0), bands) {}
+};
+
+/// For an operation that reads a whole raster once, and takes its blocks as the source gives them
+/// fastest: their size follows the source's storage, and their axes are in its order. The one place
+/// where such operations get their blocks.
+template <typename T>
+class RasterIteratorStream final : public RasterIterator<T> {
+ public:
+  /// Measured: blocks of this size stay in the caches between the reader and the computation.
+  static constexpr unsigned kBudget = 0x100000;
+
+  explicit RasterIteratorStream(const RasterPtr<T>& raster, unsigned budget = kBudget)
+      : RasterIterator<T>(raster, StreamTiles(raster.Get(), sizeof(T), budget,
+                                              raster.IsNull() ? 0 : raster->Bands())) {
+    this->order_ = StreamOrder(raster.Get());
+  }
+  RasterIteratorStream(const RasterPtr<T>& raster, const Array<unsigned>& bands,
+                       unsigned budget = kBudget)
+      : RasterIterator<T>(raster, StreamTiles(raster.Get(), sizeof(T), budget, bands.GetCount()),
+                          bands) {
+    this->order_ = StreamOrder(raster.Get());
+  }
 };
 
 /// The grid of another iterator, borders included, on all bands of this raster.

@@ -32,13 +32,18 @@ template <typename T>
 bool RasterIterator<T>::Read(unsigned column, unsigned row, Tile<T>& tile) {
   const std::lock_guard lock(readLock_);
   Placement placement;
-  if (!IsValid() || !Place(column, row, placement) || !tile.Resize(placement.tile)) return false;
+  if (!IsValid() || !Place(column, row, placement)) return false;
+  const TileDimensions& size = placement.tile;
+  const bool sized = size.HasBorders() || order_ == Interleave::BIP
+                         ? tile.Resize(size)
+                         : tile.ResizeInOrder(size.width, size.height, size.bands, order_);
+  if (!sized) return false;
   tile.SetOrigin({placement.x, placement.y});
   tile.SetIndex({column, row});
-  if (placement.tile.HasBorders()) return ReadBordered(placement, tile);
+  if (size.HasBorders()) return ReadBordered(placement, tile);
 
   const ArrayDims dims = tile.PixelArray().GetDims();
-  return raster_->GetSubRect(placement.ReadRect(), Bands(), Interleave::BIP, tile.PixelArray(),
+  return raster_->GetSubRect(placement.ReadRect(), Bands(), tile.Order(), tile.PixelArray(),
                              tile.StateArray()) &&
          tile.PixelArray().GetDims() == dims && tile.StateArray().GetDims() == dims;
 }
@@ -132,8 +137,7 @@ bool RasterIterator<T>::Write(unsigned column, unsigned row, Tile<T>& tile) {
   const SubRect rect(placement.x, placement.y, static_cast<unsigned>(endX - 1),
                      static_cast<unsigned>(endY - 1));
   if (!tile.Dimensions().HasBorders()) {
-    return raster_->PutSubRect(rect, Bands(), Interleave::BIP, tile.PixelArray(),
-                               tile.StateArray());
+    return raster_->PutSubRect(rect, Bands(), tile.Order(), tile.PixelArray(), tile.StateArray());
   }
   const ArrayDims dims = BlockDims(Interleave::BIP, tile.Width(), tile.Height(), tile.Bands());
   if (!inner_.pixels.Resize(dims) || !inner_.states.Resize(dims)) return false;

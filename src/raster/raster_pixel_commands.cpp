@@ -20,6 +20,8 @@ std::vector<InputDeclaration> BlockInputs() {
       {"PixelValueStateBufSize", Presence::kRequired, ValueKind::kInteger, "its size", "bytes"}};
 }
 
+const OutputDeclaration kFault{"Fault", ValueKind::kText, "why not, where Return is 0"};
+
 /// Moves a block of pixels between a raster and named memory of another process.
 class BlockCommand : public RasterCommand {
  protected:
@@ -55,7 +57,9 @@ class BlockCommand : public RasterCommand {
     const ArrayDims dims(static_cast<unsigned>(elements));
     Array<T> pixels(reinterpret_cast<T*>(pixelMemory.GetData()), dims);
     Array<unsigned char> state(stateMemory.GetData(), dims);
-    Write("Return", transfer(raster, rect, bands, Read<Interleave>("Interleave"), pixels, state));
+    const bool whole = transfer(raster, rect, bands, Read<Interleave>("Interleave"), pixels, state);
+    Write("Return", whole);
+    if (!whole) Write("Fault", TakeFault());
     return true;
   }
 
@@ -87,7 +91,8 @@ const CommandDeclaration kGet{
     "Pixels",
     "Reads a block of pixels into named memory.",
     BlockInputs(),
-    {{"Return", ValueKind::kBoolean, "the whole block was read; else the memory means nothing"}}};
+    {{"Return", ValueKind::kBoolean, "the whole block was read; else the memory means nothing"},
+     kFault}};
 
 class GetRasterSubRectCommand final : public BlockCommand {
   CommandResult Execute() override {
@@ -101,7 +106,7 @@ const CommandDeclaration kPut{"PutRasterSubRectCommand",
                               "Pixels",
                               "Writes a block of pixels from named memory.",
                               BlockInputs(),
-                              {{"Return", ValueKind::kBoolean, "the whole block was taken"}}};
+                              {{"Return", ValueKind::kBoolean, "the whole block was taken"}, kFault}};
 
 class PutRasterSubRectCommand final : public BlockCommand {
   CommandResult Execute() override {

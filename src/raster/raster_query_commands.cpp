@@ -121,6 +121,25 @@ class ExtendedQueryRasterCommand final : public QueryCommand {
 
 const CommandFactoryT<ExtendedQueryRasterCommand> extendedQueryFactory(kExtendedQuery);
 
+const CommandDeclaration kGetGeoRef{
+    "GetRasterGeoRefCommand",
+    "Rasters",
+    "Tells where the pixels of a raster lie.",
+    {kUri},
+    {{"GeoRef", ValueKind::kGeoRef, "the geo-reference; Unknown when it has none"}}};
+
+class GetRasterGeoRefCommand final : public RasterCommand {
+  CommandResult Execute() override {
+    if (!CheckInputs()) return Fail();
+    const BasicRasterPtr raster = FindRaster();
+    if (!raster) return Fail();
+    Write("GeoRef", raster->GetRasterDef().geoRef);
+    return Succeed();
+  }
+};
+
+const CommandFactoryT<GetRasterGeoRefCommand> getGeoRefFactory(kGetGeoRef);
+
 const CommandDeclaration kSetTiles{
     "SetDefaultTileSizeCommand",
     "Rasters",

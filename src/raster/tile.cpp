@@ -1,6 +1,7 @@
 #include "raster/tile.h"
 
 #include "foundation/type_code.h"
+#include "raster/interleave.h"
 #include "raster/tile_impl.h"
 
 namespace lumo {
@@ -52,14 +53,19 @@ bool BasicTile::Resize(const TileDimensions& dimensions) {
   return Size(dimensions);
 }
 
-bool BasicTile::Size(const TileDimensions& dimensions) {
+bool BasicTile::ResizeInOrder(unsigned width, unsigned height, unsigned bands, Interleave order) {
+  return Size({width, height, bands}, order);
+}
+
+bool BasicTile::Size(const TileDimensions& dimensions, Interleave order) {
   ClearErrorState();
   dimensions_ = dimensions;
+  order_ = order;
   constexpr std::size_t kMost = 0x7FFFFFFF;  // tile coordinates are int
   const bool possible = dimensions.width != 0 && dimensions.height != 0 && dimensions.bands != 0 &&
                         FullWidth() <= kMost && FullHeight() <= kMost;
-  const ArrayDims dims(static_cast<unsigned>(FullHeight()), static_cast<unsigned>(FullWidth()),
-                       dimensions.bands);
+  const ArrayDims dims = BlockDims(order, static_cast<unsigned>(FullWidth()),
+                                   static_cast<unsigned>(FullHeight()), dimensions.bands);
   if (possible && ResizePixels(dims) && state_.Resize(dims)) {
     std::ranges::fill(state_, static_cast<unsigned char>(State::Valid));
     return true;
@@ -69,6 +75,7 @@ bool BasicTile::Size(const TileDimensions& dimensions) {
   origin_ = {};
   index_ = {};
   dimensions_ = {};
+  order_ = Interleave::BIP;
   SetErrorState(ObjectErrorNotConstructed());
   return false;
 }

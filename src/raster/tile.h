@@ -16,6 +16,9 @@ using TilePosition = std::pair<unsigned, unsigned>;
 /// Tile coordinates count from the first pixel inside the borders; in a border they are below 0, or
 /// from Width() and Height() on. Access by coordinates has no bounds check.
 ///
+/// An operation that reads a whole raster once may ask for tiles in another order of the axes, see
+/// ResizeInOrder; it then goes by the arrays, and the access by coordinates is not for it.
+///
 /// Threads: a tile belongs to one thread at a time; parts of one may be worked on in parallel.
 /// Failure: a tile that could not be sized is empty, with ObjectErrorNotConstructed stored.
 class VEXG_EXPORT BasicTile : public Object {
@@ -48,6 +51,10 @@ class VEXG_EXPORT BasicTile : public Object {
   virtual bool Resize(unsigned width, unsigned height, unsigned bands);
   virtual bool Resize(const TileDimensions& dimensions);
   virtual TileDimensions Dimensions() const { return dimensions_; }
+  /// Sizes a tile without borders whose arrays are in the shape of BlockDims of `order`.
+  bool ResizeInOrder(unsigned width, unsigned height, unsigned bands, Interleave order);
+  /// The order of the axes: BIP, unless ResizeInOrder sized the tile last.
+  Interleave Order() const { return order_; }
 
   // For each bit of the state: set in every band (true without bands), in some band, in one band;
   // and its changes.
@@ -98,11 +105,12 @@ class VEXG_EXPORT BasicTile : public Object {
   virtual bool ResizePixels(const ArrayDims& dims) = 0;
 
  private:
-  bool Size(const TileDimensions& dimensions);
+  bool Size(const TileDimensions& dimensions, Interleave order = Interleave::BIP);
 
   TilePosition origin_;
   TilePosition index_;
   TileDimensions dimensions_;
+  Interleave order_ = Interleave::BIP;
   Array<unsigned char> state_;
 };
 

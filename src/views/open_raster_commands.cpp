@@ -64,23 +64,39 @@ class AccessRasterCommand final : public PublishCommand {
 
 const CommandFactoryT<AccessRasterCommand> accessFactory(kAccess);
 
-/// Lets go of one open of whatever object; one that isn't there is no failure.
+/// Lets go of one open of whatever object; one that isn't there is no failure. A source that can't
+/// be finished as the last open goes says so in the outputs: it is closed all the same.
 class CloseCommand final : public Command {
   CommandResult Execute() override {
     if (!CheckInputs()) return Fail();
+    TakeFault();
     catalog::Release(Read<URI>("URI"));
+    const String fault = TakeFault();
+    if (fault.GetLength() != 0) Write("Fault", fault);
     return Succeed();
   }
 };
 
+const OutputDeclaration kCloseFault{"Fault", ValueKind::kText,
+                                    "why a new source could not be finished; only then"};
+
 const InputDeclaration kClosed{"URI", Presence::kRequired, ValueKind::kURI,
                                "what to close; nothing happens when it isn't open"};
-const CommandDeclaration kCloseRaster{
-    "CloseRasterCommand", "Rasters", "Takes one from the opens of a raster.", {kClosed}, {}};
-const CommandDeclaration kCloseMask{
-    "CloseRasterMaskCommand", "Rasters", "Takes one from the opens of a mask.", {kClosed}, {}};
-const CommandDeclaration kCloseMetadata{
-    "CloseMetadataCommand", "Metadata", "Takes one from the opens of metadata.", {kClosed}, {}};
+const CommandDeclaration kCloseRaster{"CloseRasterCommand",
+                                      "Rasters",
+                                      "Takes one from the opens of a raster.",
+                                      {kClosed},
+                                      {kCloseFault}};
+const CommandDeclaration kCloseMask{"CloseRasterMaskCommand",
+                                    "Rasters",
+                                    "Takes one from the opens of a mask.",
+                                    {kClosed},
+                                    {kCloseFault}};
+const CommandDeclaration kCloseMetadata{"CloseMetadataCommand",
+                                        "Metadata",
+                                        "Takes one from the opens of metadata.",
+                                        {kClosed},
+                                        {kCloseFault}};
 
 const CommandFactoryT<CloseCommand> closeRasterFactory(kCloseRaster);
 const CommandFactoryT<CloseCommand> closeMaskFactory(kCloseMask);

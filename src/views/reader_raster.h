@@ -3,15 +3,16 @@
 #include <mutex>
 
 #include "data/raster_reader.h"
-#include "raster/raster_view.h"
+#include "views/computed_raster.h"
 
 namespace lumo {
 
 /// The raster that stands on a data source. Exists for TwelveTypes.
 ///
 /// It turns the operations of a raster into calls of a reader, in whatever interleave is asked for.
-/// A second reader, when there is one, stands on a pyramid that the library keeps in a file of its
-/// own; where it has something it goes first.
+/// What the source stores of statistics and histograms is at hand without computing; what is
+/// computed can be stored there. A second reader, when there is one, stands on a pyramid that the
+/// library keeps in a file of its own; where it has something it goes first.
 ///
 /// Ownership: shares both connections, which stay open as long as the raster lives. The readers
 ///            belong to them.
@@ -19,7 +20,7 @@ namespace lumo {
 /// Failure:   without a reader, operations give false, 0 or empty; those that a source refuses have
 ///            the fault text told.
 template <typename T>
-class ReaderRaster final : public RasterView<T> {
+class ReaderRaster final : public ComputedRaster<T> {
  public:
   /// @param pyramidReader  may be empty, and then so is `pyramidConnection`. A source that is a
   ///                       pyramid file itself is its own.
@@ -39,7 +40,21 @@ class ReaderRaster final : public RasterView<T> {
   bool PyramidRefresh() override;
 
   bool StatsExist(unsigned band, unsigned mask) const override;
+  bool WriteStats() override;
   RasterBandStats<T> BandStats(unsigned band) const override;
+  T Min(unsigned band, const IPC& ipc) override;
+  T Max(unsigned band, const IPC& ipc) override;
+  double Mean(unsigned band, const IPC& ipc) override;
+  double Std(unsigned band, const IPC& ipc) override;
+  double Sum(unsigned band, const IPC& ipc) override;
+  double Sum2(unsigned band, const IPC& ipc) override;
+  double RMS(unsigned band, const IPC& ipc) override;
+  double SumXY(unsigned band, unsigned otherBand, const IPC& ipc) override;
+  double Cov(unsigned band, unsigned otherBand, const IPC& ipc) override;
+
+  bool WriteHistogram() override;
+  /// What the pyramid's file, this raster and the source hold, each histogram once.
+  Array<RasterBandHistogram<T>> BandHistogram(unsigned band) const override;
 
   unsigned Samples() const override { return samples_; }
   unsigned Lines() const override { return lines_; }
@@ -61,6 +76,11 @@ class ReaderRaster final : public RasterView<T> {
  private:
   template <typename Call>
   bool AnyReader(const Call& call) const;
+  template <typename Value, typename Computed>
+  auto StatValue(unsigned band, unsigned bit, const IPC& ipc, const Value& value,
+                 const Computed& computed);
+  template <typename Can, typename Store>
+  bool StoreIn(const Can& can, const Store& store);
   bool Holds(const SubRect& rect, const Array<unsigned>& bands) const;
 
   // The connections go last: they own the readers.
@@ -74,6 +94,7 @@ class ReaderRaster final : public RasterView<T> {
   unsigned bands_ = 0;
   lumo::TileDimensions tiles_;
   std::mutex pixelLock_;
+  std::mutex statsLock_;  // held while a getter of statistics computes
 };
 
 extern template class VEXG_EXPORT ReaderRaster<std::uint8_t>;

@@ -37,7 +37,9 @@ ReaderRaster<T>::ReaderRaster(const RasterReaderPtr<T>& reader,
 }
 
 template <typename T>
-ReaderRaster<T>::~ReaderRaster() = default;
+ReaderRaster<T>::~ReaderRaster() {
+  this->StopComputing();
+}
 
 template <typename T>
 URI ReaderRaster<T>::GetURI() const {
@@ -93,20 +95,162 @@ bool ReaderRaster<T>::PyramidRefresh() {
 
 template <typename T>
 bool ReaderRaster<T>::StatsExist(unsigned band, unsigned mask) const {
-  return AnyReader([&](auto& reader) {
-    return reader.StatsExist(band) && (static_cast<unsigned>(reader.StatsMask()) & mask) == mask;
-  });
+  return ComputedRaster<T>::StatsExist(band, mask) || AnyReader([&](auto& reader) {
+           return reader.StatsExist(band) &&
+                  (static_cast<unsigned>(reader.StatsMask()) & mask) == mask;
+         });
 }
 
 template <typename T>
 RasterBandStats<T> ReaderRaster<T>::BandStats(unsigned band) const {
-  RasterBandStats<T> stats;
+  RasterBandStats<T> stats = ComputedRaster<T>::BandStats(band);
+  if (stats.mask != StatsMask::None) return stats;
   AnyReader([&](auto& reader) {
     if (!reader.StatsExist(band)) return false;
     stats = reader.ReadStats(band);
     return true;
   });
   return stats;
+}
+
+/// A statistic at hand, or else what `computed` gives.
+template <typename T>
+template <typename Value, typename Computed>
+auto ReaderRaster<T>::StatValue(unsigned band, unsigned bit, const IPC& ipc, const Value& value,
+                                const Computed& computed) {
+  const std::lock_guard lock(statsLock_);
+  if (StatsExist(band, bit)) {
+    const RasterBandStats<T> stats = BandStats(band);
+    if ((stats.mask & bit) != 0) {
+      ipc.progress->Update(1.0);
+      return value(stats);
+    }
+  }
+  return computed();
+}
+
+namespace detail {
+
+inline double ElementOf(const Array<double>& values, unsigned index) {
+  return index < values.GetCount() ? values[index] : 0.0;
+}
+
+}  // namespace detail
+
+template <typename T>
+T ReaderRaster<T>::Min(unsigned band, const IPC& ipc) {
+  return StatValue(
+      band, StatsMask::Min, ipc, [](const auto& stats) { return stats.min; },
+      [&] { return ComputedRaster<T>::Min(band, ipc); });
+}
+
+template <typename T>
+T ReaderRaster<T>::Max(unsigned band, const IPC& ipc) {
+  return StatValue(
+      band, StatsMask::Max, ipc, [](const auto& stats) { return stats.max; },
+      [&] { return ComputedRaster<T>::Max(band, ipc); });
+}
+
+template <typename T>
+double ReaderRaster<T>::Mean(unsigned band, const IPC& ipc) {
+  return StatValue(
+      band, StatsMask::Mean, ipc, [](const auto& stats) { return stats.mean; },
+      [&] { return ComputedRaster<T>::Mean(band, ipc); });
+}
+
+template <typename T>
+double ReaderRaster<T>::Std(unsigned band, const IPC& ipc) {
+  return StatValue(
+      band, StatsMask::Std, ipc, [](const auto& stats) { return stats.std; },
+      [&] { return ComputedRaster<T>::Std(band, ipc); });
+}
+
+template <typename T>
+double ReaderRaster<T>::Sum(unsigned band, const IPC& ipc) {
+  return StatValue(
+      band, StatsMask::Sum, ipc, [](const auto& stats) { return stats.sum; },
+      [&] { return ComputedRaster<T>::Sum(band, ipc); });
+}
+
+template <typename T>
+double ReaderRaster<T>::Sum2(unsigned band, const IPC& ipc) {
+  return StatValue(
+      band, StatsMask::Sum2, ipc, [](const auto& stats) { return stats.sum2; },
+      [&] { return ComputedRaster<T>::Sum2(band, ipc); });
+}
+
+template <typename T>
+double ReaderRaster<T>::RMS(unsigned band, const IPC& ipc) {
+  return StatValue(
+      band, StatsMask::RMS, ipc, [](const auto& stats) { return stats.rms; },
+      [&] { return ComputedRaster<T>::RMS(band, ipc); });
+}
+
+template <typename T>
+double ReaderRaster<T>::SumXY(unsigned band, unsigned otherBand, const IPC& ipc) {
+  return StatValue(
+      band, StatsMask::SumXY, ipc,
+      [=](const auto& stats) { return detail::ElementOf(stats.sumXY, otherBand); },
+      [&] { return ComputedRaster<T>::SumXY(band, otherBand, ipc); });
+}
+
+template <typename T>
+double ReaderRaster<T>::Cov(unsigned band, unsigned otherBand, const IPC& ipc) {
+  return StatValue(
+      band, StatsMask::Cov, ipc,
+      [=](const auto& stats) { return detail::ElementOf(stats.cov, otherBand); },
+      [&] { return ComputedRaster<T>::Cov(band, otherBand, ipc); });
+}
+
+template <typename T>
+bool ReaderRaster<T>::WriteStats() {
+  Array<RasterBandStats<T>> all{ArrayDims(bands_)};
+  for (unsigned band = 0; band < all.GetCount(); ++band) all[band] = BandStats(band);
+  return StoreIn(&RasterReader<T>::CanWriteStats,
+                 [&](auto& reader) { return reader.WriteStats(all); });
+}
+
+template <typename T>
+Array<RasterBandHistogram<T>> ReaderRaster<T>::BandHistogram(unsigned band) const {
+  Array<RasterBandHistogram<T>> merged;
+  if constexpr (std::is_arithmetic_v<T>) {  // complex numbers have none
+    const auto join = [&](const Array<RasterBandHistogram<T>>& histograms) {
+      for (const RasterBandHistogram<T>& histogram : histograms) {
+        const bool counts = histogram.band == band && histogram.source != StatsSource::kUnknown;
+        if (!counts || std::find(merged.begin(), merged.end(), histogram) != merged.end()) continue;
+        const unsigned at = merged.GetCount();
+        if (merged.Resize(ArrayDims(at + 1))) merged[at] = histogram;
+      }
+    };
+    if (pyramidReader_) join(pyramidReader_->Histogram(band));
+    join(ComputedRaster<T>::BandHistogram(band));
+    if (reader_) join(reader_->Histogram(band));
+  }
+  return merged;
+}
+
+template <typename T>
+bool ReaderRaster<T>::WriteHistogram() {
+  Array<RasterBandHistogram<T>> all;
+  for (unsigned band = 0; band < bands_; ++band) {
+    for (const RasterBandHistogram<T>& histogram : BandHistogram(band)) {
+      const unsigned at = all.GetCount();
+      if (all.Resize(ArrayDims(at + 1))) all[at] = histogram;
+    }
+  }
+  return all.GetCount() == 0 || StoreIn(&RasterReader<T>::CanWriteHistogram,
+                                        [&](auto& reader) { return reader.WriteHistogram(all); });
+}
+
+/// Stores something in the source and in the pyramid's file, as far as they can; having nowhere to
+/// store is no failure.
+template <typename T>
+template <typename Can, typename Store>
+bool ReaderRaster<T>::StoreIn(const Can& can, const Store& store) {
+  for (const RasterReaderPtr<T>& reader : {reader_, pyramidReader_}) {
+    if (reader && ((*reader).*can)() && !store(*reader)) return false;
+  }
+  return true;
 }
 
 template <typename T>

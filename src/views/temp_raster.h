@@ -3,7 +3,7 @@
 #include <string>
 
 #include "foundation/environment.h"
-#include "raster/raster_view.h"
+#include "views/computed_raster.h"
 
 namespace lumo {
 
@@ -22,7 +22,7 @@ VEXG_EXPORT String TempFileName(const String& directory, const String& prefix,
 /// Threads: as the reader raster underneath.
 /// Failure: IsValid() is false when the file could not be made, with the fault text told.
 template <typename T>
-class TempRaster final : public RasterView<T> {
+class TempRaster final : public ComputedRaster<T> {
  public:
   /// @param context  its WorkingDirectory() is where the file lies.
   /// @param def      the raster's size, bands, no-data values and geo-reference; pixels lie BIP.
@@ -34,10 +34,6 @@ class TempRaster final : public RasterView<T> {
 
   URI GetURI() const override;
   bool IsValid() const override { return valid_ && Object::IsValid(); }
-
-  // What is computed of a temporary raster is not stored with it.
-  bool WriteStats() override { return false; }
-  bool WriteHistogram() override { return false; }
 
   /// Whether the file outlives the raster; it doesn't unless this is set.
   void SetKeepFile(bool keep) { keepFile_ = keep; }

@@ -39,7 +39,7 @@ typename TempRaster<T>::Made TempRaster<T>::Make(const Context& context, RasterD
 
 template <typename T>
 TempRaster<T>::TempRaster(const Made& made)
-    : RasterView<T>(made.raster), fileName_(made.fileName), valid_(bool(made.raster)) {}
+    : ComputedRaster<T>(made.raster), fileName_(made.fileName), valid_(bool(made.raster)) {}
 
 template <typename T>
 TempRaster<T>::TempRaster(const Context& context, const RasterDef& def)
@@ -56,6 +56,7 @@ TempRaster<T>::TempRaster(unsigned samples, unsigned lines, unsigned bands, cons
 
 template <typename T>
 TempRaster<T>::~TempRaster() {
+  this->StopComputing();
   this->ResetParent();  // closes the file, whose header is written then
   if (keepFile_ || fileName_.GetLength() == 0) return;
   const std::string path = fileName_.ToUTF8();

@@ -152,6 +152,86 @@ class MemoryTestRaster final : public TestRaster<T> {
   }
 };
 
+/// Pixels and states in memory, stored in an order of its own, which can be read in any.
+template <typename T>
+class OrderedTestRaster final : public TestRaster<T> {
+ public:
+  OrderedTestRaster(unsigned samples, unsigned lines, unsigned bands, Interleave storage)
+      : TestRaster<T>(samples, lines, bands),
+        order(storage),
+        pixels(std::size_t{samples} * lines * bands),
+        states(pixels.size()) {}
+
+  RasterDef GetRasterDef() const override {
+    RasterDef def = TestRaster<T>::GetRasterDef();
+    def.interleave = order;
+    def.tileWidth = tileWidth;
+    return def;
+  }
+
+  bool GetSubRect(const SubRect& rect, const Array<unsigned>& bands, Interleave interleave,
+                  Array<T>& block, Array<unsigned char>& state) override {
+    const auto width = static_cast<unsigned>(rect.Width());
+    const auto height = static_cast<unsigned>(rect.Height());
+    const ArrayDims dims = BlockDims(interleave, width, height, bands.GetCount());
+    if (!block.Resize(dims) || !state.Resize(dims)) return false;
+    reads++;
+    if (interleave == order) {
+      Copy(rect, bands, pixels, block.GetData());
+      Copy(rect, bands, states, state.GetData());
+      return true;
+    }
+    std::vector<T> stored(dims.count);
+    std::vector<unsigned char> storedStates(dims.count);
+    Copy(rect, bands, pixels, stored.data());
+    Copy(rect, bands, states, storedStates.data());
+    return ConvertInterleave(stored.data(), order, block.GetData(), interleave, width, height,
+                             bands.GetCount(), sizeof(T)) &&
+           ConvertInterleave(storedStates.data(), order, state.GetData(), interleave, width, height,
+                             bands.GetCount(), 1);
+  }
+
+  std::size_t At(std::size_t sample, std::size_t line, std::size_t band) const {
+    const std::size_t samples = this->Samples();
+    const std::size_t bands = this->Bands();
+    if (order == Interleave::BSQ) return (band * this->Lines() + line) * samples + sample;
+    if (order == Interleave::BIL) return (line * bands + band) * samples + sample;
+    return (line * samples + sample) * bands + band;
+  }
+
+  const Interleave order;
+  std::vector<T> pixels;
+  std::vector<unsigned char> states;
+  unsigned tileWidth = 0;  // of the description
+  std::atomic<unsigned> reads{0};
+
+ private:
+  /// Copies a block in the order of the storage.
+  template <typename E>
+  void Copy(const SubRect& rect, const Array<unsigned>& bands, const std::vector<E>& from, E* to) {
+    const auto line = [&](std::size_t y, unsigned band) {
+      to = std::copy_n(&from[At(rect.left, y, band)], rect.Width(), to);
+    };
+    if (order == Interleave::BSQ) {
+      for (const unsigned band : bands)
+        for (std::size_t y = rect.top; y <= rect.bottom; ++y) line(y, band);
+      return;
+    }
+    bool inOrder = bands.GetCount() == this->Bands();
+    for (unsigned i = 0; i < bands.GetCount(); ++i) inOrder = inOrder && bands[i] == i;
+    for (std::size_t y = rect.top; y <= rect.bottom; ++y) {
+      if (order == Interleave::BIL) {
+        for (const unsigned band : bands) line(y, band);
+      } else if (inOrder) {
+        to = std::copy_n(&from[At(rect.left, y, 0)], rect.Width() * bands.GetCount(), to);
+      } else {
+        for (std::size_t x = rect.left; x <= rect.right; ++x)
+          for (const unsigned band : bands) *to++ = from[At(x, y, band)];
+      }
+    }
+  }
+};
+
 template <typename T>
 Pointer<RampRaster<T>> MakeRamp(unsigned samples, unsigned lines, unsigned bands) {
   return Pointer<RampRaster<T>>(new RampRaster<T>(samples, lines, bands));

@@ -28,6 +28,7 @@ int List(const Options& options) {
 const VerbRegistration registration(
     "commands", "Lists the commands that a job may name", [](CLI::App& app) {
       const auto options = std::make_shared<Options>();
+      app.footer("Example: vexg commands --json\n");
       auto* const forms = app.add_option_group("form", "One of");
       forms->add_flag("--json", options->json, "All that they declare, as JSON");
       forms->add_flag("--markdown", options->markdown, "All that they declare, as a document");

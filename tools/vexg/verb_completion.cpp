@@ -59,6 +59,7 @@ std::string BashScript(const CLI::App& app) {
 const VerbRegistration registration(
     "completion", "Prints a script with which a shell completes command lines", [](CLI::App& app) {
       const auto shell = std::make_shared<std::string>();
+      app.footer("Example: eval \"$(vexg completion bash)\"\n");
       app.add_option("shell", *shell, "The shell")->check(CLI::IsMember({"bash"}))->required();
       return VerbRegistration::Work([&app, shell] {
         std::cout << BashScript(*app.get_parent());

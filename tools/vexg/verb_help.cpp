@@ -32,6 +32,7 @@ int Help(CLI::App& app, const std::string& name) {
 const VerbRegistration registration(
     "help", "Tells about a command of jobs, or a verb", [](CLI::App& app) {
       const auto name = std::make_shared<std::string>();
+      app.footer("Examples: vexg help OpenRasterCommand, vexg help read\n");
       app.add_option("name", *name, "The command or verb")->type_name("NAME");
       return VerbRegistration::Work([&app, name] { return Help(app, *name); });
     });

@@ -43,6 +43,7 @@ int RunJobFile(const JobOptions& options) {
 const VerbRegistration registration(
     "run", "Runs a job document in this process and prints its result", [](CLI::App& app) {
       const auto options = std::make_shared<JobOptions>();
+      app.footer("Example: vexg run --json job.xml\n");
       options->AddTo(app);
       return VerbRegistration::Work([options] { return RunJobFile(*options); });
     });

@@ -1,8 +1,11 @@
+#include <algorithm>
 #include <memory>
 
 #include <CLI/CLI.hpp>
 
 #include "commands/server.h"
+#include "data/access_policy.h"
+#include "foundation/fault.h"
 #include "platform/interrupt.h"
 #include "platform/message_pipe.h"
 #include "platform/pipe_listener.h"
@@ -29,7 +32,32 @@ std::string WhyNot(platform::PipeFault fault, const std::string& name) {
   }
 }
 
-int Serve(const std::string& name, bool quiet) {
+struct ServeOptions {
+  std::string name = kDefaultServer;
+  bool quiet = false;
+  std::vector<std::string> roots;
+  std::vector<std::string> allowed;
+
+  bool Allows(const char* what) const {
+    return std::find(allowed.begin(), allowed.end(), what) != allowed.end();
+  }
+};
+
+/// Keeps the jobs of clients to what the user named.
+void LimitAccess(const ServeOptions& options) {
+  AccessPolicy policy;
+  policy.roots = options.roots;
+  policy.network = options.Allows("network");
+  policy.virtualFiles = options.Allows("virtual");
+  policy.memory = options.Allows("memory");
+  policy.indirect = options.Allows("indirect");
+  if (SetAccessPolicy(policy)) return;
+  throw HostError(kExitUsage, "--root: " + TakeFault().ToUTF8());
+}
+
+int Serve(const ServeOptions& options) {
+  const std::string& name = options.name;
+  LimitAccess(options);
   platform::RaiseDescriptorLimit();
   auto& dispatch = dynamic_cast<PipeServerDispatch&>(GetServerDispatch(String(name)));
   {
@@ -40,7 +68,8 @@ int Serve(const std::string& name, bool quiet) {
     if (!dispatch.Open() && !dispatch.StopRequested()) {
       throw HostError(kExitFailed, WhyNot(dispatch.GetFault(), name));
     }
-    if (!quiet) Say("serving \"" + name + "\"; end it with vexg stop " + name + " or Ctrl-C");
+    if (!options.quiet)
+      Say("serving \"" + name + "\"; end it with vexg stop " + name + " or Ctrl-C");
     dispatch.Run();
     WaitServedJobs();
   }
@@ -50,11 +79,26 @@ int Serve(const std::string& name, bool quiet) {
 
 const VerbRegistration registration(
     "serve", "Serves jobs of other processes of this user, until it is stopped", [](CLI::App& app) {
-      const auto name = std::make_shared<std::string>(kDefaultServer);
-      const auto quiet = std::make_shared<bool>(false);
-      app.add_option("name", *name, "Name of the server")->capture_default_str();
-      app.add_flag("-q,--quiet", *quiet, "Say nothing at the start");
-      return VerbRegistration::Work([name, quiet] { return Serve(*name, *quiet); });
+      const auto options = std::make_shared<ServeOptions>();
+      app.footer(
+          "Jobs reach no further than --root and --allow say. Links are followed before a file is "
+          "judged.\n"
+          "Example: vexg serve --root /data/scenes --root /data/results\n");
+      app.add_option("name", options->name, "Name of the server")->capture_default_str();
+      app.add_flag("-q,--quiet", options->quiet, "Say nothing at the start");
+      app.add_option("--root", options->roots,
+                     "A folder in which jobs open and make files; may come again; all folders when "
+                     "absent")
+          ->type_name("DIR")
+          ->allow_extra_args(false);
+      app.add_option("--allow", options->allowed,
+                     "What jobs may use beside plain files: network, virtual (files inside other "
+                     "files), memory (addresses), indirect (formats whose files name other files); "
+                     "may come again")
+          ->type_name("WHAT")
+          ->check(CLI::IsMember({"network", "virtual", "memory", "indirect"}))
+          ->allow_extra_args(false);
+      return VerbRegistration::Work([options] { return Serve(*options); });
     });
 
 }  // namespace

@@ -22,6 +22,7 @@ int Stop(const ServerOptions& server) {
 const VerbRegistration registration(
     "stop", "Ends a server, once the jobs that it is running are done", [](CLI::App& app) {
       const auto server = std::make_shared<ServerOptions>();
+      app.footer("Example: vexg stop vexg\n");
       app.add_option("name", server->name, "Name of the server")->capture_default_str();
       server->AddNoWait(app);
       return VerbRegistration::Work([server] { return Stop(*server); });

@@ -1,0 +1,139 @@
+#include <cmath>
+#include <cstdlib>
+#include <cstring>
+
+#include <benchmark/benchmark.h>
+
+#include "raster/raster_tasks.h"
+#include "stats/raster_stats_process.h"
+#include "support/test_rasters.h"
+#include "tasks/thread_limit.h"
+
+// Statistics and histograms of rasters in memory, beside the reading of the same blocks alone, and
+// beside a plain copy of the same memory.
+
+namespace lumo {
+namespace {
+
+constexpr unsigned kSamples = 4096;
+constexpr unsigned kLines = 2048;
+
+template <typename T>
+Pointer<OrderedTestRaster<T>> MakeScene(unsigned bands, Interleave order, bool holes = false) {
+  const Pointer<OrderedTestRaster<T>> scene(
+      new OrderedTestRaster<T>(kSamples, kLines, bands, order));
+  for (std::size_t i = 0; i < scene->pixels.size(); ++i) {
+    scene->pixels[i] = static_cast<T>((i * 2654435761U >> 16) % 200 + i % 13);
+    if (holes && i % 10 == 0) scene->states[i] = PixelValueState::NoData;
+  }
+  return scene;
+}
+
+template <typename T>
+void SetBytes(benchmark::State& state, unsigned bands) {
+  state.SetBytesProcessed(static_cast<std::int64_t>(state.iterations()) * kSamples * kLines * bands *
+                          static_cast<std::int64_t>(sizeof(T)));
+}
+
+/// Copies pixels and states once: what any read of a raster in memory does.
+template <typename T, unsigned kBands>
+void Baseline_Copy(benchmark::State& state) {
+  const auto scene = MakeScene<T>(kBands, Interleave::BIP);
+  std::vector<T> pixels(scene->pixels.size());
+  std::vector<unsigned char> states(scene->states.size());
+  for (auto _ : state) {
+    std::memcpy(pixels.data(), scene->pixels.data(), pixels.size() * sizeof(T));
+    std::memcpy(states.data(), scene->states.data(), states.size());
+    benchmark::ClobberMemory();
+  }
+  SetBytes<T>(state, kBands);
+}
+
+/// Reads all blocks and looks at nothing.
+template <typename T, unsigned kBands>
+void Baseline_Read(benchmark::State& state) {
+  const auto scene = MakeScene<T>(kBands, Interleave::BIP);
+  RasterIteratorStream<T> iterator(scene);
+  Tile<T> tile;
+  for (auto _ : state) {
+    for (unsigned row = 0; row < iterator.Rows(); ++row) {
+      for (unsigned column = 0; column < iterator.Columns(); ++column) {
+        if (!iterator.Read(column, row, tile)) std::abort();
+      }
+    }
+  }
+  SetBytes<T>(state, kBands);
+}
+
+/// The mean of band 0 by the plain running form.
+template <typename T>
+double PlainMean(const OrderedTestRaster<T>& scene) {
+  LargeStatsAccumulator<T> plain;
+  for (std::size_t line = 0; line < kLines; ++line) {
+    for (std::size_t sample = 0; sample < kSamples; ++sample) {
+      const std::size_t at = scene.At(sample, line, 0);
+      if (scene.states[at] == 0) plain.Add(scene.pixels[at]);
+    }
+  }
+  return plain.mean;
+}
+
+template <typename Stats, typename T>
+bool Run(const RasterIteratorPtr<T>& iterator, const Pointer<Stats>& stats) {
+  RasterStatsProcess<T, Stats> process(iterator, stats);
+  return process.RunProcess(process.kHere);
+}
+
+/// Arguments: threads, KiB of a block, 1 for pixels that do not count.
+template <typename T, template <typename> typename Stats, unsigned kBands, Interleave kOrder>
+void Statistics(benchmark::State& state) {
+  const ThreadLimit limit(static_cast<unsigned>(state.range(0)));
+  const auto scene = MakeScene<T>(kBands, kOrder, state.range(2) != 0);
+  const RasterIteratorPtr<T> iterator(
+      new RasterIteratorStream<T>(scene, static_cast<unsigned>(state.range(1)) * 1024));
+  const Pointer<Stats<T>> stats(new Stats<T>);
+  if (!Run(iterator, stats)) std::abort();
+  const double mean = PlainMean(*scene);
+  if (std::fabs(stats->Means()[0] - mean) > 1e-11 * mean) std::abort();
+  for (auto _ : state) {
+    if (!Run(iterator, stats)) std::abort();
+  }
+  SetBytes<T>(state, kBands);
+}
+
+/// The running form, pixel by pixel, on one thread.
+template <typename T, unsigned kBands>
+void Baseline_RunningForm(benchmark::State& state) {
+  const auto scene = MakeScene<T>(kBands, Interleave::BIP);
+  for (auto _ : state) {
+    std::vector<LargeStatsAccumulator<T>> bands(kBands);
+    for (std::size_t i = 0; i < scene->pixels.size(); ++i) {
+      if ((scene->states[i] & PixelValueState::NotValid) == 0) bands[i % kBands].Add(scene->pixels[i]);
+    }
+    benchmark::DoNotOptimize(bands.data());
+  }
+  SetBytes<T>(state, kBands);
+}
+
+#define VEXG_STATS_ARGS ->UseRealTime()->Unit(benchmark::kMillisecond)
+constexpr Interleave kBIP = Interleave::BIP;
+constexpr Interleave kBIL = Interleave::BIL;
+constexpr Interleave kBSQ = Interleave::BSQ;
+
+#define VEXG_STATS_TYPE(T)                                                                        \
+  BENCHMARK(Baseline_Copy<T, 6>) VEXG_STATS_ARGS;                                                  \
+  BENCHMARK(Baseline_Read<T, 6>) VEXG_STATS_ARGS;                                                  \
+  BENCHMARK(Statistics<T, RasterStats, 6, kBIP>)->ArgsProduct({{1, 2}, {1024}, {0, 1}}) VEXG_STATS_ARGS; \
+  BENCHMARK(Statistics<T, RasterStats, 6, kBSQ>)->ArgsProduct({{1, 2}, {1024}, {0, 1}}) VEXG_STATS_ARGS; \
+  BENCHMARK(Statistics<T, ExtendedRasterStats, 6, kBIP>)->ArgsProduct({{1, 2}, {1024}, {0, 1}}) VEXG_STATS_ARGS
+
+VEXG_STATS_TYPE(std::uint8_t);
+VEXG_STATS_TYPE(std::uint16_t);
+VEXG_STATS_TYPE(float);
+BENCHMARK(Statistics<float, RasterStats, 4, kBIL>)->Args({2, 1024, 0}) VEXG_STATS_ARGS;
+BENCHMARK(Baseline_RunningForm<float, 6>) VEXG_STATS_ARGS;
+BENCHMARK(Statistics<std::uint8_t, RasterStats, 4, kBIP>)->ArgsProduct({{2}, {128, 256, 512, 1024, 2048, 4096, 8192}, {0}}) VEXG_STATS_ARGS;
+BENCHMARK(Statistics<float, RasterStats, 4, kBIP>)->ArgsProduct({{2}, {128, 256, 512, 1024, 2048, 4096, 8192}, {0}}) VEXG_STATS_ARGS;
+
+}  // namespace
+}  // namespace lumo

@@ -1,0 +1,24 @@
+#pragma once
+
+#include "calibration/calibration_formula.h"
+#include "raster/raster.h"
+
+namespace lumo {
+
+/// Computes a raster from another one by a formula, tile by tile: RasterReadTask, a task that runs
+/// the formula over the lines of a tile in parallel, RasterWriteTask. Pixels that are not valid are
+/// not computed; they get the target's no-data value, or 0 where it has none, and keep their state.
+///
+/// Exists for all pairs of EightTypes.
+/// @param name     of the process.
+/// @param formula  for as many bands as the source has.
+/// @param target   of the source's size and bands, exists and can be written.
+/// @return false, with the fault text told where there is one, when the rasters don't fit each
+///         other or the formula, with nothing written; or when a read or a write failed. An aborted
+///         run is true, and what was written stays.
+template <typename TIn, typename TOut>
+VEXG_EXPORT bool Calibrate(const char* name, const CalibrationFormula& formula,
+                           const RasterPtr<TIn>& source, const RasterPtr<TOut>& target,
+                           const IPC& ipc);
+
+}  // namespace lumo

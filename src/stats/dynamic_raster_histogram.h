@@ -1,0 +1,102 @@
+#pragma once
+
+#include <memory>
+#include <mutex>
+#include <vector>
+
+#include "raster/raster.h"
+
+namespace lumo {
+
+/// The histograms of one raster: those at hand, and the run that counts one more. A raster that
+/// shows pixels of its own holds one and leaves its operations on histograms to it.
+///
+/// A run reads the pixels of its bands once, in the background. Its histograms are taken over at
+/// the next call of any operation, and join those at hand unless an equal one is there. So does
+/// what a run had counted when it was aborted; one that failed leaves nothing.
+///
+/// Exists for TwelveTypes; for complex numbers it is empty, counts nothing and keeps nothing.
+///
+/// Ownership: the raster owns it and outlives it. It is to be one of the raster's last members: its
+///            destructor aborts a run that goes on, which reads the raster to that moment.
+/// Threads:   every operation may be called on any thread. The lock is never held while pixels are
+///            read.
+template <typename T>
+class DynamicRasterHistogram : public ErrorState {
+ public:
+  explicit DynamicRasterHistogram(Raster<T>* raster);
+  ~DynamicRasterHistogram() override;
+  DynamicRasterHistogram(const DynamicRasterHistogram&) = delete;
+  DynamicRasterHistogram& operator=(const DynamicRasterHistogram&) = delete;
+
+  // Start a run over the values from `lower` to `upper`, both inclusive, of the bands given, or of
+  // all for an empty list. Empty while a run goes on, for a band that the raster doesn't have, and
+  // when none could be started. See RasterHistogram for the bins.
+  AsyncPtr HistogramByBinSize(T lower, T upper, double binSize, const Array<unsigned>& bands,
+                              HistogramSign sign, const IPC& ipc);
+  AsyncPtr HistogramByBinCount(T lower, T upper, unsigned binCount, const Array<unsigned>& bands,
+                               HistogramSign sign, const IPC& ipc);
+  AsyncPtr HistogramAllBands(T lower, T upper, unsigned binCount, HistogramSign sign,
+                             const IPC& ipc);
+  /// The run that goes on now; empty when none does.
+  AsyncPtr HistogramAsync() const;
+
+  /// Enters a histogram by hand. Ignored while a run goes on, or when an equal one is at hand.
+  void SetBandHistogram(const RasterBandHistogram<T>& histogram);
+  /// Those at hand for the band, in the order in which they came; none while a run goes on.
+  Array<RasterBandHistogram<T>> BandHistogram(unsigned band) const;
+
+ private:
+  struct Run;
+  struct Request;
+
+  bool CheckRunning() const;
+  AsyncPtr Start(const Request& request, const IPC& ipc);
+  void Append(const RasterBandHistogram<T>& histogram) const;
+
+  mutable std::mutex lock_;  // guards all below
+  Raster<T>* const raster_;
+  mutable std::vector<RasterBandHistogram<T>> histograms_;
+  mutable std::unique_ptr<Run> run_;
+};
+
+/// The empty form for complex numbers.
+template <typename T>
+class DynamicRasterHistogram<Complex<T>> : public ErrorState {
+ public:
+  explicit DynamicRasterHistogram(Raster<Complex<T>>* /*raster*/) {}
+
+  AsyncPtr HistogramByBinSize(Complex<T> /*lower*/, Complex<T> /*upper*/, double /*binSize*/,
+                              const Array<unsigned>& /*bands*/, HistogramSign /*sign*/,
+                              const IPC& /*ipc*/) {
+    return {};
+  }
+  AsyncPtr HistogramByBinCount(Complex<T> /*lower*/, Complex<T> /*upper*/, unsigned /*binCount*/,
+                               const Array<unsigned>& /*bands*/, HistogramSign /*sign*/,
+                               const IPC& /*ipc*/) {
+    return {};
+  }
+  AsyncPtr HistogramAllBands(Complex<T> /*lower*/, Complex<T> /*upper*/, unsigned /*binCount*/,
+                             HistogramSign /*sign*/, const IPC& /*ipc*/) {
+    return {};
+  }
+  AsyncPtr HistogramAsync() const { return {}; }
+  void SetBandHistogram(const RasterBandHistogram<Complex<T>>& /*histogram*/) {}
+  Array<RasterBandHistogram<Complex<T>>> BandHistogram(unsigned /*band*/) const { return {}; }
+};
+
+template <typename T>
+using DynamicRasterHistogramPtr = Pointer<DynamicRasterHistogram<T>>;
+
+extern template class VEXG_EXPORT DynamicRasterHistogram<std::uint8_t>;
+extern template class VEXG_EXPORT DynamicRasterHistogram<std::int8_t>;
+extern template class VEXG_EXPORT DynamicRasterHistogram<std::uint16_t>;
+extern template class VEXG_EXPORT DynamicRasterHistogram<std::int16_t>;
+extern template class VEXG_EXPORT DynamicRasterHistogram<std::uint32_t>;
+extern template class VEXG_EXPORT DynamicRasterHistogram<std::int32_t>;
+extern template class VEXG_EXPORT DynamicRasterHistogram<float>;
+extern template class VEXG_EXPORT DynamicRasterHistogram<double>;
+extern template class VEXG_EXPORT DynamicRasterHistogram<std::uint64_t>;
+extern template class VEXG_EXPORT DynamicRasterHistogram<std::int64_t>;
+
+}  // namespace lumo

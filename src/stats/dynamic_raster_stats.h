@@ -1,0 +1,124 @@
+#pragma once
+
+#include <memory>
+#include <mutex>
+#include <vector>
+
+#include "raster/raster.h"
+
+namespace lumo {
+
+/// The statistics of one raster: what is at hand, and the computation that gives the rest. A raster
+/// that shows pixels of its own holds one and leaves its operations on statistics to it.
+///
+/// A computation reads all pixels once, in the background, and gives all values of all bands. Its
+/// result is taken over at the next call of any operation, and then replaces what stood before. A
+/// computation that was aborted, or failed, leaves what stood.
+///
+/// Exists for TwelveTypes; for complex numbers it is empty, computes nothing and keeps nothing.
+///
+/// Ownership: the raster owns it and outlives it. It is to be the raster's last member: its
+///            destructor aborts a computation that goes on, which reads the raster to that moment.
+/// Threads:   every operation may be called on any thread. The lock is never held while pixels are
+///            read, or while a getter waits.
+/// Failure:   getters give 0, and have told the fault text.
+template <typename T>
+class DynamicRasterStats : public ErrorState {
+ public:
+  explicit DynamicRasterStats(Raster<T>* raster);
+  ~DynamicRasterStats() override;
+  DynamicRasterStats(const DynamicRasterStats&) = delete;
+  DynamicRasterStats& operator=(const DynamicRasterStats&) = delete;
+
+  /// True when all statistics of `mask`, bits of StatsMask, are at hand for the band.
+  bool StatsExist(unsigned band, unsigned mask) const;
+  /// Starts a computation in the current mode. Empty while one runs, or when none could be started.
+  AsyncPtr StatsBuild(const IPC& ipc);
+  /// The computation that runs now; empty when none does.
+  AsyncPtr StatsAsync() const;
+
+  /// Ignored while a computation runs. From the basic to the extended mode what is at hand goes, so
+  /// that the next getter computes everything.
+  void SetStatsMode(lumo::StatsMode mode);
+  lumo::StatsMode StatsMode() const;
+
+  /// Enters the statistics of one band, in place of what stood. Ignored while a computation runs,
+  /// and for a band that the raster doesn't have.
+  void SetBandStats(const RasterBandStats<T>& stats);
+  /// What is at hand for the band; with mask 0 when nothing is.
+  RasterBandStats<T> BandStats(unsigned band) const;
+
+  // The value at hand; else after a computation that is started here, or the one that runs, has
+  // ended. 0 when it is then still missing.
+  std::uint64_t PixelCount(unsigned band, const IPC& ipc);
+  T Min(unsigned band, const IPC& ipc);
+  T Max(unsigned band, const IPC& ipc);
+  double Mean(unsigned band, const IPC& ipc);
+  double Std(unsigned band, const IPC& ipc);  ///< of a sample: divided by n - 1
+  double Sum(unsigned band, const IPC& ipc);
+  double Sum2(unsigned band, const IPC& ipc);  ///< sum of the squares
+  double RMS(unsigned band, const IPC& ipc);
+  // Between two bands, of the pixels that are valid in both. 0 in the basic mode.
+  double SumXY(unsigned band, unsigned otherBand, const IPC& ipc);
+  double Cov(unsigned band, unsigned otherBand, const IPC& ipc);
+
+ private:
+  struct Run;
+  using Entries = std::vector<RasterBandStats<T>>;
+
+  bool CheckRunning() const;
+  const RasterBandStats<T>* FindEntry(unsigned band, unsigned mask) const;
+  template <typename Value>
+  auto Get(unsigned band, unsigned bit, const IPC& ipc, const Value& value);
+
+  mutable std::mutex lock_;  // guards all below
+  Raster<T>* const raster_;
+  lumo::StatsMode mode_ = lumo::StatsMode::kBasic;
+  mutable Entries entries_;
+  mutable std::unique_ptr<Run> run_;
+};
+
+/// The empty form for complex numbers.
+template <typename T>
+class DynamicRasterStats<Complex<T>> : public ErrorState {
+ public:
+  explicit DynamicRasterStats(Raster<Complex<T>>* /*raster*/) {}
+
+  bool StatsExist(unsigned /*band*/, unsigned /*mask*/) const { return false; }
+  AsyncPtr StatsBuild(const IPC& /*ipc*/) { return {}; }
+  AsyncPtr StatsAsync() const { return {}; }
+  void SetStatsMode(lumo::StatsMode /*mode*/) {}
+  lumo::StatsMode StatsMode() const { return lumo::StatsMode::kBasic; }
+  void SetBandStats(const RasterBandStats<Complex<T>>& /*stats*/) {}
+  RasterBandStats<Complex<T>> BandStats(unsigned band) const {
+    RasterBandStats<Complex<T>> stats;
+    stats.band = band;
+    return stats;
+  }
+  std::uint64_t PixelCount(unsigned /*band*/, const IPC& /*ipc*/) { return 0; }
+  Complex<T> Min(unsigned /*band*/, const IPC& /*ipc*/) { return {}; }
+  Complex<T> Max(unsigned /*band*/, const IPC& /*ipc*/) { return {}; }
+  double Mean(unsigned /*band*/, const IPC& /*ipc*/) { return 0; }
+  double Std(unsigned /*band*/, const IPC& /*ipc*/) { return 0; }
+  double Sum(unsigned /*band*/, const IPC& /*ipc*/) { return 0; }
+  double Sum2(unsigned /*band*/, const IPC& /*ipc*/) { return 0; }
+  double RMS(unsigned /*band*/, const IPC& /*ipc*/) { return 0; }
+  double SumXY(unsigned /*band*/, unsigned /*otherBand*/, const IPC& /*ipc*/) { return 0; }
+  double Cov(unsigned /*band*/, unsigned /*otherBand*/, const IPC& /*ipc*/) { return 0; }
+};
+
+template <typename T>
+using DynamicRasterStatsPtr = Pointer<DynamicRasterStats<T>>;
+
+extern template class VEXG_EXPORT DynamicRasterStats<std::uint8_t>;
+extern template class VEXG_EXPORT DynamicRasterStats<std::int8_t>;
+extern template class VEXG_EXPORT DynamicRasterStats<std::uint16_t>;
+extern template class VEXG_EXPORT DynamicRasterStats<std::int16_t>;
+extern template class VEXG_EXPORT DynamicRasterStats<std::uint32_t>;
+extern template class VEXG_EXPORT DynamicRasterStats<std::int32_t>;
+extern template class VEXG_EXPORT DynamicRasterStats<float>;
+extern template class VEXG_EXPORT DynamicRasterStats<double>;
+extern template class VEXG_EXPORT DynamicRasterStats<std::uint64_t>;
+extern template class VEXG_EXPORT DynamicRasterStats<std::int64_t>;
+
+}  // namespace lumo

@@ -1,0 +1,228 @@
+#pragma once
+
+#include "foundation/fault.h"
+#include "stats/dynamic_raster_stats.h"
+#include "stats/raster_stats_process.h"
+
+namespace lumo {
+
+/// A computation, with what its process works on.
+template <typename T>
+struct DynamicRasterStats<T>::Run {
+  RasterIteratorPtr<T> iterator;
+  RasterStatsPtr<T> basic;
+  ExtendedRasterStatsPtr<T> extended;
+  Pointer<ProcessBuilder<Process>> process;
+
+  const RasterStats<T>& Results() const { return extended ? *extended : *basic; }
+};
+
+template <typename T>
+DynamicRasterStats<T>::DynamicRasterStats(Raster<T>* raster) : raster_(raster) {}
+
+template <typename T>
+DynamicRasterStats<T>::~DynamicRasterStats() {
+  const std::lock_guard lock(lock_);
+  if (!run_) return;
+  run_->process->Abort();
+  run_->process->WaitFinished();
+}
+
+/// True while a computation runs. One that has ended is taken over here. Under the lock.
+template <typename T>
+bool DynamicRasterStats<T>::CheckRunning() const {
+  if (!run_) return false;
+  if (!run_->process->IsFinished()) return true;
+  const std::unique_ptr<Run> run = std::move(run_);
+  if (run->process->HasError()) {
+    SetFault(run->process->GetFault());
+    return false;
+  }
+  const RasterStats<T>& results = run->Results();
+  const unsigned bands = raster_->Bands();
+  // After an abort there are no results.
+  if (results.BandCount() != bands || results.PixelCounts().GetCount() != bands) return false;
+
+  Entries entries(bands);
+  for (unsigned band = 0; band < bands; ++band) {
+    RasterBandStats<T>& entry = entries[band];
+    entry.band = band;
+    entry.pixelCount = results.PixelCounts()[band];
+    entry.mask = StatsMask::Basic;
+    entry.min = results.Mins()[band];
+    entry.max = results.Maxs()[band];
+    entry.mean = results.Means()[band];
+    entry.std = results.Stds()[band];
+    entry.sum = results.Sums()[band];
+    entry.sum2 = results.Sums2()[band];
+    entry.rms = results.RMSs()[band];
+    if (!run->extended) continue;
+    entry.mask = StatsMask::Extended;
+    const auto row = [&](const Array<double>& matrix, Array<double>& into) {
+      if (into.Resize(ArrayDims(bands))) {
+        std::copy_n(matrix.GetData() + std::size_t{band} * bands, bands, into.begin());
+      }
+    };
+    row(run->extended->SumXY(), entry.sumXY);
+    row(run->extended->Cov(), entry.cov);
+  }
+  entries_ = std::move(entries);
+  return false;
+}
+
+/// The entry of the band, when it has all bits of the mask. Under the lock.
+template <typename T>
+const RasterBandStats<T>* DynamicRasterStats<T>::FindEntry(unsigned band, unsigned mask) const {
+  for (const RasterBandStats<T>& entry : entries_) {
+    if (entry.band == band) return (entry.mask & mask) == mask ? &entry : nullptr;
+  }
+  return nullptr;
+}
+
+template <typename T>
+bool DynamicRasterStats<T>::StatsExist(unsigned band, unsigned mask) const {
+  const std::lock_guard lock(lock_);
+  CheckRunning();
+  return FindEntry(band, mask) != nullptr;
+}
+
+template <typename T>
+AsyncPtr DynamicRasterStats<T>::StatsBuild(const IPC& ipc) {
+  const std::lock_guard lock(lock_);
+  if (CheckRunning()) return {};
+  auto run = std::make_unique<Run>();
+  const RasterPtr<T> raster(raster_, true);  // the raster outlives the run
+  run->iterator.Reset(new RasterIteratorStream<T>(raster));
+  if (!run->iterator->IsValid()) return {};
+  if (mode_ == lumo::StatsMode::kBasic) {
+    run->basic.Reset(new RasterStats<T>);
+    run->process.Reset(new RasterStatsProcess<T, RasterStats<T>>(run->iterator, run->basic, ipc));
+  } else if (mode_ == lumo::StatsMode::kExtended) {
+    run->extended.Reset(new ExtendedRasterStats<T>);
+    run->process.Reset(
+        new RasterStatsProcess<T, ExtendedRasterStats<T>>(run->iterator, run->extended, ipc));
+  } else {
+    return {};
+  }
+  if (!run->process->RunProcess(run->process->kInBackground)) return {};
+  run_ = std::move(run);
+  return run_->process;
+}
+
+template <typename T>
+AsyncPtr DynamicRasterStats<T>::StatsAsync() const {
+  const std::lock_guard lock(lock_);
+  return CheckRunning() ? AsyncPtr(run_->process) : AsyncPtr();
+}
+
+template <typename T>
+void DynamicRasterStats<T>::SetStatsMode(lumo::StatsMode mode) {
+  const std::lock_guard lock(lock_);
+  if (CheckRunning()) return;
+  if (mode_ == lumo::StatsMode::kBasic && mode == lumo::StatsMode::kExtended) entries_.clear();
+  mode_ = mode;
+}
+
+template <typename T>
+lumo::StatsMode DynamicRasterStats<T>::StatsMode() const {
+  const std::lock_guard lock(lock_);
+  CheckRunning();
+  return mode_;
+}
+
+template <typename T>
+void DynamicRasterStats<T>::SetBandStats(const RasterBandStats<T>& stats) {
+  const std::lock_guard lock(lock_);
+  if (CheckRunning()) return;
+  for (RasterBandStats<T>& entry : entries_) {
+    if (entry.band != stats.band) continue;
+    entry = stats;
+    return;
+  }
+  if (stats.band < raster_->Bands()) entries_.push_back(stats);
+}
+
+template <typename T>
+RasterBandStats<T> DynamicRasterStats<T>::BandStats(unsigned band) const {
+  const std::lock_guard lock(lock_);
+  CheckRunning();
+  if (const RasterBandStats<T>* const entry = FindEntry(band, StatsMask::None)) return *entry;
+  RasterBandStats<T> none;
+  none.band = band;
+  return none;
+}
+
+/// `value(entry)` for the band, computed when its bit is missing; 0 when it stays missing.
+template <typename T>
+template <typename Value>
+auto DynamicRasterStats<T>::Get(unsigned band, unsigned bit, const IPC& ipc, const Value& value) {
+  using Result = decltype(value(RasterBandStats<T>()));
+  const auto find = [&](Result& result) {
+    const std::lock_guard lock(lock_);
+    CheckRunning();
+    const RasterBandStats<T>* const entry = FindEntry(band, bit);
+    if (entry != nullptr) result = value(*entry);
+    return entry != nullptr;
+  };
+  Result result{};
+  if (find(result) || band >= raster_->Bands()) {
+    ipc.progress->Update(1.0);
+    return result;
+  }
+  AsyncPtr run = StatsBuild(ipc);
+  if (!run) run = StatsAsync();  // another getter's
+  if (run) run->WaitFinished();
+  find(result);
+  return result;
+}
+
+template <typename T>
+std::uint64_t DynamicRasterStats<T>::PixelCount(unsigned band, const IPC& ipc) {
+  return Get(band, StatsMask::Min, ipc, [](const auto& entry) { return entry.pixelCount; });
+}
+template <typename T>
+T DynamicRasterStats<T>::Min(unsigned band, const IPC& ipc) {
+  return Get(band, StatsMask::Min, ipc, [](const auto& entry) { return entry.min; });
+}
+template <typename T>
+T DynamicRasterStats<T>::Max(unsigned band, const IPC& ipc) {
+  return Get(band, StatsMask::Max, ipc, [](const auto& entry) { return entry.max; });
+}
+template <typename T>
+double DynamicRasterStats<T>::Mean(unsigned band, const IPC& ipc) {
+  return Get(band, StatsMask::Mean, ipc, [](const auto& entry) { return entry.mean; });
+}
+template <typename T>
+double DynamicRasterStats<T>::Std(unsigned band, const IPC& ipc) {
+  return Get(band, StatsMask::Std, ipc, [](const auto& entry) { return entry.std; });
+}
+template <typename T>
+double DynamicRasterStats<T>::Sum(unsigned band, const IPC& ipc) {
+  return Get(band, StatsMask::Sum, ipc, [](const auto& entry) { return entry.sum; });
+}
+template <typename T>
+double DynamicRasterStats<T>::Sum2(unsigned band, const IPC& ipc) {
+  return Get(band, StatsMask::Sum2, ipc, [](const auto& entry) { return entry.sum2; });
+}
+template <typename T>
+double DynamicRasterStats<T>::RMS(unsigned band, const IPC& ipc) {
+  return Get(band, StatsMask::RMS, ipc, [](const auto& entry) { return entry.rms; });
+}
+
+template <typename T>
+double DynamicRasterStats<T>::SumXY(unsigned band, unsigned otherBand, const IPC& ipc) {
+  if (StatsMode() != lumo::StatsMode::kExtended) return 0;
+  return Get(band, StatsMask::SumXY, ipc, [otherBand](const auto& entry) {
+    return otherBand < entry.sumXY.GetCount() ? entry.sumXY[otherBand] : 0.0;
+  });
+}
+
+template <typename T>
+double DynamicRasterStats<T>::Cov(unsigned band, unsigned otherBand, const IPC& ipc) {
+  if (StatsMode() != lumo::StatsMode::kExtended) return 0;
+  return Get(band, StatsMask::Cov, ipc, [otherBand](const auto& entry) {
+    return otherBand < entry.cov.GetCount() ? entry.cov[otherBand] : 0.0;
+  });
+}
+
+}  // namespace lumo

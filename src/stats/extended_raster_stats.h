@@ -1,0 +1,57 @@
+#pragma once
+
+#include "stats/raster_stats.h"
+
+namespace lumo {
+
+/// Statistics with the products and covariances between bands, which count the pixels that are
+/// valid in both. Exists for TenTypes. Those of integers of up to 16 bits come from exact sums.
+template <typename T>
+class ExtendedRasterStats : public RasterStats<T> {
+ public:
+  static const unsigned TypeCode;
+
+  explicit ExtendedRasterStats(unsigned bandCount = 0) { Reset(bandCount); }
+
+  bool IsA(unsigned typeCode) const override {
+    return typeCode == TypeCode || RasterStats<T>::IsA(typeCode);
+  }
+  bool IsValid() const override { return pairs_.IsValid() && RasterStats<T>::IsValid(); }
+
+  // As those of RasterStats.
+  void Reset(unsigned bandCount);
+  bool Accumulate(const Tile<T>& tile, unsigned rowFrom, unsigned rowTo, unsigned columnFrom,
+                  unsigned columnTo);
+  bool Merge(const ExtendedRasterStats& other);
+  bool Finish();
+
+  // The results of Finish, bands by bands, symmetric; empty before.
+  const Array<double>& SumXY() const { return sumXY_; }
+  /// Of a sample, divided by n - 1; 0 for fewer than two pixels. On the diagonal the variances.
+  const Array<double>& Cov() const { return cov_; }
+
+ private:
+  using PairAccumulator = std::conditional_t<std::is_integral_v<T> && sizeof(T) <= 2,
+                                             ExactPairAccumulator, LargeStatsAccumulator2<T>>;
+  class PairSums;
+
+  Array<PairAccumulator> pairs_;  // bands by bands; those above the diagonal are used
+  Array<double> sumXY_;
+  Array<double> cov_;
+};
+
+template <typename T>
+using ExtendedRasterStatsPtr = Pointer<ExtendedRasterStats<T>>;
+
+extern template class VEXG_EXPORT ExtendedRasterStats<std::uint8_t>;
+extern template class VEXG_EXPORT ExtendedRasterStats<std::int8_t>;
+extern template class VEXG_EXPORT ExtendedRasterStats<std::uint16_t>;
+extern template class VEXG_EXPORT ExtendedRasterStats<std::int16_t>;
+extern template class VEXG_EXPORT ExtendedRasterStats<std::uint32_t>;
+extern template class VEXG_EXPORT ExtendedRasterStats<std::int32_t>;
+extern template class VEXG_EXPORT ExtendedRasterStats<float>;
+extern template class VEXG_EXPORT ExtendedRasterStats<double>;
+extern template class VEXG_EXPORT ExtendedRasterStats<std::uint64_t>;
+extern template class VEXG_EXPORT ExtendedRasterStats<std::int64_t>;
+
+}  // namespace lumo

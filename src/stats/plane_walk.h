@@ -1,0 +1,155 @@
+#pragma once
+
+#include <algorithm>
+#include <vector>
+
+#include "raster/interleave.h"
+#include "raster/tile.h"
+#include "stats/plane_kernels.h"
+
+// A part of a tile as planes of its bands, whatever the order of the tile's axes.
+
+namespace lumo {
+
+/// A rectangle of a tile, in its pixels.
+struct TilePart {
+  unsigned rowFrom;
+  unsigned rowTo;  ///< behind the last
+  unsigned columnFrom;
+  unsigned columnTo;
+};
+
+/// Planes of the same pixels, one for each band.
+template <typename T>
+struct PlaneGroup {
+  const T* values;
+  const unsigned char* states;  ///< null: all valid
+  std::size_t stride;           ///< from one band's plane to the next one's
+  std::size_t count;            ///< pixels, kPlane at most
+};
+
+/// Cuts a part of a tile into groups of planes that fit the first caches. Where the tile's pixels
+/// are interleaved, they are parted into memory of its own; else the planes lie in the tile.
+template <typename T>
+class PlaneWalk {
+ public:
+  explicit PlaneWalk(const Tile<T>& tile)
+      : values_(tile.PixelArray().GetData()),
+        states_(tile.StateArray().GetData()),
+        tile_(tile),
+        bands_(tile.Bands()),
+        groupPixels_(GroupPixels(tile.Bands())) {}
+
+  /// Calls `visit(group)` for all pixels of `part`, row by row.
+  template <typename F>
+  void ForEach(const TilePart& part, const F& visit) {
+    const std::size_t width = part.columnTo - part.columnFrom;
+    const std::size_t rows = part.rowTo - part.rowFrom;
+    // Whole rows of pixels without a gap are one run, unless each has its bands in turn.
+    const bool joined = width == tile_.FullWidth() && tile_.Order() != Interleave::BIL;
+    for (std::size_t row = 0; row < (joined ? std::min<std::size_t>(rows, 1) : rows); ++row) {
+      VisitRun(FirstOf(part.rowFrom + row, part.columnFrom), joined ? rows * width : width, visit);
+    }
+  }
+
+ private:
+  static std::size_t GroupPixels(std::size_t bands) {
+    constexpr std::size_t kGroupBytes = 16 * 1024;
+    constexpr std::size_t kStep = 64;
+    const std::size_t fits = kGroupBytes / (bands * sizeof(T)) / kStep * kStep;
+    return std::clamp(fits, 2 * kStep, kPlane);
+  }
+
+  /// Where the first band of a pixel stands.
+  std::size_t FirstOf(std::size_t row, std::size_t column) const {
+    const std::size_t width = tile_.Width();
+    switch (tile_.Order()) {
+      case Interleave::BIL:
+        return row * width * bands_ + column;
+      case Interleave::BSQ:
+        return row * width + column;
+      default:
+        return tile_.Offset(static_cast<std::int64_t>(column), static_cast<std::int64_t>(row));
+    }
+  }
+
+  template <typename F>
+  void VisitRun(std::size_t first, std::size_t pixels, const F& visit) {
+    const bool parted = tile_.Order() == Interleave::BIP && bands_ > 1;
+    for (std::size_t done = 0; done < pixels; done += groupPixels_) {
+      const std::size_t count = std::min(groupPixels_, pixels - done);
+      visit(parted ? Parted(first + done * bands_, count) : InPlace(first + done, count));
+    }
+  }
+
+  PlaneGroup<T> InPlace(std::size_t first, std::size_t count) const {
+    const std::size_t width = tile_.Width();
+    const std::size_t stride = tile_.Order() == Interleave::BSQ ? width * tile_.Height() : width;
+    PlaneGroup<T> group{values_ + first, nullptr, stride, count};
+    for (std::size_t band = 0; band < bands_; ++band) {
+      if (AllValid(states_ + first + band * stride, count)) continue;
+      group.states = states_ + first;
+      break;
+    }
+    return group;
+  }
+
+  PlaneGroup<T> Parted(std::size_t first, std::size_t count) {
+    partedValues_.resize(groupPixels_ * bands_);
+    ConvertInterleave(values_ + first, Interleave::BIP, partedValues_.data(), Interleave::BSQ,
+                      count, 1, bands_, sizeof(T));
+    PlaneGroup<T> group{partedValues_.data(), nullptr, count, count};
+    if (!AllValid(states_ + first, count * bands_)) {
+      partedStates_.resize(groupPixels_ * bands_);
+      ConvertInterleave(states_ + first, Interleave::BIP, partedStates_.data(), Interleave::BSQ,
+                        count, 1, bands_, 1);
+      group.states = partedStates_.data();
+    }
+    return group;
+  }
+
+  const T* values_;
+  const unsigned char* states_;
+  const Tile<T>& tile_;
+  std::size_t bands_;
+  std::size_t groupPixels_;
+  std::vector<T> partedValues_;
+  std::vector<unsigned char> partedStates_;
+};
+
+/// The valid values of one plane.
+template <typename T>
+struct ValidPlane {
+  const T* values;            ///< where one isn't valid, stands one that is
+  const unsigned char* mask;  ///< ones where a value is valid; null: all are
+  std::size_t count;          ///< how many are valid; 0: nothing else means anything
+  T filler;                   ///< what stands where one isn't valid
+};
+
+/// Finds the valid values of planes, in memory that is used again.
+template <typename T>
+class ValidPlanes {
+ public:
+  /// What of a plane is valid: states without a bit of NotValid, and finite values. The plane found
+  /// means something until the next call.
+  /// @param states  null: all valid. @param allFinite  known beforehand.
+  ValidPlane<T> Find(const T* values, const unsigned char* states, std::size_t count,
+                     bool allFinite = !std::is_floating_point_v<T>) {
+    if (states == nullptr && allFinite) return {values, nullptr, count, T()};
+    std::size_t valid = MaskValid(states, count, mask_);
+    if constexpr (std::is_floating_point_v<T>) {
+      if (valid != 0 && !allFinite) valid = MaskFinite(values, count, mask_);
+    }
+    if (valid == count) return {values, nullptr, count, T()};
+    if (valid == 0) return {values, mask_, 0, T()};
+    const T filler = values[std::find(mask_, mask_ + count, 0xFF) - mask_];
+    Select(values, mask_, count, filler, filled_);
+    return {filled_, mask_, valid, filler};
+  }
+
+ private:
+  unsigned char mask_[kPlane];
+  T filled_[kPlane];
+};
+
+}  // namespace lumo

@@ -1,0 +1,141 @@
+#pragma once
+
+#include <memory>
+#include <mutex>
+#include <vector>
+
+#include "raster/raster_tasks.h"
+#include "stats/histogram_counter.h"
+#include "stats/raster_stats.h"
+#include "tasks/process_builder.h"
+
+// How histograms are counted: a process that reads a raster and counts its tiles one after the
+// other, each in parallel. T is one of TenTypes.
+
+namespace lumo {
+
+/// The counters of a run: each thread that counts borrows one, so that there are as many as count
+/// at once, and nothing is shared while counting.
+template <typename T>
+class HistogramCounterPool {
+ public:
+  using Counter = std::unique_ptr<HistogramCounter<T>>;
+
+  /// A counter for the bins of `working`.
+  Counter Take(const RasterHistogram<T>& working);
+  void Return(Counter counter);
+  /// Adds what all have counted. @return false when the bins differ.
+  bool JoinInto(RasterHistogram<T>& working);
+
+ private:
+  std::mutex lock_;
+  std::vector<Counter> counters_;
+};
+
+/// Counts the tile in slot 0, which stays. Setup arguments: the RasterHistogram<T> whose bins are
+/// counted. When the task goes, it holds what was counted, also of a run that did not come to its
+/// end.
+template <typename T>
+class RasterHistogramAccumulateTask final : public ConcurrentTask {
+ public:
+  explicit RasterHistogramAccumulateTask(ArgList& setup);
+  ~RasterHistogramAccumulateTask() override;
+  bool Execute(ArgList& args) override;
+
+ private:
+  RasterHistogramPtr<T> working_;
+  HistogramCounterPool<T> counters_;
+};
+
+/// Counts the histograms of what an iterator reads, whose bands are those of `working`.
+template <typename T>
+class RasterHistogramProcess final : public ProcessBuilder<Process> {
+ public:
+  RasterHistogramProcess(const RasterIteratorPtr<T>& iterator, const RasterHistogramPtr<T>& working,
+                         const IPC& ipc = {});
+
+ private:
+  ManagedTask<RasterReadTask<T>> read_;
+  ManagedTask<RasterHistogramAccumulateTask<T>> accumulate_;
+};
+
+/// Takes the results of a RasterHistogramCallbackProcess that wasn't aborted.
+template <typename T>
+class HistogramCallback {
+ public:
+  virtual ~HistogramCallback() = default;
+  virtual void TakeResults(const RasterStatsPtr<T>& stats, const RasterHistogramPtr<T>& histogram,
+                           HistogramSign sign) = 0;
+
+ private:
+  friend class ProcessBuilderCallback<Process, HistogramCallback>;
+  void OnProcessEnd(ProcessBuilder<Process>& process);
+};
+
+/// RasterHistogramProcess that hands what it counted to an object, together with statistics that
+/// were computed before.
+template <typename T>
+class RasterHistogramCallbackProcess final
+    : public ProcessBuilderCallback<Process, HistogramCallback<T>> {
+ public:
+  /// @param receiver  outlives the run.
+  RasterHistogramCallbackProcess(const RasterIteratorPtr<T>& iterator,
+                                 const RasterHistogramPtr<T>& working,
+                                 const RasterStatsPtr<T>& stats, HistogramCallback<T>* receiver,
+                                 const IPC& ipc = {});
+
+  const RasterStatsPtr<T>& Stats() const { return stats_; }
+  const RasterHistogramPtr<T>& Histogram() const { return working_; }
+
+ private:
+  RasterStatsPtr<T> stats_;
+  RasterHistogramPtr<T> working_;
+  ManagedTask<RasterReadTask<T>> read_;
+  ManagedTask<RasterHistogramAccumulateTask<T>> accumulate_;
+};
+
+extern template class VEXG_EXPORT RasterHistogramAccumulateTask<std::uint8_t>;
+extern template class VEXG_EXPORT RasterHistogramAccumulateTask<std::int8_t>;
+extern template class VEXG_EXPORT RasterHistogramAccumulateTask<std::uint16_t>;
+extern template class VEXG_EXPORT RasterHistogramAccumulateTask<std::int16_t>;
+extern template class VEXG_EXPORT RasterHistogramAccumulateTask<std::uint32_t>;
+extern template class VEXG_EXPORT RasterHistogramAccumulateTask<std::int32_t>;
+extern template class VEXG_EXPORT RasterHistogramAccumulateTask<float>;
+extern template class VEXG_EXPORT RasterHistogramAccumulateTask<double>;
+extern template class VEXG_EXPORT RasterHistogramAccumulateTask<std::uint64_t>;
+extern template class VEXG_EXPORT RasterHistogramAccumulateTask<std::int64_t>;
+
+extern template class VEXG_EXPORT RasterHistogramProcess<std::uint8_t>;
+extern template class VEXG_EXPORT RasterHistogramProcess<std::int8_t>;
+extern template class VEXG_EXPORT RasterHistogramProcess<std::uint16_t>;
+extern template class VEXG_EXPORT RasterHistogramProcess<std::int16_t>;
+extern template class VEXG_EXPORT RasterHistogramProcess<std::uint32_t>;
+extern template class VEXG_EXPORT RasterHistogramProcess<std::int32_t>;
+extern template class VEXG_EXPORT RasterHistogramProcess<float>;
+extern template class VEXG_EXPORT RasterHistogramProcess<double>;
+extern template class VEXG_EXPORT RasterHistogramProcess<std::uint64_t>;
+extern template class VEXG_EXPORT RasterHistogramProcess<std::int64_t>;
+
+extern template class VEXG_EXPORT HistogramCallback<std::uint8_t>;
+extern template class VEXG_EXPORT HistogramCallback<std::int8_t>;
+extern template class VEXG_EXPORT HistogramCallback<std::uint16_t>;
+extern template class VEXG_EXPORT HistogramCallback<std::int16_t>;
+extern template class VEXG_EXPORT HistogramCallback<std::uint32_t>;
+extern template class VEXG_EXPORT HistogramCallback<std::int32_t>;
+extern template class VEXG_EXPORT HistogramCallback<float>;
+extern template class VEXG_EXPORT HistogramCallback<double>;
+extern template class VEXG_EXPORT HistogramCallback<std::uint64_t>;
+extern template class VEXG_EXPORT HistogramCallback<std::int64_t>;
+
+extern template class VEXG_EXPORT RasterHistogramCallbackProcess<std::uint8_t>;
+extern template class VEXG_EXPORT RasterHistogramCallbackProcess<std::int8_t>;
+extern template class VEXG_EXPORT RasterHistogramCallbackProcess<std::uint16_t>;
+extern template class VEXG_EXPORT RasterHistogramCallbackProcess<std::int16_t>;
+extern template class VEXG_EXPORT RasterHistogramCallbackProcess<std::uint32_t>;
+extern template class VEXG_EXPORT RasterHistogramCallbackProcess<std::int32_t>;
+extern template class VEXG_EXPORT RasterHistogramCallbackProcess<float>;
+extern template class VEXG_EXPORT RasterHistogramCallbackProcess<double>;
+extern template class VEXG_EXPORT RasterHistogramCallbackProcess<std::uint64_t>;
+extern template class VEXG_EXPORT RasterHistogramCallbackProcess<std::int64_t>;
+
+}  // namespace lumo

@@ -1,0 +1,92 @@
+#pragma once
+
+#include "raster/tile.h"
+#include "stats/plane_stats.h"
+
+namespace lumo {
+
+/// The statistics of the bands of a raster while they are computed, and then the results. Exists
+/// for TenTypes.
+///
+/// A value counts when its state has none of the bits of PixelValueState::NotValid and it is
+/// finite. Results are those of LargeStatsAccumulator, to the last few bits. Those of integers of
+/// up to 32 bits come from exact sums: they do not depend on how the pixels were divided.
+///
+/// Failure: an object that could not be sized is not valid, and everything gives false.
+template <typename T>
+class RasterStats : public Object {
+ public:
+  static const unsigned TypeCode;
+
+  explicit RasterStats(unsigned bandCount = 0) { Reset(bandCount); }
+
+  bool IsA(unsigned typeCode) const override {
+    return typeCode == TypeCode || Object::IsA(typeCode);
+  }
+  bool IsValid() const override { return accumulators_.IsValid() && Object::IsValid(); }
+
+  /// Forgets everything, and makes room for so many bands.
+  void Reset(unsigned bandCount);
+  unsigned BandCount() const { return bandCount_; }
+
+  /// Takes in the part of a tile from rowFrom to before rowTo and from columnFrom to before
+  /// columnTo. @return false for a tile with another number of bands.
+  bool Accumulate(const Tile<T>& tile, unsigned rowFrom, unsigned rowTo, unsigned columnFrom,
+                  unsigned columnTo);
+  /// Takes in what another object with as many bands has seen.
+  bool Merge(const RasterStats& other);
+  /// Computes the results, and forgets what they came from. @return false, with no results, for an
+  /// object without bands, or one that is finished.
+  bool Finish();
+
+  // The results of Finish, one for each band; empty before. A band without a value has 0 in all.
+  const Array<unsigned long long>& PixelCounts() const { return pixelCounts_; }
+  const Array<T>& Mins() const { return mins_; }
+  const Array<T>& Maxs() const { return maxs_; }
+  const Array<double>& Means() const { return means_; }
+  /// Deviations of a sample, divided by n - 1; 0 for one value.
+  const Array<double>& Stds() const { return stds_; }
+  const Array<double>& Sums() const { return sums_; }
+  const Array<double>& Sums2() const { return sums2_; }  ///< sums of the squares
+  const Array<double>& RMSs() const { return rmss_; }
+
+ protected:
+  bool Fits(const Tile<T>& tile) const {
+    return IsValid() && bandCount_ != 0 && tile.Bands() == bandCount_;
+  }
+  bool Fits(const RasterStats& other) const {
+    return IsValid() && other.IsValid() && bandCount_ != 0 && bandCount_ == other.bandCount_ &&
+           accumulators_.GetCount() == bandCount_ && other.accumulators_.GetCount() == bandCount_;
+  }
+  void AddBand(unsigned band, const SummedPlane<T>& plane, std::size_t count) {
+    AddPlane(plane, count, accumulators_[band]);
+  }
+
+ private:
+  Array<BandAccumulator<T>> accumulators_;
+  Array<unsigned long long> pixelCounts_;
+  Array<double> sums_;
+  Array<double> sums2_;
+  Array<T> mins_;
+  Array<T> maxs_;
+  Array<double> means_;
+  Array<double> stds_;
+  Array<double> rmss_;
+  unsigned bandCount_ = 0;
+};
+
+template <typename T>
+using RasterStatsPtr = Pointer<RasterStats<T>>;
+
+extern template class VEXG_EXPORT RasterStats<std::uint8_t>;
+extern template class VEXG_EXPORT RasterStats<std::int8_t>;
+extern template class VEXG_EXPORT RasterStats<std::uint16_t>;
+extern template class VEXG_EXPORT RasterStats<std::int16_t>;
+extern template class VEXG_EXPORT RasterStats<std::uint32_t>;
+extern template class VEXG_EXPORT RasterStats<std::int32_t>;
+extern template class VEXG_EXPORT RasterStats<float>;
+extern template class VEXG_EXPORT RasterStats<double>;
+extern template class VEXG_EXPORT RasterStats<std::uint64_t>;
+extern template class VEXG_EXPORT RasterStats<std::int64_t>;
+
+}  // namespace lumo

@@ -1,0 +1,197 @@
+#include "foundation/fault.h"
+#include "foundation/progress.h"
+#include "raster/raster_command.h"
+
+namespace lumo {
+namespace {
+
+const InputDeclaration kUri{"URI", Presence::kRequired, ValueKind::kURI, "the raster"};
+
+/// Base of the commands that compute statistics and write them.
+class ComputeStatsCommand : public RasterCommand {
+ protected:
+  /// Computes what `mode` asks for, and writes it.
+  CommandResult Compute(StatsMode mode) {
+    if (!CheckInputs()) return Fail();
+    const BasicRasterPtr raster = FindRaster();
+    if (!raster) return Fail();
+    const AsyncPtr pyramid = raster->PyramidAsync();
+    if (pyramid) pyramid->WaitFinished();
+    raster->SetStatsMode(mode);
+    const bool typed = DispatchType(TenTypes{}, raster->DataType(), [&]<typename T>() {
+      const RasterPtr<T> source(raster);
+      if (!source) return false;
+      WriteStats(*source, mode);
+      return true;
+    });
+    if (!typed) return Fail("statistics are of real numbers, and the raster has others");
+    if (GetIPC().abort->IsSet()) return Fail("the computation was aborted");
+    const unsigned mask = mode == StatsMode::kBasic ? StatsMask::Basic : StatsMask::Extended;
+    for (unsigned band = 0; band < raster->Bands(); ++band) {
+      if (raster->StatsExist(band, mask)) continue;
+      const String fault = TakeFault();
+      return Fail(fault.GetLength() != 0 ? fault : "the statistics could not be computed");
+    }
+    return Succeed();
+  }
+
+ private:
+  template <typename T>
+  void WriteStats(Raster<T>& raster, StatsMode mode) {
+    const unsigned bands = raster.Bands();
+    const bool extended = mode == StatsMode::kExtended;
+    const double calls = (extended ? 2.0 * bands + 7 : 7) * bands;
+    // A share of the progress for each call; the calls follow each other.
+    const auto share = [&] {
+      return IPC(GetIPC().abort,
+                 ProgressReportPtr(new ScaledProgressReport(GetIPC().progress, calls)));
+    };
+    const ArrayDims each(bands);
+    Array<T> min(each), max(each);
+    Array<double> mean(each), std(each), sum(each), sum2(each), rms(each);
+    Array<double> sumXY, cov;
+    if (extended) {
+      sumXY.Resize(ArrayDims(bands, bands));
+      cov.Resize(ArrayDims(bands, bands));
+    }
+    for (unsigned band = 0; band < bands; ++band) {
+      min[band] = raster.Min(band, share());
+      max[band] = raster.Max(band, share());
+      mean[band] = raster.Mean(band, share());
+      std[band] = raster.Std(band, share());
+      sum[band] = raster.Sum(band, share());
+      sum2[band] = raster.Sum2(band, share());
+      rms[band] = raster.RMS(band, share());
+      for (unsigned other = 0; extended && other < bands; ++other) {
+        const std::size_t at = std::size_t{band} * bands + other;
+        sumXY[at] = raster.SumXY(band, other, share());
+        cov[at] = raster.Cov(band, other, share());
+      }
+    }
+    Write("Min", min);
+    Write("Max", max);
+    Write("Mean", mean);
+    Write("Std", std);
+    Write("Sum", sum);
+    Write("Sum2", sum2);
+    Write("RMS", rms);
+    if (!extended) return;
+    Write("SumXY", sumXY);
+    Write("Cov", cov);
+  }
+};
+
+const std::vector<OutputDeclaration> kBasicOutputs{
+    {"Min", ValueKind::kNumberArray, "smallest value of each band; 0 in a band without any"},
+    {"Max", ValueKind::kNumberArray, "largest value of each band"},
+    {"Mean", ValueKind::kNumberArray, "mean of each band"},
+    {"Std", ValueKind::kNumberArray, "deviation of each band, as of a sample: divided by n - 1"},
+    {"Sum", ValueKind::kNumberArray, "sum of each band"},
+    {"Sum2", ValueKind::kNumberArray, "sum of the squares of each band"},
+    {"RMS", ValueKind::kNumberArray, "root of the mean of the squares of each band"}};
+
+std::vector<OutputDeclaration> ExtendedOutputs() {
+  std::vector<OutputDeclaration> outputs = kBasicOutputs;
+  outputs.insert(
+      outputs.end(),
+      {{"SumXY", ValueKind::kNumberArray, "sums of the products of two bands, bands by bands"},
+       {"Cov", ValueKind::kNumberArray, "covariances of two bands, bands by bands"}});
+  return outputs;
+}
+
+const CommandDeclaration kBasic{
+    "GetBasicRasterStatsCommand",
+    "Statistics",
+    "Gives the statistics of each band, computed where they are not at hand.",
+    {kUri},
+    kBasicOutputs};
+
+class GetBasicRasterStatsCommand final : public ComputeStatsCommand {
+  CommandResult Execute() override { return Compute(StatsMode::kBasic); }
+};
+
+const CommandFactoryT<GetBasicRasterStatsCommand> basicFactory(kBasic);
+
+const CommandDeclaration kExtended{
+    "GetExtendedRasterStatsCommand",
+    "Statistics",
+    "Gives the statistics of each band and between bands, computed where they are not at hand.",
+    {kUri},
+    ExtendedOutputs()};
+
+class GetExtendedRasterStatsCommand final : public ComputeStatsCommand {
+  CommandResult Execute() override { return Compute(StatsMode::kExtended); }
+};
+
+const CommandFactoryT<GetExtendedRasterStatsCommand> extendedFactory(kExtended);
+
+const CommandDeclaration kSetMode{"SetRasterStatsModeCommand",
+                                  "Statistics",
+                                  "Sets which statistics a raster computes.",
+                                  {kUri,
+                                   {"StatsMode", Presence::kRequired, ValueKind::kWord,
+                                    "DoBasic, or DoExtended: with those between bands"}},
+                                  {{"StatsMode", ValueKind::kWord, "the mode from now on"}}};
+
+class SetRasterStatsModeCommand final : public RasterCommand {
+  CommandResult Execute() override {
+    if (!CheckInputs()) return Fail();
+    const BasicRasterPtr raster = FindRaster();
+    if (!raster) return Fail();
+    raster->SetStatsMode(Read<StatsMode>("StatsMode"));
+    Write("StatsMode", raster->StatsMode());
+    return Succeed();
+  }
+};
+
+const CommandFactoryT<SetRasterStatsModeCommand> setModeFactory(kSetMode);
+
+const CommandDeclaration kSetStats{"SetRasterBandStatsCommand",
+                                   "Statistics",
+                                   "Enters known statistics of one band.",
+                                   {kUri,
+                                    {"RasterBandStats", Presence::kRequired, ValueKind::kText,
+                                     "band, mask, min, max, mean, deviation, sum, sum of squares, "
+                                     "root mean square, and the arrays "
+                                     "of products and covariances"}},
+                                   {}};
+
+class SetRasterBandStatsCommand final : public RasterCommand {
+  CommandResult Execute() override {
+    if (!CheckInputs()) return Fail();
+    const BasicRasterPtr raster = FindRaster();
+    if (!raster) return Fail();
+    const bool set = DispatchType(TenTypes{}, raster->DataType(), [&]<typename T>() {
+      const RasterPtr<T> source(raster);
+      const auto stats = Read<RasterBandStats<T>>("RasterBandStats");
+      if (!source || stats.mask == StatsMask::None || stats.band >= source->Bands()) return false;
+      source->SetBandStats(stats);
+      return true;
+    });
+    return set ? Succeed() : Fail("RasterBandStats holds no statistics of a band of the raster");
+  }
+};
+
+const CommandFactoryT<SetRasterBandStatsCommand> setStatsFactory(kSetStats);
+
+const CommandDeclaration kSave{
+    "SaveRasterStatsCommand",
+    "Statistics",
+    "Stores the statistics of a raster through its data source.",
+    {kUri},
+    {{"Return", ValueKind::kBoolean, "they are stored, or the source has no place for them"}}};
+
+class SaveRasterStatsCommand final : public RasterCommand {
+  CommandResult Execute() override {
+    if (!CheckInputs()) return Fail();
+    const BasicRasterPtr raster = FindRaster();
+    if (!raster) return Fail();
+    Write("Return", raster->WriteStats());
+    return Succeed();
+  }
+};
+
+const CommandFactoryT<SaveRasterStatsCommand> saveFactory(kSave);
+
+}  // namespace
+}  // namespace lumo

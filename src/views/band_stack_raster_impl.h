@@ -1,0 +1,302 @@
+#pragma once
+
+#include <algorithm>
+
+#include "raster/interleave.h"
+#include "views/band_stack_raster.h"
+
+namespace lumo {
+
+namespace detail {
+
+template <typename T>
+RasterPtr<T> FirstOf(const Array<RasterPtr<T>>& members) {
+  const auto first = std::find_if(members.begin(), members.end(),
+                                  [](const RasterPtr<T>& member) { return bool(member); });
+  return first != members.end() ? *first : RasterPtr<T>();
+}
+
+}  // namespace detail
+
+template <typename T>
+BandStackRaster<T>::BandStackRaster(const Array<RasterPtr<T>>& members)
+    : ComputedRaster<T>(detail::FirstOf(members)) {
+  for (const RasterPtr<T>& member : members) {
+    if (!member) continue;
+    const RasterDef def = member->GetRasterDef();
+    const PyramidDef pyramid = member->GetPyramidDef();
+    if (members_.empty()) {
+      def_ = def;
+      def_.noData.clear();
+      pyramidDef_.levelMin = pyramid.levelMin;
+      pyramidDef_.levelMax = pyramid.levelMax;
+    }
+    pyramidDef_.levelMin = std::max(pyramidDef_.levelMin, pyramid.levelMin);
+    pyramidDef_.levelMax = std::min(pyramidDef_.levelMax, pyramid.levelMax);
+    pyramidDef_.levelMin = std::min(pyramidDef_.levelMin, pyramidDef_.levelMax);
+    const auto index = static_cast<unsigned>(members_.size());
+    for (unsigned band = 0; band < member->Bands(); ++band) {
+      const auto value = def.noData.find(band);
+      if (value != def.noData.end()) {
+        def_.noData[static_cast<unsigned>(sources_.size())] = value->second;
+      }
+      sources_.push_back({index, band});
+    }
+    members_.push_back(member);
+  }
+  def_.bands = static_cast<unsigned>(sources_.size());
+  if (def_.bands == 0) def_.Clear();
+}
+
+/// What `call(member, local band)` gives for a band of the stack; 0, false or empty for one that it
+/// doesn't have.
+template <typename T>
+template <typename Call>
+auto BandStackRaster<T>::AskMember(unsigned band, const Call& call) const {
+  using Result = decltype(call(*members_[0], 0u));
+  if (band >= sources_.size()) return Result();
+  return call(*members_[sources_[band].member], sources_[band].band);
+}
+
+template <typename T>
+bool BandStackRaster<T>::CanWrite() const {
+  return !members_.empty() && std::all_of(members_.begin(), members_.end(),
+                                          [](const auto& member) { return member->CanWrite(); });
+}
+
+template <typename T>
+bool BandStackRaster<T>::PyramidExists() const {
+  return !members_.empty() && std::all_of(members_.begin(), members_.end(), [](const auto& member) {
+    return member->PyramidExists();
+  });
+}
+
+template <typename T>
+bool BandStackRaster<T>::PyramidDelete() {
+  bool last = false;
+  for (const auto& member : members_) last = member->PyramidDelete();
+  return last;
+}
+
+template <typename T>
+bool BandStackRaster<T>::PyramidRefresh() {
+  bool last = false;
+  for (const auto& member : members_) last = member->PyramidRefresh();
+  return last;
+}
+
+template <typename T>
+RasterPtr<T> BandStackRaster<T>::PyramidLevel(unsigned level) {
+  Array<RasterPtr<T>> reduced{ArrayDims(static_cast<unsigned>(members_.size()))};
+  for (unsigned i = 0; i < reduced.GetCount(); ++i) {
+    reduced[i] = members_[i]->PyramidLevel(level);
+    if (!reduced[i]) return {};
+  }
+  return reduced.GetCount() != 0 ? RasterPtr<T>(new BandStackRaster(reduced)) : RasterPtr<T>();
+}
+
+template <typename T>
+bool BandStackRaster<T>::StatsExist(unsigned band, unsigned mask) const {
+  return AskMember(
+      band, [&](Raster<T>& member, unsigned local) { return member.StatsExist(local, mask); });
+}
+
+template <typename T>
+T BandStackRaster<T>::Min(unsigned band, const IPC& ipc) {
+  return AskMember(band, [&](Raster<T>& member, unsigned local) { return member.Min(local, ipc); });
+}
+
+template <typename T>
+T BandStackRaster<T>::Max(unsigned band, const IPC& ipc) {
+  return AskMember(band, [&](Raster<T>& member, unsigned local) { return member.Max(local, ipc); });
+}
+
+template <typename T>
+double BandStackRaster<T>::Mean(unsigned band, const IPC& ipc) {
+  return AskMember(band,
+                   [&](Raster<T>& member, unsigned local) { return member.Mean(local, ipc); });
+}
+
+template <typename T>
+double BandStackRaster<T>::Std(unsigned band, const IPC& ipc) {
+  return AskMember(band, [&](Raster<T>& member, unsigned local) { return member.Std(local, ipc); });
+}
+
+template <typename T>
+double BandStackRaster<T>::Sum(unsigned band, const IPC& ipc) {
+  return AskMember(band, [&](Raster<T>& member, unsigned local) { return member.Sum(local, ipc); });
+}
+
+template <typename T>
+double BandStackRaster<T>::Sum2(unsigned band, const IPC& ipc) {
+  return AskMember(band,
+                   [&](Raster<T>& member, unsigned local) { return member.Sum2(local, ipc); });
+}
+
+template <typename T>
+double BandStackRaster<T>::RMS(unsigned band, const IPC& ipc) {
+  return AskMember(band, [&](Raster<T>& member, unsigned local) { return member.RMS(local, ipc); });
+}
+
+template <typename T>
+bool BandStackRaster<T>::HasNoDataValue(unsigned band) const {
+  return AskMember(band,
+                   [&](Raster<T>& member, unsigned local) { return member.HasNoDataValue(local); });
+}
+
+template <typename T>
+T BandStackRaster<T>::NoDataValue(unsigned band) const {
+  return AskMember(band,
+                   [&](Raster<T>& member, unsigned local) { return member.NoDataValue(local); });
+}
+
+template <typename T>
+bool BandStackRaster<T>::HasPalette(unsigned band) const {
+  return AskMember(band,
+                   [&](Raster<T>& member, unsigned local) { return member.HasPalette(local); });
+}
+
+template <typename T>
+PalettePtr BandStackRaster<T>::Palette(unsigned band) const {
+  return AskMember(band, [&](Raster<T>& member, unsigned local) { return member.Palette(local); });
+}
+
+template <typename T>
+bool BandStackRaster<T>::WritePalette(unsigned band, const PalettePtr& palette) {
+  return AskMember(
+      band, [&](Raster<T>& member, unsigned local) { return member.WritePalette(local, palette); });
+}
+
+template <typename T>
+bool BandStackRaster<T>::DeletePalette(unsigned band) {
+  return AskMember(band,
+                   [&](Raster<T>& member, unsigned local) { return member.DeletePalette(local); });
+}
+
+template <typename T>
+bool BandStackRaster<T>::WriteStats() {
+  bool last = false;
+  for (const auto& member : members_) last = member->WriteStats();
+  return last;
+}
+
+template <typename T>
+bool BandStackRaster<T>::WriteHistogram() {
+  bool all = !members_.empty();
+  for (const auto& member : members_) all = member->WriteHistogram() && all;
+  return all;
+}
+
+template <typename T>
+RasterBandStats<T> BandStackRaster<T>::BandStats(unsigned band) const {
+  RasterBandStats<T> stats =
+      AskMember(band, [](Raster<T>& member, unsigned local) { return member.BandStats(local); });
+  stats.band = band;
+  return stats;
+}
+
+template <typename T>
+lumo::TileDimensions BandStackRaster<T>::TileDimensions() const {
+  lumo::TileDimensions tiles;
+  tiles.width = this->Samples();
+  tiles.height = this->Samples() != 0 ? 1 : 0;
+  return tiles;
+}
+
+template <typename T>
+bool BandStackRaster<T>::Knows(const Array<unsigned>& bands) const {
+  return bands.GetCount() != 0 && std::all_of(bands.begin(), bands.end(), [&](unsigned band) {
+           return band < sources_.size();
+         });
+}
+
+template <typename T>
+typename BandStackRaster<T>::Share BandStackRaster<T>::ShareOf(unsigned member,
+                                                               const Array<unsigned>& bands) const {
+  Share share;
+  const ArrayDims most(bands.GetCount());
+  share.bands.Resize(most);
+  share.places.Resize(most);
+  unsigned count = 0;
+  for (unsigned place = 0; place < bands.GetCount(); ++place) {
+    const Source& source = sources_[bands[place]];
+    if (source.member != member) continue;
+    share.bands[count] = source.band;
+    share.places[count++] = place;
+  }
+  share.bands.Resize(ArrayDims(count));
+  share.places.Resize(ArrayDims(count));
+  return share;
+}
+
+template <typename T>
+bool BandStackRaster<T>::GetSubRect(const SubRect& rect, const Array<unsigned>& bands,
+                                    Interleave interleave, Array<T>& pixels,
+                                    Array<unsigned char>& state) {
+  if (!Knows(bands)) return false;
+  const Share first = ShareOf(sources_[bands[0]].member, bands);
+  if (first.bands.GetCount() == bands.GetCount()) {  // all of one member
+    return members_[sources_[bands[0]].member]->GetSubRect(rect, first.bands, interleave, pixels,
+                                                           state);
+  }
+  const unsigned width = rect.Width(), height = rect.Height(), count = bands.GetCount();
+  const ArrayDims dims = BlockDims(interleave, width, height, count);
+  const std::size_t plane = std::size_t{width} * height;
+  Array<T> planes, part;
+  Array<unsigned char> planeStates, partState;
+  const ArrayDims flat(dims.count);
+  if (!pixels.Resize(dims) || !state.Resize(dims) || !planes.Resize(flat) ||
+      !planeStates.Resize(flat)) {
+    return false;
+  }
+  for (unsigned member = 0; member < members_.size(); ++member) {
+    const Share share = ShareOf(member, bands);
+    if (share.bands.GetCount() == 0) continue;
+    if (!members_[member]->GetSubRect(rect, share.bands, Interleave::BSQ, part, partState)) {
+      return false;
+    }
+    for (unsigned i = 0; i < share.places.GetCount(); ++i) {
+      std::copy_n(&part[i * plane], plane, &planes[share.places[i] * plane]);
+      std::copy_n(&partState[i * plane], plane, &planeStates[share.places[i] * plane]);
+    }
+  }
+  return ConvertInterleave(planes.GetData(), Interleave::BSQ, pixels.GetData(), interleave, width,
+                           height, count, sizeof(T)) &&
+         ConvertInterleave(planeStates.GetData(), Interleave::BSQ, state.GetData(), interleave,
+                           width, height, count, 1);
+}
+
+template <typename T>
+bool BandStackRaster<T>::PutSubRect(const SubRect& rect, const Array<unsigned>& bands,
+                                    Interleave interleave, Array<T>& pixels,
+                                    Array<unsigned char>& state) {
+  const unsigned width = rect.Width(), height = rect.Height(), count = bands.GetCount();
+  const std::size_t plane = std::size_t{width} * height;
+  const ArrayDims flat(BlockDims(interleave, width, height, count).count);
+  Array<T> planes, part;
+  Array<unsigned char> planeStates, partState;
+  if (!Knows(bands) || pixels.GetCount() < flat.count || state.GetCount() < flat.count ||
+      !planes.Resize(flat) || !planeStates.Resize(flat) ||
+      !ConvertInterleave(pixels.GetData(), interleave, planes.GetData(), Interleave::BSQ, width,
+                         height, count, sizeof(T)) ||
+      !ConvertInterleave(state.GetData(), interleave, planeStates.GetData(), Interleave::BSQ, width,
+                         height, count, 1)) {
+    return false;
+  }
+  for (unsigned member = 0; member < members_.size(); ++member) {
+    const Share share = ShareOf(member, bands);
+    const ArrayDims dims = BlockDims(Interleave::BSQ, width, height, share.bands.GetCount());
+    if (share.bands.GetCount() == 0) continue;
+    if (!part.Resize(dims) || !partState.Resize(dims)) return false;
+    for (unsigned i = 0; i < share.places.GetCount(); ++i) {
+      std::copy_n(&planes[share.places[i] * plane], plane, &part[i * plane]);
+      std::copy_n(&planeStates[share.places[i] * plane], plane, &partState[i * plane]);
+    }
+    if (!members_[member]->PutSubRect(rect, share.bands, Interleave::BSQ, part, partState)) {
+      return false;
+    }
+  }
+  return true;
+}
+
+}  // namespace lumo

@@ -1,0 +1,75 @@
+#pragma once
+
+#include "raster/raster_view.h"
+#include "stats/dynamic_raster_histogram.h"
+#include "stats/dynamic_raster_stats.h"
+
+namespace lumo {
+
+/// A raster whose statistics and histograms are its own, computed from the pixels that it shows:
+/// the base of the sources, and of the views that show other pixels than their parent. It stores
+/// none of them. Everything else goes to the parent. Exists for TwelveTypes.
+///
+/// A class derived from it says StopComputing() first in its destructor: what is being computed
+/// reads the raster, which has to be whole until it has stopped.
+template <typename T>
+class ComputedRaster : public RasterView<T> {
+ public:
+  explicit ComputedRaster(const RasterPtr<T>& parent = {});
+  ~ComputedRaster() override;
+
+  bool StatsExist(unsigned band, unsigned mask) const override;
+  AsyncPtr StatsBuild(const IPC& ipc) override;
+  AsyncPtr StatsAsync() const override;
+  void SetStatsMode(lumo::StatsMode mode) override;
+  lumo::StatsMode StatsMode() const override;
+  bool WriteStats() override { return false; }
+  void SetBandStats(const RasterBandStats<T>& stats) override;
+  RasterBandStats<T> BandStats(unsigned band) const override;
+  T Min(unsigned band, const IPC& ipc) override;
+  T Max(unsigned band, const IPC& ipc) override;
+  double Mean(unsigned band, const IPC& ipc) override;
+  double Std(unsigned band, const IPC& ipc) override;
+  double Sum(unsigned band, const IPC& ipc) override;
+  double Sum2(unsigned band, const IPC& ipc) override;
+  double RMS(unsigned band, const IPC& ipc) override;
+  double SumXY(unsigned band, unsigned otherBand, const IPC& ipc) override;
+  double Cov(unsigned band, unsigned otherBand, const IPC& ipc) override;
+
+  AsyncPtr HistogramAsync() const override;
+  bool WriteHistogram() override { return false; }
+  void SetBandHistogram(const RasterBandHistogram<T>& histogram) override;
+  Array<RasterBandHistogram<T>> BandHistogram(unsigned band) const override;
+  AsyncPtr HistogramByBinSize(T lower, T upper, double binSize, const Array<unsigned>& bands,
+                              HistogramSign sign, const IPC& ipc) override;
+  AsyncPtr HistogramByBinCount(T lower, T upper, unsigned binCount, const Array<unsigned>& bands,
+                               HistogramSign sign, const IPC& ipc) override;
+  AsyncPtr HistogramAllBands(T lower, T upper, unsigned binCount, HistogramSign sign,
+                             const IPC& ipc) override;
+
+ protected:
+  /// Ends what is being computed; nothing is at hand, or can be computed, from then on.
+  void StopComputing();
+
+  DynamicRasterStats<T>* Stats() const { return stats_.Get(); }
+  DynamicRasterHistogram<T>* Histogram() const { return histogram_.Get(); }
+
+ private:
+  DynamicRasterStatsPtr<T> stats_;
+  DynamicRasterHistogramPtr<T> histogram_;
+};
+
+extern template class VEXG_EXPORT ComputedRaster<std::uint8_t>;
+extern template class VEXG_EXPORT ComputedRaster<std::int8_t>;
+extern template class VEXG_EXPORT ComputedRaster<std::uint16_t>;
+extern template class VEXG_EXPORT ComputedRaster<std::int16_t>;
+extern template class VEXG_EXPORT ComputedRaster<std::uint32_t>;
+extern template class VEXG_EXPORT ComputedRaster<std::int32_t>;
+extern template class VEXG_EXPORT ComputedRaster<float>;
+extern template class VEXG_EXPORT ComputedRaster<double>;
+extern template class VEXG_EXPORT ComputedRaster<std::uint64_t>;
+extern template class VEXG_EXPORT ComputedRaster<std::int64_t>;
+extern template class VEXG_EXPORT ComputedRaster<Complex<float>>;
+extern template class VEXG_EXPORT ComputedRaster<Complex<double>>;
+
+}  // namespace lumo

@@ -1,0 +1,57 @@
+#pragma once
+
+#include "raster/raster_def.h"
+#include "views/computed_raster.h"
+
+namespace lumo {
+
+/// Shows a rectangle of its parent as a raster of its own; no pixel is copied or kept.
+///
+/// Pixel (0, 0) of the view is pixel (rect.left, rect.top) of the parent. Bands, data type and
+/// no-data values are the parent's; the geo-reference moves with the origin. Statistics are the
+/// view's own, since it covers other pixels. Exists for EightTypes.
+///
+/// Ownership: shares the parent, which does not know the view.
+/// Threads:   every operation may run on many threads at once; nothing is stored per call.
+/// Failure:   over an empty parent IsValid() is false and operations give false, 0 or empty.
+template <typename T>
+class SpatialSubsetRaster final : public ComputedRaster<T> {
+ public:
+  /// @param rect  pixels of the parent, corners inclusive and in any order; cut to the parent's
+  ///              extent. One wholly outside leaves the strip of the parent's last column or line.
+  SpatialSubsetRaster(const RasterPtr<T>& parent, const SubRect& rect);
+  ~SpatialSubsetRaster() override { this->StopComputing(); }
+
+  URI GetURI() const override { return this->DefaultURI("SpatialSubsetRaster"); }
+  RasterDef GetRasterDef() const override { return def_; }
+  unsigned Samples() const override { return def_.samples; }
+  unsigned Lines() const override { return def_.lines; }
+
+  /// The same rectangle on a level of the parent: left and top rounded up, right and bottom down.
+  RasterPtr<T> PyramidLevel(unsigned level) override;
+  RasterPtr<T> StoredPyramidLevel(unsigned) override { return {}; }
+
+  bool GetSubRect(const SubRect& rect, const Array<unsigned>& bands, Interleave interleave,
+                  Array<T>& pixels, Array<unsigned char>& state) override;
+  bool PutSubRect(const SubRect& rect, const Array<unsigned>& bands, Interleave interleave,
+                  Array<T>& pixels, Array<unsigned char>& state) override;
+
+  const SubRect& Rect() const { return rect_; }  ///< in the parent's pixels
+
+ private:
+  SubRect InParent(const SubRect& rect) const;
+
+  SubRect rect_;
+  RasterDef def_;
+};
+
+extern template class VEXG_EXPORT SpatialSubsetRaster<std::uint8_t>;
+extern template class VEXG_EXPORT SpatialSubsetRaster<std::int8_t>;
+extern template class VEXG_EXPORT SpatialSubsetRaster<std::uint16_t>;
+extern template class VEXG_EXPORT SpatialSubsetRaster<std::int16_t>;
+extern template class VEXG_EXPORT SpatialSubsetRaster<std::uint32_t>;
+extern template class VEXG_EXPORT SpatialSubsetRaster<std::int32_t>;
+extern template class VEXG_EXPORT SpatialSubsetRaster<float>;
+extern template class VEXG_EXPORT SpatialSubsetRaster<double>;
+
+}  // namespace lumo

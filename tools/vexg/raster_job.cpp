@@ -1,0 +1,157 @@
+#include "raster_job.h"
+
+#include <algorithm>
+
+#include <CLI/CLI.hpp>
+
+#include "commands/job_parser.h"
+#include "verb.h"
+
+namespace lumo::host {
+namespace {
+
+String RunHere(const String& document, const IPC& ipc) {
+  Job job;
+  JobParser(job).Parse(document);
+  job.defaultIpc = ipc;
+  RunJob(job);
+  return JobResultWriter(job).Write();
+}
+
+}  // namespace
+
+void RasterJobOptions::AddTo(CLI::App& app) {
+  app.add_option("--server", server.name, "Have the server of this name do the work")
+      ->type_name("NAME");
+  server.AddNoWait(app);
+  app.add_flag("--print-job", printJob, "Print the job document instead of running it");
+}
+
+void RasterJobOptions::AddProgressTo(CLI::App& app) {
+  app.add_option("--progress", progress, "How progress shows on standard error")
+      ->check(CLI::IsMember({"auto", "bar", "json", "none"}))
+      ->capture_default_str();
+  app.add_flag("-q,--quiet", quiet, "Show no progress");
+}
+
+JobDraft::JobDraft() : root_("Job") {
+  root_.AddChild("Reasons");
+}
+
+JobWriterCommand& JobDraft::Step(const std::string& name, const char* id) {
+  auto* const command = new JobWriterCommand;
+  root_.children.PushBack(XMLElementPtr(command));
+  command->attributes["Name"] = String(name);
+  command->attributes["ID"] = id;
+  if (!steps_.empty()) command->AddDependsOn(steps_.back().name);
+  steps_.push_back({String(name), id, "", ""});
+  return *command;
+}
+
+JobWriterCommand& JobDraft::Open(const std::string& name, const char* id) {
+  JobWriterCommand& command = Step(name, id);
+  steps_.back().opens = String("$" + name);
+  command.AddOutput("URI", steps_.back().opens);
+  return command;
+}
+
+void JobDraft::Close(const std::string& name, const String& raster) {
+  Step(name, "CloseRasterCommand").AddInput("URI", raster);
+  steps_.back().closes = raster;
+}
+
+String JobDraft::Write(const JobChannel* channel) const {
+  XMLElement job("Job");
+  if (channel != nullptr) channel->AddTo(job);
+  XMLDocumentRoot document;
+  document.name = root_.name;
+  for (const XMLElementPtr& child : job.children) document.children.PushBack(child);
+  for (const XMLElementPtr& child : root_.children) document.children.PushBack(child);
+  return XMLSimpleWriter().Write(document);
+}
+
+JobSession::JobSession(const RasterJobOptions& options) {
+  if (!options.server.name.empty()) {
+    channel_ = std::make_unique<JobChannel>();
+    link_ = std::make_unique<ServerLink>(options.server);
+  }
+  interrupts_ = std::make_unique<platform::InterruptWatch>([this] {
+    ipc_.abort->Set(true);
+    if (channel_) channel_->Abort();
+  });
+  if (link_) link_->Connect();
+}
+
+JobSession::~JobSession() {
+  try {
+    CloseAll();
+  } catch (const std::exception&) {
+    // The server has gone, and with it what was open.
+  }
+}
+
+ProgressReportPtr JobSession::GetProgress() const {
+  return channel_ ? channel_->GetProgress() : ipc_.progress;
+}
+
+void JobSession::CheckInterrupt() const {
+  if (ipc_.abort->IsSet()) throw HostError(kExitFailed, "interrupted; nothing was written");
+}
+
+JobResults JobSession::Run(const JobDraft& draft) {
+  JobResults results;
+  JobResultParser(results).Parse(Execute(draft, true));
+  NoteOpenRasters(draft, results);
+  CheckInterrupt();
+  CheckResults(draft, results);
+  return results;
+}
+
+/// @param watched  with the progress and the abort flag of the session.
+String JobSession::Execute(const JobDraft& draft, bool watched) {
+  if (link_) return link_->Run(draft.Write(watched ? channel_.get() : nullptr));
+  return RunHere(draft.Write(), watched ? ipc_ : IPC());
+}
+
+void JobSession::NoteOpenRasters(const JobDraft& draft, const JobResults& results) {
+  Map<String, String> variables;
+  for (const JobDraft::StepInfo& step : draft.GetSteps()) {
+    const JobResult& result = results.Find(step.name);
+    if (step.opens.GetLength() != 0 && result.returns.HasKey("URI")) {
+      const String uri = result.returns.Find("URI");
+      if (uri.GetLength() == 0) continue;
+      variables[step.opens] = uri;
+      open_.push_back(uri);
+    } else if (step.closes.GetLength() != 0 && result.result == "Success") {
+      const bool isVariable = variables.HasKey(step.closes);
+      const String uri = isVariable ? variables.Find(step.closes) : step.closes;
+      const auto at = std::find(open_.begin(), open_.end(), uri);
+      if (at != open_.end()) open_.erase(at);
+    }
+  }
+}
+
+void JobSession::CheckResults(const JobDraft& draft, const JobResults& results) const {
+  for (const JobDraft::StepInfo& step : draft.GetSteps()) {
+    const std::string id = step.id.ToUTF8();
+    if (!results.HasKey(step.name)) {
+      throw HostError(kExitFailed, "the server does not know the command " + id);
+    }
+    const JobResult& result = results.Find(step.name);
+    if (result.result == "Success") continue;
+    const std::string reason = result.reason.ToUTF8();
+    throw HostError(kExitFailed, reason.empty() ? id + " failed without a reason" : reason);
+  }
+}
+
+void JobSession::CloseAll() {
+  if (open_.empty()) return;
+  JobDraft draft;
+  for (std::size_t i = 0; i < open_.size(); ++i) {
+    draft.Close("close" + std::to_string(i), open_[i]);
+  }
+  open_.clear();
+  Execute(draft, false);
+}
+
+}  // namespace lumo::host

@@ -1,0 +1,111 @@
+#pragma once
+
+#include <memory>
+#include <string>
+#include <vector>
+
+#include "commands/job_result.h"
+#include "commands/job_writer.h"
+#include "job_channel.h"
+#include "platform/interrupt.h"
+#include "progress_view.h"
+#include "server_link.h"
+
+namespace lumo::host {
+
+/// The options of a verb that does its work by jobs of its own.
+struct RasterJobOptions {
+  ServerOptions server{.name = ""};  ///< no name: in this process
+  bool printJob = false;
+  std::string progress = "auto";
+  bool quiet = false;
+
+  void AddTo(CLI::App& app);
+  /// For a verb that may take long.
+  void AddProgressTo(CLI::App& app);
+  ProgressStyle GetProgressStyle() const { return ChooseProgressStyle(progress, quiet); }
+};
+
+/// A job document in the making, whose commands run one after the other, each whatever became of
+/// those before it.
+class JobDraft {
+ public:
+  JobDraft();
+
+  /// Adds a command at the end. Further inputs and outputs are the caller's.
+  JobWriterCommand& Step(const std::string& name, const char* id);
+
+  /// Adds a command that opens or makes a raster; its URI goes into the variable "$" name.
+  JobWriterCommand& Open(const std::string& name, const char* id);
+  /// Adds the command that closes a raster: a variable of Open, or the URI of one that is open.
+  void Close(const std::string& name, const String& raster);
+
+  /// The document; `channel` is named in it unless null.
+  String Write(const JobChannel* channel = nullptr) const;
+
+  /// What a step is called and does.
+  struct StepInfo {
+    String name;
+    String id;
+    String opens;   ///< the variable that a raster's URI goes into
+    String closes;  ///< a variable or URI
+  };
+  const std::vector<StepInfo>& GetSteps() const { return steps_; }
+
+ private:
+  XMLElement root_;
+  std::vector<StepInfo> steps_;
+};
+
+using JobResults = Map<String, JobResult>;
+
+/// Runs the jobs of a verb, in this process or by a server. What they opened and did not close is
+/// closed at the end, whatever happens. The first Ctrl-C aborts what runs.
+class JobSession {
+ public:
+  /// Throws HostError when the server doesn't answer.
+  explicit JobSession(const RasterJobOptions& options);
+  ~JobSession();
+  JobSession(const JobSession&) = delete;
+  JobSession& operator=(const JobSession&) = delete;
+
+  /// Runs a job and gives the results of its commands by name. Throws HostError with the reason of
+  /// the first command that failed, or when the user interrupted it.
+  JobResults Run(const JobDraft& draft);
+
+  /// Progress of the job that runs, over all its commands.
+  ProgressReportPtr GetProgress() const;
+
+  /// Throws HostError once the user has interrupted.
+  void CheckInterrupt() const;
+
+ private:
+  String Execute(const JobDraft& draft, bool watched);
+  void NoteOpenRasters(const JobDraft& draft, const JobResults& results);
+  void CheckResults(const JobDraft& draft, const JobResults& results) const;
+  void CloseAll();
+
+  IPC ipc_;  // of jobs in this process; its flag is that of all
+  std::unique_ptr<JobChannel> channel_;
+  std::unique_ptr<ServerLink> link_;  // null: in this process
+  std::unique_ptr<platform::InterruptWatch> interrupts_;
+  std::vector<String> open_;  // URIs
+};
+
+/// How far one command of a job has come, where the commands run one after the other.
+class StepProgress final : public ProgressReport {
+ public:
+  /// @param step  position of the command, of `steps`.
+  StepProgress(const ProgressReportPtr& job, std::size_t step, std::size_t steps)
+      : job_(job), step_(static_cast<double>(step)), steps_(static_cast<double>(steps)) {
+    job_->Update(0.0);  // what it shows is of the job before
+  }
+  double GetProgress() const override { return job_->GetProgress() * steps_ - step_; }
+
+ private:
+  ProgressReportPtr job_;
+  double step_;
+  double steps_;
+};
+
+}  // namespace lumo::host

@@ -1,0 +1,142 @@
+#include "raster_source.h"
+
+#include <charconv>
+#include <filesystem>
+
+#include <CLI/CLI.hpp>
+#include <fmt/format.h>
+
+#include "data/file_uri.h"
+#include "data/format_table.h"
+#include "raster/pixel_types.h"
+#include "verb.h"
+
+namespace lumo::host {
+namespace {
+
+/// The whole numbers between commas; false for anything else.
+bool ParseNumbers(const std::string& text, std::vector<unsigned>& numbers) {
+  const char* at = text.data();
+  const char* const end = at + text.size();
+  for (;;) {
+    unsigned value = 0;
+    const auto [next, fault] = std::from_chars(at, end, value);
+    if (fault != std::errc()) return false;
+    numbers.push_back(value);
+    if (next == end) return true;
+    if (*next != ',') return false;
+    at = next + 1;
+  }
+}
+
+}  // namespace
+
+void SourceOptions::AddTo(CLI::App& app) {
+  app.add_option("file", file, "The raster")->type_name("FILE")->required();
+  AddFormatTo(app);
+}
+
+void SourceOptions::AddFormatTo(CLI::App& app) {
+  app.add_option("--input-format", format, "Key of its format, see vexg formats; else detected")
+      ->type_name("KEY");
+}
+
+std::string AbsoluteName(const std::string& file) {
+  if (file.find('|') != std::string::npos) {
+    throw HostError(kExitUsage, file + ": a job can't carry a name with | in it; rename the file");
+  }
+  if (String(file).ToUTF8() != file) {
+    throw HostError(kExitUsage, file + ": the name is no UTF-8; rename the file");
+  }
+  if (file.empty()) throw HostError(kExitUsage, "a file's name is empty");
+  if (file.find("://") != std::string::npos) return file;
+  return std::filesystem::absolute(file).string();
+}
+
+Array<String> ConnStringsOf(const SourceOptions& source) {
+  const std::string name = AbsoluteName(source.file);
+  if (source.format.empty()) return ConnStrings({String(name)});
+  if (FindFormat(String(source.format)) == nullptr) {
+    throw HostError(kExitUsage, "--input-format: there is no format \"" + source.format +
+                                    "\"; see vexg formats");
+  }
+  return ConnStrings({String(source.format), String(name)});
+}
+
+void AddOpen(JobDraft& draft, const std::string& name, const SourceOptions& source) {
+  draft.Open(name, "OpenRasterCommand").AddInput("ConnStr", ConnStringsOf(source));
+}
+
+std::string PathOf(const String& uri) {
+  return PathOfFileURI(ParseValue<URI>(uri));
+}
+
+void AddQuery(JobDraft& draft, const std::string& name, const String& raster) {
+  draft.Step(name + ".query", "ExtendedQueryRasterCommand").AddInput("URI", raster);
+  draft.Step(name + ".georef", "GetRasterGeoRefCommand").AddInput("URI", raster);
+}
+
+RasterInfo ReadInfo(const JobResults& results, const std::string& name) {
+  const Map<String, String>& query = results.Find(String(name + ".query")).returns;
+  RasterInfo info;
+  info.samples = ParseValue<unsigned>(query.Find("Samples"));
+  info.lines = ParseValue<unsigned>(query.Find("Lines"));
+  info.bands = ParseValue<unsigned>(query.Find("Bands"));
+  info.dataType = ParseDataType(query.Find("DataType"));
+  info.format = query.Find("Format");
+  info.interleave = ParseValue<Interleave>(query.Find("Interleave"));
+  info.tiles = ParseValue<TileDimensions>(query.Find("TileDimensions"));
+  info.canWrite = ParseValue<bool>(query.Find("CanWrite"));
+  info.hasPyramid = ParseValue<bool>(query.Find("PyramidExists"));
+  info.hasNoData = ParseValue<Array<bool>>(query.Find("HasNoDataValue"));
+  info.noData = query.Find("NoDataValue");
+  info.hasPalette = ParseValue<Array<bool>>(query.Find("HasPalette"));
+  info.geoRefText = results.Find(String(name + ".georef")).returns.Find("GeoRef");
+  info.geoRef = ParseValue<GeoRefPtr>(info.geoRefText);
+  const bool hasPixels = info.samples != 0 && info.lines != 0 && info.bands != 0;
+  if (!hasPixels || DataTypeBytes(info.dataType) == 0 || info.hasNoData.GetCount() != info.bands ||
+      info.hasPalette.GetCount() != info.bands) {
+    throw HostError(kExitFailed, "the raster holds no pixels");
+  }
+  if (info.geoRef) info.geoRef->SetDimensions(info.samples, info.lines);
+  return info;
+}
+
+Interleave ParseInterleave(const std::string& word) {
+  return word == "bsq" ? Interleave::BSQ : word == "bil" ? Interleave::BIL : Interleave::BIP;
+}
+
+SubRect ParseRect(const std::string& text, const RasterInfo& info) {
+  if (text.empty()) return info.GetRect();
+  std::vector<unsigned> n;
+  if (!ParseNumbers(text, n) || n.size() != 4 || n[0] > n[2] || n[1] > n[3]) {
+    throw HostError(kExitUsage, "--rect: \"" + text +
+                                    "\" is not left,top,right,bottom, counted from 0 and "
+                                    "inclusive");
+  }
+  if (n[2] >= info.samples || n[3] >= info.lines) {
+    throw HostError(kExitUsage, fmt::format("--rect: {} reaches over the raster's {} by {} pixels",
+                                            text, info.samples, info.lines));
+  }
+  return {n[0], n[1], n[2], n[3]};
+}
+
+Array<unsigned> ParseBands(const std::string& text, const RasterInfo& info) {
+  std::vector<unsigned> numbers;
+  if (text.empty()) {
+    for (unsigned band = 0; band < info.bands; ++band) numbers.push_back(band);
+  } else if (!ParseNumbers(text, numbers)) {
+    throw HostError(kExitUsage, "--bands: \"" + text + "\" is not a list of bands such as 0,2,1");
+  }
+  Array<unsigned> bands{ArrayDims(static_cast<unsigned>(numbers.size()))};
+  for (unsigned i = 0; i < bands.GetCount(); ++i) {
+    if (numbers[i] >= info.bands) {
+      throw HostError(kExitUsage, fmt::format("--bands: the raster has no band {}, only 0 to {}",
+                                              numbers[i], info.bands - 1));
+    }
+    bands[i] = numbers[i];
+  }
+  return bands;
+}
+
+}  // namespace lumo::host

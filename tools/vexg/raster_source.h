@@ -1,0 +1,74 @@
+#pragma once
+
+#include <string>
+#include <vector>
+
+#include "georef/georef.h"
+#include "raster/raster_enums.h"
+#include "raster/tile_dimensions.h"
+#include "raster_job.h"
+
+namespace lumo::host {
+
+/// A raster source as the command line names it.
+struct SourceOptions {
+  std::string file;
+  std::string format;  ///< key; empty: to be detected
+
+  void AddTo(CLI::App& app);
+  void AddFormatTo(CLI::App& app);
+};
+
+/// `file` as a server with another working directory finds it. Names that aren't paths, such as
+/// addresses, stay as they are. Throws HostError for one that a job document can't carry.
+std::string AbsoluteName(const std::string& file);
+
+/// The connection strings of a source.
+Array<String> ConnStringsOf(const SourceOptions& source);
+
+/// What a raster tells of itself.
+struct RasterInfo {
+  unsigned samples = 0;
+  unsigned lines = 0;
+  unsigned bands = 0;
+  unsigned dataType = 0;  ///< code
+  String format;
+  Interleave interleave = Interleave::None;
+  TileDimensions tiles;  ///< blocks of the source; 0 where it has none
+  bool canWrite = false;
+  bool hasPyramid = false;
+  Array<bool> hasNoData;  ///< for each band
+  String noData;          ///< text of an array of the pixel type, for each band
+  Array<bool> hasPalette;
+  GeoRefPtr geoRef;  ///< with its size set; empty when there is none
+  String geoRefText;
+
+  SubRect GetRect() const { return {0, 0, samples - 1, lines - 1}; }
+};
+
+/// Adds the command that opens a source, into the variable "$" name.
+void AddOpen(JobDraft& draft, const std::string& name, const SourceOptions& source);
+
+/// The file behind an open raster.
+/// @param uri  as a command gives it.
+std::string PathOf(const String& uri);
+
+/// Adds the commands that ask a raster what it is.
+/// @param name    stands in front of the names of the commands.
+/// @param raster  a variable or URI.
+void AddQuery(JobDraft& draft, const std::string& name, const String& raster);
+
+/// What the commands of AddQuery said. Throws HostError for what can't be.
+RasterInfo ReadInfo(const JobResults& results, const std::string& name);
+
+/// The order that "bip", "bil" or "bsq" names.
+Interleave ParseInterleave(const std::string& word);
+
+/// The rectangle "left,top,right,bottom", all of the raster for no text. Throws HostError for one
+/// that isn't inside.
+SubRect ParseRect(const std::string& text, const RasterInfo& info);
+
+/// The bands "0,2,1", all for no text. Throws HostError for one that the raster lacks.
+Array<unsigned> ParseBands(const std::string& text, const RasterInfo& info);
+
+}  // namespace lumo::host
