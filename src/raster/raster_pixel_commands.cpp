@@ -102,11 +102,12 @@ class GetRasterSubRectCommand final : public BlockCommand {
 
 const CommandFactoryT<GetRasterSubRectCommand> getFactory(kGet);
 
-const CommandDeclaration kPut{"PutRasterSubRectCommand",
-                              "Pixels",
-                              "Writes a block of pixels from named memory.",
-                              BlockInputs(),
-                              {{"Return", ValueKind::kBoolean, "the whole block was taken"}, kFault}};
+const CommandDeclaration kPut{
+    "PutRasterSubRectCommand",
+    "Pixels",
+    "Writes a block of pixels from named memory.",
+    BlockInputs(),
+    {{"Return", ValueKind::kBoolean, "the whole block was taken"}, kFault}};
 
 class PutRasterSubRectCommand final : public BlockCommand {
   CommandResult Execute() override {
