@@ -28,12 +28,13 @@ struct Maker {
   const char* driver;
   bool isCopied;        ///< written in one go
   const char* options;  ///< separated by blanks; those that keep every value
+  bool roundsGrid = false;
 };
 constexpr Maker kMakers[] = {
     {"GTiff", false, "BIGTIFF=IF_SAFER"},
     {"HFA", false, ""},
     {"BMP", true, ""},
-    {"NITF", true, ""},
+    {"NITF", true, "", true},  // corners to the metre or the second
     {"PNG", true, ""},
     {"GIF", true, ""},
     {"JPEG", true, "QUALITY=95"},  // the one format here that loses something
@@ -187,9 +188,11 @@ bool NewRaster::CheckTarget() const {
 bool NewRaster::TryTheFormat() {
   if (!FindMaker(driver_)->isCopied) return true;
   std::string fault;
+  isBare_ = bool(def_.geoRef) && FindMaker(driver_)->roundsGrid;
   if (TrySample(fault)) return true;
+  const bool canBeBare = bool(def_.geoRef) && !isBare_;
   isBare_ = true;
-  return (def_.geoRef && TrySample(fault)) || Fail(fault);
+  return (canBeBare && TrySample(fault)) || Fail(fault);
 }
 
 bool NewRaster::TrySample(std::string& fault) const {

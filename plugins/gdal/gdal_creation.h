@@ -59,7 +59,7 @@ class NewRaster {
   const std::string temporary_;  // of the format, beside the place
   std::string scratch_;          // the TIFF file that the copy is made from
   std::vector<std::optional<StoredHistogram>> histograms_;  // which a copy leaves behind
-  bool isBare_ = false;                                     // the format refuses the geo-reference
+  bool isBare_ = false;  // the geo-reference goes beside the file
   bool isDoomed_ = false;
 };
 

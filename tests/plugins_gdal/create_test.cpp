@@ -166,10 +166,17 @@ TEST(GdalCreation, KeepsGridCoordinateSystemAndNoData) {
     const char* extension;
     double rotation;
     bool byBand;  // a no-data value for each band
-  } cases[] = {{"TIFF", ".tif", 0, false},   {"TIFF", ".tif", 30, true},
-               {"Erdas", ".img", 0, true},   {"NITF", ".ntf", 0, false},
-               {"PNG", ".png", 0, false},    {"JPEG2000", ".jp2", 0, false},
-               {"Erdas", ".img", 30, false}, {"PNG", ".png", 30, true}};
+    const char* system = "EPSG:31985";
+  } cases[] = {{"NITF", ".ntf", 0, true, "EPSG:32725"},
+               {"NITF", ".ntf", 0, false, "EPSG:4326"},
+               {"TIFF", ".tif", 0, false},
+               {"TIFF", ".tif", 30, true},
+               {"Erdas", ".img", 0, true},
+               {"NITF", ".ntf", 0, false},
+               {"PNG", ".png", 0, false},
+               {"JPEG2000", ".jp2", 0, false},
+               {"Erdas", ".img", 30, false},
+               {"PNG", ".png", 30, true}};
   test::TemporaryDirectory directory;
   for (const auto& c : cases) {
     SCOPED_TRACE(std::string(c.format) + (c.rotation != 0 ? " rotated" : ""));
@@ -181,7 +188,7 @@ TEST(GdalCreation, KeepsGridCoordinateSystemAndNoData) {
     grid.SetTiePixel(10, 4);
     grid.SetTieMap(288776.25, 9120760.75);
     grid.SetRotation(c.rotation);
-    grid.SetCoordinateSystem(test::MakeCoordSys("EPSG:31985"));
+    grid.SetCoordinateSystem(test::MakeCoordSys(c.system));
     def.SetGeoRef(GeoRefPtr(grid.Clone()));
     for (unsigned band = 0; band < 3; ++band) def.noData[band] = c.byBand ? band + 7 : 7;
     auto made = CreateSource({path}, def);
