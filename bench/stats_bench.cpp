@@ -1,10 +1,13 @@
 #include <cmath>
 #include <cstdlib>
 #include <cstring>
+#include <numeric>
 
 #include <benchmark/benchmark.h>
 
 #include "raster/raster_tasks.h"
+#include "stats/dynamic_raster_histogram.h"
+#include "stats/dynamic_raster_stats.h"
 #include "stats/raster_stats_process.h"
 #include "support/test_rasters.h"
 #include "tasks/thread_limit.h"
@@ -31,8 +34,8 @@ Pointer<OrderedTestRaster<T>> MakeScene(unsigned bands, Interleave order, bool h
 
 template <typename T>
 void SetBytes(benchmark::State& state, unsigned bands) {
-  state.SetBytesProcessed(static_cast<std::int64_t>(state.iterations()) * kSamples * kLines * bands *
-                          static_cast<std::int64_t>(sizeof(T)));
+  state.SetBytesProcessed(static_cast<std::int64_t>(state.iterations()) * kSamples * kLines *
+                          bands * static_cast<std::int64_t>(sizeof(T)));
 }
 
 /// Copies pixels and states once: what any read of a raster in memory does.
@@ -101,6 +104,29 @@ void Statistics(benchmark::State& state) {
   SetBytes<T>(state, kBands);
 }
 
+/// Arguments: threads, bins, 1 for statistics of the same raster at the same time.
+template <typename T, unsigned kBands, Interleave kOrder>
+void Histogram(benchmark::State& state) {
+  const ThreadLimit limit(static_cast<unsigned>(state.range(0)));
+  const auto scene = MakeScene<T>(kBands, kOrder);
+  const auto bins = static_cast<unsigned>(state.range(1));
+  DynamicRasterHistogram<T> histogram(scene.Get());
+  DynamicRasterStats<T> stats(scene.Get());
+  for (auto _ : state) {
+    AsyncPtr both[2] = {histogram.HistogramAllBands(0, 255, bins, HistogramSign::kBoth, IPC()), {}};
+    if (state.range(2) != 0) both[1] = stats.StatsBuild(IPC());
+    for (const AsyncPtr& run : both) {
+      if (run) run->WaitFinished();
+    }
+  }
+  // Checked after the runs, which all leave the same: every pixel is in one bin.
+  const auto counts = histogram.BandHistogram(kBands - 1)[0].counts;
+  if (std::accumulate(counts.begin(), counts.end(), 0ULL) != std::uint64_t{kSamples} * kLines) {
+    std::abort();
+  }
+  SetBytes<T>(state, kBands);
+}
+
 /// The running form, pixel by pixel, on one thread.
 template <typename T, unsigned kBands>
 void Baseline_RunningForm(benchmark::State& state) {
@@ -108,32 +134,56 @@ void Baseline_RunningForm(benchmark::State& state) {
   for (auto _ : state) {
     std::vector<LargeStatsAccumulator<T>> bands(kBands);
     for (std::size_t i = 0; i < scene->pixels.size(); ++i) {
-      if ((scene->states[i] & PixelValueState::NotValid) == 0) bands[i % kBands].Add(scene->pixels[i]);
+      if ((scene->states[i] & PixelValueState::NotValid) == 0)
+        bands[i % kBands].Add(scene->pixels[i]);
     }
     benchmark::DoNotOptimize(bands.data());
   }
   SetBytes<T>(state, kBands);
 }
 
-#define VEXG_STATS_ARGS ->UseRealTime()->Unit(benchmark::kMillisecond)
 constexpr Interleave kBIP = Interleave::BIP;
 constexpr Interleave kBIL = Interleave::BIL;
 constexpr Interleave kBSQ = Interleave::BSQ;
 
-#define VEXG_STATS_TYPE(T)                                                                        \
-  BENCHMARK(Baseline_Copy<T, 6>) VEXG_STATS_ARGS;                                                  \
-  BENCHMARK(Baseline_Read<T, 6>) VEXG_STATS_ARGS;                                                  \
-  BENCHMARK(Statistics<T, RasterStats, 6, kBIP>)->ArgsProduct({{1, 2}, {1024}, {0, 1}}) VEXG_STATS_ARGS; \
-  BENCHMARK(Statistics<T, RasterStats, 6, kBSQ>)->ArgsProduct({{1, 2}, {1024}, {0, 1}}) VEXG_STATS_ARGS; \
-  BENCHMARK(Statistics<T, ExtendedRasterStats, 6, kBIP>)->ArgsProduct({{1, 2}, {1024}, {0, 1}}) VEXG_STATS_ARGS
+void Timed(benchmark::internal::Benchmark* bench) {
+  bench->UseRealTime()->MeasureProcessCPUTime()->Unit(benchmark::kMillisecond);
+}
+void OnThreads(benchmark::internal::Benchmark* bench) {
+  bench->ArgsProduct({{1, 2}, {1024}, {0, 1}})->Apply(Timed);
+}
+void OfBlocks(benchmark::internal::Benchmark* bench) {
+  bench->ArgsProduct({{2}, {128, 256, 512, 1024, 2048, 4096, 8192}, {0}})->Apply(Timed);
+}
+void Histograms(benchmark::internal::Benchmark* bench) {
+  bench->ArgsProduct({{1, 2}, {256}, {0, 1}})->Apply(Timed);
+}
 
-VEXG_STATS_TYPE(std::uint8_t);
-VEXG_STATS_TYPE(std::uint16_t);
-VEXG_STATS_TYPE(float);
-BENCHMARK(Statistics<float, RasterStats, 4, kBIL>)->Args({2, 1024, 0}) VEXG_STATS_ARGS;
-BENCHMARK(Baseline_RunningForm<float, 6>) VEXG_STATS_ARGS;
-BENCHMARK(Statistics<std::uint8_t, RasterStats, 4, kBIP>)->ArgsProduct({{2}, {128, 256, 512, 1024, 2048, 4096, 8192}, {0}}) VEXG_STATS_ARGS;
-BENCHMARK(Statistics<float, RasterStats, 4, kBIP>)->ArgsProduct({{2}, {128, 256, 512, 1024, 2048, 4096, 8192}, {0}}) VEXG_STATS_ARGS;
+BENCHMARK(Baseline_Copy<std::uint8_t, 6>)->Apply(Timed);
+BENCHMARK(Baseline_Read<std::uint8_t, 6>)->Apply(Timed);
+BENCHMARK(Statistics<std::uint8_t, RasterStats, 6, kBIP>)->Apply(OnThreads);
+BENCHMARK(Statistics<std::uint8_t, RasterStats, 6, kBSQ>)->Apply(OnThreads);
+BENCHMARK(Statistics<std::uint8_t, ExtendedRasterStats, 6, kBIP>)->Apply(OnThreads);
+BENCHMARK(Histogram<std::uint8_t, 6, kBIP>)->Apply(Histograms);
+
+BENCHMARK(Baseline_Copy<std::uint16_t, 6>)->Apply(Timed);
+BENCHMARK(Baseline_Read<std::uint16_t, 6>)->Apply(Timed);
+BENCHMARK(Statistics<std::uint16_t, RasterStats, 6, kBIP>)->Apply(OnThreads);
+BENCHMARK(Statistics<std::uint16_t, RasterStats, 6, kBSQ>)->Apply(OnThreads);
+BENCHMARK(Statistics<std::uint16_t, ExtendedRasterStats, 6, kBIP>)->Apply(OnThreads);
+BENCHMARK(Histogram<std::uint16_t, 6, kBIP>)->Apply(Histograms);
+
+BENCHMARK(Baseline_Copy<float, 6>)->Apply(Timed);
+BENCHMARK(Baseline_Read<float, 6>)->Apply(Timed);
+BENCHMARK(Statistics<float, RasterStats, 6, kBIP>)->Apply(OnThreads);
+BENCHMARK(Statistics<float, RasterStats, 6, kBIL>)->Apply(OnThreads);
+BENCHMARK(Statistics<float, RasterStats, 6, kBSQ>)->Apply(OnThreads);
+BENCHMARK(Statistics<float, ExtendedRasterStats, 6, kBIP>)->Apply(OnThreads);
+BENCHMARK(Histogram<float, 6, kBIP>)->Apply(Histograms);
+BENCHMARK(Baseline_RunningForm<float, 6>)->Apply(Timed);
+
+BENCHMARK(Statistics<std::uint8_t, RasterStats, 4, kBIP>)->Apply(OfBlocks);
+BENCHMARK(Statistics<float, RasterStats, 4, kBIP>)->Apply(OfBlocks);
 
 }  // namespace
 }  // namespace lumo

@@ -1,6 +1,8 @@
 #pragma once
 
 #include <cstring>
+#include <memory>
+#include <vector>
 
 #include "stats/extended_raster_stats.h"
 #include "stats/raster_stats_impl.h"
@@ -9,7 +11,7 @@ namespace lumo {
 
 /// The sums between the bands of one part of a tile. Values are taken less a shift for each band,
 /// which is near its mean, or 0 where sums are exact: sums of integers of up to 16 bits are exact
-/// as doubles within a plane.
+/// as doubles within a plane, and those of 8 bits as integers.
 ///
 /// While all bands are valid in the same pixels, one count and one sum for each band serve all
 /// pairs. Where they are not, the sums are over the pixels that two bands have in common: sums of
@@ -19,6 +21,8 @@ class ExtendedRasterStats<T>::PairSums {
  public:
   static constexpr bool kExact = std::is_same_v<PairAccumulator, ExactPairAccumulator>;
   using Sum = std::conditional_t<kExact, std::int64_t, double>;
+  using Value = std::conditional_t<sizeof(T) == 1, std::int16_t, double>;  // of a plane
+  using Product = std::conditional_t<sizeof(T) == 1, std::int32_t, double>;
 
   explicit PairSums(unsigned bands)
       : bands_(bands), shifts_(bands), seen_(bands), sums_(bands), products_(Square()) {}
@@ -26,18 +30,21 @@ class ExtendedRasterStats<T>::PairSums {
   /// Starts a group of `count` pixels.
   void Begin(std::size_t count) {
     count_ = count;
-    planes_.resize(count * bands_);
+    if (count * bands_ > room_) {
+      room_ = count * bands_;
+      planes_ = std::make_unique_for_overwrite<Value[]>(room_);
+    }
     partial_ = false;
     groupCounts_.assign(bands_, count);
     groupSums_.assign(bands_, 0);
   }
 
   void SetBand(unsigned band, const SummedPlane<T>& plane) {
-    double* const values = planes_.data() + band * count_;
+    Value* const values = planes_.get() + band * count_;
     groupCounts_[band] = plane.valid.count;
     if (plane.valid.count == 0) {
-      std::fill_n(values, count_, 0.0);
-      std::fill_n(WeightsOf(band), count_, 0.0);
+      std::fill_n(values, count_, Value(0));
+      std::fill_n(WeightsOf(band), count_, Value(0));
       return;
     }
     const auto valid = static_cast<double>(plane.valid.count);
@@ -57,7 +64,11 @@ class ExtendedRasterStats<T>::PairSums {
       groupSums_[band] = (mean - shifts_[band]) * valid;
     }
     seen_[band] = true;
-    Widen(plane.valid.values, count_, shifts_[band], values);
+    if constexpr (sizeof(T) == 1) {
+      Widen(plane.valid.values, count_, values);
+    } else {
+      Widen(plane.valid.values, count_, shifts_[band], values);
+    }
     if (plane.valid.mask != nullptr) {
       WeighPlane(plane.valid.mask, count_, values, WeightsOf(band));
     }
@@ -91,12 +102,12 @@ class ExtendedRasterStats<T>::PairSums {
  private:
   std::size_t Square() const { return std::size_t{bands_} * bands_; }
   std::size_t At(unsigned i, unsigned j) const { return std::size_t{i} * bands_ + j; }
-  const double* Plane(unsigned band) const { return planes_.data() + band * count_; }
-  const double* Weights(unsigned band) const { return weights_.data() + band * count_; }
+  const Value* Plane(unsigned band) const { return planes_.get() + band * count_; }
+  const Value* Weights(unsigned band) const { return weights_.data() + band * count_; }
 
   /// The weights of a band, to be written; those of the bands without any are 1.
-  double* WeightsOf(unsigned band) {
-    if (!partial_) weights_.assign(count_ * bands_, 1.0);
+  Value* WeightsOf(unsigned band) {
+    if (!partial_) weights_.assign(count_ * bands_, Value(1));
     partial_ = true;
     return weights_.data() + band * count_;
   }
@@ -105,14 +116,14 @@ class ExtendedRasterStats<T>::PairSums {
     if (!partial_) return true;
     for (unsigned band = 1; band < bands_; ++band) {
       if (groupCounts_[band] != groupCounts_[0] ||
-          std::memcmp(Weights(band), Weights(0), count_ * sizeof(double)) != 0) {
+          std::memcmp(Weights(band), Weights(0), count_ * sizeof(Value)) != 0) {
         return false;
       }
     }
     return true;
   }
 
-  void DotAndAdd(const double* x, const double* y, std::size_t planes, Sum* sums) {
+  void DotAndAdd(const Value* x, const Value* y, std::size_t planes, Sum* sums) {
     dots_.resize(bands_);
     Dot(x, y, planes, count_, count_, dots_.data());
     for (std::size_t i = 0; i < planes; ++i) sums[i] += static_cast<Sum>(dots_[i]);
@@ -156,11 +167,12 @@ class ExtendedRasterStats<T>::PairSums {
   // The group at hand.
   std::size_t count_ = 0;
   bool partial_ = false;
-  std::vector<double> planes_;
-  std::vector<double> weights_;
+  std::size_t room_ = 0;
+  std::unique_ptr<Value[]> planes_;
+  std::vector<Value> weights_;
   std::vector<std::size_t> groupCounts_;
   std::vector<Sum> groupSums_;
-  std::vector<double> dots_;
+  std::vector<Product> dots_;
 };
 
 template <typename T>

@@ -18,28 +18,31 @@ struct HistogramBins {
 
   /// The bin of a value; `count` for one that doesn't count.
   [[gnu::always_inline]] std::uint32_t Find(T value) const {
-    const bool inside = value >= lower && value <= upper;
     if constexpr (std::is_integral_v<T> && sizeof(T) == 8) {
-      if (!inside) return count;
+      if (value < lower || value > upper) return count;
       const std::uint64_t above =
           static_cast<std::uint64_t>(value) - static_cast<std::uint64_t>(min);
-      if (size < 1) return Cut(static_cast<double>(above) / size);
+      if (size < 1) {
+        const double bin = static_cast<double>(above) / size;
+        return bin < count ? static_cast<std::uint32_t>(bin) : count;
+      }
       const std::uint64_t bin = wholeSize == 1 ? above : above / wholeSize;
       return bin < count ? static_cast<std::uint32_t>(bin) : count;
-    } else if constexpr (std::is_integral_v<T>) {
-      // A quotient of 32-bit integers never rounds up to the next whole number.
-      const double bin = (static_cast<double>(value) - static_cast<double>(min)) / size;
-      return Cut(inside ? bin : count);
     } else {
-      const double bin = static_cast<double>(value - min) / size;
-      return Cut(inside ? bin : count);
+      // As doubles throughout, which hold the values of all other types, and without a branch. A
+      // quotient of 32-bit integers never rounds up to the next whole number.
+      const auto v = static_cast<double>(value);
+      double above = v - static_cast<double>(min);
+      if constexpr (std::is_floating_point_v<T>) above = static_cast<double>(value - min);
+      const double most = count;
+      const double tooLow = v >= static_cast<double>(lower) ? 0.0 : most;
+      const double tooHigh = v <= static_cast<double>(upper) ? 0.0 : most;
+      double bin = above / size;
+      bin = bin < most ? bin : most;
+      bin = bin > tooLow ? bin : tooLow;
+      bin = bin > tooHigh ? bin : tooHigh;
+      return static_cast<std::uint32_t>(static_cast<std::int32_t>(bin));
     }
-  }
-
- private:
-  [[gnu::always_inline]] std::uint32_t Cut(double bin) const {
-    const double most = count;
-    return static_cast<std::uint32_t>(static_cast<std::int32_t>(bin < most ? bin : most));
   }
 };
 

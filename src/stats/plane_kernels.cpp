@@ -345,10 +345,27 @@ void Widen(const std::int64_t* values, std::size_t count, double shift, double* 
 }
 
 VEXG_VECTOR_CLONES
+void Widen(const std::uint8_t* values, std::size_t count, std::int16_t* out) {
+  for (std::size_t i = 0; i < count; ++i) out[i] = values[i];
+}
+VEXG_VECTOR_CLONES
+void Widen(const std::int8_t* values, std::size_t count, std::int16_t* out) {
+  for (std::size_t i = 0; i < count; ++i) out[i] = values[i];
+}
+
+VEXG_VECTOR_CLONES
 void WeighPlane(const unsigned char* mask, std::size_t count, double* plane, double* weights) {
   for (std::size_t i = 0; i < count; ++i) {
     weights[i] = static_cast<double>(mask[i] & 1);
     plane[i] *= weights[i];
+  }
+}
+VEXG_VECTOR_CLONES
+void WeighPlane(const unsigned char* mask, std::size_t count, std::int16_t* plane,
+                std::int16_t* weights) {
+  for (std::size_t i = 0; i < count; ++i) {
+    weights[i] = mask[i] & 1;
+    plane[i] = static_cast<std::int16_t>(plane[i] * weights[i]);
   }
 }
 
@@ -361,6 +378,17 @@ void Dot(const double* x, const double* y, std::size_t planes, std::size_t strid
     DotOf<kAtOnce>(x, y + p * stride, stride, count, out + p);
   }
   for (; p < planes; ++p) DotOf<1>(x, y + p * stride, stride, count, out + p);
+}
+
+VEXG_VECTOR_CLONES
+void Dot(const std::int16_t* x, const std::int16_t* y, std::size_t planes, std::size_t stride,
+         std::size_t count, std::int32_t* out) {
+  for (std::size_t p = 0; p < planes; ++p) {
+    const std::int16_t* const other = y + p * stride;
+    std::int32_t sum = 0;
+    for (std::size_t i = 0; i < count; ++i) sum += x[i] * other[i];
+    out[p] = sum;
+  }
 }
 
 }  // namespace lumo

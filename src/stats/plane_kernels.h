@@ -94,13 +94,22 @@ void Widen(const double* values, std::size_t count, double shift, double* out);
 void Widen(const std::uint64_t* values, std::size_t count, double shift, double* out);
 void Widen(const std::int64_t* values, std::size_t count, double shift, double* out);
 
+/// Values of 8 bits as integers whose products are quicker to sum.
+void Widen(const std::uint8_t* values, std::size_t count, std::int16_t* out);
+void Widen(const std::int8_t* values, std::size_t count, std::int16_t* out);
+
 /// Makes a plane that of its valid values alone: one that isn't valid becomes 0, and its weight is
 /// 0, where that of others is 1.
 void WeighPlane(const unsigned char* mask, std::size_t count, double* plane, double* weights);
+void WeighPlane(const unsigned char* mask, std::size_t count, std::int16_t* plane,
+                std::int16_t* weights);
 
 /// The sums of the products of plane `x` with each of `planes` planes, which lie `stride` values
 /// apart from `y` on.
 void Dot(const double* x, const double* y, std::size_t planes, std::size_t stride,
          std::size_t count, double* out);
+/// The same for what Widen makes of 8 bits.
+void Dot(const std::int16_t* x, const std::int16_t* y, std::size_t planes, std::size_t stride,
+         std::size_t count, std::int32_t* out);
 
 }  // namespace lumo

@@ -1,7 +1,7 @@
 #pragma once
 
 #include <algorithm>
-#include <vector>
+#include <memory>
 
 #include "raster/interleave.h"
 #include "raster/tile.h"
@@ -95,17 +95,23 @@ class PlaneWalk {
   }
 
   PlaneGroup<T> Parted(std::size_t first, std::size_t count) {
-    partedValues_.resize(groupPixels_ * bands_);
-    ConvertInterleave(values_ + first, Interleave::BIP, partedValues_.data(), Interleave::BSQ,
-                      count, 1, bands_, sizeof(T));
-    PlaneGroup<T> group{partedValues_.data(), nullptr, count, count};
+    Provide(partedValues_);
+    ConvertInterleave(values_ + first, Interleave::BIP, partedValues_.get(), Interleave::BSQ, count,
+                      1, bands_, sizeof(T));
+    PlaneGroup<T> group{partedValues_.get(), nullptr, count, count};
     if (!AllValid(states_ + first, count * bands_)) {
-      partedStates_.resize(groupPixels_ * bands_);
-      ConvertInterleave(states_ + first, Interleave::BIP, partedStates_.data(), Interleave::BSQ,
+      Provide(partedStates_);
+      ConvertInterleave(states_ + first, Interleave::BIP, partedStates_.get(), Interleave::BSQ,
                         count, 1, bands_, 1);
-      group.states = partedStates_.data();
+      group.states = partedStates_.get();
     }
     return group;
+  }
+
+  /// Makes memory for a group, which holds anything.
+  template <typename E>
+  void Provide(std::unique_ptr<E[]>& parted) const {
+    if (!parted) parted = std::make_unique_for_overwrite<E[]>(groupPixels_ * bands_);
   }
 
   const T* values_;
@@ -113,8 +119,8 @@ class PlaneWalk {
   const Tile<T>& tile_;
   std::size_t bands_;
   std::size_t groupPixels_;
-  std::vector<T> partedValues_;
-  std::vector<unsigned char> partedStates_;
+  std::unique_ptr<T[]> partedValues_;
+  std::unique_ptr<unsigned char[]> partedStates_;
 };
 
 /// The valid values of one plane.

@@ -1,6 +1,8 @@
 #include "output_file.h"
 
+#include <algorithm>
 #include <cerrno>
+#include <iterator>
 #include <system_error>
 
 #include <fmt/format.h>
@@ -12,6 +14,9 @@ namespace lumo::host {
 namespace {
 
 namespace fs = std::filesystem;
+
+/// What the names of files that describe another one have at the end.
+constexpr const char* kSideEndings[] = {".hdr", ".aux.xml", ".ovr", ".msk"};
 
 std::string LastFault() {
   const int code = errno;
@@ -49,7 +54,8 @@ void OutputFile::RefuseInput(const std::string& input) {
   const fs::path source = InResolvedFolder(input);
   const fs::path target = InResolvedFolder(target_);
   const bool goesWithIt =
-      fs::exists(target, fault) && target.string().rfind(source.string() + ".", 0) == 0;
+      std::any_of(std::begin(kSideEndings), std::end(kSideEndings),
+                  [&](const char* ending) { return target.string() == source.string() + ending; });
   if (target == source || goesWithIt || fs::equivalent(target, source, fault)) {
     Refuse("is a file of the input, or another output; nothing was run");
   }
@@ -112,9 +118,11 @@ void OutputFile::CheckSideFile(const fs::path& place) const {
 /// Removes what described the file that is being replaced.
 void OutputFile::RemoveLeftovers() const {
   std::error_code ignored;
-  for (const char* suffix : {".aux.xml", ".ovr", ".msk"}) {
+  for (const char* ending : kSideEndings) {
+    // "scene.hdr" may be of "scene.img" as well.
+    if (!target_.has_extension() && ending == std::string(".hdr")) continue;
     fs::path leftover = target_;
-    leftover += suffix;
+    leftover += ending;
     fs::remove(leftover, ignored);
   }
 }

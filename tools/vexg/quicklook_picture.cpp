@@ -39,6 +39,19 @@ std::vector<Span> GroupPositions(const std::vector<unsigned>& positions, unsigne
   return spans;
 }
 
+struct IndexRange {
+  std::size_t first;
+  std::size_t end;
+};
+
+/// Which of rising positions lie from `first` to `last`.
+IndexRange FindPositions(const std::vector<unsigned>& positions, unsigned first, unsigned last) {
+  const auto low = std::lower_bound(positions.begin(), positions.end(), first);
+  const auto high = std::upper_bound(low, positions.end(), last);
+  return {static_cast<std::size_t>(low - positions.begin()),
+          static_cast<std::size_t>(high - positions.begin())};
+}
+
 template <typename T>
 double AsDouble(T value) {
   return static_cast<double>(value);
@@ -119,10 +132,10 @@ template <typename T>
 void QuicklookPicture::TakeTyped(const SubRect& block, const T* pixels,
                                  const unsigned char* states) {
   const unsigned bands = bands_.GetCount();
-  for (std::size_t y = 0; y < lines_.size(); ++y) {
-    if (lines_[y] < block.top || lines_[y] > block.bottom) continue;
-    for (std::size_t x = 0; x < columns_.size(); ++x) {
-      if (columns_[x] < block.left || columns_[x] > block.right) continue;
+  const IndexRange rows = FindPositions(lines_, block.top, block.bottom);
+  const IndexRange columns = FindPositions(columns_, block.left, block.right);
+  for (std::size_t y = rows.first; y < rows.end; ++y) {
+    for (std::size_t x = columns.first; x < columns.end; ++x) {
       const std::size_t line = lines_[y] - block.top;
       const std::size_t at = (line * block.Width() + columns_[x] - block.left) * bands;
       for (unsigned band = 0; band < bands; ++band) {

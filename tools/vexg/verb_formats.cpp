@@ -107,9 +107,10 @@ bool TryToMake(JobSession& session, const Format& format, const fs::path& folder
     session.Run(draft);
   } catch (const HostError& error) {
     if (error.code == kExitNoServer) throw;
+    session.CheckInterrupt();
     return false;
   }
-  return format.key == "MemoryRaster" || !fs::is_empty(folder);
+  return !fs::is_empty(folder);
 }
 
 nlohmann::ordered_json AsJson(const std::vector<Format>& formats) {
@@ -143,9 +144,10 @@ int ListFormats(const Options& options) {
     std::cout << ListDraft().Write().ToUTF8() << '\n';
     return kExitSuccess;
   }
+  std::vector<Format> formats = ReadFormats(JobSession(options.job).Run(ListDraft()));
+  // A server may be kept from the folder of the trials.
   const TrialFolder folder;
-  JobSession session(options.job);
-  std::vector<Format> formats = ReadFormats(session.Run(ListDraft()));
+  JobSession session{RasterJobOptions()};
   for (Format& format : formats) {
     if (format.reads && format.kind == "raster") {
       format.writes = TryToMake(session, format, folder.Of(format));
@@ -159,7 +161,9 @@ const VerbRegistration registration(
     "formats", "Lists the formats of files, and which of them can be read and written here",
     [](CLI::App& app) {
       const auto options = std::make_shared<Options>();
-      app.footer("Example: vexg formats --json\n");
+      app.footer(
+          "Whether a format can be written is tried, in this process, with a raster of a few "
+          "pixels.\nExample: vexg formats --json\n");
       app.add_flag("--json", options->json, "As JSON");
       options->job.AddTo(app);
       return VerbRegistration::Work([options] { return ListFormats(*options); });

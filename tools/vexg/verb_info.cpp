@@ -170,7 +170,8 @@ std::string GeoRefAsText(const RasterInfo& info) {
   text += fmt::format("  system         {}\n", !name.empty()     ? name
                                                : !system.empty() ? system
                                                                  : "none");
-  text += fmt::format("  pixel size     {:.10g} {:.10g}\n", geoRef.PixelSizeX(), geoRef.PixelSizeY());
+  text +=
+      fmt::format("  pixel size     {:.10g} {:.10g}\n", geoRef.PixelSizeX(), geoRef.PixelSizeY());
   if (geoRef.GetType() != GeoRef::kRpc) {
     text += fmt::format("  tie point      pixel {} {} at {} {}\n", geoRef.TiePixelX(),
                         geoRef.TiePixelY(), geoRef.TieMapX(), geoRef.TieMapY());
@@ -228,6 +229,7 @@ int Info(const Options& options) {
       }
     } catch (const HostError& error) {
       if (error.code == kExitNoServer) throw;
+      session.CheckInterrupt();
       Say(error.what());
       code = std::max(code, error.code);
     }
