@@ -9,6 +9,7 @@
 #include "common/messages.h"
 #include "foundation/fault.h"
 #include "gdal_georef.h"
+#include "gdal_no_data.h"
 #include "gdal_side_file.h"
 #include "gdal_types.h"
 #include "platform/random_access_file.h"
@@ -19,7 +20,7 @@ namespace {
 namespace fs = std::filesystem;
 
 /// Up to this size a raster that is to be copied waits in memory.
-constexpr std::uint64_t kMaxBytesInMemory = 64 << 20;
+constexpr double kMaxBytesInMemory = 64 << 20;
 
 /// How the formats that can be made are made. What isn't here is only read: the drivers of GDAL
 /// that are left out make a file that differs from what was written.
@@ -27,12 +28,13 @@ struct Maker {
   const char* driver;
   bool isCopied;        ///< written in one go
   const char* options;  ///< separated by blanks; those that keep every value
+  bool roundsGrid = false;
 };
 constexpr Maker kMakers[] = {
     {"GTiff", false, "BIGTIFF=IF_SAFER"},
     {"HFA", false, ""},
     {"BMP", true, ""},
-    {"NITF", true, ""},
+    {"NITF", true, "", true},  // corners to the metre or the second
     {"PNG", true, ""},
     {"GIF", true, ""},
     {"JPEG", true, "QUALITY=95"},  // the one format here that loses something
@@ -64,8 +66,9 @@ std::string TemporaryPath(const std::string& path) {
   return platform::TemporaryPathBeside(path) + fs::path(path).extension().string();
 }
 
-std::uint64_t BytesOf(const RasterDef& def) {
-  return std::uint64_t{def.samples} * def.lines * def.bands * DataTypeBytes(def.dataType);
+/// A floating-point number: no size is too large for it.
+double BytesOf(const RasterDef& def) {
+  return 1.0 * def.samples * def.lines * def.bands * DataTypeBytes(def.dataType);
 }
 
 CPLStringList OptionsOf(const Maker& maker) {
@@ -100,15 +103,7 @@ bool SetNoData(GDALDatasetH dataset, const RasterDef& def) {
   for (const auto& [band, value] : def.noData) {
     if (band >= def.bands) continue;
     const GDALRasterBandH target = GDALGetRasterBand(dataset, static_cast<int>(band) + 1);
-    CPLErr result = CE_None;
-    if (def.dataType == kDataTypeOf<std::int64_t>) {
-      result = GDALSetRasterNoDataValueAsInt64(target, static_cast<std::int64_t>(value));
-    } else if (def.dataType == kDataTypeOf<std::uint64_t>) {
-      result = GDALSetRasterNoDataValueAsUInt64(target, static_cast<std::uint64_t>(value));
-    } else {
-      result = GDALSetRasterNoDataValue(target, value);
-    }
-    if (result != CE_None) return false;
+    if (!WriteNoData(target, value)) return false;
   }
   return true;
 }
@@ -193,9 +188,11 @@ bool NewRaster::CheckTarget() const {
 bool NewRaster::TryTheFormat() {
   if (!FindMaker(driver_)->isCopied) return true;
   std::string fault;
+  isBare_ = bool(def_.geoRef) && FindMaker(driver_)->roundsGrid;
   if (TrySample(fault)) return true;
+  const bool canBeBare = bool(def_.geoRef) && !isBare_;
   isBare_ = true;
-  return (def_.geoRef && TrySample(fault)) || Fail(fault);
+  return (canBeBare && TrySample(fault)) || Fail(fault);
 }
 
 bool NewRaster::TrySample(std::string& fault) const {
@@ -284,8 +281,11 @@ DatasetPtr NewRaster::CopyTo(const std::string& name, GDALDatasetH dataset) cons
                                    TRUE, options.List(), nullptr, nullptr));
 }
 
-bool NewRaster::CopyToFormat(DatasetPtr dataset) const {
+bool NewRaster::CopyToFormat(DatasetPtr dataset) {
   const Messages messages;
+  for (int band = 1; band <= static_cast<int>(def_.bands); ++band) {
+    histograms_.push_back(ReadStoredHistogram(GDALGetRasterBand(dataset.get(), band)));
+  }
   DatasetPtr copy = CopyTo(temporary_, dataset.get());
   const bool isMade = copy != nullptr;
   copy.reset();
@@ -295,7 +295,7 @@ bool NewRaster::CopyToFormat(DatasetPtr dataset) const {
 /// What the format has no room for.
 bool NewRaster::WriteBeside() const {
   const Messages messages;
-  const bool isSet = CompleteBeside(temporary_, driver_, def_);
+  const bool isSet = CompleteBeside(temporary_, driver_, def_, histograms_);
   return (isSet && !messages.HasError() && !messages.HasWarning()) || Fail(messages.Text());
 }
 

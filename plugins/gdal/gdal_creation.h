@@ -1,9 +1,12 @@
 #pragma once
 
 #include <memory>
+#include <optional>
 #include <string>
+#include <vector>
 
 #include "common/source.h"
+#include "gdal_band_values.h"
 #include "raster/raster_def.h"
 
 namespace lumo::gdal {
@@ -42,7 +45,7 @@ class NewRaster {
   DatasetPtr MakeDirectly() const;
   DatasetPtr MakeForCopy();
   bool Describe(GDALDatasetH dataset) const;
-  bool CopyToFormat(DatasetPtr dataset) const;
+  bool CopyToFormat(DatasetPtr dataset);
   DatasetPtr CopyTo(const std::string& name, GDALDatasetH dataset) const;
   bool WriteBeside() const;
   bool IsWhole() const;
@@ -55,7 +58,8 @@ class NewRaster {
   const RasterDef def_;
   const std::string temporary_;  // of the format, beside the place
   std::string scratch_;          // the TIFF file that the copy is made from
-  bool isBare_ = false;          // the format refuses the geo-reference
+  std::vector<std::optional<StoredHistogram>> histograms_;  // which a copy leaves behind
+  bool isBare_ = false;  // the geo-reference goes beside the file
   bool isDoomed_ = false;
 };
 

@@ -109,8 +109,8 @@ OpenRaster::~OpenRaster() {
 
 std::unique_ptr<OpenRaster> OpenRaster::Open(const Format& format, const Source& source) {
   std::unique_ptr<OpenRaster> raster(new OpenRaster(format, source));
-  return raster->TakeDataset(OpenToRead(format, source, raster->isThreaded_)) ? std::move(raster)
-                                                                              : nullptr;
+  DatasetPtr dataset = OpenToRead(format, source, raster->isThreaded_);
+  return raster->TakeDataset(std::move(dataset)) ? std::move(raster) : nullptr;
 }
 
 std::unique_ptr<OpenRaster> OpenRaster::Create(const Format& format, const Source& source,
@@ -138,8 +138,25 @@ bool OpenRaster::TakeDataset(DatasetPtr dataset) {
   return true;
 }
 
+/// Takes the dataset of a raster that was open before: its reader goes by what it was then.
+bool OpenRaster::TakeAgain(DatasetPtr dataset) {
+  const unsigned dataType = dataType_, bands = Bands();
+  const unsigned samples = levels_.at(0).samples, lines = levels_.at(0).lines;
+  const lumo::Interleave interleave = interleave_;
+  if (!TakeDataset(std::move(dataset))) return false;
+  const RasterLevel& full = levels_.at(0);
+  if (dataType_ == dataType && Bands() == bands && full.samples == samples && full.lines == lines &&
+      interleave_ == interleave) {
+    return true;
+  }
+  levels_.clear();
+  dataset_.reset();
+  return FailWith(Name(), "has become another raster since it was opened");
+}
+
 void OpenRaster::FindLevels() {
   levels_.clear();
+  if (dataset_ == nullptr) return;
   RasterLevel& full = levels_[0];
   full.dataset = dataset_.get();
   full.samples = SizeOf(GDALGetRasterXSize(full.dataset));
@@ -209,17 +226,13 @@ bool OpenRaster::CanWrite() {
 
 bool OpenRaster::OpenForUpdate() {
   if (isUpdated_) return true;
-  if (!CanWrite()) return FailWith(Name(), "can't be written");
+  if (levels_.empty() || !CanWrite()) return FailWith(Name(), "can't be written");
+  DatasetPtr updated = OpenDataset(source_, format_, GDAL_OF_RASTER | GDAL_OF_UPDATE);
+  canWrite_ = updated != nullptr ? Answer::kYes : Answer::kNo;
+  if (updated == nullptr) return false;
+  isUpdated_ = true;
   isThreaded_ = false;
-  levels_.clear();
-  dataset_.reset();
-  isUpdated_ = TakeDataset(OpenDataset(source_, format_, GDAL_OF_RASTER | GDAL_OF_UPDATE));
-  if (isUpdated_) return true;
-  canWrite_ = Answer::kNo;
-  const String fault = TakeFault();
-  TakeDataset(OpenToRead(format_, source_, isThreaded_));
-  SetFault(fault);
-  return false;
+  return TakeAgain(std::move(updated));
 }
 
 const RasterLevel* OpenRaster::CheckPlace(const BlockPlace& place) const {
@@ -257,8 +270,7 @@ bool OpenRaster::Transfer(GDALRWFlag direction, const BlockPlace& place, void* p
         pixels, at(place.width), at(place.height), type, at(place.bands.GetCount()), numbers.data(),
         strides.pixel, strides.line, strides.band, nullptr);
   }
-  for (unsigned i = 0; !isWhole && result == CE_None && i < place.bands.GetCount();
-       ++i) {
+  for (unsigned i = 0; !isWhole && result == CE_None && i < place.bands.GetCount(); ++i) {
     void* const first = static_cast<char*>(pixels) + strides.band * i;
     result = GDALRasterIOEx(level->bands[place.bands[i]], direction, at(place.left), at(place.top),
                             at(place.width), at(place.height), first, at(place.width),
@@ -274,14 +286,14 @@ bool OpenRaster::Read(const BlockPlace& place, void* pixels) {
   if (!isThreaded_ || CheckPlace(place) == nullptr) return false;
   // What a thread of GDAL has to say reaches nobody. Without them it says it here.
   isThreaded_ = false;
-  return TakeDataset(OpenDataset(source_, format_, GDAL_OF_RASTER)) &&
+  return TakeAgain(OpenDataset(source_, format_, GDAL_OF_RASTER)) &&
          Transfer(GF_Read, place, pixels);
 }
 
 bool OpenRaster::Write(const BlockPlace& place, const void* pixels) {
   if (place.level != 0) return FailWith(Name(), "a reduced level can't be written");
   if (CheckPlace(place) == nullptr || !OpenForUpdate()) return false;
-  if (newRaster_ == nullptr) ForgetStatistics(place.bands);
+  ForgetStatistics(place.bands);
   // GDAL only reads what it is given to write.
   if (Transfer(GF_Write, place, const_cast<void*>(pixels))) return true;
   if (newRaster_ != nullptr) newRaster_->Doom();
@@ -318,11 +330,17 @@ bool OpenRaster::BuildOverviews(const char* method, unsigned levelMin, unsigned 
   }
   if (factors.empty()) return FailWith(Name(), "no levels asked for");
   const Messages messages;
+  const bool hadLevels = levels_.size() > 1;
   const CPLErr result = GDALBuildOverviews(dataset_.get(), method, static_cast<int>(factors.size()),
                                            factors.data(), 0, nullptr, nullptr, nullptr);
   GDALFlushCache(dataset_.get());
   FindLevels();
-  return (result == CE_None && !messages.HasError()) || messages.Fail(Name());
+  if (result == CE_None && !messages.HasError()) return true;
+  messages.Fail(Name());
+  const String fault = TakeFault();
+  if (!hadLevels) DeleteOverviews();  // a half-made one would pass for a whole one
+  SetFault(fault);
+  return false;
 }
 
 bool OpenRaster::DeleteOverviews() {

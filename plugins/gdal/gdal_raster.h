@@ -48,12 +48,14 @@ class OpenRaster {
   const std::string& Name() const { return source_.name; }
   const std::string& FormatKey() const { return format_.key; }
   unsigned DataType() const { return dataType_; }  ///< code
-  unsigned Bands() const { return static_cast<unsigned>(levels_.at(0).bands.size()); }
+  unsigned Bands() const {
+    return levels_.empty() ? 0 : static_cast<unsigned>(levels_.at(0).bands.size());
+  }
   bool IsNew() const { return newRaster_ != nullptr; }
   lumo::Interleave Interleave() const { return interleave_; }
 
   /// The levels that can be read, by number: 0, and a range without gaps of those reductions by
-  /// powers of two that the source holds.
+  /// powers of two that the source holds. None when the source has gone since it was opened.
   const std::map<unsigned, RasterLevel>& Levels() const { return levels_; }
   const RasterLevel* FindLevel(unsigned level) const;
   bool HasBand(unsigned band) const { return band < Bands(); }
@@ -79,6 +81,7 @@ class OpenRaster {
  private:
   OpenRaster(const Format& format, const Source& source);
   bool TakeDataset(DatasetPtr dataset);
+  bool TakeAgain(DatasetPtr dataset);
   void FindLevels();
   bool Transfer(GDALRWFlag direction, const BlockPlace& place, void* pixels) const;
   const RasterLevel* CheckPlace(const BlockPlace& place) const;

@@ -13,7 +13,6 @@ template <typename T>
 class Reader final : public PlainRasterReader<T> {
  public:
   /// @param raster    outlives the reader.
-  /// @param metadata  of the source.
   Reader(RasterDataConnection* connection, OpenRaster& raster, const RasterDef& def);
 
   lumo::RasterDef RasterDef() override { return def_; }
@@ -36,12 +35,12 @@ class Reader final : public PlainRasterReader<T> {
   std::int32_t StatsMask() override;
   bool StatsExist(unsigned band) override;
   RasterBandStats<T> ReadStats(unsigned band) override;
-  bool CanWriteStats() override { return kHasStats && !raster_.IsNew(); }
+  bool CanWriteStats() override { return kHasStats; }
   bool WriteStats(const Array<RasterBandStats<T>>& stats) override;
   /// The one that the source holds. Its bounds are the whole numbers inside the edges of the bins,
   /// or the edges themselves.
   Array<RasterBandHistogram<T>> Histogram(unsigned band) override;
-  bool CanWriteHistogram() override { return kHasStats && !raster_.IsNew(); }
+  bool CanWriteHistogram() override { return kHasStats; }
   /// Stores the last one of each band that counts values of both signs. False when a band has only
   /// others.
   bool WriteHistogram(const Array<RasterBandHistogram<T>>& histograms) override;

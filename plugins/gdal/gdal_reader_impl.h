@@ -9,37 +9,13 @@
 
 #include "common/messages.h"
 #include "gdal_band_values.h"
+#include "gdal_pixel_value.h"
 #include "gdal_reader.h"
 #include "raster/no_data_marker.h"
 
 namespace lumo::gdal {
 
 namespace detail {
-
-/// A number as a pixel value; nothing when T hasn't got it, so that no pixel can hold it.
-template <typename T>
-std::optional<T> ToPixel(double value) {
-  if constexpr (std::is_integral_v<T>) {
-    // The bounds as doubles that are exact: the least value, and one above the greatest.
-    const double low = static_cast<double>(std::numeric_limits<T>::min());
-    const double end = std::ldexp(1.0, std::numeric_limits<T>::digits);
-    if (!(value >= low && value < end) || value != std::trunc(value)) return std::nullopt;
-    return static_cast<T>(value);
-  } else if constexpr (std::is_same_v<T, float>) {
-    // Texts of the greatest float are often a little above it.
-    constexpr double kMax = std::numeric_limits<float>::max();
-    if (std::isfinite(value) && std::abs(value) > kMax) {
-      if (std::abs(value) > kMax * (1 + 1e-7)) return std::nullopt;
-      return static_cast<float>(std::copysign(kMax, value));
-    }
-    return static_cast<float>(value);
-  } else if constexpr (std::is_same_v<T, double>) {
-    return value;
-  } else {
-    const auto real = ToPixel<decltype(T::real)>(value);
-    return real ? std::optional<T>(T{*real, 0}) : std::nullopt;
-  }
-}
 
 /// The no-data value of a band. 64-bit numbers don't pass through doubles.
 template <typename T>
@@ -149,7 +125,7 @@ Reader<T>::Reader(RasterDataConnection* connection, OpenRaster& raster, const lu
       continue;
     }
     const auto at = def.noData.find(band);
-    noData_.push_back(at != def.noData.end() ? detail::ToPixel<T>(at->second) : std::nullopt);
+    noData_.push_back(at != def.noData.end() ? ToPixel<T>(at->second) : std::nullopt);
   }
   def_.noData.clear();
   for (unsigned band = 0; band < noData_.size(); ++band) {
@@ -194,7 +170,7 @@ std::int32_t Reader<T>::PyramidLevelMin() {
 
 template <typename T>
 std::int32_t Reader<T>::PyramidLevelMax() {
-  return static_cast<std::int32_t>(raster_.Levels().rbegin()->first);
+  return PyramidExists() ? static_cast<std::int32_t>(raster_.Levels().rbegin()->first) : 0;
 }
 
 template <typename T>

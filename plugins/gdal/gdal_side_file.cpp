@@ -7,6 +7,7 @@
 #include "common/coordsys.h"
 #include "common/source.h"
 #include "gdal_georef.h"
+#include "gdal_no_data.h"
 
 namespace lumo::gdal {
 namespace {
@@ -41,59 +42,70 @@ bool HasCamera(GDALDatasetH dataset) {
   return items != nullptr && *items != nullptr;
 }
 
-bool HasNoData(GDALDatasetH dataset, unsigned band, const RasterDef& def) {
-  const auto wanted = def.noData.find(band);
-  int has = FALSE;
-  const double value =
-      GDALGetRasterNoDataValue(GDALGetRasterBand(dataset, static_cast<int>(band) + 1), &has);
-  if (wanted == def.noData.end()) return has == FALSE;
-  return has != FALSE && IsSameNumber(value, wanted->second);
+bool HasNoData(GDALRasterBandH band, double wanted) {
+  const std::optional<double> value = ReadNoData(band);
+  return value && IsSameNumber(*value, wanted);
 }
 
-/// Sets what differs. False when something can't be set.
-bool Complete(GDALPamDataset& file, const RasterDef& def) {
+// Each sets what differs, by the operations of the base class: a driver's own would write into the
+// file itself. False when something can't be set.
+
+bool CompleteGrid(GDALPamDataset& file, const GeoRef& model, const RasterDef& def) {
   GDALDatasetH const handle = GDALDataset::ToHandle(&file);
-  bool isSet = true;
-  // The operations of the base class: the driver's own would write into the file itself.
-  if (def.geoRef) {
-    GridTransform grid{};
-    if (GridOf(*def.geoRef, grid) && !HasGrid(handle, grid, def)) {
-      isSet = isSet && file.GDALPamDataset::SetGeoTransform(grid.data()) == CE_None;
-    }
-    const CoordSys& system = def.geoRef->CoordinateSystem();
-    if (GridOf(*def.geoRef, grid) && !system.IsEmpty() &&
-        !ReadCoordSys(GDALGetSpatialRef(handle)).IsEqual(system)) {
-      OGRSpatialReferenceH const reference = MakeSpatialReference(system);
-      isSet =
-          isSet && reference != nullptr &&
-          file.GDALPamDataset::SetSpatialRef(OGRSpatialReference::FromHandle(reference)) == CE_None;
-      if (reference != nullptr) OSRRelease(reference);
-    }
-    CPLStringList camera = CameraItemsOf(*def.geoRef);
-    if (camera.Count() != 0 && !HasCamera(handle)) {
-      isSet = isSet && file.GDALPamDataset::SetMetadata(camera.List(), "RPC") == CE_None;
-    }
+  GridTransform grid{};
+  if (!GridOf(model, grid)) return true;
+  if (!HasGrid(handle, grid, def) && file.GDALPamDataset::SetGeoTransform(grid.data()) != CE_None) {
+    return false;
   }
+  const CoordSys& system = model.CoordinateSystem();
+  if (system.IsEmpty() || ReadCoordSys(GDALGetSpatialRef(handle)).IsEqual(system)) return true;
+  OGRSpatialReferenceH const reference = MakeSpatialReference(system);
+  if (reference == nullptr) return false;
+  const CPLErr result =
+      file.GDALPamDataset::SetSpatialRef(OGRSpatialReference::FromHandle(reference));
+  OSRRelease(reference);
+  return result == CE_None;
+}
+
+bool CompleteCamera(GDALPamDataset& file, const GeoRef& model) {
+  CPLStringList camera = CameraItemsOf(model);
+  return camera.Count() == 0 || HasCamera(GDALDataset::ToHandle(&file)) ||
+         file.GDALPamDataset::SetMetadata(camera.List(), "RPC") == CE_None;
+}
+
+bool CompleteNoData(GDALPamDataset& file, const RasterDef& def) {
   for (const auto& [band, value] : def.noData) {
-    if (band >= def.bands || HasNoData(handle, band, def)) continue;
-    auto* const target =
-        dynamic_cast<GDALPamRasterBand*>(file.GetRasterBand(static_cast<int>(band) + 1));
-    isSet =
-        isSet && target != nullptr && target->GDALPamRasterBand::SetNoDataValue(value) == CE_None;
+    if (band >= def.bands) continue;
+    GDALRasterBandH const target =
+        GDALRasterBand::ToHandle(file.GetRasterBand(static_cast<int>(band) + 1));
+    if (!HasNoData(target, value) && !WriteNoDataBeside(target, value)) return false;
   }
-  return isSet;
+  return true;
+}
+
+bool CompleteHistograms(GDALDatasetH file,
+                        const std::vector<std::optional<StoredHistogram>>& histograms) {
+  for (std::size_t i = 0; i < histograms.size(); ++i) {
+    GDALRasterBandH const band = GDALGetRasterBand(file, static_cast<int>(i) + 1);
+    if (histograms[i] && !ReadStoredHistogram(band) &&
+        !WriteStoredHistogram(band, *histograms[i])) {
+      return false;
+    }
+  }
+  return true;
 }
 
 }  // namespace
 
-bool IsSameNumber(double a, double b) {
-  return a == b || (a != a && b != b);
-}
-
-bool CompleteBeside(const std::string& path, const std::string& driver, const RasterDef& def) {
+bool CompleteBeside(const std::string& path, const std::string& driver, const RasterDef& def,
+                    const std::vector<std::optional<StoredHistogram>>& histograms) {
   const DatasetPtr file = OpenToRead(path, driver);
   auto* const withSideFile = dynamic_cast<GDALPamDataset*>(GDALDataset::FromHandle(file.get()));
-  return withSideFile != nullptr && Complete(*withSideFile, def);
+  if (withSideFile == nullptr) return false;
+  const bool hasGeoRef = !def.geoRef || (CompleteGrid(*withSideFile, *def.geoRef, def) &&
+                                         CompleteCamera(*withSideFile, *def.geoRef));
+  return hasGeoRef && CompleteNoData(*withSideFile, def) &&
+         CompleteHistograms(file.get(), histograms);
 }
 
 }  // namespace lumo::gdal

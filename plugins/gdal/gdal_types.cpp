@@ -62,7 +62,11 @@ unsigned CommonDataType(GDALDatasetH dataset, const std::string& name) {
   for (const Row& row : kRows) {
     if (row.type == common) return row.code;
   }
-  FailWith(name, bands == 0 ? "holds no raster" : "a pixel type that can't be read");
+  char** const others = GDALGetMetadata(dataset, "SUBDATASETS");
+  FailWith(name, bands != 0 ? "a pixel type that can't be read"
+                 : others != nullptr && *others != nullptr
+                     ? "holds several rasters: name one by SUBDATASET=<number>"
+                     : "holds no raster");
   return 0;
 }
 

@@ -144,11 +144,11 @@ TEST(GdalCreation, RefusesWhatTheFormatCannotHold) {
   const struct {
     const char* format;
     unsigned type, bands;
-  } cases[] = {{"PNG", 4, 1},  {"PNG", 1, 5},    {"PNG", 99, 1}, {"JPEG", 12, 3},
-               {"JPEG", 1, 5}, {"GIF", 1, 3},    {"GIF", 12, 1}, {"BMP", 2, 1},
-               {"BMP", 1, 2},  {"Erdas", 14, 1}, {"NITF", 9, 1}, {"JPEG2000", 4, 1},
-               {"TIFF", 0, 1}, {"TIFF", 1, 0},   {"DTED", 2, 1}, {"Esri", 2, 1},
-               {"GRIB", 5, 1}};
+  } cases[] = {{"PNG", 4, 1},      {"PNG", 1, 5},       {"PNG", 99, 1}, {"JPEG", 12, 3},
+               {"JPEG", 1, 5},     {"GIF", 1, 3},       {"GIF", 12, 1}, {"BMP", 2, 1},
+               {"BMP", 1, 2},      {"Erdas", 14, 1},    {"NITF", 9, 1}, {"JPEG2000", 4, 1},
+               {"JPEG2000", 3, 1}, {"JPEG2000", 13, 3}, {"TIFF", 0, 1}, {"TIFF", 1, 0},
+               {"DTED", 2, 1},     {"Esri", 2, 1},      {"GRIB", 5, 1}};
   test::TemporaryDirectory directory;
   for (const auto& c : cases) {
     SCOPED_TRACE(std::string(c.format) + " " + std::to_string(c.type));
@@ -166,10 +166,17 @@ TEST(GdalCreation, KeepsGridCoordinateSystemAndNoData) {
     const char* extension;
     double rotation;
     bool byBand;  // a no-data value for each band
-  } cases[] = {{"TIFF", ".tif", 0, false},   {"TIFF", ".tif", 30, true},
-               {"Erdas", ".img", 0, true},   {"NITF", ".ntf", 0, false},
-               {"PNG", ".png", 0, false},    {"JPEG2000", ".jp2", 0, false},
-               {"Erdas", ".img", 30, false}, {"PNG", ".png", 30, true}};
+    const char* system = "EPSG:31985";
+  } cases[] = {{"NITF", ".ntf", 0, true, "EPSG:32725"},
+               {"NITF", ".ntf", 0, false, "EPSG:4326"},
+               {"TIFF", ".tif", 0, false},
+               {"TIFF", ".tif", 30, true},
+               {"Erdas", ".img", 0, true},
+               {"NITF", ".ntf", 0, false},
+               {"PNG", ".png", 0, false},
+               {"JPEG2000", ".jp2", 0, false},
+               {"Erdas", ".img", 30, false},
+               {"PNG", ".png", 30, true}};
   test::TemporaryDirectory directory;
   for (const auto& c : cases) {
     SCOPED_TRACE(std::string(c.format) + (c.rotation != 0 ? " rotated" : ""));
@@ -181,7 +188,7 @@ TEST(GdalCreation, KeepsGridCoordinateSystemAndNoData) {
     grid.SetTiePixel(10, 4);
     grid.SetTieMap(288776.25, 9120760.75);
     grid.SetRotation(c.rotation);
-    grid.SetCoordinateSystem(test::MakeCoordSys("EPSG:31985"));
+    grid.SetCoordinateSystem(test::MakeCoordSys(c.system));
     def.SetGeoRef(GeoRefPtr(grid.Clone()));
     for (unsigned band = 0; band < 3; ++band) def.noData[band] = c.byBand ? band + 7 : 7;
     auto made = CreateSource({path}, def);
@@ -215,6 +222,86 @@ TEST(GdalCreation, KeepsGridCoordinateSystemAndNoData) {
                        ASSERT_EQ(block.state[at] != 0, isNoData) << at;
                        ++at;
                      });
+  }
+}
+
+TEST(GdalCreation, KeepsNoDataOf64BitsAndNaN) {
+  test::TemporaryDirectory directory;
+  const struct {
+    unsigned type, bands;
+    double values[2];
+  } cases[] = {{14, 1, {-5}},
+               {15, 2, {7, 9}},
+               {5, 2, {std::nan(""), 1.5}},
+               {4, 1, {-3.4028234663852886e38}},
+               {14, 1, {1e300}}};
+  for (const auto& c : cases) {
+    SCOPED_TRACE(DataTypeName(c.type).ToUTF8() + " " + std::to_string(c.values[0]));
+    const std::string path = (directory.Path() / (std::to_string(&c - cases) + ".tif")).string();
+    RasterDef def = MakeDef("TIFF", c.type, c.bands);
+    for (unsigned band = 0; band < c.bands; ++band) def.noData[band] = c.values[band];
+    auto made = CreateSource({path}, def);
+    ASSERT_TRUE(made) << TakeFault().ToUTF8();
+    ASSERT_EQ(Release(made), "");
+    const bool isPossible = c.values[0] != 1e300;
+    const auto read = OpenSource({path})->RasterDef().noData;
+    ASSERT_EQ(read.size(), isPossible ? c.bands : 0);
+    for (const auto& [band, value] : read) {
+      EXPECT_TRUE(test::SameValue(value, c.values[band])) << value;
+    }
+  }
+}
+
+/// What is told before the raster is let go.
+TEST(GdalCreation, KeepsStatisticsHistogramsAndPalettes) {
+  test::TemporaryDirectory directory;
+  for (const char* const name : {"TIFF a.tif", "Erdas a.img", "PNG a.png", "GIF a.gif"}) {
+    SCOPED_TRACE(name);
+    const std::string format = std::string(name).substr(0, std::string(name).find(' '));
+    const std::string path = (directory.Path() / (name + format.size() + 1)).string();
+    const RasterDef def = MakeDef(format.c_str(), 1, 1);
+    auto made = CreateSource({path}, def);
+    ASSERT_TRUE(made) << TakeFault().ToUTF8();
+    {
+      const auto writer = ReaderOf<std::uint8_t>(made);
+      Palette palette;
+      for (unsigned i = 0; i < 256; ++i) {
+        palette.Append(Color("any", static_cast<std::uint8_t>(i), 7, 9));
+      }
+      ASSERT_TRUE(writer->WritePalette(0, palette)) << TakeFault().ToUTF8();
+      ASSERT_TRUE(WholeBlock<std::uint8_t>(def).Write(*writer)) << TakeFault().ToUTF8();
+      Array<RasterBandStats<std::uint8_t>> stats{ArrayDims(1)};
+      stats[0].mask = StatsMask::Basic;
+      stats[0].max = 255;
+      stats[0].mean = 100.0 / 3;
+      ASSERT_TRUE(writer->WriteStats(stats)) << TakeFault().ToUTF8();
+      Array<RasterBandHistogram<std::uint8_t>> histograms{ArrayDims(1)};
+      histograms[0].source = StatsSource::kDynamic;
+      histograms[0].binSize = 64;
+      histograms[0].binCount = 4;
+      histograms[0].max = 255;
+      histograms[0].counts = Array<unsigned long long>{ArrayDims(4)};
+      for (unsigned i = 0; i < 4; ++i) histograms[0].counts[i] = i + 3;
+      ASSERT_TRUE(writer->WriteHistogram(histograms)) << TakeFault().ToUTF8();
+    }
+    ASSERT_EQ(Release(made), "");
+    const auto again = OpenSource({path});
+    const auto reader = ReaderOf<std::uint8_t>(again);
+    ASSERT_TRUE(reader);
+    Palette palette = reader->Palette(0);
+    ASSERT_EQ(palette.GetCount(), 256U);
+    EXPECT_EQ(+palette.At(200)->r, 200);
+    EXPECT_EQ(+palette.At(200)->b, 9);
+    ASSERT_TRUE(reader->StatsExist(0));
+    EXPECT_EQ(reader->ReadStats(0).mean, 100.0 / 3);
+    const auto histograms = reader->Histogram(0);
+    ASSERT_EQ(histograms.GetCount(), 1U);
+    EXPECT_EQ(histograms[0].max, 255);
+    EXPECT_EQ(histograms[0].counts[3], 6U);
+    Block<std::uint8_t> block = WholeBlock<std::uint8_t>(def);
+    const auto want = block.pixels;
+    ASSERT_TRUE(block.Read(*reader));
+    EXPECT_EQ(block.pixels, want);
   }
 }
 

@@ -2,6 +2,7 @@
 #include <cmath>
 #include <filesystem>
 #include <gdal_alg.h>
+#include <set>
 #include <thread>
 
 #include "gdal_peer.h"
@@ -233,6 +234,43 @@ TEST(GdalReading, ReadsTheLevelsThatTheFileHolds) {
     ExpectPeersLevel(*reader, peer, level, i);
   }
   EXPECT_EQ(reader->Samples(static_cast<unsigned>(overviews) + 1), 0U);
+}
+
+TEST(GdalReading, OpensOneRasterOfSeveralInAFile) {
+  const test::TemporaryDirectory directory;
+  const std::string path = (directory.Path() / "pages.tif").string();
+  GDALAllRegister();
+  for (int page = 1; page <= 2; ++page) {
+    const char* const options[] = {page > 1 ? "APPEND_SUBDATASET=YES" : nullptr, nullptr};
+    GDALDatasetH const empty =
+        GDALCreate(GDALGetDriverByName("MEM"), "", 10 * page, 5, 1, GDT_Byte, nullptr);
+    GDALClose(GDALCreateCopy(GDALGetDriverByName("GTiff"), path.c_str(), empty, FALSE,
+                             const_cast<char**>(options), nullptr, nullptr));
+    GDALClose(empty);
+  }
+  const struct {
+    std::vector<std::string> pieces;
+    unsigned samples;  // 0: not opened
+  } cases[] = {{{path}, 10},
+               {{path, "SUBDATASET=2"}, 20},
+               {{"TIFF", path, "SUBDATASET=1"}, 10},
+               {{path, "SUBDATASET=GTIFF_DIR:2:" + path}, 20},
+               {{path, "SUBDATASET=3"}, 0},
+               {{path, "second"}, 0}};
+  std::set<std::string> identifiers;
+  for (const auto& c : cases) {
+    SCOPED_TRACE(c.pieces.back());
+    TakeFault();
+    const auto source = OpenSource(c.pieces);
+    ASSERT_EQ(bool(source), c.samples != 0);
+    if (source) {
+      EXPECT_EQ(source->RasterDef().samples, c.samples);
+      identifiers.insert(source->URI().ToUTF8());
+    } else {
+      EXPECT_NE(TakeFault().GetLength(), 0U);
+    }
+  }
+  EXPECT_EQ(identifiers.size(), 4U);
 }
 
 /// Several readers of one connection, and several connections on one file.

@@ -325,6 +325,22 @@ TEST(GdalValues, ChangedPixelsEndTheStoredStatistics) {
   EXPECT_FALSE(ReaderOf<std::uint16_t>(source)->StatsExist(1));
 }
 
+TEST(GdalValues, AFileThatHasBecomeAnotherOneIsNotWritten) {
+  const Copy copy("landsat7_u16_tiled.tif");
+  auto source = OpenSource({copy.Path()});
+  fs::remove(copy.Path());
+  fs::copy_file(test::SampleData("rotated.tif"), copy.Path());
+  const std::string before = copy.Bytes();
+  Block<std::uint16_t> patch{{0, 0, 0, 0}, {1}, {65535}, {0}};
+  EXPECT_FALSE(patch.Write(*ReaderOf<std::uint16_t>(source)));
+  EXPECT_TRUE(TakeFault().ToUTF8().starts_with(copy.Path() + ": has become another"));
+  EXPECT_FALSE(patch.Read(*ReaderOf<std::uint16_t>(source)));
+  EXPECT_EQ(ReaderOf<std::uint16_t>(source)->PyramidLevelMax(), 0);
+  EXPECT_FALSE(ReaderOf<std::uint16_t>(source)->StatsExist(0));
+  Release(source);
+  EXPECT_EQ(copy.Bytes(), before);
+}
+
 TEST(GdalValues, LevelsAreBuiltBesideTheFileAndTakenAway) {
   const Copy copy("landsat7_u16_tiled.tif");
   const std::string before = copy.Bytes();

@@ -46,18 +46,20 @@ URI MakeURI(const Source& source, const std::vector<std::string>& pieces) {
 }
 
 /// GDAL's name of a raster inside an open file; empty, with the fault told, when it holds no such.
-std::string FindSubdataset(GDALDatasetH dataset, const Source& source, std::string wanted) {
-  std::vector<std::string> names;
-  for (int i = 1;; ++i) {
-    const std::string key = "SUBDATASET_" + std::to_string(i) + "_NAME";
-    const char* const name = GDALGetMetadataItem(dataset, key.c_str(), "SUBDATASETS");
+std::string FindSubdataset(GDALDatasetH dataset, const Source& source) {
+  const std::string& wanted = source.subdataset;
+  const bool isNumber = std::all_of(wanted.begin(), wanted.end(),
+                                    [](unsigned char c) { return std::isdigit(c) != 0; });
+  int count = 0;
+  for (;; ++count) {
+    const std::string number = std::to_string(count + 1);
+    const char* const name =
+        GDALGetMetadataItem(dataset, ("SUBDATASET_" + number + "_NAME").c_str(), "SUBDATASETS");
     if (name == nullptr) break;
-    names.emplace_back(name);
-    if (names.back().ends_with(wanted) || std::to_string(i) == wanted) return names.back();
+    if (isNumber ? number == wanted : std::string(name).ends_with(wanted)) return name;
   }
-  std::string what = "holds " + std::to_string(names.size()) + " rasters, but none ";
-  what.append(wanted).append("; name one by SUBDATASET=");
-  FailWith(source.name, what);
+  std::string what = "holds " + std::to_string(count) + " rasters in the file, none of them ";
+  FailWith(source.name, what.append(wanted));
   return {};
 }
 
@@ -119,7 +121,7 @@ bool IsOfFormat(const Source& source, const Format& format, unsigned openFlags) 
 DatasetPtr OpenDataset(const Source& source, const Format& format, unsigned openFlags) {
   DatasetPtr dataset = OpenName(source.name, source, format, openFlags);
   if (dataset == nullptr || source.subdataset.empty()) return dataset;
-  const std::string inner = FindSubdataset(dataset.get(), source, source.subdataset);
+  const std::string inner = FindSubdataset(dataset.get(), source);
   return inner.empty() ? nullptr : OpenName(inner, source, format, openFlags);
 }
 
