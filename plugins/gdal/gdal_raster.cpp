@@ -301,14 +301,7 @@ bool OpenRaster::Write(const BlockPlace& place, const void* pixels) {
 }
 
 void OpenRaster::ForgetStatistics(const Array<unsigned>& bands) {
-  for (const unsigned band : bands) {
-    if (GDALGetMetadataItem(Band(band), "STATISTICS_MINIMUM", nullptr) == nullptr) continue;
-    for (const char* const name :
-         {"STATISTICS_MINIMUM", "STATISTICS_MAXIMUM", "STATISTICS_MEAN", "STATISTICS_STDDEV",
-          "STATISTICS_APPROXIMATE", "STATISTICS_VALID_PERCENT"}) {
-      GDALSetMetadataItem(Band(band), name, nullptr, nullptr);
-    }
-  }
+  for (const unsigned band : bands) DeleteStoredStats(Band(band));
 }
 
 bool OpenRaster::ReadMasks(const BlockPlace& place, unsigned char* state) const {
