@@ -336,6 +336,15 @@ bool OpenRaster::BuildOverviews(const char* method, unsigned levelMin, unsigned 
   return false;
 }
 
+bool OpenRaster::FindLevelsAnew() {
+  if (isUpdated_ || levels_.empty()) return !levels_.empty();
+  bool isThreaded = false;
+  DatasetPtr dataset = OpenToRead(format_, source_, isThreaded);
+  if (dataset == nullptr) return false;  // what is open stays
+  isThreaded_ = isThreaded;
+  return TakeAgain(std::move(dataset));
+}
+
 bool OpenRaster::DeleteOverviews() {
   const Messages messages;
   const CPLErr result =

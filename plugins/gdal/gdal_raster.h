@@ -77,6 +77,8 @@ class OpenRaster {
 
   bool BuildOverviews(const char* method, unsigned levelMin, unsigned levelMax);
   bool DeleteOverviews();
+  /// Looks for levels that another connection has made, or taken away.
+  bool FindLevelsAnew();
 
  private:
   OpenRaster(const Format& format, const Source& source);

@@ -20,17 +20,21 @@ class Reader final : public PlainRasterReader<T> {
   unsigned Lines(unsigned level) override;
   unsigned Bands() override { return def_.bands; }
 
-  std::int32_t PyramidType() override;
+  std::int32_t PyramidType() override {
+    return static_cast<std::int32_t>(lumo::PyramidType::kDriver);
+  }
   std::int32_t PyramidResamplingMethod() override;
   std::int32_t PyramidLevelMin() override;
   std::int32_t PyramidLevelMax() override;
   bool PyramidExists() override { return raster_.Levels().size() > 1; }
   /// GDAL chooses the tiles.
-  bool PyramidBuild(std::int32_t resamplingMethod, std::int32_t levelMin, std::int32_t levelMax,
+  bool PyramidBuild(std::int32_t levelMin, std::int32_t levelMax, std::int32_t resamplingMethod,
                     const TileDimensions& tiles) override;
   bool PyramidRebuild() override;
   bool PyramidDelete() override;
-  bool PyramidRefresh() override { return PyramidRebuild(); }
+  /// Builds the levels anew where pixels were written since; else looks for those that another
+  /// connection has made.
+  bool PyramidRefresh() override;
 
   std::int32_t StatsMask() override;
   bool StatsExist(unsigned band) override;
@@ -71,6 +75,7 @@ class Reader final : public PlainRasterReader<T> {
   lumo::RasterDef def_;
   std::vector<std::optional<T>> noData_;  // by band
   std::int32_t builtMethod_ = 0;          // of the levels that this connection made
+  bool areLevelsOld_ = false;             // they don't show what was written since
 };
 
 }  // namespace lumo::gdal

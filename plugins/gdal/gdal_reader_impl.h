@@ -208,12 +208,6 @@ unsigned Reader<T>::Lines(unsigned level) {
 }
 
 template <typename T>
-std::int32_t Reader<T>::PyramidType() {
-  const auto type = PyramidExists() ? lumo::PyramidType::kDriver : lumo::PyramidType::kNone;
-  return static_cast<std::int32_t>(type);
-}
-
-template <typename T>
 std::int32_t Reader<T>::PyramidResamplingMethod() {
   return PyramidExists() ? builtMethod_ : 0;
 }
@@ -230,14 +224,15 @@ std::int32_t Reader<T>::PyramidLevelMax() {
 }
 
 template <typename T>
-bool Reader<T>::PyramidBuild(std::int32_t resamplingMethod, std::int32_t levelMin,
-                             std::int32_t levelMax, const TileDimensions&) {
+bool Reader<T>::PyramidBuild(std::int32_t levelMin, std::int32_t levelMax,
+                             std::int32_t resamplingMethod, const TileDimensions&) {
   if (levelMin < 0 || levelMax < levelMin) return FailWith(raster_.Name(), "no levels asked for");
   if (!raster_.BuildOverviews(detail::ResamplingName(resamplingMethod),
                               static_cast<unsigned>(levelMin), static_cast<unsigned>(levelMax))) {
     return false;
   }
   builtMethod_ = resamplingMethod;
+  areLevelsOld_ = false;
   return true;
 }
 
@@ -245,7 +240,12 @@ template <typename T>
 bool Reader<T>::PyramidRebuild() {
   if (!PyramidExists()) return FailWith(raster_.Name(), "has no reduced levels");
   TileDimensions tiles{};
-  return PyramidBuild(builtMethod_, PyramidLevelMin(), PyramidLevelMax(), tiles);
+  return PyramidBuild(PyramidLevelMin(), PyramidLevelMax(), builtMethod_, tiles);
+}
+
+template <typename T>
+bool Reader<T>::PyramidRefresh() {
+  return areLevelsOld_ ? PyramidRebuild() : raster_.FindLevelsAnew();
 }
 
 template <typename T>
@@ -408,6 +408,7 @@ template <typename T>
 bool Reader<T>::WritePixels(unsigned left, unsigned top, unsigned width, unsigned height,
                             const Array<unsigned>& bands, unsigned level, const T* pixels,
                             const unsigned char*) {
+  areLevelsOld_ = PyramidExists();
   return raster_.Write({left, top, width, height, bands, level}, pixels);
 }
 

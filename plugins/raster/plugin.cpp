@@ -1,7 +1,9 @@
 #include "memory_factory.h"
+#include "pyramid_factory.h"
 
-/// The entry point of the plug-in. There is no factory for the row "Pyramid" yet.
+/// The entry point of the plug-in.
 extern "C" VEXG_EXPORT lumo::DataConnectionFactory* CreateDataConnectionFactory(
     lumo::FormatRecord* record) {
-  return record->name == "MemoryRaster" ? lumo::MakeMemoryFactory() : nullptr;
+  if (record->name == "MemoryRaster") return lumo::MakeMemoryFactory();
+  return record->name == "Pyramid" ? lumo::MakePyramidFactory() : nullptr;
 }

@@ -54,10 +54,10 @@ class MtRasterReader final : public RasterReader<T> {
     return Call<bool>(21, "DcSrvCmdRrPyramidExists",
                       [](auto& reader) { return reader.PyramidExists(); });
   }
-  bool PyramidBuild(std::int32_t resamplingMethod, std::int32_t levelMin, std::int32_t levelMax,
+  bool PyramidBuild(std::int32_t levelMin, std::int32_t levelMax, std::int32_t resamplingMethod,
                     const TileDimensions& tiles) override {
     return Call<bool>(22, "DcSrvCmdRrPyramidBuild", [&](auto& reader) {
-      return reader.PyramidBuild(resamplingMethod, levelMin, levelMax, tiles);
+      return reader.PyramidBuild(levelMin, levelMax, resamplingMethod, tiles);
     });
   }
   bool PyramidRebuild() override {

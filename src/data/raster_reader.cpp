@@ -2,6 +2,12 @@
 
 namespace lumo {
 
+Array<unsigned> BandsOfBlock(const Array<unsigned>& bands, Interleave interleave) {
+  Array<unsigned> kept(bands);
+  if (interleave == Interleave::None && kept.GetCount() > 1) kept.Resize(ArrayDims(1));
+  return kept;
+}
+
 template class RasterReader<std::uint8_t>;
 template class RasterReader<std::int8_t>;
 template class RasterReader<std::uint16_t>;

@@ -32,11 +32,15 @@ class VEXG_EXPORT BasicRasterReader {
   virtual std::int32_t PyramidLevelMin() = 0;
   virtual std::int32_t PyramidLevelMax() = 0;
   virtual bool PyramidExists() = 0;
-  /// Makes the levels `levelMin` to `levelMax` inside the source.
-  virtual bool PyramidBuild(std::int32_t resamplingMethod, std::int32_t levelMin,
-                            std::int32_t levelMax, const TileDimensions& tiles) = 0;
+  /// Makes the levels `levelMin` to `levelMax`. A source of the type kOrva only gets ready to be
+  /// given their pixels: what it held before stays to be read until PyramidRefresh finds them
+  /// whole.
+  /// @param tiles  how the levels are to be stored: squares of its height.
+  virtual bool PyramidBuild(std::int32_t levelMin, std::int32_t levelMax,
+                            std::int32_t resamplingMethod, const TileDimensions& tiles) = 0;
   virtual bool PyramidRebuild() = 0;
   virtual bool PyramidDelete() = 0;
+  /// Shows what the source holds by now, levels that others have made among it.
   virtual bool PyramidRefresh() = 0;
 
   /// The statistics that the source can keep, bits of lumo::StatsMask.
@@ -60,6 +64,10 @@ class VEXG_EXPORT BasicRasterReader {
 
   virtual ~BasicRasterReader() = default;
 };
+
+/// The bands that a block asked for in an interleave has: without an interleave one, whatever is
+/// asked for.
+VEXG_EXPORT Array<unsigned> BandsOfBlock(const Array<unsigned>& bands, Interleave interleave);
 
 /// The face of a raster source for pixel type T, one of TwelveTypes.
 template <typename T>

@@ -22,13 +22,6 @@ inline bool IsInterleave(Interleave interleave) {
   return interleave >= Interleave::None && interleave <= Interleave::BSQ;
 }
 
-/// A block without an interleave has one band, whatever is asked for.
-inline Array<unsigned> BandsOfBlock(const Array<unsigned>& bands, Interleave interleave) {
-  Array<unsigned> kept(bands);
-  if (interleave == Interleave::None && kept.GetCount() > 1) kept.Resize(ArrayDims(1));
-  return kept;
-}
-
 }  // namespace detail
 
 template <typename T>
@@ -47,7 +40,7 @@ bool RasterReader<T>::ReadBlock(const SubRect& rect, const Array<unsigned>& band
                                 Array<unsigned char>& state) {
   const unsigned width = rect.Width(), height = rect.Height();
   if (!detail::IsInterleave(interleave) || bands.GetCount() == 0) return false;
-  const Array<unsigned> wanted = detail::BandsOfBlock(bands, interleave);
+  const Array<unsigned> wanted = BandsOfBlock(bands, interleave);
   const unsigned count = wanted.GetCount();
   if (!detail::SizeBlock(pixels, interleave, rect, count) ||
       !detail::SizeBlock(state, interleave, rect, count)) {
@@ -76,7 +69,7 @@ bool RasterReader<T>::WriteBlock(const SubRect& rect, const Array<unsigned>& ban
                                  const Array<unsigned char>& state) {
   const unsigned width = rect.Width(), height = rect.Height();
   if (!detail::IsInterleave(interleave) || bands.GetCount() == 0) return false;
-  const Array<unsigned> given = detail::BandsOfBlock(bands, interleave);
+  const Array<unsigned> given = BandsOfBlock(bands, interleave);
   const unsigned count = given.GetCount();
   const std::uint64_t elements = std::uint64_t{width} * height * count;
   if (pixels.GetCount() < elements || state.GetCount() < elements) return false;

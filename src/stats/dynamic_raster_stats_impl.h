@@ -46,16 +46,7 @@ bool DynamicRasterStats<T>::CheckRunning() const {
   Entries entries(bands);
   for (unsigned band = 0; band < bands; ++band) {
     RasterBandStats<T>& entry = entries[band];
-    entry.band = band;
-    entry.pixelCount = results.PixelCounts()[band];
-    entry.mask = StatsMask::Basic;
-    entry.min = results.Mins()[band];
-    entry.max = results.Maxs()[band];
-    entry.mean = results.Means()[band];
-    entry.std = results.Stds()[band];
-    entry.sum = results.Sums()[band];
-    entry.sum2 = results.Sums2()[band];
-    entry.rms = results.RMSs()[band];
+    entry = results.BandStats(band);
     if (!run->extended) continue;
     entry.mask = StatsMask::Extended;
     const auto row = [&](const Array<double>& matrix, Array<double>& into) {

@@ -59,7 +59,7 @@ class RasterHistogramProcess final : public ProcessBuilder<Process> {
   ManagedTask<RasterHistogramAccumulateTask<T>> accumulate_;
 };
 
-/// Takes the results of a RasterHistogramCallbackProcess that wasn't aborted.
+/// Takes the results of a RasterHistogramCallbackProcess that neither failed nor was aborted.
 template <typename T>
 class HistogramCallback {
  public:

@@ -127,6 +127,7 @@ RasterHistogramProcess<T>::RasterHistogramProcess(const RasterIteratorPtr<T>& it
 
 template <typename T>
 void HistogramCallback<T>::OnProcessEnd(ProcessBuilder<Process>& process) {
+  if (process.HasError()) return;
   const auto& run = static_cast<RasterHistogramCallbackProcess<T>&>(process);
   TakeResults(run.Stats(), run.Histogram(), run.Histogram()->Sign());
 }

@@ -1,5 +1,6 @@
 #pragma once
 
+#include "raster/band_values.h"
 #include "raster/tile.h"
 #include "stats/plane_stats.h"
 
@@ -49,6 +50,9 @@ class RasterStats : public Object {
   const Array<double>& Sums() const { return sums_; }
   const Array<double>& Sums2() const { return sums2_; }  ///< sums of the squares
   const Array<double>& RMSs() const { return rmss_; }
+
+  /// The results of one band as a value, with the mask StatsMask::Basic.
+  RasterBandStats<T> BandStats(unsigned band) const;
 
  protected:
   bool Fits(const Tile<T>& tile) const {

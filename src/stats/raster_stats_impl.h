@@ -70,4 +70,20 @@ bool RasterStats<T>::Finish() {
   return true;
 }
 
+template <typename T>
+RasterBandStats<T> RasterStats<T>::BandStats(unsigned band) const {
+  RasterBandStats<T> stats;
+  stats.band = band;
+  stats.pixelCount = pixelCounts_[band];
+  stats.mask = StatsMask::Basic;
+  stats.min = mins_[band];
+  stats.max = maxs_[band];
+  stats.mean = means_[band];
+  stats.std = stds_[band];
+  stats.sum = sums_[band];
+  stats.sum2 = sums2_[band];
+  stats.rms = rmss_[band];
+  return stats;
+}
+
 }  // namespace lumo

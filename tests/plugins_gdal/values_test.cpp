@@ -377,7 +377,7 @@ TEST(GdalValues, LevelsAreBuiltBesideTheFileAndTakenAway) {
   const TileDimensions tiles{};
   EXPECT_FALSE(reader->PyramidRebuild());
   ASSERT_TRUE(
-      reader->PyramidBuild(static_cast<int>(PyramidResamplingMethod::kNearest), 1, 2, tiles))
+      reader->PyramidBuild(1, 2, static_cast<int>(PyramidResamplingMethod::kNearest), tiles))
       << TakeFault().ToUTF8();
   EXPECT_EQ(copy.Bytes(), before);
   ASSERT_TRUE(reader->PyramidExists());

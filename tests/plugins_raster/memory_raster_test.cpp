@@ -176,10 +176,5 @@ TEST(MemoryRaster, IsNotTakenForAnotherFormatNorMade) {
   EXPECT_EQ(TakeFault().ToUTF8(), "MemoryRaster: a block of memory is opened, not made");
 }
 
-TEST(Pyramid, IsNotServedYet) {
-  EXPECT_FALSE(OpenSource({"Pyramid", "/tmp/none"}));
-  EXPECT_EQ(TakeFault().ToUTF8(), "libvexraster.so: doesn't serve Pyramid");
-}
-
 }  // namespace
 }  // namespace lumo::test

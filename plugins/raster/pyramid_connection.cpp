@@ -1,0 +1,167 @@
+#include "pyramid_connection.h"
+
+#include <filesystem>
+
+#include "data/file_uri.h"
+#include "foundation/fault.h"
+#include "pyramid_reader.h"
+
+namespace lumo::pyramid {
+namespace {
+
+constexpr std::string_view kCompression = "COMPRESSION=";
+
+bool ReadCompression(std::string_view word, Compression& compression) {
+  if (word != "LZ4" && word != "NONE") return false;
+  compression = word == "LZ4" ? Compression::kLz4 : Compression::kNone;
+  return true;
+}
+
+lumo::RasterDef DefOf(const Header& header) {
+  lumo::RasterDef def;
+  def.samples = header.samples;
+  def.lines = header.lines;
+  def.bands = header.bands;
+  def.dataType = header.dataType;
+  def.tileWidth = def.tileHeight = header.Tiling().side;
+  def.interleave = Interleave::BIP;
+  def.format = "Pyramid";
+  return def;
+}
+
+bool IsOf(const Header& header, const lumo::RasterDef& def) {
+  return header.samples == def.samples && header.lines == def.lines && header.bands == def.bands &&
+         header.dataType == def.dataType;
+}
+
+}  // namespace
+
+bool FindPlace(const Array<String>& connStrings, Place& place) {
+  Array<String> pieces;
+  RemoveFormatNames(connStrings, pieces);
+  for (const String& piece : pieces) {
+    const std::string text = piece.ToUTF8();
+    if (text.starts_with(kCompression) &&
+        ReadCompression(std::string_view(text).substr(kCompression.size()), place.compression)) {
+      continue;
+    }
+    if (!place.path.empty()) {
+      SetFault("Pyramid: \"" + text + "\" is one piece too many");
+      return false;
+    }
+    place.path = PathOfFileURI(FileURI(text));
+  }
+  if (place.path.empty()) SetFault("Pyramid: no file named");
+  return !place.path.empty();
+}
+
+bool Connection::Fail(const std::string& fault) const {
+  SetFault(path_ + ": " + fault);
+  return false;
+}
+
+bool Connection::Begin(const Array<String>& connStrings) {
+  Disconnect();
+  Place place;
+  if (!FindPlace(connStrings, place)) return false;
+  path_ = place.path;
+  compression_ = place.compression;
+  return true;
+}
+
+bool Connection::Connect(const Array<String>& connStrings, const GeoRefPtr& geoRef,
+                         const MetadataPtr& metadata) {
+  if (!Begin(connStrings)) return false;
+  build_ = Build::Find(path_);
+  if (build_ != nullptr) {
+    def_ = DefOf(build_->GetHeader());
+    std::error_code ignored;
+    if (std::filesystem::exists(path_, ignored)) OpenFile();  // what stands there may be of no use
+    TakeFault();
+  } else {
+    file_ = PyramidFile::Open(path_);
+    if (file_ == nullptr) return false;
+    def_ = DefOf(file_->GetHeader());
+  }
+  if (geoRef) def_.SetGeoRef(geoRef);
+  if (metadata) def_.metadata = *metadata;
+  return MakeReader();
+}
+
+bool Connection::CreateRaster(const Array<String>& connStrings, const lumo::RasterDef& def) {
+  if (!Begin(connStrings)) return false;
+  def_ = def;
+  def_.interleave = Interleave::BIP;
+  def_.format = "Pyramid";
+  def_.tileWidth = def_.tileHeight = 0;
+  if (def.samples == 0 || def.lines == 0 || def.bands == 0 || DataTypeBytes(def.dataType) == 0) {
+    return Fail("a pyramid of a raster without pixels can't be made");
+  }
+  return MakeReader();
+}
+
+bool Connection::MakeReader() {
+  Array<String> strings{ArrayDims(2)};
+  strings[0] = "Pyramid";
+  strings[1] = String(path_);
+  return DispatchType(TwelveTypes{}, def_.dataType, [&]<typename T>() {
+    auto* const reader = new Reader<T>(this);
+    const RasterReaderPtr<T> owner(reader);
+    if (!reader->LoadValues()) return false;
+    SetOpened(strings, FileURI(path_), owner);
+    return true;
+  });
+}
+
+void Connection::Disconnect() {
+  PlainRasterConnection::Disconnect();
+  build_.reset();
+  file_.reset();
+  cache_.Clear();
+  def_.Clear();
+}
+
+/// Opens what stands on the disk, in place of what was open.
+bool Connection::OpenFile() {
+  std::unique_ptr<PyramidFile> file = PyramidFile::Open(path_);
+  if (file == nullptr) return false;
+  if (!IsOf(file->GetHeader(), def_)) return Fail("has become the pyramid of another raster");
+  file_ = std::move(file);
+  cache_.Clear();
+  def_.tileWidth = def_.tileHeight = file_->GetHeader().Tiling().side;
+  return true;
+}
+
+bool Connection::BeginBuild(const Header& wanted) {
+  build_.reset();
+  Header header = wanted;
+  header.samples = def_.samples;
+  header.lines = def_.lines;
+  header.bands = def_.bands;
+  header.dataType = def_.dataType;
+  header.compression = compression_;
+  build_ = Build::Begin(path_, header);
+  return build_ != nullptr;
+}
+
+bool Connection::Refresh(const std::string& values) {
+  if (build_ != nullptr && build_->IsWhole() && !build_->Commit(values)) return false;
+  if (build_ != nullptr && (build_->IsCommitted() || build_.use_count() == 1)) build_.reset();
+  if (file_ != nullptr && file_->IsCurrent()) return true;
+  std::error_code ignored;
+  if (std::filesystem::exists(path_, ignored)) return OpenFile();
+  file_.reset();
+  cache_.Clear();
+  return Fail("there is no pyramid");
+}
+
+bool Connection::Delete() {
+  build_.reset();
+  file_.reset();
+  cache_.Clear();
+  if (!IsPyramidFile(path_)) return Fail("there is no pyramid");
+  std::error_code fault;
+  return std::filesystem::remove(path_, fault) || Fail(fault.message());
+}
+
+}  // namespace lumo::pyramid

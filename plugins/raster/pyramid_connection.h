@@ -1,0 +1,63 @@
+#pragma once
+
+#include "data/plain_raster_reader.h"
+#include "pyramid_build.h"
+#include "pyramid_tile_cache.h"
+
+namespace lumo::pyramid {
+
+/// A pyramid file as a raster source: what stands on the disk, and the build that is to replace it.
+/// docs/file-formats.md tells the format.
+///
+/// One that is made has no file until a build of it is whole.
+class Connection final : public PlainRasterConnection {
+ public:
+  ~Connection() override { Disconnect(); }
+
+  bool Connect(const Array<String>& connStrings, const GeoRefPtr& geoRef,
+               const MetadataPtr& metadata) override;
+  void Disconnect() override;
+  bool CreateRaster(const Array<String>& connStrings, const lumo::RasterDef& def) override;
+
+  const lumo::RasterDef& Def() const { return def_; }
+  lumo::RasterDef& Def() { return def_; }
+  const std::string& Path() const { return path_; }
+
+  /// The file that stands on the disk; null when there is none.
+  PyramidFile* File() const { return file_.get(); }
+  TileCache& Cache() { return cache_; }
+  /// The build under way; null when there is none.
+  Build* GetBuild() const { return build_.get(); }
+
+  bool BeginBuild(const Header& wanted);
+  /// Takes a build that is whole to its place, and opens what stands there then. A build that is
+  /// not whole ends, unless another connection writes to it.
+  /// @param values  for a build that is taken to its place.
+  /// @return whether there is a file.
+  bool Refresh(const std::string& values);
+  bool Delete();
+
+  bool Fail(const std::string& fault) const;
+
+ private:
+  bool Begin(const Array<String>& connStrings);
+  bool OpenFile();
+  bool MakeReader();
+
+  std::string path_;
+  Compression compression_ = Compression::kLz4;
+  lumo::RasterDef def_;
+  std::unique_ptr<PyramidFile> file_;
+  std::shared_ptr<Build> build_;
+  TileCache cache_;
+};
+
+/// What connection strings say beside the format's key: the path, and how tiles are to be packed.
+struct Place {
+  std::string path;  ///< absolute, with links resolved; empty when the strings name none
+  Compression compression = Compression::kLz4;
+};
+/// False, with SetFault, for strings that name no file, or have a piece too many.
+bool FindPlace(const Array<String>& connStrings, Place& place);
+
+}  // namespace lumo::pyramid

@@ -1,0 +1,87 @@
+#pragma once
+
+#include <mutex>
+#include <vector>
+
+#include "pyramid/pyramid_builders.h"
+#include "pyramid/pyramid_process.h"
+#include "stats/raster_histogram.h"
+
+namespace lumo {
+
+/// The pyramid of one raster that has a reader for it: builds it in the background, and holds the
+/// statistics and histograms that the last build has left. Exists for TwelveTypes; for complex
+/// numbers there are neither.
+///
+/// Ownership: shares the connections. Its destructor aborts a build that goes on and waits for it.
+/// Threads:   every operation may be called on any thread. The lock is never held during a build.
+/// Failure:   an empty AsyncPtr, with the fault told, when no build could be started. A build that
+///            failed has its error stored; PyramidAsync tells the fault.
+template <typename T>
+class DynamicRasterPyramid final : public PyramidCallback<T> {
+ public:
+  /// @param makeRaster  makes the rasters that a build works on.
+  DynamicRasterPyramid(const RasterReaderPtr<T>& reader, const RasterDataConnectionPtr& connection,
+                       const RasterReaderPtr<T>& pyramidReader,
+                       const RasterDataConnectionPtr& pyramidConnection,
+                       const MakeSourceRaster<T>& makeRaster);
+  ~DynamicRasterPyramid() override;
+  DynamicRasterPyramid(const DynamicRasterPyramid&) = delete;
+  DynamicRasterPyramid& operator=(const DynamicRasterPyramid&) = delete;
+
+  /// Starts a build. While one runs, gives one that has ended and does nothing else.
+  /// @param tiles  the levels are stored in squares of its height; 0 stands for 256.
+  AsyncPtr PyramidBuild(const PyramidDef& def, const TileDimensions& tiles,
+                        const AsyncCallbackPtr& callback);
+  /// The build that runs now; empty when none does.
+  AsyncPtr PyramidAsync() const;
+
+  /// True when the last build has left all statistics of `mask` for the band. False while one runs.
+  bool StatsExist(unsigned band, unsigned mask) const;
+  /// What the last build has left; with mask 0 when that is nothing.
+  RasterBandStats<T> BandStats(unsigned band) const;
+  Array<RasterBandHistogram<T>> BandHistogram(unsigned band) const;
+
+  // What a build tells, on its thread. What it has computed goes into the pyramid's store too.
+  void OnLevelsWritten() override;
+  void TakeHistogram(const RasterHistogram<T>& histogram,
+                     HistogramSign sign) requires(std::is_arithmetic_v<T>);
+  void TakeStats(const RasterStats<T>& stats) requires(std::is_arithmetic_v<T>);
+  /// Shows what the store of the pyramid holds now.
+  void Refresh();
+
+ private:
+  bool IsRunning() const;
+  bool IsKeptByTheLibrary() const;
+  AsyncPtr Start(const PyramidBuilderPtr& builder);
+
+  mutable std::mutex lock_;  // guards the results and the builder
+  // The connections go last: they own the readers.
+  const RasterDataConnectionPtr connection_;
+  const RasterDataConnectionPtr pyramidConnection_;
+  const RasterReaderPtr<T> reader_;
+  const RasterReaderPtr<T> pyramidReader_;
+  const MakeSourceRaster<T> makeRaster_;
+  PyramidBuilderPtr builder_;  // that runs, or was the last one
+  mutable bool isEndTaken_ = true;
+  std::vector<RasterBandStats<T>> bandStats_;
+  std::vector<RasterBandHistogram<T>> bandHistograms_;
+};
+
+template <typename T>
+using DynamicRasterPyramidPtr = Pointer<DynamicRasterPyramid<T>>;
+
+extern template class VEXG_EXPORT DynamicRasterPyramid<std::uint8_t>;
+extern template class VEXG_EXPORT DynamicRasterPyramid<std::int8_t>;
+extern template class VEXG_EXPORT DynamicRasterPyramid<std::uint16_t>;
+extern template class VEXG_EXPORT DynamicRasterPyramid<std::int16_t>;
+extern template class VEXG_EXPORT DynamicRasterPyramid<std::uint32_t>;
+extern template class VEXG_EXPORT DynamicRasterPyramid<std::int32_t>;
+extern template class VEXG_EXPORT DynamicRasterPyramid<float>;
+extern template class VEXG_EXPORT DynamicRasterPyramid<double>;
+extern template class VEXG_EXPORT DynamicRasterPyramid<std::uint64_t>;
+extern template class VEXG_EXPORT DynamicRasterPyramid<std::int64_t>;
+extern template class VEXG_EXPORT DynamicRasterPyramid<Complex<float>>;
+extern template class VEXG_EXPORT DynamicRasterPyramid<Complex<double>>;
+
+}  // namespace lumo

@@ -1,0 +1,56 @@
+#pragma once
+
+#include "pyramid/level_shape.h"
+#include "raster/tile.h"
+
+namespace lumo {
+
+/// Some tiles of a level, side by side in one row, while their pixels are gathered from blocks of
+/// the raster. Exists for TwelveTypes.
+///
+/// In its memory the tiles follow one another from left to right, each a block of its own,
+/// pixel-interleaved: the form in which the store of a pyramid takes them. States travel with the
+/// pixels where they tell more than that a pixel holds no data, which its value shows.
+template <typename T>
+class LevelWindow {
+ public:
+  explicit LevelWindow(const LevelShape& shape) : shape_(shape) {}
+
+  const LevelShape& Shape() const { return shape_; }
+
+  /// Makes room for the tiles from `column` to before `endColumn` of a row.
+  /// @return false, with the fault told, when there is no memory.
+  bool Begin(unsigned column, unsigned endColumn, unsigned row, unsigned bands);
+
+  /// Copies what a block has of the pixels of these tiles. The block may lie in any order of axes.
+  void Take(const Tile<T>& block);
+
+  /// The tiles as one, to be written.
+  Tile<T>& Pixels() { return tiles_; }
+
+ private:
+  struct Line;
+  void TakeLine(const Tile<T>& block, unsigned line);
+  template <typename E>
+  void Pick(const Array<E>& from, const Tile<T>& block, const Line& line, Array<E>& to) const;
+
+  const LevelShape shape_;
+  Tile<T> tiles_;
+  unsigned left_ = 0;  // in pixels of the level
+  unsigned top_ = 0;
+};
+
+extern template class LevelWindow<std::uint8_t>;
+extern template class LevelWindow<std::int8_t>;
+extern template class LevelWindow<std::uint16_t>;
+extern template class LevelWindow<std::int16_t>;
+extern template class LevelWindow<std::uint32_t>;
+extern template class LevelWindow<std::int32_t>;
+extern template class LevelWindow<float>;
+extern template class LevelWindow<double>;
+extern template class LevelWindow<std::uint64_t>;
+extern template class LevelWindow<std::int64_t>;
+extern template class LevelWindow<Complex<float>>;
+extern template class LevelWindow<Complex<double>>;
+
+}  // namespace lumo

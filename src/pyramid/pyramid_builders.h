@@ -1,0 +1,124 @@
+#pragma once
+
+#include <functional>
+#include <mutex>
+
+#include "data/raster_reader.h"
+#include "foundation/async.h"
+#include "raster/raster.h"
+#include "raster/raster_def.h"
+#include "stats/raster_stats.h"
+
+namespace lumo {
+
+template <typename T>
+class DynamicRasterPyramid;
+
+/// Makes the raster that stands on a source, and on a pyramid where that isn't empty. The floor
+/// that has such rasters lies above.
+template <typename T>
+using MakeSourceRaster =
+    std::function<RasterPtr<T>(const RasterReaderPtr<T>&, const RasterDataConnectionPtr&,
+                               const RasterReaderPtr<T>&, const RasterDataConnectionPtr&)>;
+
+/// A build of a pyramid, on a thread of its own, with connections of its own.
+class VEXG_EXPORT PyramidBuilder : public Async {
+ public:
+  using Async::Async;
+
+  /// Why it failed, in words.
+  String GetFault() const;
+
+ protected:
+  /// Keeps the fault text of this thread as the reason, and gives up.
+  void Fail(const char* otherwise);
+
+ private:
+  mutable std::mutex lock_;
+  String fault_;
+};
+
+using PyramidBuilderPtr = Pointer<PyramidBuilder>;
+
+/// What a build is asked for.
+struct PyramidOrder {
+  Array<String> source;   ///< connection strings
+  Array<String> pyramid;  ///< connection strings
+  PyramidDef def;
+  TileDimensions tiles;
+};
+
+/// Has the driver of a format build its pyramid: one call, which can't be aborted on the way.
+/// Exists for TwelveTypes.
+template <typename T>
+class AsyncPyramidBuilder final : public PyramidBuilder {
+ public:
+  /// @param owner  outlives the build.
+  AsyncPyramidBuilder(DynamicRasterPyramid<T>& owner, const PyramidOrder& order,
+                      const AsyncCallbackPtr& callback);
+  void Execute() override;
+  void Finish() override;
+
+ private:
+  DynamicRasterPyramid<T>& owner_;
+  const PyramidOrder order_;
+  bool built_ = false;
+};
+
+/// Builds a pyramid file of the library's own: the levels, the statistics of the raster on the way,
+/// and a histogram of a small level, with which the owner is left. Exists for TwelveTypes; complex
+/// rasters get neither statistics nor a histogram.
+template <typename T>
+class AsyncOrvaPyramidBuilder final : public PyramidBuilder {
+ public:
+  /// @param owner  outlives the build.
+  AsyncOrvaPyramidBuilder(DynamicRasterPyramid<T>& owner, const PyramidOrder& order,
+                          const MakeSourceRaster<T>& makeRaster, const AsyncCallbackPtr& callback);
+  void Execute() override;
+
+ private:
+  struct Rasters;
+
+  bool Open(Rasters& rasters);
+  bool MakeLevels(const Rasters& rasters);
+  bool MakeHistogram(const Rasters& rasters) requires(std::is_arithmetic_v<T>);
+  IPC Share(double weight) const;
+
+  DynamicRasterPyramid<T>& owner_;
+  const PyramidOrder order_;
+  const MakeSourceRaster<T> makeRaster_;
+  std::conditional_t<std::is_arithmetic_v<T>, RasterStatsPtr<T>, std::nullptr_t> stats_;
+};
+
+/// The level whose larger side has 256 to 511 pixels, where the pyramid has it; else the nearest.
+/// 0 stands for the raster itself where level 0 isn't stored.
+VEXG_EXPORT unsigned ChooseHistogramLevel(unsigned samples, unsigned lines, unsigned levelMin,
+                                          unsigned levelMax);
+
+extern template class AsyncPyramidBuilder<std::uint8_t>;
+extern template class AsyncPyramidBuilder<std::int8_t>;
+extern template class AsyncPyramidBuilder<std::uint16_t>;
+extern template class AsyncPyramidBuilder<std::int16_t>;
+extern template class AsyncPyramidBuilder<std::uint32_t>;
+extern template class AsyncPyramidBuilder<std::int32_t>;
+extern template class AsyncPyramidBuilder<float>;
+extern template class AsyncPyramidBuilder<double>;
+extern template class AsyncPyramidBuilder<std::uint64_t>;
+extern template class AsyncPyramidBuilder<std::int64_t>;
+extern template class AsyncPyramidBuilder<Complex<float>>;
+extern template class AsyncPyramidBuilder<Complex<double>>;
+
+extern template class AsyncOrvaPyramidBuilder<std::uint8_t>;
+extern template class AsyncOrvaPyramidBuilder<std::int8_t>;
+extern template class AsyncOrvaPyramidBuilder<std::uint16_t>;
+extern template class AsyncOrvaPyramidBuilder<std::int16_t>;
+extern template class AsyncOrvaPyramidBuilder<std::uint32_t>;
+extern template class AsyncOrvaPyramidBuilder<std::int32_t>;
+extern template class AsyncOrvaPyramidBuilder<float>;
+extern template class AsyncOrvaPyramidBuilder<double>;
+extern template class AsyncOrvaPyramidBuilder<std::uint64_t>;
+extern template class AsyncOrvaPyramidBuilder<std::int64_t>;
+extern template class AsyncOrvaPyramidBuilder<Complex<float>>;
+extern template class AsyncOrvaPyramidBuilder<Complex<double>>;
+
+}  // namespace lumo

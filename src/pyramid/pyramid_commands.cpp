@@ -1,0 +1,160 @@
+#include <mutex>
+
+#include "foundation/fault.h"
+#include "raster/raster_command.h"
+#include "raster/raster_def.h"
+
+namespace lumo {
+namespace {
+
+constexpr const char* kGroup = "Pyramids";
+const InputDeclaration kUri{"URI", Presence::kRequired, ValueKind::kURI, "the raster"};
+
+const CommandDeclaration kGet{
+    "GetRasterPyramidCommand",
+    kGroup,
+    "Gives a level of the pyramid of a raster as a raster of its own.",
+    {kUri,
+     {"Level", Presence::kRequired, ValueKind::kInteger,
+      "halves samples and lines so many times; 0 is the size of the raster"}},
+    {{"PyramidURI", ValueKind::kURI, "the level, by which further commands find it"}}};
+
+class GetRasterPyramidCommand final : public RasterCommand {
+  CommandResult Execute() override {
+    if (!CheckInputs()) return Fail();
+    const BasicRasterPtr raster = FindRaster();
+    if (!raster) return Fail();
+    const auto number = Read<unsigned>("Level");
+    BasicRasterPtr level;
+    DispatchType(TwelveTypes{}, raster->DataType(), [&]<typename T>() {
+      const RasterPtr<T> typed(raster);
+      if (typed) level = typed->PyramidLevel(number);
+      return bool(level);
+    });
+    if (!level || !level->IsValid()) return Fail("the raster has no pyramid");
+    if (level->Samples() == 0 || level->Lines() == 0) {
+      return Fail(String("the pyramid has no pixels at level " + std::to_string(number)));
+    }
+    CatalogAdd(level);
+    Write("PyramidURI", level->GetURI());
+    return Succeed();
+  }
+};
+
+const CommandFactoryT<GetRasterPyramidCommand> getFactory(kGet);
+
+/// Carries the progress of a build to a command, and the abort of the command to the build.
+class BuildObserver final : public AsyncCallback {
+ public:
+  explicit BuildObserver(const IPC& ipc) : ipc_(ipc) {}
+
+  /// What is to be aborted; empty for nothing any more.
+  void Watch(const AsyncPtr& build) {
+    {
+      const std::lock_guard lock(lock_);
+      build_ = build;
+    }
+    PassAbort();
+  }
+
+  void OnProgress(double progress) override {
+    ipc_.progress->Update(progress);
+    PassAbort();
+  }
+
+ private:
+  void PassAbort() {
+    const std::lock_guard lock(lock_);
+    if (build_ && ipc_.abort->IsSet() && !build_->IsAborted()) build_->Abort();
+  }
+
+  const IPC ipc_;
+  std::mutex lock_;
+  AsyncPtr build_;
+};
+
+const CommandDeclaration kBuild{
+    "BuildRasterPyramidCommand",
+    kGroup,
+    "Builds the pyramid of a raster, with its statistics and a histogram, where it was opened.",
+    {kUri,
+     {"PyramidType", Presence::kRequired, ValueKind::kWord,
+      "ORVA: a file of the library's own; DRIVER: by the driver of the format"},
+     {"PyramidResamplingMethod", Presence::kRequired, ValueKind::kWord,
+      "Impl, Nearest, Linear, Cubic or Majority; ORVA always takes every 2^level-th pixel"},
+     {"PyramidLevelMin", Presence::kRequired, ValueKind::kInteger, "first level; 0 is a copy"},
+     {"PyramidLevelMax", Presence::kRequired, ValueKind::kInteger, "last level, up to 31"},
+     {"PyramidCanBuild", Presence::kRequired, ValueKind::kBoolean, "of the description; not read"},
+     {"TileDimensions", Presence::kRequired, ValueKind::kTiles,
+      "the levels are stored in squares of this height; of 9 bands and more in squares of 256"}},
+    {}};
+
+class BuildRasterPyramidCommand final : public RasterCommand {
+  CommandResult Execute() override {
+    if (!CheckInputs()) return Fail();
+    const BasicRasterPtr raster = FindRaster();
+    if (!raster) return Fail();
+    PyramidDef def;
+    def.pyramidType = Read<PyramidType>("PyramidType");
+    def.resamplingMethod = Read<PyramidResamplingMethod>("PyramidResamplingMethod");
+    def.levelMin = Read<unsigned>("PyramidLevelMin");
+    def.levelMax = Read<unsigned>("PyramidLevelMax");
+    def.canBuild = Read<bool>("PyramidCanBuild");
+
+    auto* const observer = new BuildObserver(GetIPC());
+    const AsyncCallbackPtr callback(observer);
+    const AsyncPtr build =
+        raster->PyramidBuild(def, Read<TileDimensions>("TileDimensions"), callback);
+    if (!build) return Fail(TakeFaultOr("no build of the pyramid could be started"));
+    observer->Watch(build);
+    build->WaitFinished();
+    observer->Watch(AsyncPtr());
+    if (build->HasError()) {
+      raster->PyramidAsync();  // tells why
+      return Fail(TakeFaultOr("the build of the pyramid failed"));
+    }
+    return build->IsAborted() ? Fail("the build was aborted") : Succeed();
+  }
+};
+
+const CommandFactoryT<BuildRasterPyramidCommand> buildFactory(kBuild);
+
+const CommandDeclaration kRefresh{
+    "RefreshRasterPyramidCommand",
+    kGroup,
+    "Has a raster show the levels that its pyramid holds by now.",
+    {kUri},
+    {{"Return", ValueKind::kBoolean, "it has a pyramid that could be looked at"}}};
+
+class RefreshRasterPyramidCommand final : public RasterCommand {
+  CommandResult Execute() override {
+    if (!CheckInputs()) return Fail();
+    const BasicRasterPtr raster = FindRaster();
+    if (!raster) return Fail();
+    Write("Return", raster->PyramidRefresh());
+    return Succeed();
+  }
+};
+
+const CommandFactoryT<RefreshRasterPyramidCommand> refreshFactory(kRefresh);
+
+const CommandDeclaration kDelete{"DeleteRasterPyramidCommand",
+                                 kGroup,
+                                 "Removes the pyramid of a raster.",
+                                 {kUri},
+                                 {{"Return", ValueKind::kBoolean, "it is gone"}}};
+
+class DeleteRasterPyramidCommand final : public RasterCommand {
+  CommandResult Execute() override {
+    if (!CheckInputs()) return Fail();
+    const BasicRasterPtr raster = FindRaster();
+    if (!raster) return Fail();
+    Write("Return", raster->PyramidDelete());
+    return Succeed();
+  }
+};
+
+const CommandFactoryT<DeleteRasterPyramidCommand> deleteFactory(kDelete);
+
+}  // namespace
+}  // namespace lumo

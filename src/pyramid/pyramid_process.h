@@ -1,0 +1,153 @@
+#pragma once
+
+#include <vector>
+
+#include "pyramid/pyramid_tasks.h"
+#include "raster/raster_def.h"
+#include "stats/raster_stats_process.h"
+#include "tasks/process_builder.h"
+
+namespace lumo {
+
+/// In which order a raster is read to make the levels of its pyramid.
+enum class PyramidPath {
+  kScanline,  ///< whole lines
+  kRow,       ///< squares, row by row
+  kMorten,    ///< one band after the other in squares along Z: needs little memory for many bands
+};
+VEXG_EXPORT PyramidPath ChoosePyramidPath(const RasterDef& def);
+
+/// What a process that makes levels works on.
+template <typename T>
+struct PyramidPlan {
+  RasterPtr<T> source;  ///< what is read
+  RasterPtr<T> full;    ///< whose StoredPyramidLevels are written
+  unsigned levelMin = 0;
+  unsigned levelMax = 0;
+  unsigned tileSide = 0;
+};
+
+/// Is told that the levels are written. Not called for a run that failed or was aborted.
+template <typename T>
+class PyramidCallback {
+ public:
+  virtual ~PyramidCallback() = default;
+  virtual void OnLevelsWritten() = 0;
+
+ private:
+  friend class ProcessBuilderCallback<Process, PyramidCallback>;
+  void OnProcessEnd(ProcessBuilder<Process>& process) {
+    if (!process.HasError()) OnLevelsWritten();
+  }
+};
+
+/// Reads a raster once, and makes all levels of a pyramid on the way: the base of the two below. A
+/// level is a stage of its own, so that levels are made at the same time, and beside the reading.
+template <typename T>
+class RasterPyramidProcess : public ProcessBuilderCallback<Process, PyramidCallback<T>> {
+ protected:
+  /// @param receiver  outlives the run; may be null.
+  RasterPyramidProcess(const char* name, const PyramidPlan<T>& plan, PyramidCallback<T>* receiver,
+                       const IPC& ipc);
+
+  /// Places the stages.
+  /// @param statsTask  takes in each tile on the way, into `stats`; null for none. Not used on the
+  ///                   path kMorten, whose tiles are of one band each.
+  void Place(TaskFactory* statsTask, const ObjectPtr& stats);
+
+ private:
+  using ProcessBuilderCallback<Process, PyramidCallback<T>>::SetArg;
+
+  ArgID AddSetup(const ObjectPtr& object);
+  TaskFactory* PlaceReader();
+  bool AddStage(TaskFactory* factory, const std::vector<ArgID>& setup);
+
+  const PyramidPlan<T> plan_;
+  const PyramidPath path_;
+  ArgID tile_;
+  unsigned stages_ = 0;
+  ManagedTask<RasterReadTask<T>> read_;
+  ManagedTask<RasterMortenReadTask<T>> mortenRead_;
+  ManagedTask<RasterPyramidScanlineDecimateTask<T>> scanlineDecimate_;
+  ManagedTask<RasterPyramidRowDecimateTask<T>> rowDecimate_;
+  ManagedTask<RasterPyramidMortenDecimateTask<T>> mortenDecimate_;
+};
+
+/// Makes the levels of a pyramid. Exists for TwelveTypes.
+template <typename T>
+class RasterPyramidDecimateRasterProcess final : public RasterPyramidProcess<T> {
+ public:
+  explicit RasterPyramidDecimateRasterProcess(const PyramidPlan<T>& plan,
+                                              PyramidCallback<T>* receiver = nullptr,
+                                              const IPC& ipc = {})
+      : RasterPyramidProcess<T>("RasterPyramidDecimateRasterProcess", plan, receiver, ipc) {
+    this->Place(nullptr, ObjectPtr());
+  }
+};
+
+/// Makes the levels of a pyramid and, except on the path kMorten, the statistics of the raster.
+/// Exists for TenTypes.
+template <typename T, typename Stats>
+class RasterPyramidDecimateRasterStatsProcess final : public RasterPyramidProcess<T> {
+ public:
+  /// @param stats  is reset for the bands of the raster.
+  RasterPyramidDecimateRasterStatsProcess(const PyramidPlan<T>& plan, const Pointer<Stats>& stats,
+                                          PyramidCallback<T>* receiver = nullptr,
+                                          const IPC& ipc = {})
+      : RasterPyramidProcess<T>("RasterPyramidDecimateRasterStatsProcess", plan, receiver, ipc) {
+    stats->Reset(plan.source->Bands());
+    this->Place(&accumulate_, stats);
+  }
+
+ private:
+  ManagedTask<RasterStatsAccumulateTask<T, Stats>> accumulate_;
+};
+
+extern template class VEXG_EXPORT RasterPyramidProcess<std::uint8_t>;
+extern template class VEXG_EXPORT RasterPyramidProcess<std::int8_t>;
+extern template class VEXG_EXPORT RasterPyramidProcess<std::uint16_t>;
+extern template class VEXG_EXPORT RasterPyramidProcess<std::int16_t>;
+extern template class VEXG_EXPORT RasterPyramidProcess<std::uint32_t>;
+extern template class VEXG_EXPORT RasterPyramidProcess<std::int32_t>;
+extern template class VEXG_EXPORT RasterPyramidProcess<float>;
+extern template class VEXG_EXPORT RasterPyramidProcess<double>;
+extern template class VEXG_EXPORT RasterPyramidProcess<std::uint64_t>;
+extern template class VEXG_EXPORT RasterPyramidProcess<std::int64_t>;
+extern template class VEXG_EXPORT RasterPyramidProcess<Complex<float>>;
+extern template class VEXG_EXPORT RasterPyramidProcess<Complex<double>>;
+
+extern template class VEXG_EXPORT RasterPyramidDecimateRasterProcess<std::uint8_t>;
+extern template class VEXG_EXPORT RasterPyramidDecimateRasterProcess<std::int8_t>;
+extern template class VEXG_EXPORT RasterPyramidDecimateRasterProcess<std::uint16_t>;
+extern template class VEXG_EXPORT RasterPyramidDecimateRasterProcess<std::int16_t>;
+extern template class VEXG_EXPORT RasterPyramidDecimateRasterProcess<std::uint32_t>;
+extern template class VEXG_EXPORT RasterPyramidDecimateRasterProcess<std::int32_t>;
+extern template class VEXG_EXPORT RasterPyramidDecimateRasterProcess<float>;
+extern template class VEXG_EXPORT RasterPyramidDecimateRasterProcess<double>;
+extern template class VEXG_EXPORT RasterPyramidDecimateRasterProcess<std::uint64_t>;
+extern template class VEXG_EXPORT RasterPyramidDecimateRasterProcess<std::int64_t>;
+extern template class VEXG_EXPORT RasterPyramidDecimateRasterProcess<Complex<float>>;
+extern template class VEXG_EXPORT RasterPyramidDecimateRasterProcess<Complex<double>>;
+
+extern template class VEXG_EXPORT
+    RasterPyramidDecimateRasterStatsProcess<std::uint8_t, RasterStats<std::uint8_t>>;
+extern template class VEXG_EXPORT
+    RasterPyramidDecimateRasterStatsProcess<std::int8_t, RasterStats<std::int8_t>>;
+extern template class VEXG_EXPORT
+    RasterPyramidDecimateRasterStatsProcess<std::uint16_t, RasterStats<std::uint16_t>>;
+extern template class VEXG_EXPORT
+    RasterPyramidDecimateRasterStatsProcess<std::int16_t, RasterStats<std::int16_t>>;
+extern template class VEXG_EXPORT
+    RasterPyramidDecimateRasterStatsProcess<std::uint32_t, RasterStats<std::uint32_t>>;
+extern template class VEXG_EXPORT
+    RasterPyramidDecimateRasterStatsProcess<std::int32_t, RasterStats<std::int32_t>>;
+extern template class VEXG_EXPORT
+    RasterPyramidDecimateRasterStatsProcess<float, RasterStats<float>>;
+extern template class VEXG_EXPORT
+    RasterPyramidDecimateRasterStatsProcess<double, RasterStats<double>>;
+extern template class VEXG_EXPORT
+    RasterPyramidDecimateRasterStatsProcess<std::uint64_t, RasterStats<std::uint64_t>>;
+extern template class VEXG_EXPORT
+    RasterPyramidDecimateRasterStatsProcess<std::int64_t, RasterStats<std::int64_t>>;
+
+}  // namespace lumo

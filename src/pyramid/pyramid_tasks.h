@@ -1,0 +1,190 @@
+#pragma once
+
+#include <memory>
+
+#include "pyramid/level_window.h"
+#include "raster/raster_tasks.h"
+
+// The stages of a process that makes the levels of a pyramid: one that reads, and one for each
+// level, which takes the pixels of its level out of every block that was read. A pixel of a level
+// is a copy of one pixel of the raster, see LevelShape. All exist for TwelveTypes.
+//
+// Setup arguments of a task for a level: the raster whose StoredPyramidLevel is written, the number
+// of the level and the side of its tiles, both as Scalar<unsigned>.
+
+namespace lumo {
+
+/// Position `index` of the walk along Z through a square grid of so many bits on each axis.
+struct ZPosition {
+  std::uint64_t x = 0;
+  std::uint64_t y = 0;
+};
+VEXG_EXPORT ZPosition PositionAlongZ(std::uint64_t index, unsigned bits);
+
+/// Writes a level in strips, as blocks of the raster come row by row.
+template <typename T>
+class LevelStripWriter {
+ public:
+  /// @param level  as a raster that can be written.
+  LevelStripWriter(const RasterPtr<T>& level, const LevelShape& shape, unsigned samples);
+
+  /// Takes what a block has of the level, and writes the strips that are whole with it. A row of
+  /// more than one block lies within one strip.
+  /// @return false, with the fault told, when a strip can't be had or written.
+  bool Take(const Tile<T>& block);
+
+ private:
+  RasterIterator<T> iterator_;  // tiles are strips
+  LevelWindow<T> strip_;
+  const unsigned samples_;  // of the raster
+  unsigned row_ = 0;        // of tiles, that the strip is
+  bool isBegun_ = false;
+};
+
+/// What the tasks for levels have in common.
+template <typename T>
+class LevelTask : public SequentialTask {
+ protected:
+  LevelTask(const char* name, ArgList& setup);
+
+  /// The block in slot 0; empty, with the error stored, when there is none.
+  TilePtr<T> BlockOf(ArgList& args);
+  bool Fail();
+
+  const RasterPtr<T>& Level() const { return level_; }
+  const LevelShape& Shape() const { return shape_; }
+  unsigned FullSamples() const { return samples_; }
+  unsigned FullLines() const { return lines_; }
+  /// Tiles of another side than the setup argument says.
+  void UseTiles(unsigned side);
+
+ private:
+  RasterPtr<T> level_;
+  LevelShape shape_{0, 0, 0, 1};
+  unsigned samples_ = 0;
+  unsigned lines_ = 0;
+};
+
+/// Makes a level out of blocks of whole lines.
+template <typename T>
+class RasterPyramidScanlineDecimateTask final : public LevelTask<T> {
+ public:
+  explicit RasterPyramidScanlineDecimateTask(ArgList& setup);
+  bool Execute(ArgList& args) override;
+
+ private:
+  std::unique_ptr<LevelStripWriter<T>> writer_;
+};
+
+/// Makes a level out of square blocks as large as a tile of the level, which come row by row. Level
+/// 0 is written block by block.
+template <typename T>
+class RasterPyramidRowDecimateTask final : public LevelTask<T> {
+ public:
+  explicit RasterPyramidRowDecimateTask(ArgList& setup);
+  bool Execute(ArgList& args) override;
+
+ private:
+  bool Copy(const Tile<T>& block);
+
+  std::unique_ptr<LevelStripWriter<T>> writer_;
+  RasterIteratorPtr<T> tiles_;  // of level 0
+};
+
+/// The first stage for rasters of many bands: reads one band after the other, each along Z, and
+/// gives a tile in slot 0. The tiles that make one tile of a level come together that way. Setup
+/// arguments: the raster, and width and height of the tiles as Scalar<unsigned>.
+template <typename T>
+class RasterMortenReadTask final : public SequentialTask {
+ public:
+  explicit RasterMortenReadTask(ArgList& setup);
+  bool Execute(ArgList& args) override;
+
+ private:
+  bool BeginBand();
+  ZPosition NextPosition();
+
+  RasterPtr<T> raster_;
+  TileDimensions tiles_;
+  RasterIteratorPtr<T> iterator_;  // of the band
+  TilePool<T> pool_;
+  unsigned band_ = 0;
+  unsigned bits_ = 0;
+  std::uint64_t index_ = 0;
+  std::uint64_t done_ = 0;
+};
+
+/// Makes a level, tile by tile, out of what RasterMortenReadTask gives. Two more setup arguments:
+/// width and height of the tiles that are read.
+template <typename T>
+class RasterPyramidMortenDecimateTask final : public LevelTask<T> {
+ public:
+  explicit RasterPyramidMortenDecimateTask(ArgList& setup);
+  bool Execute(ArgList& args) override;
+
+ private:
+  bool TakeTile(const Tile<T>& block);
+  bool BeginBand();
+
+  std::unique_ptr<LevelWindow<T>> tile_;  // of the level
+  RasterIteratorPtr<T> iterator_;         // of the level, with the band
+  unsigned blockSide_ = 0;
+  unsigned lastColumn_ = 0;  // of the grid of blocks
+  unsigned lastRow_ = 0;
+  unsigned band_ = 0;
+  bool isBegun_ = false;
+};
+
+extern template class VEXG_EXPORT RasterPyramidScanlineDecimateTask<std::uint8_t>;
+extern template class VEXG_EXPORT RasterPyramidScanlineDecimateTask<std::int8_t>;
+extern template class VEXG_EXPORT RasterPyramidScanlineDecimateTask<std::uint16_t>;
+extern template class VEXG_EXPORT RasterPyramidScanlineDecimateTask<std::int16_t>;
+extern template class VEXG_EXPORT RasterPyramidScanlineDecimateTask<std::uint32_t>;
+extern template class VEXG_EXPORT RasterPyramidScanlineDecimateTask<std::int32_t>;
+extern template class VEXG_EXPORT RasterPyramidScanlineDecimateTask<float>;
+extern template class VEXG_EXPORT RasterPyramidScanlineDecimateTask<double>;
+extern template class VEXG_EXPORT RasterPyramidScanlineDecimateTask<std::uint64_t>;
+extern template class VEXG_EXPORT RasterPyramidScanlineDecimateTask<std::int64_t>;
+extern template class VEXG_EXPORT RasterPyramidScanlineDecimateTask<Complex<float>>;
+extern template class VEXG_EXPORT RasterPyramidScanlineDecimateTask<Complex<double>>;
+
+extern template class VEXG_EXPORT RasterPyramidRowDecimateTask<std::uint8_t>;
+extern template class VEXG_EXPORT RasterPyramidRowDecimateTask<std::int8_t>;
+extern template class VEXG_EXPORT RasterPyramidRowDecimateTask<std::uint16_t>;
+extern template class VEXG_EXPORT RasterPyramidRowDecimateTask<std::int16_t>;
+extern template class VEXG_EXPORT RasterPyramidRowDecimateTask<std::uint32_t>;
+extern template class VEXG_EXPORT RasterPyramidRowDecimateTask<std::int32_t>;
+extern template class VEXG_EXPORT RasterPyramidRowDecimateTask<float>;
+extern template class VEXG_EXPORT RasterPyramidRowDecimateTask<double>;
+extern template class VEXG_EXPORT RasterPyramidRowDecimateTask<std::uint64_t>;
+extern template class VEXG_EXPORT RasterPyramidRowDecimateTask<std::int64_t>;
+extern template class VEXG_EXPORT RasterPyramidRowDecimateTask<Complex<float>>;
+extern template class VEXG_EXPORT RasterPyramidRowDecimateTask<Complex<double>>;
+
+extern template class VEXG_EXPORT RasterMortenReadTask<std::uint8_t>;
+extern template class VEXG_EXPORT RasterMortenReadTask<std::int8_t>;
+extern template class VEXG_EXPORT RasterMortenReadTask<std::uint16_t>;
+extern template class VEXG_EXPORT RasterMortenReadTask<std::int16_t>;
+extern template class VEXG_EXPORT RasterMortenReadTask<std::uint32_t>;
+extern template class VEXG_EXPORT RasterMortenReadTask<std::int32_t>;
+extern template class VEXG_EXPORT RasterMortenReadTask<float>;
+extern template class VEXG_EXPORT RasterMortenReadTask<double>;
+extern template class VEXG_EXPORT RasterMortenReadTask<std::uint64_t>;
+extern template class VEXG_EXPORT RasterMortenReadTask<std::int64_t>;
+extern template class VEXG_EXPORT RasterMortenReadTask<Complex<float>>;
+extern template class VEXG_EXPORT RasterMortenReadTask<Complex<double>>;
+
+extern template class VEXG_EXPORT RasterPyramidMortenDecimateTask<std::uint8_t>;
+extern template class VEXG_EXPORT RasterPyramidMortenDecimateTask<std::int8_t>;
+extern template class VEXG_EXPORT RasterPyramidMortenDecimateTask<std::uint16_t>;
+extern template class VEXG_EXPORT RasterPyramidMortenDecimateTask<std::int16_t>;
+extern template class VEXG_EXPORT RasterPyramidMortenDecimateTask<std::uint32_t>;
+extern template class VEXG_EXPORT RasterPyramidMortenDecimateTask<std::int32_t>;
+extern template class VEXG_EXPORT RasterPyramidMortenDecimateTask<float>;
+extern template class VEXG_EXPORT RasterPyramidMortenDecimateTask<double>;
+extern template class VEXG_EXPORT RasterPyramidMortenDecimateTask<std::uint64_t>;
+extern template class VEXG_EXPORT RasterPyramidMortenDecimateTask<std::int64_t>;
+extern template class VEXG_EXPORT RasterPyramidMortenDecimateTask<Complex<float>>;
+extern template class VEXG_EXPORT RasterPyramidMortenDecimateTask<Complex<double>>;
+
+}  // namespace lumo
