@@ -192,7 +192,8 @@ bool Build::Commit(const std::string& values) {
     const std::vector<TileEntry>& index = indices_[level];
     isWritten = append(index.data(), index.size() * sizeof(TileEntry), header.levels[level]);
   }
-  isWritten = isWritten && append(values.data(), values.size(), header.values);
+  isWritten = isWritten && append(values.data(), values.size(), header.values) &&
+              file_->SetSize(end_, &fault);  // without pixels nothing was written yet
   header.fileBytes = end_;
   const StoredHeader stored = Store(header);
   isWritten = isWritten && file_->Write(kHeaderPlaces[0], &stored, sizeof stored, &fault) &&

@@ -37,7 +37,7 @@ template <typename T>
 bool DynamicRasterPyramid<T>::IsRunning() const {
   if (!builder_) return false;
   if (!builder_->IsFinished()) return true;
-  if (!isEndTaken_) pyramidReader_->PyramidRefresh();
+  if (!isEndTaken_ && !pyramidReader_->PyramidRefresh()) TakeFault();  // there need not be one
   isEndTaken_ = true;
   return false;
 }

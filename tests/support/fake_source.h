@@ -24,7 +24,13 @@ struct FakeBehaviour {
   unsigned failConnects = 0;  // so many calls of Connect fail
   bool throwInCanConnect = false, throwInConnect = false, throwInRead = false;
   bool writable = true;
+  unsigned tileWidth = 4, tileHeight = 2;  // of the description
+  std::int32_t readerType = 17;
+  bool hasLevels = false;   // says so; blocks of them can't be read
+  bool hasMask = false;     // every third pixel, counted along the lines, is masked
+  unsigned failAtRead = 0;  // so many reads after now; 0 for none
   lumo::String uri = "fake://source";
+  GeoRefPtr geoRef;
 
   std::atomic<unsigned> asked{0}, connects{0}, made{0}, destroyed{0}, reads{0}, inRead{0};
   std::atomic<bool> overlapped{false};
@@ -46,7 +52,7 @@ class FakeReader final : public RasterReader<T> {
       : RasterReader<T>(connection), fake_(fake) {}
 
   bool OpBool() override { return true; }
-  std::int32_t ReaderType() override { return 17; }
+  std::int32_t ReaderType() override { return fake_.readerType; }
   lumo::RasterDef RasterDef() override {
     lumo::RasterDef def;
     def.samples = fake_.samples;
@@ -55,8 +61,9 @@ class FakeReader final : public RasterReader<T> {
     def.interleave = fake_.interleave;
     def.dataType = kDataTypeOf<T>;
     def.format = "EXTERNAL";
-    def.tileWidth = 4;
-    def.tileHeight = 2;
+    def.tileWidth = fake_.tileWidth;
+    def.tileHeight = fake_.tileHeight;
+    def.SetGeoRef(fake_.geoRef);
     return def;
   }
   unsigned Samples(unsigned level) override { return fake_.samples >> level; }
@@ -66,7 +73,7 @@ class FakeReader final : public RasterReader<T> {
   std::int32_t PyramidResamplingMethod() override { return 2; }
   std::int32_t PyramidLevelMin() override { return 1; }
   std::int32_t PyramidLevelMax() override { return 2; }
-  bool PyramidExists() override { return false; }
+  bool PyramidExists() override { return fake_.hasLevels; }
   bool PyramidBuild(std::int32_t, std::int32_t, std::int32_t, const TileDimensions&) override {
     return false;
   }
@@ -104,8 +111,12 @@ class FakeReader final : public RasterReader<T> {
   T NoDataValue(unsigned) override { return RampValue<T>(3, 0, 0); }
 
   bool ReadPixels(unsigned left, unsigned top, unsigned width, unsigned height,
-                  const Array<unsigned>& bands, unsigned, T* pixels,
+                  const Array<unsigned>& bands, unsigned level, T* pixels,
                   unsigned char* state) override {
+    if (level != 0 || (fake_.failAtRead != 0 && --fake_.failAtRead == 0)) {
+      SetFault("fake: this block is stuck");
+      return false;
+    }
     fake_.Visit();
     if (++fake_.inRead != 1) fake_.overlapped = true;
     ++fake_.reads;
@@ -120,7 +131,7 @@ class FakeReader final : public RasterReader<T> {
       for (unsigned x = left; x < left + width; ++x) {
         for (const unsigned band : bands) {
           bip.push_back(RampValue<T>(x, y, band));
-          states.push_back(band == 2 && x == 3 ? 1 : 0);
+          states.push_back(StateAt(x, y, band));
         }
       }
     }
@@ -144,6 +155,12 @@ class FakeReader final : public RasterReader<T> {
         for (const unsigned band : bands)
           if (!(*pixel++ == RampValue<T>(x, y, band))) return false;
     return true;
+  }
+
+  /// The pixels of band 2 at sample 3 hold no data.
+  unsigned char StateAt(unsigned x, unsigned y, unsigned band) const {
+    const bool isMasked = fake_.hasMask && (y * fake_.samples + x) % 3 == 0;
+    return static_cast<unsigned char>((band == 2 && x == 3 ? 1 : 0) + (isMasked ? 2 : 0));
   }
 
  private:
