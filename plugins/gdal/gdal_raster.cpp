@@ -254,6 +254,10 @@ const RasterLevel* OpenRaster::CheckPlace(const BlockPlace& place) const {
 bool OpenRaster::Transfer(GDALRWFlag direction, const BlockPlace& place, void* pixels) const {
   const RasterLevel* const level = CheckPlace(place);
   if (level == nullptr) return false;
+  if (newRaster_ != nullptr && newRaster_->Pixels() != nullptr) {
+    TiffPixels& target = *newRaster_->Pixels();
+    return direction == GF_Read ? target.Read(place, pixels) : target.Write(place, pixels);
+  }
   const Messages messages;
   const GDALDataType type = PixelTypeOf(dataType_).type;
   const Strides strides(interleave_, place, GDALGetDataTypeSizeBytes(type));

@@ -44,9 +44,9 @@ unsigned TextWidth(const std::string& text) {
   return static_cast<unsigned>(text.size()) * kGlyphWidth;
 }
 
-/// About five round numbers of one distance between two values.
+/// About eight round numbers of one distance between two values.
 std::vector<double> Ticks(double low, double high) {
-  const double raw = (high - low) / 5;
+  const double raw = (high - low) / 8;
   if (!(raw > 0) || !std::isfinite(raw)) return {low};
   const double decade = std::pow(10, std::floor(std::log10(raw)));
   double step = 10 * decade;
@@ -57,7 +57,7 @@ std::vector<double> Ticks(double low, double high) {
     }
   }
   std::vector<double> ticks;
-  for (double k = std::ceil(low / step); k * step <= high && ticks.size() < 12; ++k) {
+  for (double k = std::ceil(low / step); k * step <= high && ticks.size() < 20; ++k) {
     ticks.push_back(k * step);
   }
   return ticks;

@@ -1,3 +1,4 @@
+#include <algorithm>
 #include <cmath>
 #include <iostream>
 #include <memory>
@@ -65,9 +66,10 @@ T BoundAs(double value, const char* option) {
 /// numbers.
 template <typename T>
 double SizeOf(T lower, T upper, unsigned bins) {
-  const double span = static_cast<double>(upper) - static_cast<double>(lower);
+  double span = static_cast<double>(upper) - static_cast<double>(lower);
   if constexpr (std::is_integral_v<T>) return std::ceil((span + 1) / bins);
   if (!(span > 0)) return 1.0;
+  span = std::max(span, static_cast<double>(upper - lower));  // the larger of both roundings
   double size = span / bins;
   while (std::trunc(span / size) + 1 > bins) size = std::nextafter(size, HUGE_VAL);
   return size;
