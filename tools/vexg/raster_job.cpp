@@ -44,14 +44,15 @@ JobWriterCommand& JobDraft::Step(const std::string& name, const char* id) {
   command->attributes["Name"] = String(name);
   command->attributes["ID"] = id;
   if (!steps_.empty()) command->AddDependsOn(steps_.back().name);
-  steps_.push_back({String(name), id, "", ""});
+  steps_.push_back({String(name), id, "", "", ""});
   return *command;
 }
 
-JobWriterCommand& JobDraft::Open(const std::string& name, const char* id) {
+JobWriterCommand& JobDraft::Open(const std::string& name, const char* id, const char* output) {
   JobWriterCommand& command = Step(name, id);
   steps_.back().opens = String("$" + name);
-  command.AddOutput("URI", steps_.back().opens);
+  steps_.back().output = output;
+  command.AddOutput(output, steps_.back().opens);
   return command;
 }
 
@@ -117,8 +118,8 @@ void JobSession::NoteOpenRasters(const JobDraft& draft, const JobResults& result
   Map<String, String> variables;
   for (const JobDraft::StepInfo& step : draft.GetSteps()) {
     const JobResult& result = results.Find(step.name);
-    if (step.opens.GetLength() != 0 && result.returns.HasKey("URI")) {
-      const String uri = result.returns.Find("URI");
+    if (step.opens.GetLength() != 0 && result.returns.HasKey(step.output)) {
+      const String uri = result.returns.Find(step.output);
       if (uri.GetLength() == 0) continue;
       variables[step.opens] = uri;
       open_.push_back(uri);

@@ -36,7 +36,8 @@ class JobDraft {
   JobWriterCommand& Step(const std::string& name, const char* id);
 
   /// Adds a command that opens or makes a raster; its URI goes into the variable "$" name.
-  JobWriterCommand& Open(const std::string& name, const char* id);
+  /// @param output  of the command, that gives the URI.
+  JobWriterCommand& Open(const std::string& name, const char* id, const char* output = "URI");
   /// Adds the command that closes a raster: a variable of Open, or the URI of one that is open.
   void Close(const std::string& name, const String& raster);
 
@@ -49,6 +50,7 @@ class JobDraft {
     String id;
     String opens;   ///< the variable that a raster's URI goes into
     String closes;  ///< a variable or URI
+    String output;  ///< that gives the URI, of a step that opens one
   };
   const std::vector<StepInfo>& GetSteps() const { return steps_; }
 

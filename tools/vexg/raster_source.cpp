@@ -67,6 +67,43 @@ void AddOpen(JobDraft& draft, const std::string& name, const SourceOptions& sour
   draft.Open(name, "OpenRasterCommand").AddInput("ConnStr", ConnStringsOf(source));
 }
 
+std::string PyramidPathOf(const std::string& file) {
+  return AbsoluteName(file) + ".pyr";
+}
+
+namespace {
+
+/// The pyramid file that goes with a raster; empty for none.
+std::string FindPyramid(const std::string& file) {
+  if (file.find("://") != std::string::npos) return {};
+  const std::string pyramid = PyramidPathOf(file);
+  std::error_code fault;
+  if (!std::filesystem::is_regular_file(pyramid, fault)) return {};
+  const auto rasterTime = std::filesystem::last_write_time(AbsoluteName(file), fault);
+  if (fault || std::filesystem::last_write_time(pyramid, fault) >= rasterTime) return pyramid;
+  static bool isSaid = false;
+  if (!isSaid) {
+    Say(file + ".pyr is older than the raster and not used; vexg pyramid build makes it anew");
+  }
+  isSaid = true;
+  return {};
+}
+
+}  // namespace
+
+void AddOpenWithPyramid(JobDraft& draft, const std::string& name, const SourceOptions& source) {
+  JobWriterCommand& open = draft.Open(name, "OpenRasterCommand");
+  open.AddInput("ConnStr", ConnStringsOf(source));
+  const std::string pyramid = FindPyramid(source.file);
+  if (!pyramid.empty()) open.AddInput("PyramidConnStr", ConnStrings({"Pyramid", String(pyramid)}));
+}
+
+void AddLevel(JobDraft& draft, const std::string& name, const String& raster, unsigned level) {
+  JobWriterCommand& command = draft.Open(name, "GetRasterPyramidCommand", "PyramidURI");
+  command.AddInput("URI", raster);
+  command.AddInput("Level", level);
+}
+
 void AddBandView(JobDraft& draft, const std::string& name, const String& raster,
                  const Array<unsigned>& bands) {
   JobWriterCommand& view = draft.Open(name, "CreateSpectralSubsetRasterCommand");
@@ -95,6 +132,9 @@ RasterInfo ReadInfo(const JobResults& results, const std::string& name) {
   info.tiles = ParseValue<TileDimensions>(query.Find("TileDimensions"));
   info.canWrite = ParseValue<bool>(query.Find("CanWrite"));
   info.hasPyramid = ParseValue<bool>(query.Find("PyramidExists"));
+  info.pyramidType = query.Find("PyramidType");
+  info.levelMin = ParseValue<unsigned>(query.Find("PyramidLevelMin"));
+  info.levelMax = ParseValue<unsigned>(query.Find("PyramidLevelMax"));
   info.hasNoData = ParseValue<Array<bool>>(query.Find("HasNoDataValue"));
   info.noData = query.Find("NoDataValue");
   info.hasPalette = ParseValue<Array<bool>>(query.Find("HasPalette"));

@@ -37,6 +37,9 @@ struct RasterInfo {
   TileDimensions tiles;  ///< blocks of the source; 0 where it has none
   bool canWrite = false;
   bool hasPyramid = false;
+  String pyramidType;     ///< the word
+  unsigned levelMin = 0;  ///< of the pyramid
+  unsigned levelMax = 0;
   Array<bool> hasNoData;  ///< for each band
   String noData;          ///< text of an array of the pixel type, for each band
   Array<bool> hasPalette;
@@ -48,6 +51,17 @@ struct RasterInfo {
 
 /// Adds the command that opens a source, into the variable "$" name.
 void AddOpen(JobDraft& draft, const std::string& name, const SourceOptions& source);
+
+/// Where the pyramid file of a raster lies unless the user says otherwise: beside it.
+std::string PyramidPathOf(const std::string& file);
+
+/// AddOpen, with the pyramid file beside the raster where there is one. One that is older than the
+/// raster tells of other pixels: it is left out, and the user hears of it.
+void AddOpenWithPyramid(JobDraft& draft, const std::string& name, const SourceOptions& source);
+
+/// Adds the command that shows a level of the pyramid of a raster, into the variable "$" name.
+/// @param raster  a variable or URI.
+void AddLevel(JobDraft& draft, const std::string& name, const String& raster, unsigned level);
 
 /// Adds the command that chooses bands of a raster, into the variable "$" name.
 /// @param raster  a variable or URI.

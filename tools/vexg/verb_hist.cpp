@@ -204,7 +204,7 @@ class HistogramJob {
   /// The counting as one document that opens and closes the raster.
   JobDraft PrintedDraft(const std::vector<BandBins<T>>& bands) const {
     JobDraft draft;
-    AddOpen(draft, "raster", options_.source);
+    AddOpenWithPyramid(draft, "raster", options_.source);
     AddSteps(draft, bands, "$raster");
     draft.Close("close", "$raster");
     return draft;
@@ -289,7 +289,7 @@ int Hist(const Options& options) {
   }
   JobSession session(options.job);
   JobDraft opening;
-  AddOpen(opening, "raster", options.source);
+  AddOpenWithPyramid(opening, "raster", options.source);
   AddQuery(opening, "raster", "$raster");
   const JobResults opened = session.Run(opening);
   const String raster = opened.Find("raster").returns.Find("URI");

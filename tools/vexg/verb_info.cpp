@@ -124,6 +124,7 @@ Json AsJson(const std::string& file, const RasterInfo& info) {
           {"hasPalette", FlagsAsJson(info.hasPalette)},
           {"canWrite", info.canWrite},
           {"hasPyramid", info.hasPyramid},
+          {"pyramidLevels", info.hasPyramid ? Json::array({info.levelMin, info.levelMax}) : Json()},
           {"geoRef", GeoRefAsJson(info)}};
 }
 
@@ -175,12 +176,16 @@ std::string AsText(const std::string& file, const RasterInfo& info) {
   text += fmt::format("  pixels         {}, {}\n", DataTypeName(info.dataType).ToUTF8(),
                       FormatValue(info.interleave).ToUTF8());
   text += fmt::format("  no data        {}\n", BandsAsText(NoDataAsJson(info)));
+  if (info.hasPyramid) {
+    text += fmt::format("  pyramid        {}, levels {} to {}\n", info.pyramidType.ToUTF8(),
+                        info.levelMin, info.levelMax);
+  }
   return text + GeoRefAsText(info);
 }
 
 JobDraft MakeDraft(const SourceOptions& source) {
   JobDraft draft;
-  AddOpen(draft, "raster", source);
+  AddOpenWithPyramid(draft, "raster", source);
   AddQuery(draft, "raster", "$raster");
   draft.Close("close", "$raster");
   return draft;

@@ -1,3 +1,4 @@
+#include <algorithm>
 #include <charconv>
 #include <cstdlib>
 #include <iostream>
@@ -56,16 +57,44 @@ Array<unsigned> ChooseBands(const std::string& text, const RasterInfo& info) {
 
 JobDraft OpenDraft(const Options& options) {
   JobDraft draft;
-  AddOpen(draft, "raster", options.source);
+  AddOpenWithPyramid(draft, "raster", options.source);
   AddQuery(draft, "raster", "$raster");
   return draft;
 }
 
+/// The smallest level of the pyramid that is as large as the picture; 0 for the raster itself.
+unsigned ChooseLevel(const RasterInfo& info, unsigned size) {
+  if (!info.hasPyramid) return 0;
+  const unsigned longer = std::max(info.samples, info.lines);
+  unsigned level = info.levelMax;
+  while (level >= std::max(info.levelMin, 1U) && (longer >> level) < size) --level;
+  const bool isThere = level >= info.levelMin && (std::min(info.samples, info.lines) >> level) != 0;
+  return isThere ? level : 0;
+}
+
+/// Shows a level as a raster of its own.
+JobDraft LevelDraft(const String& raster, unsigned level) {
+  JobDraft draft;
+  AddLevel(draft, "level", raster, level);
+  AddQuery(draft, "level", "$level");
+  return draft;
+}
+
+/// What the picture is made from.
+struct Shown {
+  unsigned level = 0;
+  String raster;  ///< URI
+  RasterInfo info;
+};
+
 /// The whole of the work as one document; each block has memory of its own there.
-void PrintJob(const Options& options, const RasterInfo& info, const Array<unsigned>& bands,
+void PrintJob(const Options& options, const Shown& shown, const Array<unsigned>& bands,
               const std::vector<SubRect>& blocks) {
   JobDraft draft = OpenDraft(options);
-  AddBlockSteps(draft, "$raster", info, bands, Interleave::BIP, blocks);
+  if (shown.level != 0) AddLevel(draft, "level", "$raster", shown.level);
+  AddBlockSteps(draft, shown.level != 0 ? "$level" : "$raster", shown.info, bands, Interleave::BIP,
+                blocks);
+  if (shown.level != 0) draft.Close("close.level", "$level");
   draft.Close("close", "$raster");
   std::cout << draft.Write().ToUTF8() << '\n';
 }
@@ -87,15 +116,21 @@ int Quicklook(const Options& options) {
   output.RefuseInput(PathOf(raster));
   const RasterInfo info = ReadInfo(opened, "raster");
   const Array<unsigned> bands = ChooseBands(options.bands, info);
-  QuicklookPicture picture(info, options.size, bands);
+  Shown shown{ChooseLevel(info, options.size), raster, info};
+  if (shown.level != 0) {
+    const JobResults level = session.Run(LevelDraft(raster, shown.level));
+    shown.raster = level.Find("level").returns.Find("PyramidURI");
+    shown.info = ReadInfo(level, "level");
+  }
+  QuicklookPicture picture(shown.info, options.size, bands);
   const std::vector<SubRect> blocks = picture.GetBlocks();
   if (options.job.printJob) {
-    PrintJob(options, info, bands, blocks);
+    PrintJob(options, shown, bands, blocks);
     return kExitSuccess;
   }
   constexpr std::uint64_t kMostChannels = 4;
   output.Begin(kMostChannels * picture.GetWidth() * picture.GetHeight());
-  BlockReader reader(session, raster, info, options.source.file);
+  BlockReader reader(session, shown.raster, shown.info, options.source.file);
   reader.ReadAll(
       blocks, bands, Interleave::BIP, options.job.GetProgressStyle(),
       [&](const SubRect& block) { picture.Take(block, reader.GetPixels(), reader.GetStates()); });

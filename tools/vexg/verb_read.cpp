@@ -23,6 +23,7 @@ struct Options {
   std::string interleave = "bip";
   std::string output;
   std::string mask;
+  unsigned level = 0;
   bool overwrite = false;
 };
 
@@ -93,10 +94,20 @@ void CheckPng(const Options& options, const Request& request) {
   }
 }
 
+/// The name of the raster, or level of one, that is read.
+const char* NameOf(const Options& options) {
+  return options.level == 0 ? "raster" : "level";
+}
+
 JobDraft OpenDraft(const Options& options) {
   JobDraft draft;
-  AddOpen(draft, "raster", options.source);
-  AddQuery(draft, "raster", "$raster");
+  if (options.level == 0) {
+    AddOpen(draft, "raster", options.source);
+  } else {
+    AddOpenWithPyramid(draft, "raster", options.source);
+    AddLevel(draft, "level", "$raster", options.level);
+  }
+  AddQuery(draft, NameOf(options), String(std::string("$") + NameOf(options)));
   return draft;
 }
 
@@ -104,7 +115,9 @@ JobDraft OpenDraft(const Options& options) {
 /// runs it makes.
 void PrintJob(const Options& options, const Request& request, const std::vector<SubRect>& blocks) {
   JobDraft draft = OpenDraft(options);
-  AddBlockSteps(draft, "$raster", request.info, request.bands, request.interleave, blocks);
+  AddBlockSteps(draft, String(std::string("$") + NameOf(options)), request.info, request.bands,
+                request.interleave, blocks);
+  if (options.level != 0) draft.Close("close.level", "$level");
   draft.Close("close", "$raster");
   std::cout << draft.Write().ToUTF8() << '\n';
 }
@@ -115,7 +128,7 @@ std::unique_ptr<PixelSink> MakeSink(const OutputFile& output, const Request& req
 }
 
 Request MakeRequest(const Options& options, const JobResults& opened, bool isPng) {
-  Request request{ReadInfo(opened, "raster"), {}, {}, ParseInterleave(options.interleave)};
+  Request request{ReadInfo(opened, NameOf(options)), {}, {}, ParseInterleave(options.interleave)};
   request.rect = ParseRect(options.rect, request.info);
   request.bands = ParseBands(options.bands, request.info);
   if (isPng) {
@@ -179,7 +192,9 @@ int Read(const Options& options) {
   output.Begin(request.GetBytes());
   mask.Begin(request);
   const std::unique_ptr<PixelSink> pixels = MakeSink(output, request, isPng);
-  BlockReader reader(session, raster, request.info, options.source.file);
+  const String source =
+      options.level == 0 ? raster : opened.Find("level").returns.Find("PyramidURI");
+  BlockReader reader(session, source, request.info, options.source.file);
   reader.ReadAll(blocks, request.bands, request.interleave, options.job.GetProgressStyle(),
                  [&](const SubRect& block) {
                    pixels->Write(block, reader.GetPixels());
@@ -215,6 +230,10 @@ const VerbRegistration registration(
                      "A second array, of a byte for each value: 0 valid, else the sum of 1 no "
                      "data, 2 masked, 4 outside the region")
           ->type_name("OUT.npy");
+      app.add_option("--level", options->level,
+                     "Level of its pyramid: 0 the raster itself, each further one half the size")
+          ->check(CLI::Range(0U, 31U))
+          ->capture_default_str();
       app.add_flag("--overwrite", options->overwrite, "Replace files that are there");
       options->job.AddTo(app);
       options->job.AddProgressTo(app);

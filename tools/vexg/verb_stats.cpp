@@ -25,7 +25,7 @@ constexpr const char* kStatsStep = "stats";
 /// The whole of the work as one document.
 JobDraft MakeDraft(const Options& options, const Array<unsigned>& bands) {
   JobDraft draft;
-  AddOpen(draft, "raster", options.source);
+  AddOpenWithPyramid(draft, "raster", options.source);
   if (!options.bands.empty()) AddBandView(draft, "bands", "$raster", bands);
   const String shown = options.bands.empty() ? "$raster" : "$bands";
   draft
@@ -155,7 +155,7 @@ int Stats(const Options& options) {
   }
   JobSession session(options.job);
   JobDraft opening;
-  AddOpen(opening, "raster", options.source);
+  AddOpenWithPyramid(opening, "raster", options.source);
   AddQuery(opening, "raster", "$raster");
   opening.Close("close.raster", "$raster");
   const RasterInfo info = ReadInfo(session.Run(opening), "raster");
