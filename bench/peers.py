@@ -178,21 +178,39 @@ def calibrate(bench):
 def memory(bench):
     """Peak memory of one scene and of one four times as large."""
     target = bench.work / "calibrated.tif"
-    for verb in (["stats"], ["stats", "--extended"], ["hist"], ["calibrate"]):
+    for verb in (["stats"], ["stats", "--extended"], ["hist"], ["calibrate"], ["pyramid"]):
         peaks = []
         for size in (bench.options.size, 2 * bench.options.size):
             scene = bench.scene("UInt16", "tiled", size)
             command = [bench.vexg, *verb, scene]
             if verb[0] == "calibrate":
                 command = [bench.vexg, "calibrate", "radiance", scene, target, "--gain", "0.5", "--offset", "-3"]
+            if verb[0] == "pyramid":
+                command = [bench.vexg, "pyramid", "build", scene, "--levels", "1-5", "-q", "--output",
+                           bench.work / "levels.pyr"]
             target.unlink(missing_ok=True)
             peaks.append(bench.once(command)[1])
         print(f"memory {' '.join(verb):<27} {peaks[0]:5.0f} MiB, of a scene four times as large {peaks[1]:5.0f} MiB "
               "(aim 300, and 50 apart)")
     target.unlink(missing_ok=True)
+    (bench.work / "levels.pyr").unlink(missing_ok=True)
 
 
-SECTIONS = {"stats": stats, "hist": hist, "calibrate": calibrate, "memory": memory}
+def pyramid(bench):
+    """Levels 1 to 5 with statistics and a histogram, beside what GDAL needs for levels and statistics."""
+    for type_name, aim in (("Byte", 1.0), ("UInt16", 1.0), ("Float32", 0.7)):
+        for layout in ("tiled", "strips", "by band"):
+            scene = bench.scene(type_name, layout)
+            levels = ["gdaladdo", "-q", "-ro", "-r", "nearest", scene, "2", "4", "8", "16", "32"]
+            bench.compare(f"pyramid {type_name} {layout}",
+                          [bench.vexg, "pyramid", "build", scene, "--levels", "1-5", "-q"],
+                          {"gdaladdo and gdalinfo -stats": [levels, ["gdalinfo", "-stats", scene]],
+                           "gdaladdo": levels},
+                          {"gdaladdo and gdalinfo -stats": aim, "gdaladdo": 1.0},
+                          [f"{scene}{ending}" for ending in (".pyr", ".ovr", ".aux.xml")])
+
+
+SECTIONS = {"stats": stats, "hist": hist, "calibrate": calibrate, "pyramid": pyramid, "memory": memory}
 
 
 def main():

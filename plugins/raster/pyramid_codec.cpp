@@ -4,11 +4,35 @@
 #include <lz4.h>
 
 namespace lumo::pyramid {
+namespace {
+
+constexpr std::size_t kLeastGain = 8;  // an eighth
+
+/// True when samples of the bytes can be packed: most pixels can't be, and to find that out of all
+/// of them takes as long as everything else that becomes of a tile.
+bool IsWorthwhile(std::span<const unsigned char> bytes) {
+  constexpr std::size_t kSample = 8192, kSamples = 3;
+  if (bytes.size() < 4 * kSample * kSamples) return true;
+  std::size_t total = 0;
+  char packed[LZ4_COMPRESSBOUND(kSample)];
+  for (std::size_t i = 0; i < kSamples; ++i) {
+    const std::size_t at = (2 * i + 1) * bytes.size() / (2 * kSamples) - kSample / 2;
+    total += static_cast<std::size_t>(
+        LZ4_compress_default(reinterpret_cast<const char*>(bytes.data()) + at, packed,
+                             static_cast<int>(kSample), static_cast<int>(sizeof packed)));
+  }
+  return total <= kSamples * kSample - kSamples * kSample / kLeastGain;
+}
+
+}  // namespace
 
 void Pack(Compression compression, std::span<const unsigned char> bytes, Bytes& packed) {
   packed.Resize(0);
-  if (compression == Compression::kNone || bytes.size() > LZ4_MAX_INPUT_SIZE) return;
-  const std::size_t most = bytes.size() - bytes.size() / 8 - 1;
+  if (compression == Compression::kNone || bytes.size() > LZ4_MAX_INPUT_SIZE ||
+      !IsWorthwhile(bytes)) {
+    return;
+  }
+  const std::size_t most = bytes.size() - bytes.size() / kLeastGain - 1;
   packed.Resize(most);
   const int count = LZ4_compress_default(reinterpret_cast<const char*>(bytes.data()),
                                          reinterpret_cast<char*>(packed.Get()),

@@ -24,7 +24,7 @@ struct Options {
   std::string type;
   std::string method = "Nearest";
   std::string compression;
-  unsigned side = 256;
+  unsigned side = 128;
   bool json = false;
 
   bool IsDriver() const { return type == "DRIVER"; }
