@@ -78,7 +78,9 @@ bool LiesInside(const Extent& extent, std::uint64_t fileBytes) {
 
 const char* FindFaultOfPlaces(const Header& h, std::uint64_t fileBytes) {
   constexpr std::uint64_t kMostValueBytes = std::uint64_t{256} << 20;
+  constexpr std::uint64_t kMostChanges = std::uint64_t{1} << 62;
   if (h.fileBytes < kDataBegin || h.fileBytes > fileBytes) return "the file is cut off";
+  if (h.sequence > kMostChanges) return "the header is damaged";
   if (!LiesInside(h.values, h.fileBytes) || h.values.bytes > kMostValueBytes) {
     return "its values lie outside of it";
   }
