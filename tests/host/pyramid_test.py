@@ -1,0 +1,156 @@
+"""Pyramids on the command line: building, using and deleting them, and builds that are cut short."""
+
+import json
+import os
+import random
+import signal
+import subprocess
+import unittest
+
+from support import FolderTest, PipeTest, needs_gdal, read_npy, read_png, run, start, write_orva
+
+SAMPLES, LINES, BANDS = 301, 200, 3
+
+
+def every(pixels, level, samples=SAMPLES, lines=LINES, bands=BANDS):
+    """Every 2^level-th pixel of every 2^level-th line."""
+    step = 1 << level
+    return b"".join(pixels[(y * step * samples + x * step) * bands:][:bands]
+                    for y in range(lines >> level) for x in range(samples >> level))
+
+
+class Pyramids(PipeTest, FolderTest):
+    def setUp(self):
+        super().setUp()
+        self.pixels = random.Random(5).randbytes(SAMPLES * LINES * BANDS)
+        self.file = write_orva(self.folder / "scene", SAMPLES, LINES, BANDS, self.pixels)
+        self.pyramid = self.folder / "scene.pyr"
+
+    def level(self, level, *options):
+        self.fine("read", self.file, "--level", level, "-o", self.folder / "out.npy", "--overwrite", *options)
+        return read_npy(self.folder / "out.npy")
+
+    def files(self):
+        return sorted(path.name for path in self.folder.iterdir())
+
+    def test_levels_are_built_read_and_deleted(self):
+        self.serve()
+        for server in ([], ["--server", "test"]):
+            with self.subTest(server):
+                self.fine("pyramid", "build", self.file, "--levels", "1-3", *server)
+                self.assertEqual(self.files(), ["scene", "scene.hdr", "scene.pyr"])
+                for level in (1, 2, 3):
+                    shape = (LINES >> level, SAMPLES >> level, BANDS)
+                    self.assertEqual(self.level(level, *server), ("|u1", shape, every(self.pixels, level)))
+                info = json.loads(self.fine("pyramid", "info", self.file, "--json", *server))
+                self.assertEqual((info["type"], info["method"], info["pyramid"]), ("ORVA", "Nearest", str(self.pyramid)))
+                self.assertEqual(info["levels"], [{"level": level, "samples": SAMPLES >> level, "lines": LINES >> level}
+                                                  for level in (1, 2, 3)])
+                self.assertEqual(json.loads(self.fine("info", self.file, "--json"))["pyramidLevels"], [1, 3])
+                (self.folder / "out.npy").unlink()
+                self.fails(1, "no pixels at level 4", "read", self.file, "--level", "4", "-o", self.folder / "out.npy")
+                self.fine("pyramid", "delete", self.file, *server)
+                self.assertEqual(self.files(), ["scene", "scene.hdr"])
+                self.fails(1, "there is no pyramid", "pyramid", "info", self.file)
+
+    def test_statistics_come_with_it(self):
+        before = self.fine("stats", self.file, "--json")
+        self.fine("pyramid", "build", self.file)
+        self.file.write_bytes(bytes(len(self.pixels)))  # what is told now is out of the pyramid
+        os.utime(self.pyramid)
+        after = json.loads(self.fine("stats", self.file, "--json"))
+        for want, got in zip(json.loads(before)["bands"], after["bands"]):
+            for name in ("count", "min", "max", "sum", "sum2"):
+                self.assertEqual(got[name], want[name])
+
+    def test_a_picture_is_made_from_the_smallest_level_that_is_large_enough(self):
+        self.fine("pyramid", "build", self.file, "--levels", "1-3", "--tile", "16")
+        for size, level in ((301, None), (200, None), (150, 1), (76, 1), (75, 2), (30, 3)):
+            job = self.fine("quicklook", self.file, self.folder / "out.png", "--size", size, "--print-job")
+            self.assertEqual('Input Level="' in job, level is not None, size)
+            if level is not None:
+                self.assertIn(f'Input Level="{level}"', job, size)
+        self.fine("quicklook", self.file, self.folder / "out.png", "--size", 75, "--stretch", "none")
+        self.assertEqual(read_png(self.folder / "out.png"), (75, 50, 3, every(self.pixels, 2)))
+
+    def test_one_that_is_older_than_the_raster_is_not_used(self):
+        self.fine("pyramid", "build", self.file)
+        os.utime(self.pyramid, (1, 1))
+        code, out, err = run("info", "--json", str(self.file))
+        self.assertEqual(code, 0)
+        self.assertFalse(json.loads(out)["hasPyramid"])
+        self.assertEqual(err.count("is older than the raster"), 1)
+        self.fine("pyramid", "build", self.file)
+        self.assertTrue(json.loads(self.fine("info", "--json", self.file))["hasPyramid"])
+
+    def test_what_can_not_be_is_refused(self):
+        for words, options in (("--levels", ["--levels", "3-1"]), ("--levels", ["--levels", "1-32"]),
+                               ("--levels", ["--levels", "a"]), ("--method", ["--method", "Cubic"])):
+            self.fails(2, words, "pyramid", "build", self.file, *options)
+        letter = self.folder / "letter"
+        letter.write_text("Dear all")
+        self.fails(1, "no pyramid: it stays", "pyramid", "build", self.file, "--output", letter)
+        self.assertEqual(letter.read_text(), "Dear all")
+        self.fails(1, "No such file", "pyramid", "delete", self.file, "--output", self.folder / "none")
+        self.pyramid.write_bytes(b"VEXGPYRAMID01\n".ljust(9000, b"\0"))
+        self.fails(1, "scene.pyr: the header is damaged", "info", self.file)
+        self.fine("pyramid", "build", self.file)  # makes it good again
+        self.assertEqual(self.level(1)[2], every(self.pixels, 1))
+
+    def test_the_printed_job_builds_it(self):
+        job = self.fine("pyramid", "build", self.file, "--levels", "2", "--print-job")
+        self.assertEqual(self.files(), ["scene", "scene.hdr"])
+        self.assertEqual(self.fine("run", "-", stdin=job).count('Result="Success"'), 3)
+        self.assertEqual(self.level(2)[2], every(self.pixels, 2))
+
+    @needs_gdal
+    def test_a_driver_keeps_its_own(self):
+        tiff = self.folder / "scene.tif"
+        self.fine("copy", self.file, tiff)
+        self.fine("pyramid", "build", tiff, "--type", "DRIVER", "--levels", "1-2")
+        self.assertEqual(self.files(), ["scene", "scene.hdr", "scene.tif", "scene.tif.ovr"])
+        info = json.loads(self.fine("pyramid", "info", tiff, "--json"))
+        self.assertEqual((info["type"], [level["samples"] for level in info["levels"]]), ("DRIVER", [151, 76]))
+        told = subprocess.run(["gdalinfo", tiff], check=True, capture_output=True, text=True).stdout
+        self.assertIn("Overviews: 151x100, 76x50", told)
+        self.fine("pyramid", "delete", tiff)
+        self.assertEqual(self.files(), ["scene", "scene.hdr", "scene.tif"])
+
+
+class CutShort(FolderTest):
+    """Builds of a raster that takes its time."""
+
+    def setUp(self):
+        super().setUp()
+        self.file = write_orva(self.folder / "large", 30000, 20000, 1)
+        self.pyramid = self.folder / "large.pyr"
+
+    def build_until_half(self, how):
+        process = start("pyramid", "build", str(self.file), "--levels", "1-4", "--progress=json")
+        for line in process.stderr:
+            if json.loads(line)["progress"] >= 0.3:
+                break
+        process.send_signal(how)
+        _, err = process.communicate(timeout=60)
+        return process.returncode, err
+
+    def test_a_killed_build_leaves_no_pyramid_and_an_old_one_as_it_was(self):
+        self.build_until_half(signal.SIGKILL)
+        self.assertFalse(self.pyramid.exists())
+        (rest,) = self.folder.glob("large.pyr.*.tmp")
+        self.fails(1, "isn't a whole pyramid", "info", "--input-format", "Pyramid", rest)
+        self.fine("pyramid", "build", self.file, "--levels", "3-4")
+        before = self.pyramid.read_bytes()
+        self.build_until_half(signal.SIGKILL)
+        self.assertEqual(self.pyramid.read_bytes(), before)
+        self.assertEqual(json.loads(self.fine("pyramid", "info", self.file, "--json"))["levels"][0]["level"], 3)
+
+    def test_an_interrupted_build_leaves_nothing(self):
+        code, err = self.build_until_half(signal.SIGINT)
+        self.assertEqual(code, 1)
+        self.assertIn("interrupted", err)
+        self.assertEqual(sorted(path.name for path in self.folder.iterdir()), ["large", "large.hdr"])
+
+
+if __name__ == "__main__":
+    unittest.main()
