@@ -5,6 +5,7 @@
 #include "gdal_peer.h"
 #include "support/sample_data.h"
 #include "support/temporary_directory.h"
+#include "views/catalog_raster_ref.h"
 
 namespace lumo {
 namespace {
@@ -404,6 +405,34 @@ TEST(GdalValues, LevelsAreBuiltBesideTheFileAndTakenAway) {
   Release(source);
   EXPECT_FALSE(fs::exists(copy.Path() + ".ovr"));
   EXPECT_EQ(copy.Bytes(), before);
+}
+
+TEST(GdalValues, LevelsThatTheDriverBuiltShowInWhatIsOpen) {
+  const Copy copy("landsat7_u16_tiled.tif");
+  const auto other = OpenSource({copy.Path()});
+  const auto reader = ReaderOf<std::uint16_t>(other);
+  EXPECT_EQ(reader->PyramidType(), static_cast<int>(PyramidType::kDriver));
+  {
+    const BasicRasterPtr raster(MakeReaderRaster(DataConnectionPtr(OpenSource({copy.Path()})),
+                                                 DataConnectionPtr(OpenSource({copy.Path()}))));
+    ASSERT_TRUE(raster && !raster->PyramidExists());
+    PyramidDef def;
+    def.levelMin = 1;
+    def.levelMax = 2;
+    def.resamplingMethod = PyramidResamplingMethod::kNearest;
+    const AsyncPtr build = raster->PyramidBuild(def, TileDimensions(), AsyncCallbackPtr());
+    ASSERT_TRUE(build);
+    build->WaitFinished();
+    EXPECT_FALSE(build->HasError());
+    ASSERT_TRUE(raster->PyramidExists());
+    EXPECT_EQ(raster->GetPyramidDef().pyramidType, PyramidType::kDriver);
+    EXPECT_EQ(raster->GetPyramidDef().levelMax, 2U);
+    const RasterPtr<std::uint16_t> level = RasterPtr<std::uint16_t>(raster)->PyramidLevel(2);
+    EXPECT_EQ(level->Samples(), 88U);
+  }
+  EXPECT_FALSE(reader->PyramidExists());
+  EXPECT_TRUE(reader->PyramidRefresh()) << TakeFault().ToUTF8();
+  EXPECT_EQ(reader->PyramidLevelMax(), 2);
 }
 
 }  // namespace
