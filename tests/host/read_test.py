@@ -5,6 +5,7 @@ import pathlib
 import random
 import re
 import struct
+import subprocess
 import unittest
 import xml.etree.ElementTree as ElementTree
 import zlib
@@ -133,17 +134,21 @@ class Quicklook(FolderTest):
 
     @needs_gdal
     def test_shows_pixels_in_the_middle_stretched(self):
-        width, height, channels, pixels = self.look(DATA / "landsat7_olinda.tif", "--size", "100")
-        self.assertEqual((width, height, channels), (99, 100, 3))
-        source = gdal_pixels(DATA / "landsat7_olinda.tif", "-b", "3", "-b", "2", "-b", "1")
-        picked = [source[((2 * y + 1) * 352 // 200 * 349 + (2 * x + 1) * 349 // 198) * 3:][:3]
-                  for y in range(100) for x in range(99)]
-        for band in range(3):
-            values = sorted(pixel[band] for pixel in picked)
-            low, high = values[round(9899 * 0.02)], values[round(9899 * 0.98)]
-            for i, pixel in enumerate(picked):
-                want = min(max((pixel[band] - low) / (high - low) * 255, 0), 255)
-                self.assertLessEqual(abs(pixels[3 * i + band] - want), 0.5 + 1e-9)
+        scene = DATA / "landsat7_olinda.tif"  # with overviews
+        plain = self.folder / "plain.tif"
+        subprocess.run(["gdal_translate", "-q", scene, plain], check=True)
+        for file, samples, lines, options in ((plain, 349, 352, []), (scene, 175, 176, ["-oo", "OVERVIEW_LEVEL=0"])):
+            width, height, channels, pixels = self.look(file, "--size", "100")
+            self.assertEqual((width, height, channels), (99, 100, 3))
+            source = gdal_pixels(file, "-b", "3", "-b", "2", "-b", "1", *options)
+            picked = [source[((2 * y + 1) * lines // 200 * samples + (2 * x + 1) * samples // 198) * 3:][:3]
+                      for y in range(100) for x in range(99)]
+            for band in range(3):
+                values = sorted(pixel[band] for pixel in picked)
+                low, high = values[round(9899 * 0.02)], values[round(9899 * 0.98)]
+                for i, pixel in enumerate(picked):
+                    want = min(max((pixel[band] - low) / (high - low) * 255, 0), 255)
+                    self.assertLessEqual(abs(pixels[3 * i + band] - want), 0.5 + 1e-9)
 
     @needs_gdal
     def test_without_a_stretch_shows_values(self):

