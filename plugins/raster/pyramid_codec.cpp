@@ -28,8 +28,9 @@ bool IsWorthwhile(std::span<const unsigned char> bytes) {
 
 void Pack(Compression compression, std::span<const unsigned char> bytes, Bytes& packed) {
   packed.Resize(0);
-  if (compression == Compression::kNone || bytes.size() > LZ4_MAX_INPUT_SIZE ||
-      !IsWorthwhile(bytes)) {
+  constexpr std::size_t kLeast = 64;
+  if (compression == Compression::kNone || bytes.size() < kLeast ||
+      bytes.size() > LZ4_MAX_INPUT_SIZE || !IsWorthwhile(bytes)) {
     return;
   }
   const std::size_t most = bytes.size() - bytes.size() / kLeastGain - 1;

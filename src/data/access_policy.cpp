@@ -15,6 +15,7 @@ namespace fs = std::filesystem;
 std::mutex gMutex;
 AccessPolicy gPolicy;
 thread_local unsigned tOwnMemory = 0;
+thread_local unsigned tAdmitted = 0;
 
 bool IsOneOf(std::string_view text, std::initializer_list<std::string_view> list) {
   return std::find(list.begin(), list.end(), text) != list.end();
@@ -94,6 +95,14 @@ OwnMemoryScope::~OwnMemoryScope() {
   --tOwnMemory;
 }
 
+AdmittedSourceScope::AdmittedSourceScope() {
+  ++tAdmitted;
+}
+
+AdmittedSourceScope::~AdmittedSourceScope() {
+  --tAdmitted;
+}
+
 AccessPolicy GetAccessPolicy() {
   const std::lock_guard lock(gMutex);
   return gPolicy;
@@ -116,6 +125,7 @@ bool MayUseFormat(const FormatRecord& format) {
 }
 
 bool MayUseSource(const Array<String>& connStrings, bool making) {
+  if (tAdmitted != 0) return true;
   const AccessPolicy policy = GetAccessPolicy();
   if (FindFormatName(connStrings) == "MemoryRaster") {
     return MayUseFormat(*FindFormat("MemoryRaster"));

@@ -37,6 +37,16 @@ class VEXG_EXPORT OwnMemoryScope {
   OwnMemoryScope& operator=(const OwnMemoryScope&) = delete;
 };
 
+/// While one lives, this thread may open sources again under the names that open connections answer
+/// to: the policy has admitted them before.
+class VEXG_EXPORT AdmittedSourceScope {
+ public:
+  AdmittedSourceScope();
+  ~AdmittedSourceScope();
+  AdmittedSourceScope(const AdmittedSourceScope&) = delete;
+  AdmittedSourceScope& operator=(const AdmittedSourceScope&) = delete;
+};
+
 /// True when all the pieces of a source's name may be used; else tells the fault.
 /// @param making  the source is to be made: it need not exist, its folder has to.
 VEXG_EXPORT bool MayUseSource(const Array<String>& connStrings, bool making);

@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <cmath>
 
+#include "data/access_policy.h"
 #include "data/data_manager.h"
 #include "foundation/fault.h"
 #include "foundation/progress.h"
@@ -19,8 +20,9 @@ namespace detail {
 template <typename T>
 class BuilderConnection {
  public:
-  explicit BuilderConnection(const Array<String>& strings)
-      : source_(GetGlobalDataManager().Connect(strings, GeoRefPtr(), MetadataPtr())) {
+  explicit BuilderConnection(const Array<String>& strings) {
+    const AdmittedSourceScope admitted;
+    source_ = GetGlobalDataManager().Connect(strings, GeoRefPtr(), MetadataPtr());
     const RasterReaderDispatchPtr dispatch =
         source_ ? source_->RasterReaderDispatch() : RasterReaderDispatchPtr();
     if (dispatch) reader_ = dispatch->Get<T>();

@@ -34,7 +34,7 @@ class Pyramids(PipeTest, FolderTest):
         return sorted(path.name for path in self.folder.iterdir())
 
     def test_levels_are_built_read_and_deleted(self):
-        self.serve()
+        self.serve("test", "--root", str(self.folder))
         for server in ([], ["--server", "test"]):
             with self.subTest(server):
                 self.fine("pyramid", "build", self.file, "--levels", "1-3", *server)
