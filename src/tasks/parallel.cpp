@@ -7,8 +7,37 @@
 #include <oneapi/tbb/parallel_invoke.h>
 #include <oneapi/tbb/task_arena.h>
 
+#if defined(__SANITIZE_THREAD__)
+#include <sanitizer/tsan_interface.h>
+#define VEXG_TSAN(call) call
+#else
+#define VEXG_TSAN(call)
+#endif
+
 namespace lumo {
 namespace {
+
+/// Tells the thread sanitizer of the order that oneTBB makes: a loop begins after what its caller
+/// did before, and what its parts did comes before what the caller does next. Parts have no order
+/// among themselves.
+class LoopOrder {
+ public:
+  LoopOrder() { VEXG_TSAN(__tsan_release(&begin_)); }
+  ~LoopOrder() { VEXG_TSAN(__tsan_acquire(&end_)); }
+  LoopOrder(const LoopOrder&) = delete;
+  LoopOrder& operator=(const LoopOrder&) = delete;
+
+  template <typename F>
+  void RunPart(const F& part) {
+    VEXG_TSAN(__tsan_acquire(&begin_));
+    part();
+    VEXG_TSAN(__tsan_release(&end_));
+  }
+
+ private:
+  [[maybe_unused]] char begin_ = 0;
+  [[maybe_unused]] char end_ = 0;
+};
 
 /// Hands [begin, end) to `body` piece by piece, with a look at `abort` before each. A piece is at
 /// most 1/256 of the whole range, whatever part of it this is.
@@ -30,10 +59,13 @@ template <typename I>
 struct TBBParallelFor {
   IParallelFor<I>* loop;
   const AbortFlag* abort;
+  LoopOrder* order;
 
   void operator()(const tbb::blocked_range<I>& range) const {
-    InPieces(range.begin(), range.end(), std::int64_t{loop->End()} - loop->Begin(), abort,
-             [this](I begin, I end) { loop->Body(begin, end); });
+    order->RunPart([&] {
+      InPieces(range.begin(), range.end(), std::int64_t{loop->End()} - loop->Begin(), abort,
+               [this](I begin, I end) { loop->Body(begin, end); });
+    });
   }
 };
 
@@ -42,12 +74,15 @@ template <typename I>
 struct TBBParallelFor2 {
   IParallelFor2<I>* loop;
   const AbortFlag* abort;
+  LoopOrder* order;
 
   void operator()(const tbb::blocked_range2d<I>& range) const {
     const auto& r0 = range.rows();
     const auto& r1 = range.cols();
-    InPieces(r1.begin(), r1.end(), std::int64_t{loop->End1()} - loop->Begin1(), abort,
-             [&](I begin, I end) { loop->Body(r0.begin(), r0.end(), begin, end); });
+    order->RunPart([&] {
+      InPieces(r1.begin(), r1.end(), std::int64_t{loop->End1()} - loop->Begin1(), abort,
+               [&](I begin, I end) { loop->Body(r0.begin(), r0.end(), begin, end); });
+    });
   }
 };
 
@@ -56,15 +91,18 @@ template <typename I>
 struct TBBParallelFor3 {
   IParallelFor3<I>* loop;
   const AbortFlag* abort;
+  LoopOrder* order;
 
   void operator()(const tbb::blocked_range3d<I>& range) const {
     const auto& r0 = range.pages();
     const auto& r1 = range.rows();
     const auto& r2 = range.cols();
-    InPieces(r1.begin(), r1.end(), std::int64_t{loop->End1()} - loop->Begin1(), abort,
-             [&](I begin, I end) {
-               loop->Body(r0.begin(), r0.end(), begin, end, r2.begin(), r2.end());
-             });
+    order->RunPart([&] {
+      InPieces(r1.begin(), r1.end(), std::int64_t{loop->End1()} - loop->Begin1(), abort,
+               [&](I begin, I end) {
+                 loop->Body(r0.begin(), r0.end(), begin, end, r2.begin(), r2.end());
+               });
+    });
   }
 };
 
@@ -74,7 +112,10 @@ template <typename I>
 void RunParallelFor(IParallelFor<I>& loop, unsigned grain, const AbortFlag* abort) {
   if (loop.Begin() >= loop.End()) return;
   const tbb::blocked_range<I> range(loop.Begin(), loop.End(), std::max(grain, 1U));
-  tbb::this_task_arena::isolate([&] { tbb::parallel_for(range, TBBParallelFor<I>{&loop, abort}); });
+  LoopOrder order;
+  tbb::this_task_arena::isolate([&] {
+    tbb::parallel_for(range, TBBParallelFor<I>{&loop, abort, &order});
+  });
 }
 
 template <typename I>
@@ -83,8 +124,9 @@ void RunParallelFor2(IParallelFor2<I>& loop, unsigned grain, const AbortFlag* ab
   const unsigned step = std::max(grain, 1U);
   const tbb::blocked_range2d<I> range(loop.Begin0(), loop.End0(), step, loop.Begin1(), loop.End1(),
                                       step);
+  LoopOrder order;
   tbb::this_task_arena::isolate([&] {
-    tbb::parallel_for(range, TBBParallelFor2<I>{&loop, abort});
+    tbb::parallel_for(range, TBBParallelFor2<I>{&loop, abort, &order});
   });
 }
 
@@ -96,13 +138,15 @@ void RunParallelFor3(IParallelFor3<I>& loop, const AbortFlag* abort) {
   }
   const tbb::blocked_range3d<I> range(loop.Begin0(), loop.End0(), loop.Begin1(), loop.End1(),
                                       loop.Begin2(), loop.End2());
+  LoopOrder order;
   tbb::this_task_arena::isolate([&] {
-    tbb::parallel_for(range, TBBParallelFor3<I>{&loop, abort});
+    tbb::parallel_for(range, TBBParallelFor3<I>{&loop, abort, &order});
   });
 }
 
 void detail::InvokeBoth(WorkRef first, WorkRef second) {
-  tbb::parallel_invoke(first, second);
+  LoopOrder order;
+  tbb::parallel_invoke([&] { order.RunPart(first); }, [&] { order.RunPart(second); });
 }
 
 void detail::Isolated(WorkRef work) {
