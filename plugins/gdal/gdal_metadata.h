@@ -11,4 +11,11 @@ namespace lumo::gdal {
 /// for something else of the raster, are left out.
 Metadata ReadMetadata(GDALDatasetH dataset);
 
+/// All that GDAL tells of a raster as texts, for a definition file to translate: the items of the
+/// default domain at "Items/<item>" below "/GDAL/", those of others and of the camera at
+/// "<domain>/<item>", those of a band, counted from 1, at "Bands/<band>/<item>"; "Description",
+/// "Unit", "Scale" and "Offset" of all bands where one has them; size and place at "Raster/",
+/// "CoordSys/" and "Grid/".
+void CollectTexts(GDALDatasetH dataset, unsigned dataType, MetadataContainer& texts);
+
 }  // namespace lumo::gdal
