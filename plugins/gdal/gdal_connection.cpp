@@ -45,7 +45,7 @@ bool Connection::MakeReader(const Array<String>& connStrings, const Source& sour
 bool Connection::GetMetadata(const String& mdfPath, const LockableMetadataImplPtr& store) {
   if (raster_ == nullptr || !store) return FailWith(format_.key, "no raster is open");
   MetadataContainer texts;
-  CollectTexts(raster_->Dataset(), raster_->DataType(), texts);
+  CollectTexts(*raster_, texts);
   const auto say = [&](const char* path, const std::string& text) {
     texts.Put(path, std::make_unique<MetadataString>(std::vector<String>{String(text)}));
   };

@@ -10,6 +10,7 @@
 #include <vector>
 
 #include "commands/value_text.h"
+#include "gdal_raster.h"
 #include "raster/pixel_types.h"
 
 namespace lumo::gdal {
@@ -151,14 +152,16 @@ Metadata ReadMetadata(GDALDatasetH dataset) {
   return metadata;
 }
 
-void CollectTexts(GDALDatasetH dataset, unsigned dataType, MetadataContainer& texts) {
+void CollectTexts(const OpenRaster& raster, MetadataContainer& texts) {
+  const GDALDatasetH dataset = raster.Dataset();
   VisitDomains(dataset, true, [&](const String& path, const char* value) {
     texts.Put(path, std::make_unique<MetadataString>(std::vector<String>{value}));
   });
   Put(texts, "Raster/Samples", FormatValue(GDALGetRasterXSize(dataset)));
   Put(texts, "Raster/Lines", FormatValue(GDALGetRasterYSize(dataset)));
   Put(texts, "Raster/Bands", FormatValue(GDALGetRasterCount(dataset)));
-  Put(texts, "Raster/DataType", DataTypeName(dataType));
+  Put(texts, "Raster/DataType", DataTypeName(raster.DataType()));
+  Put(texts, "Raster/Interleave", FormatValue(raster.Interleave()));
   CollectPlace(dataset, texts);
   CollectBands(dataset, texts);
 }

@@ -6,6 +6,8 @@
 
 namespace lumo::gdal {
 
+class OpenRaster;
+
 /// What GDAL tells of a raster in words: its items as texts at "/GDAL/<domain>/<item>", those of
 /// its default domain at "/GDAL/Items/<item>". Domains that hold documents, and those that stand
 /// for something else of the raster, are left out.
@@ -16,6 +18,6 @@ Metadata ReadMetadata(GDALDatasetH dataset);
 /// "<domain>/<item>", those of a band, counted from 1, at "Bands/<band>/<item>"; "Description",
 /// "Unit", "Scale" and "Offset" of all bands where one has them; size and place at "Raster/",
 /// "CoordSys/" and "Grid/".
-void CollectTexts(GDALDatasetH dataset, unsigned dataType, MetadataContainer& texts);
+void CollectTexts(const OpenRaster& raster, MetadataContainer& texts);
 
 }  // namespace lumo::gdal

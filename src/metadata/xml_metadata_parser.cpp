@@ -221,7 +221,7 @@ bool XmlMetadataParser::ParseDocument(const std::string& bytes) {
     if (isText) source.setEncoding(u"UTF-8");
     reader->parse(source);
     if (reader->getErrorCount() == 0) return true;
-    LogError({"Xml Parser: Error Count greater than 0: (", name, ") \n"});
+    LogError({"Xml Parser: Error Count greater than 0: (", input_.ToUTF8(), ") \n"});
   } catch (const RefusedDocument& refused) {
     fault = refused.why;
     LogError({"Xml Parser: Fatal Error: ", fault, " \n"});
