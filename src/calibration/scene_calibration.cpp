@@ -33,8 +33,8 @@ std::vector<String> BandsOfSelection(const Metadata& metadata) {
   return present;
 }
 
-/// Gains out of the radiance of a count over a whole band, and the width of the band. Counts of such
-/// scenes have no offset.
+/// Gains out of the radiance of a count over a whole band, and the width of the band. Counts of
+/// such scenes have no offset.
 void TakeBandSections(const Metadata& metadata, SceneCalibration& scene) {
   for (const String& band : BandsOfSelection(metadata)) {
     double factor = 0.0, width = 0.0;
@@ -71,10 +71,11 @@ void TakeGains(const Metadata& metadata, SceneCalibration& scene) {
   scene.offsets = ReadList<double>(metadata, "/Radiometry/Offsets/");
   scene.bandNames = ReadList<String>(metadata, "/Radiometry/BandNames/");
   if (!scene.gains.empty()) return;
-  for (const double counts : ReadList<double>(metadata, "/Radiometry/CountsPerRadiance/")) {
-    scene.gains.push_back(1.0 / counts);
+  const auto counts = ReadList<double>(metadata, "/Radiometry/CountsPerRadiance/");
+  if (std::all_of(counts.begin(), counts.end(), [](double count) { return count > 0.0; })) {
+    for (const double count : counts) scene.gains.push_back(1.0 / count);
   }
-  if (scene.gains.empty()) TakeBandSections(metadata, scene);
+  if (counts.empty()) TakeBandSections(metadata, scene);
 }
 
 /// The number that all of `text` is.
@@ -94,11 +95,12 @@ std::optional<double> DaysSince2000(const std::string& text) {
     return {};
   }
   if (text.size() > kDateLength) {
+    if (text.size() < kTimeLength) return {};
     std::string rest = text.substr(17);
     if (rest.ends_with('Z')) rest.pop_back();
-    if (text.size() < kTimeLength || (text[10] != 'T' && text[10] != ' ') || text[13] != ':' ||
-        text[16] != ':' || !ReadPart(text.substr(11, 2), hours) ||
-        !ReadPart(text.substr(14, 2), minutes) || !ReadPart(rest, seconds)) {
+    if ((text[10] != 'T' && text[10] != ' ') || text[13] != ':' || text[16] != ':' ||
+        !ReadPart(text.substr(11, 2), hours) || !ReadPart(text.substr(14, 2), minutes) ||
+        !ReadPart(rest, seconds)) {
       return {};
     }
   }

@@ -224,8 +224,8 @@ class SetMetadataCommand final : public MetadataCommand {
     bool isKnown = false, isRead = false;
     DispatchMetadataType(static_cast<unsigned>(type), [&]<typename T>() {
       isKnown = true;
-      isRead = HasInput("VALUE") && (isArray || size > 1 ? StoreArray<T>(*metadata)
-                                                         : StoreValue<T>(*metadata));
+      isRead = HasInput("VALUE") &&
+               (isArray || size > 1 ? StoreArray<T>(*metadata) : StoreValue<T>(*metadata));
       return true;
     });
     if (!isKnown) return Fail("TYPE is no type of metadata values");
@@ -250,7 +250,7 @@ class SetMetadataCommand final : public MetadataCommand {
   template <typename T>
   bool StoreArray(Metadata& metadata) {
     const auto values = Read<Array<T>>("VALUE");
-    if (!values.IsValid()) return false;
+    if (!values.IsValid() || values.GetCount() == 0) return false;
     Write("SetResult", metadata.SetArray(Read<String>("PATH"), values));
     return true;
   }

@@ -8,20 +8,19 @@
 namespace lumo {
 namespace {
 
-/// What stands between the delimiters of a list. One behind the last delimiter counts when it
-/// isn't blank.
+constexpr std::u16string_view kBlanks = u" \t\r\n";
+
+/// What stands before each delimiter of a list, and behind the last one unless that is blank.
 std::vector<std::u16string_view> SplitList(std::u16string_view text, const MdfFormat& format) {
   const char16_t delimiters[] = {format.vsep, format.em, 0};
   std::vector<std::u16string_view> tokens;
-  while (!text.empty()) {
-    const std::size_t end = std::min(text.find_first_of(delimiters), text.size());
-    const bool isLast = end == text.size();
-    tokens.push_back(Trimmed(text.substr(0, end), u" \t\r\n"));
-    text.remove_prefix(isLast ? end : end + 1);
+  for (;;) {
+    const std::size_t end = text.find_first_of(delimiters);
+    const std::u16string_view token = Trimmed(text.substr(0, end), kBlanks);
+    if (end != text.npos || !token.empty()) tokens.push_back(token);
+    if (end == text.npos) return tokens;
+    text.remove_prefix(end + 1);
   }
-  const bool isBlank = std::all_of(tokens.begin(), tokens.end(), [](auto t) { return t.empty(); });
-  if (isBlank || tokens.back().empty()) tokens.resize(isBlank ? 0 : tokens.size() - 1);
-  return tokens;
 }
 
 std::vector<std::u16string_view> TokensOf(std::u16string_view text, const MdfEntry& entry,
@@ -50,8 +49,11 @@ bool ReadElement(std::u16string_view token, T& element) {
   }
 }
 
+/// Reads all elements; of numbers none need stand behind the last separator.
 template <typename T>
-bool ReadElements(const std::vector<std::u16string_view>& tokens, std::vector<T>& elements) {
+bool ReadElements(std::vector<std::u16string_view> tokens, std::vector<T>& elements) {
+  const bool isNumber = !std::is_same_v<T, String>;
+  if (isNumber && !tokens.empty() && tokens.back().empty()) tokens.pop_back();
   elements.resize(tokens.size());
   for (std::size_t i = 0; i < tokens.size(); ++i) {
     if (!ReadElement(tokens[i], elements[i])) return false;
@@ -81,8 +83,7 @@ Conversion StoreShared(const std::vector<T>& elements, const MdfEntry& entry,
   const std::size_t count = std::min<std::size_t>(elements.size(), entry.mton);
   if (entry.mtoi + count > shared.size()) return Conversion::kFailed;
   std::copy_n(elements.begin(), count, shared.begin() + entry.mtoi);
-  const bool stored =
-      target.Put(entry.dest, std::make_unique<MetadataValue<T>>(std::move(shared)));
+  const bool stored = target.Put(entry.dest, std::make_unique<MetadataValue<T>>(std::move(shared)));
   return stored ? Conversion::kDone : Conversion::kFailed;
 }
 

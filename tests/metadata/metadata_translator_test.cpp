@@ -58,6 +58,8 @@ TEST(MetadataTranslator, MakesValuesOfTheTypesThatEntriesName) {
       {"STRING", "0", "{one, , two }", "string(3) one, , two"},
       {"INT", "3", "{1, 2 ,3}", "int(3) 1, 2, 3"},
       {"INT", "3", "{1, 2, 3,}", "int(3) 1, 2, 3"},
+      {"STRING", "0", "{one, }", "string(2) one, "},
+      {"STRING", "0", "one, two", "string(2) one, two"},
       {"DOUBLE", "2", "7", "double(1) 7"},
       // What holds no such value stays the text that it was.
       {"DOUBLE", "1", "N/A", "string(1) N/A"},
@@ -84,29 +86,51 @@ TEST(MetadataTranslator, HandlesArraysRowsRepeatsAndSharedTargets) {
     Texts texts;
     const char* want;
   } cases[] = {
-      {"rows", Entry("/s", "/d", "INT", "cnt=0\ncols=2"), {{"/s", "{1,2,3,4}"}},
+      {"rows",
+       Entry("/s", "/d", "INT", "cnt=0\ncols=2"),
+       {{"/s", "{1,2,3,4}"}},
        "/d/ int(2,2) 1, 2, 3, 4\n"},
-      {"one row is no array of rows", Entry("/s", "/d", "INT", "cnt=0\ncols=4"),
-       {{"/s", "{1,2,3,4}"}}, "/d/ int(4) 1, 2, 3, 4\n"},
-      {"rows that do not come out", Entry("/s", "/d", "INT", "cnt=0\ncols=3"),
-       {{"/s", "{1,2,3,4}"}}, "/s/ string(1) {1,2,3,4}\n"},
-      {"repeats up to the first gap", Entry("/b#/g", "/d", "INT", "cnt=0\nidx=3"),
+      {"one row is no array of rows",
+       Entry("/s", "/d", "INT", "cnt=0\ncols=4"),
+       {{"/s", "{1,2,3,4}"}},
+       "/d/ int(4) 1, 2, 3, 4\n"},
+      {"rows that do not come out",
+       Entry("/s", "/d", "INT", "cnt=0\ncols=3"),
+       {{"/s", "{1,2,3,4}"}},
+       "/s/ string(1) {1,2,3,4}\n"},
+      {"repeats up to the first gap",
+       Entry("/b#/g", "/d", "INT", "cnt=0\nidx=3"),
        {{"/b3/g", "3"}, {"/b4/g", "4"}, {"/b6/g", "6"}},
        "/b6/g/ string(1) 6\n/d/ int(2) 3, 4\n"},
-      {"no repeat at all", Entry("/b#/g", "/d", "INT", "cnt=0"), {{"/b2/g", "2"}},
+      {"repeats without a text",
+       Entry("/b#", "/d", "STRING", "cnt=0"),
+       {{"/b1", ""}, {"/b2", "x"}, {"/b3", ""}},
+       "/d/ string(3) , x, \n"},
+      {"no repeat at all",
+       Entry("/b#/g", "/d", "INT", "cnt=0"),
+       {{"/b2/g", "2"}},
        "/b2/g/ string(1) 2\n"},
-      {"repeats that are no numbers", Entry("/b#", "/d", "INT", "cnt=0"),
-       {{"/b1", "1"}, {"/b2", "x"}}, "/b1/ string(1) 1\n/b2/ string(1) x\n"},
-      {"many to one", Entry("/x", "/d", "DOUBLE", "cnt=4\nmtoi=0\nmton=1") +
+      {"repeats that are no numbers",
+       Entry("/b#", "/d", "INT", "cnt=0"),
+       {{"/b1", "1"}, {"/b2", "x"}},
+       "/b1/ string(1) 1\n/b2/ string(1) x\n"},
+      {"many to one",
+       Entry("/x", "/d", "DOUBLE", "cnt=4\nmtoi=0\nmton=1") +
            Entry("/y", "/d", "DOUBLE", "cnt=4\nmtoi=2\nmton=2"),
-       {{"/x", "5"}, {"/y", "{6, 7, 8}"}}, "/d/ double(4) 5, 0, 6, 7\n"},
-      {"many to one of texts", Entry("/x", "/d", "STRING", "cnt=2\nmtoi=1\nmton=1"),
-       {{"/x", "a"}}, "/d/ string(2) , a\n"},
-      {"the rest under its own path", Entry("/x", "/x/y", "INT", "cnt=1"),
+       {{"/x", "5"}, {"/y", "{6, 7, 8}"}},
+       "/d/ double(4) 5, 0, 6, 7\n"},
+      {"many to one of texts",
+       Entry("/x", "/d", "STRING", "cnt=2\nmtoi=1\nmton=1"),
+       {{"/x", "a"}},
+       "/d/ string(2) , a\n"},
+      {"the rest under its own path",
+       Entry("/x", "/x/y", "INT", "cnt=1"),
        {{"/z/w", "{a, b}"}, {"/xx vex parser info/uri", "file"}},
        "/private/xx vex parser info/uri/ string(1) file\n/z/w/ string(1) {a, b}\n"},
-      {"a translated value is not replaced by the rest", Entry("/x", "/y", "INT", "cnt=1"),
-       {{"/x", "1"}, {"/y", "raw"}}, "/private/y/ string(1) raw\n/y/ int(1) 1\n"},
+      {"a translated value is not replaced by the rest",
+       Entry("/x", "/y", "INT", "cnt=1"),
+       {{"/x", "1"}, {"/y", "raw"}},
+       "/private/y/ string(1) raw\n/y/ int(1) 1\n"},
   };
   for (const auto& c : cases) {
     SCOPED_TRACE(c.name);
@@ -149,8 +173,9 @@ TEST(MetadataTranslator, FailsWhereAValueHasNoPlace) {
     MetadataContainer target;
     EXPECT_FALSE(TranslateInto(target, c.definitions, {{"/a", "1"}, {"/b", "2"}}));
     EXPECT_EQ(test::Values(target), "/d/ int(1) 1\n");  // what came before stays
-    EXPECT_EQ(test::gParseLog.Take(), std::string("Mdf Translate - Error: (Failed to translate.) Line: (") +
-                               c.line + ") \n");
+    EXPECT_EQ(
+        test::gParseLog.Take(),
+        std::string("Mdf Translate - Error: (Failed to translate.) Line: (") + c.line + ") \n");
   }
   MetadataContainer target;
   const MdfFormat format;
@@ -164,10 +189,11 @@ TEST(MetadataTranslator, LogsWhatItMade) {
   MetadataContainer target;
   ASSERT_TRUE(TranslateInto(target, Entry("/s", "/d", "INT", "cnt=1"), {{"/s", "5"}}));
   const std::string rule = std::string(84, '=') + "\n";
-  EXPECT_EQ(test::gParseLog.Take(), rule +
-                             "*** Translating string collection, using the mdf file, into data "
-                             "type collection ***\n" +
-                             rule + target.Describe("/").ToUTF8());
+  EXPECT_EQ(test::gParseLog.Take(),
+            rule +
+                "*** Translating string collection, using the mdf file, into data "
+                "type collection ***\n" +
+                rule + target.Describe("/").ToUTF8());
 }
 
 TEST(MetadataParseLog, NeedsAllThreeVariables) {
@@ -179,9 +205,9 @@ TEST(MetadataParseLog, NeedsAllThreeVariables) {
     const char* level;
     const char* console;
     unsigned on;  // the highest level that is written
-  } cases[] = {{"", "3", "0", 0},     {inside, "", "0", 0}, {inside, "0", "0", 0},
-               {inside, "3", "", 0},  {"/dev/null/x", "3", "0", 0},
-               {inside, "2", "0", 2}, {inside, "0x1", "0", 1}};
+  } cases[] = {{"", "3", "0", 0},      {inside, "", "0", 0},         {inside, "0", "0", 0},
+               {inside, "3", "", 0},   {"/dev/null/x", "3", "0", 0}, {inside, "2", "0", 2},
+               {inside, "0x1", "0", 1}};
   for (const auto& c : cases) {
     setenv("metadata_parse_log_dir", c.folder.c_str(), 1);
     setenv("metadata_parse_log_level", c.level, 1);
@@ -198,7 +224,8 @@ TEST(MetadataParseLog, NeedsAllThreeVariables) {
     const std::string text{std::istreambuf_iterator<char>(in), std::istreambuf_iterator<char>()};
     EXPECT_THAT(text, testing::MatchesRegex(
                           "\n[A-Z].. ... .. ..:..:.. ....  MetadataImpl Parse Log.   Log Level is "
-                          "set to: .\n\none" + std::string(c.on > 1 ? "two" : "")));
+                          "set to: .\n\none" +
+                          std::string(c.on > 1 ? "two" : "")));
     EXPECT_THAT(text, testing::HasSubstr("set to: " + std::to_string(c.on)));
     std::filesystem::remove(file);
   }

@@ -52,7 +52,8 @@ JobDraft MakeDraft(const Options& options, const MetadataSource& source) {
   return draft;
 }
 
-/// The paths of the values to show, in order. Throws HostError for a path below which there is none.
+/// The paths of the values to show, in order. Throws HostError for a path below which there is
+/// none.
 std::vector<std::string> ReadPaths(const Options& options, const JobResults& results) {
   std::vector<std::string> paths;
   for (std::size_t i = 0; i < options.paths.size(); ++i) {
@@ -88,8 +89,7 @@ std::vector<Value> ReadValues(JobSession& session, const String& uri,
   std::vector<Value> values;
   for (std::size_t i = 0; i < paths.size(); ++i) {
     const std::string number = std::to_string(i);
-    const auto& properties =
-        results.Find(String("GetPropertiesMetadataCommand" + number)).returns;
+    const auto& properties = results.Find(String("GetPropertiesMetadataCommand" + number)).returns;
     const auto number_of = [&](const char* name) {
       return ParseValue<unsigned>(properties.Find(name));
     };
@@ -120,7 +120,8 @@ Json ArrayAsJson(const Value& value) {
   const auto elements = ParseValue<Array<T>>(value.text);
   Json list = Json::array();
   for (const T& element : elements) {
-    const bool startsRow = value.columns != 0 && (list.empty() || list.back().size() == value.columns);
+    const bool startsRow =
+        value.columns != 0 && (list.empty() || list.back().size() == value.columns);
     if (startsRow) list.push_back(Json::array());
     (value.columns != 0 ? list.back() : list).push_back(ElementAsJson(element));
   }
@@ -160,10 +161,11 @@ int PrintMetadata(const Options& options) {
   const JobResults results = session.Run(draft);
   const String uri = results.Find("metadata").returns.Find("URI");
   Json values = Json::object();
+  constexpr std::size_t kWidest = 48;  // longer paths push their values to the right
   std::size_t width = 0;
   for (const Value& value : ReadValues(session, uri, ReadPaths(options, results))) {
     values[value.path] = AsJson(value);
-    width = std::max(width, value.path.size());
+    width = std::max(width, std::min(value.path.size(), kWidest));
   }
   if (options.json) {
     const Json all = {{"file", source.file}, {"format", source.format}, {"values", values}};
@@ -183,7 +185,8 @@ const VerbRegistration registration(
           "The paths, and what they mean, stand in docs/metadata.md. What is not known there comes "
           "under the name that it has in the file.\n"
           "Example: vexg metadata --path /Acquisition/ --json scene.IMD\n");
-      app.add_option("source", options->source, "The file, or the word of its format, : and the file")
+      app.add_option("source", options->source,
+                     "The file, or the word of its format, : and the file")
           ->type_name("FILE|FORMAT:FILE")
           ->required();
       app.add_option("--path", options->paths,
