@@ -1,16 +1,20 @@
-# Installs the packages of packages.txt that are missing, as root or through sudo. Sourced by ./demo
-# and ./test.
+# Installs the packages of a list that are missing, as root or through sudo. Sourced by ./demo,
+# ./test and bench/peers.sh.
 
 missing_packages() {
   local package
-  grep -v '^#' scripts/packages.txt | while read -r package; do
+  grep -v '^#' "$1" | while read -r package; do
     dpkg-query -W -f '${Status}' "$package" 2>/dev/null | grep -q 'ok installed' || echo "$package"
   done
 }
 
 install_packages() {
+  install_packages_of scripts/packages.txt
+}
+
+install_packages_of() {
   local missing run=()
-  missing=$(missing_packages | tr '\n' ' ')
+  missing=$(missing_packages "$1" | tr '\n' ' ')
   [[ -z $missing ]] && return
   if ((EUID != 0)); then
     if ! command -v sudo >/dev/null; then

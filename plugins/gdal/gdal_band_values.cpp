@@ -18,6 +18,8 @@ constexpr const char* kMax = "STATISTICS_MAXIMUM";
 constexpr const char* kMean = "STATISTICS_MEAN";
 constexpr const char* kStd = "STATISTICS_STDDEV";
 constexpr const char* kApproximate = "STATISTICS_APPROXIMATE";
+constexpr const char* kValidPercent = "STATISTICS_VALID_PERCENT";
+constexpr const char* kRecord = "STATISTICS_RECORD";
 
 std::string Item(GDALRasterBandH band, const char* name) {
   const char* const value = GDALGetMetadataItem(band, name, nullptr);
@@ -43,7 +45,8 @@ struct ColorTableDeleter {
 }  // namespace
 
 std::optional<StoredStats> ReadStoredStats(GDALRasterBandH band) {
-  StoredStats stats{Item(band, kMin), Item(band, kMax), Item(band, kMean), Item(band, kStd)};
+  StoredStats stats{Item(band, kMin), Item(band, kMax),          Item(band, kMean),
+                    Item(band, kStd), Item(band, kValidPercent), Item(band, kRecord)};
   const bool isWhole =
       !stats.min.empty() && !stats.max.empty() && !stats.mean.empty() && !stats.std.empty();
   // Statistics of a sample of the pixels are not those of the band.
@@ -54,18 +57,23 @@ std::optional<StoredStats> ReadStoredStats(GDALRasterBandH band) {
 
 bool WriteStoredStats(GDALRasterBandH band, const StoredStats& stats) {
   const std::pair<const char*, const char*> items[] = {
-      {kMin, stats.min.c_str()},
-      {kMax, stats.max.c_str()},
-      {kMean, stats.mean.c_str()},
-      {kStd, stats.std.c_str()},
+      {kMin, stats.min.c_str()}, {kMax, stats.max.c_str()},       {kMean, stats.mean.c_str()},
+      {kStd, stats.std.c_str()}, {kRecord, stats.record.c_str()},
   };
   for (const auto& [name, value] : items) {
     if (GDALSetMetadataItem(band, name, value, nullptr) != CE_None) return false;
   }
-  for (const char* const name : {kApproximate, "STATISTICS_VALID_PERCENT"}) {
+  for (const char* const name : {kApproximate, kValidPercent}) {
     if (!Item(band, name).empty()) GDALSetMetadataItem(band, name, nullptr, nullptr);
   }
   return true;
+}
+
+void DeleteStoredStats(GDALRasterBandH band) {
+  if (Item(band, kMin).empty()) return;
+  for (const char* const name : {kMin, kMax, kMean, kStd, kApproximate, kValidPercent, kRecord}) {
+    GDALSetMetadataItem(band, name, nullptr, nullptr);
+  }
 }
 
 std::optional<StoredHistogram> ReadStoredHistogram(GDALRasterBandH band) {

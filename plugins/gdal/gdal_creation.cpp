@@ -31,7 +31,7 @@ struct Maker {
   bool roundsGrid = false;
 };
 constexpr Maker kMakers[] = {
-    {"GTiff", false, "BIGTIFF=IF_SAFER"},
+    {"GTiff", false, "BIGTIFF=IF_SAFER SPARSE_OK=TRUE"},
     {"HFA", false, ""},
     {"BMP", true, ""},
     {"NITF", true, "", true},  // corners to the metre or the second
@@ -106,6 +106,16 @@ bool SetNoData(GDALDatasetH dataset, const RasterDef& def) {
     if (!WriteNoData(target, value)) return false;
   }
   return true;
+}
+
+/// The value of pixels that nobody writes, in a dataset with one no-data value or none.
+std::vector<unsigned char> FillValueOf(GDALDatasetH dataset) {
+  GDALRasterBandH const band = GDALGetRasterBand(dataset, 1);
+  const GDALDataType type = GDALGetRasterDataType(band);
+  std::vector<unsigned char> bytes(static_cast<std::size_t>(GDALGetDataTypeSizeBytes(type)));
+  const double value = ReadNoData(band).value_or(0.0);
+  GDALCopyWords(&value, GDT_Float64, 0, bytes.data(), type, 0, 1);
+  return bytes;
 }
 
 bool HoldsSignedBytes(GDALDriverH driver) {
@@ -215,7 +225,7 @@ bool NewRaster::TrySample(std::string& fault) const {
   return fits;
 }
 
-DatasetPtr NewRaster::MakeDirectly() const {
+DatasetPtr NewRaster::MakeDirectly() {
   const Messages messages;
   const PixelType type = PixelTypeOf(def_.dataType);
   CPLStringList options = OptionsOf(*FindMaker(driver_));
@@ -228,6 +238,21 @@ DatasetPtr NewRaster::MakeDirectly() const {
     Fail(messages.Text());
     return nullptr;
   }
+  return driver_ == "GTiff" ? BeginPixels(std::move(dataset)) : std::move(dataset);
+}
+
+/// Has the blocks of a TIFF file placed, which for that is closed and opened again.
+DatasetPtr NewRaster::BeginPixels(DatasetPtr dataset) {
+  const Messages messages;
+  const std::vector<unsigned char> fill = FillValueOf(dataset.get());
+  const bool byPixel = EQUAL(
+      CSLFetchNameValueDef(GDALGetMetadata(dataset.get(), "IMAGE_STRUCTURE"), "INTERLEAVE", "BAND"),
+      "PIXEL");
+  dataset.reset();
+  pixels_ = TiffPixels::Begin(temporary_, def_, byPixel, fill);
+  dataset.reset(
+      GDALOpenEx(temporary_.c_str(), GDAL_OF_RASTER | GDAL_OF_UPDATE, nullptr, nullptr, nullptr));
+  if (dataset == nullptr) Fail(messages.Text());
   return dataset;
 }
 
@@ -271,6 +296,11 @@ bool NewRaster::Finish(DatasetPtr dataset) {
   } else {
     dataset.reset();
     if (messages.HasError()) return Fail(messages.Text());
+    if (pixels_ != nullptr && !pixels_->Finish()) {
+      SetFault(Shown(TakeFault().ToUTF8()));
+      return false;
+    }
+    pixels_.reset();
   }
   return WriteBeside() && IsWhole() && TakePlace();
 }
@@ -323,12 +353,14 @@ bool NewRaster::IsWhole() const {
   return true;
 }
 
-/// The new file comes onto the disk before the old one goes.
+/// The new file comes onto the disk before an old one goes.
 bool NewRaster::TakePlace() const {
   std::string why;
-  const auto file = platform::RandomAccessFile::Open(
-      temporary_, platform::RandomAccessFile::Access::kUpdate, &why);
-  if (file == nullptr || !file->Flush(&why)) return Fail(why);
+  if (Exists(path_)) {
+    const auto file = platform::RandomAccessFile::Open(
+        temporary_, platform::RandomAccessFile::Access::kUpdate, &why);
+    if (file == nullptr || !file->Flush(&why)) return Fail(why);
+  }
   if (driver_ == "HFA") {  // the names of further files stand inside
     const Messages messages;
     GDALDriverH const driver = GDALGetDriverByName(driver_.c_str());

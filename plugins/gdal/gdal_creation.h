@@ -8,6 +8,7 @@
 #include "common/source.h"
 #include "gdal_band_values.h"
 #include "raster/raster_def.h"
+#include "tiff_pixels.h"
 
 namespace lumo::gdal {
 
@@ -18,6 +19,8 @@ namespace lumo::gdal {
 /// Formats that are written in one go, from the first pixel to the last, are first made as
 /// something else: in memory, or as a TIFF file beside the place. Failure: false or null, with the
 /// fault told.
+///
+/// The pixels of a TIFF file are written past GDAL.
 class NewRaster {
  public:
   /// Whether the format can hold such a raster is found out here.
@@ -31,6 +34,9 @@ class NewRaster {
   NewRaster(const NewRaster&) = delete;
   NewRaster& operator=(const NewRaster&) = delete;
 
+  /// Where the pixels go; null when they go into the dataset.
+  TiffPixels* Pixels() const { return pixels_.get(); }
+
   /// From now on the raster can't be finished: something of it is lost.
   void Doom() { isDoomed_ = true; }
 
@@ -42,7 +48,8 @@ class NewRaster {
   bool CheckTarget() const;
   bool TryTheFormat();
   bool TrySample(std::string& fault) const;
-  DatasetPtr MakeDirectly() const;
+  DatasetPtr MakeDirectly();
+  DatasetPtr BeginPixels(DatasetPtr dataset);
   DatasetPtr MakeForCopy();
   bool Describe(GDALDatasetH dataset) const;
   bool CopyToFormat(DatasetPtr dataset);
@@ -57,7 +64,8 @@ class NewRaster {
   const std::string path_;
   const RasterDef def_;
   const std::string temporary_;  // of the format, beside the place
-  std::string scratch_;          // the TIFF file that the copy is made from
+  std::unique_ptr<TiffPixels> pixels_;
+  std::string scratch_;  // the TIFF file that the copy is made from
   std::vector<std::optional<StoredHistogram>> histograms_;  // which a copy leaves behind
   bool isBare_ = false;  // the geo-reference goes beside the file
   bool isDoomed_ = false;

@@ -254,6 +254,10 @@ const RasterLevel* OpenRaster::CheckPlace(const BlockPlace& place) const {
 bool OpenRaster::Transfer(GDALRWFlag direction, const BlockPlace& place, void* pixels) const {
   const RasterLevel* const level = CheckPlace(place);
   if (level == nullptr) return false;
+  if (newRaster_ != nullptr && newRaster_->Pixels() != nullptr) {
+    TiffPixels& target = *newRaster_->Pixels();
+    return direction == GF_Read ? target.Read(place, pixels) : target.Write(place, pixels);
+  }
   const Messages messages;
   const GDALDataType type = PixelTypeOf(dataType_).type;
   const Strides strides(interleave_, place, GDALGetDataTypeSizeBytes(type));
@@ -301,14 +305,7 @@ bool OpenRaster::Write(const BlockPlace& place, const void* pixels) {
 }
 
 void OpenRaster::ForgetStatistics(const Array<unsigned>& bands) {
-  for (const unsigned band : bands) {
-    if (GDALGetMetadataItem(Band(band), "STATISTICS_MINIMUM", nullptr) == nullptr) continue;
-    for (const char* const name :
-         {"STATISTICS_MINIMUM", "STATISTICS_MAXIMUM", "STATISTICS_MEAN", "STATISTICS_STDDEV",
-          "STATISTICS_APPROXIMATE", "STATISTICS_VALID_PERCENT"}) {
-      GDALSetMetadataItem(Band(band), name, nullptr, nullptr);
-    }
-  }
+  for (const unsigned band : bands) DeleteStoredStats(Band(band));
 }
 
 bool OpenRaster::ReadMasks(const BlockPlace& place, unsigned char* state) const {

@@ -6,6 +6,8 @@
 #include <cpl_conv.h>
 #include <cpl_string.h>
 #include <limits>
+#include <locale>
+#include <sstream>
 
 #include "common/messages.h"
 #include "gdal_band_values.h"
@@ -65,6 +67,60 @@ std::string PrintPixel(T value) {
     CPLsnprintf(text, sizeof text, "%.17g", static_cast<double>(value));
     return text;
   }
+}
+
+/// Statistics as GDAL keeps them, with ours in the record.
+template <typename T>
+StoredStats ToStored(const RasterBandStats<T>& stats) {
+  StoredStats stored;
+  stored.min = PrintPixel(stats.min);
+  stored.max = PrintPixel(stats.max);
+  stored.mean = PrintPixel(stats.mean);
+  const auto n = static_cast<double>(stats.pixelCount);
+  stored.std = PrintPixel(n > 0 ? stats.std * std::sqrt((n - 1) / n) : stats.std);
+  std::ostringstream record;
+  record.imbue(std::locale::classic());
+  record << stats.pixelCount << ' ' << stats;
+  stored.record = record.str();
+  return stored;
+}
+
+/// The record of ours, when GDAL's numbers are still those it was written with.
+template <typename T>
+std::optional<RasterBandStats<T>> ReadRecord(const StoredStats& stored) {
+  std::istringstream record(stored.record);
+  record.imbue(std::locale::classic());
+  std::uint64_t pixelCount = 0;
+  RasterBandStats<T> stats;
+  if (!(record >> pixelCount >> stats)) return std::nullopt;
+  stats.pixelCount = pixelCount;
+  const StoredStats same = ToStored(stats);
+  const bool stands = same.min == stored.min && same.max == stored.max &&
+                      same.mean == stored.mean && same.std == stored.std;
+  return stands ? std::optional(stats) : std::nullopt;
+}
+
+/// Statistics that GDAL wrote.
+/// @param n  how many pixels there are.
+/// @param allValid  none of them is left out.
+template <typename T>
+RasterBandStats<T> FromStored(const StoredStats& stored, std::uint64_t n, bool allValid) {
+  RasterBandStats<T> stats;
+  const auto min = ParsePixel<T>(stored.min);
+  const auto max = ParsePixel<T>(stored.max);
+  if (!min || !max) return stats;
+  stats.mask = StatsMask::Min | StatsMask::Max | StatsMask::Mean;
+  stats.min = *min;
+  stats.max = *max;
+  stats.mean = CPLAtof(stored.mean.c_str());
+  // GDAL keeps no count. Where nothing can be left out it is known all the same.
+  if (allValid) stats.pixelCount = n;
+  double counted = static_cast<double>(n);
+  if (!allValid) counted *= CPLAtof(stored.validPercent.c_str()) / 100;
+  if (counted < 2) return stats;
+  stats.mask |= StatsMask::Std;
+  stats.std = CPLAtof(stored.std.c_str()) * std::sqrt(counted / (counted - 1));
+  return stats;
 }
 
 /// Our histogram from GDAL's. A bin holds its lower edge, not its upper one.
@@ -199,9 +255,7 @@ bool Reader<T>::PyramidDelete() {
 
 template <typename T>
 std::int32_t Reader<T>::StatsMask() {
-  using lumo::StatsMask;
-  return kHasStats ? StatsMask::Min | StatsMask::Max | StatsMask::Mean | StatsMask::Std
-                   : StatsMask::None;
+  return kHasStats ? lumo::StatsMask::Extended : lumo::StatsMask::None;
 }
 
 template <typename T>
@@ -214,20 +268,15 @@ RasterBandStats<T> Reader<T>::ReadStats(unsigned band) {
   RasterBandStats<T> stats;
   if constexpr (kHasStats) {
     if (!raster_.HasBand(band)) return stats;
-    const auto stored = ReadStoredStats(raster_.Band(band));
-    const auto min = stored ? detail::ParsePixel<T>(stored->min) : std::nullopt;
-    const auto max = stored ? detail::ParsePixel<T>(stored->max) : std::nullopt;
-    if (!min || !max) return stats;
+    GDALRasterBandH const source = raster_.Band(band);
+    const auto stored = ReadStoredStats(source);
+    if (!stored) return stats;
+    const auto record = detail::ReadRecord<T>(*stored);
+    const bool allValid = std::is_integral_v<T> && (GDALGetMaskFlags(source) & GMF_ALL_VALID) != 0;
+    stats =
+        record ? *record
+               : detail::FromStored<T>(*stored, std::uint64_t{def_.samples} * def_.lines, allValid);
     stats.band = band;
-    stats.mask = static_cast<unsigned>(StatsMask());
-    stats.min = *min;
-    stats.max = *max;
-    stats.mean = CPLAtof(stored->mean.c_str());
-    stats.std = CPLAtof(stored->std.c_str());
-    // GDAL keeps no count. Where nothing can be left out it is known all the same.
-    if (std::is_integral_v<T> && (GDALGetMaskFlags(raster_.Band(band)) & GMF_ALL_VALID) != 0) {
-      stats.pixelCount = std::uint64_t{def_.samples} * def_.lines;
-    }
   }
   return stats;
 }
@@ -237,11 +286,12 @@ bool Reader<T>::WriteStats(const Array<RasterBandStats<T>>& stats) {
   if constexpr (kHasStats) {
     const Messages messages;
     for (const RasterBandStats<T>& band : stats) {
-      const auto whole = static_cast<unsigned>(StatsMask());
-      if (!raster_.HasBand(band.band) || (band.mask & whole) != whole) continue;
-      const StoredStats stored{detail::PrintPixel(band.min), detail::PrintPixel(band.max),
-                               detail::PrintPixel(band.mean), detail::PrintPixel(band.std)};
-      if (!WriteStoredStats(raster_.Band(band.band), stored)) return messages.Fail(raster_.Name());
+      constexpr unsigned kWhole =
+          StatsMask::Min | StatsMask::Max | StatsMask::Mean | StatsMask::Std;
+      if (!raster_.HasBand(band.band) || (band.mask & kWhole) != kWhole) continue;
+      if (!WriteStoredStats(raster_.Band(band.band), detail::ToStored(band))) {
+        return messages.Fail(raster_.Name());
+      }
     }
     return FlushBandValues();
   }

@@ -36,6 +36,28 @@ class ComputeStatsCommand : public RasterCommand {
   }
 
  private:
+  /// All statistics of a band, those not at hand computed. A source may hold some of them, of
+  /// pixels that have changed since; then all come from one computation.
+  template <typename T, typename Share>
+  RasterBandStats<T> Ask(Raster<T>& raster, unsigned band, bool extended, const Share& share) {
+    RasterBandStats<T> stats;
+    stats.min = raster.Min(band, share());
+    stats.max = raster.Max(band, share());
+    stats.mean = raster.Mean(band, share());
+    stats.std = raster.Std(band, share());
+    stats.sum = raster.Sum(band, share());
+    stats.sum2 = raster.Sum2(band, share());
+    stats.rms = raster.RMS(band, share());
+    const unsigned bands = extended ? raster.Bands() : 0;
+    for (unsigned other = 0; other < bands; ++other) {
+      stats.SetSumXY(other, raster.SumXY(band, other, share()));
+      stats.SetCov(other, raster.Cov(band, other, share()));
+    }
+    const RasterBandStats<T> whole = raster.BandStats(band);
+    const unsigned mask = extended ? StatsMask::Extended : StatsMask::Basic;
+    return (whole.mask & mask) == mask ? whole : stats;
+  }
+
   template <typename T>
   void WriteStats(Raster<T>& raster, StatsMode mode) {
     const unsigned bands = raster.Bands();
@@ -48,6 +70,7 @@ class ComputeStatsCommand : public RasterCommand {
     };
     const ArrayDims each(bands);
     Array<T> min(each), max(each);
+    Array<unsigned long long> count(each);
     Array<double> mean(each), std(each), sum(each), sum2(each), rms(each);
     Array<double> sumXY, cov;
     if (extended) {
@@ -55,17 +78,19 @@ class ComputeStatsCommand : public RasterCommand {
       cov.Resize(ArrayDims(bands, bands));
     }
     for (unsigned band = 0; band < bands; ++band) {
-      min[band] = raster.Min(band, share());
-      max[band] = raster.Max(band, share());
-      mean[band] = raster.Mean(band, share());
-      std[band] = raster.Std(band, share());
-      sum[band] = raster.Sum(band, share());
-      sum2[band] = raster.Sum2(band, share());
-      rms[band] = raster.RMS(band, share());
+      const RasterBandStats<T> stats = Ask(raster, band, extended, share);
+      min[band] = stats.min;
+      max[band] = stats.max;
+      mean[band] = stats.mean;
+      std[band] = stats.std;
+      sum[band] = stats.sum;
+      sum2[band] = stats.sum2;
+      rms[band] = stats.rms;
+      count[band] = stats.pixelCount;
       for (unsigned other = 0; extended && other < bands; ++other) {
         const std::size_t at = std::size_t{band} * bands + other;
-        sumXY[at] = raster.SumXY(band, other, share());
-        cov[at] = raster.Cov(band, other, share());
+        if (other < stats.sumXY.GetCount()) sumXY[at] = stats.sumXY[other];
+        if (other < stats.cov.GetCount()) cov[at] = stats.cov[other];
       }
     }
     Write("Min", min);
@@ -75,6 +100,7 @@ class ComputeStatsCommand : public RasterCommand {
     Write("Sum", sum);
     Write("Sum2", sum2);
     Write("RMS", rms);
+    Write("Count", count);
     if (!extended) return;
     Write("SumXY", sumXY);
     Write("Cov", cov);
@@ -88,7 +114,9 @@ const std::vector<OutputDeclaration> kBasicOutputs{
     {"Std", ValueKind::kNumberArray, "deviation of each band, as of a sample: divided by n - 1"},
     {"Sum", ValueKind::kNumberArray, "sum of each band"},
     {"Sum2", ValueKind::kNumberArray, "sum of the squares of each band"},
-    {"RMS", ValueKind::kNumberArray, "root of the mean of the squares of each band"}};
+    {"RMS", ValueKind::kNumberArray, "root of the mean of the squares of each band"},
+    {"Count", ValueKind::kNumberArray,
+     "values that counted in each band; 0 where statistics were entered or stored without it"}};
 
 std::vector<OutputDeclaration> ExtendedOutputs() {
   std::vector<OutputDeclaration> outputs = kBasicOutputs;

@@ -96,8 +96,8 @@ bool ReaderRaster<T>::PyramidRefresh() {
 template <typename T>
 bool ReaderRaster<T>::StatsExist(unsigned band, unsigned mask) const {
   return ComputedRaster<T>::StatsExist(band, mask) || AnyReader([&](auto& reader) {
-           return reader.StatsExist(band) &&
-                  (static_cast<unsigned>(reader.StatsMask()) & mask) == mask;
+           return (static_cast<unsigned>(reader.StatsMask()) & mask) == mask &&
+                  reader.StatsExist(band) && (reader.ReadStats(band).mask & mask) == mask;
          });
 }
 

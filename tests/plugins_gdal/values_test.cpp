@@ -58,6 +58,10 @@ RasterBandStats<T> StatsAtTheLimits(unsigned band) {
   stats.max = std::numeric_limits<T>::max();
   stats.mean = 1.0 / 3.0 + band;
   stats.std = 2.0 / 7.0;
+  stats.sum = 1e20 / 3.0;
+  stats.sum2 = 2e20 / 3.0;
+  stats.rms = 5.0 / 3.0;
+  stats.pixelCount = 1000;
   return stats;
 }
 
@@ -100,16 +104,39 @@ TEST(GdalValues, StatisticsComeBackToTheBit) {
         const auto want = StatsAtTheLimits<T>(0);
         ASSERT_TRUE(reader.StatsExist(0));
         const auto stats = reader.ReadStats(0);
-        EXPECT_EQ(stats.mask, static_cast<unsigned>(StatsMask::Min | StatsMask::Max |
-                                                    StatsMask::Mean | StatsMask::Std));
+        EXPECT_EQ(stats.mask, static_cast<unsigned>(StatsMask::Basic));
+        EXPECT_EQ(stats.pixelCount, want.pixelCount);
         EXPECT_EQ(stats.min, want.min);
         EXPECT_EQ(stats.max, want.max);
         EXPECT_EQ(stats.mean, want.mean);
         EXPECT_EQ(stats.std, want.std);
+        EXPECT_EQ(stats.sum, want.sum);
+        EXPECT_EQ(stats.sum2, want.sum2);
+        EXPECT_EQ(stats.rms, want.rms);
       }
     };
     ASSERT_TRUE(test::WithType(source, read));
   }
+}
+
+TEST(GdalValues, StoredStatisticsStandUntilAnotherProgramReplacesThem) {
+  const Copy copy("a.tif", "GTiff", GDT_Byte, nullptr);
+  auto source = OpenSource({copy.Path()});
+  Array<RasterBandStats<std::uint8_t>> all{ArrayDims(1)};
+  all[0] = StatsAtTheLimits<std::uint8_t>(0);
+  ASSERT_TRUE(ReaderOf<std::uint8_t>(source)->WriteStats(all));
+  Release(source);
+  {
+    const Peer peer(copy.Path());
+    const char* const std = GDALGetMetadataItem(peer.Band(0), "STATISTICS_STDDEV", nullptr);
+    ASSERT_NE(std, nullptr);
+    EXPECT_NEAR(CPLAtof(std), 2.0 / 7.0 * std::sqrt(0.999), 1e-15);  // divided by n there
+    GDALSetMetadataItem(peer.Band(0), "STATISTICS_MEAN", "17", nullptr);
+  }
+  source = OpenSource({copy.Path()});
+  const auto stats = ReaderOf<std::uint8_t>(source)->ReadStats(0);
+  EXPECT_EQ(stats.mean, 17.0);
+  EXPECT_EQ(stats.mask & StatsMask::Sum, 0U);
 }
 
 TEST(GdalValues, ReadsTheStatisticsThatGdalStored) {
@@ -131,7 +158,7 @@ TEST(GdalValues, ReadsTheStatisticsThatGdalStored) {
     EXPECT_EQ(stats.min, 824);
     EXPECT_EQ(stats.max, 10000);
     EXPECT_NEAR(stats.mean, mean, 1e-9);
-    EXPECT_NEAR(stats.std, std, 1e-9);
+    EXPECT_NEAR(stats.std, std * std::sqrt(122848.0 / 122847.0), 1e-9);
     EXPECT_EQ(stats.pixelCount, 122848U);
   }
 }

@@ -67,6 +67,13 @@ void AddOpen(JobDraft& draft, const std::string& name, const SourceOptions& sour
   draft.Open(name, "OpenRasterCommand").AddInput("ConnStr", ConnStringsOf(source));
 }
 
+void AddBandView(JobDraft& draft, const std::string& name, const String& raster,
+                 const Array<unsigned>& bands) {
+  JobWriterCommand& view = draft.Open(name, "CreateSpectralSubsetRasterCommand");
+  view.AddInput("SrcURI", raster);
+  view.AddInput("Bands", bands);
+}
+
 std::string PathOf(const String& uri) {
   return PathOfFileURI(ParseValue<URI>(uri));
 }

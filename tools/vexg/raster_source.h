@@ -49,6 +49,11 @@ struct RasterInfo {
 /// Adds the command that opens a source, into the variable "$" name.
 void AddOpen(JobDraft& draft, const std::string& name, const SourceOptions& source);
 
+/// Adds the command that chooses bands of a raster, into the variable "$" name.
+/// @param raster  a variable or URI.
+void AddBandView(JobDraft& draft, const std::string& name, const String& raster,
+                 const Array<unsigned>& bands);
+
 /// The file behind an open raster.
 /// @param uri  as a command gives it.
 std::string PathOf(const String& uri);

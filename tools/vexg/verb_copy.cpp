@@ -1,16 +1,13 @@
-#include <algorithm>
 #include <iostream>
 #include <memory>
 
 #include <CLI/CLI.hpp>
 #include <fmt/format.h>
 
-#include "data/format_table.h"
 #include "foundation/color.h"
-#include "output_file.h"
 #include "palette_reading.h"
 #include "raster/pixel_types.h"
-#include "raster_source.h"
+#include "raster_target.h"
 #include "verb.h"
 
 namespace lumo::host {
@@ -18,49 +15,13 @@ namespace {
 
 struct Options {
   SourceOptions source;
+  TargetOptions target;
   RasterJobOptions job;
-  std::string output;
-  std::string format;
   std::string rect;
   std::string bands;
   std::string interleave;
   std::string type;
-  bool overwrite = false;
 };
-
-/// The format that the ending of a name stands for; empty for none.
-std::string FormatOfName(const std::string& name) {
-  static const std::pair<const char*, const char*> kEndings[] = {
-      {".tif", "TIFF"},  {".tiff", "TIFF"}, {".png", "PNG"},      {".jpg", "JPEG"},
-      {".jpeg", "JPEG"}, {".bmp", "BMP"},   {".gif", "GIF"},      {".img", "Erdas"},
-      {".ntf", "NITF"},  {".nitf", "NITF"}, {".jp2", "JPEG2000"}, {".dat", "ORVA"},
-      {".bin", "ORVA"},  {".orva", "ORVA"}};
-  const std::string ending =
-      CLI::detail::to_lower(std::filesystem::path(name).extension().string());
-  for (const auto& [known, format] : kEndings) {
-    if (ending == known) return format;
-  }
-  return {};
-}
-
-std::string ChooseFormat(const Options& options) {
-  if (options.format.empty()) {
-    const std::string format = FormatOfName(options.output);
-    if (!format.empty()) return format;
-    throw HostError(kExitUsage, options.output +
-                                    ": the name's ending tells no format; give --format, one "
-                                    "of vexg formats");
-  }
-  if (FindFormat(String(options.format)) != nullptr) return options.format;
-  throw HostError(kExitUsage,
-                  "--format: there is no format \"" + options.format + "\"; see vexg formats");
-}
-
-/// Formats whose files are smaller than their pixels by nobody knows how much.
-bool Compresses(const std::string& format) {
-  static const char* const kFormats[] = {"JPEG", "PNG", "GIF", "JPEG2000", "MrSID"};
-  return std::find(std::begin(kFormats), std::end(kFormats), format) != std::end(kFormats);
-}
 
 /// A colour table of the copy.
 struct BandPalette {
@@ -90,7 +51,6 @@ std::vector<BandPalette> ReadPalettes(JobSession& session, const String& raster,
 }
 
 constexpr const char* kCopyStep = "copy";
-constexpr const char* kCloseStep = "close.target";
 
 /// The copying as a whole: opens the source, stands views on it, makes the copy and closes all.
 /// @param target  the file to make.
@@ -105,17 +65,12 @@ JobDraft MakeDraft(const Options& options, const Plan& plan, const std::string& 
     opened.emplace_back("$part");
   }
   if (plan.choosesBands) {
-    JobWriterCommand& view = draft.Open("bands", "CreateSpectralSubsetRasterCommand");
-    view.AddVariableInput("SrcURI", opened.back());
-    view.AddInput("Bands", plan.bands);
+    AddBandView(draft, "bands", opened.back(), plan.bands);
     opened.emplace_back("$bands");
   }
   const String shown = opened.back();
   AddQuery(draft, "shown", shown);
-  JobWriterCommand& create = draft.Open("target", "CreateRasterCommand");
-  create.AddInput("ConnStr", ConnStrings({String(AbsoluteName(target))}));
-  create.AddVariableInput("SrcURI", shown);
-  create.AddInput("Format", String(plan.format));
+  JobWriterCommand& create = AddCreate(draft, {target, plan.format}, shown);
   if (!options.interleave.empty()) {
     create.AddInput("Interleave", ParseInterleave(options.interleave));
   }
@@ -129,17 +84,11 @@ JobDraft MakeDraft(const Options& options, const Plan& plan, const std::string& 
   JobWriterCommand& copy = draft.Step(kCopyStep, "CopyRasterCommand");
   copy.AddVariableInput("SrcURI", shown);
   copy.AddVariableInput("DstURI", "$target");
-  draft.Close(kCloseStep, "$target");
+  AddCloseTarget(draft);
   for (auto raster = opened.rbegin(); raster != opened.rend(); ++raster) {
     draft.Close("close." + raster->ToUTF8().substr(1), *raster);
   }
   return draft;
-}
-
-ProgressReportPtr CopyProgress(const JobSession& session, const JobDraft& draft) {
-  std::size_t step = 0;
-  while (draft.GetSteps()[step].name != kCopyStep) ++step;
-  return ProgressReportPtr(new StepProgress(session.GetProgress(), step, draft.GetSteps().size()));
 }
 
 bool SameNoData(const RasterInfo& a, const RasterInfo& b) {
@@ -156,27 +105,14 @@ bool SameNoData(const RasterInfo& a, const RasterInfo& b) {
   return true;
 }
 
-std::uint64_t PixelBytes(const Plan& plan, const RasterInfo& info) {
-  return std::uint64_t{plan.rect.Width()} * plan.rect.Height() * plan.bands.GetCount() *
-         DataTypeBytes(info.dataType);
-}
-
 /// Opens the copy and looks at it: throws when it is another raster, and says what the format did
 /// not keep.
 void CheckCopy(JobSession& session, const Options& options, const Plan& plan,
                const OutputFile& output, const RasterInfo& wanted) {
-  JobDraft draft;
-  AddOpen(draft, "copy", {output.GetWorkName(), plan.format});
-  AddQuery(draft, "copy", "$copy");
-  draft.Close("close", "$copy");
-  const RasterInfo made = ReadInfo(session.Run(draft), "copy");
-  if (made.samples != wanted.samples || made.lines != wanted.lines || made.bands != wanted.bands ||
-      made.dataType != wanted.dataType) {
-    throw HostError(kExitFailed, options.output + ": the format " + plan.format +
-                                     " did not keep the raster's size, bands or pixel type");
-  }
+  const RasterInfo made =
+      CheckMade(session, {output.GetWorkName(), plan.format}, output.GetShownName(), wanted);
   const auto note = [&](const std::string& what) {
-    Say(options.output + ": note: the format " + plan.format + " does not keep " + what);
+    Say(output.GetShownName() + ": note: the format " + plan.format + " does not keep " + what);
   };
   if (!SameNoData(wanted, made)) note("the no-data values as they are");
   if (wanted.geoRef && !wanted.geoRef->IsEqual(made.geoRef)) note("the geo-reference as it is");
@@ -197,7 +133,7 @@ Plan MakePlan(JobSession& session, const Options& options, const String& raster,
                                             DataTypeName(info.dataType).ToUTF8(), options.type));
   }
   Plan plan;
-  plan.format = ChooseFormat(options);
+  plan.format = ChooseFormat(options.target);
   plan.rect = ParseRect(options.rect, info);
   plan.isPart = !(plan.rect == info.GetRect());
   plan.bands = ParseBands(options.bands, info);
@@ -212,18 +148,18 @@ void MakeCopy(JobSession& session, const Options& options, const Plan& plan,
   const JobDraft draft = MakeDraft(options, plan, output.GetWorkName());
   JobResults results;
   {
-    const ProgressView view(CopyProgress(session, draft), options.job.GetProgressStyle());
+    const ProgressView view(ProgressOfStep(session, draft, kCopyStep),
+                            options.job.GetProgressStyle());
     results = session.Run(draft);
   }
-  const String fault = results.Find(kCloseStep).returns.Find("Fault");
-  if (fault.GetLength() != 0) throw HostError(kExitFailed, fault.ToUTF8());
+  CheckClosed(results);
   CheckCopy(session, options, plan, output, ReadInfo(results, "shown"));
   session.CheckInterrupt();
 }
 
 int Copy(const Options& options) {
-  ChooseFormat(options);
-  OutputFile output(options.output, options.overwrite, {options.source.file});
+  ChooseFormat(options.target);
+  OutputFile output(options.target.output, options.target.overwrite, {options.source.file});
   JobSession session(options.job);
   JobDraft opening;
   AddOpen(opening, "source", options.source);
@@ -237,7 +173,8 @@ int Copy(const Options& options) {
     std::cout << MakeDraft(options, plan, output.GetName()).Write().ToUTF8() << '\n';
     return kExitSuccess;
   }
-  output.Begin(Compresses(plan.format) ? 0 : PixelBytes(plan, info));
+  output.Begin(BytesInFile(plan.format, info.dataType, plan.rect.Width(), plan.rect.Height(),
+                           plan.bands.GetCount()));
   try {
     MakeCopy(session, options, plan, output);
   } catch (const HostError& error) {
@@ -255,11 +192,7 @@ const VerbRegistration registration(
           "format can; what it can't is said.\n"
           "Example: vexg copy scene.tif part.dat --format ORVA --rect 0,0,99,49 --bands 2,1,0\n");
       options->source.AddTo(app);
-      app.add_option("output", options->output, "The copy")->type_name("OUT")->required();
-      app.add_option(
-             "--format", options->format,
-             "Key of the copy's format, see vexg formats; by default from its name's ending")
-          ->type_name("KEY");
+      options->target.AddTo(app, "The copy");
       app.add_option("--rect", options->rect,
                      "Pixels: left,top,right,bottom, from 0, inclusive; all by default")
           ->type_name("L,T,R,B");
@@ -269,7 +202,6 @@ const VerbRegistration registration(
           ->check(CLI::IsMember({"bip", "bil", "bsq"}));
       app.add_option("--type", options->type, "Pixel type that the source has to have")
           ->type_name("TYPE");
-      app.add_flag("--overwrite", options->overwrite, "Replace files that are there");
       options->job.AddTo(app);
       options->job.AddProgressTo(app);
       return VerbRegistration::Work([options] { return Copy(*options); });

@@ -4,16 +4,13 @@
 
 #include <CLI/CLI.hpp>
 #include <fmt/format.h>
-#include <nlohmann/json.hpp>
 
-#include "raster/pixel_types.h"
+#include "json_number.h"
 #include "raster_source.h"
 #include "verb.h"
 
 namespace lumo::host {
 namespace {
-
-using Json = nlohmann::ordered_json;
 
 struct Options {
   std::vector<std::string> files;
@@ -21,22 +18,6 @@ struct Options {
   RasterJobOptions job;
   bool json = false;
 };
-
-/// A number of JSON, or a text for one that JSON has no number for.
-template <typename T>
-Json NumberAsJson(T value) {
-  if constexpr (std::is_floating_point_v<T>) {
-    if (!std::isfinite(value)) return FormatValue(value).ToUTF8();
-    return static_cast<double>(value);
-  } else {
-    return value;
-  }
-}
-
-template <typename T>
-Json NumberAsJson(const Complex<T>& value) {
-  return Json::array({NumberAsJson(value.real), NumberAsJson(value.imag)});
-}
 
 /// For each band its no-data value, or null.
 Json NoDataAsJson(const RasterInfo& info) {

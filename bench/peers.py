@@ -1,0 +1,215 @@
+"""vexg beside public tools that do the same work; see peers.sh."""
+
+import argparse
+import multiprocessing
+import os
+import pathlib
+import statistics
+import subprocess
+import sys
+import time
+
+BANDS = 6
+TYPES = ("Byte", "UInt16", "Float32")
+LAYOUTS = {
+    "tiled": ["TILED=YES"],
+    "strips": [],
+    "by band": ["INTERLEAVE=BAND"],
+}
+
+
+def make_scene(path, size, type_name, options):
+    """A scene of noise on slopes; the same pixels for every layout."""
+    # In a process of its own: who starts a peer is small, so that the peer's peak memory is its own.
+    import numpy
+    from osgeo import gdal
+    gdal.UseExceptions()
+    kind = numpy.dtype(type_name.lower() if type_name != "Byte" else "uint8")
+    code = gdal.GetDataTypeByName(type_name)
+    driver = gdal.GetDriverByName("ENVI" if options is None else "GTiff")
+    out = driver.Create(str(path), size, size, BANDS, code, ["INTERLEAVE=BIP"] if options is None else options)
+    out.SetGeoTransform((600000, 30, 0, 5000000, 0, -30))
+    top = {"Byte": 255, "UInt16": 4095, "Float32": 1.0}[type_name]
+    random = numpy.random.default_rng(1)
+    x = numpy.linspace(0, 1, size, dtype=numpy.float32)[None, :]
+    step = 256
+    for y in range(0, size, step):
+        lines = min(step, size - y)
+        slope = numpy.linspace(y, y + lines, lines, dtype=numpy.float32)[:, None] / size
+        block = numpy.empty((BANDS, lines, size), kind)
+        for band in range(BANDS):
+            noise = random.random((lines, size), dtype=numpy.float32)
+            block[band] = (0.05 + 0.3 * x + 0.3 * slope + 0.3 * noise) * top * (1 - band / 10)
+        out.WriteArray(block, 0, y)
+    del out
+    pathlib.Path(f"{path}.aux.xml").unlink(missing_ok=True)
+
+
+class Bench:
+    def __init__(self, options):
+        self.options = options
+        self.work = pathlib.Path(options.work)
+        self.work.mkdir(parents=True, exist_ok=True)
+        self.vexg = str(pathlib.Path(options.vexg).resolve())
+
+    def scene(self, type_name, layout, size=None):
+        size = size or self.options.size
+        if layout == "ORVA":
+            path = self.work / f"{type_name}-{size}-orva.dat"
+            if not path.exists():
+                source = self.scene(type_name, "strips", size)
+                subprocess.run([self.vexg, "copy", source, path, "--format", "ORVA", "-q"], check=True)
+            return path
+        path = self.work / f"{type_name}-{size}-{layout.replace(' ', '-')}{'.dat' if layout == 'flat' else '.tif'}"
+        if not path.exists():
+            print(f"making {path}", file=sys.stderr)
+            options = None if layout == "flat" else LAYOUTS[layout]
+            maker = multiprocessing.get_context("spawn").Process(
+                target=make_scene, args=(path, size, type_name, options))
+            maker.start()
+            maker.join()
+            if maker.exitcode != 0:
+                raise SystemExit(f"{path} could not be made")
+        return path
+
+    def once(self, command, env=None):
+        """Seconds and peak memory in MiB of a command."""
+        start = time.perf_counter()
+        process = subprocess.Popen([str(word) for word in command], stdout=subprocess.DEVNULL,
+                                   env={**os.environ, **(env or {})})
+        _, status, usage = os.wait4(process.pid, 0)
+        process.returncode = os.waitstatus_to_exitcode(status)
+        seconds = time.perf_counter() - start
+        if process.returncode != 0:
+            raise SystemExit(f"{command} ended with {process.returncode}")
+        return seconds, usage.ru_maxrss / 1024
+
+    def compare(self, what, ours, peers, aim=None, clean=()):
+        """Runs commands in turn; prints the median of each and the ratio of ours to each peer.
+        `peers` is a dictionary of name to command, or to a list of commands run one after the other."""
+        times = {name: [] for name in ["vexg", *peers]}
+        peak = 0
+        for _ in range(self.options.runs):
+            for name, command in [("vexg", ours), *peers.items()]:
+                for path in clean:
+                    pathlib.Path(path).unlink(missing_ok=True)
+                steps = command if isinstance(command[0], (list, tuple)) else [command]
+                runs = [self.once(step) for step in steps]
+                times[name].append(sum(seconds for seconds, _ in runs))
+                if name == "vexg":
+                    peak = max([peak, *(memory for _, memory in runs)])
+        for path in clean:
+            pathlib.Path(path).unlink(missing_ok=True)
+        median = {name: statistics.median(values) for name, values in times.items()}
+        text = f"{what:<34} vexg {median['vexg']:7.3f} s {peak:5.0f} MiB"
+        aims = aim if isinstance(aim, dict) else {name: aim for name in peers}
+        for name in peers:
+            ratio = median["vexg"] / median[name]
+            bound = aims.get(name)
+            verdict = "" if bound is None else f" (aim {bound}{'' if ratio <= bound else ', MISSED'})"
+            text += f"   {name} {median[name]:7.3f} s  ratio {ratio:5.2f}{verdict}"
+        print(text, flush=True)
+        return median["vexg"], peak
+
+
+def stats(bench):
+    for type_name, aim in (("Byte", 1.0), ("UInt16", 0.9), ("Float32", 0.5)):
+        for layout in ("tiled", "strips", "by band", "ORVA"):
+            scene = bench.scene(type_name, layout)
+            peer = bench.scene(type_name, "flat") if layout == "ORVA" else scene
+            side = f"{peer}.aux.xml"
+            basic, _ = bench.compare(f"statistics {type_name} {layout}", [bench.vexg, "stats", scene],
+                                     {"gdalinfo -stats": ["gdalinfo", "-stats", peer]}, aim, [side])
+        extended, _ = bench.compare(f"extended statistics {type_name} ORVA",
+                                    [bench.vexg, "stats", scene, "--extended"], {})
+        print(f"{'':<34} {extended / basic:.2f} of the basic ones (aim 3)")
+        several, _ = bench.compare(f"one worker {type_name} ORVA",
+                                   ["env", "LUMO_THREADS_HINT=1", bench.vexg, "stats", scene], {})
+        print(f"{'':<34} two workers are {several / basic:.2f} times as fast (aim 1.6)")
+
+
+def hist(bench):
+    for type_name, aim in (("Byte", 1.0), ("UInt16", None), ("Float32", None)):
+        for layout in ("tiled", "strips", "by band", "ORVA"):
+            scene = bench.scene(type_name, layout)
+            peer = bench.scene(type_name, "flat") if layout == "ORVA" else scene
+            bench.compare(f"histogram {type_name} {layout}", [bench.vexg, "hist", scene, "--json"],
+                          {"gdalinfo -hist": ["gdalinfo", "-hist", peer]}, aim, [f"{peer}.aux.xml"])
+
+
+RASTERIO_SCRIPT = """
+import sys, numpy, rasterio
+source, target, gain, offset = sys.argv[1], sys.argv[2], float(sys.argv[3]), float(sys.argv[4])
+with rasterio.open(source) as src:
+    profile = src.profile
+    profile.update(dtype="float32")
+    with rasterio.open(target, "w", **profile) as out:
+        height = profile.get("blockysize", 256)
+        height = max(height, 256) // height * height
+        for y in range(0, src.height, height):
+            window = rasterio.windows.Window(0, y, src.width, min(height, src.height - y))
+            dn = src.read(window=window).astype(numpy.float32)
+            r = dn * numpy.float32(gain) + numpy.float32(offset)
+            out.write(numpy.maximum(r, 0), window=window)
+"""
+
+
+def calibrate(bench):
+    script = bench.work / "calibrate_rasterio.py"
+    script.write_text(RASTERIO_SCRIPT)
+    target = bench.work / "calibrated.tif"
+    for type_name in TYPES:
+        for layout in ("tiled", "strips"):
+            scene = bench.scene(type_name, layout)
+            options = [f"--co={option}" for option in LAYOUTS[layout]]
+            bench.compare(
+                f"radiance {type_name} {layout}",
+                [bench.vexg, "calibrate", "radiance", scene, target, "--gain", "0.5", "--offset", "-3"],
+                {"gdal_calc": ["gdal_calc.py", "--quiet", "-A", scene, "--allBands=A", f"--outfile={target}",
+                               "--type=Float32", "--calc=maximum(A*0.5-3.0,0)", *options],
+                 "rasterio": [sys.executable, script, scene, target, "0.5", "-3"]},
+                {"gdal_calc": 0.4, "rasterio": 0.8}, [target])
+    scene = bench.scene("UInt16", "ORVA")
+    bench.compare("radiance UInt16 ORVA to ORVA",
+                  [bench.vexg, "calibrate", "radiance", scene, bench.work / "calibrated.dat", "--gain", "0.5",
+                   "--offset", "-3"], {}, None, [bench.work / "calibrated.dat", bench.work / "calibrated.dat.hdr"])
+
+
+def memory(bench):
+    """Peak memory of one scene and of one four times as large."""
+    target = bench.work / "calibrated.tif"
+    for verb in (["stats"], ["stats", "--extended"], ["hist"], ["calibrate"]):
+        peaks = []
+        for size in (bench.options.size, 2 * bench.options.size):
+            scene = bench.scene("UInt16", "tiled", size)
+            command = [bench.vexg, *verb, scene]
+            if verb[0] == "calibrate":
+                command = [bench.vexg, "calibrate", "radiance", scene, target, "--gain", "0.5", "--offset", "-3"]
+            target.unlink(missing_ok=True)
+            peaks.append(bench.once(command)[1])
+        print(f"memory {' '.join(verb):<27} {peaks[0]:5.0f} MiB, of a scene four times as large {peaks[1]:5.0f} MiB "
+              "(aim 300, and 50 apart)")
+    target.unlink(missing_ok=True)
+
+
+SECTIONS = {"stats": stats, "hist": hist, "calibrate": calibrate, "memory": memory}
+
+
+def main():
+    parser = argparse.ArgumentParser()
+    parser.add_argument("--vexg", required=True)
+    parser.add_argument("--size", type=int, default=4000)
+    parser.add_argument("--runs", type=int, default=5)
+    parser.add_argument("--work", default="build/peers")
+    parser.add_argument("sections", nargs="*", metavar="SECTION", help=", ".join(SECTIONS))
+    options = parser.parse_args()
+    unknown = [name for name in options.sections if name not in SECTIONS]
+    if unknown:
+        parser.error(f"there is no section {unknown[0]}; there are {', '.join(SECTIONS)}")
+    bench = Bench(options)
+    for name in options.sections or SECTIONS:
+        SECTIONS[name](bench)
+
+
+if __name__ == "__main__":
+    main()

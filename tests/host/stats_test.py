@@ -1,0 +1,238 @@
+"""Statistics, histograms and calibration, beside reference facts, GDAL and plain arithmetic."""
+
+import array
+import json
+import math
+import pathlib
+import re
+import shutil
+import subprocess
+import unittest
+
+from support import DATA, FolderTest, needs_data, needs_gdal, read_npy, read_png, run, table, write_orva
+
+
+class RasterTest(FolderTest):
+    def stats(self, *arguments):
+        return json.loads(self.fine("stats", "--json", *arguments))["bands"]
+
+    def values(self, file, band, *options):
+        """The valid pixels of a band, by vexg read; all of them with NaN in the others' place."""
+        self.fine("read", file, "--bands", band, "-o", self.folder / "v.npy", "--mask", self.folder / "m.npy",
+                  "--overwrite")
+        kind, _, data = read_npy(self.folder / "v.npy")
+        _, _, mask = read_npy(self.folder / "m.npy")
+        codes = {"|u1": "B", "<u2": "H", "<i2": "h", "<f4": "f", "<f8": "d"}
+        pixels = array.array(codes[kind])
+        pixels.frombytes(data)
+        return [math.nan if state else float(value) for value, state in zip(pixels, mask)]
+
+
+@needs_data
+class Stats(RasterTest):
+    def test_agree_with_the_reference_facts(self):
+        facts = {}
+        for row in table("| file | band | valid"):
+            facts.setdefault(row["file"], []).append(row)
+        for file, rows in facts.items():
+            if file.endswith(".jpg"):
+                continue  # decoders differ
+            with self.subTest(file):
+                bands = self.stats(DATA / file)
+                self.assertEqual([band["band"] for band in bands], [int(row["band"]) for row in rows])
+                for band, row in zip(bands, rows):
+                    self.assertEqual(band["count"], int(row["valid pixels"]))
+                    if band["count"] == 0:
+                        self.assertEqual([band[name] for name in ("min", "max", "mean", "std", "rms")], [0] * 5)
+                        continue
+                    self.assertEqual((band["min"], band["max"]), (float(row["min"]), float(row["max"])))
+                    for name, fact in (("mean", "mean"), ("std", "deviation")):
+                        want = float(row[fact])
+                        self.assertLessEqual(abs(band[name] - want), 1e-12 * abs(want) + 1e-300, name)
+
+    def test_sums_and_covariances_agree_with_exact_arithmetic(self):
+        for file in ("rgb1.tif", "landsat7_f32_strip.tif"):
+            with self.subTest(file):
+                bands = self.stats(DATA / file, "--extended")
+                pixels = [self.values(DATA / file, band["band"]) for band in bands]
+                for i, band in enumerate(bands):
+                    valid = [value for value in pixels[i] if value == value]
+                    sums = math.fsum(valid), math.fsum(value * value for value in valid)
+                    self.assertAlmostEqual(band["sum"] / sums[0], 1, delta=1e-13)
+                    self.assertAlmostEqual(band["sum2"] / sums[1], 1, delta=1e-13)
+                    self.assertAlmostEqual(band["rms"], math.sqrt(sums[1] / len(valid)), delta=1e-9 * band["rms"])
+                    for j in range(len(bands)):
+                        pairs = [(x, y) for x, y in zip(pixels[i], pixels[j]) if x == x and y == y]
+                        n = len(pairs)
+                        mean_x = math.fsum(x for x, _ in pairs) / n
+                        mean_y = math.fsum(y for _, y in pairs) / n
+                        cov = math.fsum((x - mean_x) * (y - mean_y) for x, y in pairs) / (n - 1)
+                        products = math.fsum(x * y for x, y in pairs)
+                        self.assertAlmostEqual(band["sumXY"][j] / products, 1, delta=1e-13)
+                        self.assertAlmostEqual(band["cov"][j] / cov, 1, delta=1e-10)
+
+    def test_of_chosen_bands_are_those_of_all(self):
+        every = self.stats(DATA / "landsat7_olinda.tif")
+        some = self.stats(DATA / "landsat7_olinda.tif", "--bands", "4,0")
+        self.assertEqual(some, [every[4], every[0]])
+
+    def test_save_stores_them_where_the_format_keeps_them(self):
+        for name in ("landsat7_u16_tiled.tif", "float_nan.tif", "landsat7.img", "flat.dat"):
+            with self.subTest(name):
+                file = self.folder / name
+                if name == "flat.dat":
+                    self.fine("copy", DATA / "rgb1.tif", file)
+                else:
+                    shutil.copy(DATA / name, file)
+                first = self.stats(file, "--save")
+                self.assertEqual(self.stats(file), first)
+                if file.suffix == ".dat":
+                    self.assertIn("statistics", (self.folder / "flat.dat.hdr").read_text())
+                elif shutil.which("gdalinfo"):
+                    out = subprocess.run(["gdalinfo", file], capture_output=True, text=True, check=True).stdout
+                    means = [float(text) for text in re.findall(r"STATISTICS_MEAN=(\S+)", out)]
+                    self.assertEqual(means, [band["mean"] for band in first])
+
+    def test_complaints(self):
+        cases = [
+            ((DATA / "complex64.tif",), 1, "statistics are of real numbers"),
+            ((DATA / "rgb1.tif", "--bands", "3"), 2, "no band 3"),
+            ((DATA / "rgb1.tif", "--bands", "0", "--save"), 2, "leave --bands out"),
+            ((self.folder / "none.tif",), 1, "none.tif"),
+        ]
+        for arguments, want, words in cases:
+            with self.subTest(words):
+                code, out, err = run("stats", *map(str, arguments))
+                self.assertEqual((code, out), (want, ""))
+                self.assertIn(words, err)
+                self.assertEqual(err.count("\n"), 1)
+
+
+@needs_data
+class Hist(RasterTest):
+    def hist(self, *arguments):
+        return json.loads(self.fine("hist", "--json", *arguments))["bands"]
+
+    def test_counts_every_valid_value_once(self):
+        cases = [("rgb1.tif", []), ("landsat7_u16_tiled.tif", ["--bands", "2,5", "--bins", "40"]),
+                 ("dem_int16.tif", ["--bin-size", "7"]), ("float_raster_with_nodata.tif", ["--bins", "7"]),
+                 ("landsat7_f32_strip.tif", ["--bands", "1"]), ("float_nan.tif", ["--bins", "1"]),
+                 ("landsat7_f32_strip.tif", ["--lower", "0.25", "--upper", "0.5", "--bins", "10"]),
+                 ("dem_int16.tif", ["--lower", "10", "--upper", "19"]), ("all-nodata.tif", [])]
+        for file, options in cases:
+            with self.subTest(file=file, options=options):
+                for band in self.hist(DATA / file, *options):
+                    low, high, size = band["min"], band["max"], band["binSize"]
+                    counts = [0] * len(band["counts"])
+                    for value in self.values(DATA / file, band["band"]):
+                        if low <= value <= high:
+                            # The difference is taken in the pixels' own precision.
+                            above = array.array("f", [value - low])[0] if isinstance(low, float) else value - low
+                            counts[int(above / size)] += 1
+                    self.assertEqual(band["counts"], counts)
+                    self.assertLessEqual(low + size * (len(counts) - 1), high)
+
+    def test_picture(self):
+        picture = self.folder / "h.png"
+        self.fine("hist", DATA / "rgb1.tif", "-o", picture)
+        width, height, channels, pixels = read_png(picture)
+        self.assertEqual((channels, height % 3), (1, 0))
+        # The highest bar of each panel is as high as the axis: a column of 126 dark grey dots.
+        panel = width * height // 3
+        for top in range(0, len(pixels), panel):
+            bars = [pixels[top + x:top + panel:width].count(90) for x in range(width)]
+            self.assertEqual(max(bars), 126)
+        code, _, err = run("hist", str(DATA / "rgb1.tif"), "-o", str(picture))
+        self.assertEqual(code, 2)
+        self.assertIn("--overwrite", err)
+
+    def test_save_stores_them(self):
+        file = self.folder / "rgb1.tif"
+        shutil.copy(DATA / "rgb1.tif", file)
+        self.fine("hist", file, "--save", "--json")
+        self.assertIn("Histograms", pathlib.Path(f"{file}.aux.xml").read_text())
+
+    def test_complaints(self):
+        for options, words in ((["--bins", "9", "--bin-size", "1"], "exclude"), (["--bin-size", "0"], "above 0"),
+                               (["--lower", "9", "--upper", "3"], "is above the upper"),
+                               (["--lower", "1.5"], "can't be 1.5"), (["--upper", "300"], "can't be 300"),
+                               (["--bin-size", "2.5"], "whole size")):
+            with self.subTest(words):
+                code, out, err = run("hist", str(DATA / "rgb1.tif"), *options)
+                self.assertEqual((code, out), (2, ""))
+                self.assertIn(words, err)
+
+
+@needs_data
+class Calibrate(RasterTest):
+    CONSTANTS = {
+        "radiance": [], "reflectance": ["--irradiance", "1969,1840,1551", "--sun-elevation", "61.5",
+                                        "--distance", "1.0128"],
+        "temperature": ["--k1", "607.76", "--k2", "1260.56"],
+    }
+
+    def want(self, quantity, value, band):
+        r = value * (0.775, 0.796, 0.619)[band] - 6.2
+        if not r > 0:
+            return 0.0
+        if quantity == "reflectance":
+            sine = math.sin(61.5 * math.pi / 180)
+            return r * 3.141592653589 * 1.0128 ** 2 * 2 / (sine * (1969, 1840, 1551)[band])
+        return 2 * (1260.56 / math.log(607.76 / r + 1) if quantity == "temperature" else r)
+
+    def test_follow_the_formulas(self):
+        for quantity, constants in self.CONSTANTS.items():
+            for source, type_name in (("rgb1.tif", "Double"), ("landsat7_rgb.png", "Single")):
+                with self.subTest(quantity=quantity, source=source, type=type_name):
+                    out = self.folder / "out.tif"
+                    self.fine("calibrate", quantity, DATA / source, out, "--gain", "0.775,0.796,0.619",
+                              "--offset", "-6.2", "--scale", "2", "--type", type_name, "--overwrite", *constants)
+                    for band in range(3):
+                        delta = 1e-12 if type_name == "Double" else 1e-7
+                        for got, dn in zip(self.values(out, band), self.values(DATA / source, band)):
+                            if dn != dn:
+                                self.assertNotEqual(got, got)
+                                continue
+                            want = self.want(quantity, dn, band)
+                            self.assertLessEqual(abs(got - want), delta * want)
+
+    def test_whole_numbers_keep_the_low_bits(self):
+        source = write_orva(self.folder / "dn.dat", 4, 1, 1, bytes([0, 100, 200, 250]))
+        out = self.folder / "out.dat"
+        self.fine("calibrate", "radiance", source, out, "--gain", "1.5", "--offset", "-0.5", "--type", "Byte")
+        self.assertEqual(self.values(out, 0), [0, 149, 299 - 256, 374 - 256])
+
+    def test_complaints_leave_nothing_behind(self):
+        base = ["--gain", "1", "--offset", "0"]
+        cases = [
+            (["radiance", "--gain", "1"], 2, "--offset: radiance needs it"),
+            (["radiance", "--gain", "1,2", "--offset", "0"], 2, "2 values for 3 bands"),
+            (["radiance", *base, "--k1", "3"], 2, "no use for it"),
+            (["reflectance", *base, "--irradiance", "5", "--sun-elevation", "0", "--distance", "1"], 2, "horizon"),
+            (["radiance", *base, "--type", "Word"], 2, "--type"),
+            (["radiance", *base, "--type", "Byte", "--scale", "0.5"], 2, "would be cut to 0"),
+            (["radiance", *base, "--format", "PNG"], 1, "out.tif"),
+        ]
+        for (quantity, *options), want, words in cases:
+            with self.subTest(words):
+                code, out, err = run("calibrate", quantity, str(DATA / "rgb1.tif"), str(self.folder / "out.tif"),
+                                     *options)
+                self.assertEqual((code, out), (want, ""))
+                self.assertIn(words, err)
+                self.assertEqual(list(self.folder.iterdir()), [])
+
+    @needs_gdal
+    def test_print_job_is_the_work_done(self):
+        out = self.folder / "out.tif"
+        arguments = ["calibrate", "radiance", str(DATA / "rgb1.tif"), str(out), "--gain", "2", "--offset", "1"]
+        job = self.folder / "job.xml"
+        job.write_text(self.fine(*arguments, "--print-job"))
+        self.assertFalse(out.exists())
+        self.fine("run", job)
+        by_job = out.read_bytes()
+        self.fine(*arguments, "--overwrite")
+        self.assertEqual(out.read_bytes(), by_job)
+
+
+if __name__ == "__main__":
+    unittest.main()

@@ -1,0 +1,43 @@
+#pragma once
+
+#include <cstdint>
+#include <string>
+#include <vector>
+
+#include "output_file.h"
+
+namespace lumo::host {
+
+/// What a plot shows of one band.
+struct PlottedHistogram {
+  std::string title;
+  double lower = 0;  ///< where the first bin begins
+  double binSize = 1;
+  std::vector<std::uint64_t> counts;
+};
+
+/// Draws histograms as a picture, one above the other: bars over an axis of values, their height a
+/// share of the highest bar, whose count stands beside it.
+class HistogramPlot {
+ public:
+  /// @param histograms  one at least, each of one bin at least.
+  explicit HistogramPlot(const std::vector<PlottedHistogram>& histograms);
+
+  /// Bytes that the picture takes at most.
+  std::uint64_t GetBytes() const { return pixels_.size(); }
+
+  /// Writes the picture, a PNG.
+  void Write(const OutputFile& output) const;
+
+ private:
+  void DrawPanel(const PlottedHistogram& histogram, unsigned top);
+  void DrawBars(const PlottedHistogram& histogram, unsigned top, double highest);
+  void DrawAxes(const PlottedHistogram& histogram, unsigned top, double highest);
+  void DrawText(const std::string& text, unsigned x, unsigned y);
+  void Fill(unsigned left, unsigned top, unsigned right, unsigned bottom, unsigned char grey);
+
+  unsigned height_;
+  std::vector<unsigned char> pixels_;  // grey, row by row
+};
+
+}  // namespace lumo::host

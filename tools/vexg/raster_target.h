@@ -1,0 +1,55 @@
+#pragma once
+
+#include <string>
+
+#include "output_file.h"
+#include "raster_source.h"
+
+namespace lumo::host {
+
+/// A raster file to make, as the command line names it.
+struct TargetOptions {
+  std::string output;
+  std::string format;  ///< key; empty: as the name's ending tells
+  bool overwrite = false;
+
+  /// @param meaning  what the file is, for the help.
+  void AddTo(CLI::App& app, const std::string& meaning);
+};
+
+/// The key of the format to make. Throws HostError for none that is known.
+std::string ChooseFormat(const TargetOptions& target);
+
+/// Bytes that `samples` by `lines` pixels of `bands` bands take in a file of this format; 0 for a
+/// format that makes them smaller by nobody knows how much.
+std::uint64_t BytesInFile(const std::string& format, unsigned dataType, std::uint64_t samples,
+                          std::uint64_t lines, unsigned bands);
+
+/// A format that a raster is made in, and where.
+struct TargetPlace {
+  std::string file;
+  std::string format;
+};
+
+/// Adds the command that makes a raster, into the variable "$target". Further inputs are the
+/// caller's.
+/// @param like  a variable or URI: the raster whose description is the start.
+JobWriterCommand& AddCreate(JobDraft& draft, const TargetPlace& place, const String& like);
+
+/// Adds the command that ends the making of "$target".
+void AddCloseTarget(JobDraft& draft);
+
+/// Throws HostError when what AddCloseTarget added told a fault.
+void CheckClosed(const JobResults& results);
+
+/// Opens a raster that was made and gives what it is. Throws HostError where it isn't of the size,
+/// bands and pixel type that were wanted.
+/// @param shown  what the user calls the file.
+RasterInfo CheckMade(JobSession& session, const TargetPlace& made, const std::string& shown,
+                     const RasterInfo& wanted);
+
+/// Progress of the step of this name, of a draft whose steps run one after the other.
+ProgressReportPtr ProgressOfStep(const JobSession& session, const JobDraft& draft,
+                                 const std::string& name);
+
+}  // namespace lumo::host

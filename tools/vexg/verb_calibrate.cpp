@@ -1,0 +1,254 @@
+#include <charconv>
+#include <cmath>
+#include <iostream>
+#include <limits>
+#include <memory>
+#include <optional>
+
+#include <CLI/CLI.hpp>
+#include <fmt/format.h>
+
+#include "raster/pixel_types.h"
+#include "raster_target.h"
+#include "verb.h"
+
+namespace lumo::host {
+namespace {
+
+struct Options {
+  std::string quantity;
+  SourceOptions source;
+  TargetOptions target;
+  RasterJobOptions job;
+  std::vector<double> gain, offset, irradiance, k1, k2;
+  std::optional<double> sunElevation, distance;
+  double scale = 1.0;
+  std::string type = "Single";
+};
+
+constexpr const char* kCalibrateStep = "calibrate";
+
+/// One of the constants of a calibration.
+struct Constant {
+  const char* option;
+  const char* input;
+  const std::vector<double>& values;
+};
+
+/// The constants that a quantity needs for each band.
+std::vector<Constant> BandConstants(const Options& options) {
+  std::vector<Constant> all{{"--gain", "Gain", options.gain},
+                            {"--offset", "Offset", options.offset}};
+  if (options.quantity == "reflectance") {
+    all.push_back({"--irradiance", "SolarIrradiance", options.irradiance});
+  } else if (options.quantity == "temperature") {
+    all.push_back({"--k1", "K1", options.k1});
+    all.push_back({"--k2", "K2", options.k2});
+  }
+  return all;
+}
+
+const char* CommandOf(const std::string& quantity) {
+  return quantity == "radiance"      ? "CalibrateRasterRadianceCommand"
+         : quantity == "reflectance" ? "CalibrateRasterTOAReflectanceCommand"
+                                     : "CalibrateRasterBrightnessTemperatureCommand";
+}
+
+/// Refuses constants that are missing, that the quantity has no use for, or that give no image.
+void CheckConstants(const Options& options) {
+  const auto refuse = [](const std::string& line) { throw HostError(kExitUsage, line); };
+  for (const Constant& constant : BandConstants(options)) {
+    if (constant.values.empty()) {
+      refuse(fmt::format("{}: {} needs it", constant.option, options.quantity));
+    }
+  }
+  const bool isReflectance = options.quantity == "reflectance";
+  const bool isTemperature = options.quantity == "temperature";
+  const std::pair<const char*, bool> useless[] = {
+      {"--irradiance", !isReflectance && !options.irradiance.empty()},
+      {"--sun-elevation", !isReflectance && options.sunElevation.has_value()},
+      {"--distance", !isReflectance && options.distance.has_value()},
+      {"--k1", !isTemperature && !options.k1.empty()},
+      {"--k2", !isTemperature && !options.k2.empty()}};
+  for (const auto& [option, given] : useless) {
+    if (given) refuse(fmt::format("{}: {} has no use for it", option, options.quantity));
+  }
+  if (!isReflectance) return;
+  if (!options.sunElevation || !options.distance) {
+    refuse(fmt::format("{}: reflectance needs it",
+                       options.sunElevation ? "--distance" : "--sun-elevation"));
+  }
+  if (!(*options.sunElevation > 0 && *options.sunElevation <= 90)) {
+    refuse("--sun-elevation: the sun stands 0 to 90 degrees above the horizon, and not on it");
+  }
+  if (!(*options.distance > 0)) refuse("--distance: it is above 0");
+  for (const double irradiance : options.irradiance) {
+    if (!(irradiance > 0)) refuse("--irradiance: it is above 0");
+  }
+}
+
+/// A value for each band; one value counts for all.
+Array<double> ForBands(const Constant& constant, unsigned bands) {
+  const std::vector<double>& values = constant.values;
+  if (values.size() != 1 && values.size() != bands) {
+    throw HostError(kExitUsage, fmt::format("{}: there are {} values for {} bands", constant.option,
+                                            values.size(), bands));
+  }
+  Array<double> all{ArrayDims(bands)};
+  for (unsigned band = 0; band < bands; ++band) all[band] = values[values.size() == 1 ? 0 : band];
+  return all;
+}
+
+unsigned TypeCode(const Options& options) {
+  const unsigned code = ParseDataType(String(options.type));
+  const bool known = DispatchType(EightTypes{}, code, []<typename T>() { return true; });
+  if (known) return code;
+  throw HostError(kExitUsage, "--type: \"" + options.type +
+                                  "\" is none of Byte, SByte, Int16, UInt16, Int32, UInt32, "
+                                  "Single, Double");
+}
+
+/// What the result has in the place of pixels without data: a floating-point type NaN, which no
+/// result can be; else the value of the source.
+void AddNoData(JobWriterCommand& create, const RasterInfo& info, unsigned type) {
+  bool has = false;
+  for (const bool band : info.hasNoData) has = has || band;
+  const bool isReal = type == kDataTypeOf<float> || type == kDataTypeOf<double>;
+  if (!has || !isReal) return;
+  Array<double> values{ArrayDims(info.bands)};
+  for (double& value : values) value = std::numeric_limits<double>::quiet_NaN();
+  create.AddInput("HasNoDataValue", info.hasNoData);
+  create.AddInput("NoDataValue", values);
+}
+
+/// The whole of the work as one document.
+/// @param file  to make.
+JobDraft MakeDraft(const Options& options, const TargetPlace& place, const RasterInfo& info) {
+  JobDraft draft;
+  AddOpen(draft, "source", options.source);
+  JobWriterCommand& create = AddCreate(draft, place, "$source");
+  const unsigned type = TypeCode(options);
+  create.AddInput("DataType", DataTypeName(type));
+  AddNoData(create, info, type);
+  JobWriterCommand& calibrate = draft.Step(kCalibrateStep, CommandOf(options.quantity));
+  calibrate.AddInput("SourceURI", String("$source"));
+  calibrate.AddInput("CalibratedURI", String("$target"));
+  for (const Constant& constant : BandConstants(options)) {
+    calibrate.AddInput(constant.input, ForBands(constant, info.bands));
+  }
+  if (options.sunElevation) calibrate.AddInput("SunElevation", *options.sunElevation);
+  if (options.distance) calibrate.AddInput("EarthSunDistance", *options.distance);
+  calibrate.AddInput("ScaleFactor", options.scale);
+  AddCloseTarget(draft);
+  draft.Close("close.source", "$source");
+  return draft;
+}
+
+/// Makes the result in the output's folder. Throws what went wrong.
+void MakeResult(JobSession& session, const Options& options, const TargetPlace& place,
+                const OutputFile& output, const RasterInfo& info) {
+  const JobDraft draft = MakeDraft(options, place, info);
+  JobResults results;
+  {
+    const ProgressView view(ProgressOfStep(session, draft, kCalibrateStep),
+                            options.job.GetProgressStyle());
+    results = session.Run(draft);
+  }
+  CheckClosed(results);
+  RasterInfo wanted = info;
+  wanted.dataType = TypeCode(options);
+  CheckMade(session, place, output.GetShownName(), wanted);
+  session.CheckInterrupt();
+}
+
+/// Says what the numbers of the result may not hold.
+void NoteLimits(const Options& options, const RasterInfo& info) {
+  const unsigned type = TypeCode(options);
+  if (type == kDataTypeOf<float> || type == kDataTypeOf<double>) return;
+  if (options.quantity != "reflectance" && std::trunc(options.scale) != options.scale) {
+    throw HostError(kExitUsage,
+                    fmt::format("--scale: {} would be cut to {}, as the result is of {}",
+                                options.scale, std::trunc(options.scale), options.type));
+  }
+  for (const bool has : info.hasNoData) {
+    if (!has) continue;
+    Say(options.target.output +
+        ": note: a result that happens to be the no-data value is no data; --type Single keeps "
+        "them apart");
+    return;
+  }
+}
+
+int Calibrate(const Options& options) {
+  CheckConstants(options);
+  TypeCode(options);
+  const std::string format = ChooseFormat(options.target);
+  OutputFile output(options.target.output, options.target.overwrite, {options.source.file});
+  JobSession session(options.job);
+  JobDraft opening;
+  AddOpen(opening, "source", options.source);
+  AddQuery(opening, "source", "$source");
+  const JobResults opened = session.Run(opening);
+  output.RefuseInput(PathOf(opened.Find("source").returns.Find("URI")));
+  const RasterInfo info = ReadInfo(opened, "source");
+  NoteLimits(options, info);
+  if (options.job.printJob) {
+    std::cout << MakeDraft(options, {output.GetName(), format}, info).Write().ToUTF8() << '\n';
+    return kExitSuccess;
+  }
+  output.Begin(BytesInFile(format, TypeCode(options), info.samples, info.lines, info.bands));
+  try {
+    MakeResult(session, options, {output.GetWorkName(), format}, output, info);
+  } catch (const HostError& error) {
+    throw HostError(error.code, output.InUsersWords(error.what()));
+  }
+  output.Commit();
+  return kExitSuccess;
+}
+
+void AddConstant(CLI::App& app, const char* name, std::vector<double>& values,
+                 const char* meaning) {
+  app.add_option(name, values, meaning)
+      ->type_name("V[,V…]")
+      ->delimiter(',')
+      ->allow_extra_args(false);
+}
+
+const VerbRegistration registration(
+    "calibrate", "Turns digital numbers into radiance, reflectance or temperature",
+    [](CLI::App& app) {
+      const auto options = std::make_shared<Options>();
+      app.footer(
+          "Constants are one value for each band, or one for all. Radiance is DN * gain + offset, "
+          "0 where that is below 0; reflectance is that at the top of the atmosphere; temperature "
+          "is that of a black body, in the unit of K2. The result is --scale times as large. "
+          "Pixels without data stay so; in a result of Single or Double they are NaN.\n"
+          "Example: vexg calibrate reflectance scene.tif reflectance.tif --gain 0.76,0.8,0.62 "
+          "--offset -1.5,-2.8,-1.2 --irradiance 1970,1843,1555 --sun-elevation 49.6 --distance "
+          "1.012\n");
+      app.add_option("quantity", options->quantity, "radiance, reflectance or temperature")
+          ->check(CLI::IsMember({"radiance", "reflectance", "temperature"}))
+          ->required();
+      options->source.AddTo(app);
+      options->target.AddTo(app, "The calibrated raster");
+      AddConstant(app, "--gain", options->gain, "Factor on the digital numbers");
+      AddConstant(app, "--offset", options->offset, "Added to them then");
+      AddConstant(app, "--irradiance", options->irradiance,
+                  "Solar irradiance outside the atmosphere, in the unit of radiance (reflectance)");
+      app.add_option("--sun-elevation", options->sunElevation,
+                     "Of the sun above the horizon, in degrees (reflectance)")
+          ->type_name("DEG");
+      app.add_option("--distance", options->distance,
+                     "From the earth to the sun, in astronomical units (reflectance)")
+          ->type_name("AU");
+      AddConstant(app, "--k1", options->k1, "First thermal constant (temperature)");
+      AddConstant(app, "--k2", options->k2, "Second thermal constant, in kelvins (temperature)");
+      app.add_option("--scale", options->scale, "Factor on the result")->capture_default_str();
+      app.add_option("--type", options->type, "Pixel type of the result")->capture_default_str();
+      options->job.AddTo(app);
+      options->job.AddProgressTo(app);
+      return VerbRegistration::Work([options] { return Calibrate(*options); });
+    });
+
+}  // namespace
+}  // namespace lumo::host

@@ -1,0 +1,336 @@
+#include <algorithm>
+#include <cmath>
+#include <iostream>
+#include <memory>
+#include <numeric>
+#include <optional>
+
+#include <CLI/CLI.hpp>
+#include <fmt/format.h>
+
+#include "histogram_plot.h"
+#include "json_number.h"
+#include "raster/band_values.h"
+#include "raster_target.h"
+#include "verb.h"
+
+namespace lumo::host {
+namespace {
+
+struct Options {
+  SourceOptions source;
+  RasterJobOptions job;
+  std::string bands;
+  std::optional<double> lower;
+  std::optional<double> upper;
+  std::optional<unsigned> bins;
+  std::optional<double> binSize;
+  std::string output;
+  bool overwrite = false;
+  bool save = false;
+  bool json = false;
+};
+
+constexpr unsigned kUsualBins = 256;
+constexpr unsigned kMostBins = 1U << 24;
+constexpr const char* kStatsStep = "stats";
+
+/// The bins of a band, and what they counted.
+template <typename T>
+struct BandBins {
+  unsigned band = 0;
+  T lower{};
+  T upper{};
+  double size = 1;
+  std::vector<std::uint64_t> counts;
+
+  bool HasBinsOf(const BandBins& other) const {
+    return lower == other.lower && upper == other.upper && size == other.size;
+  }
+};
+
+/// A bound of the command line as a pixel value.
+template <typename T>
+T BoundAs(double value, const char* option) {
+  if constexpr (std::is_floating_point_v<T>) {
+    if (std::isfinite(value) && std::isfinite(static_cast<T>(value))) return static_cast<T>(value);
+  } else {
+    const bool fits = value >= static_cast<double>(std::numeric_limits<T>::min()) &&
+                      value <= static_cast<double>(std::numeric_limits<T>::max());
+    if (fits && std::trunc(value) == value) return static_cast<T>(value);
+  }
+  throw HostError(kExitUsage, fmt::format("{}: the pixels can't be {}", option, value));
+}
+
+/// The bin size that holds both bounds in `bins` bins at most. Whole numbers get bins of whole
+/// numbers.
+template <typename T>
+double SizeOf(T lower, T upper, unsigned bins) {
+  double span = static_cast<double>(upper) - static_cast<double>(lower);
+  if constexpr (std::is_integral_v<T>) return std::ceil((span + 1) / bins);
+  if (!(span > 0)) return 1.0;
+  span = std::max(span, static_cast<double>(upper - lower));  // the larger of both roundings
+  double size = span / bins;
+  while (std::trunc(span / size) + 1 > bins) size = std::nextafter(size, HUGE_VAL);
+  return size;
+}
+
+template <typename T>
+class HistogramJob {
+ public:
+  HistogramJob(const Options& options, JobSession& session, const String& raster,
+               const Array<unsigned>& bands)
+      : options_(options), session_(session), raster_(raster), bands_(bands) {}
+
+  int Run(OutputFile* output) {
+    std::vector<BandBins<T>> bands = ChooseBins();
+    const JobDraft draft = MakeDraft(bands);
+    if (options_.job.printJob) {
+      std::cout << PrintedDraft(bands).Write().ToUTF8() << '\n';
+      return kExitSuccess;
+    }
+    JobResults results;
+    {
+      const ProgressView view(session_.GetProgress(), options_.job.GetProgressStyle());
+      results = session_.Run(draft);
+    }
+    TakeCounts(results, bands);
+    if (output != nullptr) Draw(bands, *output);
+    if (options_.json || output == nullptr) {
+      std::cout << (options_.json ? AsJson(bands).dump(2) + "\n" : AsText(bands));
+    }
+    if (options_.save && !ParseValue<bool>(results.Find("save").returns.Find("Return"))) {
+      throw HostError(kExitFailed, options_.source.file + ": the histograms could not be saved");
+    }
+    return kExitSuccess;
+  }
+
+ private:
+  std::vector<BandBins<T>> ChooseBins() {
+    Array<T> lowest{bands_.GetDims()}, highest{bands_.GetDims()};
+    constexpr bool kIsByte = sizeof(T) == 1;
+    if (!kIsByte && !(options_.lower && options_.upper)) ReadExtremes(lowest, highest);
+    std::vector<BandBins<T>> all;
+    for (unsigned i = 0; i < bands_.GetCount(); ++i) {
+      BandBins<T> bins;
+      bins.band = bands_[i];
+      bins.lower = kIsByte ? std::numeric_limits<T>::min() : lowest[i];
+      bins.upper = kIsByte ? std::numeric_limits<T>::max() : highest[i];
+      if (options_.lower) bins.lower = BoundAs<T>(*options_.lower, "--lower");
+      if (options_.upper) bins.upper = BoundAs<T>(*options_.upper, "--upper");
+      if (bins.upper < bins.lower) {
+        throw HostError(kExitUsage, fmt::format("band {}: the lower bound {} is above the upper "
+                                                "one, {}",
+                                                bins.band, bins.lower, bins.upper));
+      }
+      bins.size = options_.binSize
+                      ? *options_.binSize
+                      : SizeOf(bins.lower, bins.upper, options_.bins.value_or(kUsualBins));
+      CheckSize(bins);
+      all.push_back(bins);
+    }
+    return all;
+  }
+
+  void CheckSize(const BandBins<T>& bins) const {
+    if (std::is_integral_v<T> && std::trunc(bins.size) != bins.size) {
+      throw HostError(kExitUsage, "--bin-size: bins of whole numbers have a whole size");
+    }
+    const double span = static_cast<double>(bins.upper) - static_cast<double>(bins.lower);
+    if (span / bins.size >= kMostBins) {
+      throw HostError(kExitUsage, fmt::format("--bin-size: from {} to {} there would be more than "
+                                              "{} bins",
+                                              bins.lower, bins.upper, kMostBins));
+    }
+  }
+
+  /// Smallest and largest values of the bands.
+  void ReadExtremes(Array<T>& lowest, Array<T>& highest) {
+    JobDraft draft;
+    AddBandView(draft, "bands", raster_, bands_);
+    draft.Step(kStatsStep, "GetBasicRasterStatsCommand").AddVariableInput("URI", "$bands");
+    draft.Close("close.bands", "$bands");
+    const ProgressView view(ProgressOfStep(session_, draft, kStatsStep),
+                            options_.job.GetProgressStyle());
+    const JobResults results = session_.Run(draft);
+    const Map<String, String>& returns = results.Find(kStatsStep).returns;
+    lowest = ParseValue<Array<T>>(returns.Find("Min"));
+    highest = ParseValue<Array<T>>(returns.Find("Max"));
+    if (lowest.GetCount() == bands_.GetCount() && highest.GetCount() == bands_.GetCount()) return;
+    throw HostError(kExitFailed, options_.source.file + ": there are no statistics of all bands");
+  }
+
+  static std::string NameOf(const BandBins<T>& bins) { return "bins" + std::to_string(bins.band); }
+
+  /// Bands of the same bins are counted in one pass.
+  /// @param raster  a variable or URI.
+  void AddSteps(JobDraft& draft, const std::vector<BandBins<T>>& bands,
+                const String& raster) const {
+    std::vector<bool> isDone(bands.size());
+    for (std::size_t i = 0; i < bands.size(); ++i) {
+      if (isDone[i]) continue;
+      std::vector<unsigned> same;
+      for (std::size_t j = i; j < bands.size(); ++j) {
+        if (isDone[j] || !bands[j].HasBinsOf(bands[i])) continue;
+        isDone[j] = true;
+        same.push_back(bands[j].band);
+      }
+      Array<unsigned> list{ArrayDims(static_cast<unsigned>(same.size()))};
+      std::copy(same.begin(), same.end(), list.begin());
+      JobWriterCommand& count =
+          draft.Step("count" + std::to_string(i), "CalculateRasterHistogramCommand");
+      count.AddInput("URI", raster);
+      count.AddInput("LowerBound", bands[i].lower);
+      count.AddInput("UpperBound", bands[i].upper);
+      count.AddInput("BinSize", bands[i].size);
+      count.AddInput("Bands", list);
+    }
+    for (const BandBins<T>& bins : bands) {
+      Array<unsigned> band{ArrayDims(1)};
+      band[0] = bins.band;
+      JobWriterCommand& get = draft.Step(NameOf(bins), "GetRasterHistogramCommand");
+      get.AddInput("URI", raster);
+      get.AddInput("Bands", band);
+    }
+    if (options_.save) draft.Step("save", "SaveRasterHistogramCommand").AddInput("URI", raster);
+  }
+
+  JobDraft MakeDraft(const std::vector<BandBins<T>>& bands) const {
+    JobDraft draft;
+    AddSteps(draft, bands, raster_);
+    return draft;
+  }
+
+  /// The counting as one document that opens and closes the raster.
+  JobDraft PrintedDraft(const std::vector<BandBins<T>>& bands) const {
+    JobDraft draft;
+    AddOpen(draft, "raster", options_.source);
+    AddSteps(draft, bands, "$raster");
+    draft.Close("close", "$raster");
+    return draft;
+  }
+
+  /// A raster may have more histograms than those asked for.
+  void TakeCounts(const JobResults& results, std::vector<BandBins<T>>& bands) const {
+    for (BandBins<T>& bins : bands) {
+      const auto found = ParseValue<Array<RasterBandHistogram<T>>>(
+          results.Find(String(NameOf(bins))).returns.Find("Histograms"));
+      for (const RasterBandHistogram<T>& histogram : found) {
+        if (histogram.band != bins.band || histogram.sign != HistogramSign::kBoth ||
+            histogram.min != bins.lower || histogram.max != bins.upper ||
+            histogram.binSize != bins.size) {
+          continue;
+        }
+        bins.counts.assign(histogram.counts.begin(), histogram.counts.end());
+        break;
+      }
+      if (!bins.counts.empty()) continue;
+      throw HostError(kExitFailed, fmt::format("{}: there is no histogram of band {}",
+                                               options_.source.file, bins.band));
+    }
+  }
+
+  Json AsJson(const std::vector<BandBins<T>>& bands) const {
+    Json list = Json::array();
+    for (const BandBins<T>& bins : bands) {
+      list.push_back({{"band", bins.band},
+                      {"min", NumberAsJson(bins.lower)},
+                      {"max", NumberAsJson(bins.upper)},
+                      {"binSize", bins.size},
+                      {"counts", bins.counts}});
+    }
+    return {{"file", options_.source.file}, {"bands", list}};
+  }
+
+  std::string AsText(const std::vector<BandBins<T>>& bands) const {
+    std::string text = options_.source.file + "\n";
+    for (const BandBins<T>& bins : bands) {
+      const std::uint64_t counted =
+          std::accumulate(bins.counts.begin(), bins.counts.end(), std::uint64_t{0});
+      text += fmt::format("\nband {}: {} bins of {} from {} to {}, {} values\n", bins.band,
+                          bins.counts.size(), bins.size, bins.lower, bins.upper, counted);
+      for (std::size_t i = 0; i < bins.counts.size(); ++i) {
+        if (bins.counts[i] == 0) continue;
+        const double from = static_cast<double>(bins.lower) + static_cast<double>(i) * bins.size;
+        text += fmt::format("{:>16.10g} {:>14}\n", from, bins.counts[i]);
+      }
+    }
+    return text;
+  }
+
+  void Draw(const std::vector<BandBins<T>>& bands, OutputFile& output) const {
+    std::vector<PlottedHistogram> shown;
+    for (const BandBins<T>& bins : bands) {
+      shown.push_back({"band " + std::to_string(bins.band), static_cast<double>(bins.lower),
+                       bins.size, bins.counts});
+    }
+    const HistogramPlot plot(shown);
+    output.Begin(plot.GetBytes());
+    plot.Write(output);
+    output.Commit();
+  }
+
+  const Options& options_;
+  JobSession& session_;
+  const String raster_;
+  const Array<unsigned> bands_;
+};
+
+int Hist(const Options& options) {
+  if (options.bins && options.binSize) {
+    throw HostError(kExitUsage, "--bins and --bin-size exclude each other");
+  }
+  if (options.binSize && !(*options.binSize > 0 && std::isfinite(*options.binSize))) {
+    throw HostError(kExitUsage, "--bin-size: the size of a bin is above 0");
+  }
+  std::optional<OutputFile> output;
+  if (!options.output.empty()) {
+    output.emplace(options.output, options.overwrite, std::vector{options.source.file});
+  }
+  JobSession session(options.job);
+  JobDraft opening;
+  AddOpen(opening, "raster", options.source);
+  AddQuery(opening, "raster", "$raster");
+  const JobResults opened = session.Run(opening);
+  const String raster = opened.Find("raster").returns.Find("URI");
+  if (output) output->RefuseInput(PathOf(raster));
+  const RasterInfo info = ReadInfo(opened, "raster");
+  const Array<unsigned> bands = ParseBands(options.bands, info);
+  int code = kExitFailed;
+  const bool isReal = DispatchType(TenTypes{}, info.dataType, [&]<typename T>() {
+    code = HistogramJob<T>(options, session, raster, bands).Run(output ? &*output : nullptr);
+    return true;
+  });
+  if (isReal) return code;
+  throw HostError(kExitFailed, options.source.file + ": complex pixels have no histogram");
+}
+
+const VerbRegistration registration(
+    "hist", "Counts the values of a raster's bands into bins", [](CLI::App& app) {
+      const auto options = std::make_shared<Options>();
+      app.footer(
+          "Without bounds, the bins reach from the smallest to the largest value of each band, or "
+          "over all values of an 8-bit type; there are 256, or fewer where whole numbers fill "
+          "fewer bins of one whole size. Values outside the bounds do not count. With --json: "
+          "\"file\" and \"bands\", a list of objects with \"band\", \"min\", \"max\", \"binSize\" "
+          "and \"counts\". -o draws them.\n"
+          "Example: vexg hist scene.tif --bands 0,1,2 -o scene-histogram.png\n");
+      options->source.AddTo(app);
+      app.add_option("--bands", options->bands, "Bands, from 0; all by default")->type_name("B,B…");
+      app.add_option("--lower", options->lower, "Smallest value that counts")->type_name("VALUE");
+      app.add_option("--upper", options->upper, "Largest value that counts")->type_name("VALUE");
+      app.add_option("--bins", options->bins, "How many bins at most")
+          ->check(CLI::Range(1U, kMostBins));
+      app.add_option("--bin-size", options->binSize, "Width of a bin")->type_name("SIZE");
+      app.add_option("-o,--output", options->output, "A picture of the histograms")
+          ->type_name("OUT.png");
+      app.add_flag("--overwrite", options->overwrite, "Replace a picture that is there");
+      app.add_flag("--save", options->save, "Store the histograms with the raster");
+      app.add_flag("--json", options->json, "As JSON");
+      options->job.AddTo(app);
+      options->job.AddProgressTo(app);
+      return VerbRegistration::Work([options] { return Hist(*options); });
+    });
+
+}  // namespace
+}  // namespace lumo::host

@@ -1,0 +1,206 @@
+#include <iostream>
+#include <memory>
+
+#include <CLI/CLI.hpp>
+#include <fmt/format.h>
+
+#include "json_number.h"
+#include "raster_target.h"
+#include "verb.h"
+
+namespace lumo::host {
+namespace {
+
+struct Options {
+  SourceOptions source;
+  RasterJobOptions job;
+  std::string bands;
+  bool extended = false;
+  bool save = false;
+  bool json = false;
+};
+
+constexpr const char* kStatsStep = "stats";
+
+/// The whole of the work as one document.
+JobDraft MakeDraft(const Options& options, const Array<unsigned>& bands) {
+  JobDraft draft;
+  AddOpen(draft, "raster", options.source);
+  if (!options.bands.empty()) AddBandView(draft, "bands", "$raster", bands);
+  const String shown = options.bands.empty() ? "$raster" : "$bands";
+  draft
+      .Step(kStatsStep,
+            options.extended ? "GetExtendedRasterStatsCommand" : "GetBasicRasterStatsCommand")
+      .AddVariableInput("URI", shown);
+  if (options.save) draft.Step("save", "SaveRasterStatsCommand").AddVariableInput("URI", "$raster");
+  if (!options.bands.empty()) draft.Close("close.bands", "$bands");
+  draft.Close("close.raster", "$raster");
+  return draft;
+}
+
+/// Statistics of bands, each as the value in JSON.
+struct BandTable {
+  std::vector<unsigned> bands;
+  std::vector<std::pair<const char*, std::vector<Json>>> columns;
+  std::vector<Json> sumXY, cov;  ///< a list for each band; empty unless asked for
+};
+
+template <typename T>
+std::vector<Json> Column(const Map<String, String>& returns, const char* name) {
+  std::vector<Json> column;
+  for (const T& value : ParseValue<Array<T>>(returns.Find(name))) {
+    column.push_back(NumberAsJson(value));
+  }
+  return column;
+}
+
+/// The rows of a matrix of `bands` by `bands`.
+std::vector<Json> Rows(const Map<String, String>& returns, const char* name, std::size_t bands) {
+  std::vector<Json> rows;
+  for (const Json& value : Column<double>(returns, name)) {
+    if (rows.empty() || rows.back().size() == bands) rows.push_back(Json::array());
+    rows.back().push_back(value);
+  }
+  return rows;
+}
+
+BandTable ReadTable(const Map<String, String>& returns, const Options& options,
+                    const Array<unsigned>& bands, unsigned dataType) {
+  BandTable table;
+  table.bands.assign(bands.begin(), bands.end());
+  std::vector<Json> min, max;
+  DispatchType(TenTypes{}, dataType, [&]<typename T>() {
+    min = Column<T>(returns, "Min");
+    max = Column<T>(returns, "Max");
+    return true;
+  });
+  std::vector<Json> count = Column<unsigned long long>(returns, "Count");
+  const std::vector<Json> rms = Column<double>(returns, "RMS");
+  for (std::size_t i = 0; i < count.size(); ++i) {
+    // Statistics that were stored without it: no pixels have no RMS.
+    if (count[i] == 0 && rms[i] != 0.0) count[i] = nullptr;
+  }
+  table.columns = {{"count", count},
+                   {"min", min},
+                   {"max", max},
+                   {"mean", Column<double>(returns, "Mean")},
+                   {"std", Column<double>(returns, "Std")},
+                   {"sum", Column<double>(returns, "Sum")},
+                   {"sum2", Column<double>(returns, "Sum2")},
+                   {"rms", rms}};
+  for (const auto& [name, column] : table.columns) {
+    if (column.size() == table.bands.size()) continue;
+    throw HostError(kExitFailed, options.source.file + ": there are no statistics of all bands");
+  }
+  if (options.extended) {
+    table.sumXY = Rows(returns, "SumXY", table.bands.size());
+    table.cov = Rows(returns, "Cov", table.bands.size());
+  }
+  return table;
+}
+
+Json AsJson(const std::string& file, const BandTable& table) {
+  Json bands = Json::array();
+  for (std::size_t i = 0; i < table.bands.size(); ++i) {
+    Json band{{"band", table.bands[i]}};
+    for (const auto& [name, column] : table.columns) band[name] = column[i];
+    if (!table.cov.empty()) {
+      band["sumXY"] = table.sumXY[i];
+      band["cov"] = table.cov[i];
+    }
+    bands.push_back(band);
+  }
+  return {{"file", file}, {"bands", bands}};
+}
+
+std::string Cell(const Json& value) {
+  if (value.is_number_float()) return fmt::format("{:.10g}", value.get<double>());
+  if (value.is_null()) return "unknown";
+  return value.is_string() ? value.get<std::string>() : value.dump();
+}
+
+void AppendMatrix(std::string& text, const char* title, const BandTable& table,
+                  const std::vector<Json>& rows) {
+  text += fmt::format("\n{}\n{:>4}", title, "");
+  for (const unsigned band : table.bands) text += fmt::format(" {:>16}", band);
+  text += '\n';
+  for (std::size_t i = 0; i < rows.size(); ++i) {
+    text += fmt::format("{:>4}", table.bands[i]);
+    for (const Json& value : rows[i]) text += fmt::format(" {:>16}", Cell(value));
+    text += '\n';
+  }
+}
+
+std::string AsText(const std::string& file, const BandTable& table) {
+  std::string text = fmt::format("{}\nband", file);
+  for (const auto& [name, column] : table.columns) text += fmt::format(" {:>16}", name);
+  text += '\n';
+  for (std::size_t i = 0; i < table.bands.size(); ++i) {
+    text += fmt::format("{:>4}", table.bands[i]);
+    for (const auto& [name, column] : table.columns)
+      text += fmt::format(" {:>16}", Cell(column[i]));
+    text += '\n';
+  }
+  if (table.cov.empty()) return text;
+  AppendMatrix(text, "covariances", table, table.cov);
+  AppendMatrix(text, "sums of products", table, table.sumXY);
+  return text;
+}
+
+int Stats(const Options& options) {
+  if (options.save && !options.bands.empty()) {
+    throw HostError(kExitUsage,
+                    "--save: the statistics of all bands are saved together; leave "
+                    "--bands out");
+  }
+  JobSession session(options.job);
+  JobDraft opening;
+  AddOpen(opening, "raster", options.source);
+  AddQuery(opening, "raster", "$raster");
+  opening.Close("close.raster", "$raster");
+  const RasterInfo info = ReadInfo(session.Run(opening), "raster");
+  const Array<unsigned> bands = ParseBands(options.bands, info);
+  const JobDraft draft = MakeDraft(options, bands);
+  if (options.job.printJob) {
+    std::cout << draft.Write().ToUTF8() << '\n';
+    return kExitSuccess;
+  }
+  JobResults results;
+  {
+    const ProgressView view(ProgressOfStep(session, draft, kStatsStep),
+                            options.job.GetProgressStyle());
+    results = session.Run(draft);
+  }
+  const BandTable table =
+      ReadTable(results.Find(kStatsStep).returns, options, bands, info.dataType);
+  std::cout << (options.json ? AsJson(options.source.file, table).dump(2) + "\n"
+                             : AsText(options.source.file, table));
+  if (options.save && !ParseValue<bool>(results.Find("save").returns.Find("Return"))) {
+    throw HostError(kExitFailed, options.source.file + ": the statistics could not be saved");
+  }
+  return kExitSuccess;
+}
+
+const VerbRegistration registration(
+    "stats", "Tells the statistics of a raster's bands", [](CLI::App& app) {
+      const auto options = std::make_shared<Options>();
+      app.footer(
+          "Pixels without data, masked ones, NaN and infinities do not count. The deviation is "
+          "that "
+          "of a sample, divided by n - 1. With --json: \"file\" and \"bands\", a list of objects "
+          "with \"band\" (from 0), \"count\", \"min\", \"max\", \"mean\", \"std\", \"sum\", "
+          "\"sum2\", \"rms\", and with --extended \"sumXY\" and \"cov\", one value for each band.\n"
+          "Example: vexg stats scene.tif --bands 3,2,1 --extended\n");
+      options->source.AddTo(app);
+      app.add_option("--bands", options->bands, "Bands, from 0; all by default")->type_name("B,B…");
+      app.add_flag("--extended", options->extended, "With covariances and sums of products");
+      app.add_flag("--save", options->save,
+                   "Store them with the raster, so that they are known from now on");
+      app.add_flag("--json", options->json, "As JSON");
+      options->job.AddTo(app);
+      options->job.AddProgressTo(app);
+      return VerbRegistration::Work([options] { return Stats(*options); });
+    });
+
+}  // namespace
+}  // namespace lumo::host
