@@ -115,8 +115,9 @@ void CollectOfBands(GDALDatasetH dataset, const char* name, BandText read,
 void CollectBands(GDALDatasetH dataset, MetadataContainer& texts) {
   for (int band = 1; band <= GDALGetRasterCount(dataset); ++band) {
     const std::string place = "Bands/" + std::to_string(band) + "/";
-    VisitItems(GDALGetRasterBand(dataset, band), "",
-               [&](const std::string& name, const char* value) { Put(texts, place + name, value); });
+    VisitItems(
+        GDALGetRasterBand(dataset, band), "",
+        [&](const std::string& name, const char* value) { Put(texts, place + name, value); });
   }
   CollectOfBands(
       dataset, "Description",

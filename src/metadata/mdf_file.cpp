@@ -26,8 +26,9 @@ constexpr std::uint64_t kMaxSharedElements = 65536;  // of an array that many en
 using Fault = std::optional<std::string>;
 
 constexpr std::pair<std::u16string_view, unsigned> kTypes[] = {
-    {u"DT_UCHAR", 1},  {u"DT_SHORT", 2},   {u"DT_USHORT", 12},  {u"DT_INT", 3},    {u"DT_UINT", 13},
-    {u"DT_LONG64", 14}, {u"DT_ULONG64", 15}, {u"DT_FLOAT", 4}, {u"DT_DOUBLE", 5}, {u"DT_STRING", 7}};
+    {u"DT_UCHAR", 1},  {u"DT_SHORT", 2},   {u"DT_USHORT", 12},  {u"DT_INT", 3},
+    {u"DT_UINT", 13},  {u"DT_LONG64", 14}, {u"DT_ULONG64", 15}, {u"DT_FLOAT", 4},
+    {u"DT_DOUBLE", 5}, {u"DT_STRING", 7}};
 
 /// The entry that is being read.
 class EntryDraft {
@@ -88,8 +89,9 @@ Fault EntryDraft::TakeProperty(std::u16string_view line) {
 
 Fault EntryDraft::TakeFormat(const std::string& name, std::u16string_view value) {
   static const std::map<std::string, char16_t MdfFormat::*> kMarks = {
-      {"frmt.sep", &MdfFormat::sep}, {"frmt.vsep", &MdfFormat::vsep}, {"frmt.sm", &MdfFormat::sm},
-      {"frmt.em", &MdfFormat::em},   {"frmt.eol", &MdfFormat::eol},   {"frmt.del", &MdfFormat::del}};
+      {"frmt.sep", &MdfFormat::sep}, {"frmt.vsep", &MdfFormat::vsep},
+      {"frmt.sm", &MdfFormat::sm},   {"frmt.em", &MdfFormat::em},
+      {"frmt.eol", &MdfFormat::eol}, {"frmt.del", &MdfFormat::del}};
   hasFormat_ = true;
   if (const auto at = kMarks.find(name); at != kMarks.end()) {
     format_.*at->second = value.front();
@@ -127,8 +129,11 @@ Fault EntryDraft::Set(const std::string& name, std::u16string_view value) {
   static const std::map<std::string, String MdfEntry::*> kPaths = {
       {"src", &MdfEntry::src}, {"dest", &MdfEntry::dest}, {"alias", &MdfEntry::alias}};
   static const std::map<std::string, std::uint32_t MdfEntry::*> kNumbers = {
-      {"cnt", &MdfEntry::cnt},   {"cols", &MdfEntry::cols}, {"idx", &MdfEntry::idx},
-      {"mton", &MdfEntry::mton}, {"mtoi", &MdfEntry::mtoi}};
+      {"cnt", &MdfEntry::cnt},
+      {"cols", &MdfEntry::cols},
+      {"idx", &MdfEntry::idx},
+      {"mton", &MdfEntry::mton},
+      {"mtoi", &MdfEntry::mtoi}};
   const auto path = kPaths.find(name);
   const auto number = kNumbers.find(name);
   if (path == kPaths.end() && number == kNumbers.end() && name != "dt") {

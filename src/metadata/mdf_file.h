@@ -7,8 +7,8 @@
 
 namespace lumo {
 
-/// Reads a definition file; see docs/metadata.md for the language. Nothing behind the first fault is
-/// read.
+/// Reads a definition file; see docs/metadata.md for the language. Nothing behind the first fault
+/// is read.
 /// @param format   changed by the file's "frmt." properties.
 /// @param entries  [out] those of the file are added, in its order.
 /// @return false when the file can't be read or is wrong: the parse log and the fault text say why.

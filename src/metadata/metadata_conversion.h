@@ -9,9 +9,9 @@ namespace lumo {
 
 /// What became of a text that an entry wants as a value.
 enum class Conversion {
-  kDone,        ///< the value stands in the target
-  kStaysText,   ///< the text holds no value of the type; nothing was stored
-  kFailed,      ///< the value has no place in the target
+  kDone,       ///< the value stands in the target
+  kStaysText,  ///< the text holds no value of the type; nothing was stored
+  kFailed,     ///< the value has no place in the target
 };
 
 /// Makes the value of the entry's type and shape from `text`, and stores it at the entry's `dest`.

@@ -22,7 +22,7 @@ struct MetadataFormat {
   const char* word;     ///< compared exactly
   const char* mdfFile;  ///< name of the definition file
   eMetadataReader reader;
-  const char* extra;    ///< GDAL's driver of reader 4, the input type of those of XML
+  const char* extra;  ///< GDAL's driver of reader 4, the input type of those of XML
 };
 
 /// The metadata formats.

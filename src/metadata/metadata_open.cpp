@@ -26,7 +26,8 @@ bool FailWith(const std::string& fault, const char* format, Values... values) {
   return Fail(format, values...);
 }
 
-/// The row of the table for well-formed connection strings; null, with the failure told, for others.
+/// The row of the table for well-formed connection strings; null, with the failure told, for
+/// others.
 const MetadataFormat* CheckStrings(const Array<String>& strings) {
   const std::string word = strings[0].ToUTF8();
   if (strings.GetCount() < 2) {
@@ -124,7 +125,8 @@ bool Metadata::Open(const Array<String>& connectionStrings) {
     const MetadataFormat* const format = CheckStrings(connectionStrings);
     String mdfPath;
     if (format == nullptr || !FindMdfPath(*format, mdfPath)) return false;
-    // Read apart, without this store's lock: a source may be slow, and opening it takes other locks.
+    // Read apart, without this store's lock: a source may be slow, and opening it takes other
+    // locks.
     const LockableMetadataImplPtr read(new LockableMetadataImpl);
     return ReadSource(*format, connectionStrings, mdfPath, read) &&
            Write([&](MetadataContainer& store) { return store.Merge(*read); });

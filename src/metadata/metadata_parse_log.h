@@ -19,9 +19,9 @@ namespace lumo {
 /// Failure: a file that can't be made means no log, and nothing else.
 class VEXG_EXPORT MetadataParseLog {
  public:
-  static constexpr unsigned kErrors = 1;       ///< level of what failed
-  static constexpr unsigned kTranslated = 2;   ///< level of the values as they are stored
-  static constexpr unsigned kCollected = 3;    ///< level of the texts as they were found
+  static constexpr unsigned kErrors = 1;      ///< level of what failed
+  static constexpr unsigned kTranslated = 2;  ///< level of the values as they are stored
+  static constexpr unsigned kCollected = 3;   ///< level of the texts as they were found
 
   /// Reads the variables and opens the file.
   MetadataParseLog();

@@ -6,9 +6,8 @@ namespace lumo {
 
 void MetadataParser::Store(const String& path, const String& text) {
   if (collection_.Put(path, std::make_unique<MetadataString>(std::vector<String>{text}))) return;
-  MetadataParseLog::Instance().Write(MetadataParseLog::kErrors,
-                                     "Parser: No place for the text at: (%s)\n",
-                                     path.ToUTF8().c_str());
+  MetadataParseLog::Instance().Write(
+      MetadataParseLog::kErrors, "Parser: No place for the text at: (%s)\n", path.ToUTF8().c_str());
 }
 
 void MetadataParser::LogCollection() const {

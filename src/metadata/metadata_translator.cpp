@@ -48,13 +48,14 @@ void RewriteBlankList(const MdfEntry& entry, MetadataContainer& source, const Md
   PutText(source, entry.src, ToString(list + format.em));
 }
 
-/// Carries over what no entry took.
+/// Carries over what no entry took: what has no place of its own goes to the private paths.
 bool CarryLeftovers(const MetadataContainer& source, MetadataContainer& target) {
   bool carried = true;
   VisitTexts(source, "/", [&](const String& path, const String& text) {
     const bool isHidden =
         path.Find(kParserInfo) != String::kNotFound || target.Find(path) != nullptr;
-    carried = PutText(target, isHidden ? String("/private") + path : path, text) && carried;
+    const bool isPut = !isHidden && PutText(target, path, text);
+    carried = (isPut || PutText(target, String("/private") + path, text)) && carried;
   });
   return carried;
 }

@@ -76,9 +76,8 @@ TextMetadataParser::TextMetadataParser(MetadataContainer& collection, const MdfF
 bool TextMetadataParser::Parse() {
   std::string bytes, fault;
   if (!ReadMetadataFile(path_.ToUTF8(), bytes, fault)) {
-    MetadataParseLog::Instance().Write(MetadataParseLog::kErrors,
-                                       "Text Parser: Failed to open: (%s)\n",
-                                       path_.ToUTF8().c_str());
+    MetadataParseLog::Instance().Write(
+        MetadataParseLog::kErrors, "Text Parser: Failed to open: (%s)\n", path_.ToUTF8().c_str());
     SetFault(fault);
     return false;
   }

@@ -13,8 +13,8 @@
 #include <xercesc/sax2/XMLReaderFactory.hpp>
 #include <xercesc/util/BinInputStream.hpp>
 #include <xercesc/util/SecurityManager.hpp>
-#include <xercesc/util/XMLUni.hpp>
 #include <xercesc/util/XMLURL.hpp>
+#include <xercesc/util/XMLUni.hpp>
 
 #include "commands/xml_runtime.h"
 #include "foundation/fault.h"

@@ -29,10 +29,16 @@ class Metadata(PipeTest, FolderTest):
             self.assertFalse([path for path in values if "/private/" in path])
         text = self.fine("metadata", "--path", "/CoordSys/", "--path", "/mine", raster)
         self.assertEqual([line.split(None, 1) for line in text.splitlines()],
-                         [["/CoordSys/MapPoints/", "0, 0, 50, 100; 2, 0, 70, 100"], ["/mine", "{x, y}"]])
+                         [["/CoordSys/MapPoints/", "0.0, 0.0, 50.0, 100.0; 2.0, 0.0, 70.0, 100.0"], ["/mine", "{x, y}"]])
         shown = self.values("--private", raster)
         self.assertEqual(shown["/private/xx vex parser info/uri/"], f"{raster}.hdr")
         self.fails(1, "nothing at /Nowhere/", "metadata", "--path", "/Nowhere/", raster)
+
+    def test_says_what_bars_hide(self):
+        raster = write_orva(self.folder / "bars.dat", 1, 1, 2, more="band names = {a|b, c}\nx|y = 1\n")
+        code, out, err = run("metadata", "--json", str(raster))
+        self.assertEqual((code, err.count("|")), (0, 3), err)
+        self.assertEqual(json.loads(out)["values"]["/Bands/Names/"], "a|b|c")
 
     def test_a_server_does_the_same_inside_its_folders(self):
         raster = self.write_orva()

@@ -65,14 +65,16 @@ TEST(MdfFile, TellsEachFaultInItsWords) {
     EXPECT_THAT(log, testing::HasSubstr("   error msg:         " + c.message + " \n"));
     EXPECT_THAT(TakeFault().ToUTF8(), testing::EndsWith(c.message));
   }
-  for (const char* const name : {"src", "dest", "alias", "cnt", "dt", "cols", "idx", "mton", "mtoi"}) {
+  for (const char* const name :
+       {"src", "dest", "alias", "cnt", "dt", "cols", "idx", "mton", "mtoi"}) {
     const std::string value = std::string(name) == "dt" ? "DT_INT" : "7";
     const std::string twice = std::string(name) + " = " + value + "\n" + name + " = " + value;
     MdfFormat format;
     std::vector<MdfEntry> entries;
     EXPECT_FALSE(Read("[ " + twice + " ]", format, entries));
-    EXPECT_THAT(test::gParseLog.Take(), testing::HasSubstr("Already have a " + std::string(name) +
-                                                ". Check for missing end of entry character."));
+    EXPECT_THAT(test::gParseLog.Take(),
+                testing::HasSubstr("Already have a " + std::string(name) +
+                                   ". Check for missing end of entry character."));
   }
 }
 
@@ -133,8 +135,8 @@ TEST(MdfFile, TypesHaveTheCodesOfTheirValues) {
   const struct {
     const char* word;
     unsigned code;
-  } types[] = {{"DT_UCHAR", 1}, {"DT_SHORT", 2},   {"DT_USHORT", 12}, {"DT_INT", 3},
-               {"DT_UINT", 13}, {"DT_LONG64", 14}, {"DT_ULONG64", 15}, {"DT_FLOAT", 4},
+  } types[] = {{"DT_UCHAR", 1},  {"DT_SHORT", 2},   {"DT_USHORT", 12},  {"DT_INT", 3},
+               {"DT_UINT", 13},  {"DT_LONG64", 14}, {"DT_ULONG64", 15}, {"DT_FLOAT", 4},
                {"DT_DOUBLE", 5}, {"DT_STRING", 7}};
   for (const auto& type : types) {
     MdfFormat format;
@@ -147,10 +149,11 @@ TEST(MdfFile, TypesHaveTheCodesOfTheirValues) {
 TEST(MdfFile, FormatPropertiesChangeTheFormatAndMakeNoEntry) {
   MdfFormat format;
   std::vector<MdfEntry> entries;
-  ASSERT_TRUE(Read("[ frmt.sep = : and more\n frmt.start = GROUP ]\n"
-                   "[ frmt.start = OBJECT\n frmt.end = END\n FRMT.DEL = \"\n frmt.sm = (\n"
-                   " frmt.em = )\n frmt.eol = ;\n frmt.vsep = | ]",
-                   format, entries));
+  ASSERT_TRUE(
+      Read("[ frmt.sep = : and more\n frmt.start = GROUP ]\n"
+           "[ frmt.start = OBJECT\n frmt.end = END\n FRMT.DEL = \"\n frmt.sm = (\n"
+           " frmt.em = )\n frmt.eol = ;\n frmt.vsep = | ]",
+           format, entries));
   EXPECT_TRUE(entries.empty());
   EXPECT_EQ(format.sep, u':');
   EXPECT_EQ((std::u16string{format.sm, format.em, format.eol, format.del, format.vsep}), u"();\"|");

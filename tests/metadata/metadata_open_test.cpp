@@ -57,11 +57,13 @@ TEST_F(MetadataOpen, SaysWhyNot) {
   auto& environment = GetGlobalEnvironmentImpl()[Environment::kMdfDirectory].text;
   environment = "";
   EXPECT_FALSE(metadata_.Open(test::Strings({"ORVA", "x"})));
-  EXPECT_EQ(test::gParseLog.Take(), failed + "Invalid path to mdf files. Lumo mdf env is not valid.\n");
+  EXPECT_EQ(test::gParseLog.Take(),
+            failed + "Invalid path to mdf files. Lumo mdf env is not valid.\n");
   environment = String(directory_.Path().string());
   EXPECT_FALSE(metadata_.Open(test::Strings({"ORVA", "x"})));
-  EXPECT_THAT(test::gParseLog.Take(), testing::HasSubstr("MDF Parser: Failed to open: (" +
-                                              directory_.Path().string() + "/mdf_orva.txt)\n"));
+  EXPECT_THAT(test::gParseLog.Take(),
+              testing::HasSubstr("MDF Parser: Failed to open: (" + directory_.Path().string() +
+                                 "/mdf_orva.txt)\n"));
   EXPECT_EQ(metadata_.Describe().ToUTF8(), "");
 }
 
@@ -106,9 +108,11 @@ std::string Gml(const std::string& system) {
          "<gml:GridEnvelope><gml:low>0 0</gml:low><gml:high>348 351</gml:high>"
          "</gml:GridEnvelope></gml:limits><gml:axisName>x</gml:axisName>"
          "<gml:axisName>y</gml:axisName><gml:origin><gml:Point gml:id=\"P0001\" srsName=\"" +
-         system + "\"><gml:pos>288790.5 9120746.5</gml:pos></gml:Point></gml:origin>"
-         "<gml:offsetVector gml:id=\"offset1\" srsName=\"" + system +
-         "\">28.5 0</gml:offsetVector><gml:offsetVector gml:id=\"offset2\" srsName=\"" + system +
+         system +
+         "\"><gml:pos>288790.5 9120746.5</gml:pos></gml:Point></gml:origin>"
+         "<gml:offsetVector gml:id=\"offset1\" srsName=\"" +
+         system + "\">28.5 0</gml:offsetVector><gml:offsetVector gml:id=\"offset2\" srsName=\"" +
+         system +
          "\">0 -28.5</gml:offsetVector></gml:RectifiedGrid></gml:rectifiedGridDomain>"
          "</gml:RectifiedGridCoverage></gml:featureMember></gml:FeatureCollection>"
          "</gml:featureMember></gml:FeatureCollection>";
@@ -141,12 +145,15 @@ TEST_F(MetadataOpen, PleiadesGivesRadiometryAnglesAndCode) {
   };
   const auto document = [&](const std::string& lists, const std::string& code) {
     return "<?xml version=\"1.0\"?><Dimap_Document><Coordinate_Reference_System><Projected_CRS>"
-           "<PROJECTED_CRS_CODE>" + code + "</PROJECTED_CRS_CODE></Projected_CRS>"
+           "<PROJECTED_CRS_CODE>" +
+           code +
+           "</PROJECTED_CRS_CODE></Projected_CRS>"
            "</Coordinate_Reference_System><Geometric_Data><Use_Area>" +
            place("Top Center", "07:25:47Z", 40.5) + place("Center", "07:25:48Z", 41.5) +
            place("Bottom Center", "07:25:49Z", 42.5) +
            "</Use_Area></Geometric_Data><Radiometric_Data><Radiometric_Calibration>"
-           "<Instrument_Calibration><Band_Measurement_List>" + lists +
+           "<Instrument_Calibration><Band_Measurement_List>" +
+           lists +
            "</Band_Measurement_List></Instrument_Calibration></Radiometric_Calibration>"
            "</Radiometric_Data></Dimap_Document>";
   };

@@ -25,7 +25,8 @@ std::string Texts(const MetadataContainer& collection) {
 
 std::string ParseText(const std::string& text, const MdfFormat& format) {
   MetadataContainer collection;
-  EXPECT_TRUE(TextMetadataParser(collection, format, "test").ParseText(platform::Utf8ToUtf16(text)));
+  EXPECT_TRUE(
+      TextMetadataParser(collection, format, "test").ParseText(platform::Utf8ToUtf16(text)));
   return Texts(collection);
 }
 
@@ -150,7 +151,8 @@ TEST(XmlMetadataParser, NumbersUpToNinetyNine) {
     EXPECT_EQ(text.ToUTF8(), std::to_string(i));
   }
   EXPECT_EQ(collection.Find("/a/b100"), nullptr);
-  EXPECT_THAT(test::gParseLog.Take(), testing::HasSubstr("Xml Parser: No place for a value of: (/a/b/) \n"));
+  EXPECT_THAT(test::gParseLog.Take(),
+              testing::HasSubstr("Xml Parser: No place for a value of: (/a/b/) \n"));
 }
 
 TEST(XmlMetadataParser, RefusesWhatIsNoDocumentOrTooMuch) {
@@ -186,10 +188,9 @@ TEST(XmlMetadataParser, ReadsNothingOutsideTheDocument) {
   const std::string secret = directory.Path() / "secret";
   test::WriteFile(secret, "secret");
   const std::string system = " SYSTEM 'file://" + secret + "'";
-  for (const std::string& document :
-       {"<!DOCTYPE a [<!ENTITY e" + system + ">]><a>x&e;y</a>",
-        "<!DOCTYPE a [<!ENTITY % e" + system + "> %e;]><a>x</a>",
-        "<!DOCTYPE a" + system + "><a>x</a>"}) {
+  for (const std::string& document : {"<!DOCTYPE a [<!ENTITY e" + system + ">]><a>x&e;y</a>",
+                                      "<!DOCTYPE a [<!ENTITY % e" + system + "> %e;]><a>x</a>",
+                                      "<!DOCTYPE a" + system + "><a>x</a>"}) {
     SCOPED_TRACE(document);
     MetadataContainer collection;
     ParseXml(document, collection);

@@ -131,6 +131,10 @@ TEST(MetadataTranslator, HandlesArraysRowsRepeatsAndSharedTargets) {
        Entry("/x", "/y", "INT", "cnt=1"),
        {{"/x", "1"}, {"/y", "raw"}},
        "/private/y/ string(1) raw\n/y/ int(1) 1\n"},
+      {"nor is it a container",
+       Entry("/x", "/y", "INT", "cnt=1"),
+       {{"/x", "1"}, {"/y/z", "raw"}},
+       "/private/y/z/ string(1) raw\n/y/ int(1) 1\n"},
   };
   for (const auto& c : cases) {
     SCOPED_TRACE(c.name);

@@ -20,9 +20,8 @@ constexpr const char* kHeaderEnding = ".hdr";
 /// The ending of a name in lower case, with its dot.
 std::string EndingOf(const std::string& file) {
   std::string ending = fs::path(file).extension().string();
-  std::transform(ending.begin(), ending.end(), ending.begin(), [](unsigned char c) {
-    return static_cast<char>(std::tolower(c));
-  });
+  std::transform(ending.begin(), ending.end(), ending.begin(),
+                 [](unsigned char c) { return static_cast<char>(std::tolower(c)); });
   return ending;
 }
 
@@ -40,8 +39,8 @@ std::string FormatOfXml(const std::string& file) {
 
 std::string DetectFormat(const std::string& file) {
   static const std::map<std::string, const char*> kFormats = {
-      {".imd", "DGIMD"}, {".rpb", "DGRPB"},  {".til", "DGTIL"},  {".tif", "TIFF"},
-      {".tiff", "TIFF"}, {".img", "Erdas"},  {".grb", "GRIB"},   {".grb2", "GRIB"},
+      {".imd", "DGIMD"}, {".rpb", "DGRPB"},  {".til", "DGTIL"}, {".tif", "TIFF"},
+      {".tiff", "TIFF"}, {".img", "Erdas"},  {".grb", "GRIB"},  {".grb2", "GRIB"},
       {".grib", "GRIB"}, {".grib2", "GRIB"}, {".hdr", "ORVA"}};
   const std::string ending = EndingOf(file);
   const auto known = kFormats.find(ending);
@@ -72,8 +71,10 @@ MetadataSource ParseMetadataSource(const std::string& text) {
     source = {DetectFormat(text), text};
   }
   if (source.format.empty()) {
-    throw HostError(kExitUsage, text + ": the name doesn't tell what metadata these are; write "
-                                       "FORMAT:FILE, where FORMAT is one of " + FormatWords());
+    throw HostError(kExitUsage, text +
+                                    ": the name doesn't tell what metadata these are; write "
+                                    "FORMAT:FILE, where FORMAT is one of " +
+                                    FormatWords());
   }
   const bool namesPixels = source.format == "ORVA" && EndingOf(source.file) != kHeaderEnding;
   if (namesPixels && fs::exists(source.file + kHeaderEnding)) source.file += kHeaderEnding;

@@ -3,8 +3,8 @@
 
 #include <CLI/CLI.hpp>
 #include <fmt/format.h>
-#include <nlohmann/json.hpp>
 
+#include "json_number.h"
 #include "metadata/metadata_types.h"
 #include "metadata_source.h"
 #include "raster_job.h"
@@ -12,8 +12,6 @@
 
 namespace lumo::host {
 namespace {
-
-using Json = nlohmann::ordered_json;
 
 struct Options {
   std::string source;
@@ -90,6 +88,10 @@ std::vector<Value> ReadValues(JobSession& session, const String& uri,
   for (std::size_t i = 0; i < paths.size(); ++i) {
     const std::string number = std::to_string(i);
     const auto& properties = results.Find(String("GetPropertiesMetadataCommand" + number)).returns;
+    if (!ParseValue<bool>(properties.Find("GetPropertiesResult"))) {
+      Say(paths[i] + ": a path holds |, so its value can't be asked for");
+      continue;
+    }
     const auto number_of = [&](const char* name) {
       return ParseValue<unsigned>(properties.Find(name));
     };
@@ -104,13 +106,12 @@ template <typename T>
 Json ElementAsJson(const T& element) {
   if constexpr (std::is_same_v<T, String>) {
     return element.ToUTF8();
-  } else if constexpr (std::is_floating_point_v<T>) {
-    // The digits that tell a float apart, not those of the double nearest to it.
-    return Json::parse(FormatValue(element).ToUTF8(), nullptr, false).is_discarded()
-               ? Json(FormatValue(element).ToUTF8())
-               : Json::parse(FormatValue(element).ToUTF8());
+  } else if constexpr (std::is_same_v<T, float>) {
+    // The digits that tell the float apart, not those of the double nearest to it.
+    return std::isfinite(element) ? Json::parse(FormatValue(element).ToUTF8())
+                                  : NumberAsJson(element);
   } else {
-    return element;
+    return NumberAsJson(element);
   }
 }
 
@@ -118,6 +119,10 @@ Json ElementAsJson(const T& element) {
 template <typename T>
 Json ArrayAsJson(const Value& value) {
   const auto elements = ParseValue<Array<T>>(value.text);
+  if (elements.GetCount() != value.size) {
+    Say(value.path + ": a text holds |, so the texts of this list can't be told apart");
+    return value.text.ToUTF8();
+  }
   Json list = Json::array();
   for (const T& element : elements) {
     const bool startsRow =
