@@ -6,6 +6,7 @@ install(TARGETS vexg EXPORT vexgTargets
 install(DIRECTORY ${PROJECT_SOURCE_DIR}/src/ DESTINATION ${CMAKE_INSTALL_INCLUDEDIR}/vexg
         FILES_MATCHING PATTERN "*.h" PATTERN "*_impl.h" EXCLUDE
         REGEX "platform/(file_descriptor|message_frame|pipe_directory).h" EXCLUDE)
+install(DIRECTORY ${PROJECT_SOURCE_DIR}/resources/ DESTINATION ${CMAKE_INSTALL_DATADIR}/vexg)
 install(EXPORT vexgTargets NAMESPACE vexg:: DESTINATION ${CMAKE_INSTALL_LIBDIR}/cmake/vexg)
 
 configure_package_config_file(${PROJECT_SOURCE_DIR}/cmake/vexgConfig.cmake.in

@@ -3,6 +3,8 @@
 #include "common/messages.h"
 #include "gdal_metadata.h"
 #include "gdal_reader.h"
+#include "metadata/metadata_parser.h"
+#include "metadata/metadata_readers.h"
 
 namespace lumo::gdal {
 
@@ -38,6 +40,18 @@ bool Connection::MakeReader(const Array<String>& connStrings, const Source& sour
     SetOpened(connStrings, source.uri, RasterReaderPtr<T>(new Reader<T>(this, *raster_, def)));
     return true;
   });
+}
+
+bool Connection::GetMetadata(const String& mdfPath, const LockableMetadataImplPtr& store) {
+  if (raster_ == nullptr || !store) return FailWith(format_.key, "no raster is open");
+  MetadataContainer texts;
+  CollectTexts(*raster_, texts);
+  const auto say = [&](const char* path, const std::string& text) {
+    texts.Put(path, std::make_unique<MetadataString>(std::vector<String>{String(text)}));
+  };
+  say(kParserUri, raster_->Name());
+  say(kParserType, "GdalParser - " + raster_->FormatKey());
+  return CollectedMetadataReader().Read(texts, mdfPath, *store);
 }
 
 void Connection::Disconnect() {

@@ -18,6 +18,7 @@ class Connection final : public PlainRasterConnection {
   /// A new raster takes its place; the fault tells when it can't.
   void Disconnect() override;
   bool CanWrite() override { return raster_ != nullptr && raster_->CanWrite(); }
+  bool GetMetadata(const String& mdfPath, const LockableMetadataImplPtr& store) override;
   bool CreateRaster(const Array<String>& connStrings, const lumo::RasterDef& def) override;
 
  private:

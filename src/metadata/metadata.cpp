@@ -1,8 +1,7 @@
 #include "metadata/metadata.h"
 
-#include <algorithm>
-
 #include "foundation/type_code.h"
+#include "metadata/metadata_parse_log.h"
 
 namespace lumo {
 namespace {
@@ -28,16 +27,13 @@ void AddNames(const MetadataContainer& container, const String& path, bool isPri
   }
 }
 
-/// A store with a copy of the tree, and a lock of its own.
-LockableMetadataImplPtr CopyOf(const LockableMetadataImpl& store) {
-  return LockableMetadataImplPtr(new LockableMetadataImpl(store));
-}
-
 }  // namespace
 
 const unsigned Metadata::TypeCode = GloballyUniqueObjectTypeCode("Metadata");
 
-Metadata::Metadata() : store_(new LockableMetadataImpl) {}
+Metadata::Metadata() : store_(new LockableMetadataImpl) {
+  MetadataParseLog::Instance();
+}
 
 Metadata::Metadata(const Metadata& other) : Object(other), store_(other.Share()) {}
 
@@ -57,29 +53,6 @@ LockableMetadataImplPtr Metadata::Share() const {
 
 bool Metadata::IsA(unsigned typeCode) const {
   return typeCode == TypeCode || Object::IsA(typeCode);
-}
-
-/// Runs `work` on a store that no other Metadata shares.
-template <typename Work>
-bool Metadata::Write(Work&& work) {
-  const std::lock_guard handle(handleMutex_);
-  const LockableMetadataImplPtr shared = store_;  // keeps it, and its lock, for this call
-  const MutexLock lock = shared->Lock();
-  constexpr unsigned kOwn = 2;  // store_ and shared
-  if (shared.GetCount() > kOwn) {
-    LockableMetadataImplPtr own = CopyOf(*shared);
-    if (!work(*own)) return false;
-    store_ = own;
-    return true;
-  }
-  return work(*store_);
-}
-
-bool Metadata::Open(const Array<String>& connectionStrings) {
-  if (connectionStrings.GetCount() == 0) return true;
-  const bool anyEmpty = std::any_of(connectionStrings.begin(), connectionStrings.end(),
-                                    [](const String& text) { return text.GetLength() == 0; });
-  return !anyEmpty && connectionStrings[0] == "EMPTY";
 }
 
 bool Metadata::Exists(const String& path) const {

@@ -50,8 +50,11 @@ class VEXG_EXPORT Metadata : public Object {
 
   bool IsA(unsigned typeCode) const override;
 
-  /// Fills the store from a source. Nothing, or "EMPTY" as the first string, leaves it as it is and
-  /// gives true; an empty string, or any other source, gives false.
+  /// Adds what a source says of itself, see docs/metadata.md. The strings are the word of its
+  /// format, its name and, for XML formats, what the name is: "XmlFile", "XmlUrl" or "XmlString".
+  /// No strings, or "EMPTY" as the first one, change nothing and give true.
+  /// @return false when a string is empty, the format is unknown or the source can't be read; the
+  ///         parse log and the fault text say why.
   bool Open(const Array<String>& connectionStrings);
 
   /// True when there is a value, not a container, at `path`.
@@ -87,6 +90,13 @@ class VEXG_EXPORT Metadata : public Object {
   template <MetadataScalar T>
   bool GetArray(const String& path, Array<T>& array) const;
 
+  /// Calls `use(const MetadataObject&)` with what stands at `path`, under the store's lock.
+  /// @return what it gave; false, with no call, when there is nothing.
+  template <typename Use>
+  bool Visit(const String& path, Use&& use) const {
+    return Read(path, std::forward<Use>(use));
+  }
+
   /// False when there is nothing at `path`.
   bool GetProperties(const String& path, MetadataProperties& properties) const;
 
@@ -120,6 +130,7 @@ class VEXG_EXPORT Metadata : public Object {
   }
   bool PutValue(const String& path, std::unique_ptr<MetadataObject> value);
   void CollectNames(const String& path, bool isPrivate, List<String>& names) const;
+  /// Runs `work(MetadataContainer&)` on a store that no other Metadata shares.
   template <typename Work>
   bool Write(Work&& work);
   LockableMetadataImplPtr Share() const;
@@ -129,6 +140,19 @@ class VEXG_EXPORT Metadata : public Object {
 };
 
 using MetadataPtr = Pointer<Metadata>;
+
+template <typename Work>
+bool Metadata::Write(Work&& work) {
+  const std::lock_guard handle(handleMutex_);
+  const LockableMetadataImplPtr shared = store_;  // keeps it, and its lock, for this call
+  const MutexLock lock = shared->Lock();
+  constexpr unsigned kOwn = 2;  // store_ and shared
+  if (shared.GetCount() <= kOwn) return work(*store_);
+  LockableMetadataImplPtr own(new LockableMetadataImpl(*shared));
+  if (!work(*own)) return false;
+  store_ = own;
+  return true;
+}
 
 template <MetadataScalar T>
 bool Metadata::SetArray(const String& path, const Array<T>& array) {

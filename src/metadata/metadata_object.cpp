@@ -182,7 +182,7 @@ const MetadataObject* MetadataContainer::Find(const String& path) const {
 
 bool MetadataContainer::Put(const String& path, std::unique_ptr<MetadataObject> value) {
   const std::vector<String> names = SplitMetadataPath(path);
-  if (names.empty()) return false;
+  if (names.empty() || names.size() > kMaxDepth) return false;
   MetadataContainer* inside = this;
   for (std::size_t i = 0; i + 1 < names.size(); ++i) {
     const auto at = inside->children_.find(names[i]);
@@ -216,6 +216,37 @@ bool MetadataContainer::Remove(const String& path) {
     inside = dynamic_cast<MetadataContainer*>(at->second.get());
   }
   return false;
+}
+
+/// False when a value here would have to become a container, or the other way round.
+bool MetadataContainer::HasPlaceFor(const MetadataContainer& other) const {
+  for (const auto& [name, child] : other.children_) {
+    const auto at = children_.find(name);
+    if (at == children_.end()) continue;
+    const auto* const mine = dynamic_cast<const MetadataContainer*>(at->second.get());
+    const auto* const theirs = dynamic_cast<const MetadataContainer*>(child.get());
+    if ((mine == nullptr) != (theirs == nullptr)) return false;
+    if (mine != nullptr && !mine->HasPlaceFor(*theirs)) return false;
+  }
+  return true;
+}
+
+void MetadataContainer::Take(const MetadataContainer& other) {
+  for (const auto& [name, child] : other.children_) {
+    std::unique_ptr<MetadataObject>& place = children_[name];
+    auto* const mine = dynamic_cast<MetadataContainer*>(place.get());
+    if (mine != nullptr) {
+      mine->Take(static_cast<const MetadataContainer&>(*child));
+    } else {
+      place.reset(child->Clone());
+    }
+  }
+}
+
+bool MetadataContainer::Merge(const MetadataContainer& other) {
+  if (!HasPlaceFor(other)) return false;
+  Take(other);
+  return true;
 }
 
 std::vector<String> SplitMetadataPath(const String& path) {

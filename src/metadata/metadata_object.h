@@ -148,6 +148,7 @@ using MetadataULong64 = MetadataValue<std::uint64_t>;
 class VEXG_EXPORT MetadataContainer : public MetadataObject {
  public:
   static constexpr unsigned kTypeCode = 20;
+  static constexpr unsigned kMaxDepth = 256;  ///< names in a path
   using Children = std::map<String, std::unique_ptr<MetadataObject>>;
 
   MetadataContainer() = default;
@@ -169,13 +170,21 @@ class VEXG_EXPORT MetadataContainer : public MetadataObject {
   const MetadataObject* Find(const String& path) const;
 
   /// Puts a value at `path`, in place of what stood there; missing containers on the way are made.
-  /// @return false, with nothing changed, when the path has no piece or leads through a value.
+  /// @return false, with nothing changed, when the path has no piece or more than kMaxDepth, or
+  ///         leads through a value.
   bool Put(const String& path, std::unique_ptr<MetadataObject> value);
 
   /// Deletes what stands at `path`. False when nothing does.
   bool Remove(const String& path);
 
+  /// Puts copies of all values of `other` at their paths.
+  /// @return false, with nothing changed, when one of them has no place here.
+  bool Merge(const MetadataContainer& other);
+
  private:
+  bool HasPlaceFor(const MetadataContainer& other) const;
+  void Take(const MetadataContainer& other);
+
   Children children_;
 };
 

@@ -132,16 +132,6 @@ TEST(Metadata, DescribeHasFixedColumns) {
   EXPECT_EQ(metadata.Describe().ToUTF8(), want);
 }
 
-TEST(Metadata, OpensOnlyTheEmptySource) {
-  Metadata metadata;
-  EXPECT_TRUE(metadata.Open({}));
-  String strings[] = {"EMPTY", ""};
-  EXPECT_TRUE(metadata.Open(Array<String>(strings, ArrayDims(1))));
-  EXPECT_FALSE(metadata.Open(Array<String>(strings, ArrayDims(2))));
-  strings[0] = "NOSUCH";
-  EXPECT_FALSE(metadata.Open(Array<String>(strings, ArrayDims(1))));
-}
-
 TEST(Metadata, ThreadsMayCopyReadAndWriteOneStore) {
   Metadata shared;
   shared.Set("/n", 0);

@@ -1,10 +1,12 @@
 #include <algorithm>
 #include <exception>
+#include <filesystem>
 #include <iostream>
 #include <map>
 
 #include <CLI/CLI.hpp>
 
+#include "foundation/environment.h"
 #include "foundation/library.h"
 #include "platform/debug_output.h"
 #include "platform/module.h"
@@ -35,6 +37,19 @@ void LoadLibraries(const std::vector<std::string>& files) {
   }
 }
 
+/// Tells the library where the definition files of metadata lie: beside it, as they are built and
+/// installed.
+void FindResources() {
+  const std::filesystem::path library = platform::LibraryDirectory();
+  for (const char* const share : {"../share/vexg", VEXG_SHARE_FROM_LIBRARY}) {
+    const std::filesystem::path folder = (library / share / "mdf").lexically_normal();
+    std::error_code ignored;
+    if (!std::filesystem::is_directory(folder, ignored)) continue;
+    GetGlobalEnvironmentImpl()[Environment::kMdfDirectory].text = String(folder.string() + "/");
+    return;
+  }
+}
+
 std::string OneLine(std::string text) {
   std::replace(text.begin(), text.end(), '\n', ' ');
   return text;
@@ -62,6 +77,7 @@ int Run(int argc, char** argv) {
     throw HostError(kExitUsage, OneLine(error.what()) + "; see vexg --help");
   }
   LoadLibraries(libraries);
+  FindResources();
   VEXInit();
   const int code = works.at(app.get_subcommands().front())();
   if (!std::cout.flush()) throw HostError(kExitFailed, "standard output can't be written");

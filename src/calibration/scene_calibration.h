@@ -1,0 +1,32 @@
+#pragma once
+
+#include <optional>
+#include <vector>
+
+#include "metadata/metadata.h"
+
+namespace lumo {
+
+/// What the metadata of a scene say that calibration needs. What they don't say is empty.
+struct SceneCalibration {
+  std::vector<String> bandNames;       ///< of the bands below, in their order; empty when not told
+  std::vector<double> gains;           ///< radiance of one count, W/(m2 sr um)
+  std::vector<double> offsets;         ///< radiance of count 0, W/(m2 sr um)
+  std::vector<double> irradiances;     ///< of the sun at 1 astronomical unit, W/(m2 um)
+  std::optional<double> sunElevation;  ///< degrees above the horizon
+  std::optional<double> earthSunDistance;  ///< on the day, astronomical units
+};
+
+/// Reads metadata as Metadata::Open leaves them; see docs/metadata.md for the paths. Bands come in
+/// the order in which the metadata list them, or, where these name a selection, in its order.
+VEXG_EXPORT SceneCalibration ReadSceneCalibration(const Metadata& metadata);
+
+/// The distance between earth and sun at a time, in astronomical units, to within 0.0001 for the
+/// years 1900 to 2100: R = 1.00014 - 0.01671 cos g - 0.00014 cos 2g, with the mean anomaly
+/// g = 357.529 + 0.98560028 D degrees and D the days since 2000-01-01 12:00 (U.S. Naval
+/// Observatory, Computing Approximate Solar Coordinates).
+/// @param time  in UTC: "2010-04-01T12:00:00.5Z", or no more than its date.
+/// @return nothing for a text that is no such time.
+VEXG_EXPORT std::optional<double> EarthSunDistance(const String& time);
+
+}  // namespace lumo

@@ -1,0 +1,39 @@
+#include "metadata/metadata_sources.h"
+
+#include "data/access_policy.h"
+#include "data/data_manager.h"
+#include "foundation/fault.h"
+
+// What this floor does for Metadata::Open.
+
+namespace lumo {
+namespace {
+
+bool MayOpen(const String& name) {
+  return MayUseSource(ConnStrings({name}), false);
+}
+
+bool ReadConnection(const Array<String>& connStrings, const String& mdfPath,
+                    const LockableMetadataImplPtr& store, bool& connected) {
+  if (!MayUseSource(connStrings, false)) return false;
+  DataManager& manager = GetGlobalDataManager();
+  DataConnectionPtr connection = manager.ConnectDirect(connStrings, GeoRefPtr(), MetadataPtr());
+  connected = bool(connection);
+  if (!connected) return false;
+  bool read = false;
+  try {
+    read = connection->GetMetadata(mdfPath, store);
+  } catch (...) {
+    SetFault("the plug-in failed when it was asked for its metadata");
+  }
+  manager.ReleaseConnection(connection);
+  return read;
+}
+
+const bool gIsSet = [] {
+  GetMetadataSources() = {MayOpen, ReadConnection};
+  return true;
+}();
+
+}  // namespace
+}  // namespace lumo

@@ -1,0 +1,81 @@
+#pragma once
+
+#include "metadata/metadata_translator.h"
+
+namespace lumo {
+
+// The readers of the metadata formats. Each ties a definition file to a parser, and translates by
+// itself what the language of definition files does not reach.
+//
+// `connStrings` are the format's word, the input, and for XML formats what the input is: "XmlFile",
+// which it is when nothing is said, "XmlUrl" or "XmlString".
+
+/// What the readers have in common.
+class VEXG_EXPORT MetadataReader : protected MetadataDefFileTranslator {
+ protected:
+  /// Reads lines of names and values.
+  bool ReadText(const Array<String>& connStrings, const String& mdfPath, MetadataContainer& target);
+  /// Reads an XML document.
+  bool ReadXml(const Array<String>& connStrings, const String& mdfPath, MetadataContainer& target);
+};
+
+/// Lines of names and values.
+class VEXG_EXPORT TextMetadataReader final : MetadataReader {
+ public:
+  bool Read(const Array<String>& connStrings, const String& mdfPath, MetadataContainer& target) {
+    return ReadText(connStrings, mdfPath, target);
+  }
+};
+
+/// XML documents.
+class VEXG_EXPORT XmlMetadataReader final : MetadataReader {
+ public:
+  bool Read(const Array<String>& connStrings, const String& mdfPath, MetadataContainer& target) {
+    return ReadXml(connStrings, mdfPath, target);
+  }
+};
+
+/// Headers of ORVA rasters. The coordinate system is one text although it stands in braces; points
+/// count from 0 in place of 1, and their map coordinates come as x, y.
+class VEXG_EXPORT OrvaMetadataReader final : MetadataReader {
+ public:
+  bool Read(const Array<String>& connStrings, const String& mdfPath, MetadataContainer& target) {
+    return ReadText(connStrings, mdfPath, target);
+  }
+
+ private:
+  bool Translate(const MdfEntry& entry, MetadataContainer& source, MetadataContainer& target,
+                 const MdfFormat& format) override;
+};
+
+/// The GML of JPEG 2000 files. Names of coordinate systems become their codes.
+class VEXG_EXPORT GmlMetadataReader final : MetadataReader {
+ public:
+  bool Read(const Array<String>& connStrings, const String& mdfPath, MetadataContainer& target) {
+    return ReadXml(connStrings, mdfPath, target);
+  }
+
+ private:
+  bool Translate(const MdfEntry& entry, MetadataContainer& source, MetadataContainer& target,
+                 const MdfFormat& format) override;
+};
+
+/// Product descriptions of Pleiades scenes. Names of coordinate systems become their codes.
+class VEXG_EXPORT PleiadesDimMetadataReader final : MetadataReader {
+ public:
+  bool Read(const Array<String>& connStrings, const String& mdfPath, MetadataContainer& target) {
+    return ReadXml(connStrings, mdfPath, target);
+  }
+
+ private:
+  bool Translate(const MdfEntry& entry, MetadataContainer& source, MetadataContainer& target,
+                 const MdfFormat& format) override;
+};
+
+/// Texts that a plug-in collected, with lists that blanks separate.
+class VEXG_EXPORT CollectedMetadataReader final : MetadataReader {
+ public:
+  bool Read(MetadataContainer& collection, const String& mdfPath, MetadataContainer& target);
+};
+
+}  // namespace lumo
