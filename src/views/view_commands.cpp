@@ -1,5 +1,6 @@
 #include "views/band_stack_raster.h"
 #include "views/complex_raster.h"
+#include "views/projected_raster.h"
 #include "views/publish_raster.h"
 #include "views/skip_raster.h"
 #include "views/spatial_subset_raster.h"
@@ -148,6 +149,49 @@ class CreateVirtualRasterCommand final : public ViewCommand {
 };
 
 const CommandFactoryT<CreateVirtualRasterCommand> virtualFactory(kVirtual);
+
+const CommandDeclaration kProjected{
+    "CreateProjectedRasterCommand",
+    "Views",
+    "Shows a raster in the grid of another geo-reference.",
+    {kSource,
+     {"GeoRef", Presence::kRequired, ValueKind::kGeoRef, "of type Std: the grid"},
+     {"ReprojectionMethod", Presence::kRequired, ValueKind::kWord,
+      "Polynomial: fitted to each block; Rigorous: a transform of every pixel; Triangulation runs "
+      "as Polynomial"},
+     {"ResamplingMethod", Presence::kRequired, ValueKind::kWord,
+      "Nearest, Linear or Cubic; others run as Nearest"},
+     {"PyramidURI", Presence::kOptional, ValueKind::kURI, "has no effect"},
+     {"PyramidLevel", Presence::kOptional, ValueKind::kInteger, "has no effect"},
+     {"Grid", Presence::kOptional, ValueKind::kWord,
+      "Computed: all of the raster, with pixels as large as its own, as without it; Exact: the "
+      "GeoRef with its own size"},
+     {"Sampling", Presence::kOptional, ValueKind::kWord,
+      "Corner: linear and cubic weigh from the corners of pixels and round toward zero, as without "
+      "it; Centred: they weigh from the centres, round to the nearest, and leave out pixels that "
+      "aren't valid"},
+     {"NoData", Presence::kOptional, ValueKind::kNumber,
+      "the no-data value of all bands, outside the raster too; the raster's own when absent"}},
+    PublishedOutputs()};
+
+class CreateProjectedRasterCommand final : public ViewCommand {
+  CommandResult Execute() override {
+    if (!CheckInputs()) return Fail();
+    const auto target = Read<GeoRefPtr>("GeoRef");
+    if (!target) return Fail("GeoRef: the text isn't a geo-reference");
+    const auto method = Read<ReprojectionMethod>("ReprojectionMethod");
+    const auto resampling = Read<PyramidResamplingMethod>("ResamplingMethod");
+    ProjectedRasterOptions options;
+    if (HasInput("Grid")) options.grid = Read<ProjectedGrid>("Grid");
+    if (HasInput("Sampling")) options.sampling = Read<WarpSampling>("Sampling");
+    if (HasInput("NoData")) options.noData = Read<double>("NoData");
+    return PublishView([&]<typename T>(const RasterPtr<T>& source) {
+      return RasterPtr<T>(new ProjectedRaster<T>(source, target, method, resampling, options));
+    });
+  }
+};
+
+const CommandFactoryT<CreateProjectedRasterCommand> projectedFactory(kProjected);
 
 /// Shows a complex raster as a real one.
 template <ComplexPart kPart>

@@ -1,0 +1,101 @@
+#pragma once
+
+#include <cmath>
+#include <optional>
+
+#include "raster/raster.h"
+#include "views/reprojection_geometry.h"
+
+namespace lumo {
+
+/// How a sampler reads the neighbours of a position.
+enum class WarpSampling : unsigned {
+  /// Linear and cubic weigh from the corners of pixels and round toward zero; a pixel's state is
+  /// that of the pixel it falls into. A rigorous nearest leaves out the last column and line.
+  kCorner = 0,
+  /// Linear and cubic weigh from the centres of pixels and round to the nearest number; neighbours
+  /// that are not valid are left out.
+  kCentred = 1
+};
+
+VEXG_EXPORT std::span<const EnumWord<WarpSampling>> WordsOf(WarpSampling);
+
+/// Shows pixels of a raster in the grid of another geo-reference: maps a rectangle of the grid back
+/// to the raster, reads what it covers, works out where every pixel falls, and resamples. Exists
+/// for EightTypes.
+///
+/// Threads:   Reproject may run on many threads at once, where the raster allows it.
+/// Failure:   see Reproject. A polynomial that can't be fitted is replaced by the rigorous method
+///            for that rectangle.
+template <typename T>
+class Reprojection {
+ public:
+  /// What came of a rectangle.
+  enum class Outcome {
+    kDone,
+    kMissed,  ///< it lies outside the raster
+    kFailed   ///< the raster could not be read
+  };
+
+  /// @param resampling  kNearest, kLinear, or else kCubic.
+  Reprojection(const GeoRefPtr& target, ReprojectionMethod method,
+               PyramidResamplingMethod resampling)
+      : target_(target), method_(method), resampling_(resampling) {}
+
+  /// The grid in place of the target.
+  void SetOutputGrid(const GeoRefPtr& grid) { outputGrid_ = grid; }
+  /// Whether a position is taken at the centre of its pixel, as at first, or at its corner.
+  void SetPixelCentres(bool at) { pixelCentres_ = at; }
+  void SetSampling(WarpSampling sampling) { sampling_ = sampling; }
+  /// How far, in pixels of the source, a polynomial may be off at the points of its fit before the
+  /// rectangle is cut in two; without a limit at first.
+  void SetTolerance(double pixels) { tolerance_ = pixels; }
+  /// The value of pixels outside the source; at first the source's no-data value, or 0.
+  void SetBackground(double value) { background_ = value; }
+
+  /// Fills a rectangle of the grid from the raster.
+  /// @param rect  normalised; width by height pixels of the grid.
+  /// @param data,state  [out] resized to the block. A pixel outside the raster has the background
+  ///                    value and state NoData.
+  /// @return false when the rectangle misses the raster or that can't be read; all pixels are then
+  ///         outside. False with no block where there is no grid, or no memory.
+  bool Reproject(Raster<T>& parent, const SubRect& rect, const Array<unsigned>& bands,
+                 Interleave interleave, Array<T>& data, Array<unsigned char>& state) const {
+    return Run(parent, rect, bands, interleave, data, state) == Outcome::kDone;
+  }
+
+  /// As Reproject, and tells a rectangle that misses the raster from one that can't be read.
+  Outcome Run(Raster<T>& parent, const SubRect& rect, const Array<unsigned>& bands,
+              Interleave interleave, Array<T>& data, Array<unsigned char>& state) const;
+
+ private:
+  struct Work;
+  struct Window;
+
+  Outcome RunPart(Work& work, const SubRectProj& part) const;
+  Outcome RunHalves(Work& work, const SubRectProj& part) const;
+  bool Fetch(Work& work, const SubRectProj& rect, Window& window) const;
+  void SamplePart(Work& work, const Window& window, const SubRectProj& part) const;
+
+  double Centre() const { return pixelCentres_ ? 0.5 : 0.0; }
+
+  GeoRefPtr target_;
+  ReprojectionMethod method_;
+  PyramidResamplingMethod resampling_;
+  GeoRefPtr outputGrid_;
+  bool pixelCentres_ = true;
+  WarpSampling sampling_ = WarpSampling::kCorner;
+  double tolerance_ = HUGE_VAL;
+  std::optional<double> background_;
+};
+
+extern template class VEXG_EXPORT Reprojection<std::uint8_t>;
+extern template class VEXG_EXPORT Reprojection<std::int8_t>;
+extern template class VEXG_EXPORT Reprojection<std::uint16_t>;
+extern template class VEXG_EXPORT Reprojection<std::int16_t>;
+extern template class VEXG_EXPORT Reprojection<std::uint32_t>;
+extern template class VEXG_EXPORT Reprojection<std::int32_t>;
+extern template class VEXG_EXPORT Reprojection<float>;
+extern template class VEXG_EXPORT Reprojection<double>;
+
+}  // namespace lumo

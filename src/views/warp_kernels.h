@@ -1,0 +1,40 @@
+#pragma once
+
+#include <cstddef>
+#include <cstdint>
+
+namespace lumo {
+
+/// Values of one band to be interpolated at once.
+template <typename T, unsigned kTaps>
+struct WarpLanes {
+  static constexpr unsigned kLanes = 128;
+  T taps[kTaps][kLanes];  ///< neighbours of each lane, line by line
+  T out[kLanes];
+};
+
+/// How a result becomes a whole number.
+enum class WarpRounding { kTowardZero, kNearest };
+
+/// Bilinear interpolation of `count` lanes between the taps (0, 0), (1, 0), (0, 1), (1, 1).
+/// Cubic convolution between four by four taps, the kernel's parameter -1; whole numbers are
+/// limited to their type (Keys, Cubic convolution interpolation for digital image processing, 1981,
+/// the kernel with a free parameter).
+/// @param a  the way of each lane from its first middle column to the next one, 0 to 1.
+/// @param b  the same between lines.
+#define VEXG_WARP_KERNELS(T)                                                                       \
+  void InterpolateLinear(WarpLanes<T, 4>& lanes, const double* a, const double* b, unsigned count, \
+                         WarpRounding rounding);                                                   \
+  void InterpolateCubic(WarpLanes<T, 16>& lanes, const double* a, const double* b, unsigned count, \
+                        WarpRounding rounding);
+VEXG_WARP_KERNELS(std::uint8_t)
+VEXG_WARP_KERNELS(std::int8_t)
+VEXG_WARP_KERNELS(std::uint16_t)
+VEXG_WARP_KERNELS(std::int16_t)
+VEXG_WARP_KERNELS(std::uint32_t)
+VEXG_WARP_KERNELS(std::int32_t)
+VEXG_WARP_KERNELS(float)
+VEXG_WARP_KERNELS(double)
+#undef VEXG_WARP_KERNELS
+
+}  // namespace lumo
