@@ -1,7 +1,10 @@
 #pragma once
 
 #include <cmath>
+#include <memory>
+#include <mutex>
 #include <optional>
+#include <vector>
 
 #include "raster/raster.h"
 #include "views/reprojection_geometry.h"
@@ -39,8 +42,10 @@ class Reprojection {
 
   /// @param resampling  kNearest, kLinear, or else kCubic.
   Reprojection(const GeoRefPtr& target, ReprojectionMethod method,
-               PyramidResamplingMethod resampling)
-      : target_(target), method_(method), resampling_(resampling) {}
+               PyramidResamplingMethod resampling);
+  ~Reprojection();
+  Reprojection(const Reprojection&) = delete;
+  Reprojection& operator=(const Reprojection&) = delete;
 
   /// The grid in place of the target.
   void SetOutputGrid(const GeoRefPtr& grid) { outputGrid_ = grid; }
@@ -76,6 +81,8 @@ class Reprojection {
   Outcome RunHalves(Work& work, const SubRectProj& part) const;
   bool Fetch(Work& work, const SubRectProj& rect, Window& window) const;
   void SamplePart(Work& work, const Window& window, const SubRectProj& part) const;
+  std::unique_ptr<Window> TakeWindow() const;
+  void GiveBack(std::unique_ptr<Window> window) const;
 
   double Centre() const { return pixelCentres_ ? 0.5 : 0.0; }
 
@@ -87,6 +94,8 @@ class Reprojection {
   WarpSampling sampling_ = WarpSampling::kCorner;
   double tolerance_ = HUGE_VAL;
   std::optional<double> background_;
+  mutable std::mutex windowsLock_;
+  mutable std::vector<std::unique_ptr<Window>> windows_;  // not in use; their memory is used again
 };
 
 extern template class VEXG_EXPORT Reprojection<std::uint8_t>;

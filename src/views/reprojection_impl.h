@@ -147,10 +147,11 @@ typename Reprojection<T>::Outcome Reprojection<T>::RunPart(Work& work,
   const std::uint64_t bytes = static_cast<std::uint64_t>(from.Width() * from.Height()) *
                               work.bands.GetCount() * (sizeof(T) + 1);
   if (bytes > detail::kWarpWindowBytes && detail::CanHalve(part)) return RunHalves(work, part);
-  Window window;
-  if (!Fetch(work, from, window)) return Outcome::kFailed;
-  SamplePart(work, window, part);
-  return Outcome::kDone;
+  std::unique_ptr<Window> window = TakeWindow();
+  const bool fetched = Fetch(work, from, *window);
+  if (fetched) SamplePart(work, *window, part);
+  GiveBack(std::move(window));
+  return fetched ? Outcome::kDone : Outcome::kFailed;
 }
 
 template <typename T>
@@ -160,6 +161,30 @@ typename Reprojection<T>::Outcome Reprojection<T>::RunHalves(Work& work,
   if (first == Outcome::kFailed) return first;
   const Outcome second = RunPart(work, detail::HalfOf(part, true));
   return second == Outcome::kMissed ? first : second;
+}
+
+template <typename T>
+Reprojection<T>::Reprojection(const GeoRefPtr& target, ReprojectionMethod method,
+                              PyramidResamplingMethod resampling)
+    : target_(target), method_(method), resampling_(resampling) {}
+
+template <typename T>
+Reprojection<T>::~Reprojection() = default;
+
+template <typename T>
+std::unique_ptr<typename Reprojection<T>::Window> Reprojection<T>::TakeWindow() const {
+  const std::lock_guard lock(windowsLock_);
+  if (windows_.empty()) return std::make_unique<Window>();
+  std::unique_ptr<Window> window = std::move(windows_.back());
+  windows_.pop_back();
+  return window;
+}
+
+template <typename T>
+void Reprojection<T>::GiveBack(std::unique_ptr<Window> window) const {
+  constexpr std::size_t kKept = 4;
+  const std::lock_guard lock(windowsLock_);
+  if (windows_.size() < kKept) windows_.push_back(std::move(window));
 }
 
 template <typename T>

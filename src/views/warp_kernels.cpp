@@ -48,7 +48,7 @@ template <typename T, bool kNearest>
                                          t * ((p0 + p1 - p2 - p3) * k + (p1 - p2) * 2)));
 }
 
-template <typename T, bool kNearest>
+template <typename T>
 [[gnu::always_inline]] inline void Cubic(WarpLanes<T, 16>& lanes, const double* as,
                                          const double* bs, unsigned count) {
   for (unsigned i = 0; i < count; ++i) {
@@ -58,11 +58,37 @@ template <typename T, bool kNearest>
     const double c1 = Convolve(tap(1), tap(5), tap(9), tap(13), b);
     const double c2 = Convolve(tap(2), tap(6), tap(10), tap(14), b);
     const double c3 = Convolve(tap(3), tap(7), tap(11), tap(15), b);
-    lanes.out[i] = Store<T, kNearest>(Convolve(c0, c1, c2, c3, a));
+    lanes.out[i] = Store<T, false>(Convolve(c0, c1, c2, c3, a));
+  }
+}
+
+template <typename T>
+[[gnu::always_inline]] inline void Weigh(WarpLanes<T, 16>& lanes, const CubicWeights& x,
+                                         const CubicWeights& y, unsigned count) {
+  for (unsigned i = 0; i < count; ++i) {
+    const auto line = [&](unsigned n) {
+      return static_cast<double>(lanes.taps[n][i]) * x.of[0][i] +
+             static_cast<double>(lanes.taps[n + 1][i]) * x.of[1][i] +
+             static_cast<double>(lanes.taps[n + 2][i]) * x.of[2][i] +
+             static_cast<double>(lanes.taps[n + 3][i]) * x.of[3][i];
+    };
+    lanes.out[i] = Store<T, true>(line(0) * y.of[0][i] + line(4) * y.of[1][i] +
+                                  line(8) * y.of[2][i] + line(12) * y.of[3][i]);
   }
 }
 
 }  // namespace
+
+VEXG_VECTOR_CLONES
+void FindCubicWeights(const double* ways, unsigned count, CubicWeights& weights) {
+  for (unsigned i = 0; i < count; ++i) {
+    const double t = ways[i], t2 = t * t, t3 = t2 * t;
+    weights.of[0][i] = 2 * t2 - t3 - t;
+    weights.of[1][i] = 1 - 2 * t2 + t3;
+    weights.of[2][i] = t + t2 - t3;
+    weights.of[3][i] = t3 - t2;
+  }
+}
 
 #define VEXG_WARP_KERNELS(T)                                                                       \
   VEXG_VECTOR_CLONES                                                                               \
@@ -75,13 +101,14 @@ template <typename T, bool kNearest>
     }                                                                                              \
   }                                                                                                \
   VEXG_VECTOR_CLONES                                                                               \
-  void InterpolateCubic(WarpLanes<T, 16>& lanes, const double* a, const double* b, unsigned count, \
-                        WarpRounding rounding) {                                                   \
-    if (rounding == WarpRounding::kNearest) {                                                      \
-      Cubic<T, true>(lanes, a, b, count);                                                          \
-    } else {                                                                                       \
-      Cubic<T, false>(lanes, a, b, count);                                                         \
-    }                                                                                              \
+  void InterpolateCubic(WarpLanes<T, 16>& lanes, const double* a, const double* b,                 \
+                        unsigned count) {                                                          \
+    Cubic(lanes, a, b, count);                                                                     \
+  }                                                                                                \
+  VEXG_VECTOR_CLONES                                                                               \
+  void WeighCubic(WarpLanes<T, 16>& lanes, const CubicWeights& x, const CubicWeights& y,           \
+                  unsigned count) {                                                                \
+    Weigh(lanes, x, y, count);                                                                     \
   }
 VEXG_WARP_KERNELS(std::uint8_t)
 VEXG_WARP_KERNELS(std::int8_t)

@@ -211,18 +211,24 @@ class NeighbourhoodParallel : public WarpParallel<T> {
     Offsets from;
     FindTaps(chunk, from);
     WarpLanes<T, kTaps> lanes;
-    const WarpRounding rounding = this->sampling_ == WarpSampling::kCentred
-                                      ? WarpRounding::kNearest
-                                      : WarpRounding::kTowardZero;
+    const bool isCentred = this->sampling_ == WarpSampling::kCentred;
+    CubicWeights x, y;
+    if (kSide == 4 && isCentred) {
+      FindCubicWeights(chunk.a, chunk.count, x);
+      FindCubicWeights(chunk.b, chunk.count, y);
+    }
     for (unsigned band = 0; band < target.bands; ++band) {
       const T* const in = source.pixels + band * source.strides.band;
       for (unsigned tap = 0; tap < kTaps; ++tap) {
         for (unsigned i = 0; i < chunk.count; ++i) lanes.taps[tap][i] = in[from[tap][i]];
       }
       if constexpr (kSide == 2) {
-        InterpolateLinear(lanes, chunk.a, chunk.b, chunk.count, rounding);
+        InterpolateLinear(lanes, chunk.a, chunk.b, chunk.count,
+                          isCentred ? WarpRounding::kNearest : WarpRounding::kTowardZero);
+      } else if (isCentred) {
+        WeighCubic(lanes, x, y, chunk.count);
       } else {
-        InterpolateCubic(lanes, chunk.a, chunk.b, chunk.count, rounding);
+        InterpolateCubic(lanes, chunk.a, chunk.b, chunk.count);
       }
       const std::size_t first = out + band * target.strides.band;
       T* at = target.pixels + first;
