@@ -88,6 +88,17 @@ Array<double> RectPoints(const SubRectProj& rect) {
   return points.Take();
 }
 
+/// The corners of all pixels of a rectangle.
+Array<double> PixelPoints(const SubRectProj& rect) {
+  PointList points;
+  for (std::int64_t y = 0; y <= rect.Height(); ++y) {
+    for (std::int64_t x = 0; x <= rect.Width(); ++x) {
+      points.Add(rect.left + static_cast<double>(x), rect.top + static_cast<double>(y));
+    }
+  }
+  return points.Take();
+}
+
 /// A rounded coordinate inside 0 to size - 1.
 std::int32_t Inside(double value, unsigned size) {
   return static_cast<std::int32_t>(std::clamp(value, 0.0, size - 1.0));
@@ -202,8 +213,8 @@ std::int32_t SamplingMargin(PyramidResamplingMethod resampling) {
 
 CoveredRect BaseSubRectToSecSubRect(const GeoRef& base, const SubRectProj& rect,
                                     const GeoRef& second, unsigned samples, unsigned lines,
-                                    PyramidResamplingMethod resampling) {
-  Array<double> points = RectPoints(rect);
+                                    PyramidResamplingMethod resampling, bool everyPixel) {
+  Array<double> points = everyPixel ? PixelPoints(rect) : RectPoints(rect);
   base.PixelToPixel(points, second);
   const Bounds bounds(points);
   CoveredRect covered;

@@ -72,9 +72,12 @@ struct CoveredRect {
 /// The rectangle of the second raster, of samples by lines, that covers `rect` of the base grid,
 /// with the margin that the resampling reads, cut to the raster. A rectangle that misses it leaves
 /// a line in the log.
+/// @param everyPixel  carry all pixels, not some on the edges and the diagonals: for a small
+///                    rectangle that can be carried in part only.
 VEXG_EXPORT CoveredRect BaseSubRectToSecSubRect(const GeoRef& base, const SubRectProj& rect,
                                                 const GeoRef& second, unsigned samples,
-                                                unsigned lines, PyramidResamplingMethod resampling);
+                                                unsigned lines, PyramidResamplingMethod resampling,
+                                                bool everyPixel = false);
 
 /// Carries positions of a rectangle of a grid to pixels of a source raster:
 /// u, v = k0 + k1 y + k2 x + k3 x y, where x and y count from the rectangle's upper left corner.

@@ -132,9 +132,15 @@ typename Reprojection<T>::Outcome Reprojection<T>::Run(Raster<T>& parent, const 
 template <typename T>
 typename Reprojection<T>::Outcome Reprojection<T>::RunPart(Work& work,
                                                            const SubRectProj& part) const {
-  const CoveredRect covered = BaseSubRectToSecSubRect(
-      work.grid, part, *work.source.geoRef, work.source.samples, work.source.lines, resampling_);
-  if (covered.isPartial && detail::CanHalve(part)) return RunHalves(work, part);
+  const auto cover = [&](bool everyPixel) {
+    return BaseSubRectToSecSubRect(work.grid, part, *work.source.geoRef, work.source.samples,
+                                   work.source.lines, resampling_, everyPixel);
+  };
+  CoveredRect covered = cover(false);
+  if (covered.isPartial) {
+    if (detail::CanHalve(part)) return RunHalves(work, part);
+    covered = cover(true);
+  }
   if (covered.misses) {
     detail::FillBackground(detail::TargetOf(work.target, work.rect, part), part);
     return Outcome::kMissed;
