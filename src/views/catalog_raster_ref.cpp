@@ -7,6 +7,22 @@
 #include "views/reader_raster.h"
 
 namespace lumo {
+namespace {
+
+/// True when a pyramid is one of a raster of the same size and pixel type; else tells the fault.
+bool BelongTogether(RasterDataConnection& source, RasterDataConnection& pyramid) {
+  const RasterDef raster = source.RasterDef(), levels = pyramid.RasterDef();
+  const bool isSameType = source.DataType() == pyramid.DataType();
+  if (isSameType && raster.samples == levels.samples && raster.lines == levels.lines &&
+      raster.bands == levels.bands) {
+    return true;
+  }
+  SetFault(source.URI().ToUTF8() + (isSameType ? ": the pyramid is of a raster of another size"
+                                               : ": the pyramid has another pixel type"));
+  return false;
+}
+
+}  // namespace
 
 BasicRasterPtr MakeReaderRaster(const DataConnectionPtr& connection,
                                 const DataConnectionPtr& pyramidConnection) {
@@ -19,21 +35,17 @@ BasicRasterPtr MakeReaderRaster(const DataConnectionPtr& connection,
   const RasterDataConnectionPtr pyramid(pyramidConnection);
   const RasterReaderDispatchPtr pyramidDispatch =
       pyramid ? pyramid->RasterReaderDispatch() : RasterReaderDispatchPtr();
+  if (pyramid && !BelongTogether(*source, *pyramid)) return {};
   BasicRasterPtr made;
   if (dispatch) {
     DispatchType(TwelveTypes{}, dispatch->DataType(), [&]<typename T>() {
       const RasterReaderPtr<T> pyramidReader =
           pyramidDispatch ? pyramidDispatch->Get<T>() : RasterReaderPtr<T>();
-      if (pyramid && !pyramidReader) return false;
       made.Reset(new ReaderRaster<T>(dispatch->Get<T>(), source, pyramidReader, pyramid));
       return true;
     });
   }
-  if (!made) {
-    SetFault(source->URI().ToUTF8() + (pyramidConnection
-                                           ? ": the pyramid has another pixel type"
-                                           : ": the pixel type of the source can't be read"));
-  }
+  if (!made) SetFault(source->URI().ToUTF8() + ": the pixel type of the source can't be read");
   return made;
 }
 

@@ -1,3 +1,5 @@
+#include <filesystem>
+
 #include "commands/catalog.h"
 #include "data/data_manager.h"
 #include "foundation/fault.h"
@@ -13,7 +15,9 @@ const CommandDeclaration kOpen{
     {{"ConnStr", Presence::kRequired, ValueKind::kTextList,
       "the source: a file, with or without the key of its format"},
      {"PyramidConnStr", Presence::kOptional, ValueKind::kTextList,
-      "a pyramid file that belongs to it"},
+      "a pyramid file that belongs to it; one that isn't there yet can be built"},
+     {"PyramidNew", Presence::kOptional, ValueKind::kBoolean,
+      "1: a pyramid file that is there is not looked at, only replaced by a build"},
      {"GeoRef", Presence::kOptional, ValueKind::kGeoRef, "in place of the source's own"}},
     PublishedOutputs()};
 
@@ -37,11 +41,29 @@ class OpenRasterCommand final : public PublishCommand {
     DataManager& manager = GetGlobalDataManager();
     const DataConnectionPtr source = manager.Connect(connStrings, geoRef, MetadataPtr());
     if (!source) return Fail();
-    const DataConnectionPtr pyramid = manager.Connect(pyramidStrings, GeoRefPtr(), MetadataPtr());
+    const DataConnectionPtr pyramid =
+        ConnectPyramid(pyramidStrings, RasterDataConnectionPtr(source));
     if (!pyramid) return Fail();
     BasicRasterPtr raster(catalog::Find(source->URI()));
     if (!raster) raster = MakeReaderRaster(source, pyramid);
     return Publish(CatalogRasterRef(raster, false));
+  }
+
+  /// Opens a pyramid; one of the library's own that isn't there, or is to be replaced, has no file
+  /// until it is built.
+  DataConnectionPtr ConnectPyramid(const Array<String>& strings,
+                                   const RasterDataConnectionPtr& source) {
+    DataManager& manager = GetGlobalDataManager();
+    Array<String> names;
+    const bool isOurs = SplitConnStr(strings, names) == "Pyramid" && names.GetCount() != 0;
+    std::error_code ignored;
+    if (!source || !isOurs ||
+        (!Read<bool>("PyramidNew") && std::filesystem::exists(names[0].ToUTF8(), ignored))) {
+      return manager.Connect(strings, GeoRefPtr(), MetadataPtr());
+    }
+    RasterDef def = source->RasterDef();
+    def.format = "Pyramid";
+    return manager.CreateRaster(strings, def);
   }
 };
 

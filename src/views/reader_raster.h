@@ -2,7 +2,7 @@
 
 #include <mutex>
 
-#include "data/raster_reader.h"
+#include "pyramid/dynamic_raster_pyramid.h"
 #include "views/computed_raster.h"
 
 namespace lumo {
@@ -36,6 +36,9 @@ class ReaderRaster final : public ComputedRaster<T> {
 
   bool PyramidExists() const override;
   PyramidDef GetPyramidDef() const override;
+  AsyncPtr PyramidBuild(const PyramidDef& def, const lumo::TileDimensions& tiles,
+                        const AsyncCallbackPtr& callback) override;
+  AsyncPtr PyramidAsync() const override;
   bool PyramidDelete() override;
   bool PyramidRefresh() override;
 
@@ -60,6 +63,9 @@ class ReaderRaster final : public ComputedRaster<T> {
   unsigned Lines() const override { return lines_; }
   unsigned Bands() const override { return bands_; }
   lumo::TileDimensions TileDimensions() const override { return tiles_; }
+  /// Of the pyramid's file, when that has levels, else of the source.
+  RasterPtr<T> PyramidLevel(unsigned level) override;
+  RasterPtr<T> StoredPyramidLevel(unsigned level) override;
 
   bool HasNoDataValue(unsigned band) const override;
   T NoDataValue(unsigned band) const override;
@@ -94,7 +100,8 @@ class ReaderRaster final : public ComputedRaster<T> {
   unsigned bands_ = 0;
   lumo::TileDimensions tiles_;
   std::mutex pixelLock_;
-  std::mutex statsLock_;  // held while a getter of statistics computes
+  std::mutex statsLock_;                // held while a getter of statistics computes
+  DynamicRasterPyramidPtr<T> pyramid_;  // empty without a reader of a pyramid
 };
 
 extern template class VEXG_EXPORT ReaderRaster<std::uint8_t>;

@@ -3,6 +3,7 @@
 #include <algorithm>
 
 #include "foundation/fault.h"
+#include "views/pyramid_raster_impl.h"
 #include "views/reader_raster.h"
 
 namespace lumo {
@@ -34,10 +35,16 @@ ReaderRaster<T>::ReaderRaster(const RasterReaderPtr<T>& reader,
   bands_ = def.bands;
   tiles_.width = def.tileWidth;
   tiles_.height = def.tileHeight;
+  if (pyramidReader_ && connection_ && pyramidConnection_) {
+    pyramid_.Reset(new DynamicRasterPyramid<T>(
+        reader_, connection_, pyramidReader_, pyramidConnection_,
+        [](const auto&... sources) { return RasterPtr<T>(new ReaderRaster(sources...)); }));
+  }
 }
 
 template <typename T>
 ReaderRaster<T>::~ReaderRaster() {
+  pyramid_ = DynamicRasterPyramidPtr<T>();
   this->StopComputing();
 }
 
@@ -84,6 +91,36 @@ PyramidDef ReaderRaster<T>::GetPyramidDef() const {
 }
 
 template <typename T>
+AsyncPtr ReaderRaster<T>::PyramidBuild(const PyramidDef& def, const lumo::TileDimensions& tiles,
+                                       const AsyncCallbackPtr& callback) {
+  if (pyramid_) return pyramid_->PyramidBuild(def, tiles, callback);
+  SetFault(uri_.ToUTF8() + ": the raster was opened without a pyramid");
+  return {};
+}
+
+template <typename T>
+AsyncPtr ReaderRaster<T>::PyramidAsync() const {
+  return pyramid_ ? pyramid_->PyramidAsync() : AsyncPtr();
+}
+
+template <typename T>
+RasterPtr<T> ReaderRaster<T>::PyramidLevel(unsigned level) {
+  if (pyramidReader_ && pyramidReader_->PyramidExists()) {
+    return RasterPtr<T>(new PyramidRasterImpl<T>(*this, pyramidReader_, pyramidConnection_, level));
+  }
+  if (reader_ && reader_->PyramidExists()) {
+    return RasterPtr<T>(new PyramidRasterImpl<T>(*this, reader_, connection_, level));
+  }
+  return {};
+}
+
+template <typename T>
+RasterPtr<T> ReaderRaster<T>::StoredPyramidLevel(unsigned level) {
+  if (!pyramidReader_) return {};
+  return RasterPtr<T>(new PyramidRasterImpl<T>(*this, pyramidReader_, pyramidConnection_, level));
+}
+
+template <typename T>
 bool ReaderRaster<T>::PyramidDelete() {
   return pyramidReader_ && pyramidReader_->PyramidDelete();
 }
@@ -95,7 +132,8 @@ bool ReaderRaster<T>::PyramidRefresh() {
 
 template <typename T>
 bool ReaderRaster<T>::StatsExist(unsigned band, unsigned mask) const {
-  return ComputedRaster<T>::StatsExist(band, mask) || AnyReader([&](auto& reader) {
+  return ComputedRaster<T>::StatsExist(band, mask) ||
+         (pyramid_ && pyramid_->StatsExist(band, mask)) || AnyReader([&](auto& reader) {
            return (static_cast<unsigned>(reader.StatsMask()) & mask) == mask &&
                   reader.StatsExist(band) && (reader.ReadStats(band).mask & mask) == mask;
          });
@@ -104,6 +142,8 @@ bool ReaderRaster<T>::StatsExist(unsigned band, unsigned mask) const {
 template <typename T>
 RasterBandStats<T> ReaderRaster<T>::BandStats(unsigned band) const {
   RasterBandStats<T> stats = ComputedRaster<T>::BandStats(band);
+  if (stats.mask != StatsMask::None) return stats;
+  if (pyramid_) stats = pyramid_->BandStats(band);
   if (stats.mask != StatsMask::None) return stats;
   AnyReader([&](auto& reader) {
     if (!reader.StatsExist(band)) return false;

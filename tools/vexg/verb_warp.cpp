@@ -1,0 +1,199 @@
+#include <filesystem>
+#include <iostream>
+#include <memory>
+#include <optional>
+
+#include <CLI/CLI.hpp>
+#include <fmt/format.h>
+
+#include "georef/covering_grid.h"
+#include "raster_target.h"
+#include "verb.h"
+
+namespace lumo::host {
+namespace {
+
+struct Options {
+  SourceOptions source;
+  TargetOptions target;
+  RasterJobOptions job;
+  std::string to;
+  double pixelSize = 0;
+  std::string method = "polynomial";
+  std::string resampling = "nearest";
+  std::string bands;
+  std::optional<double> noData;
+};
+
+/// What is made.
+struct Plan {
+  std::string format;
+  Array<unsigned> bands;
+  GeoRefPtr grid;
+};
+
+constexpr const char* kWarpStep = "warp";
+
+/// A word of the command line as the commands have it.
+std::string Capital(std::string word) {
+  if (!word.empty() && word[0] >= 'a' && word[0] <= 'z') word[0] += 'A' - 'a';
+  return word;
+}
+
+/// The warping as a whole: opens the source, stands views on it, makes the file and closes all.
+JobDraft MakeDraft(const Options& options, const Plan& plan, const std::string& target) {
+  JobDraft draft;
+  AddOpen(draft, "source", options.source);
+  std::vector<String> opened{"$source"};
+  if (!options.bands.empty()) {
+    AddBandView(draft, "bands", opened.back(), plan.bands);
+    opened.emplace_back("$bands");
+  }
+  JobWriterCommand& view = draft.Open("warped", "CreateProjectedRasterCommand");
+  view.AddVariableInput("SrcURI", opened.back());
+  view.AddInput("GeoRef", plan.grid);
+  view.AddInput("ReprojectionMethod", String(Capital(options.method)));
+  view.AddInput("ResamplingMethod", String(Capital(options.resampling)));
+  view.AddInput("Grid", String("Exact"));
+  view.AddInput("Sampling", String("Centred"));
+  if (options.noData) view.AddInput("NoData", *options.noData);
+  opened.emplace_back("$warped");
+  AddQuery(draft, "shown", opened.back());
+  AddCreate(draft, {target, plan.format}, opened.back());
+  JobWriterCommand& copy = draft.Step(kWarpStep, "CopyRasterCommand");
+  copy.AddVariableInput("SrcURI", opened.back());
+  copy.AddVariableInput("DstURI", "$target");
+  AddCloseTarget(draft);
+  for (auto raster = opened.rbegin(); raster != opened.rend(); ++raster) {
+    draft.Close("close." + raster->ToUTF8().substr(1), *raster);
+  }
+  return draft;
+}
+
+bool IsFile(const std::string& name) {
+  std::error_code ignored;
+  return std::filesystem::is_regular_file(name, ignored);
+}
+
+/// The grid of another raster file. Throws HostError when it has none.
+GeoRefPtr GridOfFile(JobSession& session, const std::string& file) {
+  JobDraft draft;
+  AddOpen(draft, "like", {file, ""});
+  AddQuery(draft, "like", "$like");
+  draft.Close("close.like", "$like");
+  const RasterInfo like = ReadInfo(session.Run(draft), "like");
+  if (like.geoRef.IsNull() || like.geoRef->GetType() != GeoRef::kStd) {
+    throw HostError(kExitFailed, file + ": the raster has no plain grid to be taken over");
+  }
+  return like.geoRef;
+}
+
+/// The grid that was asked for. Throws HostError for one that can't be.
+GeoRefPtr FindGrid(JobSession& session, const Options& options, const RasterInfo& info) {
+  if (info.geoRef.IsNull()) {
+    throw HostError(kExitFailed, options.source.file + ": the raster has no geo-reference");
+  }
+  if (IsFile(options.to)) {
+    if (options.pixelSize != 0) {
+      throw HostError(kExitUsage, "--pixel-size: the grid of " + options.to + " has its own");
+    }
+    return GridOfFile(session, options.to);
+  }
+  CoordSys system;
+  if (!system.SetFromString(String(options.to))) {
+    throw HostError(kExitUsage, "--to: neither a file nor a coordinate system: " + options.to);
+  }
+  if (info.geoRef->CoordinateSystem().IsEmpty()) {
+    throw HostError(kExitFailed, options.source.file + ": the raster has no coordinate system");
+  }
+  const GeoRefPtr grid = CoveringGrid(*info.geoRef, system, options.pixelSize);
+  if (grid.IsNull()) {
+    throw HostError(kExitFailed, options.source.file +
+                                      ": the raster can't be carried to that system with pixels "
+                                      "of that size");
+  }
+  return grid;
+}
+
+/// Makes the file in the output's folder. Throws what went wrong.
+void MakeFile(JobSession& session, const Options& options, const Plan& plan,
+              const OutputFile& output) {
+  const JobDraft draft = MakeDraft(options, plan, output.GetWorkName());
+  JobResults results;
+  {
+    const ProgressView view(ProgressOfStep(session, draft, kWarpStep),
+                            options.job.GetProgressStyle());
+    results = session.Run(draft);
+  }
+  CheckClosed(results);
+  CheckMade(session, {output.GetWorkName(), plan.format}, output.GetShownName(),
+            ReadInfo(results, "shown"));
+  session.CheckInterrupt();
+}
+
+int Warp(const Options& options) {
+  Plan plan;
+  plan.format = ChooseFormat(options.target);
+  OutputFile output(options.target.output, options.target.overwrite, {options.source.file});
+  JobSession session(options.job);
+  JobDraft opening;
+  AddOpen(opening, "source", options.source);
+  AddQuery(opening, "source", "$source");
+  const JobResults opened = session.Run(opening);
+  output.RefuseInput(PathOf(opened.Find("source").returns.Find("URI")));
+  const RasterInfo info = ReadInfo(opened, "source");
+  plan.bands = ParseBands(options.bands, info);
+  plan.grid = FindGrid(session, options, info);
+  if (options.job.printJob) {
+    std::cout << MakeDraft(options, plan, output.GetName()).Write().ToUTF8() << '\n';
+    return kExitSuccess;
+  }
+  output.Begin(BytesInFile(plan.format, info.dataType, plan.grid->Samples(), plan.grid->Lines(),
+                           plan.bands.GetCount()));
+  try {
+    MakeFile(session, options, plan, output);
+  } catch (const HostError& error) {
+    throw HostError(error.code, output.InUsersWords(error.what()));
+  }
+  output.Commit();
+  return kExitSuccess;
+}
+
+const VerbRegistration registration(
+    "warp", "Carries a raster to another coordinate system or grid", [](CLI::App& app) {
+      const auto options = std::make_shared<Options>();
+      app.footer(
+          "The polynomial method is within an eighth of a pixel; rigorous transforms every pixel. "
+          "Linear and cubic leave out pixels that aren't valid; cubic has the parameter -1. Pixels "
+          "outside the source have the no-data value, or 0.\n"
+          "Example: vexg warp scene.tif geographic.tif --to EPSG:4326 --resampling linear\n");
+      options->source.AddTo(app);
+      options->target.AddTo(app, "The warped raster");
+      app.add_option("--to", options->to,
+                     "Coordinate system (EPSG:n, WKT, PROJ text), or a raster file whose grid is "
+                     "taken over")
+          ->type_name("CS|FILE")
+          ->required();
+      app.add_option("--pixel-size", options->pixelSize,
+                     "Side of a pixel in units of the system; by default about as many pixels as "
+                     "the source has")
+          ->type_name("SIZE")
+          ->check(CLI::PositiveNumber);
+      app.add_option("--method", options->method, "How positions are found")
+          ->check(CLI::IsMember({"polynomial", "rigorous"}))
+          ->capture_default_str();
+      app.add_option("--resampling", options->resampling, "How pixels are made")
+          ->check(CLI::IsMember({"nearest", "linear", "cubic"}))
+          ->capture_default_str();
+      app.add_option("--bands", options->bands, "Bands in the order wanted, from 0; all by default")
+          ->type_name("B,B…");
+      app.add_option("--no-data", options->noData,
+                     "No-data value of the result; by default the source's")
+          ->type_name("VALUE");
+      options->job.AddTo(app);
+      options->job.AddProgressTo(app);
+      return VerbRegistration::Work([options] { return Warp(*options); });
+    });
+
+}  // namespace
+}  // namespace lumo::host
