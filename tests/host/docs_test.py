@@ -30,7 +30,7 @@ class Documents(PipeTest):
         self.assertEqual(without_times(run("run", "-", stdin=job)[1]), without_times(result))
 
     def test_the_first_job_of_the_readme_runs(self):
-        two_commands, first_job, _, _, transform = blocks("README.md", "sh")
+        two_commands, first_job, _, _, _, transform = blocks("README.md", "sh")
         for line in two_commands.splitlines():
             self.assertTrue(os.access(SOURCE / line.split()[0], os.X_OK), line)
         script = "set -e\n" + first_job.replace("build/release", str(BUILD)) + "wait\n" + transform
@@ -44,7 +44,7 @@ class Documents(PipeTest):
 
     @needs_data
     def test_the_raster_verbs_of_the_readme_run(self):
-        script = "set -e\n" + "".join(blocks("README.md", "sh")[2:4]).replace("build/release", str(BUILD))
+        script = "set -e\n" + "".join(blocks("README.md", "sh")[2:5]).replace("build/release", str(BUILD))
         with tempfile.TemporaryDirectory() as folder:
             shutil.copy(DATA / "landsat7_olinda.tif", pathlib.Path(folder) / "scene.tif")
             shell = subprocess.run(["bash", "-c", script], cwd=folder, capture_output=True, text=True, timeout=60)
