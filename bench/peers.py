@@ -22,13 +22,16 @@ def make_scene(path, size, type_name, options):
     """A scene of noise on slopes; the same pixels for every layout."""
     # In a process of its own: who starts a peer is small, so that the peer's peak memory is its own.
     import numpy
-    from osgeo import gdal
+    from osgeo import gdal, osr
     gdal.UseExceptions()
     kind = numpy.dtype(type_name.lower() if type_name != "Byte" else "uint8")
     code = gdal.GetDataTypeByName(type_name)
     driver = gdal.GetDriverByName("ENVI" if options is None else "GTiff")
     out = driver.Create(str(path), size, size, BANDS, code, ["INTERLEAVE=BIP"] if options is None else options)
     out.SetGeoTransform((600000, 30, 0, 5000000, 0, -30))
+    system = osr.SpatialReference()
+    system.ImportFromEPSG(32633)
+    out.SetProjection(system.ExportToWkt())
     top = {"Byte": 255, "UInt16": 4095, "Float32": 1.0}[type_name]
     random = numpy.random.default_rng(1)
     x = numpy.linspace(0, 1, size, dtype=numpy.float32)[None, :]
@@ -210,7 +213,29 @@ def pyramid(bench):
                           [f"{scene}{ending}" for ending in (".pyr", ".ovr", ".aux.xml")])
 
 
-SECTIONS = {"stats": stats, "hist": hist, "calibrate": calibrate, "pyramid": pyramid, "memory": memory}
+def warp(bench):
+    """To longitude and latitude, with all threads and with one, on the grid that gdalwarp chooses."""
+    aims = {"near": 0.7, "bilinear": 0.5, "cubic": 0.5}
+    words = {"near": "nearest", "bilinear": "linear", "cubic": "cubic"}
+    for type_name in ("Byte", "UInt16", "Float32"):
+        scene = bench.scene(type_name, "tiled")
+        grid, made, theirs = (bench.work / name for name in ("grid.tif", "warped.tif", "gdal-warped.tif"))
+        subprocess.run(["gdalwarp", "-q", "-overwrite", "-t_srs", "EPSG:4326", scene, grid], check=True)
+        for threads in ("all", "one"):
+            vexg = [bench.vexg] if threads == "all" else ["env", "LUMO_THREADS_HINT=1", bench.vexg]
+            peer = ["-multi", "-wo", "NUM_THREADS=ALL_CPUS"] if threads == "all" else []
+            for method, error, of_method in (("polynomial", [], aims), ("rigorous", ["-et", "0"], {"bilinear": 0.7})):
+                for resampling, word in words.items():
+                    command = ["gdalwarp", "-q", "-overwrite", "-t_srs", "EPSG:4326", "-r", resampling, *error, *peer,
+                               scene, theirs]
+                    bench.compare(f"warp {type_name} {method} {word}, {threads} threads",
+                                  [*vexg, "warp", scene, made, "--to", grid, "--method", method, "--resampling",
+                                   word, "--overwrite", "-q"],
+                                  {"gdalwarp": command}, {"gdalwarp": of_method.get(resampling)})
+
+
+SECTIONS = {"stats": stats, "hist": hist, "calibrate": calibrate, "pyramid": pyramid, "warp": warp,
+            "memory": memory}
 
 
 def main():
