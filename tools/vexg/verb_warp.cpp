@@ -109,8 +109,8 @@ GeoRefPtr FindGrid(JobSession& session, const Options& options, const RasterInfo
   const GeoRefPtr grid = CoveringGrid(*info.geoRef, system, options.pixelSize);
   if (grid.IsNull()) {
     throw HostError(kExitFailed, options.source.file +
-                                      ": the raster can't be carried to that system with pixels "
-                                      "of that size");
+                                     ": the raster can't be carried to that system with pixels "
+                                     "of that size");
   }
   return grid;
 }
