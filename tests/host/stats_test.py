@@ -221,6 +221,47 @@ class Calibrate(RasterTest):
                 self.assertIn(words, err)
                 self.assertEqual(list(self.folder.iterdir()), [])
 
+    SCENE = ("band names = {Red, Near infrared}\ngains = {0.5, 0.25}\noffsets = {-1, 2}\n"
+             "solar irradiances = {1551, 1036}\nsun elevation = 30\nacquisition time = 2010-07-06T11:30:00Z\n")
+
+    def calibrate(self, quantity, source, metadata, *options):
+        """Exit code, what was said, and the values of the first pixel."""
+        out = self.folder / "out.dat"
+        code, printed, err = run("calibrate", quantity, str(source), str(out), "--type", "Double", "--overwrite",
+                                 "--progress", "none", "--from-metadata", str(metadata), *options)
+        self.assertEqual(printed, "")
+        return code, err, [self.values(out, band)[0] for band in range(2)] if code == 0 else []
+
+    def test_constants_come_from_metadata(self):
+        source = write_orva(self.folder / "dn.dat", 2, 1, 2, bytes([100, 200, 9, 8]), more=self.SCENE)
+        code, said, values = self.calibrate("radiance", source, source)
+        self.assertEqual((code, values), (0, [49, 52]), said)
+        self.assertIn("dn.dat: taken --gain 0.5,0.25 --offset -1,2\n", said)
+        distance = 1.01668  # of the aphelion
+        code, said, values = self.calibrate("reflectance", source, f"ORVA:{source}.hdr", "--gain", "1")
+        self.assertEqual(code, 0, said)
+        self.assertIn("taken --offset -1,2 --irradiance 1551,1036 --sun-elevation 30 --distance 1.016", said)
+        for value, radiance, irradiance in zip(values, (99, 202), (1551, 1036)):
+            self.assertAlmostEqual(value / (math.pi * radiance * distance ** 2 / (irradiance * 0.5)), 1, 4)
+
+    def test_metadata_that_do_not_do(self):
+        source = write_orva(self.folder / "dn.dat", 2, 1, 2, bytes(4), more=self.SCENE)
+        low = write_orva(self.folder / "low.dat", 1, 1, 2, more=self.SCENE.replace("tion = 30", "tion = -3"))
+        three = write_orva(self.folder / "three.dat", 2, 1, 3)
+        before = sorted(self.folder.iterdir())
+        for quantity, scene, metadata, words in (
+                ("temperature", source, source, "dn.dat: it doesn't tell --k1, which temperature needs"),
+                ("reflectance", source, low, "low.dat: --sun-elevation: the sun stands"),
+                ("radiance", three, source, "dn.dat: --gain: there are 2 values for 3 bands"),
+                ("radiance", source, three, "three.dat: it doesn't tell --gain"),
+                ("radiance", source, self.folder / "none.dat.hdr", "none.dat.hdr: No such file"),
+                ("radiance", source, "scene.txt", "scene.txt: the name doesn't tell what metadata")):
+            with self.subTest(words):
+                code, said, _ = self.calibrate(quantity, scene, metadata)
+                self.assertNotEqual(code, 0)
+                self.assertIn(words, said)
+                self.assertEqual(sorted(self.folder.iterdir()), before)
+
     @needs_gdal
     def test_print_job_is_the_work_done(self):
         out = self.folder / "out.tif"

@@ -4,10 +4,12 @@
 #include <limits>
 #include <memory>
 #include <optional>
+#include <set>
 
 #include <CLI/CLI.hpp>
 #include <fmt/format.h>
 
+#include "metadata_source.h"
 #include "raster/pixel_types.h"
 #include "raster_target.h"
 #include "verb.h"
@@ -22,30 +24,48 @@ struct Options {
   RasterJobOptions job;
   std::vector<double> gain, offset, irradiance, k1, k2;
   std::optional<double> sunElevation, distance;
+  std::string metadata;         ///< FILE or FORMAT:FILE; empty: all constants are on the line
+  std::set<std::string> taken;  ///< the options whose values the metadata gave
   double scale = 1.0;
   std::string type = "Single";
 };
 
 constexpr const char* kCalibrateStep = "calibrate";
+constexpr const char* kMetadataStep = "metadata";
+constexpr const char* kConstantsStep = "constants";
 
-/// One of the constants of a calibration.
-struct Constant {
+/// One of the constants of a calibration that are not of the whole scene.
+struct BandConstant {
   const char* option;
-  const char* input;
-  const std::vector<double>& values;
+  const char* input;  ///< of the commands that calibrate; also what metadata call it
+  std::vector<double> Options::*values;
 };
 
 /// The constants that a quantity needs for each band.
-std::vector<Constant> BandConstants(const Options& options) {
-  std::vector<Constant> all{{"--gain", "Gain", options.gain},
-                            {"--offset", "Offset", options.offset}};
-  if (options.quantity == "reflectance") {
-    all.push_back({"--irradiance", "SolarIrradiance", options.irradiance});
-  } else if (options.quantity == "temperature") {
-    all.push_back({"--k1", "K1", options.k1});
-    all.push_back({"--k2", "K2", options.k2});
+std::vector<BandConstant> BandConstants(const std::string& quantity) {
+  std::vector<BandConstant> all{{"--gain", "Gain", &Options::gain},
+                                {"--offset", "Offset", &Options::offset}};
+  if (quantity == "reflectance") {
+    all.push_back({"--irradiance", "SolarIrradiance", &Options::irradiance});
+  } else if (quantity == "temperature") {
+    all.push_back({"--k1", "K1", &Options::k1});
+    all.push_back({"--k2", "K2", &Options::k2});
   }
   return all;
+}
+
+/// A constant of the whole scene.
+struct SceneConstant {
+  const char* option;
+  const char* input;
+  std::optional<double> Options::*value;
+};
+
+/// The constants that a quantity needs of the scene.
+std::vector<SceneConstant> SceneConstants(const std::string& quantity) {
+  if (quantity != "reflectance") return {};
+  return {{"--sun-elevation", "SunElevation", &Options::sunElevation},
+          {"--distance", "EarthSunDistance", &Options::distance}};
 }
 
 const char* CommandOf(const std::string& quantity) {
@@ -54,14 +74,17 @@ const char* CommandOf(const std::string& quantity) {
                                      : "CalibrateRasterBrightnessTemperatureCommand";
 }
 
-/// Refuses constants that are missing, that the quantity has no use for, or that give no image.
-void CheckConstants(const Options& options) {
-  const auto refuse = [](const std::string& line) { throw HostError(kExitUsage, line); };
-  for (const Constant& constant : BandConstants(options)) {
-    if (constant.values.empty()) {
-      refuse(fmt::format("{}: {} needs it", constant.option, options.quantity));
-    }
-  }
+[[noreturn]] void Refuse(const std::string& line) {
+  throw HostError(kExitUsage, line);
+}
+
+/// An option as a complaint names it: with the file behind its values.
+std::string NameOf(const Options& options, const char* option) {
+  return options.taken.count(option) != 0 ? options.metadata + ": " + option : option;
+}
+
+/// Refuses constants that the quantity has no use for.
+void RefuseUseless(const Options& options) {
   const bool isReflectance = options.quantity == "reflectance";
   const bool isTemperature = options.quantity == "temperature";
   const std::pair<const char*, bool> useless[] = {
@@ -71,28 +94,83 @@ void CheckConstants(const Options& options) {
       {"--k1", !isTemperature && !options.k1.empty()},
       {"--k2", !isTemperature && !options.k2.empty()}};
   for (const auto& [option, given] : useless) {
-    if (given) refuse(fmt::format("{}: {} has no use for it", option, options.quantity));
-  }
-  if (!isReflectance) return;
-  if (!options.sunElevation || !options.distance) {
-    refuse(fmt::format("{}: reflectance needs it",
-                       options.sunElevation ? "--distance" : "--sun-elevation"));
-  }
-  if (!(*options.sunElevation > 0 && *options.sunElevation <= 90)) {
-    refuse("--sun-elevation: the sun stands 0 to 90 degrees above the horizon, and not on it");
-  }
-  if (!(*options.distance > 0)) refuse("--distance: it is above 0");
-  for (const double irradiance : options.irradiance) {
-    if (!(irradiance > 0)) refuse("--irradiance: it is above 0");
+    if (given) Refuse(fmt::format("{}: {} has no use for it", option, options.quantity));
   }
 }
 
+/// Refuses constants that are missing.
+void RefuseMissing(const Options& options) {
+  const auto need = [&](const char* option, bool given) {
+    if (given) return;
+    const char* const why = options.metadata.empty() ? "{1}: {2} needs it"
+                                                     : "{0}: it doesn't tell {1}, which {2} needs";
+    Refuse(fmt::format(fmt::runtime(why), options.metadata, option, options.quantity));
+  };
+  for (const BandConstant& constant : BandConstants(options.quantity)) {
+    need(constant.option, !(options.*constant.values).empty());
+  }
+  for (const SceneConstant& constant : SceneConstants(options.quantity)) {
+    need(constant.option, (options.*constant.value).has_value());
+  }
+}
+
+/// Refuses constants that give no image.
+void RefuseImpossible(const Options& options) {
+  if (options.quantity != "reflectance") return;
+  const auto refuse = [&](const char* option, const char* why) {
+    Refuse(NameOf(options, option) + ": " + why);
+  };
+  if (!(*options.sunElevation > 0 && *options.sunElevation <= 90)) {
+    refuse("--sun-elevation", "the sun stands 0 to 90 degrees above the horizon, and not on it");
+  }
+  if (!(*options.distance > 0)) refuse("--distance", "it is above 0");
+  for (const double irradiance : options.irradiance) {
+    if (!(irradiance > 0)) refuse("--irradiance", "it is above 0");
+  }
+}
+
+/// Adds the commands that read the constants of the metadata.
+void AddConstants(JobDraft& draft, const MetadataSource& source) {
+  draft.Open(kMetadataStep, "CreateMetadataCommand").AddInput("ConnStr", ConnStringsOf(source));
+  draft.Step(kConstantsStep, "GetMetadataCalibrationCommand").AddInput("URI", String("$metadata"));
+}
+
+/// Takes what the line doesn't give from what the commands of AddConstants said.
+/// @return a line that tells the user of it.
+std::string TakeConstants(Options& options, const JobResults& results) {
+  const Map<String, String>& told = results.Find(kConstantsStep).returns;
+  std::string line;
+  for (const BandConstant& constant : BandConstants(options.quantity)) {
+    std::vector<double>& values = options.*constant.values;
+    if (!values.empty() || !told.HasKey(constant.input)) continue;
+    const auto array = ParseValue<Array<double>>(told.Find(constant.input));
+    values.assign(array.begin(), array.end());
+    options.taken.insert(constant.option);
+    line += fmt::format(" {} {}", constant.option, fmt::join(values, ","));
+  }
+  for (const SceneConstant& constant : SceneConstants(options.quantity)) {
+    std::optional<double>& value = options.*constant.value;
+    if (value.has_value() || !told.HasKey(constant.input)) continue;
+    value = ParseValue<double>(told.Find(constant.input));
+    options.taken.insert(constant.option);
+    line += fmt::format(" {} {}", constant.option, *value);
+  }
+  std::string bands;
+  if (told.HasKey("BandNames")) {
+    for (const String& band : ParseValue<Array<String>>(told.Find("BandNames"))) {
+      bands.append(bands.empty() ? " of the bands " : ", ").append(band.ToUTF8());
+    }
+  }
+  return options.metadata +
+         (line.empty() ? ": nothing was taken from it" : ": taken" + line + bands);
+}
+
 /// A value for each band; one value counts for all.
-Array<double> ForBands(const Constant& constant, unsigned bands) {
-  const std::vector<double>& values = constant.values;
+Array<double> ForBands(const Options& options, const BandConstant& constant, unsigned bands) {
+  const std::vector<double>& values = options.*constant.values;
   if (values.size() != 1 && values.size() != bands) {
-    throw HostError(kExitUsage, fmt::format("{}: there are {} values for {} bands", constant.option,
-                                            values.size(), bands));
+    Refuse(fmt::format("{}: there are {} values for {} bands", NameOf(options, constant.option),
+                       values.size(), bands));
   }
   Array<double> all{ArrayDims(bands)};
   for (unsigned band = 0; band < bands; ++band) all[band] = values[values.size() == 1 ? 0 : band];
@@ -133,11 +211,12 @@ JobDraft MakeDraft(const Options& options, const TargetPlace& place, const Raste
   JobWriterCommand& calibrate = draft.Step(kCalibrateStep, CommandOf(options.quantity));
   calibrate.AddInput("SourceURI", String("$source"));
   calibrate.AddInput("CalibratedURI", String("$target"));
-  for (const Constant& constant : BandConstants(options)) {
-    calibrate.AddInput(constant.input, ForBands(constant, info.bands));
+  for (const BandConstant& constant : BandConstants(options.quantity)) {
+    calibrate.AddInput(constant.input, ForBands(options, constant, info.bands));
   }
-  if (options.sunElevation) calibrate.AddInput("SunElevation", *options.sunElevation);
-  if (options.distance) calibrate.AddInput("EarthSunDistance", *options.distance);
+  for (const SceneConstant& constant : SceneConstants(options.quantity)) {
+    calibrate.AddInput(constant.input, *(options.*constant.value));
+  }
   calibrate.AddInput("ScaleFactor", options.scale);
   AddCloseTarget(draft);
   draft.Close("close.source", "$source");
@@ -179,16 +258,32 @@ void NoteLimits(const Options& options, const RasterInfo& info) {
   }
 }
 
-int Calibrate(const Options& options) {
-  CheckConstants(options);
+int Calibrate(Options& options) {
+  RefuseUseless(options);
   TypeCode(options);
-  const std::string format = ChooseFormat(options.target);
-  OutputFile output(options.target.output, options.target.overwrite, {options.source.file});
-  JobSession session(options.job);
+  const bool hasMetadata = !options.metadata.empty();
+  std::vector<std::string> inputs{options.source.file};
   JobDraft opening;
   AddOpen(opening, "source", options.source);
   AddQuery(opening, "source", "$source");
+  if (hasMetadata) {
+    const MetadataSource metadata = ParseMetadataSource(options.metadata);
+    inputs.push_back(metadata.file);
+    AddConstants(opening, metadata);
+  } else {
+    RefuseMissing(options);
+    RefuseImpossible(options);
+  }
+  const std::string format = ChooseFormat(options.target);
+  OutputFile output(options.target.output, options.target.overwrite, inputs);
+  JobSession session(options.job);
   const JobResults opened = session.Run(opening);
+  if (hasMetadata) {
+    const std::string taken = TakeConstants(options, opened);
+    RefuseMissing(options);
+    RefuseImpossible(options);
+    Say(taken);
+  }
   output.RefuseInput(PathOf(opened.Find("source").returns.Find("URI")));
   const RasterInfo info = ReadInfo(opened, "source");
   NoteLimits(options, info);
@@ -231,6 +326,10 @@ const VerbRegistration registration(
           ->required();
       options->source.AddTo(app);
       options->target.AddTo(app, "The calibrated raster");
+      app.add_option("--from-metadata", options->metadata,
+                     "Takes what isn't given here from the metadata of this file, and says what it "
+                     "took")
+          ->type_name("FILE|FORMAT:FILE");
       AddConstant(app, "--gain", options->gain, "Factor on the digital numbers");
       AddConstant(app, "--offset", options->offset, "Added to them then");
       AddConstant(app, "--irradiance", options->irradiance,
