@@ -3,15 +3,14 @@
 
 #include <cstdint>
 #include <cstdlib>
-#include <filesystem>
 #include <fstream>
 #include <string>
-#include <unistd.h>
 #include <vector>
 
 #include "commands/value_text.h"
 #include "data/data_manager.h"
 #include "data/raster_reader.h"
+#include "support/temporary_directory.h"
 
 namespace {
 
@@ -23,21 +22,6 @@ using lumo::RasterReaderPtr;
 using lumo::String;
 
 constexpr std::size_t kPixelBytes = 4096;
-
-/// The files, which go with the process.
-struct Files {
-  Files() {
-    std::string pattern = (std::filesystem::temp_directory_path() / "vexg-fuzz-XXXXXX").string();
-    if (mkdtemp(pattern.data()) == nullptr) std::abort();
-    directory = pattern;
-    std::ofstream(directory / "raster") << std::string(kPixelBytes, 'x');
-  }
-  ~Files() {
-    std::error_code ignored;
-    std::filesystem::remove_all(directory, ignored);
-  }
-  std::filesystem::path directory;
-};
 
 RasterDataConnectionPtr Open(const std::filesystem::path& path) {
   Array<String> strings{ArrayDims(2)};
@@ -73,8 +57,9 @@ bool Use(RasterDataConnection& source) {
 }  // namespace
 
 extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
-  static const Files files;
-  const std::filesystem::path path = files.directory / "raster";
+  static const lumo::test::TemporaryDirectory directory;
+  const std::filesystem::path path = directory.Path() / "raster";
+  if (!std::filesystem::exists(path)) std::ofstream(path) << std::string(kPixelBytes, 'x');
   std::ofstream(path.string() + ".hdr", std::ios::binary)
       .write(reinterpret_cast<const char*>(data), static_cast<std::streamsize>(size));
   const RasterDataConnectionPtr source = Open(path);

@@ -7,10 +7,8 @@
 #include <cstdint>
 #include <cstdlib>
 #include <cstring>
-#include <filesystem>
 #include <fstream>
 #include <string>
-#include <unistd.h>
 #include <vector>
 
 #define XXH_INLINE_ALL
@@ -18,6 +16,7 @@
 
 #include "data/data_manager.h"
 #include "data/raster_reader.h"
+#include "support/temporary_directory.h"
 
 namespace {
 
@@ -33,19 +32,6 @@ constexpr std::size_t kHeaderBytes = 872;
 constexpr std::size_t kExtents = 72, kExtentCount = 33, kExtentBytes = 24;
 constexpr std::size_t kHeaderSum = kHeaderBytes - 8;
 constexpr std::size_t kHeaderPlaces[] = {0, 4096};
-
-struct Files {
-  Files() {
-    std::string pattern = (std::filesystem::temp_directory_path() / "vexg-fuzz-XXXXXX").string();
-    if (mkdtemp(pattern.data()) == nullptr) std::abort();
-    directory = pattern;
-  }
-  ~Files() {
-    std::error_code ignored;
-    std::filesystem::remove_all(directory, ignored);
-  }
-  std::filesystem::path directory;
-};
 
 std::uint64_t NumberAt(const std::string& bytes, std::size_t at) {
   std::uint64_t number = 0;
@@ -114,11 +100,11 @@ bool Use(RasterDataConnection& source) {
 }  // namespace
 
 extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
-  static const Files files;
+  static const lumo::test::TemporaryDirectory directory;
   if (size == 0) return 0;
   std::string bytes(reinterpret_cast<const char*>(data) + 1, size - 1);
   if ((data[0] & 1) != 0) MakeSums(bytes);
-  const std::filesystem::path path = files.directory / "pyramid";
+  const std::filesystem::path path = directory.Path() / "pyramid";
   std::ofstream(path, std::ios::binary) << bytes;
   Array<String> strings{ArrayDims(2)};
   strings[0] = "Pyramid";

@@ -10,6 +10,7 @@
 #include <sys/uio.h>
 #include <system_error>
 #include <unistd.h>
+#include <utility>
 
 #include "platform/file_descriptor.h"
 
@@ -111,7 +112,14 @@ std::unique_ptr<RandomAccessFile> RandomAccessFile::Create(const std::string& pa
 }
 
 RandomAccessFile::~RandomAccessFile() {
-  close(descriptor_);
+  Close();
+}
+
+bool RandomAccessFile::Close(std::string* fault) {
+  const int descriptor = std::exchange(descriptor_, -1);
+  // An interrupted close has closed all the same.
+  if (descriptor < 0 || close(descriptor) == 0 || errno == EINTR) return true;
+  return FailBySystem(fault, path_, errno);
 }
 
 bool RandomAccessFile::Read(std::uint64_t offset, std::span<const FilePiece> pieces,
@@ -121,6 +129,19 @@ bool RandomAccessFile::Read(std::uint64_t offset, std::span<const FilePiece> pie
   });
   if (error == kEnded) return Fail(fault, path_, "the file is too short");
   return error == 0 || FailBySystem(fault, path_, error);
+}
+
+bool RandomAccessFile::ReadUpTo(std::uint64_t offset, void* data, std::size_t bytes,
+                                std::size_t& got, std::string* fault) const {
+  got = 0;
+  const FilePiece piece{data, bytes};
+  const int error =
+      Transfer(offset, std::span(&piece, 1), [&](const iovec* at, int count, off_t place) {
+        const ssize_t moved = preadv(descriptor_, at, count, place);
+        if (moved > 0) got += static_cast<std::size_t>(moved);
+        return moved;
+      });
+  return error == 0 || error == kEnded || FailBySystem(fault, path_, error);
 }
 
 bool RandomAccessFile::Write(std::uint64_t offset, std::span<const ConstFilePiece> pieces,

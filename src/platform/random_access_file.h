@@ -58,6 +58,10 @@ class VEXG_EXPORT RandomAccessFile {
     return Read(offset, std::span(&piece, 1), fault);
   }
 
+  /// Reads from `offset` as much as the file has, up to `bytes`. @param got  bytes read.
+  bool ReadUpTo(std::uint64_t offset, void* data, std::size_t bytes, std::size_t& got,
+                std::string* fault = nullptr) const;
+
   /// Writes one piece after the other from `offset` on. The file grows where it must.
   bool Write(std::uint64_t offset, std::span<const ConstFilePiece> pieces,
              std::string* fault = nullptr);
@@ -75,6 +79,10 @@ class VEXG_EXPORT RandomAccessFile {
   /// Returns when what was written is on the disk.
   bool Flush(std::string* fault = nullptr);
 
+  /// Gives the file back to the system, which may tell only now of a write that failed. Nothing
+  /// works any more after it.
+  bool Close(std::string* fault = nullptr);
+
   /// False when the file was deleted, or replaced by another, since it was opened.
   bool HasName() const;
 
@@ -83,7 +91,7 @@ class VEXG_EXPORT RandomAccessFile {
       : path_(std::move(path)), descriptor_(descriptor) {}
 
   const std::string path_;
-  const int descriptor_;
+  int descriptor_;  // below 0: closed
 };
 
 /// Makes a file that holds `content`, on the disk when this returns; none when it fails.

@@ -1,10 +1,9 @@
-#include <csignal>
 #include <filesystem>
 #include <fstream>
-#include <sys/resource.h>
 #include <unistd.h>
 
 #include "gdal_peer.h"
+#include "support/file_size_limit.h"
 #include "support/sample_data.h"
 #include "support/temporary_directory.h"
 
@@ -203,25 +202,6 @@ TEST(GdalFaults, ReadingChangesNothing) {
   EXPECT_EQ(NamesIn(directory.Path()).size(), 3U);
 }
 
-/// Lowers the size that files may have while it lives.
-class FileLimit {
- public:
-  explicit FileLimit(rlim_t bytes) {
-    handler_ = std::signal(SIGXFSZ, SIG_IGN);
-    getrlimit(RLIMIT_FSIZE, &before_);
-    const rlimit limit{bytes, before_.rlim_max};
-    setrlimit(RLIMIT_FSIZE, &limit);
-  }
-  ~FileLimit() {
-    setrlimit(RLIMIT_FSIZE, &before_);
-    std::signal(SIGXFSZ, handler_);
-  }
-
- private:
-  rlimit before_{};
-  void (*handler_)(int);
-};
-
 /// When the disk is full the older file stays, and nothing lies beside it.
 TEST(GdalFaults, AFullDiskLeavesTheOlderFile) {
   test::TemporaryDirectory directory;
@@ -238,7 +218,7 @@ TEST(GdalFaults, AFullDiskLeavesTheOlderFile) {
     std::string fault;
     testing::internal::CaptureStderr();
     {
-      const FileLimit limit(20000);
+      const test::FileSizeLimit limit(20000);
       auto made = CreateSource({path}, def);
       if (made && !NoiseFor(def).Write(*ReaderOf<std::uint8_t>(made))) fault = TakeFault().ToUTF8();
       fault += made ? Release(made) : TakeFault().ToUTF8();

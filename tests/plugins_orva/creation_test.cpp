@@ -1,8 +1,7 @@
-#include <csignal>
-#include <sys/resource.h>
 #include <unistd.h>
 
 #include "orva_scene.h"
+#include "support/file_size_limit.h"
 
 namespace lumo::test {
 namespace {
@@ -146,26 +145,6 @@ TEST(OrvaCreation, RefusesWhatItCanNotHold) {
   EXPECT_FALSE(CreateSource({directory.Path().string()}, def));
   EXPECT_NE(TakeFault().ToUTF8().find(": not a file"), std::string::npos);
 }
-
-/// Lets no file grow beyond a size, which is how a full disk looks, as long as it lives.
-class FileSizeLimit {
- public:
-  explicit FileSizeLimit(rlim_t bytes) : handler_(std::signal(SIGXFSZ, SIG_IGN)) {
-    getrlimit(RLIMIT_FSIZE, &before_);
-    const rlimit limit{bytes, before_.rlim_max};
-    EXPECT_EQ(setrlimit(RLIMIT_FSIZE, &limit), 0);
-  }
-  ~FileSizeLimit() {
-    setrlimit(RLIMIT_FSIZE, &before_);
-    std::signal(SIGXFSZ, handler_);
-  }
-  FileSizeLimit(const FileSizeLimit&) = delete;
-  FileSizeLimit& operator=(const FileSizeLimit&) = delete;
-
- private:
-  void (*handler_)(int);
-  rlimit before_{};
-};
 
 TEST(OrvaCreation, AFullDiskLeavesNoRasterAndTheOlderOne) {
   for (const bool hasOlder : {false, true}) {

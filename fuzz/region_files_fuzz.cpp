@@ -1,0 +1,65 @@
+// A region file: as attributes it opens or it doesn't, and as statistics; of one that opens any
+// value can be read and written, and it opens again as it was. The rest of the file stays.
+
+#include <cmath>
+#include <cstdint>
+#include <cstdlib>
+#include <fstream>
+#include <string>
+#include <utility>
+
+#include "fx/region_attribute_stats.h"
+#include "fx/region_kinds.h"
+#include "support/temporary_directory.h"
+
+namespace {
+
+using lumo::String;
+using lumo::URI;
+
+void Check(bool condition) {
+  if (!condition) std::abort();
+}
+
+template <typename File>
+void UseRegions(const URI& uri) {
+  const File readOnly(uri, false);
+  File store(uri, true);
+  Check(readOnly.IsValid() == store.IsValid());
+  if (!store.IsValid()) return;
+  const unsigned bands = store.Bands(), attributes = store.Attributes();
+  const unsigned regions = store.RegionCount();
+  const unsigned band = bands != 0 ? bands - 1 : 0;
+  store.RegionExists(regions, band);
+  store.Value(regions, band, 0) = 7.0F;
+  Check(std::as_const(store).Value(regions, band, 0) == 7.0F);
+  Check(store.Close());
+  File again(uri, true);
+  Check(again.IsValid() && again.Bands() == bands && again.Attributes() == attributes);
+  Check(std::as_const(again).Value(regions, band, 0) == 7.0F);
+}
+
+void UseStats(const URI& uri) {
+  lumo::RegionAttributeStatsFile<float> store(uri);
+  if (!store.IsValid()) return;
+  const unsigned band = store.Bands() - 1, attribute = store.Attributes() - 1;
+  if (store.Bands() == 0 || store.Attributes() == 0) return;
+  store.Count(band, attribute) = 3.0F;
+  Check(store.Close());
+  lumo::RegionAttributeStatsFile<float> again(uri);
+  Check(again.IsValid() && std::as_const(again).Count(band, attribute) == 3.0F);
+}
+
+}  // namespace
+
+extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
+  static const lumo::test::TemporaryDirectory directory;
+  const std::filesystem::path path = directory.Path() / "regions";
+  std::ofstream(path, std::ios::binary)
+      .write(reinterpret_cast<const char*>(data), static_cast<std::streamsize>(size));
+  const URI uri{String(path.string())};
+  UseRegions<lumo::RegionAttributesFile<float>>(uri);
+  UseRegions<lumo::SpectralRegionAttributesFile>(uri);
+  UseStats(uri);
+  return 0;
+}

@@ -1,0 +1,144 @@
+#pragma once
+
+#include "foundation/buffer.h"
+
+namespace lumo {
+
+/// A histogram of each attribute over all regions. Indexes are not checked. Threads: one at a time,
+/// for reading too.
+template <typename T>
+class RegionAttributeHistogram : public Object {
+ public:
+  static const unsigned TypeCode;
+
+  bool IsA(unsigned typeCode) const override {
+    return typeCode == TypeCode || Object::IsA(typeCode);
+  }
+
+  virtual unsigned Bands() const { return bands_; }
+  virtual unsigned Attributes() const { return attributes_; }
+  virtual unsigned Bins() const { return bins_; }
+
+  /// The lowest value of the first bin, to read and to write.
+  virtual const T& LowerLimit(unsigned band, unsigned attribute) const {
+    return limits_[LimitOf(band, attribute)];
+  }
+  virtual T& LowerLimit(unsigned band, unsigned attribute) {
+    return limits_[LimitOf(band, attribute)];
+  }
+  /// The lowest value of the last bin, to read and to write.
+  virtual const T& UpperLimit(unsigned band, unsigned attribute) const {
+    return limits_[LimitOf(band, attribute) + 1];
+  }
+  virtual T& UpperLimit(unsigned band, unsigned attribute) {
+    return limits_[LimitOf(band, attribute) + 1];
+  }
+  /// (upper - lower) / (bins - 1); of a single bin upper - lower + 1.
+  virtual T BinSize(unsigned band, unsigned attribute) const;
+
+  /// The number of values in a bin, to read and to write.
+  virtual const unsigned& Count(unsigned band, unsigned attribute, unsigned bin) const = 0;
+  virtual unsigned& Count(unsigned band, unsigned attribute, unsigned bin) = 0;
+
+ protected:
+  static constexpr unsigned kLimits = 2;  // lower, upper
+
+  RegionAttributeHistogram(unsigned bands, unsigned attributes, unsigned bins)
+      : bands_(bands), attributes_(attributes), bins_(bins) {}
+
+  /// Gives the limits room of their own, of zeros.
+  void OwnLimits();
+  /// Has the limits at `data`.
+  void PutLimits(T* data) { limits_ = Array<T>(data, ShapeOf(kLimits)); }
+  bool HasLimits() const { return limits_.IsValid() && limits_.GetCount() != 0; }
+
+  ArrayDims ShapeOf(unsigned values) const { return ArrayDims(bands_, attributes_, values); }
+  std::size_t PairOf(unsigned band, unsigned attribute) const {
+    return std::size_t{band} * (attributes_ != 0 ? attributes_ : 1) + attribute;
+  }
+
+ private:
+  std::size_t LimitOf(unsigned band, unsigned attribute) const {
+    return PairOf(band, attribute) * kLimits;
+  }
+
+  unsigned bands_;
+  unsigned attributes_;
+  unsigned bins_;
+  Array<T> limits_;
+};
+
+/// Histograms in memory. Valid when there was memory for them.
+template <typename T>
+class RegionAttributeHistogramMap final : public RegionAttributeHistogram<T> {
+  using Base = RegionAttributeHistogram<T>;
+
+ public:
+  static const unsigned TypeCode;
+
+  RegionAttributeHistogramMap(unsigned bands, unsigned attributes, unsigned bins);
+
+  bool IsA(unsigned typeCode) const override { return typeCode == TypeCode || Base::IsA(typeCode); }
+  bool IsValid() const override {
+    return Base::HasLimits() && counts_.IsValid() && Object::IsValid();
+  }
+
+  const unsigned& Count(unsigned band, unsigned attribute, unsigned bin) const override {
+    return counts_[PlaceOf(band, attribute, bin)];
+  }
+  unsigned& Count(unsigned band, unsigned attribute, unsigned bin) override {
+    return counts_[PlaceOf(band, attribute, bin)];
+  }
+
+ private:
+  std::size_t PlaceOf(unsigned band, unsigned attribute, unsigned bin) const {
+    return Base::PairOf(band, attribute) * Base::Bins() + bin;
+  }
+
+  Array<unsigned> counts_;
+};
+
+/// Histograms in a file of the form "FXAH50", see docs/file-formats.md, that is made here. Limits
+/// are written with the header. Valid as long as no error is stored; one that could not be made has
+/// no limits to look at.
+template <typename T>
+class RegionAttributeHistogramFile final : public RegionAttributeHistogram<T> {
+  using Base = RegionAttributeHistogram<T>;
+
+ public:
+  static const unsigned TypeCode;
+  static constexpr unsigned kBins = 256;
+  static constexpr unsigned kMostPairs = 8190;  ///< of band and attribute: the header holds no more
+
+  /// Creates a file. None is made of more than kMostPairs pairs.
+  RegionAttributeHistogramFile(const URI& uri, unsigned bands, unsigned attributes);
+
+  bool IsA(unsigned typeCode) const override { return typeCode == TypeCode || Base::IsA(typeCode); }
+  bool IsValid() const override { return isValid_ && buffer_.IsValid(); }
+
+  const unsigned& Count(unsigned band, unsigned attribute, unsigned bin) const override {
+    return buffer_.At(PlaceOf(band, attribute, bin));
+  }
+  unsigned& Count(unsigned band, unsigned attribute, unsigned bin) override {
+    return buffer_.Ref(PlaceOf(band, attribute, bin));
+  }
+
+  /// Completes the file and closes it; it has no valid header before. Limits can still be looked
+  /// at. @return false when it isn't whole on the disk; the error is stored, and TakeFault says
+  /// why.
+  bool Close();
+
+ private:
+  std::uint64_t PlaceOf(unsigned band, unsigned attribute, unsigned bin) const {
+    return std::uint64_t{Base::PairOf(band, attribute)} * kBins + bin;
+  }
+
+  mutable Buffer<unsigned> buffer_;
+  bool isValid_ = false;
+};
+
+extern template class VEXG_EXPORT RegionAttributeHistogram<float>;
+extern template class VEXG_EXPORT RegionAttributeHistogramMap<float>;
+extern template class VEXG_EXPORT RegionAttributeHistogramFile<float>;
+
+}  // namespace lumo
