@@ -256,7 +256,7 @@ void LogFault(const MdfReader& reader, const String& path, const std::string* me
   MetadataParseLog& log = MetadataParseLog::Instance();
   constexpr unsigned kLevel = MetadataParseLog::kErrors;
   log.Write(kLevel, message != nullptr ? "MDF Parsing Error, Invalid entry:\n"
-                                       : "MDF Parsing Error, Invalid entry (unknown exception):\n");
+                                       : "MDF Parsing Error, Invalid entry (unknown exception):");
   log.Write(kLevel, "   file:              %s \n", path.ToUTF8().c_str());
   for (const std::u16string& line : reader.KeptLines()) {
     log.Write(kLevel, "   preceding lines    %s \n", platform::Utf16ToUtf8(line).c_str());

@@ -1,10 +1,13 @@
 """Warping, beside gdalwarp on the same grid."""
 
+import array
+import re
 import shutil
+import struct
 import subprocess
 import unittest
 
-from support import DATA, FolderTest, gdal_pixels, needs_data, needs_gdal, write_orva
+from support import DATA, FolderTest, gdal_pixels, needs_data, needs_gdal, read_npy, write_orva
 
 
 @needs_data
@@ -27,6 +30,40 @@ class Warp(FolderTest):
                     self.fine("warp", self.scene, made, "--to", grid, "--method", "rigorous", "--resampling", ours,
                               "--overwrite")
                     self.assertEqual(gdal_pixels(made), gdal_pixels(grid))
+
+    def write_positions(self):
+        """A raster on the scene's grid whose bands are the sample and the line of each pixel."""
+        flat = self.folder / "flat.dat"
+        self.fine("copy", self.scene, flat)
+        places = re.findall(r"^(?:georeference|coordinate system string) = .*\n", (self.folder / "flat.dat.hdr").read_text(),
+                            re.MULTILINE)
+        pixels = array.array("d", (number for line in range(352) for sample in range(349) for number in (sample, line)))
+        return write_orva(self.folder / "places.dat", 349, 352, 2, pixels.tobytes(), "Double", "".join(places))
+
+    @unittest.skipUnless(shutil.which("gdaltransform"), "needs gdaltransform")
+    def test_positions_are_those_of_gdaltransform(self):
+        source = self.write_positions()
+        for method, error in (("rigorous", 1e-3), ("polynomial", 0.5)):
+            made = self.folder / f"{method}.tif"
+            self.fine("warp", source, made, "--to", "EPSG:4326", "--method", method, "--resampling", "linear",
+                      "--no-data", "-1")
+            self.fine("read", made, "--interleave", "bip", "-o", self.folder / "made.npy", "--overwrite")
+            kind, shape, data = read_npy(self.folder / "made.npy")
+            self.assertEqual((kind, shape[-1]), ("<f8", 2))
+            found = list(struct.iter_unpack("<dd", data))
+            width = shape[1]
+            points = [at for at in range(0, len(found), 13) if found[at][0] >= 0]
+            self.assertGreater(len(points), 8000)
+            asked = "".join(f"{at % width + 0.5} {at // width + 0.5}\n" for at in points)
+            told = subprocess.run(["gdaltransform", "-i", self.scene, made], input=asked, text=True, capture_output=True,
+                                  check=True).stdout
+            worst = 0.0
+            for at, line in zip(points, told.splitlines(), strict=True):
+                sample, row, _ = map(float, line.split())
+                # Along the border the pixel that isn't there has no weight.
+                if 0.5 <= sample <= 348.5 and 0.5 <= row <= 351.5:
+                    worst = max(worst, abs(found[at][0] + 0.5 - sample), abs(found[at][1] + 0.5 - row))
+            self.assertLess(worst, error, method)
 
     @needs_gdal
     @unittest.skipUnless(shutil.which("gdalwarp"), "needs gdalwarp")
