@@ -192,7 +192,8 @@ TEST(MetadataTranslator, LogsWhatItMade) {
   test::gParseLog.Take();
   MetadataContainer target;
   ASSERT_TRUE(TranslateInto(target, Entry("/s", "/d", "INT", "cnt=1"), {{"/s", "5"}}));
-  const std::string rule = std::string(84, '=') + "\n";
+  std::string rule(84, '=');
+  rule += '\n';
   EXPECT_EQ(test::gParseLog.Take(),
             rule +
                 "*** Translating string collection, using the mdf file, into data "

@@ -31,7 +31,7 @@ SubRect RandomRect(std::mt19937& random, const RasterDef& def) {
     unsigned first = random() % size, last = random() % size;
     if (random() % 3 == 0) first = 0;
     if (random() % 3 == 0) last = size - 1;
-    return std::minmax(first, last);
+    return std::minmax({first, last});
   };
   const auto [left, right] = side(def.samples);
   const auto [top, bottom] = side(def.lines);

@@ -277,8 +277,7 @@ TEST(Shapefile, RefusesWhatIsNoShape) {
 TEST(Shapefile, BrokenFilesFailWithWordsAndSilently) {
   test::TemporaryDirectory directory;
   const std::string path = (directory.Path() / "made.shp").string();
-  std::vector<std::string> shapes;
-  for (int i = 0; i < 100; ++i) shapes.push_back("POLYGON((1 1,1 2,2 2,3 1,1 1))");
+  const std::vector<std::string> shapes(100, "POLYGON((1 1,1 2,2 2,3 1,1 1))");
   ASSERT_NO_FATAL_FAILURE(MakeShapes(path, wkbPolygon, shapes));
   std::ifstream in(path, std::ios::binary);
   const std::string whole{std::istreambuf_iterator<char>(in), std::istreambuf_iterator<char>()};
