@@ -221,14 +221,14 @@ def warp(bench):
         scene = bench.scene(type_name, "tiled")
         grid, made, theirs = (bench.work / name for name in ("grid.tif", "warped.tif", "gdal-warped.tif"))
         subprocess.run(["gdalwarp", "-q", "-overwrite", "-t_srs", "EPSG:4326", scene, grid], check=True)
-        for threads in ("all", "one"):
-            vexg = [bench.vexg] if threads == "all" else ["env", "LUMO_THREADS_HINT=1", bench.vexg]
-            peer = ["-multi", "-wo", "NUM_THREADS=ALL_CPUS"] if threads == "all" else []
+        for threads in ("all threads", "one thread"):
+            vexg = [bench.vexg] if threads == "all threads" else ["env", "LUMO_THREADS_HINT=1", bench.vexg]
+            peer = ["-multi", "-wo", "NUM_THREADS=ALL_CPUS"] if threads == "all threads" else []
             for method, error, of_method in (("polynomial", [], aims), ("rigorous", ["-et", "0"], {"bilinear": 0.7})):
                 for resampling, word in words.items():
                     command = ["gdalwarp", "-q", "-overwrite", "-t_srs", "EPSG:4326", "-r", resampling, *error, *peer,
                                scene, theirs]
-                    bench.compare(f"warp {type_name} {method} {word}, {threads} threads",
+                    bench.compare(f"warp {type_name} {method} {word}, {threads}",
                                   [*vexg, "warp", scene, made, "--to", grid, "--method", method, "--resampling",
                                    word, "--overwrite", "-q"],
                                   {"gdalwarp": command}, {"gdalwarp": of_method.get(resampling)})
