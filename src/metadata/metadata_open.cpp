@@ -15,7 +15,12 @@ namespace {
 /// Writes the line to the log.
 template <typename... Values>
 bool Fail(const char* format, Values... values) {
-  MetadataParseLog::Instance().Write(MetadataParseLog::kErrors, format, values...);
+  MetadataParseLog& log = MetadataParseLog::Instance();
+  if constexpr (sizeof...(values) == 0) {
+    log.Write(MetadataParseLog::kErrors, "%s", format);
+  } else {
+    log.Write(MetadataParseLog::kErrors, format, values...);
+  }
   return false;
 }
 

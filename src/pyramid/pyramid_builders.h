@@ -81,7 +81,7 @@ class AsyncOrvaPyramidBuilder final : public PyramidBuilder {
 
   bool Open(Rasters& rasters);
   bool MakeLevels(const Rasters& rasters);
-  bool MakeHistogram(const Rasters& rasters) requires(std::is_arithmetic_v<T>);
+  bool MakeHistogram(const Rasters& rasters);
   IPC Share(double weight) const;
 
   DynamicRasterPyramid<T>& owner_;

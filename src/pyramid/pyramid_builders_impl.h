@@ -130,9 +130,7 @@ void AsyncOrvaPyramidBuilder<T>::Execute() {
   if (!MakeLevels(rasters)) return Fail("the levels could not be made");
   if (IsAborted()) return;
   if (!rasters.full->PyramidRefresh()) return Fail("the levels are not whole");
-  if constexpr (std::is_arithmetic_v<T>) {
-    if (!MakeHistogram(rasters)) return Fail("the histogram of a level could not be counted");
-  }
+  if (!MakeHistogram(rasters)) return Fail("the histogram of a level could not be counted");
 }
 
 /// Writes the levels; with them, or behind them, the statistics. True as well after an abort.
@@ -159,33 +157,36 @@ bool AsyncOrvaPyramidBuilder<T>::MakeLevels(const Rasters& rasters) {
 
 /// Counts a histogram of a small level, and leaves the owner with it and with the statistics.
 template <typename T>
-bool AsyncOrvaPyramidBuilder<T>::MakeHistogram(const Rasters& rasters) requires(
-    std::is_arithmetic_v<T>) {
-  const unsigned number = ChooseHistogramLevel(rasters.full->Samples(), rasters.full->Lines(),
-                                               order_.def.levelMin, order_.def.levelMax);
-  const bool isStored = number != 0 || order_.def.levelMin == 0;
-  const RasterPtr<T> level = isStored ? rasters.full->PyramidLevel(number) : rasters.full;
-  if (!level || !level->IsValid()) return false;
+bool AsyncOrvaPyramidBuilder<T>::MakeHistogram(const Rasters& rasters) {
+  if constexpr (std::is_arithmetic_v<T>) {
+    const unsigned number = ChooseHistogramLevel(rasters.full->Samples(), rasters.full->Lines(),
+                                                 order_.def.levelMin, order_.def.levelMax);
+    const bool isStored = number != 0 || order_.def.levelMin == 0;
+    const RasterPtr<T> level = isStored ? rasters.full->PyramidLevel(number) : rasters.full;
+    if (!level || !level->IsValid()) return false;
 
-  level->SetStatsMode(StatsMode::kBasic);
-  const IPC apart(GetIPC().abort, ProgressReportPtr(new StandardProgressReport));
-  const unsigned bands = level->Bands();
-  Array<double> binSizes{ArrayDims(bands)};
-  Array<T> mins{ArrayDims(bands)}, maxes{ArrayDims(bands)};
-  for (unsigned band = 0; band < bands; ++band) {
-    mins[band] = level->Min(band, apart);
-    maxes[band] = level->Max(band, apart);
-    constexpr double kBins = 255;
-    const double range = static_cast<double>(maxes[band]) - static_cast<double>(mins[band]);
-    binSizes[band] = mins[band] != maxes[band] ? std::ceil(range / kBins) : 1.0;
+    level->SetStatsMode(StatsMode::kBasic);
+    const IPC apart(GetIPC().abort, ProgressReportPtr(new StandardProgressReport));
+    const unsigned bands = level->Bands();
+    Array<double> binSizes{ArrayDims(bands)};
+    Array<T> mins{ArrayDims(bands)}, maxes{ArrayDims(bands)};
+    for (unsigned band = 0; band < bands; ++band) {
+      mins[band] = level->Min(band, apart);
+      maxes[band] = level->Max(band, apart);
+      constexpr double kBins = 255;
+      const double range = static_cast<double>(maxes[band]) - static_cast<double>(mins[band]);
+      binSizes[band] = mins[band] != maxes[band] ? std::ceil(range / kBins) : 1.0;
+    }
+    if (IsAborted()) return true;
+    const RasterHistogramPtr<T> histogram(
+        new RasterHistogram<T>(bands, binSizes, mins, maxes, HistogramSign::kBoth));
+    const RasterIteratorPtr<T> blocks(new RasterIteratorStream<T>(level));
+    detail::BuildResults<T> results(owner_);
+    RasterHistogramCallbackProcess<T> counting(blocks, histogram, stats_, &results, Share(1));
+    return counting.RunProcess(counting.kHere);
+  } else {
+    return rasters.full->IsValid();  // complex pixels have none
   }
-  if (IsAborted()) return true;
-  const RasterHistogramPtr<T> histogram(
-      new RasterHistogram<T>(bands, binSizes, mins, maxes, HistogramSign::kBoth));
-  const RasterIteratorPtr<T> blocks(new RasterIteratorStream<T>(level));
-  detail::BuildResults<T> results(owner_);
-  RasterHistogramCallbackProcess<T> counting(blocks, histogram, stats_, &results, Share(1));
-  return counting.RunProcess(counting.kHere);
 }
 
 }  // namespace lumo
