@@ -16,12 +16,8 @@ bool BasicBuffer::IsA(unsigned typeCode) const {
 
 BasicBuffer::BasicBuffer(const String& path, const ArrayDims& dims, unsigned pageSize, Mode mode,
                          unsigned headerSize, unsigned elementSize)
-    : dims_(dims),
-      pageSize_(std::max(pageSize, 1U)),
-      mode_(mode),
-      elementSize_(elementSize),
-      headerSize_(headerSize) {
-  Allocate();
+    : dims_(dims), pageSize_(std::max(pageSize, 1U)), mode_(mode), elementSize_(elementSize) {
+  Allocate(headerSize);
   if (!HasError()) OpenFile(path.ToUTF8());
   if (!HasError()) ReadHeader();
 }
@@ -36,11 +32,13 @@ bool BasicBuffer::Fail(const ObjectErrorState& error, const std::string& why) {
   return false;
 }
 
-bool BasicBuffer::FailClosed() {
-  return Fail(ObjectErrorIO(), "the file of a buffer is not open");
+/// True when no error is stored and the file is open.
+bool BasicBuffer::IsReady() {
+  if (HasError()) return false;
+  return file_ != nullptr || Fail(ObjectErrorIO(), "the file of a buffer is not open");
 }
 
-void BasicBuffer::Allocate() {
+void BasicBuffer::Allocate(std::size_t headerSize) {
   const std::size_t elements = std::size_t{pageSize_} + 2 * std::size_t{kMargin};
   window_.reset(new (std::nothrow) unsigned char[elements * elementSize_]);
   if (!window_) {
@@ -48,7 +46,7 @@ void BasicBuffer::Allocate() {
     return;
   }
   try {
-    header_.assign(headerSize_, 0);
+    header_.assign(headerSize, 0);
   } catch (const std::bad_alloc&) {
     Fail(BufferErrorBadHeader(), "there is no memory for the header of a buffer");
   }
@@ -69,8 +67,7 @@ void BasicBuffer::OpenFile(const std::string& path) {
 }
 
 bool BasicBuffer::ReadHeader() {
-  if (HasError()) return false;
-  if (!file_) return FailClosed();
+  if (!IsReady()) return false;
   if (headerIsAway_ && !knownHeader_.empty()) {
     std::copy(knownHeader_.begin(), knownHeader_.end(), header_.begin());
     return true;
@@ -87,8 +84,7 @@ bool BasicBuffer::ReadHeader() {
 }
 
 bool BasicBuffer::WriteHeader() {
-  if (HasError()) return false;
-  if (!file_) return FailClosed();
+  if (!IsReady()) return false;
   if (mode_ == kReadOnly) {
     SetErrorState(BufferWarningReadOnly());
     return false;
@@ -118,9 +114,13 @@ bool BasicBuffer::TakeHeaderAway() {
   return true;
 }
 
+void BasicBuffer::ForgetChanges() {
+  changedFrom_ = UINT64_MAX;
+  changedTo_ = 0;
+}
+
 bool BasicBuffer::Flush() {
-  if (HasError()) return false;
-  if (!file_) return FailClosed();
+  if (!IsReady()) return false;
   if (mode_ == kReadOnly) {
     SetErrorState(BufferWarningReadOnly());
     return true;
@@ -133,8 +133,7 @@ bool BasicBuffer::Flush() {
                     bytes, &why)) {
     return Fail(ObjectErrorIO(), why);
   }
-  changedFrom_ = UINT64_MAX;
-  changedTo_ = 0;
+  ForgetChanges();
   countIsStale_ = true;
   return true;
 }
@@ -150,8 +149,7 @@ bool BasicBuffer::MoveTo(std::uint64_t index) {
   }
   windowStart_ = pageStart > kMargin ? pageStart - kMargin : 0;
   windowCount_ = pageStart + reach - windowStart_;
-  changedFrom_ = UINT64_MAX;
-  changedTo_ = 0;
+  ForgetChanges();
   if (LoadWindow()) return true;
   windowCount_ = 0;
   return false;
@@ -169,7 +167,6 @@ bool BasicBuffer::LoadWindow() {
 }
 
 std::uint64_t BasicBuffer::Count() {
-  count_ = countIsStale_ ? 0 : count_;
   if (!Flush()) return 0;
   if (!countIsStale_) return count_;
   std::string why;

@@ -89,11 +89,12 @@ class VEXG_EXPORT BasicBuffer : public Object {
 
  private:
   bool Fail(const ObjectErrorState& error, const std::string& why);
-  bool FailClosed();
-  void Allocate();
+  bool IsReady();
+  void Allocate(std::size_t headerSize);
   void OpenFile(const std::string& path);
   bool LoadWindow();
   bool TakeHeaderAway();
+  void ForgetChanges();
   bool HeaderIsDue() const { return headerIsAway_ || header_ != knownHeader_; }
   std::uint64_t PlaceOf(std::uint64_t index) const { return header_.size() + index * elementSize_; }
 
@@ -101,7 +102,6 @@ class VEXG_EXPORT BasicBuffer : public Object {
   const unsigned pageSize_ = kPageSize;
   const Mode mode_ = kReadOnly;
   const unsigned elementSize_;
-  const std::size_t headerSize_ = 0;
   std::unique_ptr<platform::RandomAccessFile> file_;
   std::vector<unsigned char> header_;
   std::vector<unsigned char> knownHeader_;  // as it was read or written last; empty of a new file
@@ -128,9 +128,9 @@ class VEXG_EXPORT BasicBuffer : public Object {
 ///
 /// Threads: one at a time.
 /// Failure: BufferErrorBadBuffer or BufferErrorBadHeader when there is no memory, ObjectErrorIO
-/// when
-///          the file can't be opened, read or written. Nothing is done under an error. References
-///          that Ref and At give then lead to an element of no file, which is 0 at first.
+///          when the file can't be opened, read or written. Nothing is done under an error.
+///          References that Ref and At give then lead to an element of no file, which is 0 at
+///          first.
 template <typename T>
 class Buffer final : public BasicBuffer {
   static_assert(std::is_trivially_copyable_v<T> && alignof(T) <= alignof(std::max_align_t));

@@ -2,7 +2,6 @@
 
 #include "foundation/fault.h"
 #include "foundation/type_code.h"
-#include "fx/store_header.h"
 
 namespace lumo {
 namespace {
@@ -10,8 +9,8 @@ namespace {
 constexpr std::string_view kMark = "FXAH50";
 constexpr std::size_t kLimitsAt = 12;  // in the header
 
-bool Fits(const URI& uri, unsigned bands, unsigned attributes, unsigned most) {
-  if (!detail::FitsStoreHeader(uri, {bands, attributes})) return false;
+/// True when the header has room for the limits. Else the fault names the file.
+bool HasRoom(const URI& uri, unsigned bands, unsigned attributes, unsigned most) {
   const std::uint64_t pairs = std::uint64_t{bands} * attributes;
   if (pairs <= most) return true;
   SetFault(String(uri.ToUTF8() + ": a file holds histograms of " + std::to_string(most) +
@@ -56,20 +55,10 @@ template <typename T>
 RegionAttributeHistogramFile<T>::RegionAttributeHistogramFile(const URI& uri, unsigned bands,
                                                               unsigned attributes)
     : Base(bands, attributes, kBins),
-      buffer_(Fits(uri, bands, attributes, kMostPairs)
-                  ? Buffer<unsigned>(uri, ArrayDims(bands, attributes, kBins))
-                  : Buffer<unsigned>()) {
-  if (buffer_.Header().empty()) return;
-  detail::WriteStoreHeader(buffer_.Header(), kMark, {bands, attributes, kBins});
-  Base::PutLimits(reinterpret_cast<T*>(&buffer_.Header()[kLimitsAt]));
-  isValid_ = true;
-}
-
-template <typename T>
-bool RegionAttributeHistogramFile<T>::Close() {
-  const bool isWhole = buffer_.Close() && isValid_;
-  this->SetErrorState(buffer_);
-  return isWhole;
+      file_(uri, kMark, {bands, attributes, kBins}, ArrayDims(bands, attributes, kBins),
+            BasicBuffer::kPageSize, HasRoom(uri, bands, attributes, kMostPairs)) {
+  const std::span<unsigned char> header = file_.Elements().Header();
+  if (!header.empty()) Base::PutLimits(reinterpret_cast<T*>(&header[kLimitsAt]));
 }
 
 template class RegionAttributeHistogram<float>;

@@ -1,13 +1,13 @@
 #pragma once
 
-#include "foundation/buffer.h"
+#include "fx/store_file.h"
 
 namespace lumo {
 
 /// A histogram of each attribute over all regions. Indexes are not checked. Threads: one at a time,
 /// for reading too.
 template <typename T>
-class RegionAttributeHistogram : public Object {
+class RegionAttributeHistogram : public AttributeTable {
  public:
   static const unsigned TypeCode;
 
@@ -15,8 +15,6 @@ class RegionAttributeHistogram : public Object {
     return typeCode == TypeCode || Object::IsA(typeCode);
   }
 
-  virtual unsigned Bands() const { return bands_; }
-  virtual unsigned Attributes() const { return attributes_; }
   virtual unsigned Bins() const { return bins_; }
 
   /// The lowest value of the first bin, to read and to write.
@@ -44,7 +42,7 @@ class RegionAttributeHistogram : public Object {
   static constexpr unsigned kLimits = 2;  // lower, upper
 
   RegionAttributeHistogram(unsigned bands, unsigned attributes, unsigned bins)
-      : bands_(bands), attributes_(attributes), bins_(bins) {}
+      : AttributeTable(bands, attributes), bins_(bins) {}
 
   /// Gives the limits room of their own, of zeros.
   void OwnLimits();
@@ -52,18 +50,13 @@ class RegionAttributeHistogram : public Object {
   void PutLimits(T* data) { limits_ = Array<T>(data, ShapeOf(kLimits)); }
   bool HasLimits() const { return limits_.IsValid() && limits_.GetCount() != 0; }
 
-  ArrayDims ShapeOf(unsigned values) const { return ArrayDims(bands_, attributes_, values); }
-  std::size_t PairOf(unsigned band, unsigned attribute) const {
-    return std::size_t{band} * (attributes_ != 0 ? attributes_ : 1) + attribute;
-  }
+  ArrayDims ShapeOf(unsigned values) const { return ArrayDims(Bands(), Attributes(), values); }
 
  private:
   std::size_t LimitOf(unsigned band, unsigned attribute) const {
     return PairOf(band, attribute) * kLimits;
   }
 
-  unsigned bands_;
-  unsigned attributes_;
   unsigned bins_;
   Array<T> limits_;
 };
@@ -92,7 +85,7 @@ class RegionAttributeHistogramMap final : public RegionAttributeHistogram<T> {
 
  private:
   std::size_t PlaceOf(unsigned band, unsigned attribute, unsigned bin) const {
-    return Base::PairOf(band, attribute) * Base::Bins() + bin;
+    return this->PairOf(band, attribute) * Base::Bins() + bin;
   }
 
   Array<unsigned> counts_;
@@ -114,27 +107,24 @@ class RegionAttributeHistogramFile final : public RegionAttributeHistogram<T> {
   RegionAttributeHistogramFile(const URI& uri, unsigned bands, unsigned attributes);
 
   bool IsA(unsigned typeCode) const override { return typeCode == TypeCode || Base::IsA(typeCode); }
-  bool IsValid() const override { return isValid_ && buffer_.IsValid(); }
+  bool IsValid() const override { return file_.IsValid(); }
 
   const unsigned& Count(unsigned band, unsigned attribute, unsigned bin) const override {
-    return buffer_.At(PlaceOf(band, attribute, bin));
+    return file_.Elements().At(PlaceOf(band, attribute, bin));
   }
   unsigned& Count(unsigned band, unsigned attribute, unsigned bin) override {
-    return buffer_.Ref(PlaceOf(band, attribute, bin));
+    return file_.Elements().Ref(PlaceOf(band, attribute, bin));
   }
 
-  /// Completes the file and closes it; it has no valid header before. Limits can still be looked
-  /// at. @return false when it isn't whole on the disk; the error is stored, and TakeFault says
-  /// why.
-  bool Close();
+  /// Completes the file and closes it; see StoreFile. Limits can still be looked at.
+  bool Close() { return file_.Close(*this); }
 
  private:
   std::uint64_t PlaceOf(unsigned band, unsigned attribute, unsigned bin) const {
-    return std::uint64_t{Base::PairOf(band, attribute)} * kBins + bin;
+    return this->PairOf(band, attribute) * kBins + bin;
   }
 
-  mutable Buffer<unsigned> buffer_;
-  bool isValid_ = false;
+  mutable StoreFile<unsigned> file_;
 };
 
 extern template class VEXG_EXPORT RegionAttributeHistogram<float>;

@@ -4,7 +4,6 @@
 #include <new>
 
 #include "foundation/type_code.h"
-#include "fx/store_header.h"
 
 namespace lumo {
 namespace {
@@ -30,9 +29,7 @@ void RegionAttributesMap<T>::Find(unsigned region) const {
   try {
     auto at = records_.lower_bound(region);
     if (at == records_.end() || at->first != region) {
-      const std::size_t count =
-          std::size_t{Base::Extent(Base::Bands())} * Base::Extent(Base::Attributes());
-      at = records_.emplace_hint(at, region, std::make_unique<T[]>(count));
+      at = records_.emplace_hint(at, region, std::make_unique<T[]>(this->Pairs()));
     }
     last_ = at->second.get();
   } catch (const std::bad_alloc&) {
@@ -57,54 +54,25 @@ Array<unsigned> RegionAttributesMap<T>::GetRegions() const {
 template <typename T>
 RegionAttributesFile<T>::RegionAttributesFile(const URI& uri, bool writable)
     : Base(0, 0),
-      buffer_(uri, kPageSize, writable ? BasicBuffer::kReadWrite : BasicBuffer::kReadOnly) {
-  const auto counts = detail::ReadStoreHeader(buffer_, kMark);
-  if (!counts) {
-    buffer_.Close();
-    return;
-  }
-  TakeCounts(counts->bands, counts->attributes);
+      file_(uri, kMark, kPageSize, writable ? BasicBuffer::kReadWrite : BasicBuffer::kReadOnly) {
+  this->SetCounts(file_.Counts().bands, file_.Counts().attributes);
 }
 
 template <typename T>
 RegionAttributesFile<T>::RegionAttributesFile(const URI& uri, unsigned bands, unsigned attributes)
-    : Base(0, 0),
-      buffer_(detail::FitsStoreHeader(uri, {bands, attributes})
-                  ? Buffer<T>(uri, ArrayDims(1, Base::Extent(bands), Base::Extent(attributes)),
-                              kPageSize)
-                  : Buffer<T>()) {
-  if (buffer_.Header().empty()) return;
-  detail::WriteStoreHeader(buffer_.Header(), kMark, {bands, attributes});
-  TakeCounts(bands, attributes);
-}
-
-template <typename T>
-void RegionAttributesFile<T>::TakeCounts(unsigned bands, unsigned attributes) {
-  Base::SetCounts(bands, attributes);
-  bandExtent_ = Base::Extent(bands);
-  attributeExtent_ = Base::Extent(attributes);
-  isValid_ = true;
-}
+    : Base(bands, attributes),
+      file_(uri, kMark, {bands, attributes}, ArrayDims(1, bands, attributes), kPageSize) {}
 
 template <typename T>
 void RegionAttributesFile<T>::Require(unsigned bands, unsigned attributes) {
-  if (bands == Base::Bands() && attributes == Base::Attributes()) return;
-  isValid_ = false;
-  buffer_.Close();
+  if (bands != Base::Bands() || attributes != Base::Attributes()) file_.Refuse();
 }
 
 template <typename T>
 unsigned RegionAttributesFile<T>::RegionCount() {
   if (Base::Bands() == 0 || Base::Attributes() == 0) return 0;
   return static_cast<unsigned>(
-      std::min<std::uint64_t>(buffer_.Count() / (bandExtent_ * attributeExtent_), UINT32_MAX));
-}
-
-template <typename T>
-bool RegionAttributesFile<T>::Close() {
-  const bool isWhole = buffer_.Close() && isValid_;
-  this->SetErrorState(buffer_);
-  return isWhole;
+      std::min<std::uint64_t>(file_.Elements().Count() / this->Pairs(), UINT32_MAX));
 }
 
 template class RegionAttributes<float>;

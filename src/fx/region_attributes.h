@@ -3,18 +3,18 @@
 #include <map>
 #include <memory>
 
-#include "foundation/buffer.h"
+#include "fx/store_file.h"
 
 namespace lumo {
 
 /// Values for each region, band and attribute. A region is a segment of a label raster, and its
 /// label is its index here. The last attribute of a band tells whether the region is there.
 ///
-/// Bands and attributes are not checked; a store with 0 of them keeps as many values as one with 1.
+/// Bands and attributes are not checked.
 ///
 /// Threads: one at a time, for reading too.
 template <typename T>
-class RegionAttributes : public Object {
+class RegionAttributes : public AttributeTable {
  public:
   static const unsigned TypeCode;
 
@@ -22,15 +22,12 @@ class RegionAttributes : public Object {
     return typeCode == TypeCode || Object::IsA(typeCode);
   }
 
-  virtual unsigned Bands() const { return bands_; }
-  virtual unsigned Attributes() const { return attributes_; }
-
   /// Regions in the store: those of a map, or the records of a file.
   virtual unsigned RegionCount() = 0;
 
   /// True when the last attribute of the band is at least 1.
   virtual bool RegionExists(unsigned region, unsigned band) const {
-    return Value(region, band, Extent(attributes_) - 1) >= T{1};
+    return Value(region, band, static_cast<unsigned>(AttributeExtent()) - 1) >= T{1};
   }
 
   /// The value to read.
@@ -42,18 +39,7 @@ class RegionAttributes : public Object {
   virtual void Clear() = 0;
 
  protected:
-  RegionAttributes(unsigned bands, unsigned attributes) : bands_(bands), attributes_(attributes) {}
-
-  static unsigned Extent(unsigned count) { return count != 0 ? count : 1; }
-
-  void SetCounts(unsigned bands, unsigned attributes) {
-    bands_ = bands;
-    attributes_ = attributes;
-  }
-
- private:
-  unsigned bands_;
-  unsigned attributes_;
+  using AttributeTable::AttributeTable;
 };
 
 /// Regions in memory: those that were touched so far, by reading too. Always valid; a region for
@@ -88,7 +74,7 @@ class RegionAttributesMap : public RegionAttributes<T> {
     // Neighbouring pixels mostly are of one region.
     if (last_ == nullptr || region != lastRegion_) Find(region);
     if (last_ == nullptr) return nowhere_ = T();
-    return last_[band * Base::Extent(Base::Attributes()) + attribute];
+    return last_[this->PairOf(band, attribute)];
   }
   void Find(unsigned region) const;
 
@@ -109,29 +95,27 @@ class RegionAttributesFile : public RegionAttributes<T> {
 
  public:
   static const unsigned TypeCode;
-  static constexpr unsigned kPageSize = 16384;   ///< elements
-  static constexpr unsigned kMostCount = 65535;  ///< bands, or attributes
+  static constexpr unsigned kPageSize = 16384;  ///< elements
 
   /// Opens a file.
   RegionAttributesFile(const URI& uri, bool writable);
-  /// Creates a file. Of more than kMostCount bands or attributes none is made.
+  /// Creates a file. Of more than 65,535 bands or attributes none is made.
   RegionAttributesFile(const URI& uri, unsigned bands, unsigned attributes);
 
   bool IsA(unsigned typeCode) const override { return typeCode == TypeCode || Base::IsA(typeCode); }
-  bool IsValid() const override { return isValid_ && buffer_.IsValid(); }
+  bool IsValid() const override { return file_.IsValid(); }
 
   unsigned RegionCount() final;
   const T& Value(unsigned region, unsigned band, unsigned attribute) const final {
-    return buffer_.At(PlaceOf(region, band, attribute));
+    return file_.Elements().At(PlaceOf(region, band, attribute));
   }
   T& Value(unsigned region, unsigned band, unsigned attribute) final {
-    return buffer_.Ref(PlaceOf(region, band, attribute));
+    return file_.Elements().Ref(PlaceOf(region, band, attribute));
   }
   void Clear() final {}
 
-  /// Completes the file and closes it. A file that was written has no valid header before.
-  /// @return false when it isn't whole on the disk; the error is stored, and TakeFault says why.
-  bool Close();
+  /// Completes the file and closes it; see StoreFile.
+  bool Close() { return file_.Close(*this); }
 
  protected:
   /// Makes a file that was opened not valid unless it has these counts.
@@ -139,14 +123,10 @@ class RegionAttributesFile : public RegionAttributes<T> {
 
  private:
   std::uint64_t PlaceOf(unsigned region, unsigned band, unsigned attribute) const {
-    return (std::uint64_t{region} * bandExtent_ + band) * attributeExtent_ + attribute;
+    return region * this->Pairs() + this->PairOf(band, attribute);
   }
-  void TakeCounts(unsigned bands, unsigned attributes);
 
-  mutable Buffer<T> buffer_;
-  std::uint64_t bandExtent_ = 1;
-  std::uint64_t attributeExtent_ = 1;
-  bool isValid_ = false;
+  mutable StoreFile<T> file_;
 };
 
 extern template class VEXG_EXPORT RegionAttributes<float>;

@@ -11,8 +11,8 @@ namespace lumo::test {
 class TemporaryDirectory {
  public:
   TemporaryDirectory() {
-    // mkdtemp replaces the X's at the end by a name of its own.
-    std::string pattern = (std::filesystem::temp_directory_path() / "vexg-test-XXXXXX").string();
+    std::string pattern = (std::filesystem::temp_directory_path() / "vexg-test-").string();
+    pattern.append(6, 'X');  // in whose place mkdtemp puts a name of its own
     if (mkdtemp(pattern.data()) == nullptr) throw std::runtime_error("no temporary directory");
     path_ = pattern;
   }

@@ -102,9 +102,9 @@ void RefuseUseless(const Options& options) {
 void RefuseMissing(const Options& options) {
   const auto need = [&](const char* option, bool given) {
     if (given) return;
-    const char* const why = options.metadata.empty() ? "{1}: {2} needs it"
-                                                     : "{0}: it doesn't tell {1}, which {2} needs";
-    Refuse(fmt::format(fmt::runtime(why), options.metadata, option, options.quantity));
+    Refuse(options.metadata.empty() ? fmt::format("{}: {} needs it", option, options.quantity)
+                                    : fmt::format("{}: it doesn't tell {}, which {} needs",
+                                                  options.metadata, option, options.quantity));
   };
   for (const BandConstant& constant : BandConstants(options.quantity)) {
     need(constant.option, !(options.*constant.values).empty());
