@@ -37,13 +37,22 @@ struct ValueKindText {
 };
 VEXG_EXPORT ValueKindText Describe(ValueKind kind);
 
+/// Gives the words that an input takes; an unknown word reads as the first of them, unless the
+/// enumeration names another value for it. See WordsIn in value_text.h.
+using WordsFunction = std::vector<const char*> (*)();
+
 /// One input of a command. Texts are single lines.
+///
+/// An input whose first word is "Told" chooses between the form of a result that has always been
+/// given and a better one. Without the input the told form is given; the verbs of the command line
+/// ask for the better one. The reference document lists these inputs in one table.
 struct InputDeclaration {
   const char* name;
   Presence presence;
   ValueKind kind;
   const char* meaning;
-  const char* unit = "";  ///< unit of a number; empty for none
+  const char* unit = "";          ///< unit of a number; empty for none
+  WordsFunction words = nullptr;  ///< of a kWord
 };
 
 /// One output of a command.

@@ -6,6 +6,11 @@
 
 namespace lumo {
 
+std::span<const EnumWord<Form>> WordsOf(Form) {
+  static constexpr EnumWord<Form> kWords[] = {{"Told", Form::kTold}, {"Exact", Form::kExact}};
+  return kWords;
+}
+
 const String* FindText(const ObjectPtr& object) {
   return FindScalarValue<String>(object);
 }

@@ -3,6 +3,7 @@
 #include <span>
 #include <string_view>
 #include <type_traits>
+#include <vector>
 
 #include "foundation/array.h"
 #include "foundation/scalar.h"
@@ -27,6 +28,20 @@ struct EnumWord {
   const char* word;
   E value;
 };
+
+/// The words of an enumeration in their order, for the declaration of an input that takes them.
+template <typename E>
+std::vector<const char*> WordsIn() {
+  std::vector<const char*> words;
+  for (const EnumWord<E>& entry : WordsOf(E())) words.push_back(entry.word);
+  return words;
+}
+
+/// Which form of a result a command gives: the one that has always been given, or the exact one.
+enum class Form { kTold, kExact };
+
+/// "Told", "Exact".
+VEXG_EXPORT std::span<const EnumWord<Form>> WordsOf(Form);
 
 /// The text of the Scalar<String> at `object`; null when there is none.
 VEXG_EXPORT const String* FindText(const ObjectPtr& object);

@@ -4,7 +4,8 @@ namespace lumo {
 
 std::span<const EnumWord<ProjectedGrid>> WordsOf(ProjectedGrid) {
   using enum ProjectedGrid;
-  static constexpr EnumWord<ProjectedGrid> kWords[] = {{"Computed", kComputed}, {"Exact", kExact}};
+  static constexpr EnumWord<ProjectedGrid> kWords[] = {
+      {"Told", kComputed}, {"Exact", kExact}, {"Computed", kComputed}};
   return kWords;
 }
 

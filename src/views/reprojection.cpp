@@ -4,7 +4,8 @@ namespace lumo {
 
 std::span<const EnumWord<WarpSampling>> WordsOf(WarpSampling) {
   using enum WarpSampling;
-  static constexpr EnumWord<WarpSampling> kWords[] = {{"Corner", kCorner}, {"Centred", kCentred}};
+  static constexpr EnumWord<WarpSampling> kWords[] = {
+      {"Told", kCorner}, {"Centred", kCentred}, {"Corner", kCorner}};
   return kWords;
 }
 

@@ -158,18 +158,21 @@ const CommandDeclaration kProjected{
      {"GeoRef", Presence::kRequired, ValueKind::kGeoRef, "of type Std: the grid"},
      {"ReprojectionMethod", Presence::kRequired, ValueKind::kWord,
       "Polynomial: fitted to each block; Rigorous: a transform of every pixel; Triangulation runs "
-      "as Polynomial"},
+      "as Polynomial",
+      "", &WordsIn<ReprojectionMethod>},
      {"ResamplingMethod", Presence::kRequired, ValueKind::kWord,
-      "Nearest, Linear or Cubic; others run as Nearest"},
+      "Nearest, Linear or Cubic; others run as Nearest", "", &WordsIn<PyramidResamplingMethod>},
      {"PyramidURI", Presence::kOptional, ValueKind::kURI, "has no effect"},
      {"PyramidLevel", Presence::kOptional, ValueKind::kInteger, "has no effect"},
      {"Grid", Presence::kOptional, ValueKind::kWord,
-      "Computed: all of the raster, with pixels as large as its own, as without it; Exact: the "
-      "GeoRef with its own size"},
+      "Told: all of the raster, with pixels as large as its own; Exact: the GeoRef with its own "
+      "size",
+      "", &WordsIn<ProjectedGrid>},
      {"Sampling", Presence::kOptional, ValueKind::kWord,
-      "Corner: linear and cubic weigh from the corners of pixels and round toward zero, as without "
-      "it; Centred: they weigh from the centres, round to the nearest, and leave out pixels that "
-      "aren't valid"},
+      "Told: linear and cubic weigh from the corners of pixels and round toward zero; Centred: "
+      "they "
+      "weigh from the centres, round to the nearest, and leave out pixels that aren't valid",
+      "", &WordsIn<WarpSampling>},
      {"NoData", Presence::kOptional, ValueKind::kNumber,
       "the no-data value of all bands, outside the raster too; the raster's own when absent"}},
     PublishedOutputs()};

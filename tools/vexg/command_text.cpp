@@ -2,9 +2,11 @@
 
 #include <algorithm>
 #include <map>
+#include <string_view>
 #include <vector>
 
 #include <fmt/format.h>
+#include <fmt/ranges.h>
 #include <nlohmann/json.hpp>
 
 #include "commands/command.h"
@@ -45,12 +47,14 @@ std::size_t WidestName(const CommandDeclaration& command) {
 nlohmann::ordered_json AsJson(const CommandDeclaration& command) {
   nlohmann::ordered_json inputs = nlohmann::ordered_json::array();
   for (const InputDeclaration& input : command.inputs) {
-    inputs.push_back({{"name", input.name},
-                      {"required", input.presence == Presence::kRequired},
-                      {"kind", Describe(input.kind).name},
-                      {"form", Describe(input.kind).form},
-                      {"unit", input.unit},
-                      {"meaning", input.meaning}});
+    inputs.push_back(
+        {{"name", input.name},
+         {"required", input.presence == Presence::kRequired},
+         {"kind", Describe(input.kind).name},
+         {"form", Describe(input.kind).form},
+         {"unit", input.unit},
+         {"words", input.words == nullptr ? std::vector<const char*>() : input.words()},
+         {"meaning", input.meaning}});
   }
   nlohmann::ordered_json outputs = nlohmann::ordered_json::array();
   for (const OutputDeclaration& output : command.outputs) {
@@ -79,6 +83,33 @@ std::string AsMarkdown(const CommandDeclaration& command) {
   for (const OutputDeclaration& output : command.outputs) {
     text += fmt::format("| `{}` | {} | {} | {} |\n", output.name, output.returned ? "returned" : "",
                         KindOf(output.kind, output.unit), output.meaning);
+  }
+  return text;
+}
+
+/// The words of an input, joined by `separator`; empty for one without.
+std::string JoinWords(const InputDeclaration& input, const char* separator) {
+  return input.words == nullptr ? "" : fmt::format("{}", fmt::join(input.words(), separator));
+}
+
+bool IsToldForm(const InputDeclaration& input) {
+  return input.words != nullptr && std::string_view(input.words().front()) == "Told";
+}
+
+/// The table of the inputs that choose between the told form of a result and a better one.
+std::string ToldFormsAsMarkdown() {
+  std::string text =
+      "\n## Told forms\n\n"
+      "These inputs choose between the form of a result that has always been given, `Told`, and a\n"
+      "better one. Without the input the told form is given; the verbs of the command line ask "
+      "for\n"
+      "the better one.\n\n| Command | Input | Words | Meaning |\n|---|---|---|---|\n";
+  for (const auto& [name, factory] : GetCommandRegistry()) {
+    for (const InputDeclaration& input : factory->GetDeclaration().inputs) {
+      if (!IsToldForm(input)) continue;
+      text += fmt::format("| `{}` | `{}` | {} | {} |\n", factory->GetDeclaration().name, input.name,
+                          JoinWords(input, ", "), input.meaning);
+    }
   }
   return text;
 }
@@ -118,7 +149,7 @@ std::string CommandsAsMarkdown() {
     text += fmt::format("\n## {}\n", group);
     for (const CommandDeclaration* command : commands) text += AsMarkdown(*command);
   }
-  return text;
+  return text + ToldFormsAsMarkdown();
 }
 
 std::string CommandAsHelp(const CommandDeclaration& command) {
