@@ -3,6 +3,7 @@
 #include "foundation/fault.h"
 #include "platform/unicode.h"
 #include "support/metadata_support.h"
+#include "support/source_dir.h"
 
 namespace lumo {
 namespace {
@@ -163,7 +164,7 @@ TEST(MdfFile, FormatPropertiesChangeTheFormatAndMakeNoEntry) {
 
 TEST(MdfFile, TheDefinitionFilesOfTheLibraryAreWellFormed) {
   unsigned files = 0;
-  for (const auto& file : std::filesystem::directory_iterator(VEXG_SOURCE_DIR "/resources/mdf")) {
+  for (const auto& file : std::filesystem::directory_iterator(SourceDir() + "/resources/mdf")) {
     MdfFormat format;
     std::vector<MdfEntry> entries;
     EXPECT_TRUE(ReadMdfFile(String(file.path().string()), format, entries)) << TakeFault().ToUTF8();

@@ -7,6 +7,7 @@
 #include "support/coordsys_support.h"
 #include "support/rpc_file.h"
 #include "support/sample_data.h"
+#include "support/source_dir.h"
 
 namespace lumo::test {
 namespace {
@@ -143,7 +144,7 @@ TEST(OrvaHeader, TakesHandWrittenForms) {
 }
 
 TEST(OrvaHeader, TheExampleOfTheDocumentOpens) {
-  const std::string document = ReadFile(VEXG_SOURCE_DIR "/docs/file-formats.md");
+  const std::string document = ReadFile(SourceDir() + "/docs/file-formats.md");
   const std::size_t begin = document.find("ORVA\nsamples");
   ASSERT_NE(begin, std::string::npos);
   const HeaderCase files;

@@ -10,6 +10,7 @@
 #include "foundation/environment.h"
 #include "metadata/metadata.h"
 #include "metadata/metadata_parse_log.h"
+#include "support/source_dir.h"
 #include "support/temporary_directory.h"
 
 namespace lumo::test {
@@ -44,7 +45,8 @@ inline ParseLogOfTest gParseLog;
 
 /// Has the library read the definition files of the source tree.
 inline void UseDefinitionFiles() {
-  GetGlobalEnvironmentImpl()[Environment::kMdfDirectory].text = VEXG_SOURCE_DIR "/resources/mdf";
+  GetGlobalEnvironmentImpl()[Environment::kMdfDirectory].text =
+      String(SourceDir() + "/resources/mdf");
 }
 
 inline Array<String> Strings(std::initializer_list<String> pieces) {
