@@ -17,13 +17,17 @@
 namespace lumo::platform {
 namespace {
 
+constexpr mode_t kReadableByAll = 0666;  // less what the process masks
+
 bool Fail(std::string* fault, const std::string& path, const std::string& what) {
   if (fault != nullptr) *fault = path + ": " + what;
   return false;
 }
 
 bool FailBySystem(std::string* fault, const std::string& path, int error) {
-  return Fail(fault, path, std::generic_category().message(error));
+  Fail(fault, path, std::generic_category().message(error));
+  errno = error;
+  return false;
 }
 
 template <typename Call>
@@ -94,14 +98,31 @@ std::unique_ptr<RandomAccessFile> RandomAccessFile::Open(const std::string& path
   }
   if (!IsRegular(file.Get())) {
     Fail(fault, path, "not a file");
+    errno = EISDIR;
     return nullptr;
   }
   return std::unique_ptr<RandomAccessFile>(new RandomAccessFile(path, file.Release()));
 }
 
+std::unique_ptr<RandomAccessFile> RandomAccessFile::CreateOrEmpty(const std::string& path,
+                                                                  std::string* fault) {
+  constexpr int kMode = O_RDWR | O_CREAT | O_CLOEXEC | O_NONBLOCK;
+  FileDescriptor file(RetryInterrupted([&] { return open(path.c_str(), kMode, kReadableByAll); }));
+  if (!file.IsOpen()) {
+    FailBySystem(fault, path, errno);
+    return nullptr;
+  }
+  if (!IsRegular(file.Get())) {
+    Fail(fault, path, "not a file");
+    errno = EISDIR;
+    return nullptr;
+  }
+  std::unique_ptr<RandomAccessFile> opened(new RandomAccessFile(path, file.Release()));
+  return opened->SetSize(0, fault) ? std::move(opened) : nullptr;
+}
+
 std::unique_ptr<RandomAccessFile> RandomAccessFile::Create(const std::string& path,
                                                            std::string* fault) {
-  constexpr mode_t kReadableByAll = 0666;  // less what the process masks
   constexpr int kMode = O_RDWR | O_CREAT | O_EXCL | O_CLOEXEC;
   FileDescriptor file(RetryInterrupted([&] { return open(path.c_str(), kMode, kReadableByAll); }));
   if (!file.IsOpen()) {

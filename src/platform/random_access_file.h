@@ -25,8 +25,9 @@ struct ConstFilePiece {
 ///
 /// Threads: any number of threads may transfer at once; what they do to one place is theirs to
 ///          order.
-/// Failure: false or null, and one line in `fault`, where that isn't null: "path: what". A transfer
-///          that fails half way may have moved some of its bytes.
+/// Failure: false or null, and one line in `fault`, where that isn't null: "path: what". errno
+/// holds
+///          the system's number. A transfer that fails half way may have moved some of its bytes.
 class VEXG_EXPORT RandomAccessFile {
  public:
   enum class Access {
@@ -42,6 +43,10 @@ class VEXG_EXPORT RandomAccessFile {
   /// Makes an empty file and opens it for kUpdate. Fails where there is one already.
   static std::unique_ptr<RandomAccessFile> Create(const std::string& path,
                                                   std::string* fault = nullptr);
+
+  /// Opens a regular file for kUpdate, empty: a new one, or the one that is there.
+  static std::unique_ptr<RandomAccessFile> CreateOrEmpty(const std::string& path,
+                                                         std::string* fault = nullptr);
 
   ~RandomAccessFile();
   RandomAccessFile(const RandomAccessFile&) = delete;

@@ -5,6 +5,7 @@
 #include <map>
 #include <mutex>
 
+#include "common/file_system.h"
 #include "common/messages.h"
 #include "foundation/environment.h"
 
@@ -34,6 +35,7 @@ void StartGdal() {
     const std::string data = GetGlobalEnvironmentImpl().Find(Environment::kGdalDirectory).ToUTF8();
     if (!data.empty()) CPLSetConfigOption("GDAL_DATA", data.c_str());
     Silence();
+    InstallFileSystem();
     GDALAllRegister();
   });
 }

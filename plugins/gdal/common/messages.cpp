@@ -26,23 +26,25 @@ Messages::~Messages() {
   CPLErrorReset();
 }
 
+std::string Messages::Text() const {
+  if (const FileFault* const fault = faults_.First()) return fault->path + ": " + fault->Text();
+  return error_.empty() ? warning_ : error_;
+}
+
 bool Messages::Fail(const std::string& name, const char* otherwise) const {
-  // GDAL itself puts the name in front of some messages.
-  const std::string& text = Text();
-  if (text.starts_with(name + ": ")) {
-    SetFault(text);
-    return false;
-  }
+  const std::string text = Text();
   return FailWith(name, text.empty() ? otherwise : text);
 }
 
 void Messages::Clear() {
+  faults_.Clear();
   error_.clear();
   warning_.clear();
 }
 
 bool FailWith(const std::string& name, const std::string& what) {
-  SetFault(std::string(name).append(": ").append(what));
+  // GDAL itself puts the name in front of some messages.
+  SetFault(what.starts_with(name + ": ") ? what : name + ": " + what);
   return false;
 }
 

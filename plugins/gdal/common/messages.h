@@ -2,10 +2,13 @@
 
 #include <string>
 
+#include "foundation/file_faults.h"
+
 namespace lumo::gdal {
 
 /// Gathers what GDAL has to say on this thread while it lives, in place of the standard error
-/// stream. They nest; each hears what is said while it is the innermost.
+/// stream, and which file operations failed (FileFaults). They nest; each hears what is said while
+/// it is the innermost.
 class Messages {
  public:
   Messages();
@@ -13,13 +16,19 @@ class Messages {
   Messages(const Messages&) = delete;
   Messages& operator=(const Messages&) = delete;
 
-  bool HasError() const { return !error_.empty(); }
+  /// True when GDAL told an error, or a file operation failed that it did not tell of.
+  bool HasError() const { return !error_.empty() || faults_.First() != nullptr; }
   bool HasWarning() const { return !warning_.empty(); }
 
-  /// The last error, else the last warning, in one line; empty when there was none.
-  const std::string& Text() const { return HasError() ? error_ : warning_; }
+  /// The file operation that failed first, else the last error, else the last warning, in one line;
+  /// empty when there was none.
+  std::string Text() const;
 
-  /// Tells the fault "name: what GDAL said". False, to be returned.
+  /// The file operations that failed.
+  const FileFaults& Files() const { return faults_; }
+
+  /// Tells the fault "name: what GDAL said", or why the system refused a file operation. False, to
+  /// be returned.
   /// @param otherwise  what is told when GDAL said nothing.
   bool Fail(const std::string& name, const char* otherwise = "GDAL gave no reason") const;
 
@@ -29,6 +38,7 @@ class Messages {
  private:
   struct Handler;
 
+  FileFaults faults_;
   std::string error_;
   std::string warning_;
 };

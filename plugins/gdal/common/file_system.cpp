@@ -1,0 +1,302 @@
+#include "common/file_system.h"
+
+#include <algorithm>
+#include <cerrno>
+#include <cpl_conv.h>
+#include <cpl_vsi_error.h>
+#include <cpl_vsi_virtual.h>
+#include <cstring>
+#include <filesystem>
+#include <memory>
+#include <string>
+#include <string_view>
+#include <system_error>
+#include <utility>
+#include <vector>
+
+#include "foundation/file_faults.h"
+#include "platform/random_access_file.h"
+
+namespace lumo::gdal {
+namespace {
+
+using platform::RandomAccessFile;
+
+/// Notes the system's number of the call that just failed. False, to be returned.
+bool NoteFault(const std::string& path) {
+  FileFaults::Note(path, errno != 0 ? errno : EIO);
+  return false;
+}
+
+/// One open file of GDAL's. Small reads and writes go through one window of the file, which holds
+/// either what was read ahead or what is not yet written.
+class File final : public VSIVirtualHandle {
+ public:
+  /// @param shown  the path that faults are noted under.
+  /// @param target  the place that the file takes when it is closed; empty when it is there.
+  File(std::unique_ptr<RandomAccessFile> file, std::string shown, std::string target)
+      : file_(std::move(file)), shown_(std::move(shown)), target_(std::move(target)) {}
+  ~File() override { Close(); }
+
+  int Seek(vsi_l_offset offset, int whence) override {
+    isAtEnd_ = false;
+    if (whence == SEEK_SET) {
+      place_ = offset;
+      return 0;
+    }
+    // Offsets are unsigned; those before the place come as large ones and wrap.
+    std::uint64_t base = place_;
+    if (whence == SEEK_END && !SizeOf(base)) return -1;
+    place_ = base + offset;
+    return 0;
+  }
+
+  vsi_l_offset Tell() override { return place_; }
+
+  std::size_t Read(void* to, std::size_t size, std::size_t count) override {
+    if (size == 0 || count == 0) return 0;
+    const std::size_t wanted = size * count;
+    const std::size_t got = ReadBytes(static_cast<char*>(to), wanted);
+    if (got < wanted) isAtEnd_ = true;
+    return got / size;
+  }
+
+  std::size_t Write(const void* from, std::size_t size, std::size_t count) override {
+    if (size == 0 || count == 0) return 0;
+    return WriteBytes(static_cast<const char*>(from), size * count) ? count : 0;
+  }
+
+  int Eof() override { return isAtEnd_ ? TRUE : FALSE; }
+
+  int Flush() override { return WriteWindow() ? 0 : -1; }
+
+  int Truncate(vsi_l_offset size) override {
+    if (!WriteWindow()) return -1;
+    window_.clear();
+    errno = 0;
+    return file_->SetSize(size) || NoteFault(shown_) ? 0 : -1;
+  }
+
+  bool HasPRead() const override { return true; }
+
+  std::size_t PRead(void* to, std::size_t size, vsi_l_offset offset) const override {
+    std::size_t got = 0;
+    errno = 0;
+    if (!file_->ReadUpTo(offset, to, size, got)) NoteFault(shown_);
+    return got;
+  }
+
+  int Close() override {
+    if (file_ == nullptr) return 0;
+    const bool isWritten = WriteWindow();
+    const std::string made = file_->Path();
+    errno = 0;
+    const bool isClosed = file_->Close() || NoteFault(shown_);
+    file_.reset();
+    const bool isWhole = isWritten && isClosed && !hasFailed_;
+    if (target_.empty()) return isWhole ? 0 : -1;
+    errno = 0;
+    if (isWhole && (platform::RenameFile(made, target_) || NoteFault(shown_))) return 0;
+    VSIUnlink(made.c_str());
+    return -1;
+  }
+
+ private:
+  static constexpr std::size_t kWindowBytes = 16 << 10;
+
+  bool SizeOf(std::uint64_t& bytes) {
+    errno = 0;
+    return WriteWindow() && (file_->GetSize(bytes) || NoteFault(shown_));
+  }
+
+  /// Takes what the window holds of the next bytes.
+  std::size_t TakeFromWindow(char* to, std::size_t bytes) {
+    if (place_ < windowPlace_ || place_ >= windowPlace_ + window_.size()) return 0;
+    const auto skipped = static_cast<std::size_t>(place_ - windowPlace_);
+    const std::size_t taken = std::min(bytes, window_.size() - skipped);
+    std::memcpy(to, window_.data() + skipped, taken);
+    place_ += taken;
+    return taken;
+  }
+
+  /// @return the bytes that there are, up to `bytes`; fewer also when the read failed.
+  std::size_t ReadBytes(char* to, std::size_t bytes) {
+    if (!WriteWindow()) return 0;
+    std::size_t got = TakeFromWindow(to, bytes);
+    if (got == bytes) return got;
+    const std::size_t rest = bytes - got;
+    std::size_t more = 0;
+    errno = 0;
+    if (rest >= kWindowBytes) {
+      if (!file_->ReadUpTo(place_, to + got, rest, more)) NoteFault(shown_);
+      place_ += more;
+      return got + more;
+    }
+    window_.resize(kWindowBytes);
+    windowPlace_ = place_;
+    const bool isRead = file_->ReadUpTo(place_, window_.data(), kWindowBytes, more);
+    window_.resize(isRead ? more : 0);
+    if (!isRead) NoteFault(shown_);
+    return got + TakeFromWindow(to + got, rest);
+  }
+
+  bool WriteBytes(const char* from, std::size_t bytes) {
+    if (!isUnwritten_ || place_ != windowPlace_ + window_.size() ||
+        window_.size() + bytes > kWindowBytes) {
+      if (!WriteWindow()) return false;
+      window_.clear();
+      windowPlace_ = place_;
+    }
+    if (bytes > kWindowBytes) {
+      errno = 0;
+      if (!file_->Write(place_, from, bytes)) return FailToWrite();
+    } else {
+      window_.insert(window_.end(), from, from + bytes);
+      isUnwritten_ = true;
+    }
+    place_ += bytes;
+    return true;
+  }
+
+  bool WriteWindow() {
+    if (!isUnwritten_) return true;
+    isUnwritten_ = false;
+    errno = 0;
+    const bool isWritten = file_->Write(windowPlace_, window_.data(), window_.size());
+    window_.clear();
+    return isWritten || FailToWrite();
+  }
+
+  bool FailToWrite() {
+    hasFailed_ = true;
+    return NoteFault(shown_);
+  }
+
+  std::unique_ptr<RandomAccessFile> file_;
+  const std::string shown_;
+  const std::string target_;
+  std::uint64_t place_ = 0;
+  std::vector<char> window_;
+  std::uint64_t windowPlace_ = 0;
+  bool isUnwritten_ = false;
+  bool hasFailed_ = false;
+  bool isAtEnd_ = false;
+};
+
+/// Codes that only say that there is nothing of the name, or nothing that can be changed: drivers
+/// ask for files that need not be there, and try to open for writing what may be read only.
+bool IsAnswer(int code, bool isForWriting) {
+  switch (code) {
+    case ENOENT:
+    case ENOTDIR:
+    case EISDIR:
+    case ENAMETOOLONG:
+      return true;
+    case EACCES:
+    case EPERM:
+    case EROFS:
+    case ETXTBSY:
+      return isForWriting;
+    default:
+      return false;
+  }
+}
+
+/// Tells this library's handler from GDAL's own, which has no options.
+constexpr const char* kMark = "<Options handler='vexg'/>";
+
+/// Plain files by File; all else as GDAL's own handler does it.
+class FileSystem final : public VSIFilesystemHandler {
+ public:
+  explicit FileSystem(VSIFilesystemHandler& plain) : plain_(plain) {}
+
+  VSIVirtualHandle* Open(const char* path, const char* access, bool setError,
+                         CSLConstList options) override {
+    const std::string_view mode = access;
+    if (mode.starts_with('a')) return plain_.Open(path, access, setError, options);
+    const bool isNew = mode.starts_with('w');
+    const bool isForWriting = isNew || mode.find('+') != mode.npos;
+    errno = 0;
+    VSIVirtualHandle* const file = isNew ? OpenNew(path) : OpenOld(path, isForWriting);
+    if (file != nullptr) return file;
+    const int code = errno != 0 ? errno : EIO;
+    if (!IsAnswer(code, isForWriting && !isNew)) FileFaults::Note(path, code);
+    if (setError) {
+      VSIError(VSIE_FileError, "%s: %s", path, std::generic_category().message(code).c_str());
+    }
+    errno = code;
+    return nullptr;
+  }
+
+  int Stat(const char* path, VSIStatBufL* status, int flags) override {
+    errno = 0;
+    const int result = plain_.Stat(path, status, flags);
+    const int code = errno;
+    if (result != 0 && code != 0 && !IsAnswer(code, false)) FileFaults::Note(path, code);
+    errno = code;
+    return result;
+  }
+  int Unlink(const char* path) override { return Noted(path, plain_.Unlink(path)); }
+  int Rename(const char* from, const char* to) override {
+    return Noted(from, plain_.Rename(from, to));
+  }
+  int* UnlinkBatch(CSLConstList files) override { return plain_.UnlinkBatch(files); }
+  int Mkdir(const char* path, long mode) override { return plain_.Mkdir(path, mode); }
+  int Rmdir(const char* path) override { return plain_.Rmdir(path); }
+  int RmdirRecursive(const char* path) override { return plain_.RmdirRecursive(path); }
+  char** ReadDirEx(const char* path, int most) override { return plain_.ReadDirEx(path, most); }
+  char** SiblingFiles(const char* path) override { return plain_.SiblingFiles(path); }
+  int IsCaseSensitive(const char* path) override { return plain_.IsCaseSensitive(path); }
+  const char* GetOptions() override { return kMark; }
+  GIntBig GetDiskFreeSpace(const char* path) override { return plain_.GetDiskFreeSpace(path); }
+  int SupportsSparseFiles(const char* path) override { return plain_.SupportsSparseFiles(path); }
+  VSIDIR* OpenDir(const char* path, int depth, const char* const* options) override {
+    return plain_.OpenDir(path, depth, options);
+  }
+
+ private:
+  static VSIVirtualHandle* OpenOld(const char* path, bool isForWriting) {
+    auto file = RandomAccessFile::Open(
+        path, isForWriting ? RandomAccessFile::Access::kUpdate : RandomAccessFile::Access::kRead);
+    return file != nullptr ? new File(std::move(file), path, "") : nullptr;
+  }
+
+  static VSIVirtualHandle* OpenNew(const char* path) {
+    if (!std::string_view(path).ends_with(".aux.xml")) {
+      auto file = RandomAccessFile::CreateOrEmpty(path);
+      return file != nullptr ? new File(std::move(file), path, "") : nullptr;
+    }
+    std::error_code fault;
+    const std::filesystem::path resolved = std::filesystem::weakly_canonical(path, fault);
+    const std::string target = fault ? path : resolved.string();
+    auto file = RandomAccessFile::Create(platform::TemporaryPathBeside(target));
+    if (file == nullptr) return nullptr;
+    const auto status = std::filesystem::status(target, fault);
+    if (std::filesystem::is_regular_file(status)) {
+      std::filesystem::permissions(file->Path(), status.permissions(), fault);
+    }
+    return new File(std::move(file), path, target);
+  }
+
+  static int Noted(const char* path, int result) {
+    const int code = errno;
+    if (result != 0 && code != 0 && !IsAnswer(code, false)) FileFaults::Note(path, code);
+    errno = code;
+    return result;
+  }
+
+  VSIFilesystemHandler& plain_;
+};
+
+}  // namespace
+
+void InstallFileSystem() {
+  VSIFilesystemHandler* const plain = VSIFileManager::GetHandler("");
+  // Several plug-ins share one GDAL, and the first of them has done it for all.
+  const char* const mark = plain->GetOptions();
+  if (mark != nullptr && std::string_view(mark) == kMark) return;
+  // GDAL deletes the handler at its end, and never the one that it replaces.
+  VSIFileManager::InstallHandler("", new FileSystem(*plain));
+}
+
+}  // namespace lumo::gdal
