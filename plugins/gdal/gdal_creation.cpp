@@ -12,7 +12,9 @@
 #include "gdal_no_data.h"
 #include "gdal_side_file.h"
 #include "gdal_types.h"
+#include "platform/file_moves.h"
 #include "platform/random_access_file.h"
+#include "platform/temporary_file.h"
 
 namespace lumo::gdal {
 namespace {

@@ -4,6 +4,8 @@
 
 #include "data/format_table.h"
 #include "foundation/fault.h"
+#include "platform/file_moves.h"
+#include "platform/temporary_file.h"
 
 namespace lumo::orva {
 namespace {

@@ -6,6 +6,8 @@
 #include <map>
 
 #include "foundation/fault.h"
+#include "platform/file_moves.h"
+#include "platform/temporary_file.h"
 #include "raster/pixel_types.h"
 #include "raster/raster_enums.h"
 #include "tasks/parallel.h"

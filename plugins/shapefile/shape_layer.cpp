@@ -6,7 +6,9 @@
 #include "common/messages.h"
 #include "foundation/fault.h"
 #include "georef/std_georef.h"
+#include "platform/file_moves.h"
 #include "platform/random_access_file.h"
+#include "platform/temporary_file.h"
 #include "raster/pixel_types.h"
 
 namespace lumo::shapefile {

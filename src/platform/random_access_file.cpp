@@ -13,6 +13,8 @@
 #include <utility>
 
 #include "platform/file_descriptor.h"
+#include "platform/file_moves.h"
+#include "platform/temporary_file.h"
 
 namespace lumo::platform {
 namespace {
@@ -198,15 +200,6 @@ bool RandomAccessFile::HasName() const {
          mine.st_dev == named.st_dev && mine.st_ino == named.st_ino;
 }
 
-bool RenameFile(const std::string& from, const std::string& to, std::string* fault) {
-  return std::rename(from.c_str(), to.c_str()) == 0 || FailBySystem(fault, to, errno);
-}
-
-std::string TemporaryPathBeside(const std::string& path) {
-  static std::atomic<unsigned> count{0};
-  return path + "." + std::to_string(getpid()) + "-" + std::to_string(count++) + ".tmp";
-}
-
 bool WriteNewFile(const std::string& path, std::string_view content, std::string* fault) {
   const auto file = RandomAccessFile::Create(path, fault);
   if (file == nullptr) return false;
@@ -216,6 +209,7 @@ bool WriteNewFile(const std::string& path, std::string_view content, std::string
 }
 
 bool ReplaceFile(const std::string& path, std::string_view content, std::string* fault) {
+  RemoveAbandonedFiles(path);
   const std::string temporary = TemporaryPathBeside(path);
   std::string why;
   const bool written = WriteNewFile(temporary, content, &why);

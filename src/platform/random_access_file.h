@@ -108,11 +108,4 @@ VEXG_EXPORT bool WriteNewFile(const std::string& path, std::string_view content,
 VEXG_EXPORT bool ReplaceFile(const std::string& path, std::string_view content,
                              std::string* fault = nullptr);
 
-/// A path beside `path` that nobody else uses, for a file that is to take its place.
-VEXG_EXPORT std::string TemporaryPathBeside(const std::string& path);
-
-/// Gives the file `from` the path `to`, in place of what stood there.
-VEXG_EXPORT bool RenameFile(const std::string& from, const std::string& to,
-                            std::string* fault = nullptr);
-
 }  // namespace lumo::platform

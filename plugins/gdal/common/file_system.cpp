@@ -15,7 +15,9 @@
 #include <vector>
 
 #include "foundation/file_faults.h"
+#include "platform/file_moves.h"
 #include "platform/random_access_file.h"
+#include "platform/temporary_file.h"
 
 namespace lumo::gdal {
 namespace {

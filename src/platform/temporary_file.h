@@ -1,0 +1,28 @@
+#pragma once
+
+#include <string>
+#include <vector>
+
+#include "platform/export.h"
+
+namespace lumo::platform {
+
+// Names of files and folders that a process makes beside the place that they are to take. The name
+// says which process they belong to, so that what a killed one left can be told from the work of a
+// running one.
+
+/// A path beside `path` that nobody else uses, for a file that is to take its place.
+VEXG_EXPORT std::string TemporaryPathBeside(const std::string& path);
+
+/// The same for a folder, whose name is hidden.
+VEXG_EXPORT std::string TemporaryFolderBeside(const std::string& path);
+
+/// Removes the files that TemporaryPathBeside named for `path` in a process of this machine that
+/// has ended. Those of other machines, and what can't be removed, stay.
+VEXG_EXPORT void RemoveAbandonedFiles(const std::string& path);
+
+/// The folders that TemporaryFolderBeside named for `path` in processes of this machine that have
+/// ended.
+VEXG_EXPORT std::vector<std::string> FindAbandonedFolders(const std::string& path);
+
+}  // namespace lumo::platform
