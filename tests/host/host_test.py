@@ -25,8 +25,12 @@ class Run(unittest.TestCase):
         code, out, err = run("run", "--json", str(SOURCE / "examples/jobs/sum.xml"))
         self.assertEqual((code, err), (0, ""))
         first, second = json.loads(out)["commands"]
-        self.assertEqual((first["name"], first["return"]), ("bands", {"Count": "3", "Sum": "60"}))
-        self.assertEqual((second["result"], second["usage"]), ("Success", "0"))
+        self.assertEqual((first["name"], first["return"]), ("bands", {"Count": 3, "Sum": 60}))
+        self.assertEqual((second["result"], second["usage"]), ("Success", 0))
+        for command in (first, second):
+            for name in ("wall", "cpu"):
+                self.assertIsInstance(command[name], float)
+                self.assertLess(command[name], 60)
 
     def test_the_exit_code_tells_how_it_went(self):
         unknown = '<Job><Command Name="a" ID="X"/><Command Name="b" ID="ExampleWaitCommand"><Input Seconds="0"/></Command></Job>'

@@ -4,56 +4,86 @@
 #include <iostream>
 
 #include <CLI/CLI.hpp>
-#include <nlohmann/json.hpp>
 
 #include "commands/command.h"
 #include "platform/process.h"
+#include "value_json.h"
 #include "verb.h"
 
 namespace lumo::host {
 namespace {
 
-std::string ToJson(const Document& result) {
-  nlohmann::ordered_json commands = nlohmann::ordered_json::array();
-  for (const XMLElementPtr& command : result.GetRoot().children) {
-    const auto attribute = [&](const char* name) {
-      return command->attributes.Find(name).ToUTF8();
-    };
-    nlohmann::ordered_json returns = nlohmann::ordered_json::object();
-    for (const XMLElementPtr& child : command->children) {
-      for (const auto& [name, value] : child->attributes) returns[name.ToUTF8()] = value.ToUTF8();
-    }
-    commands.push_back({{"name", attribute("Name")},
-                        {"result", attribute("Result")},
-                        {"wall", attribute("Wall")},
-                        {"cpu", attribute("CPU")},
-                        {"usage", attribute("Usage")},
-                        {"return", returns}});
-  }
-  return nlohmann::ordered_json{{"commands", commands}}.dump(2) + "\n";
-}
-
 bool IsKnownHere(const NamedCommand& command) {
   return GetCommandRegistry().HasKey(command.id);
 }
 
-/// The commands of the job that have no counterpart in the result. Both lists have the same order
-/// and only names to compare; where names repeat, one that is unknown here too is the likelier.
-std::vector<NamedCommand> FindDropped(const std::vector<NamedCommand>& asked,
-                                      const std::vector<NamedCommand>& answered) {
-  std::vector<NamedCommand> dropped;
+/// The commands of a job by what became of them, in order.
+struct MatchedCommands {
+  std::vector<NamedCommand> answered;  ///< as many as the result has, if it is of this job
+  std::vector<NamedCommand> dropped;   ///< without a counterpart in the result
+};
+
+/// Both lists have the same order and only names to compare; where names repeat, a command that is
+/// unknown here too is the likelier to have been dropped.
+MatchedCommands MatchCommands(const std::vector<NamedCommand>& asked,
+                              const std::vector<NamedCommand>& answered) {
+  MatchedCommands matched;
   std::size_t missing = asked.size() - std::min(asked.size(), answered.size());
   std::size_t next = 0;
   for (const NamedCommand& command : asked) {
     const bool matches = next < answered.size() && answered[next].name == command.name;
     if (matches && (missing == 0 || IsKnownHere(command))) {
+      matched.answered.push_back(command);
       ++next;
     } else {
-      dropped.push_back(command);
+      matched.dropped.push_back(command);
       if (missing != 0) --missing;
     }
   }
-  return dropped;
+  return matched;
+}
+
+/// How the value of a returned output is to be read, by its name; text for what isn't declared.
+ValueKind KindOf(const CommandDeclaration* command, const String& output) {
+  if (command == nullptr) return ValueKind::kText;
+  for (const OutputDeclaration& declared : command->outputs) {
+    if (output == declared.name) return declared.kind;
+  }
+  return ValueKind::kText;
+}
+
+/// What a command declares; null for one that is unknown here.
+const CommandDeclaration* FindDeclaration(const NamedCommand& command) {
+  if (!IsKnownHere(command)) return nullptr;
+  return &GetCommandRegistry().Find(String(command.id))->GetDeclaration();
+}
+
+Json AsJson(const XMLElement& command, const CommandDeclaration* declaration) {
+  const auto attribute = [&](const char* name) { return command.attributes.Find(name); };
+  Json returns = Json::object();
+  for (const XMLElementPtr& child : command.children) {
+    for (const auto& [name, value] : child->attributes) {
+      returns[name.ToUTF8()] = ValueAsJson(value, KindOf(declaration, name));
+    }
+  }
+  return {{"name", attribute("Name").ToUTF8()},
+          {"result", attribute("Result").ToUTF8()},
+          {"wall", SecondsAsJson(attribute("Wall"))},
+          {"cpu", SecondsAsJson(attribute("CPU"))},
+          {"usage", ValueAsJson(attribute("Usage"), ValueKind::kNumber)},
+          {"return", returns}};
+}
+
+std::string ToJson(const Document& job, const Document& result) {
+  const std::vector<NamedCommand> matched =
+      MatchCommands(job.GetCommands(), result.GetCommands()).answered;
+  Json commands = Json::array();
+  for (const XMLElementPtr& command : result.GetRoot().children) {
+    const bool isMatched = commands.size() < matched.size();
+    commands.push_back(
+        AsJson(*command, isMatched ? FindDeclaration(matched[commands.size()]) : nullptr));
+  }
+  return Json{{"commands", commands}}.dump(2) + "\n";
 }
 
 }  // namespace
@@ -109,8 +139,8 @@ Document ReadJob(const JobOptions& options, String& text) {
   return {text, source};
 }
 
-void WriteResult(const String& resultDocument, bool json, Output& output) {
-  output.Write(json ? ToJson(Document(resultDocument, "the result"))
+void WriteResult(const Document& job, const String& resultDocument, bool json, Output& output) {
+  output.Write(json ? ToJson(job, Document(resultDocument, "the result"))
                     : resultDocument.ToUTF8() + "\n");
 }
 
@@ -122,7 +152,7 @@ int ExitCodeOf(const Document& job, const String& resultDocument) {
   }
   const Document result(resultDocument, "the result");
   bool failed = false;
-  for (const NamedCommand& command : FindDropped(asked, result.GetCommands())) {
+  for (const NamedCommand& command : MatchCommands(asked, result.GetCommands()).dropped) {
     Say("command \"" + command.name + "\" was left out: the ID \"" + command.id +
         "\" is unknown; see vexg commands");
     failed = true;

@@ -48,8 +48,11 @@ struct JobOptions {
 Document ReadJob(const JobOptions& options, String& text);
 
 /// Writes the result document, or the same as JSON:
-/// {"commands": [{"name", "result", "wall", "cpu", "usage", "return": {name: value}}]}.
-void WriteResult(const String& resultDocument, bool json, Output& output);
+/// {"commands": [{"name", "result", "wall", "cpu", "usage", "return": {name: value}}]}, with "wall"
+/// and "cpu" in seconds and values as ValueAsJson gives them for what their commands declare. The
+/// values of a command that is unknown here are texts.
+/// @param job  whose result it is.
+void WriteResult(const Document& job, const String& resultDocument, bool json, Output& output);
 
 /// Says which commands of the job left no trace in its result, as their IDs are unknown.
 /// @return how the program ends: success, a failed or unknown command, or a job without any.

@@ -19,6 +19,16 @@ struct Options {
   bool json = false;
 };
 
+/// A no-data value, which may be NaN or infinite: these are words, since null says that there is
+/// none.
+template <typename T>
+Json NoDataValueAsJson(const T& value) {
+  if constexpr (std::is_floating_point_v<T>) {
+    if (!std::isfinite(value)) return FormatValue(value).ToUTF8();
+  }
+  return NumberAsJson(value);
+}
+
 /// For each band its no-data value, or null.
 Json NoDataAsJson(const RasterInfo& info) {
   Json list = Json::array();
@@ -26,7 +36,7 @@ Json NoDataAsJson(const RasterInfo& info) {
     const auto values = ParseValue<Array<T>>(info.noData);
     for (unsigned band = 0; band < info.bands; ++band) {
       const bool has = info.hasNoData[band] && band < values.GetCount();
-      list.push_back(has ? NumberAsJson(values[band]) : Json());
+      list.push_back(has ? NoDataValueAsJson(values[band]) : Json());
     }
     return true;
   });

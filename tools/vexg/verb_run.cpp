@@ -36,7 +36,7 @@ int RunJobFile(const JobOptions& options) {
   }
   SayWhyCommandsFailed(job);
   const String result = JobResultWriter(job).Write();
-  WriteResult(result, options.json, output);
+  WriteResult(document, result, options.json, output);
   return ExitCodeOf(document, result);
 }
 

@@ -35,7 +35,7 @@ int SubmitJobFile(const JobOptions& options, const ServerOptions& server) {
                             ChooseProgressStyle(options.progress, options.quiet));
     result = link.Run(document.Write());
   }
-  WriteResult(result, options.json, output);
+  WriteResult(document, result, options.json, output);
   return ExitCodeOf(document, result);
 }
 
