@@ -304,8 +304,16 @@ bool OpenRaster::Write(const BlockPlace& place, const void* pixels) {
   return false;
 }
 
+/// Deletes what is stored of the pixels before a write to bands; of other bands what they have with
+/// these.
 void OpenRaster::ForgetStatistics(const Array<unsigned>& bands) {
-  for (const unsigned band : bands) DeleteStoredStats(Band(band));
+  for (const unsigned band : bands) {
+    DeleteStoredStats(Band(band));
+    DeleteStoredHistograms(Band(band));
+  }
+  if (!mayHavePairs_) return;
+  for (unsigned band = 0; band < Bands(); ++band) DeleteStoredPairs(Band(band));
+  mayHavePairs_ = false;
 }
 
 bool OpenRaster::ReadMasks(const BlockPlace& place, unsigned char* state) const {

@@ -71,6 +71,8 @@ class OpenRaster {
   /// Carries a block to the caller's memory, in the raster's interleave.
   bool Read(const BlockPlace& place, void* pixels);
   bool Write(const BlockPlace& place, const void* pixels);
+  /// Says that statistics are being stored, those between bands perhaps among them.
+  void NoteStatistics() { mayHavePairs_ = true; }
 
   /// Sets state bits where a mask or an alpha band of the source excludes pixels.
   bool ReadMasks(const BlockPlace& place, unsigned char* state) const;
@@ -96,8 +98,9 @@ class OpenRaster {
   unsigned dataType_ = 0;
   lumo::Interleave interleave_ = lumo::Interleave::BSQ;
   std::map<unsigned, RasterLevel> levels_;
-  bool isUpdated_ = false;   // open for writing
-  bool isThreaded_ = false;  // GDAL decodes on threads of its own
+  bool isUpdated_ = false;    // open for writing
+  bool isThreaded_ = false;   // GDAL decodes on threads of its own
+  bool mayHavePairs_ = true;  // stored statistics between bands
   enum class Answer { kUnknown, kNo, kYes } canWrite_ = Answer::kUnknown;
 };
 

@@ -149,7 +149,9 @@ StoredHistogram ToStored(const RasterBandHistogram<T>& histogram) {
   double width = histogram.binSize;
   if constexpr (std::is_integral_v<T>) {
     stored.lowEdge -= 0.5;
-    if (histogram.source != StatsSource::kNative) width = std::trunc(width);  // as it was counted
+    const bool isCountedAsTold =
+        histogram.source != StatsSource::kNative && histogram.bins == Form::kTold;
+    if (isCountedAsTold) width = std::trunc(width);
   }
   stored.highEdge = stored.lowEdge + width * histogram.binCount;
   stored.counts = histogram.counts;
@@ -285,6 +287,7 @@ template <typename T>
 bool Reader<T>::WriteStats(const Array<RasterBandStats<T>>& stats) {
   if constexpr (kHasStats) {
     const Messages messages;
+    raster_.NoteStatistics();
     for (const RasterBandStats<T>& band : stats) {
       constexpr unsigned kWhole =
           StatsMask::Min | StatsMask::Max | StatsMask::Mean | StatsMask::Std;

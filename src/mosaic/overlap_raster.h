@@ -47,6 +47,7 @@ class OverlapRaster final : public ComputedRaster<T> {
                   Array<unsigned char>&) override {
     return false;
   }
+  std::uint64_t WriteCount() const override;
 
  private:
   bool SetUp();

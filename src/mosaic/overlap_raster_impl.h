@@ -145,6 +145,11 @@ std::uint64_t OverlapRaster<T, U>::PixelCount(unsigned band, const IPC& ipc) {
 }
 
 template <typename T, typename U>
+std::uint64_t OverlapRaster<T, U>::WriteCount() const {
+  return ComputedRaster<T>::WriteCount() + (second_ ? second_->WriteCount() : 0);
+}
+
+template <typename T, typename U>
 RasterPtr<T> OverlapRaster<T, U>::PyramidLevel(unsigned level) {
   const RasterPtr<T> first = ComputedRaster<T>::PyramidLevel(level);
   const RasterPtr<U> second = second_ ? second_->PyramidLevel(level) : RasterPtr<U>();

@@ -86,7 +86,11 @@ const CommandDeclaration kBuild{
      {"PyramidLevelMax", Presence::kRequired, ValueKind::kInteger, "last level, up to 31"},
      {"PyramidCanBuild", Presence::kRequired, ValueKind::kBoolean, "of the description; not read"},
      {"TileDimensions", Presence::kRequired, ValueKind::kTiles,
-      "the levels are stored in squares of this height; of 9 bands and more in squares of 256"}},
+      "the levels are stored in squares of this height; of 9 bands and more in squares of 256"},
+     {"Bins", Presence::kOptional, ValueKind::kWord,
+      "of the histogram. Told: each a whole number wide, 256 at most; Exact: 256 that share the "
+      "range of the values, or one for each of fewer integers",
+      "", &WordsIn<Form>}},
     {}};
 
 class BuildRasterPyramidCommand final : public RasterCommand {
@@ -100,6 +104,7 @@ class BuildRasterPyramidCommand final : public RasterCommand {
     def.levelMin = Read<unsigned>("PyramidLevelMin");
     def.levelMax = Read<unsigned>("PyramidLevelMax");
     def.canBuild = Read<bool>("PyramidCanBuild");
+    def.bins = Read<Form>("Bins");
 
     auto* const observer = new BuildObserver(GetIPC());
     const AsyncCallbackPtr callback(observer);

@@ -9,7 +9,11 @@ template <typename T>
                                               const T* __restrict values, std::size_t count,
                                               std::uint32_t* __restrict out) {
   const HistogramBins<T> bins = from;  // so that no store can change it
-  for (std::size_t i = 0; i < count; ++i) out[i] = bins.Find(values[i]);
+  if (bins.form == Form::kExact) {
+    for (std::size_t i = 0; i < count; ++i) out[i] = bins.FindExactly(values[i]);
+  } else {
+    for (std::size_t i = 0; i < count; ++i) out[i] = bins.FindAsTold(values[i]);
+  }
 }
 
 }  // namespace

@@ -1,3 +1,5 @@
+#include <algorithm>
+
 #include "foundation/fault.h"
 #include "foundation/progress.h"
 #include "raster/raster_command.h"
@@ -55,7 +57,8 @@ class ComputeStatsCommand : public RasterCommand {
     }
     const RasterBandStats<T> whole = raster.BandStats(band);
     const unsigned mask = extended ? StatsMask::Extended : StatsMask::Basic;
-    return (whole.mask & mask) == mask ? whole : stats;
+    const bool hasPairs = whole.sumXY.GetCount() == bands && whole.cov.GetCount() == bands;
+    return (whole.mask & mask) == mask && (!extended || hasPairs) ? whole : stats;
   }
 
   template <typename T>
@@ -76,6 +79,8 @@ class ComputeStatsCommand : public RasterCommand {
     if (extended) {
       sumXY.Resize(ArrayDims(bands, bands));
       cov.Resize(ArrayDims(bands, bands));
+      std::fill(sumXY.begin(), sumXY.end(), 0.0);
+      std::fill(cov.begin(), cov.end(), 0.0);
     }
     for (unsigned band = 0; band < bands; ++band) {
       const RasterBandStats<T> stats = Ask(raster, band, extended, share);

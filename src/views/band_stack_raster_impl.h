@@ -97,8 +97,10 @@ RasterPtr<T> BandStackRaster<T>::PyramidLevel(unsigned level) {
 
 template <typename T>
 bool BandStackRaster<T>::StatsExist(unsigned band, unsigned mask) const {
-  return AskMember(
-      band, [&](Raster<T>& member, unsigned local) { return member.StatsExist(local, mask); });
+  if ((mask & kPairs) != 0 && !ComputedRaster<T>::StatsExist(band, mask & kPairs)) return false;
+  return AskMember(band, [&](Raster<T>& member, unsigned local) {
+    return member.StatsExist(local, mask & ~kPairs);
+  });
 }
 
 template <typename T>
@@ -191,8 +193,19 @@ template <typename T>
 RasterBandStats<T> BandStackRaster<T>::BandStats(unsigned band) const {
   RasterBandStats<T> stats =
       AskMember(band, [](Raster<T>& member, unsigned local) { return member.BandStats(local); });
+  const RasterBandStats<T> own = ComputedRaster<T>::BandStats(band);
   stats.band = band;
+  stats.sumXY = own.sumXY;
+  stats.cov = own.cov;
+  stats.mask = (stats.mask & ~kPairs) | (own.mask & kPairs);
   return stats;
+}
+
+template <typename T>
+std::uint64_t BandStackRaster<T>::WriteCount() const {
+  std::uint64_t writes = 0;  // no sum comes twice, since none of them ever falls
+  for (const auto& member : members_) writes += member->WriteCount();
+  return writes;
 }
 
 template <typename T>

@@ -3,7 +3,7 @@
 #include <optional>
 
 #include "raster/raster_def.h"
-#include "raster/raster_view.h"
+#include "views/computed_raster.h"
 #include "views/reprojection.h"
 
 namespace lumo {
@@ -25,8 +25,9 @@ struct ProjectedRasterOptions {
 };
 
 /// Shows its parent in the grid of another geo-reference. Nothing is computed until a block is
-/// asked for; see Reprojection. Statistics, histograms and palettes are the parent's. Exists for
-/// EightTypes.
+/// asked for; see Reprojection. Palettes are the parent's. Statistics and histograms are the view's
+/// own on an exact grid, computed from the pixels that it shows, and the parent's on a computed
+/// one. Exists for EightTypes.
 ///
 /// On an exact grid a polynomial that is off by more than an eighth of a pixel is replaced by
 /// polynomials of smaller rectangles, and a block that misses the parent is one of background
@@ -39,12 +40,13 @@ struct ProjectedRasterOptions {
 ///            carried to the target makes a view without a parent: IsValid() is false and
 ///            operations give false, 0 or empty. Nothing can be written.
 template <typename T>
-class ProjectedRaster final : public RasterView<T> {
+class ProjectedRaster final : public ComputedRaster<T> {
  public:
   /// @param method      anything but kRigorous runs as kPolynomial.
   /// @param resampling  anything but kLinear and kCubic runs as kNearest.
   ProjectedRaster(const RasterPtr<T>& parent, const GeoRefPtr& target, ReprojectionMethod method,
                   PyramidResamplingMethod resampling, const ProjectedRasterOptions& options = {});
+  ~ProjectedRaster() override { this->StopComputing(); }
 
   URI GetURI() const override { return this->DefaultURI("ProjectedRaster"); }
   bool CanWrite() const override { return false; }

@@ -26,7 +26,9 @@ template <typename T>
 ProjectedRaster<T>::ProjectedRaster(const RasterPtr<T>& parent, const GeoRefPtr& target,
                                     ReprojectionMethod method, PyramidResamplingMethod resampling,
                                     const ProjectedRasterOptions& options)
-    : RasterView<T>(parent),
+    : ComputedRaster<T>(parent, options.grid == ProjectedGrid::kExact
+                                    ? ComputedRaster<T>::StatsOf::kThis
+                                    : ComputedRaster<T>::StatsOf::kParent),
       target_(CloneOf(target)),
       method_(detail::KnownMethod(method)),
       resampling_(detail::KnownResampling(resampling)),
@@ -94,22 +96,22 @@ GeoRefPtr ProjectedRaster<T>::ComputedGrid(const GeoRef& source) const {
 
 template <typename T>
 bool ProjectedRaster<T>::HasNoDataValue(unsigned band) const {
-  return options_.noData ? band < def_.bands : RasterView<T>::HasNoDataValue(band);
+  return options_.noData ? band < def_.bands : ComputedRaster<T>::HasNoDataValue(band);
 }
 
 template <typename T>
 T ProjectedRaster<T>::NoDataValue(unsigned band) const {
-  return options_.noData ? static_cast<T>(*options_.noData) : RasterView<T>::NoDataValue(band);
+  return options_.noData ? static_cast<T>(*options_.noData) : ComputedRaster<T>::NoDataValue(band);
 }
 
 template <typename T>
 RasterPtr<T> ProjectedRaster<T>::PyramidLevel(unsigned level) {
-  return OnLevel(RasterView<T>::PyramidLevel(level));
+  return OnLevel(ComputedRaster<T>::PyramidLevel(level));
 }
 
 template <typename T>
 RasterPtr<T> ProjectedRaster<T>::StoredPyramidLevel(unsigned level) {
-  return OnLevel(RasterView<T>::StoredPyramidLevel(level));
+  return OnLevel(ComputedRaster<T>::StoredPyramidLevel(level));
 }
 
 /// This view over a level of the parent; empty over none.

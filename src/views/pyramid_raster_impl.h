@@ -55,6 +55,8 @@ class PyramidRasterImpl final : public ComputedRaster<T> {
                   Array<T>& pixels, Array<unsigned char>& state) override;
   bool PutSubRect(const SubRect& rect, const Array<unsigned>& bands, Interleave interleave,
                   Array<T>& pixels, Array<unsigned char>& state) override;
+  /// Of the level, and of level 0, from which it may be sampled.
+  std::uint64_t WriteCount() const override;
 
  private:
   static constexpr unsigned kTileSide = 256;

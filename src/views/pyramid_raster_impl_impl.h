@@ -199,4 +199,10 @@ bool PyramidRasterImpl<T>::PutSubRect(const SubRect& rect, const Array<unsigned>
   return reader_->WriteBlock(rect, bands, level_, interleave, pixels, state);
 }
 
+template <typename T>
+std::uint64_t PyramidRasterImpl<T>::WriteCount() const {
+  if (!reader_) return 0;
+  return reader_->WriteCount(level_) + (level_ != 0 ? reader_->WriteCount(0) : 0);
+}
+
 }  // namespace lumo

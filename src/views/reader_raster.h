@@ -14,6 +14,10 @@ namespace lumo {
 /// computed can be stored there. A second reader, when there is one, stands on a pyramid that the
 /// library keeps in a file of its own; where it has something it goes first.
 ///
+/// Once pixels have been written, what the source and the pyramid's file store of statistics and
+/// histograms is given no more. The pyramid's file loses it then, the source at the next
+/// WriteStats or WriteHistogram, unless it has lost it already.
+///
 /// Ownership: shares both connections, which stay open as long as the raster lives. The readers
 ///            belong to them.
 /// Threads:   every operation may run on many threads at once; one block is transferred at a time.
@@ -78,10 +82,15 @@ class ReaderRaster final : public ComputedRaster<T> {
                   Array<T>& pixels, Array<unsigned char>& state) override;
   bool PutSubRect(const SubRect& rect, const Array<unsigned>& bands, Interleave interleave,
                   Array<T>& pixels, Array<unsigned char>& state) override;
+  std::uint64_t WriteCount() const override { return reader_ ? reader_->WriteCount(0) : 0; }
 
  private:
   template <typename Call>
   bool AnyReader(const Call& call) const;
+  template <typename Call>
+  bool AnyReaderWithStats(const Call& call) const;
+  bool HistogramsHold(const RasterReaderPtr<T>& reader) const;
+  void DropStatsOfPyramid();
   template <typename Value, typename Computed>
   auto StatValue(unsigned band, unsigned bit, const IPC& ipc, const Value& value,
                  const Computed& computed);

@@ -70,6 +70,19 @@ bool ReaderRaster<T>::AnyReader(const Call& call) const {
   return (pyramidReader_ && call(*pyramidReader_)) || (reader_ && call(*reader_));
 }
 
+/// The same over readers whose stored statistics hold for the pixels as they are.
+template <typename T>
+template <typename Call>
+bool ReaderRaster<T>::AnyReaderWithStats(const Call& call) const {
+  const std::uint64_t writes = WriteCount();
+  return AnyReader([&](auto& reader) { return reader.StatsHoldFor() == writes && call(reader); });
+}
+
+template <typename T>
+bool ReaderRaster<T>::HistogramsHold(const RasterReaderPtr<T>& reader) const {
+  return reader && reader->HistogramsHoldFor() == WriteCount();
+}
+
 template <typename T>
 bool ReaderRaster<T>::PyramidExists() const {
   return AnyReader([](auto& reader) { return reader.PyramidExists(); });
@@ -133,7 +146,7 @@ bool ReaderRaster<T>::PyramidRefresh() {
 template <typename T>
 bool ReaderRaster<T>::StatsExist(unsigned band, unsigned mask) const {
   return ComputedRaster<T>::StatsExist(band, mask) ||
-         (pyramid_ && pyramid_->StatsExist(band, mask)) || AnyReader([&](auto& reader) {
+         (pyramid_ && pyramid_->StatsExist(band, mask)) || AnyReaderWithStats([&](auto& reader) {
            return (static_cast<unsigned>(reader.StatsMask()) & mask) == mask &&
                   reader.StatsExist(band) && (reader.ReadStats(band).mask & mask) == mask;
          });
@@ -145,11 +158,12 @@ RasterBandStats<T> ReaderRaster<T>::BandStats(unsigned band) const {
   if (stats.mask != StatsMask::None) return stats;
   if (pyramid_) stats = pyramid_->BandStats(band);
   if (stats.mask != StatsMask::None) return stats;
-  AnyReader([&](auto& reader) {
+  AnyReaderWithStats([&](auto& reader) {
     if (!reader.StatsExist(band)) return false;
     stats = reader.ReadStats(band);
     return true;
   });
+  stats.band = band;
   return stats;
 }
 
@@ -244,10 +258,14 @@ double ReaderRaster<T>::Cov(unsigned band, unsigned otherBand, const IPC& ipc) {
 
 template <typename T>
 bool ReaderRaster<T>::WriteStats() {
+  const std::uint64_t writes = WriteCount();
   Array<RasterBandStats<T>> all{ArrayDims(bands_)};
   for (unsigned band = 0; band < all.GetCount(); ++band) all[band] = BandStats(band);
-  return StoreIn(&RasterReader<T>::CanWriteStats,
-                 [&](auto& reader) { return reader.WriteStats(all); });
+  return StoreIn(&RasterReader<T>::CanWriteStats, [&](auto& reader) {
+    if (!reader.WriteStats(all)) return false;
+    reader.SetStatsHoldFor(writes);
+    return true;
+  });
 }
 
 template <typename T>
@@ -262,15 +280,16 @@ Array<RasterBandHistogram<T>> ReaderRaster<T>::BandHistogram(unsigned band) cons
         if (merged.Resize(ArrayDims(at + 1))) merged[at] = histogram;
       }
     };
-    if (pyramidReader_) join(pyramidReader_->Histogram(band));
+    if (HistogramsHold(pyramidReader_)) join(pyramidReader_->Histogram(band));
     join(ComputedRaster<T>::BandHistogram(band));
-    if (reader_) join(reader_->Histogram(band));
+    if (HistogramsHold(reader_)) join(reader_->Histogram(band));
   }
   return merged;
 }
 
 template <typename T>
 bool ReaderRaster<T>::WriteHistogram() {
+  const std::uint64_t writes = WriteCount();
   Array<RasterBandHistogram<T>> all;
   for (unsigned band = 0; band < bands_; ++band) {
     for (const RasterBandHistogram<T>& histogram : BandHistogram(band)) {
@@ -278,8 +297,14 @@ bool ReaderRaster<T>::WriteHistogram() {
       if (all.Resize(ArrayDims(at + 1))) all[at] = histogram;
     }
   }
-  return all.GetCount() == 0 || StoreIn(&RasterReader<T>::CanWriteHistogram,
-                                        [&](auto& reader) { return reader.WriteHistogram(all); });
+  const bool hasStale =
+      (reader_ && !HistogramsHold(reader_)) || (pyramidReader_ && !HistogramsHold(pyramidReader_));
+  if (all.GetCount() == 0 && !hasStale) return true;
+  return StoreIn(&RasterReader<T>::CanWriteHistogram, [&](auto& reader) {
+    if (!reader.WriteHistogram(all)) return false;
+    reader.SetHistogramsHoldFor(writes);
+    return true;
+  });
 }
 
 /// Stores something in the source and in the pyramid's file, as far as they can; having nowhere to
@@ -349,8 +374,35 @@ bool ReaderRaster<T>::PutSubRect(const SubRect& rect, const Array<unsigned>& ban
                                  Interleave interleave, Array<T>& pixels,
                                  Array<unsigned char>& state) {
   if (!reader_ || !Holds(rect, bands) || !CanWrite()) return false;
-  const std::lock_guard lock(pixelLock_);
-  return reader_->WriteBlock(rect, bands, 0, interleave, pixels, state);
+  bool isWritten = false;
+  {
+    const std::lock_guard lock(pixelLock_);
+    isWritten = reader_->WriteBlock(rect, bands, 0, interleave, pixels, state);
+  }
+  DropStatsOfPyramid();
+  return isWritten;
+}
+
+/// Takes what the pyramid's file stores of the pixels before a write out of it, once. Where that
+/// can't be done it is not given all the same.
+template <typename T>
+void ReaderRaster<T>::DropStatsOfPyramid() {
+  constexpr std::uint64_t kNone = UINT64_MAX;  // a number of writes that there never is
+  if (!pyramidReader_ || pyramidReader_.Get() == reader_.Get() ||
+      (pyramidReader_->StatsHoldFor() == kNone && pyramidReader_->HistogramsHoldFor() == kNone)) {
+    return;
+  }
+  pyramidReader_->SetStatsHoldFor(kNone);
+  pyramidReader_->SetHistogramsHoldFor(kNone);
+  bool hasStats = false, hasHistograms = false;
+  Array<RasterBandStats<T>> none{ArrayDims(bands_)};
+  for (unsigned band = 0; band < none.GetCount(); ++band) {
+    none[band].band = band;
+    hasStats = hasStats || pyramidReader_->StatsExist(band);
+    hasHistograms = hasHistograms || pyramidReader_->Histogram(band).GetCount() != 0;
+  }
+  if (hasStats && pyramidReader_->CanWriteStats()) pyramidReader_->WriteStats(none);
+  if (hasHistograms && pyramidReader_->CanWriteHistogram()) pyramidReader_->WriteHistogram({});
 }
 
 }  // namespace lumo

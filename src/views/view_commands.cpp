@@ -29,7 +29,11 @@ class ViewCommand : public PublishCommand {
       view = BasicRasterPtr(make(RasterPtr<T>(source)));
       return true;
     });
-    return typed ? Publish(view) : Fail("SrcURI: there is no such view on this pixel type");
+    if (!typed) return Fail("SrcURI: there is no such view on this pixel type");
+    if (view->IsValid() && (view->Samples() == 0 || view->Lines() == 0)) {
+      return Fail("the view would show no pixel of the raster");
+    }
+    return Publish(view);
   }
 };
 

@@ -88,6 +88,7 @@ void AddBuild(JobDraft& draft, const Options& options, const String& raster, con
   build.AddInput("PyramidLevelMax", levels.last);
   build.AddInput("PyramidCanBuild", true);
   build.AddInput("TileDimensions", TileDimensions{options.side, options.side});
+  build.AddInput("Bins", Form::kExact);
 }
 
 int Build(const Options& options) {
