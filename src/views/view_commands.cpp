@@ -38,14 +38,19 @@ const CommandDeclaration kSpatial{"CreateSpatialSubsetRasterCommand",
                                   "Shows a rectangle of a raster as a raster.",
                                   {kSource,
                                    {"SubRect", Presence::kRequired, ValueKind::kRectangle,
-                                    "pixels of the source; cut to its extent"}},
+                                    "pixels of the source; cut to its extent"},
+                                   {"Placing", Presence::kOptional, ValueKind::kWord,
+                                    "Told: the tie pixel of the geo-reference stays where it was; "
+                                    "Exact: the view lies where its pixels lie in the source",
+                                    "", &WordsIn<Form>}},
                                   PublishedOutputs()};
 
 class CreateSpatialSubsetRasterCommand final : public ViewCommand {
   CommandResult Execute() override {
     const auto rect = Read<SubRect>("SubRect");
+    const Form form = HasInput("Placing") ? Read<Form>("Placing") : Form::kTold;
     return PublishView([&]<typename T>(const RasterPtr<T>& source) {
-      return RasterPtr<T>(new SpatialSubsetRaster<T>(source, rect));
+      return RasterPtr<T>(new SpatialSubsetRaster<T>(source, rect, form));
     });
   }
 };
