@@ -2,6 +2,7 @@
 
 #include <cmath>
 
+#include "georef/carry_points.h"
 #include "georef/std_georef.h"
 
 namespace lumo {
@@ -29,22 +30,44 @@ std::optional<AffineLink> FindAffineLink(const GeoRef& from, const GeoRef& to) {
   if (!IsUsable(from) || !IsUsable(to)) return std::nullopt;
   if (!from.CoordinateSystem().IsEqual(to.CoordinateSystem())) return std::nullopt;
   const Turn f(from), t(to);
-  // To the target's axes before its turn, (a, b) in its pixels. The tie points are subtracted
-  // first, so that large map coordinates cost no digits.
-  const double ax = f.cosine * from.PixelSizeX() / to.PixelSizeX();
-  const double ay = f.sine * from.PixelSizeY() / to.PixelSizeX();
-  const double bx = -f.sine * from.PixelSizeX() / to.PixelSizeY();
-  const double by = f.cosine * from.PixelSizeY() / to.PixelSizeY();
-  const double a0 = (from.TieMapX() - to.TieMapX()) / to.PixelSizeX() - from.TiePixelX() * ax -
-                    from.TiePixelY() * ay;
-  const double b0 = (to.TieMapY() - from.TieMapY()) / to.PixelSizeY() - from.TiePixelX() * bx -
-                    from.TiePixelY() * by;
-  return AffineLink{t.cosine * a0 - t.sine * b0 + to.TiePixelX(),
-                    t.cosine * ax - t.sine * bx,
-                    t.cosine * ay - t.sine * by,
-                    t.sine * a0 + t.cosine * b0 + to.TiePixelY(),
-                    t.sine * ax + t.cosine * bx,
-                    t.sine * ay + t.cosine * by};
+  // East and south of the target's tie point, in map units. The tie points are subtracted first, so
+  // that large map coordinates cost no digits.
+  const double ex = f.cosine * from.PixelSizeX(), ey = f.sine * from.PixelSizeY();
+  const double sx = -f.sine * from.PixelSizeX(), sy = f.cosine * from.PixelSizeY();
+  const double e0 = (from.TieMapX() - to.TieMapX()) - from.TiePixelX() * ex - from.TiePixelY() * ey;
+  const double s0 = (to.TieMapY() - from.TieMapY()) - from.TiePixelX() * sx - from.TiePixelY() * sy;
+  const auto column = [&](double east, double south) {
+    return (t.cosine * east - t.sine * south) / to.PixelSizeX();
+  };
+  const auto line = [&](double east, double south) {
+    return (t.sine * east + t.cosine * south) / to.PixelSizeY();
+  };
+  return AffineLink{column(e0, s0) + to.TiePixelX(), column(ex, sx), column(ey, sy),
+                    line(e0, s0) + to.TiePixelY(),   line(ex, sx),   line(ey, sy)};
+}
+
+bool InvertPixelToMap(const GeoRef& model, Array<double>& points) {
+  const bool isPlain = model.Rotation() == 0 || model.PixelSizeX() == model.PixelSizeY();
+  const bool isPairs = points.GetRank() == 2 && points.GetExtent(1) == 2;
+  if (isPlain || !isPairs || !IsUsable(model)) return model.MapToPixel(points);
+  const Turn turn(model);
+  for (unsigned i = 0; i + 1 < points.GetCount(); i += 2) {
+    const double east = points[i] - model.TieMapX(), south = model.TieMapY() - points[i + 1];
+    points[i] = (turn.cosine * east - turn.sine * south) / model.PixelSizeX() + model.TiePixelX();
+    points[i + 1] =
+        (turn.sine * east + turn.cosine * south) / model.PixelSizeY() + model.TiePixelY();
+  }
+  return true;
+}
+
+bool CarryPixels(const GeoRef& from, const GeoRef& to, Array<double>& points) {
+  bool isCarried = from.PixelToMap(points);
+  if (!from.CoordinateSystem().IsEqual(to.CoordinateSystem())) {
+    isCarried = from.MapToMap(points, to) && isCarried;
+  }
+  const bool isPlaced = InvertPixelToMap(to, points);
+  if (isPlaced && !isCarried) MarkUncarried(points);
+  return isPlaced && isCarried;
 }
 
 }  // namespace lumo

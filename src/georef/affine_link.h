@@ -18,4 +18,11 @@ struct AffineLink {
 ///         coordinate systems are equal.
 VEXG_EXPORT std::optional<AffineLink> FindAffineLink(const GeoRef& from, const GeoRef& to);
 
+/// Map coordinates to pixels, in place: the inverse of PixelToMap. That is MapToPixel, but for a
+/// grid that is turned and whose pixels aren't square, where MapToPixel keeps a form that isn't.
+VEXG_EXPORT bool InvertPixelToMap(const GeoRef& model, Array<double>& points);
+
+/// As from.PixelToPixel(points, to), by InvertPixelToMap.
+VEXG_EXPORT bool CarryPixels(const GeoRef& from, const GeoRef& to, Array<double>& points);
+
 }  // namespace lumo

@@ -5,6 +5,7 @@
 #include <cmath>
 #include <vector>
 
+#include "georef/affine_link.h"
 #include "georef/derived_georef.h"
 #include "mosaic/overlap_raster.h"
 #include "raster/block_strides.h"
@@ -80,7 +81,7 @@ inline std::vector<std::array<double, 2>> OutlineIn(const GeoRef& other, const R
     *at++ = def.samples * (fromX + (toX - fromX) * part) - shiftOf(*def.geoRef);
     *at++ = def.lines * (fromY + (toY - fromY) * part) - shiftOf(*def.geoRef);
   }
-  def.geoRef->PixelToPixel(points, other);
+  CarryPixels(*def.geoRef, other, points);
   std::vector<std::array<double, 2>> outline;
   for (unsigned i = 0; i + 1 < points.GetCount(); i += 2) {
     if (!std::isfinite(points[i]) || !std::isfinite(points[i + 1])) continue;

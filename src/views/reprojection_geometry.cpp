@@ -4,6 +4,7 @@
 #include <limits>
 #include <vector>
 
+#include "georef/affine_link.h"
 #include "georef/coordsys_log.h"
 
 namespace lumo {
@@ -142,7 +143,7 @@ Array<double> PolePoints(const GeoRef& base, const SubRectProj& rect, const GeoR
     pole.Add(0, latitude);
     Array<double> inBase = pole.Take();
     base.CoordinateSystem().Project(inBase);
-    base.MapToPixel(inBase);
+    InvertPixelToMap(base, inBase);
     const double x = inBase[0], y = inBase[1];
     const bool isInside = x >= rect.left && x <= rect.left + rect.Width() && y >= rect.top &&
                           y <= rect.top + rect.Height();
@@ -154,7 +155,7 @@ Array<double> PolePoints(const GeoRef& base, const SubRectProj& rect, const GeoR
   Array<double> meridians = points.Take();
   if (meridians.GetCount() == 0) return meridians;
   second.CoordinateSystem().Project(meridians);
-  second.MapToPixel(meridians);
+  InvertPixelToMap(second, meridians);
   return meridians;
 }
 
@@ -274,11 +275,11 @@ CoveredRect BaseSubRectToSecSubRect(const GeoRef& base, const SubRectProj& rect,
                                     const GeoRef& second, unsigned samples, unsigned lines,
                                     PyramidResamplingMethod resampling, bool everyPixel) {
   Array<double> points = everyPixel ? PixelPoints(rect) : RectPoints(rect);
-  base.PixelToPixel(points, second);
+  CarryPixels(base, second, points);
   Bounds bounds(points);
   if (!base.CoordinateSystem().IsEqual(second.CoordinateSystem())) {
     Array<double> net = NetPoints(rect);
-    base.PixelToPixel(net, second);
+    CarryPixels(base, second, net);
     bounds.Add(net);
     const bool isWhole = bounds.isWhole;
     if (GoesRound(net, samples)) {
@@ -313,7 +314,7 @@ bool FitWarp(const GeoRef& grid, const SubRectProj& rect, const GeoRef& source,
              const SubRectProj& sourceRect, double centre, WarpPolynomial& fit) {
   const Array<double> inSource = BaseGrid(sourceRect, centre);
   Array<double> inGrid = inSource;
-  if (!source.PixelToPixel(inGrid, grid)) return false;
+  if (!CarryPixels(source, grid, inGrid)) return false;
   // All sides run from 0 to about 1 in the equations, which keeps them well conditioned.
   const auto width = static_cast<double>(rect.Width());
   const auto height = static_cast<double>(rect.Height());

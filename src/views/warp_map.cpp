@@ -198,7 +198,7 @@ bool WarpMap::CarryNet(const SubRectProj& rect, std::vector<double>& points) con
     points[i + 1] += rect.top;
   }
   Array<double> wrapped(points.data(), ArrayDims(static_cast<unsigned>(points.size() / 2), 2));
-  grid_->PixelToPixel(wrapped, *source_);
+  CarryPixels(*grid_, *source_, wrapped);
   bool isWhole = true;
   for (double& value : points) {
     value += shift_;
@@ -232,7 +232,7 @@ void WarpMap::Transform(const SubRectProj& rect, double* positions) const {
     }
   }
   Array<double> points(positions, ArrayDims(count, 2));
-  grid_->PixelToPixel(points, *source_);
+  CarryPixels(*grid_, *source_, points);
   for (at = positions; shift_ != 0 && at != positions + 2 * std::size_t{count}; ++at) *at += shift_;
 }
 

@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <cmath>
 
+#include "georef/affine_link.h"
 #include "platform/vector_clones.h"
 
 namespace lumo {
@@ -94,7 +95,7 @@ void WarpPositions::Reader::Transform(unsigned line) {
     }
   }
   Array<double> points(scratch.data(), ArrayDims(lines_ * width, 2));
-  positions_.grid_->PixelToPixel(points, *positions_.source_);
+  CarryPixels(*positions_.grid_, *positions_.source_, points);
 }
 
 void TakeApart(double* positionX, double* positionY, const WarpLimits& limits, WarpChunk& chunk) {
