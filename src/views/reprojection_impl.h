@@ -262,7 +262,8 @@ void Reprojection<T>::SampleMapped(Work& work, const Window& window,
                                    const MappedPart& mapped) const {
   const SubRectProj all(0, 0, static_cast<std::int32_t>(work.source.samples) - 1,
                         static_cast<std::int32_t>(work.source.lines) - 1);
-  const WarpLimits limits = LimitsIn(all, true);
+  const WarpLimits limits =
+      LimitsIn(all, map_->IsAffine() ? WarpLimits::kAffineNoise : WarpLimits::kTransformNoise);
   detail::RunEach(mapped.strips.size(), [&](unsigned i) {
     const detail::WarpStrip& strip = mapped.strips[i];
     const WarpPiece& piece = mapped.pieces[strip.piece];
@@ -340,7 +341,7 @@ bool Reprojection<T>::Fetch(Work& work, const SubRectProj& rect, Window& window)
 }
 
 template <typename T>
-WarpLimits Reprojection<T>::LimitsIn(const SubRectProj& pixels, bool snaps) const {
+WarpLimits Reprojection<T>::LimitsIn(const SubRectProj& pixels, double noise) const {
   const bool isNearest = resampling_ == PyramidResamplingMethod::kNearest;
   const bool isCorner = sampling_ == WarpSampling::kCorner;
   const int last = isNearest && isCorner && method_ == ReprojectionMethod::kRigorous ? 0 : 1;
@@ -349,7 +350,7 @@ WarpLimits Reprojection<T>::LimitsIn(const SubRectProj& pixels, bool snaps) cons
           double(pixels.right) + last,
           double(pixels.bottom) + last,
           isNearest || isCorner ? 0.0 : 0.5,
-          snaps};
+          noise};
 }
 
 template <typename T>
@@ -397,7 +398,8 @@ void Reprojection<T>::SamplePart(Work& work, const Window& window, const SubRect
   const WarpTarget<T> target = detail::TargetOf(work.target, work.rect, part);
   const auto sampler =
       MakeSampler(positions, static_cast<unsigned>(part.Height()),
-                  LimitsIn(window.source.window, affine.has_value()), window.source, target);
+                  LimitsIn(window.source.window, affine ? WarpLimits::kAffineNoise : 0.0),
+                  window.source, target);
   RunParallelFor(*sampler);
 }
 

@@ -51,6 +51,9 @@ class VEXG_EXPORT WarpMap {
   WarpMap(const GeoRefPtr& grid, const GeoRefPtr& source, unsigned samples, unsigned lines,
           double tolerance);
 
+  /// True within one coordinate system.
+  bool IsAffine() const { return affine_.has_value(); }
+
   /// Cuts a rectangle of the grid into the pieces that the squares make of it.
   void Cut(const SubRectProj& rect, std::vector<WarpPiece>& pieces) const;
 

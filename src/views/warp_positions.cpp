@@ -30,11 +30,10 @@ void FillPolynomial(const double* k, double y, double firstX, double* out) {
 }
 
 VEXG_VECTOR_CLONES
-void Snap(double* positions) {
-  constexpr double kNoise = 0x1p-20;
+void Snap(double* positions, double noise) {
   for (unsigned i = 0; i < WarpChunk::kPixels; ++i) {
     const double near = std::floor(positions[i] * 2 + 0.5) / 2;
-    positions[i] = std::abs(positions[i] - near) < kNoise ? near : positions[i];
+    positions[i] = std::abs(positions[i] - near) < noise ? near : positions[i];
   }
 }
 
@@ -99,9 +98,9 @@ void WarpPositions::Reader::Transform(unsigned line) {
 }
 
 void TakeApart(double* positionX, double* positionY, const WarpLimits& limits, WarpChunk& chunk) {
-  if (limits.snaps) {
-    Snap(positionX);
-    Snap(positionY);
+  if (limits.noise > 0) {
+    Snap(positionX, limits.noise);
+    Snap(positionY, limits.noise);
   }
   std::uint8_t insideY[WarpChunk::kPixels];
   const bool allX = TakeAxisApart(positionX, chunk.count, limits.lowX, limits.highX, limits.shift,

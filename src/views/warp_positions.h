@@ -65,10 +65,12 @@ struct WarpLimits {
   double lowX, lowY;    ///< a position counts from here on
   double highX, highY;  ///< up to here, itself not
   double shift;         ///< taken off a position before it is rounded down
-  /// A position that the errors of arithmetic have moved off an edge or the middle of a pixel, by
-  /// less than a millionth of one, is put back there. So an edge belongs to the pixel that begins
-  /// with it.
-  bool snaps = false;
+  /// A position no farther than this from an edge or the middle of a pixel is put there, as the
+  /// errors of arithmetic have moved it. So an edge belongs to the pixel that begins with it.
+  double noise = 0;
+
+  static constexpr double kAffineNoise = 0x1p-20;     ///< of map coordinates that were written down
+  static constexpr double kTransformNoise = 0x1p-30;  ///< of transforms between systems
 };
 
 /// Positions of some pixels, taken apart.
