@@ -162,8 +162,8 @@ const CommandDeclaration kProjected{
     {kSource,
      {"GeoRef", Presence::kRequired, ValueKind::kGeoRef, "of type Std: the grid"},
      {"ReprojectionMethod", Presence::kRequired, ValueKind::kWord,
-      "Polynomial: fitted to each block; Rigorous: a transform of every pixel; Triangulation runs "
-      "as Polynomial",
+      "Polynomial: fitted to each block, or on an exact grid to its fixed squares; Rigorous: a "
+      "transform of every pixel; Triangulation runs as Polynomial",
       "", &WordsIn<ReprojectionMethod>},
      {"ResamplingMethod", Presence::kRequired, ValueKind::kWord,
       "Nearest, Linear or Cubic; others run as Nearest", "", &WordsIn<PyramidResamplingMethod>},
@@ -171,7 +171,7 @@ const CommandDeclaration kProjected{
      {"PyramidLevel", Presence::kOptional, ValueKind::kInteger, "has no effect"},
      {"Grid", Presence::kOptional, ValueKind::kWord,
       "Told: all of the raster, with pixels as large as its own; Exact: the GeoRef with its own "
-      "size",
+      "size, where a pixel is the same in every block",
       "", &WordsIn<ProjectedGrid>},
      {"Sampling", Presence::kOptional, ValueKind::kWord,
       "Told: linear and cubic weigh from the corners of pixels and round toward zero; Centred: "
