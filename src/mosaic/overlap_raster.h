@@ -1,14 +1,17 @@
 #pragma once
 
+#include <optional>
+
 #include "raster/raster_def.h"
 #include "views/computed_raster.h"
 
 namespace lumo {
 
 /// Shows the area that two geo-referenced rasters have in common, as pixels of the first one on its
-/// grid, moved to the corner of the area. A pixel is valid where it is in both. Statistics and
-/// histograms are the view's own, of the pixels valid in both. Exists for pairs of one type of
-/// EightTypes.
+/// grid, moved to the corner of the area. Of a first raster that is turned, or has a camera alone,
+/// the grid stays where it is, and the area's pixels are cut out of it. A pixel is valid where it
+/// is in both. Statistics and histograms are the view's own, of the pixels valid in both. Exists
+/// for pairs of one type of EightTypes.
 ///
 /// Both rasters are read to the nearest pixel. A pixel that isn't valid may have any value.
 ///
@@ -51,9 +54,12 @@ class OverlapRaster final : public ComputedRaster<T> {
 
  private:
   bool SetUp();
+  bool CutInMap(const RasterDef& second);
+  bool CutInPixels(const RasterDef& second);
 
   RasterPtr<U> second_;
   RasterDef def_;
+  std::optional<SubRect> part_;  // pixels of the first raster, where the view has just these
 };
 
 extern template class VEXG_EXPORT OverlapRaster<std::uint8_t, std::uint8_t>;

@@ -1,6 +1,7 @@
 #include <mutex>
 
 #include "foundation/fault.h"
+#include "pyramid/exact_levels.h"
 #include "raster/raster_command.h"
 #include "raster/raster_def.h"
 
@@ -16,7 +17,11 @@ const CommandDeclaration kGet{
     "Gives a level of the pyramid of a raster as a raster of its own.",
     {kUri,
      {"Level", Presence::kRequired, ValueKind::kInteger,
-      "halves samples and lines so many times; 0 is the size of the raster"}},
+      "halves samples and lines so many times; 0 is the size of the raster"},
+     {"Placing", Presence::kOptional, ValueKind::kWord,
+      "Told: pixels grow by the whole part of the quotient of the sizes; Exact: by 2^Level, as the "
+      "level's pixel x is the raster's pixel x * 2^Level",
+      "", &WordsIn<Form>}},
     {{"PyramidURI", ValueKind::kURI, "the level, by which further commands find it"}}};
 
 class GetRasterPyramidCommand final : public RasterCommand {
@@ -25,6 +30,7 @@ class GetRasterPyramidCommand final : public RasterCommand {
     const BasicRasterPtr raster = FindRaster();
     if (!raster) return Fail();
     const auto number = Read<unsigned>("Level");
+    const ExactLevels exactly(HasInput("Placing") && Read<Form>("Placing") == Form::kExact);
     BasicRasterPtr level;
     DispatchType(TwelveTypes{}, raster->DataType(), [&]<typename T>() {
       const RasterPtr<T> typed(raster);

@@ -29,10 +29,11 @@ struct ProjectedRasterOptions {
 /// own on an exact grid, computed from the pixels that it shows, and the parent's on a computed
 /// one. Exists for EightTypes.
 ///
-/// On an exact grid a polynomial that is off by more than an eighth of a pixel is replaced by
-/// polynomials of smaller rectangles, and a block that misses the parent is one of background
-/// pixels. On a computed grid each block has one polynomial, and a block that misses the parent is
-/// given as such but the read reports false.
+/// On an exact grid a pixel is the same whatever block it is read in: the polynomials belong to
+/// fixed squares of the grid, with no position off by more than an eighth of a pixel, see WarpMap.
+/// A block that misses the parent is one of background pixels. On a computed grid each block has a
+/// polynomial of its own, and a block that misses the parent is given as such but the read reports
+/// false.
 ///
 /// Ownership: shares the parent, which does not know the view; has copies of the geo-references.
 /// Threads:   every operation may run on many threads at once; nothing is stored per call.

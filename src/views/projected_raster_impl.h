@@ -4,6 +4,7 @@
 #include <limits>
 
 #include "foundation/fault.h"
+#include "pyramid/exact_levels.h"
 #include "views/projected_raster.h"
 
 namespace lumo {
@@ -58,7 +59,9 @@ bool ProjectedRaster<T>::SetUp() {
     constexpr double kWarpTolerance = 0.125;
     constexpr unsigned kSquares = 256;
     grid = CloneOf(target_);
-    reprojection_.SetTolerance(kWarpTolerance);
+    const bool isRigorous = method_ == ReprojectionMethod::kRigorous;
+    reprojection_.SetMap(std::make_shared<WarpMap>(grid, def_.geoRef, def_.samples, def_.lines,
+                                                   isRigorous ? 0.0 : kWarpTolerance));
     def_.tileWidth = def_.tileHeight = kSquares;  // squares cover least of a turned source
   } else {
     grid = ComputedGrid(*def_.geoRef);
@@ -106,11 +109,13 @@ T ProjectedRaster<T>::NoDataValue(unsigned band) const {
 
 template <typename T>
 RasterPtr<T> ProjectedRaster<T>::PyramidLevel(unsigned level) {
+  const ExactLevels exactly(options_.grid == ProjectedGrid::kExact);
   return OnLevel(ComputedRaster<T>::PyramidLevel(level));
 }
 
 template <typename T>
 RasterPtr<T> ProjectedRaster<T>::StoredPyramidLevel(unsigned level) {
+  const ExactLevels exactly(options_.grid == ProjectedGrid::kExact);
   return OnLevel(ComputedRaster<T>::StoredPyramidLevel(level));
 }
 

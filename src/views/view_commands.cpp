@@ -42,14 +42,19 @@ const CommandDeclaration kSpatial{"CreateSpatialSubsetRasterCommand",
                                   "Shows a rectangle of a raster as a raster.",
                                   {kSource,
                                    {"SubRect", Presence::kRequired, ValueKind::kRectangle,
-                                    "pixels of the source; cut to its extent"}},
+                                    "pixels of the source; cut to its extent"},
+                                   {"Placing", Presence::kOptional, ValueKind::kWord,
+                                    "Told: the tie pixel of the geo-reference stays where it was; "
+                                    "Exact: the view lies where its pixels lie in the source",
+                                    "", &WordsIn<Form>}},
                                   PublishedOutputs()};
 
 class CreateSpatialSubsetRasterCommand final : public ViewCommand {
   CommandResult Execute() override {
     const auto rect = Read<SubRect>("SubRect");
+    const Form form = HasInput("Placing") ? Read<Form>("Placing") : Form::kTold;
     return PublishView([&]<typename T>(const RasterPtr<T>& source) {
-      return RasterPtr<T>(new SpatialSubsetRaster<T>(source, rect));
+      return RasterPtr<T>(new SpatialSubsetRaster<T>(source, rect, form));
     });
   }
 };
@@ -161,8 +166,8 @@ const CommandDeclaration kProjected{
     {kSource,
      {"GeoRef", Presence::kRequired, ValueKind::kGeoRef, "of type Std: the grid"},
      {"ReprojectionMethod", Presence::kRequired, ValueKind::kWord,
-      "Polynomial: fitted to each block; Rigorous: a transform of every pixel; Triangulation runs "
-      "as Polynomial",
+      "Polynomial: fitted to each block, or on an exact grid to its fixed squares; Rigorous: a "
+      "transform of every pixel; Triangulation runs as Polynomial",
       "", &WordsIn<ReprojectionMethod>},
      {"ResamplingMethod", Presence::kRequired, ValueKind::kWord,
       "Nearest, Linear or Cubic; others run as Nearest", "", &WordsIn<PyramidResamplingMethod>},
@@ -170,7 +175,7 @@ const CommandDeclaration kProjected{
      {"PyramidLevel", Presence::kOptional, ValueKind::kInteger, "has no effect"},
      {"Grid", Presence::kOptional, ValueKind::kWord,
       "Told: all of the raster, with pixels as large as its own; Exact: the GeoRef with its own "
-      "size",
+      "size, where a pixel is the same in every block",
       "", &WordsIn<ProjectedGrid>},
      {"Sampling", Presence::kOptional, ValueKind::kWord,
       "Told: linear and cubic weigh from the corners of pixels and round toward zero; Centred: "

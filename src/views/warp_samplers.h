@@ -49,7 +49,7 @@ class WarpParallel : public ArrayParallelFor {
   void Body(unsigned begin, unsigned end) override {
     WarpPositions::Reader reader(positions_, end);
     WarpChunk chunk;
-    double x[WarpChunk::kPixels], y[WarpChunk::kPixels];
+    double x[WarpChunk::kPixels] = {}, y[WarpChunk::kPixels] = {};
     for (unsigned line = begin; line < end; ++line) {
       for (unsigned at = 0; at < positions_.Width(); at += WarpChunk::kPixels) {
         chunk.count = std::min(WarpChunk::kPixels, positions_.Width() - at);

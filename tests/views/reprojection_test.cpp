@@ -189,6 +189,13 @@ TEST(Reprojection, LeavesOutNeighboursThatAreNotValid) {
   }
 }
 
+template <typename T>
+std::shared_ptr<WarpMap> MapOf(const GeoRefPtr& grid, const PlacedRaster<T>& raster,
+                               double tolerance) {
+  return std::make_shared<WarpMap>(grid, raster.geoRef, raster.Samples(), raster.Lines(),
+                                   tolerance);
+}
+
 /// A raster whose two bands are the position of each pixel's centre.
 Pointer<PlacedRaster<double>> MakePositions(const GeoRefPtr& grid) {
   return MakePlaced<double>(
@@ -227,7 +234,7 @@ TEST(Reprojection, FindsPositionsAcrossCoordinateSystems) {
   const auto near = Reproject(fitted, *raster, rect, {0, 1});
   Reprojection<double> bounded(grid, kPolynomial, kLinear);
   bounded.SetSampling(WarpSampling::kCentred);
-  bounded.SetTolerance(0.001);  // cuts the rectangle
+  bounded.SetMap(MapOf(grid, *raster, 0.001));  // cuts the squares
   const auto nearer = Reproject(bounded, *raster, rect, {0, 1});
   double worst = 0, worstNearer = 0;
   for (unsigned i = 0; i < exact.pixels.GetCount(); ++i) {
@@ -260,7 +267,7 @@ TEST(Reprojection, ShowsAGlobeWithoutWhatIsBehindIt) {
   for (const auto method : {kRigorous, kPolynomial}) {
     Reprojection<double> reprojection(grid, method, kLinear);
     reprojection.SetSampling(WarpSampling::kCentred);
-    reprojection.SetTolerance(0.125);
+    reprojection.SetMap(MapOf(grid, *raster, method == kRigorous ? 0.0 : 0.125));
     reprojection.SetBackground(-1);
     const auto block = Reproject(reprojection, *raster, {0, 0, 139, 139}, {0, 1});
     ASSERT_TRUE(block.whole);

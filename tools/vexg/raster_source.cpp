@@ -102,6 +102,7 @@ void AddLevel(JobDraft& draft, const std::string& name, const String& raster, un
   JobWriterCommand& command = draft.Open(name, "GetRasterPyramidCommand", "PyramidURI");
   command.AddInput("URI", raster);
   command.AddInput("Level", level);
+  command.AddInput("Placing", Form::kExact);
 }
 
 void AddBandView(JobDraft& draft, const std::string& name, const String& raster,

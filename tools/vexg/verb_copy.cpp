@@ -62,6 +62,7 @@ JobDraft MakeDraft(const Options& options, const Plan& plan, const std::string& 
     JobWriterCommand& view = draft.Open("part", "CreateSpatialSubsetRasterCommand");
     view.AddVariableInput("SrcURI", opened.back());
     view.AddInput("SubRect", plan.rect);
+    view.AddInput("Placing", Form::kExact);
     opened.emplace_back("$part");
   }
   if (plan.choosesBands) {

@@ -11,6 +11,7 @@
 #include <CLI/CLI.hpp>
 #include <fmt/format.h>
 
+#include "georef/affine_link.h"
 #include "georef/std_georef.h"
 #include "raster_source.h"
 #include "verb.h"
@@ -103,7 +104,7 @@ class RasterCarrier final : public Carrier {
 
   void Carry(Array<double>& points) const override {
     if (inverse_) {
-      geoRef_->MapToPixel(points);
+      InvertPixelToMap(*geoRef_, points);
       Shift(points, -firstPixel_);
     } else {
       Shift(points, firstPixel_);
