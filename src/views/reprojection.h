@@ -55,7 +55,8 @@ class Reprojection {
   /// How far, in pixels of the source, a polynomial may be off at the points of its fit before the
   /// rectangle is cut in two; without a limit at first.
   void SetTolerance(double pixels) { tolerance_ = pixels; }
-  /// The value of pixels outside the source; at first the source's no-data value, or 0.
+  /// The value of pixels outside the source; at first, and with one that T can't hold, the source's
+  /// no-data value, or 0.
   void SetBackground(double value) { background_ = value; }
 
   /// Fills a rectangle of the grid from the raster.

@@ -2,6 +2,7 @@
 
 #include <algorithm>
 
+#include "raster/raster_details.h"
 #include "views/spatial_subset_raster.h"
 
 namespace lumo {
@@ -28,6 +29,7 @@ SpatialSubsetRaster<T>::SpatialSubsetRaster(const RasterPtr<T>& parent, const Su
   def_.samples = rect_.Width();
   def_.lines = rect_.Height();
   if (def_.geoRef) def_.SetGeoRef(def_.geoRef->SubRectGeoRef(rect_));
+  MovePlaceDetails(def_.metadata, rect_.left, rect_.top);
 }
 
 template <typename T>

@@ -1,5 +1,6 @@
 #pragma once
 
+#include "raster/raster_details.h"
 #include "views/spectral_subset_raster.h"
 
 namespace lumo {
@@ -19,6 +20,7 @@ SpectralSubsetRaster<T>::SpectralSubsetRaster(const RasterPtr<T>& parent,
     const auto value = noData.find(map_[band]);
     if (value != noData.end()) def_.noData[band] = value->second;
   }
+  ChooseBandDetails(def_.metadata, map_);
 }
 
 template <typename T>
