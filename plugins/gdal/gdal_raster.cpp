@@ -258,7 +258,7 @@ bool OpenRaster::Transfer(GDALRWFlag direction, const BlockPlace& place, void* p
     TiffPixels& target = *newRaster_->Pixels();
     return direction == GF_Read ? target.Read(place, pixels) : target.Write(place, pixels);
   }
-  const Messages messages;
+  const Messages messages(Messages::Damage::kIsError);
   const GDALDataType type = PixelTypeOf(dataType_).type;
   const Strides strides(interleave_, place, GDALGetDataTypeSizeBytes(type));
   const auto at = [](unsigned number) { return static_cast<int>(number); };
@@ -286,12 +286,20 @@ bool OpenRaster::Transfer(GDALRWFlag direction, const BlockPlace& place, void* p
 }
 
 bool OpenRaster::Read(const BlockPlace& place, void* pixels) {
+  // What was read of damaged data waits in GDAL's cache as if it were whole, and codecs warn once.
+  if (isDamaged_ && !isUpdated_) {
+    isThreaded_ = false;
+    if (!TakeAgain(OpenDataset(source_, format_, GDAL_OF_RASTER))) return false;
+  }
+  isDamaged_ = false;
   if (Transfer(GF_Read, place, pixels)) return true;
-  if (!isThreaded_ || CheckPlace(place) == nullptr) return false;
+  isDamaged_ = CheckPlace(place) != nullptr;
+  if (!isThreaded_ || !isDamaged_) return false;
   // What a thread of GDAL has to say reaches nobody. Without them it says it here.
   isThreaded_ = false;
-  return TakeAgain(OpenDataset(source_, format_, GDAL_OF_RASTER)) &&
-         Transfer(GF_Read, place, pixels);
+  isDamaged_ = !TakeAgain(OpenDataset(source_, format_, GDAL_OF_RASTER)) ||
+               !Transfer(GF_Read, place, pixels);
+  return !isDamaged_;
 }
 
 bool OpenRaster::Write(const BlockPlace& place, const void* pixels) {
@@ -301,6 +309,23 @@ bool OpenRaster::Write(const BlockPlace& place, const void* pixels) {
   // GDAL only reads what it is given to write.
   if (Transfer(GF_Write, place, const_cast<void*>(pixels))) return true;
   if (newRaster_ != nullptr) newRaster_->Doom();
+  return false;
+}
+
+std::map<unsigned, double> OpenRaster::KeptNoData() const {
+  return newRaster_ != nullptr ? newRaster_->Definition().noData : std::map<unsigned, double>();
+}
+
+bool OpenRaster::KeepsAlpha() const {
+  return newRaster_ != nullptr && newRaster_->KeepsAlpha();
+}
+
+bool OpenRaster::ExcludeFromNew(const BlockPlace& place,
+                                const std::vector<unsigned char>& excluded) {
+  if (newRaster_ == nullptr) return true;
+  const bool isWhole = place.bands.GetCount() >= Bands();
+  if (newRaster_->Mask().Take(place, excluded, isWhole)) return true;
+  newRaster_->Doom();
   return false;
 }
 
@@ -319,7 +344,7 @@ void OpenRaster::ForgetStatistics(const Array<unsigned>& bands) {
 bool OpenRaster::ReadMasks(const BlockPlace& place, unsigned char* state) const {
   const RasterLevel* const level = CheckPlace(place);
   if (level == nullptr) return false;
-  const Messages messages;
+  const Messages messages(Messages::Damage::kIsError);
   const Masks masks(*level, place.bands);
   if (!masks.IsNeeded()) return true;
   const Strides strides(interleave_, place, 1);
@@ -334,7 +359,7 @@ bool OpenRaster::BuildOverviews(const char* method, unsigned levelMin, unsigned 
     factors.push_back(1 << level);
   }
   if (factors.empty()) return FailWith(Name(), "no levels asked for");
-  const Messages messages;
+  const Messages messages(Messages::Damage::kIsError);
   const bool hadLevels = levels_.size() > 1;
   const CPLErr result = GDALBuildOverviews(dataset_.get(), method, static_cast<int>(factors.size()),
                                            factors.data(), 0, nullptr, nullptr, nullptr);

@@ -21,6 +21,15 @@ GeoRefPtr MakeGeoRef(const Description& block) {
   return owner;
 }
 
+/// The text that describes a block has no room for no-data values: they come as details.
+void ReadNoData(RasterDef& def) {
+  for (unsigned band = 0; band < def.bands; ++band) {
+    const auto value =
+        ToPixel<double>(FindDetail(def.metadata, BandDetailPath(band, "NoDataValue")));
+    if (value && FitsPixel(def.dataType, *value)) def.noData[band] = *value;
+  }
+}
+
 }  // namespace
 
 bool Connection::Connect(const Array<String>& connStrings, const GeoRefPtr& geoRef,
@@ -36,6 +45,7 @@ bool Connection::Connect(const Array<String>& connStrings, const GeoRefPtr& geoR
   def_.format = "MemoryRaster";
   def_.SetGeoRef(geoRef ? geoRef : MakeGeoRef(block));
   if (metadata) def_.metadata = *metadata;
+  ReadNoData(def_);
   connStrings_ = connStrings;
   block_ = std::move(block);
   return DispatchType(TwelveTypes{}, def_.dataType, [&]<typename T>() {

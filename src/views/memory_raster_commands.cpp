@@ -18,7 +18,7 @@ class CreateMemoryRasterCommand final : public RasterDefCommand {
     BasicRasterPtr made;
     const bool typed = DispatchType(EightTypes{}, def.dataType, [&]<typename T>() {
       made.Reset(new AutoMemoryRaster<T>("AutoMemoryRaster", def.samples, def.lines, def.bands,
-                                         def.interleave, def.geoRef));
+                                         def.interleave, def.geoRef, def.noData));
       return true;
     });
     return typed ? Publish(made) : Fail("DataType is no pixel type that a memory raster can have");

@@ -1,12 +1,12 @@
 #pragma once
 
 #include <cstdint>
-#include <new>
 
 #include "data/access_policy.h"
 #include "data/data_manager.h"
 #include "foundation/fault.h"
 #include "georef/std_georef.h"
+#include "raster/raster_details.h"
 #include "views/catalog_raster_ref.h"
 #include "views/memory_raster.h"
 
@@ -26,7 +26,8 @@ GeoRefPtr MakeStdGeoRef(double pixelSizeX, double pixelSizeY, double tieX, doubl
 /// Opens the block; empty, with the fault text told, when that can't be done.
 template <typename T>
 RasterPtr<T> OpenMemory(const String& name, T* pixelData, unsigned samples, unsigned lines,
-                        unsigned bands, Interleave interleave, const GeoRefPtr& geoRef) {
+                        unsigned bands, Interleave interleave, const GeoRefPtr& geoRef,
+                        const std::map<unsigned, double>& noData = {}) {
   if (pixelData == nullptr) return {};
   if (bands > 0xFFFF) {
     SetFault("a memory raster has no more than 65535 bands");
@@ -34,21 +35,14 @@ RasterPtr<T> OpenMemory(const String& name, T* pixelData, unsigned samples, unsi
   }
   const String text = MemoryConnectionText(pixelData, name, samples, lines, bands, interleave,
                                            kDataTypeOf<T>, geoRef);
-  const OwnMemoryScope own;
-  return RasterPtr<T>(MakeReaderRaster(GetGlobalDataManager().Connect(
-      ConnStrings({"MemoryRaster", text}), GeoRefPtr(), MetadataPtr())));
-}
-
-/// A block for so many pixels; none, with the fault told, when there is no memory.
-template <typename T>
-std::unique_ptr<T[]> AllocateBlock(unsigned samples, unsigned lines, unsigned bands) {
-  const double bytes = 1.0 * samples * lines * bands * sizeof(T);  // may be beyond any integer
-  std::unique_ptr<T[]> block;
-  if (bytes > 0 && bytes < static_cast<double>(PTRDIFF_MAX)) {
-    block.reset(new (std::nothrow) T[std::size_t{samples} * lines * bands]);
+  MetadataPtr details;
+  if (!noData.empty()) details.Reset(new Metadata);
+  for (const auto& [band, value] : noData) {
+    details->Set(BandDetailPath(band, "NoDataValue"), FormatValue(value));
   }
-  if (!block) SetFault("there is no memory for the raster");
-  return block;
+  const OwnMemoryScope own;
+  return RasterPtr<T>(MakeReaderRaster(
+      GetGlobalDataManager().Connect(ConnStrings({"MemoryRaster", text}), GeoRefPtr(), details)));
 }
 
 }  // namespace detail
@@ -95,16 +89,34 @@ lumo::TileDimensions MemoryRaster<T>::TileDimensions() const {
 template <typename T>
 AutoMemoryRaster<T>::AutoMemoryRaster(const String& name, unsigned samples, unsigned lines,
                                       unsigned bands, Interleave interleave,
-                                      const GeoRefPtr& geoRef)
-    : AutoMemoryRaster(name, detail::AllocateBlock<T>(samples, lines, bands), samples, lines, bands,
-                       interleave, geoRef) {}
+                                      const GeoRefPtr& geoRef,
+                                      const std::map<unsigned, double>& noData)
+    : AutoMemoryRaster(name, Allocate(samples, lines, bands), samples, lines, bands, interleave,
+                       geoRef, noData) {}
 
 template <typename T>
-AutoMemoryRaster<T>::AutoMemoryRaster(const String& name, std::unique_ptr<T[]> block,
-                                      unsigned samples, unsigned lines, unsigned bands,
-                                      Interleave interleave, const GeoRefPtr& geoRef)
-    : MemoryRaster<T>(name, block.get(), samples, lines, bands, interleave, geoRef),
+AutoMemoryRaster<T>::AutoMemoryRaster(const String& name, Block block, unsigned samples,
+                                      unsigned lines, unsigned bands, Interleave interleave,
+                                      const GeoRefPtr& geoRef,
+                                      const std::map<unsigned, double>& noData)
+    : MemoryRaster<T>(
+          detail::OpenMemory(name, block.get(), samples, lines, bands, interleave, geoRef, noData),
+          geoRef),
       block_(std::move(block)) {}
+
+/// A block for so many pixels; none, with the fault told, when there is no memory. All pixels are
+/// 0: memory that was in use before may hold anything.
+template <typename T>
+typename AutoMemoryRaster<T>::Block AutoMemoryRaster<T>::Allocate(unsigned samples, unsigned lines,
+                                                                  unsigned bands) {
+  const double bytes = 1.0 * samples * lines * bands * sizeof(T);  // may be beyond any integer
+  Block block;
+  if (bytes > 0 && bytes < static_cast<double>(PTRDIFF_MAX)) {
+    block.reset(static_cast<T*>(std::calloc(std::size_t{samples} * lines * bands, sizeof(T))));
+  }
+  if (!block) SetFault("there is no memory for the raster");
+  return block;
+}
 
 template <typename T>
 AutoMemoryRaster<T>::~AutoMemoryRaster() {

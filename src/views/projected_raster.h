@@ -21,6 +21,7 @@ struct ProjectedRasterOptions {
   ProjectedGrid grid = ProjectedGrid::kComputed;
   WarpSampling sampling = WarpSampling::kCorner;
   /// The no-data value of all bands, which pixels outside the parent have; otherwise the parent's.
+  /// With one that the pixel type can't hold, bands have none.
   std::optional<double> noData;
 };
 

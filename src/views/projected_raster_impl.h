@@ -5,6 +5,8 @@
 
 #include "foundation/fault.h"
 #include "pyramid/exact_levels.h"
+#include "raster/pixel_value.h"
+#include "raster/raster_details.h"
 #include "views/projected_raster.h"
 
 namespace lumo {
@@ -74,6 +76,7 @@ bool ProjectedRaster<T>::SetUp() {
   def_.samples = grid->Samples();
   def_.lines = grid->Lines();
   def_.SetGeoRef(grid);
+  KeepDetails(def_.metadata, KeptDetails::kBands);
   if (options_.noData) {
     for (unsigned band = 0; band < def_.bands; ++band) def_.noData[band] = *options_.noData;
     reprojection_.SetBackground(*options_.noData);
@@ -99,12 +102,14 @@ GeoRefPtr ProjectedRaster<T>::ComputedGrid(const GeoRef& source) const {
 
 template <typename T>
 bool ProjectedRaster<T>::HasNoDataValue(unsigned band) const {
-  return options_.noData ? band < def_.bands : ComputedRaster<T>::HasNoDataValue(band);
+  if (!options_.noData) return ComputedRaster<T>::HasNoDataValue(band);
+  return band < def_.bands && ToPixel<T>(*options_.noData).has_value();
 }
 
 template <typename T>
 T ProjectedRaster<T>::NoDataValue(unsigned band) const {
-  return options_.noData ? static_cast<T>(*options_.noData) : ComputedRaster<T>::NoDataValue(band);
+  return options_.noData ? ToPixel<T>(*options_.noData).value_or(T())
+                         : ComputedRaster<T>::NoDataValue(band);
 }
 
 template <typename T>

@@ -72,7 +72,8 @@ class Reprojection {
   /// Has positions come from a map of the grid, of the raster that Reproject is given, and no
   /// longer from the method.
   void SetMap(std::shared_ptr<const WarpMap> map) { map_ = std::move(map); }
-  /// The value of pixels outside the source; at first the source's no-data value, or 0.
+  /// The value of pixels outside the source; at first, and with one that T can't hold, the source's
+  /// no-data value, or 0.
   void SetBackground(double value) { background_ = value; }
 
   /// Fills a rectangle of the grid from the raster.

@@ -8,6 +8,7 @@
 #include "foundation/fault.h"
 #include "georef/coordsys_log.h"
 #include "raster/interleave.h"
+#include "raster/pixel_value.h"
 #include "raster/raster_def.h"
 #include "stats/plane_kernels.h"
 #include "views/reprojection.h"
@@ -177,7 +178,8 @@ typename Reprojection<T>::Outcome Reprojection<T>::Run(Raster<T>& parent, const 
 
   std::vector<T> background(wanted.GetCount());
   for (unsigned i = 0; i < wanted.GetCount(); ++i) {
-    background[i] = background_                        ? static_cast<T>(*background_)
+    const std::optional<T> own = background_ ? ToPixel<T>(*background_) : std::nullopt;
+    background[i] = own                                ? *own
                     : parent.HasNoDataValue(wanted[i]) ? parent.NoDataValue(wanted[i])
                                                        : T();
   }

@@ -3,6 +3,7 @@
 #include <algorithm>
 
 #include "pyramid/exact_levels.h"
+#include "raster/raster_details.h"
 #include "views/spatial_subset_raster.h"
 
 namespace lumo {
@@ -30,6 +31,7 @@ SpatialSubsetRaster<T>::SpatialSubsetRaster(const RasterPtr<T>& parent, const Su
   def_.samples = rect_.Width();
   def_.lines = rect_.Height();
   if (def_.geoRef) def_.SetGeoRef(PartGeoRef(*def_.geoRef, rect_, form_));
+  MovePlaceDetails(def_.metadata, rect_.left, rect_.top);
 }
 
 template <typename T>

@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <vector>
 
+#include "raster/raster_details.h"
 #include "views/spectral_subset_raster.h"
 
 namespace lumo {
@@ -22,6 +23,7 @@ SpectralSubsetRaster<T>::SpectralSubsetRaster(const RasterPtr<T>& parent,
     const auto value = noData.find(map_[band]);
     if (value != noData.end()) def_.noData[band] = value->second;
   }
+  ChooseBandDetails(def_.metadata, map_);
 }
 
 template <typename T>

@@ -1,3 +1,4 @@
+#include "raster/pixel_value.h"
 #include "views/band_stack_raster.h"
 #include "views/complex_raster.h"
 #include "views/projected_raster.h"
@@ -197,6 +198,10 @@ class CreateProjectedRasterCommand final : public ViewCommand {
     if (HasInput("Grid")) options.grid = Read<ProjectedGrid>("Grid");
     if (HasInput("Sampling")) options.sampling = Read<WarpSampling>("Sampling");
     if (HasInput("NoData")) options.noData = Read<double>("NoData");
+    const BasicRasterPtr parent = options.noData ? FindRaster("SrcURI") : BasicRasterPtr();
+    if (parent && !FitsPixel(parent->DataType(), *options.noData)) {
+      return Fail("NoData: the pixel type can't hold this value");
+    }
     return PublishView([&]<typename T>(const RasterPtr<T>& source) {
       return RasterPtr<T>(new ProjectedRaster<T>(source, target, method, resampling, options));
     });

@@ -9,9 +9,9 @@
 #include <CLI/CLI.hpp>
 #include <fmt/format.h>
 
+#include "keeping.h"
 #include "metadata_source.h"
 #include "raster/pixel_types.h"
-#include "raster_target.h"
 #include "verb.h"
 
 namespace lumo::host {
@@ -186,28 +186,22 @@ unsigned TypeCode(const Options& options) {
                                   "Single, Double");
 }
 
-/// What the result has in the place of pixels without data: a floating-point type NaN, which no
-/// result can be; else the value of the source.
-void AddNoData(JobWriterCommand& create, const RasterInfo& info, unsigned type) {
-  bool has = false;
-  for (const bool band : info.hasNoData) has = has || band;
-  const bool isReal = type == kDataTypeOf<float> || type == kDataTypeOf<double>;
-  if (!has || !isReal) return;
-  Array<double> values{ArrayDims(info.bands)};
-  for (double& value : values) value = std::numeric_limits<double>::quiet_NaN();
-  create.AddInput("HasNoDataValue", info.hasNoData);
-  create.AddInput("NoDataValue", values);
+bool IsReal(unsigned type) {
+  return type == kDataTypeOf<float> || type == kDataTypeOf<double>;
 }
 
 /// The whole of the work as one document.
-/// @param file  to make.
-JobDraft MakeDraft(const Options& options, const TargetPlace& place, const RasterInfo& info) {
+/// @param file    to make.
+/// @param noData  of bands, in the place of pixels that are not valid.
+JobDraft MakeDraft(const Options& options, const TargetPlace& place, const RasterInfo& info,
+                   const FillValues& noData) {
   JobDraft draft;
   AddOpen(draft, "source", options.source);
-  JobWriterCommand& create = AddCreate(draft, place, "$source");
+  AddQuery(draft, "source", "$source");
+  AddDetailsQuery(draft, "source", "$source");
   const unsigned type = TypeCode(options);
+  JobWriterCommand& create = AddCreate(draft, place, "$source", "Names", noData);
   create.AddInput("DataType", DataTypeName(type));
-  AddNoData(create, info, type);
   JobWriterCommand& calibrate = draft.Step(kCalibrateStep, CommandOf(options.quantity));
   calibrate.AddInput("SourceURI", String("$source"));
   calibrate.AddInput("CalibratedURI", String("$target"));
@@ -219,43 +213,60 @@ JobDraft MakeDraft(const Options& options, const TargetPlace& place, const Raste
   }
   calibrate.AddInput("ScaleFactor", options.scale);
   AddCloseTarget(draft);
+  if (!IsReal(type)) AddValidityQuery(draft, "source", "$source");
   draft.Close("close.source", "$source");
   return draft;
+}
+
+/// The no-data value of a result: of a floating-point type NaN, which no result can be; of others
+/// that of the source, unless another one is chosen.
+FillValues NoDataOf(const Options& options, unsigned bands, const FillValues& chosen) {
+  if (IsReal(TypeCode(options))) return FillValues(bands, std::numeric_limits<double>::quiet_NaN());
+  return chosen;
+}
+
+/// What the result shall hold. No results that are pixels with data are NaN: of floating-point
+/// types nothing need be counted.
+RasterContents Wanted(const Options& options, const JobResults& results) {
+  RasterContents put = ReadContents(results, "source");
+  put.info.dataType = TypeCode(options);
+  std::erase_if(put.details, [](const std::string& detail) {
+    return detail.find("/Description=") == detail.npos;
+  });
+  if (!IsReal(put.info.dataType)) put.valid = ReadValidPixels(results, "source.validity");
+  return put;
 }
 
 /// Makes the result in the output's folder. Throws what went wrong.
 void MakeResult(JobSession& session, const Options& options, const TargetPlace& place,
                 const OutputFile& output, const RasterInfo& info) {
-  const JobDraft draft = MakeDraft(options, place, info);
-  JobResults results;
-  {
-    const ProgressView view(ProgressOfStep(session, draft, kCalibrateStep),
-                            options.job.GetProgressStyle());
-    results = session.Run(draft);
-  }
-  CheckClosed(results);
-  RasterInfo wanted = info;
-  wanted.dataType = TypeCode(options);
-  CheckMade(session, place, output.GetShownName(), wanted);
+  Losses losses(output.GetShownName(), place.format, options.target.strict);
+  MadeRaster raster = MakeKept(session, place, losses, true, [&](const FillValues& noData) {
+    const JobDraft draft = MakeDraft(options, place, info, NoDataOf(options, info.bands, noData));
+    JobResults results;
+    {
+      const ProgressView view(ProgressOfStep(session, draft, kCalibrateStep),
+                              options.job.GetProgressStyle());
+      results = session.Run(draft);
+    }
+    CheckClosed(results);
+    return Wanted(options, results);
+  });
+  raster.put.info.hasNoData = raster.made.info.hasNoData;  // the source's are of another quantity
+  raster.isFilled = true;
+  CompareKept(raster, losses);
   session.CheckInterrupt();
+  losses.Settle();
 }
 
-/// Says what the numbers of the result may not hold.
-void NoteLimits(const Options& options, const RasterInfo& info) {
-  const unsigned type = TypeCode(options);
-  if (type == kDataTypeOf<float> || type == kDataTypeOf<double>) return;
-  if (options.quantity != "reflectance" && std::trunc(options.scale) != options.scale) {
-    throw HostError(kExitUsage,
-                    fmt::format("--scale: {} would be cut to {}, as the result is of {}",
-                                options.scale, std::trunc(options.scale), options.type));
-  }
-  for (const bool has : info.hasNoData) {
-    if (!has) continue;
-    Say(options.target.output +
-        ": note: a result that happens to be the no-data value is no data; --type Single keeps "
-        "them apart");
+/// Refuses a scale that the result's type would cut.
+void CheckScale(const Options& options) {
+  if (IsReal(TypeCode(options)) || options.quantity == "reflectance" ||
+      std::trunc(options.scale) == options.scale) {
     return;
   }
+  throw HostError(kExitUsage, fmt::format("--scale: {} would be cut to {}, as the result is of {}",
+                                          options.scale, std::trunc(options.scale), options.type));
 }
 
 int Calibrate(Options& options) {
@@ -286,9 +297,13 @@ int Calibrate(Options& options) {
   }
   output.RefuseInput(PathOf(opened.Find("source").returns.Find("URI")));
   const RasterInfo info = ReadInfo(opened, "source");
-  NoteLimits(options, info);
+  CheckScale(options);
   if (options.job.printJob) {
-    std::cout << MakeDraft(options, {output.GetName(), format}, info).Write().ToUTF8() << '\n';
+    std::cout << MakeDraft(options, {output.GetName(), format}, info,
+                           NoDataOf(options, info.bands, {}))
+                     .Write()
+                     .ToUTF8()
+              << '\n';
     return kExitSuccess;
   }
   output.Begin(BytesInFile(format, TypeCode(options), info.samples, info.lines, info.bands));
@@ -317,7 +332,7 @@ const VerbRegistration registration(
           "Constants are one value for each band, or one for all. Radiance is DN * gain + offset, "
           "0 where that is below 0; reflectance is that at the top of the atmosphere; temperature "
           "is that of a black body, in the unit of K2. The result is --scale times as large. "
-          "Pixels without data stay so; in a result of Single or Double they are NaN.\n"
+          "Pixels that are not valid stay so; in a result of Single or Double they are NaN.\n"
           "Example: vexg calibrate reflectance scene.tif reflectance.tif --gain 0.76,0.8,0.62 "
           "--offset -1.5,-2.8,-1.2 --irradiance 1970,1843,1555 --sun-elevation 49.6 --distance "
           "1.012\n");

@@ -7,7 +7,8 @@
 #include <fmt/format.h>
 
 #include "georef/covering_grid.h"
-#include "raster_target.h"
+#include "keeping.h"
+#include "raster/pixel_value.h"
 #include "verb.h"
 
 namespace lumo::host {
@@ -41,7 +42,9 @@ std::string Capital(std::string word) {
 }
 
 /// The warping as a whole: opens the source, stands views on it, makes the file and closes all.
-JobDraft MakeDraft(const Options& options, const Plan& plan, const std::string& target) {
+/// @param noData  of bands, in the place of pixels that are not valid.
+JobDraft MakeDraft(const Options& options, const Plan& plan, const std::string& target,
+                   const FillValues& noData) {
   JobDraft draft;
   AddOpen(draft, "source", options.source);
   std::vector<String> opened{"$source"};
@@ -59,10 +62,12 @@ JobDraft MakeDraft(const Options& options, const Plan& plan, const std::string& 
   if (options.noData) view.AddInput("NoData", *options.noData);
   opened.emplace_back("$warped");
   AddQuery(draft, "shown", opened.back());
-  AddCreate(draft, {target, plan.format}, opened.back());
+  AddDetailsQuery(draft, "shown", opened.back());
+  AddCreate(draft, {target, plan.format}, opened.back(), "Bands", noData);
   JobWriterCommand& copy = draft.Step(kWarpStep, "CopyRasterCommand");
   copy.AddVariableInput("SrcURI", opened.back());
   copy.AddVariableInput("DstURI", "$target");
+  copy.AddInput("Invalid", String(noData.empty() && !options.noData ? "Told" : "NoData"));
   AddCloseTarget(draft);
   for (auto raster = opened.rbegin(); raster != opened.rend(); ++raster) {
     draft.Close("close." + raster->ToUTF8().substr(1), *raster);
@@ -118,17 +123,32 @@ GeoRefPtr FindGrid(JobSession& session, const Options& options, const RasterInfo
 /// Makes the file in the output's folder. Throws what went wrong.
 void MakeFile(JobSession& session, const Options& options, const Plan& plan,
               const OutputFile& output) {
-  const JobDraft draft = MakeDraft(options, plan, output.GetWorkName());
-  JobResults results;
-  {
-    const ProgressView view(ProgressOfStep(session, draft, kWarpStep),
-                            options.job.GetProgressStyle());
-    results = session.Run(draft);
-  }
-  CheckClosed(results);
-  CheckMade(session, {output.GetWorkName(), plan.format}, output.GetShownName(),
-            ReadInfo(results, "shown"));
+  Losses losses(output.GetShownName(), plan.format, options.target.strict);
+  const MadeRaster raster =
+      MakeKept(session, {output.GetWorkName(), plan.format}, losses, !options.noData,
+               [&](const FillValues& noData) {
+                 const JobDraft draft = MakeDraft(options, plan, output.GetWorkName(), noData);
+                 JobResults results;
+                 {
+                   const ProgressView view(ProgressOfStep(session, draft, kWarpStep),
+                                           options.job.GetProgressStyle());
+                   results = session.Run(draft);
+                 }
+                 CheckClosed(results);
+                 RasterContents put = ReadContents(results, "shown");
+                 put.valid = ReadValidPixels(results, kWarpStep);
+                 return put;
+               });
+  CompareKept(raster, losses);
   session.CheckInterrupt();
+  losses.Settle();
+}
+
+/// Refuses a no-data value that no pixel can have.
+void CheckNoData(const Options& options, const RasterInfo& info) {
+  if (!options.noData || FitsPixel(info.dataType, *options.noData)) return;
+  throw HostError(kExitUsage, fmt::format("--no-data: a pixel of type {} can't be {}",
+                                          DataTypeName(info.dataType).ToUTF8(), *options.noData));
 }
 
 int Warp(const Options& options) {
@@ -142,10 +162,11 @@ int Warp(const Options& options) {
   const JobResults opened = session.Run(opening);
   output.RefuseInput(PathOf(opened.Find("source").returns.Find("URI")));
   const RasterInfo info = ReadInfo(opened, "source");
+  CheckNoData(options, info);
   plan.bands = ParseBands(options.bands, info);
   plan.grid = FindGrid(session, options, info);
   if (options.job.printJob) {
-    std::cout << MakeDraft(options, plan, output.GetName()).Write().ToUTF8() << '\n';
+    std::cout << MakeDraft(options, plan, output.GetName(), {}).Write().ToUTF8() << '\n';
     return kExitSuccess;
   }
   output.Begin(BytesInFile(plan.format, info.dataType, plan.grid->Samples(), plan.grid->Lines(),
@@ -165,7 +186,7 @@ const VerbRegistration registration(
       app.footer(
           "The polynomial method is within an eighth of a pixel; rigorous transforms every pixel. "
           "Linear and cubic leave out pixels that aren't valid; cubic has the parameter -1. Pixels "
-          "outside the source have the no-data value, or 0.\n"
+          "outside the source are not valid: they have the no-data value, or 0 under a mask.\n"
           "Example: vexg warp scene.tif geographic.tif --to EPSG:4326 --resampling linear\n");
       options->source.AddTo(app);
       options->target.AddTo(app, "The warped raster");

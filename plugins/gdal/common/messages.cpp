@@ -1,23 +1,56 @@
 #include "common/messages.h"
 
 #include <algorithm>
+#include <cctype>
 #include <cpl_error.h>
+#include <initializer_list>
+#include <string_view>
 
 #include "foundation/fault.h"
 
 namespace lumo::gdal {
+namespace {
+
+/// True for a text that holds one of the pieces, whatever the case of its letters.
+bool HoldsOneOf(const char* text, std::initializer_list<std::string_view> pieces) {
+  std::string lower(text);
+  std::transform(lower.begin(), lower.end(), lower.begin(),
+                 [](unsigned char c) { return static_cast<char>(std::tolower(c)); });
+  return std::any_of(pieces.begin(), pieces.end(),
+                     [&](std::string_view piece) { return lower.find(piece) != lower.npos; });
+}
+
+/// True for a warning by which a codec goes on with made-up pixels: libjpeg's of data that end too
+/// early or have bad codes (jerror.h, JWRN_...), libtiff's of PackBits and fax data
+/// (tif_packbits.c, tif_fax3.c), OpenJPEG's of streams and segments that are cut. Bytes between
+/// markers that nothing needs, unknown revisions and text pieces with bad check sums are harmless.
+bool TellsOfDamage(const char* text) {
+  return HoldsOneOf(text, {"corrupt", "premature", "truncat", "lack of data", "not enough data",
+                           "too short", "too long", "unexpected end", "bad code", "discarding",
+                           "line length mismatch", "inconsistent progression", "buffer overrun"}) &&
+         !HoldsOneOf(text, {"extraneous bytes"});
+}
+
+/// True for a warning that stands for a failure.
+bool IsOfFailure(const char* text, Messages::Damage damage) {
+  return HoldsOneOf(text, {"unable to save auxiliary information"}) ||
+         (damage == Messages::Damage::kIsError && TellsOfDamage(text));
+}
+
+}  // namespace
 
 struct Messages::Handler {
   static void CPL_STDCALL Take(CPLErr severity, CPLErrorNum, const char* text) {
     auto* const messages = static_cast<Messages*>(CPLGetErrorHandlerUserData());
     if (severity != CE_Warning && severity != CE_Failure && severity != CE_Fatal) return;
-    std::string& line = severity == CE_Warning ? messages->warning_ : messages->error_;
+    const bool isWarning = severity == CE_Warning && !IsOfFailure(text, messages->damage_);
+    std::string& line = isWarning ? messages->warning_ : messages->error_;
     line = text;
     std::replace(line.begin(), line.end(), '\n', ' ');
   }
 };
 
-Messages::Messages() {
+Messages::Messages(Damage damage) : damage_(damage) {
   CPLPushErrorHandlerEx(Handler::Take, this);
 }
 

@@ -8,13 +8,16 @@ namespace lumo::gdal {
 /// stream. They nest; each hears what is said while it is the innermost.
 class Messages {
  public:
-  Messages();
+  /// What is made of warnings by which codecs tell that pixels are damaged.
+  enum class Damage { kIsWarned, kIsError };
+
+  explicit Messages(Damage damage = Damage::kIsWarned);
   ~Messages();
   Messages(const Messages&) = delete;
   Messages& operator=(const Messages&) = delete;
 
+  /// True also when a file beside the raster could not be saved, which GDAL only warns of.
   bool HasError() const { return !error_.empty(); }
-  bool HasWarning() const { return !warning_.empty(); }
 
   /// The last error, else the last warning, in one line; empty when there was none.
   const std::string& Text() const { return HasError() ? error_ : warning_; }
@@ -29,6 +32,7 @@ class Messages {
  private:
   struct Handler;
 
+  const Damage damage_;
   std::string error_;
   std::string warning_;
 };
