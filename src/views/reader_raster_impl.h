@@ -263,7 +263,11 @@ bool ReaderRaster<T>::WriteStats() {
   for (unsigned band = 0; band < all.GetCount(); ++band) all[band] = BandStats(band);
   return StoreIn(&RasterReader<T>::CanWriteStats, [&](auto& reader) {
     if (!reader.WriteStats(all)) return false;
-    reader.SetStatsHoldFor(writes);
+    // A source that did not take away what isn't given has it of other pixels, perhaps.
+    const bool hasOthers = std::any_of(all.begin(), all.end(), [&](const auto& stats) {
+      return stats.mask == StatsMask::None && reader.StatsExist(stats.band);
+    });
+    if (!hasOthers) reader.SetStatsHoldFor(writes);
     return true;
   });
 }
@@ -374,12 +378,13 @@ bool ReaderRaster<T>::PutSubRect(const SubRect& rect, const Array<unsigned>& ban
                                  Interleave interleave, Array<T>& pixels,
                                  Array<unsigned char>& state) {
   if (!reader_ || !Holds(rect, bands) || !CanWrite()) return false;
+  const std::uint64_t before = WriteCount();
   bool isWritten = false;
   {
     const std::lock_guard lock(pixelLock_);
     isWritten = reader_->WriteBlock(rect, bands, 0, interleave, pixels, state);
   }
-  DropStatsOfPyramid();
+  if (WriteCount() != before) DropStatsOfPyramid();
   return isWritten;
 }
 

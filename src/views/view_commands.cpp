@@ -175,8 +175,9 @@ const CommandDeclaration kProjected{
      {"PyramidURI", Presence::kOptional, ValueKind::kURI, "has no effect"},
      {"PyramidLevel", Presence::kOptional, ValueKind::kInteger, "has no effect"},
      {"Grid", Presence::kOptional, ValueKind::kWord,
-      "Told: all of the raster, with pixels as large as its own; Exact: the GeoRef with its own "
-      "size, where a pixel is the same in every block",
+      "Told: all of the raster, with pixels as large as its own, and its statistics; Exact: the "
+      "GeoRef with its own size, where a pixel is the same in every block, and statistics of the "
+      "pixels there",
       "", &WordsIn<ProjectedGrid>},
      {"Sampling", Presence::kOptional, ValueKind::kWord,
       "Told: linear and cubic weigh from the corners of pixels and round toward zero; Centred: "

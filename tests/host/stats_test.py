@@ -134,7 +134,7 @@ class Hist(RasterTest):
     def test_counts_every_valid_value_once(self):
         cases = [("rgb1.tif", []), ("landsat7_u16_tiled.tif", ["--bands", "2,5", "--bins", "40"]),
                  ("dem_int16.tif", ["--bin-size", "7"]), ("rgb1.tif", ["--bin-size", "2.5"]),
-                 ("rgb1.tif", ["--bins", "100"]), ("float_raster_with_nodata.tif", ["--bins", "7"]),
+                 ("rgb1.tif", ["--bins", "100", "--lower", "-5", "--upper", "300"]), ("float_raster_with_nodata.tif", ["--bins", "7"]),
                  ("landsat7_f32_strip.tif", ["--bands", "1"]), ("float_nan.tif", ["--bins", "1"]),
                  ("landsat7_f32_strip.tif", ["--lower", "0.25", "--upper", "0.5", "--bins", "10"]),
                  ("dem_int16.tif", ["--lower", "10", "--upper", "19"]), ("all-nodata.tif", [])]
@@ -175,7 +175,8 @@ class Hist(RasterTest):
     def test_complaints(self):
         for options, words in ((["--bins", "9", "--bin-size", "1"], "exclude"), (["--bin-size", "0"], "above 0"),
                                (["--lower", "9", "--upper", "3"], "is above the upper"),
-                               (["--lower", "1.5"], "can't be 1.5"), (["--upper", "300"], "can't be 300")):
+                               (["--lower", "1.5"], "can't be 1.5"), (["--upper", "nan"], "can't be nan"),
+                               (["--lower", "300", "--upper", "400"], "no value that the pixels can have")):
             with self.subTest(words):
                 code, out, err = run("hist", str(DATA / "rgb1.tif"), *options)
                 self.assertEqual((code, out), (2, ""))

@@ -1,8 +1,11 @@
+#include "views/memory_raster.h"
+
 #include <cstdio>
 #include <cwchar>
 
 #include "support/raster_sources.h"
 #include "support/test_rasters.h"
+#include "views/spectral_subset_raster.h"
 
 namespace lumo::test {
 namespace {
@@ -111,6 +114,29 @@ TEST(MemoryRaster, APaletteLastsWithTheConnection) {
   EXPECT_EQ(reader->Palette(0).At(0)->r, 255);
   EXPECT_TRUE(reader->DeletePalette(0));
   EXPECT_FALSE(reader->HasPalette(0));
+}
+
+TEST(MemoryRaster, AWriteEndsStatisticsOfTheRasterAndItsViews) {
+  const RasterPtr<std::uint8_t> raster(
+      new AutoMemoryRaster<std::uint8_t>("block", 8, 4, 2, Interleave::BSQ, {}));
+  ASSERT_TRUE(raster->IsValid()) << TakeFault().ToUTF8();
+  const RasterPtr<std::uint8_t> view(
+      new SpectralSubsetRaster<std::uint8_t>(raster, MakeArray<unsigned>({1, 0})));
+  for (const std::uint8_t value : {5, 77}) {
+    Array<std::uint8_t> pixels{BlockDims(Interleave::BIP, 8, 4, 2)};
+    Array<unsigned char> states{pixels.GetDims()};
+    std::fill(pixels.begin(), pixels.end(), value);
+    std::fill(states.begin(), states.end(), static_cast<unsigned char>(0));
+    ASSERT_TRUE(raster->PutSubRect({0, 0, 7, 3}, MakeArray<unsigned>({0, 1}), Interleave::BIP,
+                                   pixels, states));
+    EXPECT_FALSE(raster->StatsExist(0, StatsMask::Mean));
+    EXPECT_EQ(view->BandHistogram(1).GetCount(), 0U);
+    EXPECT_EQ(raster->Mean(0, IPC()), value);
+    EXPECT_EQ(view->Max(1, IPC()), value);
+    view->HistogramAllBands(0, 255, 256, HistogramSign::kBoth, IPC())->WaitFinished();
+    ASSERT_EQ(raster->BandHistogram(0).GetCount(), 1U);
+    EXPECT_EQ(raster->BandHistogram(0)[0].counts[value], 32U);
+  }
 }
 
 TEST(MemoryRaster, TextsOfAnotherFormAreRefused) {

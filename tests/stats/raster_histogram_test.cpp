@@ -183,7 +183,7 @@ TYPED_TEST(HistogramOfType, ExactBinsHoldEveryValueWithinTheBounds) {
     };
     const double end = static_cast<double>(high) + (std::is_integral_v<T> ? 1 : 0);
     EXPECT_LT(edge(working->BinCount(0) - 1), end);
-    EXPECT_GE(edge(working->BinCount(0)), static_cast<double>(high));
+    EXPECT_GE(edge(working->BinCount(0)), high - 1e-12 * high);  // which the last bin holds anyway
     std::vector<unsigned long long> want(working->BinCount(0));
     for (std::size_t i = 0; i < scene->pixels.size(); ++i) {
       const T v = scene->pixels[i];

@@ -28,7 +28,7 @@ class PixelStore final : public TestRaster<Pixel> {
         states(pixels.size()) {
     for (std::size_t i = 0; i < pixels.size(); ++i) {
       seed = seed * 1664525 + 1013904223;  // Numerical Recipes
-      pixels[i] = static_cast<Pixel>(seed >> 18);
+      pixels[i] = static_cast<Pixel>(static_cast<int>(seed >> 18) - 8192);
       states[i] = seed % 11 == 0 ? PixelValueState::NoData : 0;
     }
   }
@@ -249,7 +249,7 @@ TEST_F(ViewStats, CommandsGiveTheMatricesOfAView) {
     first->SetStatsMode(StatsMode::kBasic);
     catalog::Add(view);
     auto got = RunCommand("GetExtendedRasterStatsCommand",
-                          {{"URI", "[" + view->GetURI().ToUTF8() + "] "}});
+                          {{"URI", FormatValue(view->GetURI()).ToUTF8()}});
     ASSERT_TRUE(got.Succeeded()) << got.reason;
     const auto sumXY = ParseValue<Array<double>>(String(got.outputs["SumXY"]));
     const auto all = ReadAll(*view);
@@ -337,7 +337,7 @@ TEST(VirtualRaster, ForwardsThePixelCount) {
 TEST(ViewCommands, AViewWithoutPixelsFails) {
   const Pointer<PixelStore> store(new PixelStore(5, 4, 1, 1));
   catalog::Add(store);
-  const std::string uri = "[" + store->GetURI().ToUTF8() + "] ";
+  const std::string uri = FormatValue(store->GetURI()).ToUTF8();
   for (const auto& [x, y] : {std::pair("6", "1"), {"1", "5"}}) {
     EXPECT_FALSE(
         RunCommand("CreateSkipRasterCommand", {{"SrcURI", uri}, {"SkipX", x}, {"SkipY", y}})

@@ -52,16 +52,17 @@ struct BandBins {
   }
 };
 
-/// A bound of the command line as a pixel value.
+/// A bound of the command line as a pixel value; the nearest one for a bound beyond them all.
 template <typename T>
 T BoundAs(double value, const char* option) {
-  if constexpr (std::is_floating_point_v<T>) {
-    if (std::isfinite(value) && std::isfinite(static_cast<T>(value))) return static_cast<T>(value);
-  } else {
-    const bool fits = value >= static_cast<double>(std::numeric_limits<T>::min()) &&
-                      value <= static_cast<double>(std::numeric_limits<T>::max());
-    if (fits && std::trunc(value) == value) return static_cast<T>(value);
+  if (value <= static_cast<double>(std::numeric_limits<T>::lowest())) {
+    return std::numeric_limits<T>::lowest();
   }
+  if (value >= static_cast<double>(std::numeric_limits<T>::max())) {
+    return std::numeric_limits<T>::max();
+  }
+  const bool isWhole = std::trunc(value) == value;
+  if (!std::isnan(value) && (std::is_floating_point_v<T> || isWhole)) return static_cast<T>(value);
   throw HostError(kExitUsage, fmt::format("{}: the pixels can't be {}", option, value));
 }
 
@@ -110,6 +111,12 @@ class HistogramJob {
 
  private:
   std::vector<BandBins<T>> ChooseBins() {
+    const bool isBeyond =
+        options_.lower.value_or(0) > static_cast<double>(std::numeric_limits<T>::max()) ||
+        options_.upper.value_or(0) < static_cast<double>(std::numeric_limits<T>::lowest());
+    if (isBeyond) {
+      throw HostError(kExitUsage, "between the bounds there is no value that the pixels can have");
+    }
     Array<T> lowest{bands_.GetDims()}, highest{bands_.GetDims()};
     constexpr bool kIsByte = sizeof(T) == 1;
     if (!kIsByte && !(options_.lower && options_.upper)) ReadExtremes(lowest, highest);
@@ -339,7 +346,9 @@ const VerbRegistration registration(
           "Without bounds, the bins reach from the smallest to the largest value of each band, or "
           "over all values of an 8-bit type; there are 256, or fewer where whole numbers fill "
           "fewer bins of one whole size. Every value within the bounds is in one bin; the last bin "
-          "holds the upper bound too. Values outside the bounds do not count. With --json: "
+          "holds the upper bound too. Values outside the bounds do not count; bounds that the "
+          "pixels "
+          "can't reach are limited to what they can. With --json: "
           "\"file\" and \"bands\", a list of objects with \"band\", \"min\", \"max\", \"binSize\" "
           "and \"counts\". -o draws them.\n"
           "Example: vexg hist scene.tif --bands 0,1,2 -o scene-histogram.png\n");
