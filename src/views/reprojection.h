@@ -41,8 +41,8 @@ VEXG_EXPORT std::span<const EnumWord<WarpSampling>> WordsOf(WarpSampling);
 /// system it always does.
 ///
 /// A pixel of the source holds the positions from its left and upper edge up to the next pixel's,
-/// that one's edge left out; WarpLimits::noise tells how positions by an affine map or a WarpMap
-/// are freed from the errors of arithmetic.
+/// that one's edge left out; WarpLimits::noise tells how positions by an affine map, or by the
+/// transforms of a WarpMap, are freed from the errors of arithmetic.
 ///
 /// Threads:   Reproject may run on many threads at once, where the raster allows it.
 /// Failure:   see Reproject. A polynomial that can't be fitted is replaced by the rigorous method

@@ -262,8 +262,6 @@ void Reprojection<T>::SampleMapped(Work& work, const Window& window,
                                    const MappedPart& mapped) const {
   const SubRectProj all(0, 0, static_cast<std::int32_t>(work.source.samples) - 1,
                         static_cast<std::int32_t>(work.source.lines) - 1);
-  const WarpLimits limits =
-      LimitsIn(all, map_->IsAffine() ? WarpLimits::kAffineNoise : WarpLimits::kTransformNoise);
   detail::RunEach(mapped.strips.size(), [&](unsigned i) {
     const detail::WarpStrip& strip = mapped.strips[i];
     const WarpPiece& piece = mapped.pieces[strip.piece];
@@ -272,14 +270,18 @@ void Reprojection<T>::SampleMapped(Work& work, const Window& window,
       detail::FillBackground(target, strip.rect);
       return;
     }
+    // A polynomial moves edges by far more than noise.
+    const bool isTransform = piece.way == WarpPiece::Way::kTransform;
+    const double noise = map_->IsAffine() ? WarpLimits::kAffineNoise
+                         : isTransform    ? WarpLimits::kTransformNoise
+                                          : 0.0;
     const auto width = static_cast<unsigned>(strip.rect.Width());
     const WarpPositions positions =
-        piece.way == WarpPiece::Way::kTransform
-            ? WarpPositions(&mapped.positions[strip.positions], width)
-            : WarpPositions(piece.fit, width, double(strip.rect.left) - piece.originX + 0.5,
-                            double(strip.rect.top) - piece.originY + 0.5);
+        isTransform ? WarpPositions(&mapped.positions[strip.positions], width)
+                    : WarpPositions(piece.fit, width, double(strip.rect.left) - piece.originX + 0.5,
+                                    double(strip.rect.top) - piece.originY + 0.5);
     const auto lines = static_cast<unsigned>(strip.rect.Height());
-    MakeSampler(positions, lines, limits, window.source, target)->Body(0, lines);
+    MakeSampler(positions, lines, LimitsIn(all, noise), window.source, target)->Body(0, lines);
   });
 }
 
