@@ -37,8 +37,8 @@ VEXG_EXPORT std::span<const EnumWord<WarpSampling>> WordsOf(WarpSampling);
 /// for EightTypes.
 ///
 /// At first a polynomial is fitted to each rectangle that is asked for, so that a pixel's position
-/// depends on the rectangle too. With SetMap it depends on the pixel alone. Within one coordinate
-/// system it always does.
+/// depends on the rectangle too. With SetMap it depends on the pixel alone, as it always does
+/// within one coordinate system and by the rigorous method.
 ///
 /// A pixel of the source holds the positions from its left and upper edge up to the next pixel's,
 /// that one's edge left out; WarpLimits::noise tells how positions by an affine map, or by the
@@ -96,6 +96,7 @@ class Reprojection {
 
   struct MappedPart;
 
+  Outcome RunWhole(Work& work) const;
   Outcome RunPart(Work& work, const SubRectProj& part) const;
   Outcome RunMapped(Work& work, const SubRectProj& part) const;
   Outcome RunHalves(Work& work, const SubRectProj& part) const;

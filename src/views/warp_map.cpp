@@ -98,11 +98,11 @@ WarpPolynomial PolynomialOf(const AffineLink& link) {
 }
 
 WarpMap::WarpMap(const GeoRefPtr& grid, const GeoRefPtr& source, unsigned samples, unsigned lines,
-                 double tolerance)
+                 double tolerance, Form form)
     : grid_(CloneOf(grid)),
       source_(CloneOf(source)),
       tolerance_(tolerance),
-      shift_(source_->GetType() == GeoRef::kRpc ? 0.5 : 0.0),
+      shift_(source_->GetType() == GeoRef::kRpc && form == Form::kExact ? 0.5 : 0.0),
       affine_(FindAffineLink(*grid_, *source_)) {
   source_->SetDimensions(samples, lines);
 }

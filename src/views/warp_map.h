@@ -7,6 +7,7 @@
 #include <unordered_map>
 #include <vector>
 
+#include "commands/value_text.h"
 #include "georef/affine_link.h"
 #include "views/reprojection_geometry.h"
 
@@ -48,8 +49,9 @@ class VEXG_EXPORT WarpMap {
   /// The geo-references are copied.
   /// @param samples,lines  of the source.
   /// @param tolerance      pixels of the source; 0 has every pixel transformed.
+  /// @param form           kTold: the positions of a camera stay as it counts them.
   WarpMap(const GeoRefPtr& grid, const GeoRefPtr& source, unsigned samples, unsigned lines,
-          double tolerance);
+          double tolerance, Form form = Form::kExact);
 
   /// True within one coordinate system.
   bool IsAffine() const { return affine_.has_value(); }
