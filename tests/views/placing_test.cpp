@@ -169,7 +169,6 @@ TEST(Placing, AnOverlapCountsAllThatIsCommon) {
     OverlapRaster<Pixel, Pixel> self(source, source);
     EXPECT_EQ(self.Samples(), kSamples);
     EXPECT_EQ(self.Lines(), kLines);
-    if (model.geoRef->GetType() == GeoRef::kRpc) continue;  // a polynomial of a whole camera
     EXPECT_EQ(self.PixelCount(0, IPC()), std::uint64_t{kSamples} * kLines);
     const Source part(new SpatialSubsetRaster<Pixel>(source, {101, 50, 130, 69}, Form::kExact));
     OverlapRaster<Pixel, Pixel> withPart(source, part);
