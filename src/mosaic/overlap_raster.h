@@ -1,9 +1,11 @@
 #pragma once
 
+#include <memory>
 #include <optional>
 
 #include "raster/raster_def.h"
 #include "views/computed_raster.h"
+#include "views/warp_map.h"
 
 namespace lumo {
 
@@ -59,7 +61,8 @@ class OverlapRaster final : public ComputedRaster<T> {
 
   RasterPtr<U> second_;
   RasterDef def_;
-  std::optional<SubRect> part_;  // pixels of the first raster, where the view has just these
+  std::optional<SubRect> part_;         // pixels of the first raster, where the view has just these
+  std::shared_ptr<const WarpMap> map_;  // to the second raster, where one has a camera alone
 };
 
 extern template class VEXG_EXPORT OverlapRaster<std::uint8_t, std::uint8_t>;

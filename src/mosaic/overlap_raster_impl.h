@@ -198,7 +198,14 @@ bool OverlapRaster<T, U>::SetUp() {
   const RasterDef second = second_->GetRasterDef();
   if (def_.geoRef.IsNull() || second.geoRef.IsNull()) return false;
   const bool isAlongTheMap = def_.geoRef->GetType() != GeoRef::kRpc && def_.geoRef->Rotation() == 0;
-  return isAlongTheMap ? CutInMap(second) : CutInPixels(second);
+  if (!(isAlongTheMap ? CutInMap(second) : CutInPixels(second))) return false;
+  const bool isCamera =
+      def_.geoRef->GetType() == GeoRef::kRpc || second.geoRef->GetType() == GeoRef::kRpc;
+  if (isCamera) {
+    map_ = std::make_shared<WarpMap>(def_.geoRef, second.geoRef, second.samples, second.lines,
+                                     WarpMap::kUsualTolerance);
+  }
+  return true;
 }
 
 /// Cuts the map rectangle of the first raster to that of the second one. The first pixel lies in
@@ -277,11 +284,11 @@ bool OverlapRaster<T, U>::GetSubRect(const SubRect& rect, const Array<unsigned>&
   Array<T> firstPixels;
   Array<U> secondPixels;
   Array<unsigned char> firstState, secondState;
-  const auto read = [&]<typename P>(Raster<P>& raster, Array<P>& into, Array<unsigned char>& of) {
+  const auto read = [&]<typename P>(Raster<P>& raster, const std::shared_ptr<const WarpMap>& map,
+                                    Array<P>& into, Array<unsigned char>& of) {
     Reprojection<P> reprojection(def_.geoRef, ReprojectionMethod::kPolynomial,
                                  PyramidResamplingMethod::kNearest);
-    // A camera counts from the middle of pixels.
-    if (def_.geoRef->GetType() == GeoRef::kRpc) reprojection.SetPixelCentres(false);
+    reprojection.SetMap(map);
     return reprojection.Run(raster, cut, bands, Interleave::BIP, into, of) !=
            Reprojection<P>::Outcome::kFailed;
   };
@@ -291,10 +298,10 @@ bool OverlapRaster<T, U>::GetSubRect(const SubRect& rect, const Array<unsigned>&
     if (!this->Parent()->GetSubRect(inFirst, bands, Interleave::BIP, firstPixels, firstState)) {
       return false;
     }
-  } else if (!read(*this->Parent(), firstPixels, firstState)) {
+  } else if (!read(*this->Parent(), {}, firstPixels, firstState)) {
     return false;
   }
-  if (!read(*second_, secondPixels, secondState)) return false;
+  if (!read(*second_, map_, secondPixels, secondState)) return false;
 
   OverlapRasterGetDataParallel<T> loop(
       width, height, count, {firstPixels.GetData(), firstState.GetData(), secondState.GetData()},

@@ -2,6 +2,7 @@
 
 #include <algorithm>
 
+#include "data/raster_reader.h"
 #include "raster/interleave.h"
 #include "views/band_stack_raster.h"
 
@@ -243,9 +244,10 @@ typename BandStackRaster<T>::Share BandStackRaster<T>::ShareOf(unsigned member,
 }
 
 template <typename T>
-bool BandStackRaster<T>::GetSubRect(const SubRect& rect, const Array<unsigned>& bands,
+bool BandStackRaster<T>::GetSubRect(const SubRect& rect, const Array<unsigned>& asked,
                                     Interleave interleave, Array<T>& pixels,
                                     Array<unsigned char>& state) {
+  const Array<unsigned> bands = BandsOfBlock(asked, interleave);
   if (!Knows(bands)) return false;
   const Share first = ShareOf(sources_[bands[0]].member, bands);
   if (first.bands.GetCount() == bands.GetCount()) {  // all of one member
@@ -280,9 +282,10 @@ bool BandStackRaster<T>::GetSubRect(const SubRect& rect, const Array<unsigned>& 
 }
 
 template <typename T>
-bool BandStackRaster<T>::PutSubRect(const SubRect& rect, const Array<unsigned>& bands,
+bool BandStackRaster<T>::PutSubRect(const SubRect& rect, const Array<unsigned>& asked,
                                     Interleave interleave, Array<T>& pixels,
                                     Array<unsigned char>& state) {
+  const Array<unsigned> bands = BandsOfBlock(asked, interleave);
   const unsigned width = rect.Width(), height = rect.Height(), count = bands.GetCount();
   const std::size_t plane = std::size_t{width} * height;
   const ArrayDims flat(BlockDims(interleave, width, height, count).count);

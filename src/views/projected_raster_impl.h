@@ -58,12 +58,11 @@ bool ProjectedRaster<T>::SetUp() {
   tiles_ = parent->TileDimensions();
   GeoRefPtr grid;
   if (options_.grid == ProjectedGrid::kExact) {
-    constexpr double kWarpTolerance = 0.125;
     constexpr unsigned kSquares = 256;
     grid = CloneOf(target_);
     const bool isRigorous = method_ == ReprojectionMethod::kRigorous;
     reprojection_.SetMap(std::make_shared<WarpMap>(grid, def_.geoRef, def_.samples, def_.lines,
-                                                   isRigorous ? 0.0 : kWarpTolerance));
+                                                   isRigorous ? 0.0 : WarpMap::kUsualTolerance));
     def_.tileWidth = def_.tileHeight = kSquares;  // squares cover least of a turned source
   } else {
     grid = ComputedGrid(*def_.geoRef);

@@ -37,12 +37,12 @@ VEXG_EXPORT std::span<const EnumWord<WarpSampling>> WordsOf(WarpSampling);
 /// for EightTypes.
 ///
 /// At first a polynomial is fitted to each rectangle that is asked for, so that a pixel's position
-/// depends on the rectangle too. With SetMap it depends on the pixel alone. Within one coordinate
-/// system it always does.
+/// depends on the rectangle too. With SetMap it depends on the pixel alone, as it always does
+/// within one coordinate system and by the rigorous method.
 ///
 /// A pixel of the source holds the positions from its left and upper edge up to the next pixel's,
-/// that one's edge left out; WarpLimits::noise tells how positions by an affine map or a WarpMap
-/// are freed from the errors of arithmetic.
+/// that one's edge left out; WarpLimits::noise tells how positions by an affine map, or by the
+/// transforms of a WarpMap, are freed from the errors of arithmetic.
 ///
 /// Threads:   Reproject may run on many threads at once, where the raster allows it.
 /// Failure:   see Reproject. A polynomial that can't be fitted is replaced by the rigorous method
@@ -97,6 +97,7 @@ class Reprojection {
 
   struct MappedPart;
 
+  Outcome RunWhole(Work& work) const;
   Outcome RunPart(Work& work, const SubRectProj& part) const;
   Outcome RunMapped(Work& work, const SubRectProj& part) const;
   Outcome RunHalves(Work& work, const SubRectProj& part) const;

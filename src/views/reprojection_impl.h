@@ -26,7 +26,8 @@ struct Reprojection<T>::Work {
   Array<unsigned> bands;
   Interleave interleave;
   std::vector<T> background;
-  WarpTarget<T> target;  // of the whole rectangle
+  WarpTarget<T> target;                // of the whole rectangle
+  std::shared_ptr<const WarpMap> map;  // of all positions, or empty
 };
 
 /// A block of the source.
@@ -60,6 +61,12 @@ inline SubRectProj HalfOf(const SubRectProj& rect, bool second) {
 
 inline bool CanHalve(const SubRectProj& rect) {
   return std::max(rect.Width(), rect.Height()) > kWarpLeastSide;
+}
+
+inline void LogSourceRect(const SubRectProj& rect, const BasicRaster& source) {
+  LogCoordSys(CoordSysLog::kReprojection,
+              "Reproject:            Src Rect l:%d, r:%d, t:%d, b:%d, pyramid lvl: %d", rect.left,
+              rect.right, rect.top, rect.bottom, static_cast<int>(source.GetPyramidDef().level));
 }
 
 /// Makes pixels of a rectangle that lie outside the source.
@@ -190,10 +197,10 @@ typename Reprojection<T>::Outcome Reprojection<T>::Run(Raster<T>& parent, const 
       data.GetData(), state.GetData(),
       BlockStrides(interleave, rect.Width(), rect.Height(), wanted.GetCount()), wanted.GetCount(),
       background.data()};
-  Work work{parent, *grid, std::move(source), whole, wanted, interleave, background, target};
+  Work work{parent, *grid, std::move(source), whole, wanted, interleave, background, target, map_};
   work.target.background = work.background.data();
 
-  const Outcome outcome = map_ ? RunMapped(work, whole) : RunPart(work, whole);
+  const Outcome outcome = RunWhole(work);
   if (outcome == Outcome::kDone) return outcome;
   detail::FillBackground(work.target, whole);
   if (outcome == Outcome::kMissed) {
@@ -203,6 +210,21 @@ typename Reprojection<T>::Outcome Reprojection<T>::Run(Raster<T>& parent, const 
                 "Reproject: Error: GetSubRect on parent raster failed.");
   }
   return outcome;
+}
+
+template <typename T>
+typename Reprojection<T>::Outcome Reprojection<T>::RunWhole(Work& work) const {
+  const bool isEachTransformed = method_ == ReprojectionMethod::kRigorous && pixelCentres_;
+  if (!work.map && isEachTransformed) {
+    const CoveredRect covered =
+        BaseSubRectToSecSubRect(work.grid, work.rect, *work.source.geoRef, work.source.samples,
+                                work.source.lines, resampling_);
+    if (covered.misses && !covered.isPartial) return Outcome::kMissed;
+    const GeoRefPtr& grid = outputGrid_ ? outputGrid_ : target_;
+    work.map = std::make_shared<WarpMap>(grid, work.source.geoRef, work.source.samples,
+                                         work.source.lines, 0.0, Form::kTold);
+  }
+  return work.map ? RunMapped(work, work.rect) : RunPart(work, work.rect);
 }
 
 template <typename T>
@@ -222,10 +244,7 @@ typename Reprojection<T>::Outcome Reprojection<T>::RunPart(Work& work,
     return Outcome::kMissed;
   }
   const SubRectProj& from = covered.rect;
-  LogCoordSys(CoordSysLog::kReprojection,
-              "Reproject:            Src Rect l:%d, r:%d, t:%d, b:%d, pyramid lvl: %d", from.left,
-              from.right, from.top, from.bottom,
-              static_cast<int>(work.parent.GetPyramidDef().level));
+  detail::LogSourceRect(from, work.parent);
   const std::uint64_t bytes = static_cast<std::uint64_t>(from.Width() * from.Height()) *
                               work.bands.GetCount() * (sizeof(T) + 1);
   if (bytes > detail::kWarpWindowBytes && detail::CanHalve(part)) return RunHalves(work, part);
@@ -242,13 +261,14 @@ typename Reprojection<T>::Outcome Reprojection<T>::RunMapped(Work& work,
   if (part.Width() * part.Height() > detail::kWarpMappedPixels && detail::CanHalve(part)) {
     return RunHalves(work, part);
   }
-  const MappedPart mapped(*map_, part);
+  const MappedPart mapped(*work.map, part);
   const WarpBounds bounds = mapped.Bounds(work.source);
   if (bounds.IsEmpty()) {
     detail::FillBackground(detail::TargetOf(work.target, work.rect, part), part);
     return Outcome::kMissed;
   }
   const SubRectProj from = bounds.Pixels(SamplingMargin(resampling_));
+  detail::LogSourceRect(from, work.parent);
   const std::uint64_t bytes = static_cast<std::uint64_t>(from.Width() * from.Height()) *
                               work.bands.GetCount() * (sizeof(T) + 1);
   if (bytes > detail::kWarpWindowBytes && detail::CanHalve(part)) return RunHalves(work, part);
@@ -264,8 +284,6 @@ void Reprojection<T>::SampleMapped(Work& work, const Window& window,
                                    const MappedPart& mapped) const {
   const SubRectProj all(0, 0, static_cast<std::int32_t>(work.source.samples) - 1,
                         static_cast<std::int32_t>(work.source.lines) - 1);
-  const WarpLimits limits =
-      LimitsIn(all, map_->IsAffine() ? WarpLimits::kAffineNoise : WarpLimits::kTransformNoise);
   detail::RunEach(mapped.strips.size(), [&](unsigned i) {
     const detail::WarpStrip& strip = mapped.strips[i];
     const WarpPiece& piece = mapped.pieces[strip.piece];
@@ -274,14 +292,18 @@ void Reprojection<T>::SampleMapped(Work& work, const Window& window,
       detail::FillBackground(target, strip.rect);
       return;
     }
+    // A polynomial moves edges by far more than noise.
+    const bool isTransform = piece.way == WarpPiece::Way::kTransform;
+    const double noise = work.map->IsAffine() ? WarpLimits::kAffineNoise
+                         : isTransform        ? WarpLimits::kTransformNoise
+                                              : 0.0;
     const auto width = static_cast<unsigned>(strip.rect.Width());
     const WarpPositions positions =
-        piece.way == WarpPiece::Way::kTransform
-            ? WarpPositions(&mapped.positions[strip.positions], width)
-            : WarpPositions(piece.fit, width, double(strip.rect.left) - piece.originX + 0.5,
-                            double(strip.rect.top) - piece.originY + 0.5);
+        isTransform ? WarpPositions(&mapped.positions[strip.positions], width)
+                    : WarpPositions(piece.fit, width, double(strip.rect.left) - piece.originX + 0.5,
+                                    double(strip.rect.top) - piece.originY + 0.5);
     const auto lines = static_cast<unsigned>(strip.rect.Height());
-    MakeSampler(positions, lines, limits, window.source, target)->Body(0, lines);
+    MakeSampler(positions, lines, LimitsIn(all, noise), window.source, target)->Body(0, lines);
   });
 }
 
@@ -289,7 +311,7 @@ template <typename T>
 typename Reprojection<T>::Outcome Reprojection<T>::RunHalves(Work& work,
                                                              const SubRectProj& part) const {
   const auto run = [&](const SubRectProj& half) {
-    return map_ ? RunMapped(work, half) : RunPart(work, half);
+    return work.map ? RunMapped(work, half) : RunPart(work, half);
   };
   const Outcome first = run(detail::HalfOf(part, false));
   if (first == Outcome::kFailed) return first;

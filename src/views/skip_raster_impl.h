@@ -2,6 +2,7 @@
 
 #include <algorithm>
 
+#include "data/raster_reader.h"
 #include "georef/derived_georef.h"
 #include "raster/interleave.h"
 #include "views/skip_raster.h"
@@ -57,7 +58,7 @@ SubRect SkipRaster<T>::ReadAtOnce(const SubRect& rect, unsigned x, unsigned y,
   const unsigned bottom = y + std::min(inTile - 1, rect.bottom - y);
   constexpr std::uint64_t kMostBytes = std::uint64_t{64} << 20;
   const std::uint64_t columnBytes =
-      (std::uint64_t{bottom - y} * skipY_ + 1) * bands * (sizeof(T) + 1);
+      (std::uint64_t{bottom - y} * skipY_ + 1) * std::max(bands, 1U) * (sizeof(T) + 1);
   const std::uint64_t tileWidth = std::max(def_.tileWidth, 1U);
   const std::uint64_t columns =
       std::max<std::uint64_t>(kMostBytes / columnBytes / tileWidth, 1) * tileWidth;
@@ -71,9 +72,10 @@ template <typename T>
 bool SkipRaster<T>::GetSubRect(const SubRect& rect, const Array<unsigned>& bands,
                                Interleave interleave, Array<T>& pixels,
                                Array<unsigned char>& state) {
-  const unsigned width = rect.Width(), height = rect.Height(), count = bands.GetCount();
+  const Array<unsigned> wanted = BandsOfBlock(bands, interleave);
+  const unsigned width = rect.Width(), height = rect.Height(), count = wanted.GetCount();
   const ArrayDims dims = BlockDims(interleave, width, height, count);
-  if (!this->Parent() || rect.right >= Samples() || rect.bottom >= Lines() || count == 0 ||
+  if (!this->Parent() || rect.right >= Samples() || rect.bottom >= Lines() ||
       !pixels.Resize(dims) || !state.Resize(dims)) {
     return false;
   }
@@ -93,7 +95,7 @@ bool SkipRaster<T>::GetSubRect(const SubRect& rect, const Array<unsigned>& bands
       part = ReadAtOnce(rect, x, y, count);
       const SubRect inParent(part.left * skipX_, part.top * skipY_, part.right * skipX_,
                              part.bottom * skipY_);
-      if (!this->Parent()->GetSubRect(inParent, bands, Interleave::BIP, block, blockState)) {
+      if (!this->Parent()->GetSubRect(inParent, wanted, Interleave::BIP, block, blockState)) {
         return false;
       }
       const std::size_t step = std::size_t{skipX_} * count;
@@ -117,7 +119,8 @@ template <typename T>
 bool SkipRaster<T>::PutSubRect(const SubRect& rect, const Array<unsigned>& bands,
                                Interleave interleave, Array<T>& pixels,
                                Array<unsigned char>& state) {
-  const unsigned width = rect.Width(), height = rect.Height(), count = bands.GetCount();
+  const Array<unsigned> wanted = BandsOfBlock(bands, interleave);
+  const unsigned width = rect.Width(), height = rect.Height(), count = wanted.GetCount();
   const ArrayDims flat(BlockDims(interleave, width, height, count).count);
   if (!this->Parent() || rect.right >= Samples() || rect.bottom >= Lines() ||
       pixels.GetCount() < flat.count || state.GetCount() < flat.count) {
@@ -138,7 +141,7 @@ bool SkipRaster<T>::PutSubRect(const SubRect& rect, const Array<unsigned>& bands
   Array<unsigned char> lineState;
   for (unsigned y = rect.top; y <= rect.bottom; ++y) {
     const SubRect inParent = LineInParent(rect, y);
-    if (!this->Parent()->GetSubRect(inParent, bands, Interleave::BIP, line, lineState)) {
+    if (!this->Parent()->GetSubRect(inParent, wanted, Interleave::BIP, line, lineState)) {
       return false;
     }
     const std::size_t step = std::size_t{skipX_} * count;
@@ -146,7 +149,7 @@ bool SkipRaster<T>::PutSubRect(const SubRect& rect, const Array<unsigned>& bands
       std::copy_n(fromPixel, count, &line[x * step]);
       std::copy_n(fromState, count, &lineState[x * step]);
     }
-    if (!this->Parent()->PutSubRect(inParent, bands, Interleave::BIP, line, lineState)) {
+    if (!this->Parent()->PutSubRect(inParent, wanted, Interleave::BIP, line, lineState)) {
       return false;
     }
   }

@@ -27,6 +27,11 @@ bool Intersect(const SubRectProj& a, const SubRectProj& b, SubRectProj& both) {
   return true;
 }
 
+/// From the pixels of a model to those that count from the corner of the first one.
+double CornerShift(const GeoRef& model, Form form) {
+  return model.GetType() == GeoRef::kRpc && form == Form::kExact ? 0.5 : 0.0;
+}
+
 /// Places of the net in a rectangle, counted from its corner: x, then y.
 std::vector<double> NetOf(const SubRectProj& rect) {
   const auto at = [](double i, double last) { return kCentre + i * last / (kNet - 1); };
@@ -98,11 +103,12 @@ WarpPolynomial PolynomialOf(const AffineLink& link) {
 }
 
 WarpMap::WarpMap(const GeoRefPtr& grid, const GeoRefPtr& source, unsigned samples, unsigned lines,
-                 double tolerance)
+                 double tolerance, Form form)
     : grid_(CloneOf(grid)),
       source_(CloneOf(source)),
       tolerance_(tolerance),
-      shift_(source_->GetType() == GeoRef::kRpc ? 0.5 : 0.0),
+      gridShift_(-CornerShift(*grid_, form)),
+      sourceShift_(CornerShift(*source_, form)),
       affine_(FindAffineLink(*grid_, *source_)) {
   source_->SetDimensions(samples, lines);
 }
@@ -194,14 +200,14 @@ WarpMap::Node WarpMap::MakeNode(const Square& square) const {
 /// Carries places in a rectangle of the grid to the source. False unless all can be carried.
 bool WarpMap::CarryNet(const SubRectProj& rect, std::vector<double>& points) const {
   for (std::size_t i = 0; i < points.size(); i += 2) {
-    points[i] += rect.left;
-    points[i + 1] += rect.top;
+    points[i] += rect.left + gridShift_;
+    points[i + 1] += rect.top + gridShift_;
   }
   Array<double> wrapped(points.data(), ArrayDims(static_cast<unsigned>(points.size() / 2), 2));
   CarryPixels(*grid_, *source_, wrapped);
   bool isWhole = true;
   for (double& value : points) {
-    value += shift_;
+    value += sourceShift_;
     isWhole = isWhole && std::isfinite(value);
   }
   return isWhole;
@@ -227,13 +233,14 @@ void WarpMap::Transform(const SubRectProj& rect, double* positions) const {
   double* at = positions;
   for (std::int64_t y = rect.top; y <= rect.bottom; ++y) {
     for (std::int64_t x = rect.left; x <= rect.right; ++x) {
-      *at++ = static_cast<double>(x) + kCentre;
-      *at++ = static_cast<double>(y) + kCentre;
+      *at++ = static_cast<double>(x) + kCentre + gridShift_;
+      *at++ = static_cast<double>(y) + kCentre + gridShift_;
     }
   }
   Array<double> points(positions, ArrayDims(count, 2));
   CarryPixels(*grid_, *source_, points);
-  for (at = positions; shift_ != 0 && at != positions + 2 * std::size_t{count}; ++at) *at += shift_;
+  if (sourceShift_ == 0) return;
+  for (at = positions; at != positions + 2 * std::size_t{count}; ++at) *at += sourceShift_;
 }
 
 void WarpBounds::AddFit(const WarpPiece& piece) {

@@ -7,6 +7,7 @@
 #include <unordered_map>
 #include <vector>
 
+#include "commands/value_text.h"
 #include "georef/affine_link.h"
 #include "views/reprojection_geometry.h"
 
@@ -39,17 +40,20 @@ VEXG_EXPORT WarpPolynomial PolynomialOf(const AffineLink& link);
 /// transformed one by one. So it goes too where some point can't be carried, and where the source
 /// comes to an end and begins anew, as at the date line and the poles.
 ///
-/// Positions count from the corner of the source's first pixel, whatever its model: to those of a
-/// camera, which counts from the middle, a half is added.
+/// Pixels of both count from the corner of the first one, whatever their models: between that and
+/// what a camera counts, from the middle, lies a half.
 ///
 /// Threads:   every operation may run on many threads at once.
 class VEXG_EXPORT WarpMap {
  public:
+  static constexpr double kUsualTolerance = 0.125;
+
   /// The geo-references are copied.
   /// @param samples,lines  of the source.
   /// @param tolerance      pixels of the source; 0 has every pixel transformed.
+  /// @param form           kTold: the positions of cameras stay as these count them.
   WarpMap(const GeoRefPtr& grid, const GeoRefPtr& source, unsigned samples, unsigned lines,
-          double tolerance);
+          double tolerance, Form form = Form::kExact);
 
   /// True within one coordinate system.
   bool IsAffine() const { return affine_.has_value(); }
@@ -81,7 +85,8 @@ class VEXG_EXPORT WarpMap {
   GeoRefPtr grid_;
   GeoRefPtr source_;
   double tolerance_;
-  double shift_;  // from the source's pixel coordinates to those that count from a corner
+  double gridShift_;    // from coordinates that count from a corner to the grid's own
+  double sourceShift_;  // from the source's to such
   std::optional<AffineLink> affine_;
   mutable std::mutex lock_;
   mutable std::unordered_map<std::uint64_t, Node> nodes_;  // some that were needed

@@ -65,6 +65,32 @@ class Placing(FolderTest):
         self.assertIn("SAMP_OFF=750\n", told)
 
 
+    def test_copies_of_levels_have_pixels_of_their_size(self):
+        scene = self.translate("scene.tif", "-outsize", "1500", "1500", *CORNERS, "300000", "4640000", "345000", "4595000")
+        self.fine("pyramid", "build", scene, "--levels", "1-8")
+        for placing, size in (("", 9000), ('Placing="Told"', 9000), ('Placing="Exact"', 7680)):
+            copy = self.folder / f"level{size}.tif"
+            copy.unlink(missing_ok=True)
+            steps = [("OpenRasterCommand", f'ConnStr="{scene}" PyramidConnStr="Pyramid|{scene}.pyr"', "URI", "$scene"),
+                     ("GetRasterPyramidCommand", f'URI="$scene" Level="8" {placing}', "PyramidURI", "$level"),
+                     ("CreateRasterCommand", f'ConnStr="{copy}" Format="TIFF" SrcURI="$level"', "URI", "$copy"),
+                     ("CopyRasterCommand", 'SrcURI="$level" DstURI="$copy"', "", ""),
+                     ("CloseRasterCommand", 'URI="$copy"', "", ""),
+                     ("CloseRasterCommand", 'URI="$level"', "", ""),
+                     ("CloseRasterCommand", 'URI="$scene"', "", "")]
+            job = "".join(
+                f'<Command ID="{command}" Name="s{i}">'
+                + (f'<DependsOn Name="s{i - 1}"/>' if i else "") + (f'<Output {name}="{variable}"/>' if name else "")
+                + f"<Input {inputs}/></Command>" for i, (command, inputs, name, variable) in enumerate(steps))
+            document = self.folder / "job.xml"
+            document.write_text(f'<?xml version="1.0" encoding="UTF-8" standalone="no" ?><Job>{job}</Job>')
+            self.fine("run", document)
+            told = subprocess.run(["gdalinfo", copy], capture_output=True, text=True, check=True).stdout
+            self.assertIn(f"Pixel Size = ({size}.0", told)
+        printed = self.fine("read", scene, "--level", "8", "-o", self.folder / "o.npy", "--print-job")
+        self.assertIn('Placing="Exact"', printed)
+
+
 @needs_data
 @needs_gdal
 @unittest.skipUnless(shutil.which("gdalwarp"), "needs gdalwarp")

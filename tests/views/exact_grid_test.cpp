@@ -222,6 +222,45 @@ TEST(ExactGrid, LosesNoPixelAndKeepsItsBound) {
   }
 }
 
+TEST(ToldGrid, ReadsAllOfTheSourceThatABlockFallsOn) {
+  const auto source = MakePlaced<float>(
+      MakeGrid(-180, 90, 0.5, 720, 360, "EPSG:4326"), 2,
+      [](unsigned x, unsigned y, unsigned band) { return (band == 0 ? x : y) + 0.5f; });
+  const GeoRefPtr grids[] = {MakeGrid(-4e6, 4.3e6, 20000, 400, 400, "EPSG:3995"),
+                             MakeGrid(-4.1e6, 4e6, 20000, 400, 400, "EPSG:3031"),
+                             MakeGrid(-1.8e7, 9e6, 60000, 600, 300, kMollweide)};
+  for (const GeoRefPtr& grid : grids) {
+    const std::vector<double> positions = Positions(*grid, *source->geoRef);
+    const Reprojection<float> reprojection(grid, kRigorous, kNearest);
+    for (const unsigned step : {60U, 97U, 256U}) {
+      unsigned lost = 0, wrong = 0;
+      for (unsigned top = 0; top < grid->Lines(); top += step)
+        for (unsigned left = 0; left < grid->Samples(); left += step) {
+          const SubRect rect(left, top, std::min(left + step, grid->Samples()) - 1,
+                             std::min(top + step, grid->Lines()) - 1);
+          Block<float> block;
+          reprojection.Reproject(*source, rect, MakeArray<unsigned>({0, 1}), Interleave::BIP,
+                                 block.pixels, block.state);
+          for (unsigned i = 0; i < rect.Width() * rect.Height(); ++i) {
+            const std::size_t at = 2 * ((top + i / rect.Width()) * std::size_t{grid->Samples()} +
+                                        left + i % rect.Width());
+            const double x = positions[at], y = positions[at + 1];
+            // This form leaves out the source's last column and line.
+            const bool isIn = x >= 0 && x < 719 && y >= 0 && y < 359;
+            if (block.state[2 * i] != 0) {
+              lost += isIn ? 1 : 0;
+            } else {
+              wrong += std::abs(block.pixels[2 * i] - x) > 0.5 + 1e-6 ||
+                       std::abs(block.pixels[2 * i + 1] - y) > 0.5 + 1e-6;
+            }
+          }
+        }
+      EXPECT_EQ(lost, 0u) << "blocks of " << step;
+      EXPECT_EQ(wrong, 0u) << "blocks of " << step;
+    }
+  }
+}
+
 TEST(ExactGrid, CountsACamerasPixelsFromTheirMiddle) {
   RpcCoefficients rpc;  // a sample is a thousandth of a degree, and so is a line
   rpc.lineOffset = 100;

@@ -169,7 +169,6 @@ TEST(Placing, AnOverlapCountsAllThatIsCommon) {
     OverlapRaster<Pixel, Pixel> self(source, source);
     EXPECT_EQ(self.Samples(), kSamples);
     EXPECT_EQ(self.Lines(), kLines);
-    if (model.geoRef->GetType() == GeoRef::kRpc) continue;  // a polynomial of a whole camera
     EXPECT_EQ(self.PixelCount(0, IPC()), std::uint64_t{kSamples} * kLines);
     const Source part(new SpatialSubsetRaster<Pixel>(source, {101, 50, 130, 69}, Form::kExact));
     OverlapRaster<Pixel, Pixel> withPart(source, part);
@@ -275,11 +274,17 @@ TEST(SkipRaster, DecodesEachTileOnce) {
     EXPECT_EQ(counting->tiles, c.tiles);
     EXPECT_LE(counting->most, 10'000'000u);
     std::size_t at = 0;
-    for (const unsigned band : {1U, 0U})
+    for (const unsigned band : {1U, 0U}) {
       for (unsigned y = 0; y < view.Lines(); ++y)
         for (unsigned x = 0; x < view.Samples(); ++x) {
           ASSERT_EQ(pixels[at++], RampValue<Pixel>(x * c.skipX, y * c.skipY, band));
         }
+    }
+    // A block without bands is the first of them.
+    ASSERT_TRUE(view.GetSubRect({0, 0, 2, 1}, MakeArray<unsigned>({1, 0}), Interleave::None, pixels,
+                                state));
+    EXPECT_EQ(pixels.GetDims(), ArrayDims(2, 3));
+    EXPECT_EQ(pixels[5], RampValue<Pixel>(2 * c.skipX, c.skipY, 1));
   }
 }
 
