@@ -230,7 +230,7 @@ bool NewRaster::TryTheFormat() {
     return true;
   }
   std::string fault;
-  const bool isRounded = bool(def_.geoRef) && FindMaker(driver_)->roundsGrid;
+  const bool isRounded = FindMaker(driver_)->roundsGrid && (def_.geoRef || HasPlaceDetails(def_));
   for (const Given given : {Given::kAll, Given::kBands, Given::kNothing}) {
     if (given == Given::kAll && isRounded) continue;
     given_ = given;

@@ -260,6 +260,11 @@ void WriteBandDetails(GDALDatasetH dataset, const RasterDef& def) {
   }
 }
 
+bool HasPlaceDetails(const RasterDef& def) {
+  const Wanted wanted(def);
+  return wanted.hasGrid || !wanted.points.empty() || !wanted.coordSys.empty();
+}
+
 bool WritePlaceDetails(GDALDatasetH dataset, const RasterDef& def) {
   const Wanted wanted(def);
   const SystemPtr system = MakeSystem(wanted.coordSys);

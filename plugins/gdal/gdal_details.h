@@ -16,7 +16,10 @@ void ReadDetails(GDALDatasetH dataset, bool hasGrid, Metadata& metadata);
 /// for them.
 void WriteBandDetails(GDALDatasetH dataset, const RasterDef& def);
 
-/// Gives it those of the place. False when GDAL refuses them.
+/// True when a definition has details of the place.
+bool HasPlaceDetails(const RasterDef& def);
+
+/// Gives a dataset those of the place. False when GDAL refuses them.
 bool WritePlaceDetails(GDALDatasetH dataset, const RasterDef& def);
 
 /// Puts those that a file doesn't tell by itself into the file beside it.

@@ -4,6 +4,7 @@
 
 #include "georef/std_georef.h"
 #include "memory_reader.h"
+#include "raster/pixel_value.h"
 
 namespace lumo::memory {
 namespace {
@@ -21,15 +22,6 @@ GeoRefPtr MakeGeoRef(const Description& block) {
   return owner;
 }
 
-/// The text that describes a block has no room for no-data values: they come as details.
-void ReadNoData(RasterDef& def) {
-  for (unsigned band = 0; band < def.bands; ++band) {
-    const auto value =
-        ToPixel<double>(FindDetail(def.metadata, BandDetailPath(band, "NoDataValue")));
-    if (value && FitsPixel(def.dataType, *value)) def.noData[band] = *value;
-  }
-}
-
 }  // namespace
 
 bool Connection::Connect(const Array<String>& connStrings, const GeoRefPtr& geoRef,
@@ -45,7 +37,9 @@ bool Connection::Connect(const Array<String>& connStrings, const GeoRefPtr& geoR
   def_.format = "MemoryRaster";
   def_.SetGeoRef(geoRef ? geoRef : MakeGeoRef(block));
   if (metadata) def_.metadata = *metadata;
-  ReadNoData(def_);
+  for (const auto& [band, value] : block.noData) {
+    if (band < def_.bands && FitsPixel(def_.dataType, value)) def_.noData[band] = value;
+  }
   connStrings_ = connStrings;
   block_ = std::move(block);
   return DispatchType(TwelveTypes{}, def_.dataType, [&]<typename T>() {

@@ -6,7 +6,6 @@
 #include "memory_connection.h"
 #include "raster/no_data_marker.h"
 #include "raster/pixel_value.h"
-#include "raster/raster_details.h"
 
 namespace lumo::memory {
 
@@ -19,7 +18,8 @@ class Reader final : public RasterReader<T> {
       : RasterReader<T>(connection), block_(connection->Block()) {
     const lumo::RasterDef def = connection->RasterDef();
     for (unsigned band = 0; band < block_.layout.bands; ++band) {
-      noData_.push_back(ToPixel<T>(FindDetail(def.metadata, BandDetailPath(band, "NoDataValue"))));
+      const auto value = def.noData.find(band);
+      noData_.push_back(value != def.noData.end() ? ToPixel<T>(value->second) : std::nullopt);
     }
   }
 

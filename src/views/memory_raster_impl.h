@@ -6,7 +6,6 @@
 #include "data/data_manager.h"
 #include "foundation/fault.h"
 #include "georef/std_georef.h"
-#include "raster/raster_details.h"
 #include "views/catalog_raster_ref.h"
 #include "views/memory_raster.h"
 
@@ -23,6 +22,9 @@ String MemoryConnectionText(const void* pixelData, const String& name, unsigned 
 GeoRefPtr MakeStdGeoRef(double pixelSizeX, double pixelSizeY, double tieX, double tieY,
                         const String& coordSys);
 
+/// The connection string of its no-data values: "NODATA=<band>:<value>,<band>:<value>".
+String MemoryNoDataText(const std::map<unsigned, double>& noData);
+
 /// Opens the block; empty, with the fault text told, when that can't be done.
 template <typename T>
 RasterPtr<T> OpenMemory(const String& name, T* pixelData, unsigned samples, unsigned lines,
@@ -35,14 +37,11 @@ RasterPtr<T> OpenMemory(const String& name, T* pixelData, unsigned samples, unsi
   }
   const String text = MemoryConnectionText(pixelData, name, samples, lines, bands, interleave,
                                            kDataTypeOf<T>, geoRef);
-  MetadataPtr details;
-  if (!noData.empty()) details.Reset(new Metadata);
-  for (const auto& [band, value] : noData) {
-    details->Set(BandDetailPath(band, "NoDataValue"), FormatValue(value));
-  }
+  Array<String> strings = ConnStrings({"MemoryRaster", text});
+  if (!noData.empty() && strings.Resize(ArrayDims(3))) strings[2] = MemoryNoDataText(noData);
   const OwnMemoryScope own;
-  return RasterPtr<T>(MakeReaderRaster(
-      GetGlobalDataManager().Connect(ConnStrings({"MemoryRaster", text}), GeoRefPtr(), details)));
+  return RasterPtr<T>(
+      MakeReaderRaster(GetGlobalDataManager().Connect(strings, GeoRefPtr(), MetadataPtr())));
 }
 
 }  // namespace detail

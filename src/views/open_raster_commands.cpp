@@ -2,11 +2,46 @@
 
 #include "commands/catalog.h"
 #include "data/data_manager.h"
+#include "data/file_uri.h"
+#include "data/raster_reader.h"
 #include "foundation/fault.h"
 #include "views/publish_raster.h"
 
 namespace lumo {
 namespace {
+
+/// Which levels a raster shows that has some of its own beside a pyramid file.
+enum class LevelChoice : unsigned { kTold = 0, kBest = 1 };
+
+std::span<const EnumWord<LevelChoice>> WordsOf(LevelChoice) {
+  static constexpr EnumWord<LevelChoice> kWords[] = {{"Told", LevelChoice::kTold},
+                                                     {"Best", LevelChoice::kBest}};
+  return kWords;
+}
+
+std::vector<OutputDeclaration> OpenOutputs() {
+  std::vector<OutputDeclaration> outputs = PublishedOutputs();
+  outputs.push_back({"Note", ValueKind::kText,
+                     "which levels are shown, where Levels is Best and there are two sets of them; "
+                     "only then"});
+  return outputs;
+}
+
+/// When the levels that a file has itself were last written.
+std::filesystem::file_time_type TimeOfOwnLevels(const std::string& path) {
+  std::error_code fault;
+  const auto beside = std::filesystem::last_write_time(path + ".ovr", fault);
+  return fault ? std::filesystem::last_write_time(path, fault) : beside;
+}
+
+/// True when the levels of a source itself are newer than those of a pyramid file, or finer.
+bool AreOwnLevelsBetter(BasicRasterReader& own, const std::string& path, BasicRasterReader& pyramid,
+                        const std::string& pyramidPath) {
+  if (!pyramid.PyramidExists() || own.PyramidLevelMin() < pyramid.PyramidLevelMin()) return true;
+  std::error_code fault;
+  const auto time = std::filesystem::last_write_time(pyramidPath, fault);
+  return !fault && TimeOfOwnLevels(path) > time;
+}
 
 const CommandDeclaration kOpen{
     "OpenRasterCommand",
@@ -18,8 +53,12 @@ const CommandDeclaration kOpen{
       "a pyramid file that belongs to it; one that isn't there yet can be built"},
      {"PyramidNew", Presence::kOptional, ValueKind::kBoolean,
       "1: a pyramid file that is there is not looked at, only replaced by a build"},
-     {"GeoRef", Presence::kOptional, ValueKind::kGeoRef, "in place of the source's own"}},
-    PublishedOutputs()};
+     {"GeoRef", Presence::kOptional, ValueKind::kGeoRef, "in place of the source's own"},
+     {"Levels", Presence::kOptional, ValueKind::kWord,
+      "of a source that has levels of its own beside a pyramid file. Told: those of the pyramid "
+      "file; Best: its own where they are newer, or begin with a finer one",
+      "", &WordsIn<LevelChoice>}},
+    OpenOutputs()};
 
 class OpenRasterCommand final : public PublishCommand {
   CommandResult Execute() override {
@@ -44,9 +83,35 @@ class OpenRasterCommand final : public PublishCommand {
     const DataConnectionPtr pyramid =
         ConnectPyramid(pyramidStrings, RasterDataConnectionPtr(source));
     if (!pyramid) return Fail();
+    if (Read<LevelChoice>("Levels") == LevelChoice::kBest && ChoosesOwn(source, pyramid)) {
+      return Publish(CatalogRasterRef(connStrings, geoRef, MetadataPtr(), true, false));
+    }
     BasicRasterPtr raster(catalog::Find(source->URI()));
     if (!raster) raster = MakeReaderRaster(source, pyramid);
     return Publish(CatalogRasterRef(raster, false));
+  }
+
+  /// True when the levels of the source itself are to be shown; notes which are where there are two
+  /// sets.
+  bool ChoosesOwn(const DataConnectionPtr& source, const DataConnectionPtr& pyramid) {
+    const auto own = ReaderOf(source), beside = ReaderOf(pyramid);
+    if (!own || !beside || !own->PyramidExists()) return false;
+    const std::string path = PathOfFileURI(source->URI());
+    const std::string pyramidPath = PathOfFileURI(pyramid->URI());
+    const bool isBetter = AreOwnLevelsBetter(*own, path, *beside, pyramidPath);
+    if (beside->PyramidExists()) {
+      Write("Note", String(path + ": has levels of its own and a pyramid file; " +
+                           (isBetter ? "its own are used, which are newer or begin with a finer one"
+                                     : "those of the pyramid file are used")));
+    }
+    return isBetter;
+  }
+
+  static Pointer<BasicRasterReader> ReaderOf(const DataConnectionPtr& connection) {
+    const RasterDataConnectionPtr source(connection);
+    const RasterReaderDispatchPtr dispatch =
+        source ? source->RasterReaderDispatch() : RasterReaderDispatchPtr();
+    return dispatch ? dispatch->GetBasic() : Pointer<BasicRasterReader>();
   }
 
   /// Opens a pyramid; one of the library's own that isn't there, or is to be replaced, has no file

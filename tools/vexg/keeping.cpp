@@ -210,11 +210,13 @@ bool IsSamePlace(const GeoRefPtr& wanted, const GeoRefPtr& made) {
   for (const double x : {0.0, 0.5, 1.0}) {
     for (const double y : {0.0, 0.5, 1.0}) {
       const double pixelX = x * wanted->Samples(), pixelY = y * wanted->Lines();
-      double mapX = 0, mapY = 0, backX = 0, backY = 0;
+      double mapX = 0, mapY = 0, nextX = 0, nextY = 0, madeX = 0, madeY = 0;
       constexpr double kOff = 1e-3;
-      const bool isSame = wanted->PixelToMap(pixelX, pixelY, mapX, mapY) &&
-                          made->MapToPixel(mapX, mapY, backX, backY) &&
-                          std::abs(backX - pixelX) <= kOff && std::abs(backY - pixelY) <= kOff;
+      const bool isSame =
+          wanted->PixelToMap(pixelX, pixelY, mapX, mapY) &&
+          wanted->PixelToMap(pixelX + 1, pixelY, nextX, nextY) &&
+          made->PixelToMap(pixelX, pixelY, madeX, madeY) &&
+          std::hypot(madeX - mapX, madeY - mapY) <= kOff * std::hypot(nextX - mapX, nextY - mapY);
       if (!isSame) return false;
     }
   }

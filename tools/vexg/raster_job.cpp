@@ -105,7 +105,16 @@ JobResults JobSession::Run(const JobDraft& draft) {
   NoteOpenRasters(draft, results);
   CheckInterrupt();
   CheckResults(draft, results);
+  SayNotes(draft, results);
   return results;
+}
+
+/// Says what the opening of a raster noted, once.
+void JobSession::SayNotes(const JobDraft& draft, const JobResults& results) {
+  for (const JobDraft::StepInfo& step : draft.GetSteps()) {
+    const std::string note = results.Find(step.name).returns.Find("Note").ToUTF8();
+    if (step.opens.GetLength() != 0 && !note.empty() && said_.insert(note).second) Say(note);
+  }
 }
 
 /// @param watched  with the progress and the abort flag of the session.

@@ -10,6 +10,7 @@
 
 #include "histogram_plot.h"
 #include "json_number.h"
+#include "picture_writer.h"
 #include "raster/band_values.h"
 #include "raster_target.h"
 #include "stats/raster_histogram.h"
@@ -319,6 +320,7 @@ int Hist(const Options& options) {
   }
   std::optional<OutputFile> output;
   if (!options.output.empty()) {
+    CheckPictureName(options.output);
     output.emplace(options.output, options.overwrite, std::vector{options.source.file});
   }
   JobSession session(options.job);
@@ -359,8 +361,8 @@ const VerbRegistration registration(
       app.add_option("--bins", options->bins, "How many bins; no more than there are whole numbers")
           ->check(CLI::Range(1U, kMostBins));
       app.add_option("--bin-size", options->binSize, "Width of a bin")->type_name("SIZE");
-      app.add_option("-o,--output", options->output, "A picture of the histograms")
-          ->type_name("OUT.png");
+      app.add_option("-o,--output", options->output, "A picture of the histograms, a PNG or JPEG")
+          ->type_name("OUT.png|jpg");
       app.add_flag("--overwrite", options->overwrite, "Replace a picture that is there");
       app.add_flag("--save", options->save, "Store the histograms with the raster");
       app.add_flag("--json", options->json, "As JSON");

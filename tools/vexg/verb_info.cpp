@@ -203,7 +203,9 @@ JobDraft MakeDraft(const SourceOptions& source) {
 
 int PrintJobs(const Options& options) {
   for (const std::string& file : options.files) {
-    std::cout << MakeDraft({file, options.source.format}).Write().ToUTF8() << '\n';
+    std::cout
+        << MakeDraft({file, options.source.format, options.source.subdataset}).Write().ToUTF8()
+        << '\n';
   }
   return kExitSuccess;
 }
@@ -217,7 +219,8 @@ int Info(const Options& options) {
   for (const std::string& file : options.files) {
     try {
       const RasterInfo info =
-          ReadInfo(session.Run(MakeDraft({file, options.source.format})), "raster");
+          ReadInfo(session.Run(MakeDraft({file, options.source.format, options.source.subdataset})),
+                   "raster");
       if (options.json) {
         all.push_back(AsJson(file, info));
       } else {

@@ -29,7 +29,7 @@ struct Options {
 
   bool IsDriver() const { return type == "DRIVER"; }
   std::string PyramidPath() const {
-    return output.empty() ? PyramidPathOf(source.file) : AbsoluteName(output);
+    return output.empty() ? PyramidPathOf(FileOf(source)) : AbsoluteName(output);
   }
 };
 
@@ -118,7 +118,7 @@ int Build(const Options& options) {
 /// Opens the raster with the pyramid that the options name, or that lies beside it.
 void AddOpenToLook(JobDraft& draft, const Options& options) {
   if (options.output.empty() && !options.IsDriver()) {
-    AddOpenWithPyramid(draft, "raster", options.source);
+    AddOpenWithPyramid(draft, "raster", options.source, "Told");
     return;
   }
   JobWriterCommand& open = draft.Open("raster", "OpenRasterCommand");

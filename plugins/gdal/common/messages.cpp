@@ -46,6 +46,9 @@ struct Messages::Handler {
     const bool isWarning = severity == CE_Warning && !IsOfFailure(text, messages->damage_);
     std::string& line = isWarning ? messages->warning_ : messages->error_;
     line = text;
+    // A hint at settings that no user of ours has.
+    const std::size_t hint = line.find(" (this warning can be turned");
+    if (hint != line.npos) line.erase(hint);
     std::replace(line.begin(), line.end(), '\n', ' ');
   }
 };
