@@ -4,9 +4,9 @@
 #include <cmath>
 #include <optional>
 
+#include "data/block_shape.h"
 #include "mosaic/overlap_raster.h"
 #include "raster/block_strides.h"
-#include "raster/interleave.h"
 #include "tasks/parallel_ranges.h"
 #include "views/reprojection.h"
 
@@ -166,10 +166,8 @@ bool OverlapRaster<T, U>::GetSubRect(const SubRect& rect, const Array<unsigned>&
   const unsigned lastX = def_.samples - 1, lastY = def_.lines - 1;
   const SubRect cut(std::min(rect.left, lastX), std::min(rect.top, lastY),
                     std::min(rect.right, lastX), std::min(rect.bottom, lastY));
-  const unsigned width = cut.Width(), height = cut.Height(), count = bands.GetCount();
-  const ArrayDims dims = BlockDims(interleave, width, height, count);
-  if (dims.count != std::uint64_t{width} * height * count) return false;
-  if (!pixels.Resize(dims) || !state.Resize(dims)) return false;
+  const BlockShape block(cut, bands, interleave);
+  if (!block.Size(pixels, state)) return false;
 
   constexpr auto kNearest = PyramidResamplingMethod::kNearest;
   Array<T> firstPixels;
@@ -177,15 +175,17 @@ bool OverlapRaster<T, U>::GetSubRect(const SubRect& rect, const Array<unsigned>&
   Array<unsigned char> firstState, secondState;
   const auto read = [&]<typename P>(Raster<P>& raster, Array<P>& into, Array<unsigned char>& of) {
     const Reprojection<P> reprojection(def_.geoRef, ReprojectionMethod::kPolynomial, kNearest);
-    return reprojection.Run(raster, cut, bands, Interleave::BIP, into, of) !=
+    return reprojection.Run(raster, cut, block.bands, Interleave::BIP, into, of) !=
            Reprojection<P>::Outcome::kFailed;
   };
   if (!read(*this->Parent(), firstPixels, firstState)) return false;
   if (!read(*second_, secondPixels, secondState)) return false;
 
   OverlapRasterGetDataParallel<T> loop(
-      width, height, count, {firstPixels.GetData(), firstState.GetData(), secondState.GetData()},
-      BlockStrides(interleave, width, height, count), pixels.GetData(), state.GetData());
+      block.width, block.height, block.count,
+      {firstPixels.GetData(), firstState.GetData(), secondState.GetData()},
+      BlockStrides(interleave, block.width, block.height, block.count), pixels.GetData(),
+      state.GetData());
   RunParallelFor(loop);
   return true;
 }

@@ -1,4 +1,5 @@
 #include "data/data_manager.h"
+#include "data/open_sources.h"
 #include "foundation/fault.h"
 #include "views/raster_def_command.h"
 #include "views/temp_raster.h"
@@ -18,8 +19,13 @@ class CreateRasterCommand final : public RasterDefCommand {
   CommandResult Execute() override {
     RasterDef def;
     if (!CheckInputs() || !ReadRasterDef(def)) return Fail();
-    return Publish(
-        MakeReaderRaster(GetGlobalDataManager().CreateRaster(Read<Array<String>>("ConnStr"), def)));
+    const auto connStrings = Read<Array<String>>("ConnStr");
+    const SourceClaim claim(connStrings);
+    if (!claim.IsGranted()) {
+      return Fail("the source is open already, and left as it is: " +
+                  connStrings[connStrings.GetCount() - 1]);
+    }
+    return Publish(MakeReaderRaster(GetGlobalDataManager().CreateRaster(connStrings, def)));
   }
 };
 

@@ -2,7 +2,7 @@
 
 #include <algorithm>
 
-#include "raster/interleave.h"
+#include "data/block_shape.h"
 #include "views/skip_raster.h"
 
 namespace lumo {
@@ -52,16 +52,16 @@ template <typename T>
 bool SkipRaster<T>::GetSubRect(const SubRect& rect, const Array<unsigned>& bands,
                                Interleave interleave, Array<T>& pixels,
                                Array<unsigned char>& state) {
-  const unsigned width = rect.Width(), height = rect.Height(), count = bands.GetCount();
-  const ArrayDims dims = BlockDims(interleave, width, height, count);
+  const BlockShape block(rect, bands, interleave);
   if (!this->Parent() || rect.right >= Samples() || rect.bottom >= Lines() ||
-      !pixels.Resize(dims) || !state.Resize(dims)) {
+      !block.Size(pixels, state)) {
     return false;
   }
+  const unsigned count = block.count;
   const bool inOrder = interleave == Interleave::BIP || count == 1;
   Array<T> bip;
   Array<unsigned char> bipState;
-  const ArrayDims flat(dims.count);
+  const ArrayDims flat(block.dims.count);
   if (!inOrder && (!bip.Resize(flat) || !bipState.Resize(flat))) return false;
   T* toPixel = inOrder ? pixels.GetData() : bip.GetData();
   unsigned char* toState = inOrder ? state.GetData() : bipState.GetData();
@@ -69,39 +69,34 @@ bool SkipRaster<T>::GetSubRect(const SubRect& rect, const Array<unsigned>& bands
   Array<T> line;
   Array<unsigned char> lineState;
   for (unsigned y = rect.top; y <= rect.bottom; ++y) {
-    if (!this->Parent()->GetSubRect(LineInParent(rect, y), bands, Interleave::BIP, line,
+    if (!this->Parent()->GetSubRect(LineInParent(rect, y), block.bands, Interleave::BIP, line,
                                     lineState)) {
       return false;
     }
     const std::size_t step = std::size_t{skipX_} * count;
-    for (unsigned x = 0; x < width; ++x) {
+    for (unsigned x = 0; x < block.width; ++x) {
       toPixel = std::copy_n(&line[x * step], count, toPixel);
       toState = std::copy_n(&lineState[x * step], count, toState);
     }
   }
-  return inOrder || (ConvertInterleave(bip.GetData(), Interleave::BIP, pixels.GetData(), interleave,
-                                       width, height, count, sizeof(T)) &&
-                     ConvertInterleave(bipState.GetData(), Interleave::BIP, state.GetData(),
-                                       interleave, width, height, count, 1));
+  return inOrder || block.Convert(bip, bipState, Interleave::BIP, pixels, state, interleave);
 }
 
 template <typename T>
 bool SkipRaster<T>::PutSubRect(const SubRect& rect, const Array<unsigned>& bands,
                                Interleave interleave, Array<T>& pixels,
                                Array<unsigned char>& state) {
-  const unsigned width = rect.Width(), height = rect.Height(), count = bands.GetCount();
-  const ArrayDims flat(BlockDims(interleave, width, height, count).count);
+  const BlockShape block(rect, bands, interleave);
   if (!this->Parent() || rect.right >= Samples() || rect.bottom >= Lines() ||
-      pixels.GetCount() < flat.count || state.GetCount() < flat.count) {
+      !block.IsHeldBy(pixels, state)) {
     return false;
   }
+  const unsigned count = block.count;
+  const ArrayDims flat(block.dims.count);
   Array<T> bip;
   Array<unsigned char> bipState;
   if (!bip.Resize(flat) || !bipState.Resize(flat) ||
-      !ConvertInterleave(pixels.GetData(), interleave, bip.GetData(), Interleave::BIP, width,
-                         height, count, sizeof(T)) ||
-      !ConvertInterleave(state.GetData(), interleave, bipState.GetData(), Interleave::BIP, width,
-                         height, count, 1)) {
+      !block.Convert(pixels, state, interleave, bip, bipState, Interleave::BIP)) {
     return false;
   }
   const T* fromPixel = bip.GetData();
@@ -110,15 +105,15 @@ bool SkipRaster<T>::PutSubRect(const SubRect& rect, const Array<unsigned>& bands
   Array<unsigned char> lineState;
   for (unsigned y = rect.top; y <= rect.bottom; ++y) {
     const SubRect inParent = LineInParent(rect, y);
-    if (!this->Parent()->GetSubRect(inParent, bands, Interleave::BIP, line, lineState)) {
+    if (!this->Parent()->GetSubRect(inParent, block.bands, Interleave::BIP, line, lineState)) {
       return false;
     }
     const std::size_t step = std::size_t{skipX_} * count;
-    for (unsigned x = 0; x < width; ++x, fromPixel += count, fromState += count) {
+    for (unsigned x = 0; x < block.width; ++x, fromPixel += count, fromState += count) {
       std::copy_n(fromPixel, count, &line[x * step]);
       std::copy_n(fromState, count, &lineState[x * step]);
     }
-    if (!this->Parent()->PutSubRect(inParent, bands, Interleave::BIP, line, lineState)) {
+    if (!this->Parent()->PutSubRect(inParent, block.bands, Interleave::BIP, line, lineState)) {
       return false;
     }
   }

@@ -94,6 +94,9 @@ class JobSession {
   std::vector<String> open_;  // URIs
 };
 
+/// Has a server run a job of one verb. Throws HostError as a JobSession does.
+JobResults RunOnServer(const ServerOptions& server, const JobDraft& draft);
+
 /// How far one command of a job has come, where the commands run one after the other.
 class StepProgress final : public ProgressReport {
  public:

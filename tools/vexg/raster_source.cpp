@@ -10,6 +10,7 @@
 #include "data/format_table.h"
 #include "raster/pixel_types.h"
 #include "verb.h"
+#include "views/catalog_raster_ref.h"
 
 namespace lumo::host {
 namespace {
@@ -64,7 +65,9 @@ Array<String> ConnStringsOf(const SourceOptions& source) {
 }
 
 void AddOpen(JobDraft& draft, const std::string& name, const SourceOptions& source) {
-  draft.Open(name, "OpenRasterCommand").AddInput("ConnStr", ConnStringsOf(source));
+  JobWriterCommand& open = draft.Open(name, "OpenRasterCommand");
+  open.AddInput("ConnStr", ConnStringsOf(source));
+  open.AddInput("CheckSource", SourceCheck::kCompared);
 }
 
 std::string PyramidPathOf(const std::string& file) {
@@ -94,6 +97,7 @@ std::string FindPyramid(const std::string& file) {
 void AddOpenWithPyramid(JobDraft& draft, const std::string& name, const SourceOptions& source) {
   JobWriterCommand& open = draft.Open(name, "OpenRasterCommand");
   open.AddInput("ConnStr", ConnStringsOf(source));
+  open.AddInput("CheckSource", SourceCheck::kCompared);
   const std::string pyramid = FindPyramid(source.file);
   if (!pyramid.empty()) open.AddInput("PyramidConnStr", ConnStrings({"Pyramid", String(pyramid)}));
 }
