@@ -54,9 +54,10 @@ class PrivateServers {
 template <typename Serve>
 void ServeAll(NamedPipe& pipe, const SimpleThread& thread, const Serve& serve) {
   constexpr auto kBreather = std::chrono::milliseconds(10);  // for memory to come back
-  while (!thread.StopRequested()) {
+  bool goesOn = true;
+  while (goesOn && !thread.StopRequested()) {
     try {
-      if (!serve()) return;
+      goesOn = serve();
     } catch (...) {
       std::this_thread::sleep_for(kBreather);
       try {
@@ -66,6 +67,7 @@ void ServeAll(NamedPipe& pipe, const SimpleThread& thread, const Serve& serve) {
       }
     }
   }
+  pipe.FinishAnswers();
 }
 
 /// True when a text is longer in UTF-8, with a zero byte, than `bytes`.

@@ -6,12 +6,14 @@
 #include <compare>
 #include <cstring>
 #include <fcntl.h>
+#include <limits>
 #include <list>
 #include <mutex>
 #include <new>
 #include <poll.h>
 #include <set>
 #include <sys/file.h>
+#include <sys/resource.h>
 #include <sys/socket.h>
 #include <sys/stat.h>
 #include <sys/syscall.h>
@@ -159,6 +161,16 @@ FileDescriptor ListenAt(const std::string& path) {
   return {};
 }
 
+/// How many clients one listener may have at a time, so that most of the descriptors of the process
+/// are left for what it does.
+unsigned MostClients() {
+  rlimit limit{};
+  if (getrlimit(RLIMIT_NOFILE, &limit) != 0) return std::numeric_limits<unsigned>::max();
+  constexpr rlim_t kShare = 4;
+  const rlim_t share = std::max<rlim_t>(limit.rlim_cur / kShare, 1);
+  return static_cast<unsigned>(std::min<rlim_t>(share, std::numeric_limits<int>::max()));
+}
+
 bool HasLivingServer(const std::string& path) {
   FileDescriptor probe;
   const int fault = ConnectSocket(path, 0.0, probe);
@@ -226,6 +238,7 @@ std::unique_ptr<PipeListener> PipeListener::Open(const std::string& name, PipeFa
                                                  const ListenerLimits& limits) {
   auto impl = std::make_unique<Impl>();
   impl->limits = limits;
+  impl->limits.clients = std::min(limits.clients, MostClients());
   impl->file.path = PipePath(name);
   fault = PipeFault::kBadName;
   if (impl->file.path.empty()) return nullptr;
@@ -251,10 +264,14 @@ bool PipeListener::Wait(std::string& message) {
       impl_->waitEnd = MonotonicSeconds();
       return true;
     }
-    if (!impl_->PollRound() && !impl_->stopped) return false;
+    if (!impl_->PollRound()) return false;
   }
-  impl_->Drain();
   return false;
+}
+
+void PipeListener::Finish() {
+  impl_->EndExchange();
+  impl_->Drain();
 }
 
 bool PipeListener::Reply(std::string_view message) {
@@ -402,9 +419,8 @@ void PipeListener::Impl::Serve(std::list<Peer>::iterator peer, short events) {
 /// Takes in what a client has sent; false when it is to be closed.
 bool PipeListener::Impl::Receive(Peer& peer) const {
   try {
-    const std::size_t before = peer.in.GetReceived();
     if (peer.in.Receive(peer.socket.Get()) == FrameReader::Status::kBroken) return false;
-    if (peer.in.GetReceived() != before) peer.lastByte = MonotonicSeconds();
+    peer.lastByte = MonotonicSeconds();
     return peer.share.Set(peer.in.GetReceived(), limits.incomingBytes);
   } catch (const std::bad_alloc&) {
     return false;  // the others go on

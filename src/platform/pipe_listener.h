@@ -51,8 +51,12 @@ class VEXG_EXPORT PipeListener {
   /// @return false when that process has ended already or can't be watched.
   bool EndWithProcess(int process);
 
-  /// Has this and every later Wait give false, once the clients have read their answers.
+  /// Has this and every later Wait give false.
   void Stop();
+
+  /// Ends the exchange before, and gives clients that go on reading what is left of their answers;
+  /// for the end of the listener.
+  void Finish();
 
  private:
   struct Impl;
