@@ -3,6 +3,8 @@
 #include <algorithm>
 #include <memory>
 
+#include "commands/catalog_session.h"
+
 namespace lumo {
 namespace {
 
@@ -36,12 +38,30 @@ bool AllRetired(const Job& job) {
   });
 }
 
+/// Ends a command as failed that memory was too short for; never throws.
+void GiveUp(CommandDescriptor& descriptor) {
+  try {
+    descriptor.command->FailUnstarted("memory is short");
+  } catch (...) {
+    // It retires without a result.
+  }
+}
+
 /// The stages of one run with what they share. Each thread of the run holds it, as the last one may
 /// still be leaving the lock when the run returns.
 struct JobRun {
   explicit JobRun(Job& job) : starter(job, variables), executor(variables), finisher(variables) {}
 
-  void Execute(CommandDescriptor* descriptor) { finisher.Write(executor.Process(descriptor)); }
+  catalog::Session* const session = catalog::CurrentSession();  // whose opens the job's are
+
+  void Execute(CommandDescriptor* descriptor) {
+    try {
+      executor.Process(descriptor);
+    } catch (...) {
+      GiveUp(*descriptor);
+    }
+    finisher.Write(descriptor);  // come what may: the run waits for it
+  }
 
   JobVariables variables;
   JobStarter starter;
@@ -57,6 +77,7 @@ class JobExecutorThread : public SimpleThread {
 
   void Run() override {
     SetRunning();
+    const catalog::SessionScope session(run_->session);
     // What this command held up runs here, rather than on a thread that has to be made first.
     for (CommandDescriptor* next = descriptor_; next != nullptr; next = run_->starter.TryNext()) {
       run_->Execute(next);
@@ -69,8 +90,12 @@ class JobExecutorThread : public SimpleThread {
 };
 
 void StartCommandThread(const std::shared_ptr<JobRun>& run, CommandDescriptor* descriptor) {
-  if (StartThread(SimpleThreadPtr(new JobExecutorThread(run, descriptor)))) return;
-  descriptor->command->FailUnstarted("the system gives no thread for the command");
+  try {
+    if (StartThread(SimpleThreadPtr(new JobExecutorThread(run, descriptor)))) return;
+    descriptor->command->FailUnstarted("the system gives no thread for the command");
+  } catch (...) {
+    GiveUp(*descriptor);
+  }
   run->finisher.Write(descriptor);
 }
 

@@ -5,6 +5,7 @@
 #include <mutex>
 #include <string_view>
 
+#include "data/file_uri.h"
 #include "foundation/fault.h"
 
 namespace lumo {
@@ -45,7 +46,23 @@ bool LiesInside(const fs::path& path, const std::vector<std::string>& roots) {
   });
 }
 
+/// True for what is there and is neither a file nor a folder.
+bool IsSpecialFile(const std::string& path) {
+  std::error_code fault;
+  const fs::file_status status = fs::status(path, fault);
+  return fs::exists(status) && !fs::is_regular_file(status) && !fs::is_directory(status);
+}
+
+/// True when a name is, or holds as a part, a device, a pipe or a socket.
+bool NamesSpecialFile(const std::string& name) {
+  const std::vector<std::string> paths = PathsIn(name);
+  return std::any_of(paths.begin(), paths.end(), IsSpecialFile);
+}
+
 bool MayUseName(const std::string& name, const AccessPolicy& policy, bool making) {
+  if (!policy.special && NamesSpecialFile(name)) {
+    return Refuse(name, "is no file; devices and pipes are not allowed here");
+  }
   if (IsNetworkName(name)) {
     if (policy.network) return true;
     return Refuse(name, "sources on the network are not allowed here");

@@ -16,6 +16,7 @@ struct AccessPolicy {
   bool virtualFiles = true;  ///< names of files inside other files, or that stand for no file
   bool memory = true;        ///< names of memory addresses
   bool indirect = true;      ///< formats whose files name further files to read
+  bool special = true;       ///< devices, pipes and sockets, whose opening may never end
 };
 
 /// Takes over a policy for the process, before the first source is opened. False, with the fault

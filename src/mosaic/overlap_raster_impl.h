@@ -5,11 +5,11 @@
 #include <cmath>
 #include <vector>
 
+#include "data/block_shape.h"
 #include "georef/affine_link.h"
 #include "georef/derived_georef.h"
 #include "mosaic/overlap_raster.h"
 #include "raster/block_strides.h"
-#include "raster/interleave.h"
 #include "tasks/parallel_ranges.h"
 #include "views/reprojection.h"
 
@@ -276,10 +276,8 @@ bool OverlapRaster<T, U>::GetSubRect(const SubRect& rect, const Array<unsigned>&
   const unsigned lastX = def_.samples - 1, lastY = def_.lines - 1;
   const SubRect cut(std::min(rect.left, lastX), std::min(rect.top, lastY),
                     std::min(rect.right, lastX), std::min(rect.bottom, lastY));
-  const unsigned width = cut.Width(), height = cut.Height(), count = bands.GetCount();
-  const ArrayDims dims = BlockDims(interleave, width, height, count);
-  if (dims.count != std::uint64_t{width} * height * count) return false;
-  if (!pixels.Resize(dims) || !state.Resize(dims)) return false;
+  const BlockShape block(cut, bands, interleave);
+  if (!block.Size(pixels, state)) return false;
 
   Array<T> firstPixels;
   Array<U> secondPixels;
@@ -289,13 +287,14 @@ bool OverlapRaster<T, U>::GetSubRect(const SubRect& rect, const Array<unsigned>&
     Reprojection<P> reprojection(def_.geoRef, ReprojectionMethod::kPolynomial,
                                  PyramidResamplingMethod::kNearest);
     reprojection.SetMap(map);
-    return reprojection.Run(raster, cut, bands, Interleave::BIP, into, of) !=
+    return reprojection.Run(raster, cut, block.bands, Interleave::BIP, into, of) !=
            Reprojection<P>::Outcome::kFailed;
   };
   if (part_) {
     const SubRect inFirst(cut.left + part_->left, cut.top + part_->top, cut.right + part_->left,
                           cut.bottom + part_->top);
-    if (!this->Parent()->GetSubRect(inFirst, bands, Interleave::BIP, firstPixels, firstState)) {
+    if (!this->Parent()->GetSubRect(inFirst, block.bands, Interleave::BIP, firstPixels,
+                                    firstState)) {
       return false;
     }
   } else if (!read(*this->Parent(), {}, firstPixels, firstState)) {
@@ -304,8 +303,10 @@ bool OverlapRaster<T, U>::GetSubRect(const SubRect& rect, const Array<unsigned>&
   if (!read(*second_, map_, secondPixels, secondState)) return false;
 
   OverlapRasterGetDataParallel<T> loop(
-      width, height, count, {firstPixels.GetData(), firstState.GetData(), secondState.GetData()},
-      BlockStrides(interleave, width, height, count), pixels.GetData(), state.GetData());
+      block.width, block.height, block.count,
+      {firstPixels.GetData(), firstState.GetData(), secondState.GetData()},
+      BlockStrides(interleave, block.width, block.height, block.count), pixels.GetData(),
+      state.GetData());
   RunParallelFor(loop);
   return true;
 }

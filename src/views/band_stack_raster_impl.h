@@ -2,8 +2,7 @@
 
 #include <algorithm>
 
-#include "data/raster_reader.h"
-#include "raster/interleave.h"
+#include "data/block_shape.h"
 #include "views/band_stack_raster.h"
 
 namespace lumo {
@@ -244,28 +243,23 @@ typename BandStackRaster<T>::Share BandStackRaster<T>::ShareOf(unsigned member,
 }
 
 template <typename T>
-bool BandStackRaster<T>::GetSubRect(const SubRect& rect, const Array<unsigned>& asked,
+bool BandStackRaster<T>::GetSubRect(const SubRect& rect, const Array<unsigned>& bands,
                                     Interleave interleave, Array<T>& pixels,
                                     Array<unsigned char>& state) {
-  const Array<unsigned> bands = BandsOfBlock(asked, interleave);
-  if (!Knows(bands)) return false;
-  const Share first = ShareOf(sources_[bands[0]].member, bands);
-  if (first.bands.GetCount() == bands.GetCount()) {  // all of one member
-    return members_[sources_[bands[0]].member]->GetSubRect(rect, first.bands, interleave, pixels,
-                                                           state);
+  const BlockShape block(rect, bands, interleave);
+  if (!Knows(block.bands)) return false;
+  const Share first = ShareOf(sources_[block.bands[0]].member, block.bands);
+  if (first.bands.GetCount() == block.count) {  // all of one member
+    return members_[sources_[block.bands[0]].member]->GetSubRect(rect, first.bands, interleave,
+                                                                 pixels, state);
   }
-  const unsigned width = rect.Width(), height = rect.Height(), count = bands.GetCount();
-  const ArrayDims dims = BlockDims(interleave, width, height, count);
-  const std::size_t plane = std::size_t{width} * height;
+  const std::size_t plane = std::size_t{block.width} * block.height;
   Array<T> planes, part;
   Array<unsigned char> planeStates, partState;
-  const ArrayDims flat(dims.count);
-  if (!pixels.Resize(dims) || !state.Resize(dims) || !planes.Resize(flat) ||
-      !planeStates.Resize(flat)) {
-    return false;
-  }
+  const ArrayDims flat(block.dims.count);
+  if (!block.Size(pixels, state) || !planes.Resize(flat) || !planeStates.Resize(flat)) return false;
   for (unsigned member = 0; member < members_.size(); ++member) {
-    const Share share = ShareOf(member, bands);
+    const Share share = ShareOf(member, block.bands);
     if (share.bands.GetCount() == 0) continue;
     if (!members_[member]->GetSubRect(rect, share.bands, Interleave::BSQ, part, partState)) {
       return false;
@@ -275,42 +269,34 @@ bool BandStackRaster<T>::GetSubRect(const SubRect& rect, const Array<unsigned>& 
       std::copy_n(&partState[i * plane], plane, &planeStates[share.places[i] * plane]);
     }
   }
-  return ConvertInterleave(planes.GetData(), Interleave::BSQ, pixels.GetData(), interleave, width,
-                           height, count, sizeof(T)) &&
-         ConvertInterleave(planeStates.GetData(), Interleave::BSQ, state.GetData(), interleave,
-                           width, height, count, 1);
+  return block.Convert(planes, planeStates, Interleave::BSQ, pixels, state, interleave);
 }
 
 template <typename T>
-bool BandStackRaster<T>::PutSubRect(const SubRect& rect, const Array<unsigned>& asked,
+bool BandStackRaster<T>::PutSubRect(const SubRect& rect, const Array<unsigned>& bands,
                                     Interleave interleave, Array<T>& pixels,
                                     Array<unsigned char>& state) {
-  const Array<unsigned> bands = BandsOfBlock(asked, interleave);
-  const unsigned width = rect.Width(), height = rect.Height(), count = bands.GetCount();
-  const std::size_t plane = std::size_t{width} * height;
-  const ArrayDims flat(BlockDims(interleave, width, height, count).count);
-  Array<T> planes, part;
-  Array<unsigned char> planeStates, partState;
-  if (!Knows(bands) || pixels.GetCount() < flat.count || state.GetCount() < flat.count ||
-      !planes.Resize(flat) || !planeStates.Resize(flat) ||
-      !ConvertInterleave(pixels.GetData(), interleave, planes.GetData(), Interleave::BSQ, width,
-                         height, count, sizeof(T)) ||
-      !ConvertInterleave(state.GetData(), interleave, planeStates.GetData(), Interleave::BSQ, width,
-                         height, count, 1)) {
+  const BlockShape block(rect, bands, interleave);
+  const std::size_t plane = std::size_t{block.width} * block.height;
+  const ArrayDims flat(block.dims.count);
+  Array<T> planes;
+  Array<unsigned char> planeStates;
+  if (!Knows(block.bands) || !block.IsHeldBy(pixels, state) || !planes.Resize(flat) ||
+      !planeStates.Resize(flat) ||
+      !block.Convert(pixels, state, interleave, planes, planeStates, Interleave::BSQ)) {
     return false;
   }
-  for (unsigned member = 0; member < members_.size(); ++member) {
-    const Share share = ShareOf(member, bands);
-    const ArrayDims dims = BlockDims(Interleave::BSQ, width, height, share.bands.GetCount());
-    if (share.bands.GetCount() == 0) continue;
-    if (!part.Resize(dims) || !partState.Resize(dims)) return false;
-    for (unsigned i = 0; i < share.places.GetCount(); ++i) {
-      std::copy_n(&planes[share.places[i] * plane], plane, &part[i * plane]);
-      std::copy_n(&planeStates[share.places[i] * plane], plane, &partState[i * plane]);
-    }
-    if (!members_[member]->PutSubRect(rect, share.bands, Interleave::BSQ, part, partState)) {
-      return false;
-    }
+  // In the order of the list, neighbours of one member together: two members may stand on the same
+  // pixels, and then the last in the list stays.
+  for (unsigned first = 0, next = 0; first < block.count; first = next) {
+    const unsigned member = sources_[block.bands[first]].member;
+    while (next < block.count && sources_[block.bands[next]].member == member) ++next;
+    Array<unsigned> local{ArrayDims(next - first)};
+    for (unsigned i = first; i < next; ++i) local[i - first] = sources_[block.bands[i]].band;
+    const ArrayDims dims = BlockDims(Interleave::BSQ, block.width, block.height, next - first);
+    Array<T> part(&planes[first * plane], dims);
+    Array<unsigned char> partState(&planeStates[first * plane], dims);
+    if (!members_[member]->PutSubRect(rect, local, Interleave::BSQ, part, partState)) return false;
   }
   return true;
 }

@@ -1,4 +1,5 @@
 #include "data/data_manager.h"
+#include "data/open_sources.h"
 #include "foundation/fault.h"
 #include "raster/raster_details.h"
 #include "views/raster_def_command.h"
@@ -26,8 +27,13 @@ class CreateRasterCommand final : public RasterDefCommand {
     RasterDef def;
     if (!CheckInputs() || !ReadRasterDef(def)) return Fail();
     KeepDetails(def.metadata, Read<KeptDetails>("Details"));
-    return Publish(
-        MakeReaderRaster(GetGlobalDataManager().CreateRaster(Read<Array<String>>("ConnStr"), def)));
+    const auto connStrings = Read<Array<String>>("ConnStr");
+    const SourceClaim claim(connStrings);
+    if (!claim.IsGranted()) {
+      return Fail("the source is open already, and left as it is: " +
+                  connStrings[connStrings.GetCount() - 1]);
+    }
+    return Publish(MakeReaderRaster(GetGlobalDataManager().CreateRaster(connStrings, def)));
   }
 };
 

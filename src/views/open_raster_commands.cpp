@@ -1,9 +1,11 @@
 #include <filesystem>
+#include <functional>
 
 #include "commands/catalog.h"
 #include "data/data_manager.h"
 #include "data/file_uri.h"
 #include "data/raster_reader.h"
+#include "foundation/abortable_call.h"
 #include "foundation/fault.h"
 #include "views/publish_raster.h"
 
@@ -57,8 +59,19 @@ const CommandDeclaration kOpen{
      {"Levels", Presence::kOptional, ValueKind::kWord,
       "of a source that has levels of its own beside a pyramid file. Told: those of the pyramid "
       "file; Best: its own where they are newer, or begin with a finer one",
-      "", &WordsIn<LevelChoice>}},
+      "", &WordsIn<LevelChoice>},
+     {"CheckSource", Presence::kOptional, ValueKind::kWord,
+      "Told: a source that is open is shared, whatever has become of its file; Compared: one whose "
+      "file is another one now, or has changed its size or time, gives a raster of its own, whose "
+      "URI has a counter behind it",
+      "", &WordsIn<SourceCheck>}},
     OpenOutputs()};
+
+/// What the opening of a source gives.
+struct Opened {
+  DataConnectionPtr source;
+  DataConnectionPtr pyramid;
+};
 
 class OpenRasterCommand final : public PublishCommand {
   CommandResult Execute() override {
@@ -68,27 +81,32 @@ class OpenRasterCommand final : public PublishCommand {
       geoRef = Read<GeoRefPtr>("GeoRef");
       if (!geoRef) return Fail("GeoRef makes no geo-reference");
     }
-    const auto connStrings = Read<Array<String>>("ConnStr");
-    const auto pyramidStrings = Read<Array<String>>("PyramidConnStr");
-    if (pyramidStrings.GetCount() != 0) return OpenWithPyramid(connStrings, pyramidStrings, geoRef);
-    const CatalogRasterRef opened(connStrings, geoRef, MetadataPtr(), true, false);
-    return Publish(opened);
+    Opened opened;
+    if (!RunAbortable<Opened>(*GetIPC().abort, MakeOpening(geoRef), opened)) {
+      return Fail("aborted while the source was being opened");
+    }
+    if (!opened.source) return Fail();
+    if (opened.pyramid && Read<LevelChoice>("Levels") == LevelChoice::kBest &&
+        ChoosesOwn(opened.source, opened.pyramid)) {
+      opened.pyramid = DataConnectionPtr();
+    }
+    return Publish(
+        CatalogRasterRef(opened.source, opened.pyramid, Read<SourceCheck>("CheckSource")));
   }
 
-  CommandResult OpenWithPyramid(const Array<String>& connStrings,
-                                const Array<String>& pyramidStrings, const GeoRefPtr& geoRef) {
-    DataManager& manager = GetGlobalDataManager();
-    const DataConnectionPtr source = manager.Connect(connStrings, geoRef, MetadataPtr());
-    if (!source) return Fail();
-    const DataConnectionPtr pyramid =
-        ConnectPyramid(pyramidStrings, RasterDataConnectionPtr(source));
-    if (!pyramid) return Fail();
-    if (Read<LevelChoice>("Levels") == LevelChoice::kBest && ChoosesOwn(source, pyramid)) {
-      return Publish(CatalogRasterRef(connStrings, geoRef, MetadataPtr(), true, false));
-    }
-    BasicRasterPtr raster(catalog::Find(source->URI()));
-    if (!raster) raster = MakeReaderRaster(source, pyramid);
-    return Publish(CatalogRasterRef(raster, false));
+  /// The opening with all that it needs, since it may outlive the command.
+  std::function<Opened()> MakeOpening(const GeoRefPtr& geoRef) const {
+    const auto sourceStrings = Read<Array<String>>("ConnStr");
+    const auto pyramidStrings = Read<Array<String>>("PyramidConnStr");
+    const auto isNew = Read<bool>("PyramidNew");
+    return [=] {
+      Opened opened;
+      opened.source = GetGlobalDataManager().Connect(sourceStrings, geoRef, MetadataPtr());
+      if (!opened.source || pyramidStrings.GetCount() == 0) return opened;
+      opened.pyramid =
+          ConnectPyramid(pyramidStrings, isNew, RasterDataConnectionPtr(opened.source));
+      return opened.pyramid ? opened : Opened();
+    };
   }
 
   /// True when the levels of the source itself are to be shown; notes which are where there are two
@@ -116,14 +134,13 @@ class OpenRasterCommand final : public PublishCommand {
 
   /// Opens a pyramid; one of the library's own that isn't there, or is to be replaced, has no file
   /// until it is built.
-  DataConnectionPtr ConnectPyramid(const Array<String>& strings,
-                                   const RasterDataConnectionPtr& source) {
+  static DataConnectionPtr ConnectPyramid(const Array<String>& strings, bool isNew,
+                                          const RasterDataConnectionPtr& source) {
     DataManager& manager = GetGlobalDataManager();
     Array<String> names;
     const bool isOurs = SplitConnStr(strings, names) == "Pyramid" && names.GetCount() != 0;
     std::error_code ignored;
-    if (!source || !isOurs ||
-        (!Read<bool>("PyramidNew") && std::filesystem::exists(names[0].ToUTF8(), ignored))) {
+    if (!source || !isOurs || (!isNew && std::filesystem::exists(names[0].ToUTF8(), ignored))) {
       return manager.Connect(strings, GeoRefPtr(), MetadataPtr());
     }
     RasterDef def = source->RasterDef();

@@ -1,9 +1,11 @@
 #pragma once
 
+#include <atomic>
 #include <mutex>
 
 #include "pyramid/dynamic_raster_pyramid.h"
 #include "views/computed_raster.h"
+#include "views/source_raster.h"
 
 namespace lumo {
 
@@ -24,16 +26,18 @@ namespace lumo {
 /// Failure:   without a reader, operations give false, 0 or empty; those that a source refuses have
 ///            the fault text told.
 template <typename T>
-class ReaderRaster final : public ComputedRaster<T> {
+class ReaderRaster final : public ComputedRaster<T>, public SourceRaster {
  public:
   /// @param pyramidReader  may be empty, and then so is `pyramidConnection`. A source that is a
   ///                       pyramid file itself is its own.
+  /// @param uri            in place of the connection's, unless empty.
   ReaderRaster(const RasterReaderPtr<T>& reader, const RasterDataConnectionPtr& connection,
                const RasterReaderPtr<T>& pyramidReader = {},
-               const RasterDataConnectionPtr& pyramidConnection = {});
+               const RasterDataConnectionPtr& pyramidConnection = {}, const URI& uri = {});
   ~ReaderRaster() override;
 
   URI GetURI() const override;
+  bool IsUpToDate() const override;
   bool IsValid() const override { return Object::IsValid(); }
   bool CanWrite() const override;
   RasterDef GetRasterDef() const override;
@@ -108,6 +112,7 @@ class ReaderRaster final : public ComputedRaster<T> {
   unsigned lines_ = 0;
   unsigned bands_ = 0;
   lumo::TileDimensions tiles_;
+  std::atomic<bool> written_{false};  // something may have been, to the source
   std::mutex pixelLock_;
   std::mutex statsLock_;                // held while a getter of statistics computes
   DynamicRasterPyramidPtr<T> pyramid_;  // empty without a reader of a pyramid

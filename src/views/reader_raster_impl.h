@@ -2,6 +2,7 @@
 
 #include <algorithm>
 
+#include "data/mt_connection.h"
 #include "foundation/fault.h"
 #include "views/pyramid_raster_impl.h"
 #include "views/reader_raster.h"
@@ -12,7 +13,7 @@ template <typename T>
 ReaderRaster<T>::ReaderRaster(const RasterReaderPtr<T>& reader,
                               const RasterDataConnectionPtr& connection,
                               const RasterReaderPtr<T>& pyramidReader,
-                              const RasterDataConnectionPtr& pyramidConnection)
+                              const RasterDataConnectionPtr& pyramidConnection, const URI& uri)
     : connection_(connection),
       pyramidConnection_(pyramidConnection),
       reader_(reader),
@@ -29,7 +30,8 @@ ReaderRaster<T>::ReaderRaster(const RasterReaderPtr<T>& reader,
   if (pyramidReader_ && pyramidReader_->CanInheritNoDataValues()) {
     pyramidReader_->InheritNoDataValues(def);
   }
-  if (connection_) uri_ = connection_->URI();
+  uri_ = uri;
+  if (connection_ && uri_.GetLength() == 0) uri_ = connection_->URI();
   samples_ = def.samples;
   lines_ = def.lines;
   bands_ = def.bands;
@@ -51,6 +53,14 @@ ReaderRaster<T>::~ReaderRaster() {
 template <typename T>
 URI ReaderRaster<T>::GetURI() const {
   return uri_.GetLength() != 0 ? uri_ : this->DefaultURI("ReaderRaster");
+}
+
+template <typename T>
+bool ReaderRaster<T>::IsUpToDate() const {
+  auto* const proxy = dynamic_cast<MtRasterDataConnection*>(connection_.Get());
+  if (proxy == nullptr) return true;
+  const SourceStamp opened = proxy->Stamp();
+  return written_ ? opened.HasSameFiles() : opened.IsCurrent();
 }
 
 template <typename T>
@@ -316,6 +326,7 @@ bool ReaderRaster<T>::WriteHistogram() {
 template <typename T>
 template <typename Can, typename Store>
 bool ReaderRaster<T>::StoreIn(const Can& can, const Store& store) {
+  written_ = true;
   for (const RasterReaderPtr<T>& reader : {reader_, pyramidReader_}) {
     if (reader && ((*reader).*can)() && !store(*reader)) return false;
   }
@@ -345,11 +356,13 @@ PalettePtr ReaderRaster<T>::Palette(unsigned band) const {
 
 template <typename T>
 bool ReaderRaster<T>::WritePalette(unsigned band, const PalettePtr& palette) {
+  written_ = true;
   return reader_ && palette && reader_->WritePalette(band, *palette);
 }
 
 template <typename T>
 bool ReaderRaster<T>::DeletePalette(unsigned band) {
+  written_ = true;
   return reader_ && reader_->DeletePalette(band);
 }
 
@@ -378,6 +391,7 @@ bool ReaderRaster<T>::PutSubRect(const SubRect& rect, const Array<unsigned>& ban
                                  Interleave interleave, Array<T>& pixels,
                                  Array<unsigned char>& state) {
   if (!reader_ || !Holds(rect, bands) || !CanWrite()) return false;
+  written_ = true;
   const std::uint64_t before = WriteCount();
   bool isWritten = false;
   {

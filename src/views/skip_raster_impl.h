@@ -2,9 +2,8 @@
 
 #include <algorithm>
 
-#include "data/raster_reader.h"
+#include "data/block_shape.h"
 #include "georef/derived_georef.h"
-#include "raster/interleave.h"
 #include "views/skip_raster.h"
 
 namespace lumo {
@@ -72,67 +71,60 @@ template <typename T>
 bool SkipRaster<T>::GetSubRect(const SubRect& rect, const Array<unsigned>& bands,
                                Interleave interleave, Array<T>& pixels,
                                Array<unsigned char>& state) {
-  const Array<unsigned> wanted = BandsOfBlock(bands, interleave);
-  const unsigned width = rect.Width(), height = rect.Height(), count = wanted.GetCount();
-  const ArrayDims dims = BlockDims(interleave, width, height, count);
+  const BlockShape block(rect, bands, interleave);
   if (!this->Parent() || rect.right >= Samples() || rect.bottom >= Lines() ||
-      !pixels.Resize(dims) || !state.Resize(dims)) {
+      !block.Size(pixels, state)) {
     return false;
   }
+  const unsigned count = block.count;
   const bool inOrder = interleave == Interleave::BIP || count == 1;
   Array<T> bip;
   Array<unsigned char> bipState;
-  const ArrayDims flat(dims.count);
+  const ArrayDims flat(block.dims.count);
   if (!inOrder && (!bip.Resize(flat) || !bipState.Resize(flat))) return false;
   T* const toPixels = inOrder ? pixels.GetData() : bip.GetData();
   unsigned char* const toStates = inOrder ? state.GetData() : bipState.GetData();
 
-  Array<T> block;
-  Array<unsigned char> blockState;
+  Array<T> read;
+  Array<unsigned char> readState;
   SubRect part = rect;
   for (unsigned y = rect.top; y <= rect.bottom; y = part.bottom + 1) {
     for (unsigned x = rect.left; x <= rect.right; x = part.right + 1) {
       part = ReadAtOnce(rect, x, y, count);
       const SubRect inParent(part.left * skipX_, part.top * skipY_, part.right * skipX_,
                              part.bottom * skipY_);
-      if (!this->Parent()->GetSubRect(inParent, wanted, Interleave::BIP, block, blockState)) {
+      if (!this->Parent()->GetSubRect(inParent, block.bands, Interleave::BIP, read, readState)) {
         return false;
       }
       const std::size_t step = std::size_t{skipX_} * count;
       for (std::size_t line = 0; line < part.Height(); ++line) {
         const std::size_t from = line * skipY_ * inParent.Width() * count;
-        const std::size_t to = ((y - rect.top + line) * width + (x - rect.left)) * count;
+        const std::size_t to = ((y - rect.top + line) * block.width + (x - rect.left)) * count;
         for (std::size_t i = 0; i < part.Width(); ++i) {
-          std::copy_n(&block[from + i * step], count, toPixels + to + i * count);
-          std::copy_n(&blockState[from + i * step], count, toStates + to + i * count);
+          std::copy_n(&read[from + i * step], count, toPixels + to + i * count);
+          std::copy_n(&readState[from + i * step], count, toStates + to + i * count);
         }
       }
     }
   }
-  return inOrder || (ConvertInterleave(bip.GetData(), Interleave::BIP, pixels.GetData(), interleave,
-                                       width, height, count, sizeof(T)) &&
-                     ConvertInterleave(bipState.GetData(), Interleave::BIP, state.GetData(),
-                                       interleave, width, height, count, 1));
+  return inOrder || block.Convert(bip, bipState, Interleave::BIP, pixels, state, interleave);
 }
 
 template <typename T>
 bool SkipRaster<T>::PutSubRect(const SubRect& rect, const Array<unsigned>& bands,
                                Interleave interleave, Array<T>& pixels,
                                Array<unsigned char>& state) {
-  const Array<unsigned> wanted = BandsOfBlock(bands, interleave);
-  const unsigned width = rect.Width(), height = rect.Height(), count = wanted.GetCount();
-  const ArrayDims flat(BlockDims(interleave, width, height, count).count);
+  const BlockShape block(rect, bands, interleave);
   if (!this->Parent() || rect.right >= Samples() || rect.bottom >= Lines() ||
-      pixels.GetCount() < flat.count || state.GetCount() < flat.count) {
+      !block.IsHeldBy(pixels, state)) {
     return false;
   }
+  const unsigned count = block.count;
+  const ArrayDims flat(block.dims.count);
   Array<T> bip;
   Array<unsigned char> bipState;
   if (!bip.Resize(flat) || !bipState.Resize(flat) ||
-      !ConvertInterleave(pixels.GetData(), interleave, bip.GetData(), Interleave::BIP, width,
-                         height, count, sizeof(T)) ||
-      !ConvertInterleave(state.GetData(), interleave, bipState.GetData(), Interleave::BIP, width,
-                         height, count, 1)) {
+      !block.Convert(pixels, state, interleave, bip, bipState, Interleave::BIP)) {
     return false;
   }
   const T* fromPixel = bip.GetData();
@@ -141,15 +133,15 @@ bool SkipRaster<T>::PutSubRect(const SubRect& rect, const Array<unsigned>& bands
   Array<unsigned char> lineState;
   for (unsigned y = rect.top; y <= rect.bottom; ++y) {
     const SubRect inParent = LineInParent(rect, y);
-    if (!this->Parent()->GetSubRect(inParent, wanted, Interleave::BIP, line, lineState)) {
+    if (!this->Parent()->GetSubRect(inParent, block.bands, Interleave::BIP, line, lineState)) {
       return false;
     }
     const std::size_t step = std::size_t{skipX_} * count;
-    for (unsigned x = 0; x < width; ++x, fromPixel += count, fromState += count) {
+    for (unsigned x = 0; x < block.width; ++x, fromPixel += count, fromState += count) {
       std::copy_n(fromPixel, count, &line[x * step]);
       std::copy_n(fromState, count, &lineState[x * step]);
     }
-    if (!this->Parent()->PutSubRect(inParent, wanted, Interleave::BIP, line, lineState)) {
+    if (!this->Parent()->PutSubRect(inParent, block.bands, Interleave::BIP, line, lineState)) {
       return false;
     }
   }

@@ -6,10 +6,12 @@
 
 #include <CLI/CLI.hpp>
 
+#include "data/access_policy.h"
 #include "foundation/environment.h"
 #include "foundation/library.h"
 #include "platform/debug_output.h"
 #include "platform/module.h"
+#include "platform/process.h"
 #include "verb.h"
 
 namespace lumo::host {
@@ -79,6 +81,9 @@ int Run(int argc, char** argv) {
   LoadLibraries(libraries);
   FindResources();
   VEXInit();
+  AccessPolicy policy;
+  policy.special = false;  // nobody waits for a pipe that nobody writes to
+  SetAccessPolicy(policy);
   const int code = works.at(app.get_subcommands().front())();
   if (!std::cout.flush()) throw HostError(kExitFailed, "standard output can't be written");
   return code;
@@ -97,9 +102,12 @@ void Say(const std::string& line) {
 }  // namespace lumo::host
 
 int main(int argc, char** argv) {
+  lumo::platform::SurviveClosedPipes();
   try {
     return lumo::host::Run(argc, argv);
   } catch (const lumo::host::HostError& error) {
+    // What was in the making is gone by now. Who has closed the pipe knows why there is no more.
+    if (lumo::platform::OutputIsClosed()) lumo::platform::EndOfClosedPipe();
     lumo::host::Say(error.what());
     return error.code;
   } catch (const std::exception& error) {

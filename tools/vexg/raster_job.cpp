@@ -97,6 +97,9 @@ ProgressReportPtr JobSession::GetProgress() const {
 
 void JobSession::CheckInterrupt() const {
   if (ipc_.abort->IsSet()) throw HostError(kExitFailed, "interrupted; nothing was written");
+  if (channel_ && channel_->IsAborted()) {
+    throw HostError(kExitFailed, "the job was aborted; nothing was written");
+  }
 }
 
 JobResults JobSession::Run(const JobDraft& draft) {
@@ -162,6 +165,12 @@ void JobSession::CloseAll() {
   }
   open_.clear();
   Execute(draft, false);
+}
+
+JobResults RunOnServer(const ServerOptions& server, const JobDraft& draft) {
+  RasterJobOptions options;
+  options.server = server;
+  return JobSession(options).Run(draft);
 }
 
 }  // namespace lumo::host

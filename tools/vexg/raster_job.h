@@ -97,6 +97,9 @@ class JobSession {
   std::set<std::string> said_;
 };
 
+/// Has a server run a job of one verb. Throws HostError as a JobSession does.
+JobResults RunOnServer(const ServerOptions& server, const JobDraft& draft);
+
 /// How far one command of a job has come, where the commands run one after the other.
 class StepProgress final : public ProgressReport {
  public:

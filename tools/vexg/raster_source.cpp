@@ -11,6 +11,7 @@
 #include "data/format_table.h"
 #include "raster/pixel_types.h"
 #include "verb.h"
+#include "views/catalog_raster_ref.h"
 
 namespace lumo::host {
 namespace {
@@ -89,7 +90,9 @@ Array<String> ConnStringsOf(const SourceOptions& source) {
 }
 
 void AddOpen(JobDraft& draft, const std::string& name, const SourceOptions& source) {
-  draft.Open(name, "OpenRasterCommand").AddInput("ConnStr", ConnStringsOf(source));
+  JobWriterCommand& open = draft.Open(name, "OpenRasterCommand");
+  open.AddInput("ConnStr", ConnStringsOf(source));
+  open.AddInput("CheckSource", SourceCheck::kCompared);
 }
 
 std::string PyramidPathOf(const std::string& file) {
@@ -120,6 +123,7 @@ void AddOpenWithPyramid(JobDraft& draft, const std::string& name, const SourceOp
                         const char* levels) {
   JobWriterCommand& open = draft.Open(name, "OpenRasterCommand");
   open.AddInput("ConnStr", ConnStringsOf(source));
+  open.AddInput("CheckSource", SourceCheck::kCompared);
   // A pyramid beside a file is of the raster that the file gives without further words.
   const bool isPlain = source.subdataset.empty() && source.file.find('|') == std::string::npos;
   const std::string pyramid = isPlain ? FindPyramid(source.file) : std::string();

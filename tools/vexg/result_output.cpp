@@ -1,5 +1,6 @@
 #include "result_output.h"
 
+#include <algorithm>
 #include <cstdio>
 #include <iostream>
 
@@ -161,6 +162,22 @@ int ExitCodeOf(const Document& job, const String& resultDocument) {
     if (command->attributes.Find("Result") != "Success") failed = true;
   }
   return failed ? kExitFailed : kExitSuccess;
+}
+
+Outcome OutcomeOf(const String& resultDocument, bool aborted) {
+  if (aborted) return Outcome::kAborted;
+  const Document result(resultDocument, "the result");
+  const auto& commands = result.GetRoot().children;
+  const bool succeeded = std::all_of(
+      commands.begin(), commands.end(),
+      [](const XMLElementPtr& command) { return command->attributes.Find("Result") == "Success"; });
+  return succeeded ? Outcome::kDone : Outcome::kFailed;
+}
+
+int ExitCodeAfter(Outcome outcome, int code) {
+  if (outcome != Outcome::kAborted) return code;
+  Say("the job was aborted; what it made is not whole");
+  return kExitFailed;
 }
 
 }  // namespace lumo::host

@@ -5,6 +5,7 @@
 #include <string>
 
 #include "document.h"
+#include "progress_view.h"
 
 namespace CLI {
 class App;
@@ -25,6 +26,8 @@ class Output {
 
   /// Writes all of it. Throws HostError.
   void Write(const std::string& text);
+
+  bool IsStandardOutput() const { return file_.empty(); }
 
  private:
   std::string file_;
@@ -57,5 +60,13 @@ void WriteResult(const Document& job, const String& resultDocument, bool json, O
 /// Says which commands of the job left no trace in its result, as their IDs are unknown.
 /// @return how the program ends: success, a failed or unknown command, or a job without any.
 int ExitCodeOf(const Document& job, const String& resultDocument);
+
+/// How a job ended that has this result. One that was aborted may look like a success, as a command
+/// that was in its middle does.
+Outcome OutcomeOf(const String& resultDocument, bool aborted);
+
+/// Says of an aborted job that its result is not whole, and gives the exit code for it; else gives
+/// `code`.
+int ExitCodeAfter(Outcome outcome, int code);
 
 }  // namespace lumo::host

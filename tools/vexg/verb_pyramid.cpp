@@ -11,6 +11,7 @@
 #include "json_number.h"
 #include "raster_target.h"
 #include "verb.h"
+#include "views/catalog_raster_ref.h"
 
 namespace lumo::host {
 namespace {
@@ -73,6 +74,7 @@ Array<String> PyramidStrings(const Options& options) {
 JobDraft OpenToBuild(const Options& options) {
   JobDraft draft;
   JobWriterCommand& open = draft.Open("raster", "OpenRasterCommand");
+  open.AddInput("CheckSource", SourceCheck::kCompared);
   open.AddInput("ConnStr", ConnStringsOf(options.source));
   open.AddInput("PyramidConnStr", PyramidStrings(options));
   if (!options.IsDriver()) open.AddInput("PyramidNew", true);
@@ -122,6 +124,7 @@ void AddOpenToLook(JobDraft& draft, const Options& options) {
     return;
   }
   JobWriterCommand& open = draft.Open("raster", "OpenRasterCommand");
+  open.AddInput("CheckSource", SourceCheck::kCompared);
   open.AddInput("ConnStr", ConnStringsOf(options.source));
   if (!options.IsDriver()) open.AddInput("PyramidConnStr", PyramidStrings(options));
 }
@@ -203,6 +206,7 @@ int Delete(const Options& options) {
                       std::filesystem::exists(options.PyramidPath());
   JobDraft draft;
   JobWriterCommand& open = draft.Open("raster", "OpenRasterCommand");
+  open.AddInput("CheckSource", SourceCheck::kCompared);
   if (isFile && !options.IsDriver()) {
     open.AddInput("ConnStr", ConnStrings({"Pyramid", String(options.PyramidPath())}));
   } else {

@@ -28,16 +28,20 @@ int RunJobFile(const JobOptions& options) {
   Output output(options.output);
   Job job;
   JobParser(job).Parse(text);
+  const AbortFlagPtr abort = job.GetIPC().abort;
+  String result;
+  auto outcome = Outcome::kDone;
   {
-    const platform::InterruptWatch interrupts([&] { job.GetIPC().abort->Set(true); });
-    const ProgressView view(job.GetIPC().progress,
-                            ChooseProgressStyle(options.progress, options.quiet));
+    const platform::InterruptWatch interrupts([&] { abort->Set(true); }, output.IsStandardOutput());
+    ProgressView view(job.GetIPC().progress, ChooseProgressStyle(options.progress, options.quiet));
     RunJob(job);
+    result = JobResultWriter(job).Write();
+    outcome = OutcomeOf(result, abort->IsSet());
+    view.SetOutcome(outcome);
   }
   SayWhyCommandsFailed(job);
-  const String result = JobResultWriter(job).Write();
   WriteResult(document, result, options.json, output);
-  return ExitCodeOf(document, result);
+  return ExitCodeAfter(outcome, ExitCodeOf(document, result));
 }
 
 const VerbRegistration registration(

@@ -3,9 +3,12 @@
 
 #include <CLI/CLI.hpp>
 
+#include "commands/catalog_session.h"
+#include "commands/served_jobs.h"
 #include "commands/server.h"
 #include "data/access_policy.h"
 #include "foundation/fault.h"
+#include "foundation/thread_roll.h"
 #include "platform/interrupt.h"
 #include "platform/message_pipe.h"
 #include "platform/pipe_listener.h"
@@ -35,6 +38,7 @@ std::string WhyNot(platform::PipeFault fault, const std::string& name) {
 struct ServeOptions {
   std::string name = kDefaultServer;
   bool quiet = false;
+  bool shared = false;
   std::vector<std::string> roots;
   std::vector<std::string> allowed;
 
@@ -51,19 +55,23 @@ void LimitAccess(const ServeOptions& options) {
   policy.virtualFiles = options.Allows("virtual");
   policy.memory = options.Allows("memory");
   policy.indirect = options.Allows("indirect");
+  policy.special = options.Allows("special");
   if (SetAccessPolicy(policy)) return;
   throw HostError(kExitUsage, "--root: " + TakeFault().ToUTF8());
 }
 
 int Serve(const ServeOptions& options) {
+  constexpr double kPatience = 5.0;  // s, for threads that are on their way out
   const std::string& name = options.name;
   LimitAccess(options);
   platform::RaiseDescriptorLimit();
   auto& dispatch = dynamic_cast<PipeServerDispatch&>(GetServerDispatch(String(name)));
+  dispatch.SetReleaseOnQuit(!options.shared);
+  bool allGone = false;
   {
     const platform::InterruptWatch interrupts([&] {
       dispatch.EndNow();
-      AbortServedJobs();
+      ServedJobs::Get().AbortFromNowOn();
     });
     if (!dispatch.Open() && !dispatch.StopRequested()) {
       throw HostError(kExitFailed, WhyNot(dispatch.GetFault(), name));
@@ -71,9 +79,14 @@ int Serve(const ServeOptions& options) {
     if (!options.quiet)
       Say("serving \"" + name + "\"; end it with vexg stop " + name + " or Ctrl-C");
     dispatch.Run();
-    WaitServedJobs();
+    // No new messages, then no jobs, then no clients; only then can what they have opened go.
+    EndServers();
+    for (const String& fault : catalog::Empty()) Say(fault.ToUTF8());
+    allGone = JoinThreads(kPatience);
   }
   platform::RemoveOwnPipes();
+  // A thread that hangs in a source has no part in the end: the process ends around it.
+  if (!allGone) platform::EndProcess(kExitSuccess);
   return kExitSuccess;
 }
 
@@ -86,6 +99,9 @@ const VerbRegistration registration(
           "Example: vexg serve --root /data/scenes --root /data/results\n");
       app.add_option("name", options->name, "Name of the server")->capture_default_str();
       app.add_flag("-q,--quiet", options->quiet, "Say nothing at the start");
+      app.add_flag(
+          "--shared", options->shared,
+          "What a client opened stays open when it goes, for other clients to use and close");
       app.add_option("--root", options->roots,
                      "A folder in which jobs open and make files; may come again; all folders when "
                      "absent")
@@ -93,10 +109,10 @@ const VerbRegistration registration(
           ->allow_extra_args(false);
       app.add_option("--allow", options->allowed,
                      "What jobs may use beside plain files: network, virtual (files inside other "
-                     "files), memory (addresses), indirect (formats whose files name other files); "
-                     "may come again")
+                     "files), memory (addresses), indirect (formats whose files name other files), "
+                     "special (devices and pipes); may come again")
           ->type_name("WHAT")
-          ->check(CLI::IsMember({"network", "virtual", "memory", "indirect"}))
+          ->check(CLI::IsMember({"network", "virtual", "memory", "indirect", "special"}))
           ->allow_extra_args(false);
       return VerbRegistration::Work([options] { return Serve(*options); });
     });

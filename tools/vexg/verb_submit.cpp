@@ -28,15 +28,17 @@ int SubmitJobFile(const JobOptions& options, const ServerOptions& server) {
   JobChannel channel = ChannelOf(document);
   ServerLink link(server);
   String result;
+  auto outcome = Outcome::kDone;
   {
-    const platform::InterruptWatch interrupts([&] { channel.Abort(); });
+    const platform::InterruptWatch interrupts([&] { channel.Abort(); }, output.IsStandardOutput());
     link.Connect();
-    const ProgressView view(channel.GetProgress(),
-                            ChooseProgressStyle(options.progress, options.quiet));
+    ProgressView view(channel.GetProgress(), ChooseProgressStyle(options.progress, options.quiet));
     result = link.Run(document.Write());
+    outcome = OutcomeOf(result, channel.IsAborted());
+    view.SetOutcome(outcome);
   }
   WriteResult(document, result, options.json, output);
-  return ExitCodeOf(document, result);
+  return ExitCodeAfter(outcome, ExitCodeOf(document, result));
 }
 
 const VerbRegistration registration(
