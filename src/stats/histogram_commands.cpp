@@ -1,5 +1,6 @@
 #include "foundation/fault.h"
 #include "raster/raster_command.h"
+#include "stats/turn.h"
 
 namespace lumo {
 namespace {
@@ -19,7 +20,8 @@ const CommandDeclaration kCalculate{
      {"Bands", Presence::kOptional, ValueKind::kIntegerArray,
       "which bands; all when absent, with a BinCount"},
      {"Sign", Presence::kOptional, ValueKind::kWord,
-      "Both, Positive (0 and above), Negative; Both when absent"}},
+      "Both, Positive (0 and above), Negative; Both when absent", "", &WordsIn<HistogramSign>},
+     WaitInput()},
     {}};
 
 class CalculateRasterHistogramCommand final : public RasterCommand {
@@ -34,10 +36,15 @@ class CalculateRasterHistogramCommand final : public RasterCommand {
     }
     const auto bands = Read<Array<unsigned>>("Bands");
     if (HasInput("Bands") && !CheckBands(*raster, bands)) return Fail();
+    const Turn turn(raster, Read<Waiting>("Wait"), GetIPC());
     AsyncPtr run;
     const bool typed = DispatchType(TenTypes{}, raster->DataType(), [&]<typename T>() {
       const RasterPtr<T> source(raster);
       if (source) run = Start(*source, bands);
+      // Another run may have begun meanwhile.
+      while (source && !run && raster->HistogramAsync() && turn.AwaitRuns()) {
+        run = Start(*source, bands);
+      }
       return bool(source);
     });
     if (!typed) return Fail("histograms are of real numbers, and the raster has others");
@@ -76,7 +83,8 @@ const CommandDeclaration kGet{
     "Statistics",
     "Gives the histograms at hand of bands.",
     {kUri,
-     {"Bands", Presence::kRequired, ValueKind::kIntegerArray, "the bands, in the order wanted"}},
+     {"Bands", Presence::kRequired, ValueKind::kIntegerArray, "the bands, in the order wanted"},
+     WaitInput()},
     {{"Histograms", ValueKind::kText,
       "array of histograms: band, sign, bin size, bins, bounds, source and counts of each"}}};
 
@@ -87,6 +95,7 @@ class GetRasterHistogramCommand final : public RasterCommand {
     if (!raster) return Fail();
     const auto bands = Read<Array<unsigned>>("Bands");
     if (!CheckBands(*raster, bands)) return Fail();
+    const Turn turn(raster, Read<Waiting>("Wait"), GetIPC());
     const bool typed = DispatchType(TenTypes{}, raster->DataType(), [&]<typename T>() {
       const RasterPtr<T> source(raster);
       if (source) WriteHistograms(*source, bands);
@@ -115,7 +124,8 @@ const CommandDeclaration kSet{"SetRasterBandHistogramCommand",
                               "Enters a known histogram of one band.",
                               {kUri,
                                {"RasterBandHistogram", Presence::kRequired, ValueKind::kText,
-                                "band, sign, bin size, bins, bounds, source and counts"}},
+                                "band, sign, bin size, bins, bounds, source and counts"},
+                               WaitInput()},
                               {}};
 
 class SetRasterBandHistogramCommand final : public RasterCommand {
@@ -123,6 +133,7 @@ class SetRasterBandHistogramCommand final : public RasterCommand {
     if (!CheckInputs()) return Fail();
     const BasicRasterPtr raster = FindRaster();
     if (!raster) return Fail();
+    const Turn turn(raster, Read<Waiting>("Wait"), GetIPC());
     const bool set = DispatchType(TenTypes{}, raster->DataType(), [&]<typename T>() {
       const RasterPtr<T> source(raster);
       const auto histogram = Read<RasterBandHistogram<T>>("RasterBandHistogram");
@@ -143,7 +154,7 @@ const CommandDeclaration kSave{
     "SaveRasterHistogramCommand",
     "Statistics",
     "Stores the histograms of a raster through its data source.",
-    {kUri},
+    {kUri, WaitInput()},
     {{"Return", ValueKind::kBoolean, "they are stored, or the source has no place for them"}}};
 
 class SaveRasterHistogramCommand final : public RasterCommand {
@@ -151,6 +162,7 @@ class SaveRasterHistogramCommand final : public RasterCommand {
     if (!CheckInputs()) return Fail();
     const BasicRasterPtr raster = FindRaster();
     if (!raster) return Fail();
+    const Turn turn(raster, Read<Waiting>("Wait"), GetIPC());
     Write("Return", raster->WriteHistogram());
     return Succeed();
   }

@@ -11,7 +11,7 @@ const CommandDeclaration kCreate{
     RasterDefInputs({{"ConnStr", Presence::kRequired, ValueKind::kTextList, "where it is made"},
                      {"Format", Presence::kOptional, ValueKind::kText, "key of the format"},
                      {"Interleave", Presence::kOptional, ValueKind::kWord,
-                      "BIP, BIL, BSQ: the order in the source"}}),
+                      "BIP, BIL, BSQ: the order in the source", "", &WordsIn<Interleave>}}),
     PublishedOutputs()};
 
 class CreateRasterCommand final : public RasterDefCommand {

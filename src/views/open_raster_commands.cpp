@@ -4,9 +4,16 @@
 #include "data/data_manager.h"
 #include "foundation/fault.h"
 #include "views/publish_raster.h"
+#include "views/reader_raster.h"
 
 namespace lumo {
 namespace {
+
+std::vector<OutputDeclaration> OpenOutputs() {
+  std::vector<OutputDeclaration> outputs = PublishedOutputs();
+  outputs.push_back({"Note", ValueKind::kText, "what of the inputs had no effect; only then"});
+  return outputs;
+}
 
 const CommandDeclaration kOpen{
     "OpenRasterCommand",
@@ -19,7 +26,7 @@ const CommandDeclaration kOpen{
      {"PyramidNew", Presence::kOptional, ValueKind::kBoolean,
       "1: a pyramid file that is there is not looked at, only replaced by a build"},
      {"GeoRef", Presence::kOptional, ValueKind::kGeoRef, "in place of the source's own"}},
-    PublishedOutputs()};
+    OpenOutputs()};
 
 class OpenRasterCommand final : public PublishCommand {
   CommandResult Execute() override {
@@ -45,8 +52,24 @@ class OpenRasterCommand final : public PublishCommand {
         ConnectPyramid(pyramidStrings, RasterDataConnectionPtr(source));
     if (!pyramid) return Fail();
     BasicRasterPtr raster(catalog::Find(source->URI()));
-    if (!raster) raster = MakeReaderRaster(source, pyramid);
+    if (!raster) {
+      raster = MakeReaderRaster(source, pyramid);
+    } else if (PyramidOf(*raster) != pyramid->URI()) {
+      Write("Note", String("the raster is open already, without this pyramid; it is opened with it "
+                           "once everybody has closed it"));
+    }
     return Publish(CatalogRasterRef(raster, false));
+  }
+
+  /// The source that the pyramid of an open raster was opened from; no text for none.
+  static URI PyramidOf(const BasicRaster& raster) {
+    URI uri;
+    DispatchType(TwelveTypes{}, raster.DataType(), [&]<typename T>() {
+      const auto* const reader = dynamic_cast<const ReaderRaster<T>*>(&raster);
+      if (reader != nullptr) uri = reader->PyramidURI();
+      return true;
+    });
+    return uri;
   }
 
   /// Opens a pyramid; one of the library's own that isn't there, or is to be replaced, has no file
