@@ -98,6 +98,7 @@ class OpenRaster {
   std::map<unsigned, RasterLevel> levels_;
   bool isUpdated_ = false;   // open for writing
   bool isThreaded_ = false;  // GDAL decodes on threads of its own
+  bool isPlain_ = false;     // opened without what makes reads faster, as one has failed
   enum class Answer { kUnknown, kNo, kYes } canWrite_ = Answer::kUnknown;
 };
 
