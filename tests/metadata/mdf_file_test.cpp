@@ -164,7 +164,8 @@ TEST(MdfFile, FormatPropertiesChangeTheFormatAndMakeNoEntry) {
 
 TEST(MdfFile, TheDefinitionFilesOfTheLibraryAreWellFormed) {
   unsigned files = 0;
-  for (const auto& file : std::filesystem::directory_iterator(SourceDir() + "/resources/mdf")) {
+  for (const auto& file :
+       std::filesystem::directory_iterator(test::SourceDir() + "/resources/mdf")) {
     MdfFormat format;
     std::vector<MdfEntry> entries;
     EXPECT_TRUE(ReadMdfFile(String(file.path().string()), format, entries)) << TakeFault().ToUTF8();

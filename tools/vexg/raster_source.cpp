@@ -8,6 +8,7 @@
 
 #include "data/file_uri.h"
 #include "data/format_table.h"
+#include "option_values.h"
 #include "raster/pixel_types.h"
 #include "verb.h"
 
@@ -56,11 +57,8 @@ std::string AbsoluteName(const std::string& file) {
 Array<String> ConnStringsOf(const SourceOptions& source) {
   const std::string name = AbsoluteName(source.file);
   if (source.format.empty()) return ConnStrings({String(name)});
-  if (FindFormat(String(source.format)) == nullptr) {
-    throw HostError(kExitUsage, "--input-format: there is no format \"" + source.format +
-                                    "\"; see vexg formats");
-  }
-  return ConnStrings({String(source.format), String(name)});
+  const std::string key = FormatKey("--input-format", source.format);
+  return ConnStrings({String(key), String(name)});
 }
 
 void AddOpen(JobDraft& draft, const std::string& name, const SourceOptions& source) {

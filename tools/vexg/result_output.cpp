@@ -7,15 +7,23 @@
 #include <nlohmann/json.hpp>
 
 #include "commands/command.h"
+#include "option_values.h"
 #include "platform/process.h"
 #include "verb.h"
 
 namespace lumo::host {
 namespace {
 
+constexpr const char* kFault = "Fault";
+
 std::string ToJson(const Document& result) {
   nlohmann::ordered_json commands = nlohmann::ordered_json::array();
+  nlohmann::ordered_json faults = nlohmann::ordered_json::array();
   for (const XMLElementPtr& command : result.GetRoot().children) {
+    if (command->name == kFault) {
+      faults.push_back(command->attributes.Find("Reason").ToUTF8());
+      continue;
+    }
     const auto attribute = [&](const char* name) {
       return command->attributes.Find(name).ToUTF8();
     };
@@ -23,14 +31,30 @@ std::string ToJson(const Document& result) {
     for (const XMLElementPtr& child : command->children) {
       for (const auto& [name, value] : child->attributes) returns[name.ToUTF8()] = value.ToUTF8();
     }
-    commands.push_back({{"name", attribute("Name")},
-                        {"result", attribute("Result")},
-                        {"wall", attribute("Wall")},
-                        {"cpu", attribute("CPU")},
-                        {"usage", attribute("Usage")},
-                        {"return", returns}});
+    nlohmann::ordered_json entry{{"name", attribute("Name")},
+                                 {"result", attribute("Result")},
+                                 {"wall", attribute("Wall")},
+                                 {"cpu", attribute("CPU")},
+                                 {"usage", attribute("Usage")}};
+    if (command->attributes.HasKey("Reason")) entry["reason"] = attribute("Reason");
+    entry["return"] = returns;
+    commands.push_back(entry);
   }
-  return nlohmann::ordered_json{{"commands", commands}}.dump(2) + "\n";
+  nlohmann::ordered_json all{{"commands", commands}};
+  if (!faults.empty()) all["faults"] = faults;
+  return all.dump(2) + "\n";
+}
+
+/// Says why a command failed.
+void SayReason(const NamedCommand& command, const XMLElement& result) {
+  const std::string word = result.attributes.Find("Result").ToUTF8();
+  const std::string reason = result.attributes.Find("Reason").ToUTF8();
+  if (word == "None" && !reason.empty()) {
+    Say("command \"" + command.name + "\" was left out: " + reason + "; see vexg commands");
+  } else if (word == "Failed") {
+    Say("command \"" + command.name + "\" (" + command.id + ") failed" +
+        (reason.empty() ? "" : ": " + reason));
+  }
 }
 
 bool IsKnownHere(const NamedCommand& command) {
@@ -94,7 +118,7 @@ void JobOptions::AddTo(CLI::App& app) {
       ->type_name("FILE");
   app.add_flag("--json", json, "Give the result as JSON");
   app.add_option("--progress", progress, "How progress shows on standard error")
-      ->check(CLI::IsMember({"auto", "bar", "json", "none"}))
+      ->transform(OneOf({"auto", "bar", "json", "none"}))
       ->capture_default_str();
   app.add_flag("-q,--quiet", quiet, "Show no progress");
 }
@@ -107,6 +131,10 @@ Document ReadJob(const JobOptions& options, String& text) {
   }
   text = String(bytes);
   return {text, source};
+}
+
+bool AsksForStrictChecks(const Document& job) {
+  return ChecksAreStrict() && !job.GetRoot().attributes.HasKey("Checks");
 }
 
 void WriteResult(const String& resultDocument, bool json, Output& output) {
@@ -127,8 +155,16 @@ int ExitCodeOf(const Document& job, const String& resultDocument) {
         "\" is unknown; see vexg commands");
     failed = true;
   }
+  auto next = asked.begin();
   for (const XMLElementPtr& command : result.GetRoot().children) {
+    if (command->name == kFault) {
+      Say("the job: " + command->attributes.Find("Reason").ToUTF8());
+      failed = failed || ChecksAreStrict();
+    }
+    if (command->name != "Command") continue;
     if (command->attributes.Find("Result") != "Success") failed = true;
+    while (next != asked.end() && next->name != command->attributes.Find("Name").ToUTF8()) ++next;
+    if (next != asked.end()) SayReason(*next++, *command);
   }
   return failed ? kExitFailed : kExitSuccess;
 }
