@@ -4,6 +4,7 @@
 #include <cmath>
 #include <filesystem>
 
+#include "common/file_guard.h"
 #include "common/messages.h"
 #include "foundation/fault.h"
 #include "gdal_creation.h"
@@ -135,7 +136,8 @@ bool OpenRaster::TakeDataset(DatasetPtr dataset) {
   if (dataType_ == 0) return false;
   interleave_ = ReadInterleave(dataset_.get());
   FindLevels();
-  return true;
+  // The overviews are looked for only now, and a file may name one anywhere.
+  return WasRefusedNothing();
 }
 
 /// Takes the dataset of a raster that was open before: its reader goes by what it was then.
@@ -289,14 +291,18 @@ bool OpenRaster::Read(const BlockPlace& place, void* pixels) {
   // What was read of damaged data waits in GDAL's cache as if it were whole, and codecs warn once.
   if (isDamaged_ && !isUpdated_) {
     isThreaded_ = false;
+    isPlain_ = true;
     if (!TakeAgain(OpenDataset(source_, format_, GDAL_OF_RASTER))) return false;
   }
   isDamaged_ = false;
   if (Transfer(GF_Read, place, pixels)) return true;
   isDamaged_ = CheckPlace(place) != nullptr;
-  if (!isThreaded_ || !isDamaged_) return false;
-  // What a thread of GDAL has to say reaches nobody. Without them it says it here.
+  const bool isShortCut = !isPlain_ && !isUpdated_ && format_.drivers.front() == "GTiff";
+  if (!isShortCut || !isDamaged_) return false;
+  // What a thread of GDAL has to say reaches nobody, and a read past its cache says nothing. A
+  // plain one says it here.
   isThreaded_ = false;
+  isPlain_ = true;
   isDamaged_ = !TakeAgain(OpenDataset(source_, format_, GDAL_OF_RASTER)) ||
                !Transfer(GF_Read, place, pixels);
   return !isDamaged_;
@@ -379,6 +385,7 @@ bool OpenRaster::FindLevelsAnew() {
   DatasetPtr dataset = OpenToRead(format_, source_, isThreaded);
   if (dataset == nullptr) return false;  // what is open stays
   isThreaded_ = isThreaded;
+  isPlain_ = false;
   return TakeAgain(std::move(dataset));
 }
 

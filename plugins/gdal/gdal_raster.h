@@ -106,6 +106,7 @@ class OpenRaster {
   std::map<unsigned, RasterLevel> levels_;
   bool isUpdated_ = false;    // open for writing
   bool isThreaded_ = false;   // GDAL decodes on threads of its own
+  bool isPlain_ = false;      // opened without what makes reads faster, as one has failed
   bool isDamaged_ = false;    // the last read failed
   bool mayHavePairs_ = true;  // stored statistics between bands
   enum class Answer { kUnknown, kNo, kYes } canWrite_ = Answer::kUnknown;

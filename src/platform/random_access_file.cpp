@@ -13,6 +13,7 @@
 #include <utility>
 
 #include "platform/file_descriptor.h"
+#include "platform/file_gate.h"
 
 namespace lumo::platform {
 namespace {
@@ -86,6 +87,7 @@ int Transfer(std::uint64_t offset, std::span<const Piece> pieces, Call&& call) {
 
 std::unique_ptr<RandomAccessFile> RandomAccessFile::Open(const std::string& path, Access access,
                                                          std::string* fault) {
+  if (!PassesFileGate(path, access == Access::kUpdate, fault)) return nullptr;
   const int mode = (access == Access::kRead ? O_RDONLY : O_RDWR) | O_CLOEXEC | O_NONBLOCK;
   FileDescriptor file(RetryInterrupted([&] { return open(path.c_str(), mode); }));
   if (!file.IsOpen()) {
@@ -101,6 +103,7 @@ std::unique_ptr<RandomAccessFile> RandomAccessFile::Open(const std::string& path
 
 std::unique_ptr<RandomAccessFile> RandomAccessFile::Create(const std::string& path,
                                                            std::string* fault) {
+  if (!PassesFileGate(path, true, fault)) return nullptr;
   constexpr mode_t kReadableByAll = 0666;  // less what the process masks
   constexpr int kMode = O_RDWR | O_CREAT | O_EXCL | O_CLOEXEC;
   FileDescriptor file(RetryInterrupted([&] { return open(path.c_str(), kMode, kReadableByAll); }));

@@ -13,7 +13,7 @@ std::vector<InputDeclaration> BlockInputs() {
       {"SubRect", Presence::kRequired, ValueKind::kRectangle, "the block, pixels of the raster"},
       {"Bands", Presence::kRequired, ValueKind::kIntegerArray, "the bands, in any order"},
       {"Interleave", Presence::kRequired, ValueKind::kWord,
-       "BIP, BIL, BSQ: the order in memory; any other word for one band"},
+       "BIP, BIL, BSQ: the order in memory; any other word for one band", "", &WordsIn<Interleave>},
       {"PixelDataBufName", Presence::kRequired, ValueKind::kText, "named memory of the pixels"},
       {"PixelDataBufSize", Presence::kRequired, ValueKind::kInteger, "its size", "bytes"},
       {"PixelValueStateBufName", Presence::kRequired, ValueKind::kText,

@@ -2,6 +2,7 @@
 
 #include "foundation/fault.h"
 #include "raster/raster_command.h"
+#include "stats/turn.h"
 
 namespace lumo {
 namespace {
@@ -23,11 +24,12 @@ const CommandDeclaration kCalculate{
      {"Bands", Presence::kOptional, ValueKind::kIntegerArray,
       "which bands; all when absent, with a BinCount"},
      {"Sign", Presence::kOptional, ValueKind::kWord,
-      "Both, Positive (0 and above), Negative; Both when absent"},
+      "Both, Positive (0 and above), Negative; Both when absent", "", &WordsIn<HistogramSign>},
      {"Bins", Presence::kOptional, ValueKind::kWord,
       "Told: sizes of bin counts hold one bin less, integers have whole sizes, and values behind "
       "the last bin do not count; Exact: every value within the bounds is in one bin",
-      "", &WordsIn<Form>}},
+      "", &WordsIn<Form>},
+     WaitInput()},
     {}};
 
 class CalculateRasterHistogramCommand final : public RasterCommand {
@@ -42,10 +44,11 @@ class CalculateRasterHistogramCommand final : public RasterCommand {
     }
     const auto bands = Read<Array<unsigned>>("Bands");
     if (HasInput("Bands") && !CheckBands(*raster, bands)) return Fail();
+    const Turn turn(raster, Read<Waiting>("Wait"), GetIPC());
     String why;
     const bool typed = DispatchType(TenTypes{}, raster->DataType(), [&]<typename T>() {
       const RasterPtr<T> source(raster);
-      if (source) why = Count(*source, bands);
+      if (source) why = Count(*source, bands, turn);
       return bool(source);
     });
     if (!typed) return Fail("histograms are of real numbers, and the raster has others");
@@ -54,7 +57,7 @@ class CalculateRasterHistogramCommand final : public RasterCommand {
 
   /// Counts, and gives no text, or why that could not be done.
   template <typename T>
-  String Count(Raster<T>& raster, const Array<unsigned>& bands) {
+  String Count(Raster<T>& raster, const Array<unsigned>& bands, const Turn& turn) {
     HistogramRequest<T> request;
     if (!ReadBounds(request)) {
       return "LowerBound and UpperBound hold between them no value that pixels may have";
@@ -68,7 +71,11 @@ class CalculateRasterHistogramCommand final : public RasterCommand {
       request.binSize = Read<double>("BinSize");
     }
     const std::uint64_t writes = raster.WriteCount();
-    const AsyncPtr run = raster.CountHistogram(request, GetIPC());
+    AsyncPtr run = raster.CountHistogram(request, GetIPC());
+    // Another run may have begun meanwhile.
+    while (!run && raster.HistogramAsync() && turn.AwaitRuns()) {
+      run = raster.CountHistogram(request, GetIPC());
+    }
     if (!run) return FaultOr("the run could not be started");
     run->WaitFinished();
     if (run->IsValid() && run->IsAborted()) return "the run was aborted";
@@ -111,7 +118,8 @@ const CommandDeclaration kGet{
     "Statistics",
     "Gives the histograms at hand of bands.",
     {kUri,
-     {"Bands", Presence::kRequired, ValueKind::kIntegerArray, "the bands, in the order wanted"}},
+     {"Bands", Presence::kRequired, ValueKind::kIntegerArray, "the bands, in the order wanted"},
+     WaitInput()},
     {{"Histograms", ValueKind::kText,
       "array of histograms: band, sign, bin size, bins, bounds, source and counts of each"}}};
 
@@ -122,6 +130,7 @@ class GetRasterHistogramCommand final : public RasterCommand {
     if (!raster) return Fail();
     const auto bands = Read<Array<unsigned>>("Bands");
     if (!CheckBands(*raster, bands)) return Fail();
+    const Turn turn(raster, Read<Waiting>("Wait"), GetIPC());
     const bool typed = DispatchType(TenTypes{}, raster->DataType(), [&]<typename T>() {
       const RasterPtr<T> source(raster);
       if (source) WriteHistograms(*source, bands);
@@ -150,7 +159,8 @@ const CommandDeclaration kSet{"SetRasterBandHistogramCommand",
                               "Enters a known histogram of one band.",
                               {kUri,
                                {"RasterBandHistogram", Presence::kRequired, ValueKind::kText,
-                                "band, sign, bin size, bins, bounds, source and counts"}},
+                                "band, sign, bin size, bins, bounds, source and counts"},
+                               WaitInput()},
                               {}};
 
 class SetRasterBandHistogramCommand final : public RasterCommand {
@@ -158,6 +168,7 @@ class SetRasterBandHistogramCommand final : public RasterCommand {
     if (!CheckInputs()) return Fail();
     const BasicRasterPtr raster = FindRaster();
     if (!raster) return Fail();
+    const Turn turn(raster, Read<Waiting>("Wait"), GetIPC());
     const bool set = DispatchType(TenTypes{}, raster->DataType(), [&]<typename T>() {
       const RasterPtr<T> source(raster);
       const auto histogram = Read<RasterBandHistogram<T>>("RasterBandHistogram");
@@ -178,7 +189,7 @@ const CommandDeclaration kSave{
     "SaveRasterHistogramCommand",
     "Statistics",
     "Stores the histograms of a raster through its data source.",
-    {kUri},
+    {kUri, WaitInput()},
     {{"Return", ValueKind::kBoolean, "they are stored, or the source has no place for them"}}};
 
 class SaveRasterHistogramCommand final : public RasterCommand {
@@ -186,6 +197,7 @@ class SaveRasterHistogramCommand final : public RasterCommand {
     if (!CheckInputs()) return Fail();
     const BasicRasterPtr raster = FindRaster();
     if (!raster) return Fail();
+    const Turn turn(raster, Read<Waiting>("Wait"), GetIPC());
     Write("Return", raster->WriteHistogram());
     return Succeed();
   }

@@ -13,7 +13,7 @@ const CommandDeclaration kCreate{
     RasterDefInputs({{"ConnStr", Presence::kRequired, ValueKind::kTextList, "where it is made"},
                      {"Format", Presence::kOptional, ValueKind::kText, "key of the format"},
                      {"Interleave", Presence::kOptional, ValueKind::kWord,
-                      "BIP, BIL, BSQ: the order in the source"},
+                      "BIP, BIL, BSQ: the order in the source", "", &WordsIn<Interleave>},
                      {"Details", Presence::kOptional, ValueKind::kWord,
                       "of the raster in SrcURI, as far as the format has room for them. Told: "
                       "none; Names: the names of bands; Bands: all of the bands and the raster, "

@@ -7,7 +7,7 @@ namespace {
 const CommandDeclaration kCreate{
     "CreateMemoryRasterCommand", "Rasters", "Makes a raster in memory.",
     RasterDefInputs({{"Interleave", Presence::kOptional, ValueKind::kWord,
-                      "BIP, BIL, BSQ: the order in memory"}}),
+                      "BIP, BIL, BSQ: the order in memory", "", &WordsIn<Interleave>}}),
     PublishedOutputs()};
 
 class CreateMemoryRasterCommand final : public RasterDefCommand {

@@ -8,6 +8,7 @@
 #include "foundation/abortable_call.h"
 #include "foundation/fault.h"
 #include "views/publish_raster.h"
+#include "views/reader_raster.h"
 
 namespace lumo {
 namespace {
@@ -24,8 +25,8 @@ std::span<const EnumWord<LevelChoice>> WordsOf(LevelChoice) {
 std::vector<OutputDeclaration> OpenOutputs() {
   std::vector<OutputDeclaration> outputs = PublishedOutputs();
   outputs.push_back({"Note", ValueKind::kText,
-                     "which levels are shown, where Levels is Best and there are two sets of them; "
-                     "only then"});
+                     "what of the inputs had no effect, or which levels are shown where Levels is "
+                     "Best and there are two sets of them; only then"});
   return outputs;
 }
 
@@ -90,8 +91,12 @@ class OpenRasterCommand final : public PublishCommand {
         ChoosesOwn(opened.source, opened.pyramid)) {
       opened.pyramid = DataConnectionPtr();
     }
-    return Publish(
-        CatalogRasterRef(opened.source, opened.pyramid, Read<SourceCheck>("CheckSource")));
+    const CatalogRasterRef raster(opened.source, opened.pyramid, Read<SourceCheck>("CheckSource"));
+    if (opened.pyramid && raster.Raster() && PyramidOf(*raster.Raster()) != opened.pyramid->URI()) {
+      Write("Note", String("the raster is open already, without this pyramid; it is opened with it "
+                           "once everybody has closed it"));
+    }
+    return Publish(raster);
   }
 
   /// The opening with all that it needs, since it may outlive the command.
@@ -130,6 +135,17 @@ class OpenRasterCommand final : public PublishCommand {
     const RasterReaderDispatchPtr dispatch =
         source ? source->RasterReaderDispatch() : RasterReaderDispatchPtr();
     return dispatch ? dispatch->GetBasic() : Pointer<BasicRasterReader>();
+  }
+
+  /// The source that the pyramid of an open raster was opened from; no text for none.
+  static URI PyramidOf(const BasicRaster& raster) {
+    URI uri;
+    DispatchType(TwelveTypes{}, raster.DataType(), [&]<typename T>() {
+      const auto* const reader = dynamic_cast<const ReaderRaster<T>*>(&raster);
+      if (reader != nullptr) uri = reader->PyramidURI();
+      return true;
+    });
+    return uri;
   }
 
   /// Opens a pyramid; one of the library's own that isn't there, or is to be replaced, has no file

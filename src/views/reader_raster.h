@@ -44,6 +44,10 @@ class ReaderRaster final : public ComputedRaster<T>, public SourceRaster {
 
   bool PyramidExists() const override;
   PyramidDef GetPyramidDef() const override;
+  /// The source that the pyramid was opened from; no text when it is the raster's own, or none.
+  lumo::URI PyramidURI() const {
+    return pyramidConnection_ ? pyramidConnection_->URI() : lumo::URI();
+  }
   AsyncPtr PyramidBuild(const PyramidDef& def, const lumo::TileDimensions& tiles,
                         const AsyncCallbackPtr& callback) override;
   AsyncPtr PyramidAsync() const override;

@@ -38,7 +38,7 @@ class Run(unittest.TestCase):
             ("fails", '<Job><Command Name="a" ID="ExampleSumCommand"/></Job>', 1, 'Result="Failed"',
              'vexg: command "a" (ExampleSumCommand) failed: input Values is missing\n'),
             ("bad value", '<Job><Command ID="ExampleSumCommand"><Input Values="1:9 [1] "/></Command></Job>',
-             1, 'Result="Failed"', "Values is not a number array"),
+             1, 'Result="Failed"', "is no number array"),
             ("unknown", unknown, 1, 'Name="b"', 'vexg: command "a" was left out: the ID "X" is unknown'),
             ("empty job", "<Job/>", 2, "<JobResult/>", "vexg: the job holds no Command\n"),
             ("cut", '<Job><Command Name="a"', 2, "", "standard input: not well formed: line 1, column"),

@@ -295,5 +295,36 @@ class Calibrate(RasterTest):
         self.assertEqual(out.read_bytes(), by_job)
 
 
+
+class Waiting(FolderTest):
+    """Commands that compute over one raster at the same time."""
+
+    def job(self, wait):
+        raster = write_orva(self.folder / "raster", 2000, 2000, 2)
+        commands = "".join(
+            f'<Command Name="h{i}" ID="CalculateRasterHistogramCommand"><DependsOn Name="o"/>'
+            f'<Input URI="$r" LowerBound="0" UpperBound="255" BinCount="{i + 1}" {wait}/></Command>'
+            for i in range(4))
+        for name in ("GetBasicRasterStatsCommand", "GetExtendedRasterStatsCommand"):
+            commands += (f'<Command Name="{name}" ID="{name}"><DependsOn Name="o"/>'
+                         f'<Input URI="$r" {wait}/></Command>')
+        path = self.folder / "job.xml"
+        path.write_text(f'<Job><Command Name="o" ID="OpenRasterCommand"><Input ConnStr="{raster}"/>'
+                        f'<Output URI="$r"/></Command>{commands}</Job>')
+        return path
+
+    def test_they_wait_their_turn(self):
+        out = self.fine("run", "-q", "--json", self.job('Wait="Always"'))
+        returned = {command["name"]: command["return"] for command in json.loads(out)["commands"]}
+        self.assertIn("Cov", returned["GetExtendedRasterStatsCommand"])
+        self.assertEqual(returned["GetBasicRasterStatsCommand"]["Count"], "1:2 [4000000 4000000]")
+        self.fails_in_part("run", "-q", self.job('Wait="Alwayz"'), words="did you mean Always?")
+
+    def fails_in_part(self, *arguments, words):
+        code, _, err = run(*map(str, arguments))
+        self.assertEqual(code, 1)
+        self.assertIn(words, err)
+
+
 if __name__ == "__main__":
     unittest.main()

@@ -5,6 +5,7 @@
 #include <CLI/CLI.hpp>
 
 #include "commands/job_parser.h"
+#include "option_values.h"
 #include "verb.h"
 
 namespace lumo::host {
@@ -29,7 +30,7 @@ void RasterJobOptions::AddTo(CLI::App& app) {
 
 void RasterJobOptions::AddProgressTo(CLI::App& app) {
   app.add_option("--progress", progress, "How progress shows on standard error")
-      ->check(CLI::IsMember({"auto", "bar", "json", "none"}))
+      ->transform(OneOf({"auto", "bar", "json", "none"}))
       ->capture_default_str();
   app.add_flag("-q,--quiet", quiet, "Show no progress");
 }
@@ -66,6 +67,7 @@ String JobDraft::Write(const JobChannel* channel) const {
   if (channel != nullptr) channel->AddTo(job);
   XMLDocumentRoot document;
   document.name = root_.name;
+  if (ChecksAreStrict()) document.attributes["Checks"] = FormatValue(JobChecks::kStrict);
   for (const XMLElementPtr& child : job.children) document.children.PushBack(child);
   for (const XMLElementPtr& child : root_.children) document.children.PushBack(child);
   return XMLSimpleWriter().Write(document);
@@ -141,6 +143,14 @@ void JobSession::NoteOpenRasters(const JobDraft& draft, const JobResults& result
       const auto at = std::find(open_.begin(), open_.end(), uri);
       if (at != open_.end()) open_.erase(at);
     }
+  }
+}
+
+/// Says which inputs had no effect.
+void JobSession::SayNotes(const JobDraft& draft, const JobResults& results) const {
+  for (const JobDraft::StepInfo& step : draft.GetSteps()) {
+    const String note = results.Find(step.name).returns.Find("Note");
+    if (note.GetLength() != 0) Say("note: " + note.ToUTF8());
   }
 }
 

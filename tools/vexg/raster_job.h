@@ -85,6 +85,7 @@ class JobSession {
  private:
   String Execute(const JobDraft& draft, bool watched);
   void NoteOpenRasters(const JobDraft& draft, const JobResults& results);
+  void SayNotes(const JobDraft& draft, const JobResults& results) const;
   void CheckResults(const JobDraft& draft, const JobResults& results) const;
   void SayNotes(const JobDraft& draft, const JobResults& results);
   void CloseAll();

@@ -9,6 +9,7 @@
 
 #include "data/file_uri.h"
 #include "data/format_table.h"
+#include "option_values.h"
 #include "raster/pixel_types.h"
 #include "verb.h"
 #include "views/catalog_raster_ref.h"
@@ -65,7 +66,7 @@ std::string AbsoluteName(const std::string& file) {
 
 Array<String> ConnStringsOf(const SourceOptions& source) {
   std::vector<String> pieces;
-  if (!source.format.empty()) pieces.emplace_back(source.format);
+  if (!source.format.empty()) pieces.emplace_back(FormatKey("--input-format", source.format));
   std::string rest = source.file;
   std::size_t bar = rest.find('|');
   pieces.emplace_back(AbsoluteName(rest.substr(0, bar)));
@@ -80,10 +81,6 @@ Array<String> ConnStringsOf(const SourceOptions& source) {
     }
   }
   if (!source.subdataset.empty()) pieces.emplace_back("SUBDATASET=" + source.subdataset);
-  if (!source.format.empty() && FindFormat(String(source.format)) == nullptr) {
-    throw HostError(kExitUsage, "--input-format: there is no format \"" + source.format +
-                                    "\"; see vexg formats");
-  }
   Array<String> strings{ArrayDims(static_cast<unsigned>(pieces.size()))};
   std::copy(pieces.begin(), pieces.end(), strings.begin());
   return strings;

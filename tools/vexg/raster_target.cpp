@@ -5,6 +5,7 @@
 #include <CLI/CLI.hpp>
 
 #include "data/format_table.h"
+#include "option_values.h"
 #include "raster/pixel_types.h"
 #include "verb.h"
 
@@ -54,9 +55,7 @@ std::string ChooseFormat(const TargetOptions& target) {
                                     ": the name's ending tells no format; give --format, one "
                                     "of vexg formats");
   }
-  if (FindFormat(String(target.format)) != nullptr) return target.format;
-  throw HostError(kExitUsage,
-                  "--format: there is no format \"" + target.format + "\"; see vexg formats");
+  return FormatKey("--format", target.format);
 }
 
 std::uint64_t BytesInFile(const std::string& format, unsigned dataType, std::uint64_t samples,

@@ -7,12 +7,27 @@
 #include <CLI/CLI.hpp>
 
 #include "commands/command.h"
+#include "option_values.h"
 #include "platform/process.h"
 #include "value_json.h"
 #include "verb.h"
 
 namespace lumo::host {
 namespace {
+
+constexpr const char* kFault = "Fault";
+
+/// Says why a command failed.
+void SayReason(const NamedCommand& command, const XMLElement& result) {
+  const std::string word = result.attributes.Find("Result").ToUTF8();
+  const std::string reason = result.attributes.Find("Reason").ToUTF8();
+  if (word == "None" && !reason.empty()) {
+    Say("command \"" + command.name + "\" was left out: " + reason + "; see vexg commands");
+  } else if (word == "Failed") {
+    Say("command \"" + command.name + "\" (" + command.id + ") failed" +
+        (reason.empty() ? "" : ": " + reason));
+  }
+}
 
 bool IsKnownHere(const NamedCommand& command) {
   return GetCommandRegistry().HasKey(command.id);
@@ -67,24 +82,32 @@ Json AsJson(const XMLElement& command, const CommandDeclaration* declaration) {
       returns[name.ToUTF8()] = ValueAsJson(value, KindOf(declaration, name));
     }
   }
-  return {{"name", attribute("Name").ToUTF8()},
-          {"result", attribute("Result").ToUTF8()},
-          {"wall", SecondsAsJson(attribute("Wall"))},
-          {"cpu", SecondsAsJson(attribute("CPU"))},
-          {"usage", ValueAsJson(attribute("Usage"), ValueKind::kNumber)},
-          {"return", returns}};
+  Json entry{{"name", attribute("Name").ToUTF8()},
+             {"result", attribute("Result").ToUTF8()},
+             {"wall", SecondsAsJson(attribute("Wall"))},
+             {"cpu", SecondsAsJson(attribute("CPU"))},
+             {"usage", ValueAsJson(attribute("Usage"), ValueKind::kNumber)}};
+  if (command.attributes.HasKey("Reason")) entry["reason"] = attribute("Reason").ToUTF8();
+  entry["return"] = returns;
+  return entry;
 }
 
 std::string ToJson(const Document& job, const Document& result) {
   const std::vector<NamedCommand> matched =
       MatchCommands(job.GetCommands(), result.GetCommands()).answered;
-  Json commands = Json::array();
-  for (const XMLElementPtr& command : result.GetRoot().children) {
+  Json commands = Json::array(), faults = Json::array();
+  for (const XMLElementPtr& child : result.GetRoot().children) {
+    if (child->name == kFault) {
+      faults.push_back(child->attributes.Find("Reason").ToUTF8());
+      continue;
+    }
     const bool isMatched = commands.size() < matched.size();
     commands.push_back(
-        AsJson(*command, isMatched ? FindDeclaration(matched[commands.size()]) : nullptr));
+        AsJson(*child, isMatched ? FindDeclaration(matched[commands.size()]) : nullptr));
   }
-  return Json{{"commands", commands}}.dump(2) + "\n";
+  Json all{{"commands", commands}};
+  if (!faults.empty()) all["faults"] = faults;
+  return all.dump(2) + "\n";
 }
 
 }  // namespace
@@ -125,7 +148,7 @@ void JobOptions::AddTo(CLI::App& app) {
       ->type_name("FILE");
   app.add_flag("--json", json, "Give the result as JSON");
   app.add_option("--progress", progress, "How progress shows on standard error")
-      ->check(CLI::IsMember({"auto", "bar", "json", "none"}))
+      ->transform(OneOf({"auto", "bar", "json", "none"}))
       ->capture_default_str();
   app.add_flag("-q,--quiet", quiet, "Show no progress");
 }
@@ -138,6 +161,10 @@ Document ReadJob(const JobOptions& options, String& text) {
   }
   text = String(bytes);
   return {text, source};
+}
+
+bool AsksForStrictChecks(const Document& job) {
+  return ChecksAreStrict() && !job.GetRoot().attributes.HasKey("Checks");
 }
 
 void WriteResult(const Document& job, const String& resultDocument, bool json, Output& output) {
@@ -158,8 +185,16 @@ int ExitCodeOf(const Document& job, const String& resultDocument) {
         "\" is unknown; see vexg commands");
     failed = true;
   }
+  auto next = asked.begin();
   for (const XMLElementPtr& command : result.GetRoot().children) {
+    if (command->name == kFault) {
+      Say("the job: " + command->attributes.Find("Reason").ToUTF8());
+      failed = failed || ChecksAreStrict();
+    }
+    if (command->name != "Command") continue;
     if (command->attributes.Find("Result") != "Success") failed = true;
+    while (next != asked.end() && next->name != command->attributes.Find("Name").ToUTF8()) ++next;
+    if (next != asked.end()) SayReason(*next++, *command);
   }
   return failed ? kExitFailed : kExitSuccess;
 }
@@ -168,9 +203,10 @@ Outcome OutcomeOf(const String& resultDocument, bool aborted) {
   if (aborted) return Outcome::kAborted;
   const Document result(resultDocument, "the result");
   const auto& commands = result.GetRoot().children;
-  const bool succeeded = std::all_of(
-      commands.begin(), commands.end(),
-      [](const XMLElementPtr& command) { return command->attributes.Find("Result") == "Success"; });
+  const bool succeeded =
+      std::all_of(commands.begin(), commands.end(), [](const XMLElementPtr& command) {
+        return command->name != "Command" || command->attributes.Find("Result") == "Success";
+      });
   return succeeded ? Outcome::kDone : Outcome::kFailed;
 }
 

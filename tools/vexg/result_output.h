@@ -50,14 +50,20 @@ struct JobOptions {
 /// any Command is answered with a bare result; see ExitCodeOf.
 Document ReadJob(const JobOptions& options, String& text);
 
+/// True when the commands of a job are to be checked strictly: the job says nothing of its checks,
+/// and the user has not asked for lenient ones.
+bool AsksForStrictChecks(const Document& job);
+
 /// Writes the result document, or the same as JSON:
-/// {"commands": [{"name", "result", "wall", "cpu", "usage", "return": {name: value}}]}, with "wall"
-/// and "cpu" in seconds and values as ValueAsJson gives them for what their commands declare. The
-/// values of a command that is unknown here are texts.
+/// {"commands": [{"name", "result", "wall", "cpu", "usage", "reason", "return": {name: value}}],
+/// "faults": [text]}; "reason" and "faults" only where there are some, "wall" and "cpu" in seconds,
+/// and values as ValueAsJson gives them for what their commands declare. The values of a command
+/// that is unknown here are texts.
 /// @param job  whose result it is.
 void WriteResult(const Document& job, const String& resultDocument, bool json, Output& output);
 
-/// Says which commands of the job left no trace in its result, as their IDs are unknown.
+/// Says what is wrong with the document, why commands failed, and which of them left no trace in
+/// the result, as their IDs are unknown to a server that doesn't say so.
 /// @return how the program ends: success, a failed or unknown command, or a job without any.
 int ExitCodeOf(const Document& job, const String& resultDocument);
 

@@ -11,6 +11,7 @@
 
 #include "keeping.h"
 #include "metadata_source.h"
+#include "option_values.h"
 #include "raster/pixel_types.h"
 #include "verb.h"
 
@@ -114,6 +115,18 @@ void RefuseMissing(const Options& options) {
   }
 }
 
+/// Questions constants that can hardly be meant.
+void QuestionOdd(const Options& options) {
+  if (options.quantity != "reflectance") return;
+  constexpr double kLeast = 0.9, kMost = 1.1;  // the earth keeps within 0.983 and 1.017
+  if (*options.distance < kLeast || *options.distance > kMost) {
+    Say(
+        fmt::format("note: {}: {} astronomical units; the earth is 0.983 to 1.017 of them from the "
+                    "sun",
+                    NameOf(options, "--distance"), *options.distance));
+  }
+}
+
 /// Refuses constants that give no image.
 void RefuseImpossible(const Options& options) {
   if (options.quantity != "reflectance") return;
@@ -182,7 +195,7 @@ unsigned TypeCode(const Options& options) {
   const bool known = DispatchType(EightTypes{}, code, []<typename T>() { return true; });
   if (known) return code;
   throw HostError(kExitUsage, "--type: \"" + options.type +
-                                  "\" is none of Byte, SByte, Int16, UInt16, Int32, UInt32, "
+                                  "\" is none of Byte, Char, Int16, UInt16, Int32, UInt32, "
                                   "Single, Double");
 }
 
@@ -284,6 +297,7 @@ int Calibrate(Options& options) {
   } else {
     RefuseMissing(options);
     RefuseImpossible(options);
+    QuestionOdd(options);
   }
   const std::string format = ChooseFormat(options.target);
   OutputFile output(options.target.output, options.target.overwrite, inputs);
@@ -293,6 +307,7 @@ int Calibrate(Options& options) {
     const std::string taken = TakeConstants(options, opened);
     RefuseMissing(options);
     RefuseImpossible(options);
+    QuestionOdd(options);
     Say(taken);
   }
   output.RefuseInput(PathOf(opened.Find("source").returns.Find("URI")));
@@ -337,7 +352,7 @@ const VerbRegistration registration(
           "--offset -1.5,-2.8,-1.2 --irradiance 1970,1843,1555 --sun-elevation 49.6 --distance "
           "1.012\n");
       app.add_option("quantity", options->quantity, "radiance, reflectance or temperature")
-          ->check(CLI::IsMember({"radiance", "reflectance", "temperature"}))
+          ->transform(OneOf({"radiance", "reflectance", "temperature"}))
           ->required();
       options->source.AddTo(app);
       options->target.AddTo(app, "The calibrated raster");
@@ -351,14 +366,18 @@ const VerbRegistration registration(
                   "Solar irradiance outside the atmosphere, in the unit of radiance (reflectance)");
       app.add_option("--sun-elevation", options->sunElevation,
                      "Of the sun above the horizon, in degrees (reflectance)")
-          ->type_name("DEG");
+          ->type_name("DEG")
+          ->transform(NumberWithUnit({"degrees", "degree", "deg", "\u00b0"}));
       app.add_option("--distance", options->distance,
                      "From the earth to the sun, in astronomical units (reflectance)")
-          ->type_name("AU");
+          ->type_name("AU")
+          ->transform(NumberWithUnit({"astronomical units", "au", "ua"}));
       AddConstant(app, "--k1", options->k1, "First thermal constant (temperature)");
       AddConstant(app, "--k2", options->k2, "Second thermal constant, in kelvins (temperature)");
       app.add_option("--scale", options->scale, "Factor on the result")->capture_default_str();
-      app.add_option("--type", options->type, "Pixel type of the result")->capture_default_str();
+      app.add_option("--type", options->type, "Pixel type of the result")
+          ->transform(PixelTypeName())
+          ->capture_default_str();
       options->job.AddTo(app);
       options->job.AddProgressTo(app);
       return VerbRegistration::Work([options] { return Calibrate(*options); });

@@ -6,6 +6,7 @@
 
 #include "foundation/color.h"
 #include "keeping.h"
+#include "option_values.h"
 #include "palette_reading.h"
 #include "raster/pixel_types.h"
 #include "verb.h"
@@ -197,9 +198,10 @@ const VerbRegistration registration(
       app.add_option("--bands", options->bands, "Bands in the order wanted, from 0; all by default")
           ->type_name("B,B…");
       app.add_option("--interleave", options->interleave, "Order of the pixels in the copy")
-          ->check(CLI::IsMember({"bip", "bil", "bsq"}));
+          ->transform(OneOf({"bip", "bil", "bsq"}));
       app.add_option("--type", options->type, "Pixel type that the source has to have")
-          ->type_name("TYPE");
+          ->type_name("TYPE")
+          ->transform(PixelTypeName());
       options->job.AddTo(app);
       options->job.AddProgressTo(app);
       return VerbRegistration::Work([options] { return Copy(*options); });

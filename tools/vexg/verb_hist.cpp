@@ -8,12 +8,14 @@
 #include <CLI/CLI.hpp>
 #include <fmt/format.h>
 
+#include "foundation/near_name.h"
 #include "histogram_plot.h"
 #include "json_number.h"
 #include "picture_writer.h"
 #include "raster/band_values.h"
 #include "raster_target.h"
 #include "stats/raster_histogram.h"
+#include "stats/turn.h"
 #include "verb.h"
 
 namespace lumo::host {
@@ -175,7 +177,9 @@ class HistogramJob {
   void ReadExtremes(Array<T>& lowest, Array<T>& highest) {
     JobDraft draft;
     AddBandView(draft, "bands", raster_, bands_);
-    draft.Step(kStatsStep, "GetBasicRasterStatsCommand").AddVariableInput("URI", "$bands");
+    JobWriterCommand& stats = draft.Step(kStatsStep, "GetBasicRasterStatsCommand");
+    stats.AddVariableInput("URI", "$bands");
+    stats.AddInput("Wait", Waiting::kAlways);
     draft.Close("close.bands", "$bands");
     const ProgressView view(ProgressOfStep(session_, draft, kStatsStep),
                             options_.job.GetProgressStyle());
@@ -216,6 +220,7 @@ class HistogramJob {
       }
       count.AddInput("Bands", list);
       count.AddInput("Bins", Form::kExact);
+      count.AddInput("Wait", Waiting::kAlways);
     }
     for (const BandBins<T>& bins : bands) {
       Array<unsigned> band{ArrayDims(1)};
@@ -223,8 +228,12 @@ class HistogramJob {
       JobWriterCommand& get = draft.Step(NameOf(bins), "GetRasterHistogramCommand");
       get.AddInput("URI", raster);
       get.AddInput("Bands", band);
+      get.AddInput("Wait", Waiting::kAlways);
     }
-    if (options_.save) draft.Step("save", "SaveRasterHistogramCommand").AddInput("URI", raster);
+    if (!options_.save) return;
+    JobWriterCommand& save = draft.Step("save", "SaveRasterHistogramCommand");
+    save.AddInput("URI", raster);
+    save.AddInput("Wait", Waiting::kAlways);
   }
 
   JobDraft MakeDraft(const std::vector<BandBins<T>>& bands) const {
@@ -278,7 +287,7 @@ class HistogramJob {
   }
 
   std::string AsText(const std::vector<BandBins<T>>& bands) const {
-    std::string text = options_.source.file + "\n";
+    std::string text = Printable(options_.source.file) + "\n";
     for (const BandBins<T>& bins : bands) {
       const std::uint64_t counted =
           std::accumulate(bins.counts.begin(), bins.counts.end(), std::uint64_t{0});

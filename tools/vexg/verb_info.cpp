@@ -5,6 +5,7 @@
 #include <CLI/CLI.hpp>
 #include <fmt/format.h>
 
+#include "foundation/near_name.h"
 #include "json_number.h"
 #include "raster_source.h"
 #include "verb.h"
@@ -179,7 +180,7 @@ std::string GeoRefAsText(const RasterInfo& info) {
 }
 
 std::string AsText(const std::string& file, const RasterInfo& info) {
-  std::string text = fmt::format("{}\n", file);
+  std::string text = fmt::format("{}\n", Printable(file));
   text += fmt::format("  format         {}\n", info.format.ToUTF8());
   text += fmt::format("  size           {} samples, {} lines, {} bands\n", info.samples, info.lines,
                       info.bands);

@@ -4,6 +4,7 @@
 #include <CLI/CLI.hpp>
 #include <fmt/format.h>
 
+#include "foundation/near_name.h"
 #include "json_number.h"
 #include "metadata/metadata_types.h"
 #include "metadata_source.h"
@@ -181,7 +182,7 @@ int PrintMetadata(const Options& options) {
     return kExitSuccess;
   }
   for (const auto& [path, value] : values.items()) {
-    std::cout << fmt::format("{:<{}}  {}\n", path, width, AsText(value));
+    std::cout << fmt::format("{:<{}}  {}\n", Printable(path), width, Printable(AsText(value)));
   }
   return kExitSuccess;
 }

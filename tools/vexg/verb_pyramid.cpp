@@ -9,6 +9,7 @@
 
 #include "data/format_table.h"
 #include "json_number.h"
+#include "option_values.h"
 #include "raster_target.h"
 #include "verb.h"
 #include "views/catalog_raster_ref.h"
@@ -241,24 +242,24 @@ const VerbRegistration registration(
           "Example: vexg pyramid build scene.tif --levels 1-5\n");
       app.add_option("action", options->action, "build, info or delete")
           ->type_name("ACTION")
-          ->check(CLI::IsMember({"build", "info", "delete"}))
+          ->transform(OneOf({"build", "info", "delete"}))
           ->required();
       options->source.AddTo(app);
       app.add_option("--levels", options->levels,
                      "First and last level; by default from 1 to that smaller than 512 pixels")
           ->type_name("A-B");
       app.add_option("--type", options->type, "Who keeps the pyramid; ORVA by default")
-          ->check(CLI::IsMember({"ORVA", "DRIVER"}));
+          ->transform(OneOf({"ORVA", "DRIVER"}));
       app.add_option("--output", options->output, "The pyramid file; FILE.pyr by default")
           ->type_name("PATH");
       app.add_option("--method", options->method, "How a driver reduces pixels")
-          ->check(CLI::IsMember({"Nearest", "Linear", "Cubic", "Majority"}))
+          ->transform(OneOf({"Nearest", "Linear", "Cubic", "Majority"}))
           ->capture_default_str();
       app.add_option("--tile", options->side, "Side of the squares that levels are stored in")
           ->check(CLI::Range(1U, 2048U))
           ->capture_default_str();
       app.add_option("--compression", options->compression, "Of a pyramid file; LZ4 by default")
-          ->check(CLI::IsMember({"LZ4", "NONE"}));
+          ->transform(OneOf({"LZ4", "NONE"}));
       app.add_flag("--json", options->json, "info as JSON");
       options->job.AddTo(app);
       options->job.AddProgressTo(app);

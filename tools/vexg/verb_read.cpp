@@ -7,6 +7,7 @@
 
 #include "block_reader.h"
 #include "npy_writer.h"
+#include "option_values.h"
 #include "output_file.h"
 #include "png_writer.h"
 #include "raster/pixel_types.h"
@@ -224,7 +225,7 @@ const VerbRegistration registration(
       app.add_option("--bands", options->bands, "Bands in the order wanted, from 0; all by default")
           ->type_name("B,B…");
       app.add_option("--interleave", options->interleave, "Order of the array")
-          ->check(CLI::IsMember({"bip", "bil", "bsq"}))
+          ->transform(OneOf({"bip", "bil", "bsq"}))
           ->capture_default_str();
       app.add_option("--mask", options->mask,
                      "A second array, of a byte for each value: 0 valid, else the sum of 1 no "

@@ -1,4 +1,5 @@
 #include <algorithm>
+#include <cstdlib>
 #include <memory>
 
 #include <CLI/CLI.hpp>
@@ -7,10 +8,15 @@
 #include "commands/served_jobs.h"
 #include "commands/server.h"
 #include "data/access_policy.h"
+#include "data/format_table.h"
+#include "foundation/environment.h"
 #include "foundation/fault.h"
 #include "foundation/thread_roll.h"
+#include "option_values.h"
+#include "platform/file_fence.h"
 #include "platform/interrupt.h"
 #include "platform/message_pipe.h"
+#include "platform/module.h"
 #include "platform/pipe_listener.h"
 #include "platform/process.h"
 #include "server_options.h"
@@ -47,6 +53,36 @@ struct ServeOptions {
   }
 };
 
+void AddVariable(std::vector<std::string>& paths, const char* name) {
+  if (const char* const value = std::getenv(name)) paths.emplace_back(value);
+}
+
+/// Has the kernel keep the server to the roots too: a library that opens a file by itself can't
+/// reach further then.
+void FenceIn(bool quiet) {
+  for (std::uint32_t row = 0; row < kFormatCount; ++row) LoadFormat(row);
+  TakeFault();  // of formats that have no plug-in here
+  const AccessPolicy policy = GetAccessPolicy();
+  const EnvironmentImpl& folders = GetGlobalEnvironmentImpl();
+  platform::FileFence fence;
+  fence.network = policy.network;
+  fence.writable = policy.roots;
+  fence.writable.push_back(folders.Find(Environment::kPeDirectory).ToUTF8());
+  AddVariable(fence.writable, "metadata_parse_log_dir");
+  fence.readable.push_back(platform::LibraryDirectory());
+  for (const ContextKey& key : {Environment::kBinDirectory, Environment::kXmlDirectory,
+                                Environment::kGdalDirectory, Environment::kMdfDirectory}) {
+    fence.readable.push_back(folders.Find(key).ToUTF8());
+  }
+  for (const char* const name : {"PROJ_DATA", "PROJ_LIB", "GDAL_DATA", "GDAL_DRIVER_PATH"}) {
+    AddVariable(fence.readable, name);
+  }
+  std::string fault;
+  if (!platform::RaiseFileFence(fence, fault) && !quiet) {
+    Say("--root is kept by the server alone, not by the kernel: " + fault);
+  }
+}
+
 /// Keeps the jobs of clients to what the user named.
 void LimitAccess(const ServeOptions& options) {
   AccessPolicy policy;
@@ -56,8 +92,10 @@ void LimitAccess(const ServeOptions& options) {
   policy.memory = options.Allows("memory");
   policy.indirect = options.Allows("indirect");
   policy.special = options.Allows("special");
-  if (SetAccessPolicy(policy)) return;
-  throw HostError(kExitUsage, "--root: " + TakeFault().ToUTF8());
+  if (!SetAccessPolicy(policy)) {
+    throw HostError(kExitUsage, "--root: " + TakeFault().ToUTF8());
+  }
+  if (!policy.roots.empty()) FenceIn(options.quiet);
 }
 
 int Serve(const ServeOptions& options) {
@@ -112,7 +150,7 @@ const VerbRegistration registration(
                      "files), memory (addresses), indirect (formats whose files name other files), "
                      "special (devices and pipes); may come again")
           ->type_name("WHAT")
-          ->check(CLI::IsMember({"network", "virtual", "memory", "indirect", "special"}))
+          ->transform(OneOf({"network", "virtual", "memory", "indirect", "special"}))
           ->allow_extra_args(false);
       return VerbRegistration::Work([options] { return Serve(*options); });
     });

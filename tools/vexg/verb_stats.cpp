@@ -4,8 +4,10 @@
 #include <CLI/CLI.hpp>
 #include <fmt/format.h>
 
+#include "foundation/near_name.h"
 #include "json_number.h"
 #include "raster_target.h"
+#include "stats/turn.h"
 #include "verb.h"
 
 namespace lumo::host {
@@ -28,11 +30,16 @@ JobDraft MakeDraft(const Options& options, const Array<unsigned>& bands) {
   AddOpenWithPyramid(draft, "raster", options.source);
   if (!options.bands.empty()) AddBandView(draft, "bands", "$raster", bands);
   const String shown = options.bands.empty() ? "$raster" : "$bands";
-  draft
-      .Step(kStatsStep,
-            options.extended ? "GetExtendedRasterStatsCommand" : "GetBasicRasterStatsCommand")
-      .AddVariableInput("URI", shown);
-  if (options.save) draft.Step("save", "SaveRasterStatsCommand").AddVariableInput("URI", "$raster");
+  JobWriterCommand& stats =
+      draft.Step(kStatsStep,
+                 options.extended ? "GetExtendedRasterStatsCommand" : "GetBasicRasterStatsCommand");
+  stats.AddVariableInput("URI", shown);
+  stats.AddInput("Wait", Waiting::kAlways);
+  if (options.save) {
+    JobWriterCommand& save = draft.Step("save", "SaveRasterStatsCommand");
+    save.AddVariableInput("URI", "$raster");
+    save.AddInput("Wait", Waiting::kAlways);
+  }
   if (!options.bands.empty()) draft.Close("close.bands", "$bands");
   draft.Close("close.raster", "$raster");
   return draft;
@@ -168,7 +175,7 @@ void AppendMatrix(std::string& text, const char* title, const BandTable& table,
 }
 
 std::string AsText(const std::string& file, const BandTable& table) {
-  std::string text = fmt::format("{}\nband", file);
+  std::string text = fmt::format("{}\nband", Printable(file));
   for (const auto& [name, column] : table.columns) text += fmt::format(" {:>16}", name);
   text += '\n';
   for (std::size_t i = 0; i < table.bands.size(); ++i) {

@@ -26,6 +26,8 @@ int SubmitJobFile(const JobOptions& options, const ServerOptions& server) {
   Document document = ReadJob(options, text);
   Output output(options.output);
   JobChannel channel = ChannelOf(document);
+  document.GetRoot().AddChild("Reasons");
+  if (AsksForStrictChecks(document)) document.GetRoot().attributes["Checks"] = "Strict";
   ServerLink link(server);
   String result;
   auto outcome = Outcome::kDone;

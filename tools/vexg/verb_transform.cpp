@@ -13,6 +13,7 @@
 
 #include "georef/affine_link.h"
 #include "georef/std_georef.h"
+#include "option_values.h"
 #include "raster_source.h"
 #include "verb.h"
 
@@ -270,8 +271,9 @@ const VerbRegistration registration(
       app.add_option("file", options->source.file, "A raster: from its pixels to its map")
           ->type_name("FILE");
       app.add_flag("--inverse", options->inverse, "From the map of the file to its pixels");
-      app.add_option("--from", options->from, "The system of the input: WKT, EPSG:n or PROJ");
-      app.add_option("--to", options->to, "The system of the output");
+      app.add_option("--from", options->from, "The system of the input: WKT, EPSG:n or PROJ")
+          ->transform(CoordSysName());
+      app.add_option("--to", options->to, "The system of the output")->transform(CoordSysName());
       options->source.AddFormatTo(app);
       options->job.AddTo(app);
       return VerbRegistration::Work([options] { return Transform(*options); });

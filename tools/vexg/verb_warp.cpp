@@ -1,5 +1,9 @@
+#include <algorithm>
+#include <cmath>
+#include <cstdlib>
 #include <filesystem>
 #include <iostream>
+#include <map>
 #include <memory>
 #include <optional>
 
@@ -8,6 +12,7 @@
 
 #include "georef/covering_grid.h"
 #include "keeping.h"
+#include "option_values.h"
 #include "raster/pixel_value.h"
 #include "verb.h"
 
@@ -19,7 +24,7 @@ struct Options {
   TargetOptions target;
   RasterJobOptions job;
   std::string to;
-  double pixelSize = 0;
+  std::string pixelSize;  ///< with or without a unit
   std::string method = "polynomial";
   std::string resampling = "nearest";
   std::string bands;
@@ -93,13 +98,83 @@ GeoRefPtr GridOfFile(JobSession& session, const std::string& file) {
   return like.geoRef;
 }
 
+/// The complaint of an option's check; no text for a size.
+std::string CheckPixelSize(const std::string& text) {
+  Quantity size;
+  const bool isSize = ReadQuantity(text, size) && std::isfinite(size.value) && size.value > 0;
+  return isSize ? "" : fmt::format("\"{}\" is no size above 0", text);
+}
+
+/// The unit that a person writes behind a number; null for none that is known.
+const MapUnit* FindUnit(const std::string& typed) {
+  static const std::map<std::string, std::int32_t> kShort{
+      {"m", 9001},      {"metre", 9001},   {"metres", 9001}, {"meter", 9001}, {"meters", 9001},
+      {"km", 9036},     {"ft", 9002},      {"feet", 9002},   {"foot", 9002},  {"deg", 9102},
+      {"degree", 9102}, {"degrees", 9102}, {"\u00b0", 9102}};
+  const auto at = kShort.find(typed);
+  return at != kShort.end() ? FindMapUnit(at->second) : nullptr;
+}
+
+/// The side of a pixel in units of the system; 0 for no text. Throws HostError for one that can't
+/// be, and questions one that can hardly be meant.
+double ReadPixelSize(const std::string& text, const CoordSys& system) {
+  Quantity size;
+  if (text.empty() || !ReadQuantity(text, size)) return 0;
+  const CoordSysInfo& info = *system.Info();
+  if (!size.unit.empty()) {
+    const MapUnit* const unit = FindUnit(size.unit);
+    if (unit == nullptr || unit->kind != info.unitKind) {
+      throw HostError(kExitUsage, "--pixel-size: " + text + ": the unit of the system is " +
+                                      info.unitName.ToUTF8());
+    }
+    size.value *= unit->factor / info.unitFactor;
+  }
+  const double plain = size.value * info.unitFactor;  // metres or degrees
+  if (info.unitKind == 1 && plain > 360) {
+    throw HostError(kExitUsage, "--pixel-size: " + text + ": no pixel is that many degrees wide");
+  }
+  if (info.unitKind == 1 && plain >= 1) {
+    Say(fmt::format(
+        "note: --pixel-size: a pixel is {} degrees wide; that is the unit of the system", plain));
+  } else if (info.unitKind == 0 && plain < 0.01) {
+    Say(fmt::format("note: --pixel-size: a pixel is {} m wide; that is the unit of the system",
+                    plain));
+  }
+  return size.value;
+}
+
+/// Questions a zone of the Universal Transverse Mercator grid that is far from the raster.
+void QuestionZone(const std::string& named, const CoordSys& system, const GeoRef& source) {
+  std::string name = system.Info()->name.ToUTF8();
+  std::replace(name.begin(), name.end(), '_', ' ');
+  const std::size_t at = CLI::detail::to_lower(name).find("utm zone ");
+  if (at == std::string::npos) return;
+  const int zone = std::atoi(name.c_str() + at + 9);
+  if (zone < 1 || zone > 60) return;
+  Array<double> centre{ArrayDims(1, 2)};
+  centre[0] = source.Samples() / 2.0;
+  centre[1] = source.Lines() / 2.0;
+  source.PixelToMap(centre);
+  double longitude = 0, latitude = 0;
+  source.CoordinateSystem().MapToGeo(centre[0], centre[1], longitude, latitude);
+  if (!std::isfinite(longitude)) return;
+  constexpr double kFar = 9;  // degrees: the zone's half, and a zone between
+  const double off = std::abs(std::remainder(longitude - (zone * 6 - 183), 360.0));
+  if (off <= kFar) return;
+  const int nearest = static_cast<int>(std::floor((std::remainder(longitude, 360.0) + 180) / 6));
+  Say(
+      fmt::format("note: --to: the raster lies {:.0f} degrees from the middle of zone {} ({}); its "
+                  "own is zone {}",
+                  off, zone, named, nearest % 60 + 1));
+}
+
 /// The grid that was asked for. Throws HostError for one that can't be.
 GeoRefPtr FindGrid(JobSession& session, const Options& options, const RasterInfo& info) {
   if (info.geoRef.IsNull()) {
     throw HostError(kExitFailed, options.source.file + ": the raster has no geo-reference");
   }
   if (IsFile(options.to)) {
-    if (options.pixelSize != 0) {
+    if (!options.pixelSize.empty()) {
       throw HostError(kExitUsage, "--pixel-size: the grid of " + options.to + " has its own");
     }
     return GridOfFile(session, options.to);
@@ -111,7 +186,9 @@ GeoRefPtr FindGrid(JobSession& session, const Options& options, const RasterInfo
   if (info.geoRef->CoordinateSystem().IsEmpty()) {
     throw HostError(kExitFailed, options.source.file + ": the raster has no coordinate system");
   }
-  const GeoRefPtr grid = CoveringGrid(*info.geoRef, system, options.pixelSize);
+  QuestionZone(options.to, system, *info.geoRef);
+  const GeoRefPtr grid =
+      CoveringGrid(*info.geoRef, system, ReadPixelSize(options.pixelSize, system));
   if (grid.IsNull()) {
     throw HostError(kExitFailed, options.source.file +
                                      ": the raster can't be carried to that system with pixels "
@@ -194,17 +271,19 @@ const VerbRegistration registration(
                      "Coordinate system (EPSG:n, WKT, PROJ text), or a raster file whose grid is "
                      "taken over")
           ->type_name("CS|FILE")
+          ->transform(CoordSysName())
           ->required();
       app.add_option("--pixel-size", options->pixelSize,
-                     "Side of a pixel in units of the system; by default about as many pixels as "
+                     "Side of a pixel in units of the system, or with its unit; by default about "
+                     "as many pixels as "
                      "the source has")
           ->type_name("SIZE")
-          ->check(CLI::PositiveNumber);
+          ->check(CheckPixelSize);
       app.add_option("--method", options->method, "How positions are found")
-          ->check(CLI::IsMember({"polynomial", "rigorous"}))
+          ->transform(OneOf({"polynomial", "rigorous"}))
           ->capture_default_str();
       app.add_option("--resampling", options->resampling, "How pixels are made")
-          ->check(CLI::IsMember({"nearest", "linear", "cubic"}))
+          ->transform(OneOf({"nearest", "linear", "cubic"}))
           ->capture_default_str();
       app.add_option("--bands", options->bands, "Bands in the order wanted, from 0; all by default")
           ->type_name("B,B…");

@@ -5,6 +5,7 @@
 #include <map>
 #include <mutex>
 
+#include "common/file_guard.h"
 #include "common/messages.h"
 #include "foundation/environment.h"
 
@@ -35,6 +36,7 @@ void StartGdal() {
     if (!data.empty()) CPLSetConfigOption("GDAL_DATA", data.c_str());
     Silence();
     GDALAllRegister();
+    InstallFileGuard();
   });
 }
 

@@ -6,6 +6,7 @@
 #include <initializer_list>
 #include <string_view>
 
+#include "common/hdf5_files.h"
 #include "foundation/fault.h"
 
 namespace lumo::gdal {
@@ -54,6 +55,7 @@ struct Messages::Handler {
 };
 
 Messages::Messages(Damage damage) : damage_(damage) {
+  SilenceHdf5();
   CPLPushErrorHandlerEx(Handler::Take, this);
 }
 
@@ -62,14 +64,40 @@ Messages::~Messages() {
   CPLErrorReset();
 }
 
-bool Messages::Fail(const std::string& name, const char* otherwise) const {
-  // GDAL itself puts the name in front of some messages.
-  const std::string& text = Text();
-  if (text.starts_with(name + ": ")) {
-    SetFault(text);
-    return false;
+namespace {
+
+/// True when the name that ends at `end` goes on there, as that of a side file does.
+bool GoesOn(const std::string& text, std::size_t end) {
+  const auto isPart = [&](std::size_t at) {
+    return at < text.size() && (std::isalnum(static_cast<unsigned char>(text[at])) != 0 ||
+                                text[at] == '_' || text[at] == '-' || text[at] == '/');
+  };
+  return isPart(end) || (end < text.size() && text[end] == '.' && isPart(end + 1));
+}
+
+/// `text` without the file's own name, which stands in front of it anyway.
+std::string WithoutName(std::string text, const std::string& name) {
+  std::size_t at = text.find(name);
+  if (name.empty() || at == std::string::npos || GoesOn(text, at + name.size())) return text;
+  // "name: what", "name, band 1: what", "HDF5:"name"://place, band 1: what"
+  const std::size_t comma = text.find_first_of(",: ", at + name.size());
+  const bool leads = at == 0 || text.substr(0, at).find(' ') == std::string::npos;
+  if (leads && comma != std::string::npos) {
+    const std::size_t end = text[comma] == ' ' ? comma : text.find(' ', comma);
+    if (end != std::string::npos && end + 1 < text.size()) return text.substr(end + 1);
   }
-  return FailWith(name, text.empty() ? otherwise : text);
+  std::size_t length = name.size();
+  const auto isQuote = [](char c) { return c == '\'' || c == '`' || c == '"'; };
+  if (at != 0 && isQuote(text[at - 1])) --at, ++length;
+  if (at + length < text.size() && isQuote(text[at + length])) ++length;
+  return text.replace(at, length, "it");
+}
+
+}  // namespace
+
+bool Messages::Fail(const std::string& name, const char* otherwise) const {
+  // GDAL itself puts the name into some messages.
+  return FailWith(name, Text().empty() ? otherwise : WithoutName(Text(), name));
 }
 
 void Messages::Clear() {
