@@ -60,13 +60,16 @@ struct HistogramBins {
       const double from = std::is_integral_v<T> ? bin * span : begin + bin * span;
       const double to = std::is_integral_v<T> ? (bin + 1.0) * span : begin + (bin + 1.0) * span;
       const double place = std::is_integral_v<T> ? at : v;
-      double beside = place < from ? -1.0 : 0.0;
-      beside = place >= to ? 1.0 : beside;
-      bin += beside;
+      const double above = bin + 1.0;
+      const double below = bin - 1.0;
+      bin = place >= to ? above : bin;
+      bin = place < from ? below : bin;
       bin = bin < last ? bin : last;
-      bin = bin > 0.0 ? bin : 0.0;
-      const bool counts = v >= static_cast<double>(lower) && v <= static_cast<double>(upper);
-      bin = counts ? bin : static_cast<double>(count);
+      const double most = count;
+      const double tooLow = v >= static_cast<double>(lower) ? 0.0 : most;
+      const double tooHigh = v <= static_cast<double>(upper) ? 0.0 : most;
+      bin = bin > tooLow ? bin : tooLow;
+      bin = bin > tooHigh ? bin : tooHigh;
       return static_cast<std::uint32_t>(static_cast<std::int32_t>(bin));
     }
   }

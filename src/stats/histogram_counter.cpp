@@ -18,52 +18,52 @@ template <typename T>
 
 }  // namespace
 
-VEXG_VECTOR_CLONES
+VEXG_CHOOSING_VECTOR_CLONES
 void FindBins(const HistogramBins<std::uint8_t>& bins, const std::uint8_t* values,
               std::size_t count, std::uint32_t* out) {
   FindBinsOf(bins, values, count, out);
 }
-VEXG_VECTOR_CLONES
+VEXG_CHOOSING_VECTOR_CLONES
 void FindBins(const HistogramBins<std::int8_t>& bins, const std::int8_t* values, std::size_t count,
               std::uint32_t* out) {
   FindBinsOf(bins, values, count, out);
 }
-VEXG_VECTOR_CLONES
+VEXG_CHOOSING_VECTOR_CLONES
 void FindBins(const HistogramBins<std::uint16_t>& bins, const std::uint16_t* values,
               std::size_t count, std::uint32_t* out) {
   FindBinsOf(bins, values, count, out);
 }
-VEXG_VECTOR_CLONES
+VEXG_CHOOSING_VECTOR_CLONES
 void FindBins(const HistogramBins<std::int16_t>& bins, const std::int16_t* values,
               std::size_t count, std::uint32_t* out) {
   FindBinsOf(bins, values, count, out);
 }
-VEXG_VECTOR_CLONES
+VEXG_CHOOSING_VECTOR_CLONES
 void FindBins(const HistogramBins<std::uint32_t>& bins, const std::uint32_t* values,
               std::size_t count, std::uint32_t* out) {
   FindBinsOf(bins, values, count, out);
 }
-VEXG_VECTOR_CLONES
+VEXG_CHOOSING_VECTOR_CLONES
 void FindBins(const HistogramBins<std::int32_t>& bins, const std::int32_t* values,
               std::size_t count, std::uint32_t* out) {
   FindBinsOf(bins, values, count, out);
 }
-VEXG_VECTOR_CLONES
+VEXG_CHOOSING_VECTOR_CLONES
 void FindBins(const HistogramBins<float>& bins, const float* values, std::size_t count,
               std::uint32_t* out) {
   FindBinsOf(bins, values, count, out);
 }
-VEXG_VECTOR_CLONES
+VEXG_CHOOSING_VECTOR_CLONES
 void FindBins(const HistogramBins<double>& bins, const double* values, std::size_t count,
               std::uint32_t* out) {
   FindBinsOf(bins, values, count, out);
 }
-VEXG_VECTOR_CLONES
+VEXG_CHOOSING_VECTOR_CLONES
 void FindBins(const HistogramBins<std::uint64_t>& bins, const std::uint64_t* values,
               std::size_t count, std::uint32_t* out) {
   FindBinsOf(bins, values, count, out);
 }
-VEXG_VECTOR_CLONES
+VEXG_CHOOSING_VECTOR_CLONES
 void FindBins(const HistogramBins<std::int64_t>& bins, const std::int64_t* values,
               std::size_t count, std::uint32_t* out) {
   FindBinsOf(bins, values, count, out);
