@@ -7,7 +7,6 @@
 #include "support/pyramid_scene.h"
 #include "support/run_command.h"
 #include "views/band_stack_raster.h"
-#include "views/projected_raster.h"
 #include "views/skip_raster.h"
 #include "views/spatial_subset_raster.h"
 #include "views/spectral_subset_raster.h"
