@@ -47,53 +47,49 @@ bool AllAreValid(const RasterContents& raster) {
                      [&](std::uint64_t count) { return count == pixels; });
 }
 
-struct Opened {
-  RasterContents contents;
-  FillValues freeValues;  // of each band, that none of its valid pixels has
-  std::vector<bool> hasFreeValue;
-};
+/// Counts the valid pixels of the file that was made.
+/// @param withValues  also looks for values that none of them has.
+JobResults CountValid(JobSession& session, const TargetPlace& place, bool withValues) {
+  JobDraft draft;
+  AddOpen(draft, "made", {place.file, place.format});
+  AddValidityQuery(draft, "made", "$made", withValues);
+  draft.Close("close", "$made");
+  return session.Run(draft);
+}
 
 /// Opens the file that was made and looks at it.
-Opened LookAt(JobSession& session, const TargetPlace& place, const std::string& shown,
-              const RasterContents& put) {
+RasterContents LookAt(JobSession& session, const TargetPlace& place, const std::string& shown,
+                      const RasterContents& put) {
   JobDraft draft;
   AddOpen(draft, "made", {place.file, place.format});
   AddQuery(draft, "made", "$made");
   AddDetailsQuery(draft, "made", "$made");
   draft.Close("close", "$made");
-  Opened opened;
-  opened.contents = ReadContents(session.Run(draft), "made");
-  CheckSame(opened.contents.info, put.info, place.format, shown);
+  RasterContents made = ReadContents(session.Run(draft), "made");
+  CheckSame(made.info, put.info, place.format, shown);
   // Where there is nothing by which a pixel could be not valid, none need be counted.
-  if (put.valid.empty() || (AllAreValid(put) && HasPlainPixels(opened.contents))) return opened;
-  JobDraft count;
-  AddOpen(count, "made", {place.file, place.format});
-  AddValidityQuery(count, "made", "$made");
-  count.Close("close", "$made");
-  const JobResults counted = session.Run(count);
-  opened.contents.valid = ReadValidPixels(counted, StepOf("made", "validity"));
-  const Map<String, String>& told = counted.Find(String(StepOf("made", "validity"))).returns;
-  const auto values = ParseValue<Array<double>>(told.Find("FreeValue"));
-  const auto has = ParseValue<Array<bool>>(told.Find("HasFreeValue"));
-  opened.freeValues.assign(values.begin(), values.end());
-  opened.hasFreeValue.assign(has.begin(), has.end());
-  return opened;
+  if (put.valid.empty() || (AllAreValid(put) && HasPlainPixels(made))) return made;
+  made.valid = ReadValidPixels(CountValid(session, place, false), StepOf("made", "validity"));
+  return made;
 }
 
 /// Values that can stand for pixels that are not valid, up to the last band that needs one; none
 /// where a band has no such value.
-FillValues ChooseFill(const RasterContents& put, const Opened& opened) {
+FillValues ChooseFill(JobSession& session, const TargetPlace& place, const RasterContents& put,
+                      const RasterContents& made) {
   const auto details = SplitDetails(put.details);
-  std::size_t count = 0;
-  for (unsigned band = 0; band < opened.contents.valid.size(); ++band) {
-    const bool isKept = put.valid[band] == opened.contents.valid[band] || IsAlpha(details, band);
-    if (!isKept) count = band + 1;
+  std::ptrdiff_t count = 0;
+  for (unsigned band = 0; band < made.valid.size(); ++band) {
+    const bool isKept = put.valid[band] == made.valid[band] || IsAlpha(details, band);
+    if (!isKept) count = std::ptrdiff_t{band} + 1;
   }
-  if (count > opened.freeValues.size() || count > opened.hasFreeValue.size()) return {};
-  const auto end = opened.hasFreeValue.begin() + static_cast<std::ptrdiff_t>(count);
-  if (std::find(opened.hasFreeValue.begin(), end, false) != end) return {};
-  return FillValues(opened.freeValues.begin(),
-                    opened.freeValues.begin() + static_cast<std::ptrdiff_t>(count));
+  const JobResults counted = CountValid(session, place, true);
+  const Map<String, String>& told = counted.Find(String(StepOf("made", "validity"))).returns;
+  const auto values = ParseValue<Array<double>>(told.Find("FreeValue"));
+  const auto has = ParseValue<Array<bool>>(told.Find("HasFreeValue"));
+  const bool areAll = count <= std::min<std::ptrdiff_t>(values.GetCount(), has.GetCount()) &&
+                      std::find(has.begin(), has.begin() + count, false) == has.begin() + count;
+  return areAll ? FillValues(values.begin(), values.begin() + count) : FillValues();
 }
 
 /// A line of what the counts of valid pixels lost; empty when they are the same. An alpha band
@@ -240,10 +236,11 @@ void AddDetailsQuery(JobDraft& draft, const std::string& name, const String& ras
   draft.Step(StepOf(name, "details"), "QueryRasterDetailsCommand").AddInput("URI", raster);
 }
 
-void AddValidityQuery(JobDraft& draft, const std::string& name, const String& raster) {
+void AddValidityQuery(JobDraft& draft, const std::string& name, const String& raster,
+                      bool withValues) {
   JobWriterCommand& command = draft.Step(StepOf(name, "validity"), "QueryRasterValidityCommand");
   command.AddInput("URI", raster);
-  command.AddInput("Values", true);
+  command.AddInput("Values", withValues);
 }
 
 RasterContents ReadContents(const JobResults& results, const std::string& name) {
@@ -266,10 +263,11 @@ MadeRaster MakeKept(JobSession& session, const TargetPlace& place, Losses& losse
                     const std::function<RasterContents(const FillValues& noData)>& make) {
   MadeRaster raster;
   raster.put = make({});
-  Opened opened = LookAt(session, place, losses.GetShownName(), raster.put);
-  const bool isKept = CompareCounts(raster.put, opened.contents).empty();
+  raster.made = LookAt(session, place, losses.GetShownName(), raster.put);
+  const bool isKept = CompareCounts(raster.put, raster.made).empty();
   mayFill = mayFill && place.format != "JPEG";  // where no value stays as it is
-  const FillValues fill = isKept || !mayFill ? FillValues() : ChooseFill(raster.put, opened);
+  const FillValues fill =
+      isKept || !mayFill ? FillValues() : ChooseFill(session, place, raster.put, raster.made);
   if (!fill.empty()) {
     raster.put = make(fill);
     raster.isFilled = true;
@@ -281,11 +279,10 @@ MadeRaster MakeKept(JobSession& session, const TargetPlace& place, Losses& losse
         "are not have the no-data value {}",
         losses.GetShownName(), place.format,
         isOne ? fmt::format("{}", fill[0]) : fmt::format("{}", fmt::join(fill, ","))));
-    opened = LookAt(session, place, losses.GetShownName(), raster.put);
+    raster.made = LookAt(session, place, losses.GetShownName(), raster.put);
   }
-  const std::string lost = CompareCounts(raster.put, opened.contents);
+  const std::string lost = CompareCounts(raster.put, raster.made);
   if (!lost.empty()) losses.Add(lost);
-  raster.made = std::move(opened.contents);
   return raster;
 }
 

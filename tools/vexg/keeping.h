@@ -46,7 +46,9 @@ using FillValues = std::vector<double>;
 /// @param raster  a variable or URI.
 void AddDetailsQuery(JobDraft& draft, const std::string& name, const String& raster);
 /// Adds the command that counts the valid pixels of a raster.
-void AddValidityQuery(JobDraft& draft, const std::string& name, const String& raster);
+/// @param withValues  also looks for values that none of them has.
+void AddValidityQuery(JobDraft& draft, const std::string& name, const String& raster,
+                      bool withValues = false);
 
 /// What AddQuery and AddDetailsQuery said of a raster.
 RasterContents ReadContents(const JobResults& results, const std::string& name);

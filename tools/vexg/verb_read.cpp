@@ -171,6 +171,14 @@ class MaskOutput {
   std::optional<NpySink> sink_;
 };
 
+/// True when a mask or a region excludes some of the pixels that were read. What a no-data value
+/// says, the values say themselves.
+bool AnyExcluded(const unsigned char* states, std::uint64_t count) {
+  unsigned char any = 0;
+  for (std::uint64_t i = 0; i < count; ++i) any |= states[i];
+  return (any & (PixelValueState::Masked | PixelValueState::OutsideROI)) != 0;
+}
+
 int Read(const Options& options) {
   const bool isPng = EndsWith(options.output, ".png");
   if (!isPng && !EndsWith(options.output, ".npy")) {
@@ -196,14 +204,22 @@ int Read(const Options& options) {
   const String source =
       options.level == 0 ? raster : opened.Find("level").returns.Find("PyramidURI");
   BlockReader reader(session, source, request.info, options.source.file);
+  bool isExcluded = false;
   reader.ReadAll(blocks, request.bands, request.interleave, options.job.GetProgressStyle(),
                  [&](const SubRect& block) {
                    pixels->Write(block, reader.GetPixels());
                    mask.Write(block, reader.GetStates());
+                   const std::uint64_t count =
+                       std::uint64_t{block.Width()} * block.Height() * request.bands.GetCount();
+                   isExcluded = isExcluded || AnyExcluded(reader.GetStates(), count);
                  });
   pixels->Close();
   mask.Commit();
   output.Commit();
+  if (isExcluded && options.mask.empty()) {
+    Say(options.output +
+        ": note: a mask excludes some of these pixels; --mask OUT.npy tells which");
+  }
   return kExitSuccess;
 }
 
