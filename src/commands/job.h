@@ -31,6 +31,10 @@ struct CommandDescriptor {
 
 using CommandDescriptorPtr = Pointer<CommandDescriptor>;
 
+/// How often a job looks for the nearest name in its own: each look goes over all of them, and a
+/// document may be wrong in a hundred thousand places.
+inline constexpr unsigned kMostHints = 100;
+
 /// A command of a document that names no command known here. It is no part of the job; a host may
 /// want to say so.
 struct UnknownCommand {
@@ -38,8 +42,9 @@ struct UnknownCommand {
   String id;
   unsigned position = 0;  ///< commands of the job that stand before it
 
-  /// What is wrong with it, in one line, with the nearest command that is known.
-  String GetReason() const;
+  /// What is wrong with it, in one line.
+  /// @param withHint  with the nearest command that is known.
+  String GetReason(bool withHint) const;
 };
 
 /// Commands with their inputs, outputs and order, and the channel through which a host watches.

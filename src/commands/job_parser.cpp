@@ -50,6 +50,8 @@ void JobParser::StartJob(const Attributes& attributes) {
   channel_.Reset();
   isInCommand_ = false;
   job_.Clear();
+  unknownNames_ = Set<String>();
+  hints_ = kMostHints;
   if (!attributes.HasKey(kChecks)) return;
   const String word = attributes.Find(kChecks);
   job_.checks = ParseValue<JobChecks>(word);
@@ -110,6 +112,7 @@ void JobParser::StartCommand(const Attributes& attributes) {
   current_->id = attributes.Find("ID");
   current_->command = CreateCommand(current_->id);
   if (!current_->command.IsNull() && current_->command->IsValid()) return;
+  unknownNames_.Insert(current_->name);
   job_.unknown.PushBack({current_->name, current_->id, job_.commands.GetCount()});
   current_.Reset();
 }
@@ -142,11 +145,14 @@ void JobParser::AddDependency(const String& name) {
     return;
   }
   const std::string text = name.ToUTF8();
-  for (const UnknownCommand& command : job_.unknown) {
-    if (command.name == name) return Complain("skipped, as the ID of \"" + text + "\" is unknown");
+  if (unknownNames_.Contains(name)) {
+    return Complain("skipped, as the ID of \"" + Printable(text, 80) + "\" is unknown");
   }
   std::vector<std::string> names;
-  for (const auto& entry : job_.commandIndex) names.push_back(entry.first.ToUTF8());
+  if (hints_ != 0) {
+    --hints_;
+    for (const auto& entry : job_.commandIndex) names.push_back(entry.first.ToUTF8());
+  }
   Complain("DependsOn: no command before this one is called \"" + Printable(text, 80) + "\"" +
            DidYouMean(text, names));
 }

@@ -37,6 +37,8 @@ class VEXG_EXPORT JobParser : public XMLSimpleParser {
 
   Job& job_;
   bool isInCommand_ = false;  // known or not
+  Set<String> unknownNames_;  // of commands without a known ID
+  unsigned hints_ = kMostHints;
   CommandDescriptorPtr current_;
   IPCPtr channel_;
 };

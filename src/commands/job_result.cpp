@@ -34,14 +34,14 @@ XMLElementPtr DescribeCommand(CommandDescriptor& descriptor, bool tellReason) {
 }
 
 /// A command of the document that is no command here.
-XMLElementPtr DescribeUnknown(const UnknownCommand& command) {
+XMLElementPtr DescribeUnknown(const UnknownCommand& command, bool withHint) {
   const XMLElementPtr element(new XMLElement("Command"));
   element->attributes["Name"] = command.name;
   element->attributes["Result"] = GetResultWord(CommandResult::kNone);
   element->attributes["Wall"] = FormatDuration(0.0);
   element->attributes["CPU"] = FormatDuration(0.0);
   element->attributes["Usage"] = "0";
-  element->attributes["Reason"] = command.GetReason();
+  element->attributes["Reason"] = command.GetReason(withHint);
   return element;
 }
 
@@ -87,11 +87,13 @@ String JobResultWriter::Write() {
   XMLDocumentRoot root;
   root.name = "JobResult";
   if (job_.tellsReasons) AddFaults(job_, root);
+  unsigned hints = kMostHints;
   auto unknown = job_.unknown.begin();
   const auto addUnknown = [&](unsigned position) {
     for (; job_.tellsReasons && unknown != job_.unknown.end(); ++unknown) {
       if (unknown->position > position) return;
-      root.children.PushBack(DescribeUnknown(*unknown));
+      root.children.PushBack(DescribeUnknown(*unknown, hints != 0));
+      if (hints != 0) --hints;
     }
   };
   for (unsigned i = 0; i < job_.commands.GetCount(); ++i) {

@@ -139,7 +139,7 @@ String ExplainOutput(const CommandDescriptor& writer, const String& variable) {
 JobVariables::JobVariables(Job& job) : schedule_(job) {
   for (const CommandDescriptorPtr& descriptor : job.commands) {
     for (const auto& [output, variable] : descriptor->outputs) {
-      writers_.emplace(variable, descriptor.Get());
+      writers_[variable].push_back(descriptor.Get());
     }
   }
 }
@@ -149,18 +149,24 @@ ObjectPtr JobVariables::FindOrMake(const String& variable) {
 }
 
 /// Why `variable` holds nothing, as far as the job can tell.
-String JobVariables::ExplainEmpty(const CommandDescriptor& reader, const String& variable) const {
+String JobVariables::ExplainEmpty(const CommandDescriptor& reader, const String& variable) {
   const std::string name = Printable(variable.ToUTF8(), 80);
-  const auto [first, last] = writers_.equal_range(variable);
-  if (first == last) {
+  const auto found = writers_.find(variable);
+  if (found == writers_.end()) {
     std::vector<std::string> known;
-    for (const auto& entry : writers_) known.push_back(entry.first.ToUTF8());
+    if (hints_ != 0) {
+      --hints_;
+      for (const auto& entry : writers_) known.push_back(entry.first.ToUTF8());
+    }
     return String("nothing has written " + name + DidYouMean(variable.ToUTF8(), known));
   }
-  const CommandDescriptor* writer = first->second;
-  for (auto at = first; at != last; ++at) {
-    if (at->second->position < reader.position) writer = at->second;
-  }
+  // The last that stands before the reader, else the first of all.
+  const std::vector<const CommandDescriptor*>& writers = found->second;
+  const auto behind = std::partition_point(
+      writers.begin(), writers.end(),
+      [&](const CommandDescriptor* writer) { return writer->position < reader.position; });
+  const CommandDescriptor* const writer =
+      behind != writers.begin() ? *std::prev(behind) : writers.front();
   if (writer == &reader) return String("nothing has written " + name + " before");
   const Command& command = *writer->command;
   if (command.GetState() != CommandState::kRetired) {

@@ -50,14 +50,15 @@ class JobVariables {
   ObjectPtr FindOrMake(const String& variable);
   ObjectPtr Expand(const CommandDescriptor& descriptor, const String& input, const String& text,
                    String& why);
-  String ExplainEmpty(const CommandDescriptor& reader, const String& variable) const;
+  String ExplainEmpty(const CommandDescriptor& reader, const String& variable);
   void RetireLocked(CommandDescriptor& descriptor);
 
   std::mutex mutex_;
   std::condition_variable changed_;
   Map<String, ObjectPtr> variables_;
-  std::multimap<String, const CommandDescriptor*> writers_;  // of a variable, in document order
+  std::map<String, std::vector<const CommandDescriptor*>> writers_;  // of a variable, in order
   JobSchedule schedule_;
+  unsigned hints_ = kMostHints;
 };
 
 /// The first stage of a run: hands out the commands as what they depend on retires.

@@ -169,8 +169,15 @@ bool Fits(const InputDeclaration& input, std::string_view text) {
   return true;
 }
 
+constexpr std::size_t kShown = 80;  // bytes of a text
+
+std::string Joined(const std::vector<std::string>& names) {
+  std::string list;
+  for (const std::string& name : names) list.append(list.empty() ? "" : ", ").append(name);
+  return list;
+}
+
 std::string Quoted(std::string_view text) {
-  constexpr std::size_t kShown = 80;
   return std::string("\"").append(Printable(text, kShown)).append("\"");
 }
 
@@ -180,9 +187,7 @@ std::string MisfitOfWord(const InputDeclaration& input, std::string_view text) {
   for (const char* const word : input.words()) words.emplace_back(word);
   const std::string word(Trimmed(text));
   if (std::find(words.begin(), words.end(), word) != words.end()) return {};
-  std::string list;
-  for (const std::string& known : words) list += (list.empty() ? "" : ", ") + known;
-  return std::string("input ") + input.name + ": " + Quoted(word) + " is none of " + list +
+  return std::string("input ") + input.name + ": " + Quoted(word) + " is none of " + Joined(words) +
          DidYouMean(word, words);
 }
 
@@ -200,7 +205,9 @@ std::string UnknownName(const char* what, const String& name, const std::vector<
   for (const Declared& entry : known) names.emplace_back(entry.name);
   const std::string text = name.ToUTF8();
   if (std::find(names.begin(), names.end(), text) != names.end()) return {};
-  return std::string("there is no ") + what + " " + Printable(text) + DidYouMean(text, names);
+  std::string help = DidYouMean(text, names);
+  if (help.empty() && !names.empty()) help = "; there are " + Joined(names);
+  return std::string("there is no ") + what + " " + Printable(text, kShown) + help;
 }
 
 }  // namespace

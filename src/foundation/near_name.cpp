@@ -73,6 +73,8 @@ std::string NearestName(std::string_view name, const std::vector<std::string>& k
   if (wanted.size() == 1) best = 1;  // any other letter would be near
   std::string nearest;
   for (const std::string& candidate : known) {
+    const auto lengths = std::minmax({wanted.size(), candidate.size()});
+    if (lengths.second - lengths.first >= best) continue;  // so many letters to add at least
     const std::size_t distance = Distance(wanted, Lower(candidate));
     if (distance >= best || distance >= std::max(wanted.size(), candidate.size())) continue;
     best = distance;
