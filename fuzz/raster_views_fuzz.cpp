@@ -11,6 +11,7 @@
 #include <memory>
 #include <vector>
 
+#include "foundation/thread_roll.h"
 #include "georef/std_georef.h"
 #include "mosaic/overlap_raster.h"
 #include "mosaic/pvs_raster.h"
@@ -463,5 +464,6 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
     Run<T>(choices).Go();
     return true;
   });
+  lumo::JoinThreads(10.0);  // of the sources: half an end of one looks like a leak
   return 0;
 }

@@ -261,7 +261,8 @@ bool BandStackRaster<T>::GetSubRect(const SubRect& rect, const Array<unsigned>& 
   for (unsigned member = 0; member < members_.size(); ++member) {
     const Share share = ShareOf(member, block.bands);
     if (share.bands.GetCount() == 0) continue;
-    if (!members_[member]->GetSubRect(rect, share.bands, Interleave::BSQ, part, partState)) {
+    if (!members_[member]->GetSubRect(rect, share.bands, Interleave::BSQ, part, partState) ||
+        part.GetCount() < plane * share.bands.GetCount()) {  // the member has cut the block
       return false;
     }
     for (unsigned i = 0; i < share.places.GetCount(); ++i) {

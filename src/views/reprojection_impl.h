@@ -4,10 +4,9 @@
 #include <memory>
 #include <vector>
 
-#include "data/raster_reader.h"
+#include "data/block_shape.h"
 #include "foundation/fault.h"
 #include "georef/coordsys_log.h"
-#include "raster/interleave.h"
 #include "raster/pixel_value.h"
 #include "raster/raster_def.h"
 #include "stats/plane_kernels.h"
@@ -178,9 +177,9 @@ typename Reprojection<T>::Outcome Reprojection<T>::Run(Raster<T>& parent, const 
   constexpr unsigned kMost = std::numeric_limits<std::int32_t>::max();
   RasterDef source = parent.GetRasterDef();
   if (!grid || !source.geoRef || rect.right > kMost || rect.bottom > kMost) return Outcome::kFailed;
-  const Array<unsigned> wanted = BandsOfBlock(bands, interleave);
-  const ArrayDims dims = BlockDims(interleave, rect.Width(), rect.Height(), wanted.GetCount());
-  if (!data.Resize(dims) || !state.Resize(dims)) return Outcome::kFailed;
+  const BlockShape block(rect, bands, interleave);
+  if (!block.Size(data, state)) return Outcome::kFailed;
+  const Array<unsigned>& wanted = block.bands;
   std::fill(state.begin(), state.end(), static_cast<unsigned char>(PixelValueState::Valid));
 
   std::vector<T> background(wanted.GetCount());
