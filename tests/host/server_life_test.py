@@ -136,9 +136,11 @@ class Memory(Server):
         client = vexg_client.Client("test")
         uri = self.open_raster(client)["return"]["URI"]
         failed = 0
-        for attempt in range(30):
+        for attempt in range(600):
+            if failed and attempt >= 30:
+                break
             pixels, states = self.block("p", 3600), self.block("s", 3600)
-            cutter = threading.Thread(target=lambda: (time.sleep(attempt * 1e-4), pixels.cut(), states.cut()))
+            cutter = threading.Thread(target=lambda: (time.sleep(attempt % 30 * 1e-4), pixels.cut(), states.cut()))
             cutter.start()
             failed += self.get(client, uri, pixels, states)["Result"] == "Failed"
             cutter.join()

@@ -317,7 +317,7 @@ class Waiting(FolderTest):
         out = self.fine("run", "-q", "--json", self.job('Wait="Always"'))
         returned = {command["name"]: command["return"] for command in json.loads(out)["commands"]}
         self.assertIn("Cov", returned["GetExtendedRasterStatsCommand"])
-        self.assertEqual(returned["GetBasicRasterStatsCommand"]["Count"], "1:2 [4000000 4000000]")
+        self.assertEqual(returned["GetBasicRasterStatsCommand"]["Count"], [4000000, 4000000])
         self.fails_in_part("run", "-q", self.job('Wait="Alwayz"'), words="did you mean Always?")
 
     def fails_in_part(self, *arguments, words):
