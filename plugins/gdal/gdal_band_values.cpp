@@ -6,6 +6,7 @@
 #include <cpl_conv.h>
 #include <cpl_string.h>
 #include <cstdio>
+#include <gdal_pam.h>
 #include <memory>
 #include <string>
 #include <vector>
@@ -37,6 +38,18 @@ String NameOf(std::uint8_t r, std::uint8_t g, std::uint8_t b, std::uint8_t a) {
   std::snprintf(text, sizeof text, "#%02x%02x%02x", r, g, b);
   return text;
 }
+
+/// Reaches what GDAL keeps of a band beside its file, and has no operation to remove.
+class BesideBand : public GDALPamRasterBand {
+ public:
+  static void RemoveHistograms(GDALPamRasterBand& band) {
+    GDALRasterBandPamInfo* const kept = band.*(&BesideBand::psPam);
+    if (kept == nullptr || kept->psSavedHistograms == nullptr) return;
+    CPLDestroyXMLNode(kept->psSavedHistograms);
+    kept->psSavedHistograms = nullptr;
+    (band.*(&BesideBand::MarkPamDirty))();
+  }
+};
 
 struct ColorTableDeleter {
   void operator()(void* table) const { GDALDestroyColorTable(table); }
@@ -76,6 +89,14 @@ void DeleteStoredStats(GDALRasterBandH band) {
   }
 }
 
+void DeleteStoredPairs(GDALRasterBandH band) {
+  std::string record = Item(band, kRecord);
+  constexpr std::string_view kNone = "0: [] 0: []";
+  record.erase(record.find_last_not_of(' ') + 1);
+  if (record.empty() || record.ends_with(kNone)) return;
+  GDALSetMetadataItem(band, kRecord, nullptr, nullptr);
+}
+
 std::optional<StoredHistogram> ReadStoredHistogram(GDALRasterBandH band) {
   StoredHistogram histogram;
   int bins = 0;
@@ -96,6 +117,11 @@ bool WriteStoredHistogram(GDALRasterBandH band, const StoredHistogram& histogram
   std::vector<GUIntBig> counts(histogram.counts.begin(), histogram.counts.end());
   return GDALSetDefaultHistogramEx(band, histogram.lowEdge, histogram.highEdge,
                                    static_cast<int>(counts.size()), counts.data()) == CE_None;
+}
+
+void DeleteStoredHistograms(GDALRasterBandH band) {
+  auto* const withSideFile = dynamic_cast<GDALPamRasterBand*>(GDALRasterBand::FromHandle(band));
+  if (withSideFile != nullptr) BesideBand::RemoveHistograms(*withSideFile);
 }
 
 bool HasPalette(GDALRasterBandH band) {

@@ -25,6 +25,8 @@ struct StoredStats {
 std::optional<StoredStats> ReadStoredStats(GDALRasterBandH band);
 bool WriteStoredStats(GDALRasterBandH band, const StoredStats& stats);
 void DeleteStoredStats(GDALRasterBandH band);
+/// Deletes our record where it has statistics with other bands; what GDAL knows of stays.
+void DeleteStoredPairs(GDALRasterBandH band);
 
 /// A band's histogram as GDAL keeps it: bins of one width between two edges.
 struct StoredHistogram {
@@ -36,6 +38,8 @@ struct StoredHistogram {
 /// The one that the source holds; none is computed.
 std::optional<StoredHistogram> ReadStoredHistogram(GDALRasterBandH band);
 bool WriteStoredHistogram(GDALRasterBandH band, const StoredHistogram& histogram);
+/// Those that GDAL keeps beside the file, as it does for most formats.
+void DeleteStoredHistograms(GDALRasterBandH band);
 
 /// The colour table of a band, empty when it has none. A colour is called by its name in the table
 /// of named colours, else "#rrggbb".

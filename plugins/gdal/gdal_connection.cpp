@@ -16,8 +16,9 @@ bool Connection::Connect(const Array<String>& connStrings, const GeoRefPtr& geoR
   raster_ = OpenRaster::Open(format_, source);
   if (raster_ == nullptr) return false;
   lumo::RasterDef def = raster_->Describe();
+  const bool hasGrid = def.geoRef && def.geoRef->GetType() != GeoRef::kRpc;
   if (geoRef) def.SetGeoRef(geoRef);
-  def.metadata = metadata ? *metadata : ReadMetadata(raster_->Dataset());
+  def.metadata = metadata ? *metadata : ReadMetadata(raster_->Dataset(), hasGrid);
   return MakeReader(connStrings, source, def);
 }
 
@@ -28,7 +29,7 @@ bool Connection::CreateRaster(const Array<String>& connStrings, const lumo::Rast
   raster_ = OpenRaster::Create(format_, source, def);
   if (raster_ == nullptr) return false;
   lumo::RasterDef made = raster_->Describe();
-  made.noData = def.noData;
+  made.noData = raster_->KeptNoData();
   made.SetGeoRef(def.geoRef);
   made.metadata = def.metadata;
   return MakeReader(ConnStrings({String(format_.key), String(source.name)}), source, made);

@@ -3,11 +3,13 @@
 #include <climits>
 #include <cpl_string.h>
 #include <cpl_vsi.h>
+#include <cstring>
 #include <filesystem>
 #include <set>
 
 #include "common/messages.h"
 #include "foundation/fault.h"
+#include "gdal_details.h"
 #include "gdal_georef.h"
 #include "gdal_no_data.h"
 #include "gdal_side_file.h"
@@ -31,6 +33,7 @@ struct Maker {
   bool isCopied;        ///< written in one go
   const char* options;  ///< separated by blanks; those that keep every value
   bool roundsGrid = false;
+  bool changesValues = false;  ///< a no-data value would not stay one
 };
 constexpr Maker kMakers[] = {
     {"GTiff", false, "BIGTIFF=IF_SAFER SPARSE_OK=TRUE"},
@@ -39,7 +42,7 @@ constexpr Maker kMakers[] = {
     {"NITF", true, "", true},  // corners to the metre or the second
     {"PNG", true, ""},
     {"GIF", true, ""},
-    {"JPEG", true, "QUALITY=95"},  // the one format here that loses something
+    {"JPEG", true, "QUALITY=95", false, true},  // the one format here that loses something
     {"JP2OpenJPEG", true, "QUALITY=100 REVERSIBLE=YES YCBCR420=NO"},
 };
 
@@ -94,9 +97,9 @@ void AddLayout(const RasterDef& def, CPLStringList& options) {
 bool DiffersByBand(const RasterDef& def) {
   if (def.noData.empty()) return false;
   if (def.noData.size() != def.bands) return true;
-  const double first = def.noData.begin()->second;
+  const auto first = NoDataOf(def, def.noData.begin()->first);
   for (const auto& [band, value] : def.noData) {
-    if (!IsSameNumber(value, first)) return true;
+    if (!NoDataOf(def, band)->IsSame(*first)) return true;
   }
   return false;
 }
@@ -105,19 +108,32 @@ bool SetNoData(GDALDatasetH dataset, const RasterDef& def) {
   for (const auto& [band, value] : def.noData) {
     if (band >= def.bands) continue;
     const GDALRasterBandH target = GDALGetRasterBand(dataset, static_cast<int>(band) + 1);
-    if (!WriteNoData(target, value)) return false;
+    if (!WriteNoData(target, *NoDataOf(def, band))) return false;
   }
   return true;
 }
 
-/// The value of pixels that nobody writes, in a dataset with one no-data value or none.
-std::vector<unsigned char> FillValueOf(GDALDatasetH dataset) {
-  GDALRasterBandH const band = GDALGetRasterBand(dataset, 1);
-  const GDALDataType type = GDALGetRasterDataType(band);
-  std::vector<unsigned char> bytes(static_cast<std::size_t>(GDALGetDataTypeSizeBytes(type)));
-  const double value = ReadNoData(band).value_or(0.0);
-  GDALCopyWords(&value, GDT_Float64, 0, bytes.data(), type, 0, 1);
+/// The value of pixels that nobody writes, of a raster with one no-data value or none: that value
+/// where pixels can hold it, else 0.
+std::vector<unsigned char> FillValueOf(const RasterDef& def) {
+  std::vector<unsigned char> bytes(DataTypeBytes(def.dataType));
+  const auto value = DiffersByBand(def) ? std::nullopt : NoDataOf(def, 0);
+  DispatchType(TwelveTypes{}, def.dataType, [&]<typename T>() {
+    const std::optional<T> pixel = value ? value->As<T>() : std::nullopt;
+    if (pixel) std::memcpy(bytes.data(), &*pixel, sizeof(T));
+    return true;
+  });
   return bytes;
+}
+
+/// What a TIFF file is told of the meaning of its bands. Without it GDAL takes the fourth of four
+/// bands of bytes for alpha.
+void AddMeaning(const RasterDef& def, CPLStringList& options) {
+  if (IsInColors(def)) options.SetNameValue("PHOTOMETRIC", "RGB");
+  if (def.bands < 2) return;
+  options.SetNameValue("ALPHA", IsAlpha(def, def.bands - 1) ? "NON-PREMULTIPLIED" : "NO");
+  const bool isPlain = !IsInColors(def) && def.bands != 3;
+  if (isPlain) options.SetNameValue("PHOTOMETRIC", "MINISBLACK");
 }
 
 bool HoldsSignedBytes(GDALDriverH driver) {
@@ -125,10 +141,22 @@ bool HoldsSignedBytes(GDALDriverH driver) {
   return list != nullptr && std::string(list).find("SIGNEDBYTE") != std::string::npos;
 }
 
+/// What a format keeps of a definition in any case.
+RasterDef AsKept(const std::string& driver, const RasterDef& def) {
+  RasterDef kept = def;
+  const Maker* const maker = FindMaker(driver);
+  if (maker != nullptr && maker->changesValues) kept.noData.clear();
+  return kept;
+}
+
 }  // namespace
 
 NewRaster::NewRaster(std::string driver, const std::string& path, const RasterDef& def)
-    : driver_(std::move(driver)), path_(path), def_(def), temporary_(TemporaryPath(path)) {}
+    : driver_(std::move(driver)),
+      path_(path),
+      def_(AsKept(driver_, def)),
+      temporary_(TemporaryPath(path)),
+      mask_(platform::TemporaryPathBeside(path), def.samples, def.lines) {}
 
 NewRaster::~NewRaster() {
   for (const std::string& path : {temporary_, scratch_}) {
@@ -198,16 +226,24 @@ bool NewRaster::CheckTarget() const {
 
 /// Makes a raster of a few pixels in GDAL's memory: the driver itself says what it can't hold.
 bool NewRaster::TryTheFormat() {
-  if (!FindMaker(driver_)->isCopied) return true;
+  const bool hasAlpha = GivesMask(def_) && IsAlpha(def_, def_.bands - 1);
+  if (!FindMaker(driver_)->isCopied) {
+    keepsAlpha_ = hasAlpha && driver_ == "GTiff";
+    return true;
+  }
   std::string fault;
-  isBare_ = bool(def_.geoRef) && FindMaker(driver_)->roundsGrid;
-  if (TrySample(fault)) return true;
-  const bool canBeBare = bool(def_.geoRef) && !isBare_;
-  isBare_ = true;
-  return (canBeBare && TrySample(fault)) || Fail(fault);
+  const bool isRounded = FindMaker(driver_)->roundsGrid && (def_.geoRef || HasPlaceDetails(def_));
+  for (const Given given : {Given::kAll, Given::kBands, Given::kNothing}) {
+    if (given == Given::kAll && isRounded) continue;
+    given_ = given;
+    if (!TrySample(fault)) continue;
+    keepsAlpha_ = keepsAlpha_ && hasAlpha;
+    return true;
+  }
+  return Fail(fault);
 }
 
-bool NewRaster::TrySample(std::string& fault) const {
+bool NewRaster::TrySample(std::string& fault) {
   const Messages messages;
   fault = "the format can't hold such pixels";
   constexpr int kSide = 32;
@@ -220,6 +256,8 @@ bool NewRaster::TrySample(std::string& fault) const {
   const bool fits = copy != nullptr && !messages.HasError() &&
                     GDALGetRasterCount(copy.get()) == static_cast<int>(def_.bands) &&
                     GDALGetRasterDataType(GDALGetRasterBand(copy.get(), 1)) == type;
+  keepsAlpha_ = fits && GDALGetRasterColorInterpretation(GDALGetRasterBand(
+                            copy.get(), static_cast<int>(def_.bands))) == GCI_AlphaBand;
   copy.reset();
   VSIUnlink(name.c_str());
   for (const char* const suffix : kSideFiles) VSIUnlink((name + suffix).c_str());
@@ -232,7 +270,10 @@ DatasetPtr NewRaster::MakeDirectly() {
   const PixelType type = PixelTypeOf(def_.dataType);
   CPLStringList options = OptionsOf(*FindMaker(driver_));
   if (type.isSignedByte) options.SetNameValue("PIXELTYPE", "SIGNEDBYTE");
-  if (driver_ == "GTiff") AddLayout(def_, options);
+  if (driver_ == "GTiff") {
+    AddLayout(def_, options);
+    AddMeaning(def_, options);
+  }
   DatasetPtr dataset(GDALCreate(GDALGetDriverByName(driver_.c_str()), temporary_.c_str(),
                                 static_cast<int>(def_.samples), static_cast<int>(def_.lines),
                                 static_cast<int>(def_.bands), type.type, options.List()));
@@ -246,7 +287,7 @@ DatasetPtr NewRaster::MakeDirectly() {
 /// Has the blocks of a TIFF file placed, which for that is closed and opened again.
 DatasetPtr NewRaster::BeginPixels(DatasetPtr dataset) {
   const Messages messages;
-  const std::vector<unsigned char> fill = FillValueOf(dataset.get());
+  const std::vector<unsigned char> fill = FillValueOf(def_);
   const bool byPixel = EQUAL(
       CSLFetchNameValueDef(GDALGetMetadata(dataset.get(), "IMAGE_STRUCTURE"), "INTERLEAVE", "BAND"),
       "PIXEL");
@@ -280,11 +321,14 @@ DatasetPtr NewRaster::MakeForCopy() {
 
 /// Gives a new dataset all but its pixels, as far as the format has room for it.
 bool NewRaster::Describe(GDALDatasetH dataset) const {
-  if (isBare_) return true;
+  if (given_ == Given::kNothing) return true;
+  WriteBandDetails(dataset, def_);
+  if (given_ == Given::kBands) return true;
   if (def_.geoRef && !WriteGeoRef(dataset, *def_.geoRef)) return false;
   const bool isTiff = GDALGetDatasetDriver(dataset) == GDALGetDriverByName("GTiff");
   // A TIFF file has room for one value.
-  return (isTiff && DiffersByBand(def_)) || SetNoData(dataset, def_);
+  return WritePlaceDetails(dataset, def_) &&
+         ((isTiff && DiffersByBand(def_)) || SetNoData(dataset, def_));
 }
 
 bool NewRaster::Finish(DatasetPtr dataset) {
@@ -304,7 +348,7 @@ bool NewRaster::Finish(DatasetPtr dataset) {
     }
     pixels_.reset();
   }
-  return WriteBeside() && IsWhole() && TakePlace();
+  return WriteBeside() && WriteMask() && IsWhole() && TakePlace();
 }
 
 DatasetPtr NewRaster::CopyTo(const std::string& name, GDALDatasetH dataset) const {
@@ -328,7 +372,13 @@ bool NewRaster::CopyToFormat(DatasetPtr dataset) {
 bool NewRaster::WriteBeside() const {
   const Messages messages;
   const bool isSet = CompleteBeside(temporary_, driver_, def_, histograms_);
-  return (isSet && !messages.HasError() && !messages.HasWarning()) || Fail(messages.Text());
+  return (isSet && !messages.HasError()) || Fail(messages.Text());
+}
+
+bool NewRaster::WriteMask() {
+  if (mask_.WriteTo(temporary_, driver_)) return true;
+  SetFault(Shown(TakeFault().ToUTF8()));
+  return false;
 }
 
 /// Opens the file once more and reads its last pixel: not every driver reports a disk that is full.
@@ -364,6 +414,7 @@ bool NewRaster::TakePlace() const {
     if (file == nullptr || !file->Flush(&why)) return Fail(why);
   }
   if (driver_ == "HFA") {  // the names of further files stand inside
+    for (const char* const suffix : kSideFiles) Remove(path_ + suffix);
     const Messages messages;
     GDALDriverH const driver = GDALGetDriverByName(driver_.c_str());
     if (GDALRenameDataset(driver, path_.c_str(), temporary_.c_str()) != CE_None) {
@@ -376,7 +427,7 @@ bool NewRaster::TakePlace() const {
   // What the older file had beside it tells of other pixels.
   for (const char* const suffix : kSideFiles) {
     if (!Exists(temporary_ + suffix)) {
-      if (driver_ != "HFA") Remove(path_ + suffix);
+      if (driver_ != "HFA") Remove(path_ + suffix);  // GDAL has moved what was beside it
     } else if (!platform::RenameFile(temporary_ + suffix, path_ + suffix, &why)) {
       SetFault(Shown(why));
       return false;

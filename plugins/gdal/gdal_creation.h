@@ -7,6 +7,7 @@
 
 #include "common/source.h"
 #include "gdal_band_values.h"
+#include "gdal_new_mask.h"
 #include "raster/raster_def.h"
 #include "tiff_pixels.h"
 
@@ -37,6 +38,15 @@ class NewRaster {
   /// Where the pixels go; null when they go into the dataset.
   TiffPixels* Pixels() const { return pixels_.get(); }
 
+  /// The definition as far as the format keeps it.
+  const RasterDef& Definition() const { return def_; }
+
+  /// True when the last band will tell which pixels of the others are valid.
+  bool KeepsAlpha() const { return keepsAlpha_; }
+
+  /// Takes the pixels that are not valid and don't say so themselves.
+  NewMask& Mask() { return mask_; }
+
   /// From now on the raster can't be finished: something of it is lost.
   void Doom() { isDoomed_ = true; }
 
@@ -47,7 +57,7 @@ class NewRaster {
   NewRaster(std::string driver, const std::string& path, const RasterDef& def);
   bool CheckTarget() const;
   bool TryTheFormat();
-  bool TrySample(std::string& fault) const;
+  bool TrySample(std::string& fault);
   DatasetPtr MakeDirectly();
   DatasetPtr BeginPixels(DatasetPtr dataset);
   DatasetPtr MakeForCopy();
@@ -55,6 +65,7 @@ class NewRaster {
   bool CopyToFormat(DatasetPtr dataset);
   DatasetPtr CopyTo(const std::string& name, GDALDatasetH dataset) const;
   bool WriteBeside() const;
+  bool WriteMask();
   bool IsWhole() const;
   bool TakePlace() const;
   std::string Shown(const std::string& text) const;
@@ -65,9 +76,12 @@ class NewRaster {
   const RasterDef def_;
   const std::string temporary_;  // of the format, beside the place
   std::unique_ptr<TiffPixels> pixels_;
+  NewMask mask_;
   std::string scratch_;  // the TIFF file that the copy is made from
   std::vector<std::optional<StoredHistogram>> histograms_;  // which a copy leaves behind
-  bool isBare_ = false;  // the geo-reference goes beside the file
+  /// What the format is given to keep; the rest goes beside the file.
+  enum class Given { kNothing, kBands, kAll } given_ = Given::kAll;
+  bool keepsAlpha_ = false;
   bool isDoomed_ = false;
 };
 

@@ -10,6 +10,7 @@
 #include <vector>
 
 #include "commands/value_text.h"
+#include "gdal_details.h"
 #include "gdal_raster.h"
 #include "raster/pixel_types.h"
 
@@ -146,10 +147,11 @@ void CollectBands(GDALDatasetH dataset, MetadataContainer& texts) {
 
 }  // namespace
 
-Metadata ReadMetadata(GDALDatasetH dataset) {
+Metadata ReadMetadata(GDALDatasetH dataset, bool hasGrid) {
   Metadata metadata;
   VisitDomains(dataset, false,
                [&](const String& path, const char* value) { metadata.Set(path, value); });
+  ReadDetails(dataset, hasGrid, metadata);
   return metadata;
 }
 

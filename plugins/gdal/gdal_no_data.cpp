@@ -2,61 +2,65 @@
 
 #include <cstdint>
 #include <gdal_pam.h>
-
-#include "gdal_pixel_value.h"
+#include <string>
 
 namespace lumo::gdal {
-std::optional<double> ReadNoData(GDALRasterBandH band) {
+namespace {
+
+template <typename T>
+NoDataNumber Exact(T whole) {
+  return {static_cast<double>(whole), std::to_string(whole)};
+}
+
+}  // namespace
+
+std::optional<NoDataNumber> ReadNoData(GDALRasterBandH band) {
   int has = FALSE;
-  double value = 0;
+  NoDataNumber value;
   switch (GDALGetRasterDataType(band)) {
     case GDT_Int64:
-      value = static_cast<double>(GDALGetRasterNoDataValueAsInt64(band, &has));
+      value = Exact(GDALGetRasterNoDataValueAsInt64(band, &has));
       break;
     case GDT_UInt64:
-      value = static_cast<double>(GDALGetRasterNoDataValueAsUInt64(band, &has));
+      value = Exact(GDALGetRasterNoDataValueAsUInt64(band, &has));
       break;
     default:
-      value = GDALGetRasterNoDataValue(band, &has);
+      value.number = GDALGetRasterNoDataValue(band, &has);
   }
   return has != FALSE ? std::optional(value) : std::nullopt;
 }
 
-bool WriteNoData(GDALRasterBandH band, double value) {
+bool WriteNoData(GDALRasterBandH band, const NoDataNumber& value) {
   switch (GDALGetRasterDataType(band)) {
     case GDT_Int64: {
-      const auto whole = ToPixel<std::int64_t>(value);
+      const auto whole = value.As<std::int64_t>();
       return !whole || GDALSetRasterNoDataValueAsInt64(band, *whole) == CE_None;
     }
     case GDT_UInt64: {
-      const auto whole = ToPixel<std::uint64_t>(value);
+      const auto whole = value.As<std::uint64_t>();
       return !whole || GDALSetRasterNoDataValueAsUInt64(band, *whole) == CE_None;
     }
     default:
-      return GDALSetRasterNoDataValue(band, value) == CE_None;
+      return GDALSetRasterNoDataValue(band, value.number) == CE_None;
   }
 }
 
-bool WriteNoDataBeside(GDALRasterBandH band, double value) {
+bool WriteNoDataBeside(GDALRasterBandH band, const NoDataNumber& value) {
   // The base class keeps such values there; a driver's own operation may write into the file.
   auto* const target = dynamic_cast<GDALPamRasterBand*>(GDALRasterBand::FromHandle(band));
   if (target == nullptr) return false;
   switch (GDALGetRasterDataType(band)) {
     case GDT_Int64: {
-      const auto whole = ToPixel<std::int64_t>(value);
+      const auto whole = value.As<std::int64_t>();
       return !whole || target->GDALPamRasterBand::SetNoDataValueAsInt64(*whole) == CE_None;
     }
     case GDT_UInt64: {
-      const auto whole = ToPixel<std::uint64_t>(value);
+      const auto whole = value.As<std::uint64_t>();
       return !whole || target->GDALPamRasterBand::SetNoDataValueAsUInt64(*whole) == CE_None;
     }
     default:
-      return target->GDALPamRasterBand::SetNoDataValue(value) == CE_None;
+      return target->GDALPamRasterBand::SetNoDataValue(value.number) == CE_None;
   }
-}
-
-bool IsSameNumber(double a, double b) {
-  return a == b || (a != a && b != b);
 }
 
 }  // namespace lumo::gdal

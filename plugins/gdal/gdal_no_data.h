@@ -3,19 +3,18 @@
 #include <gdal.h>
 #include <optional>
 
+#include "raster/no_data_number.h"
+
 namespace lumo::gdal {
 
-/// The no-data value of a band as a number; one of 64 bits is rounded.
-std::optional<double> ReadNoData(GDALRasterBandH band);
+/// What a band says.
+std::optional<NoDataNumber> ReadNoData(GDALRasterBandH band);
 
 /// Gives a band a no-data value. One that no pixel of 64 bits can hold is left out. False when GDAL
 /// refuses.
-bool WriteNoData(GDALRasterBandH band, double value);
+bool WriteNoData(GDALRasterBandH band, const NoDataNumber& value);
 
 /// The same into the file beside the raster's, whatever the raster's format would do.
-bool WriteNoDataBeside(GDALRasterBandH band, double value);
-
-/// True for one number, and for NaN and NaN.
-bool IsSameNumber(double a, double b);
+bool WriteNoDataBeside(GDALRasterBandH band, const NoDataNumber& value);
 
 }  // namespace lumo::gdal

@@ -4,6 +4,7 @@
 #include <cmath>
 #include <filesystem>
 
+#include "common/file_guard.h"
 #include "common/messages.h"
 #include "foundation/fault.h"
 #include "gdal_creation.h"
@@ -135,7 +136,8 @@ bool OpenRaster::TakeDataset(DatasetPtr dataset) {
   if (dataType_ == 0) return false;
   interleave_ = ReadInterleave(dataset_.get());
   FindLevels();
-  return true;
+  // The overviews are looked for only now, and a file may name one anywhere.
+  return WasRefusedNothing();
 }
 
 /// Takes the dataset of a raster that was open before: its reader goes by what it was then.
@@ -258,7 +260,7 @@ bool OpenRaster::Transfer(GDALRWFlag direction, const BlockPlace& place, void* p
     TiffPixels& target = *newRaster_->Pixels();
     return direction == GF_Read ? target.Read(place, pixels) : target.Write(place, pixels);
   }
-  const Messages messages;
+  const Messages messages(Messages::Damage::kIsError);
   const GDALDataType type = PixelTypeOf(dataType_).type;
   const Strides strides(interleave_, place, GDALGetDataTypeSizeBytes(type));
   const auto at = [](unsigned number) { return static_cast<int>(number); };
@@ -286,12 +288,24 @@ bool OpenRaster::Transfer(GDALRWFlag direction, const BlockPlace& place, void* p
 }
 
 bool OpenRaster::Read(const BlockPlace& place, void* pixels) {
+  // What was read of damaged data waits in GDAL's cache as if it were whole, and codecs warn once.
+  if (isDamaged_ && !isUpdated_) {
+    isThreaded_ = false;
+    isPlain_ = true;
+    if (!TakeAgain(OpenDataset(source_, format_, GDAL_OF_RASTER))) return false;
+  }
+  isDamaged_ = false;
   if (Transfer(GF_Read, place, pixels)) return true;
-  if (!isThreaded_ || CheckPlace(place) == nullptr) return false;
-  // What a thread of GDAL has to say reaches nobody. Without them it says it here.
+  isDamaged_ = CheckPlace(place) != nullptr;
+  const bool isShortCut = !isPlain_ && !isUpdated_ && format_.drivers.front() == "GTiff";
+  if (!isShortCut || !isDamaged_) return false;
+  // What a thread of GDAL has to say reaches nobody, and a read past its cache says nothing. A
+  // plain one says it here.
   isThreaded_ = false;
-  return TakeAgain(OpenDataset(source_, format_, GDAL_OF_RASTER)) &&
-         Transfer(GF_Read, place, pixels);
+  isPlain_ = true;
+  isDamaged_ = !TakeAgain(OpenDataset(source_, format_, GDAL_OF_RASTER)) ||
+               !Transfer(GF_Read, place, pixels);
+  return !isDamaged_;
 }
 
 bool OpenRaster::Write(const BlockPlace& place, const void* pixels) {
@@ -304,14 +318,39 @@ bool OpenRaster::Write(const BlockPlace& place, const void* pixels) {
   return false;
 }
 
+std::map<unsigned, double> OpenRaster::KeptNoData() const {
+  return newRaster_ != nullptr ? newRaster_->Definition().noData : std::map<unsigned, double>();
+}
+
+bool OpenRaster::KeepsAlpha() const {
+  return newRaster_ != nullptr && newRaster_->KeepsAlpha();
+}
+
+bool OpenRaster::ExcludeFromNew(const BlockPlace& place,
+                                const std::vector<unsigned char>& excluded) {
+  if (newRaster_ == nullptr) return true;
+  const bool isWhole = place.bands.GetCount() >= Bands();
+  if (newRaster_->Mask().Take(place, excluded, isWhole)) return true;
+  newRaster_->Doom();
+  return false;
+}
+
+/// Deletes what is stored of the pixels before a write to bands; of other bands what they have with
+/// these.
 void OpenRaster::ForgetStatistics(const Array<unsigned>& bands) {
-  for (const unsigned band : bands) DeleteStoredStats(Band(band));
+  for (const unsigned band : bands) {
+    DeleteStoredStats(Band(band));
+    DeleteStoredHistograms(Band(band));
+  }
+  if (!mayHavePairs_) return;
+  for (unsigned band = 0; band < Bands(); ++band) DeleteStoredPairs(Band(band));
+  mayHavePairs_ = false;
 }
 
 bool OpenRaster::ReadMasks(const BlockPlace& place, unsigned char* state) const {
   const RasterLevel* const level = CheckPlace(place);
   if (level == nullptr) return false;
-  const Messages messages;
+  const Messages messages(Messages::Damage::kIsError);
   const Masks masks(*level, place.bands);
   if (!masks.IsNeeded()) return true;
   const Strides strides(interleave_, place, 1);
@@ -326,7 +365,7 @@ bool OpenRaster::BuildOverviews(const char* method, unsigned levelMin, unsigned 
     factors.push_back(1 << level);
   }
   if (factors.empty()) return FailWith(Name(), "no levels asked for");
-  const Messages messages;
+  const Messages messages(Messages::Damage::kIsError);
   const bool hadLevels = levels_.size() > 1;
   const CPLErr result = GDALBuildOverviews(dataset_.get(), method, static_cast<int>(factors.size()),
                                            factors.data(), 0, nullptr, nullptr, nullptr);
@@ -346,6 +385,7 @@ bool OpenRaster::FindLevelsAnew() {
   DatasetPtr dataset = OpenToRead(format_, source_, isThreaded);
   if (dataset == nullptr) return false;  // what is open stays
   isThreaded_ = isThreaded;
+  isPlain_ = false;
   return TakeAgain(std::move(dataset));
 }
 

@@ -52,6 +52,10 @@ class OpenRaster {
     return levels_.empty() ? 0 : static_cast<unsigned>(levels_.at(0).bands.size());
   }
   bool IsNew() const { return newRaster_ != nullptr; }
+  /// The no-data values that a new raster keeps.
+  std::map<unsigned, double> KeptNoData() const;
+  /// True for a new raster whose last band will be alpha.
+  bool KeepsAlpha() const;
   lumo::Interleave Interleave() const { return interleave_; }
 
   /// The levels that can be read, by number: 0, and a range without gaps of those reductions by
@@ -71,6 +75,10 @@ class OpenRaster {
   /// Carries a block to the caller's memory, in the raster's interleave.
   bool Read(const BlockPlace& place, void* pixels);
   bool Write(const BlockPlace& place, const void* pixels);
+  /// Says that statistics are being stored, those between bands perhaps among them.
+  void NoteStatistics() { mayHavePairs_ = true; }
+  /// Lets the mask of a raster that is being made exclude pixels of a block; see NewMask::Take.
+  bool ExcludeFromNew(const BlockPlace& place, const std::vector<unsigned char>& excluded);
 
   /// Sets state bits where a mask or an alpha band of the source excludes pixels.
   bool ReadMasks(const BlockPlace& place, unsigned char* state) const;
@@ -96,8 +104,11 @@ class OpenRaster {
   unsigned dataType_ = 0;
   lumo::Interleave interleave_ = lumo::Interleave::BSQ;
   std::map<unsigned, RasterLevel> levels_;
-  bool isUpdated_ = false;   // open for writing
-  bool isThreaded_ = false;  // GDAL decodes on threads of its own
+  bool isUpdated_ = false;    // open for writing
+  bool isThreaded_ = false;   // GDAL decodes on threads of its own
+  bool isPlain_ = false;      // opened without what makes reads faster, as one has failed
+  bool isDamaged_ = false;    // the last read failed
+  bool mayHavePairs_ = true;  // stored statistics between bands
   enum class Answer { kUnknown, kNo, kYes } canWrite_ = Answer::kUnknown;
 };
 

@@ -70,10 +70,13 @@ class Reader final : public PlainRasterReader<T> {
 
   bool ChangePalette(unsigned band, const lumo::Palette* palette);
   bool FlushBandValues();
+  std::vector<unsigned char> FindUntold(const BlockPlace& place, const T* pixels,
+                                        const unsigned char* state) const;
 
   OpenRaster& raster_;
   lumo::RasterDef def_;
   std::vector<std::optional<T>> noData_;  // by band
+  unsigned alphaBand_ = 0;                // of a new raster; the number of bands for none
   std::int32_t builtMethod_ = 0;          // of the levels that this connection made
   bool areLevelsOld_ = false;             // they don't show what was written since
 };

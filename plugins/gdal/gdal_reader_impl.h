@@ -11,41 +11,16 @@
 
 #include "common/messages.h"
 #include "gdal_band_values.h"
-#include "gdal_pixel_value.h"
+#include "gdal_no_data.h"
 #include "gdal_reader.h"
+#include "raster/block_strides.h"
 #include "raster/no_data_marker.h"
+#include "raster/pixel_value.h"
+#include "raster/raster_details.h"
 
 namespace lumo::gdal {
 
 namespace detail {
-
-/// The no-data value of a band. 64-bit numbers don't pass through doubles.
-template <typename T>
-std::optional<T> ReadNoData(GDALRasterBandH band) {
-  int has = FALSE;
-  const auto whole = [&](auto value) -> std::optional<T> {
-    if constexpr (std::is_integral_v<T>) {
-      if (std::in_range<T>(value)) return static_cast<T>(value);
-      return std::nullopt;
-    } else {
-      return ToPixel<T>(static_cast<double>(value));
-    }
-  };
-  switch (GDALGetRasterDataType(band)) {
-    case GDT_Int64: {
-      const std::int64_t value = GDALGetRasterNoDataValueAsInt64(band, &has);
-      return has ? whole(value) : std::nullopt;
-    }
-    case GDT_UInt64: {
-      const std::uint64_t value = GDALGetRasterNoDataValueAsUInt64(band, &has);
-      return has ? whole(value) : std::nullopt;
-    }
-    default: {
-      const double value = GDALGetRasterNoDataValue(band, &has);
-      return has ? ToPixel<T>(value) : std::nullopt;
-    }
-  }
-}
 
 /// A number out of a text, as a pixel value.
 template <typename T>
@@ -149,7 +124,9 @@ StoredHistogram ToStored(const RasterBandHistogram<T>& histogram) {
   double width = histogram.binSize;
   if constexpr (std::is_integral_v<T>) {
     stored.lowEdge -= 0.5;
-    if (histogram.source != StatsSource::kNative) width = std::trunc(width);  // as it was counted
+    const bool isCountedAsTold =
+        histogram.source != StatsSource::kNative && histogram.bins == Form::kTold;
+    if (isCountedAsTold) width = std::trunc(width);
   }
   stored.highEdge = stored.lowEdge + width * histogram.binCount;
   stored.counts = histogram.counts;
@@ -176,12 +153,8 @@ template <typename T>
 Reader<T>::Reader(RasterDataConnection* connection, OpenRaster& raster, const lumo::RasterDef& def)
     : PlainRasterReader<T>(connection), raster_(raster), def_(def) {
   for (unsigned band = 0; band < raster.Bands(); ++band) {
-    if (!raster.IsNew()) {
-      noData_.push_back(detail::ReadNoData<T>(raster.Band(band)));
-      continue;
-    }
-    const auto at = def.noData.find(band);
-    noData_.push_back(at != def.noData.end() ? ToPixel<T>(at->second) : std::nullopt);
+    const auto told = raster.IsNew() ? NoDataOf(def, band) : gdal::ReadNoData(raster.Band(band));
+    noData_.push_back(told ? told->As<T>() : std::nullopt);
   }
   def_.noData.clear();
   for (unsigned band = 0; band < noData_.size(); ++band) {
@@ -192,7 +165,11 @@ Reader<T>::Reader(RasterDataConnection* connection, OpenRaster& raster, const lu
     } else {
       def_.noData[band] = static_cast<double>(value->real);
     }
+    if constexpr (std::is_integral_v<T> && sizeof(T) == 8) {
+      def_.metadata.Set(BandDetailPath(band, "NoDataValue"), String(std::to_string(*value)));
+    }
   }
+  alphaBand_ = raster.KeepsAlpha() ? raster.Bands() - 1 : raster.Bands();
 }
 
 template <typename T>
@@ -285,6 +262,7 @@ template <typename T>
 bool Reader<T>::WriteStats(const Array<RasterBandStats<T>>& stats) {
   if constexpr (kHasStats) {
     const Messages messages;
+    raster_.NoteStatistics();
     for (const RasterBandStats<T>& band : stats) {
       constexpr unsigned kWhole =
           StatsMask::Min | StatsMask::Max | StatsMask::Mean | StatsMask::Std;
@@ -345,7 +323,7 @@ template <typename T>
 bool Reader<T>::FlushBandValues() {
   const Messages messages;
   GDALFlushCache(raster_.Dataset());
-  return (!messages.HasError() && !messages.HasWarning()) || messages.Fail(raster_.Name());
+  return !messages.HasError() || messages.Fail(raster_.Name());
 }
 
 template <typename T>
@@ -407,9 +385,50 @@ bool Reader<T>::ReadPixels(unsigned left, unsigned top, unsigned width, unsigned
 template <typename T>
 bool Reader<T>::WritePixels(unsigned left, unsigned top, unsigned width, unsigned height,
                             const Array<unsigned>& bands, unsigned level, const T* pixels,
-                            const unsigned char*) {
+                            const unsigned char* state) {
   areLevelsOld_ = PyramidExists();
-  return raster_.Write({left, top, width, height, bands, level}, pixels);
+  const BlockPlace place{left, top, width, height, bands, level};
+  return raster_.Write(place, pixels) &&
+         (!raster_.IsNew() || raster_.ExcludeFromNew(place, FindUntold(place, pixels, state)));
+}
+
+/// The pixels of a block that are not valid though neither a no-data value nor the alpha band says
+/// so, as bytes that are not 0; empty when there is none.
+template <typename T>
+std::vector<unsigned char> Reader<T>::FindUntold(const BlockPlace& place, const T* pixels,
+                                                 const unsigned char* state) const {
+  const std::size_t plane = std::size_t{place.width} * place.height;
+  const std::size_t bands = place.bands.GetCount(), count = plane * bands;
+  unsigned char any = 0;
+  for (std::size_t i = 0; i < count; ++i) any |= state[i];
+  if ((any & PixelValueState::NotValid) == 0) return {};
+  std::vector<std::optional<T>> values;
+  for (const unsigned band : place.bands) values.push_back(noData_[band]);
+  std::vector<unsigned char> told(count);
+  const NoDataMarker<T> marker(std::move(values), raster_.Interleave(), place.width, place.height);
+  marker.Mark(0, count, pixels, told.data());
+
+  const BlockStrides strides(raster_.Interleave(), place.width, place.height, bands);
+  const auto alphaAt = std::find(place.bands.begin(), place.bands.end(), alphaBand_);
+  const bool hasAlpha = alphaAt != place.bands.end();
+  const auto alpha = static_cast<std::size_t>(alphaAt - place.bands.begin());
+  std::vector<unsigned char> untold(plane);
+  bool isAny = false;
+  for (std::size_t band = 0; band < bands; ++band) {
+    if (hasAlpha && band == alpha) continue;  // an alpha band is valid everywhere
+    for (std::size_t y = 0, pixel = 0; y < place.height; ++y) {
+      for (std::size_t x = 0; x < place.width; ++x, ++pixel) {
+        const std::size_t at = y * strides.line + x * strides.pixel;
+        const std::size_t here = at + band * strides.band;
+        if ((state[here] & PixelValueState::NotValid) == 0 || told[here] != 0) continue;
+        if (hasAlpha && pixels[at + alpha * strides.band] == T{}) continue;
+        untold[pixel] = 1;
+        isAny = true;
+      }
+    }
+  }
+  if (!isAny) untold.clear();
+  return untold;
 }
 
 }  // namespace lumo::gdal

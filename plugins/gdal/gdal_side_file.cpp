@@ -6,6 +6,7 @@
 
 #include "common/coordsys.h"
 #include "common/source.h"
+#include "gdal_details.h"
 #include "gdal_georef.h"
 #include "gdal_no_data.h"
 
@@ -42,9 +43,9 @@ bool HasCamera(GDALDatasetH dataset) {
   return items != nullptr && *items != nullptr;
 }
 
-bool HasNoData(GDALRasterBandH band, double wanted) {
-  const std::optional<double> value = ReadNoData(band);
-  return value && IsSameNumber(*value, wanted);
+bool HasNoData(GDALRasterBandH band, const NoDataNumber& wanted) {
+  const std::optional<NoDataNumber> value = ReadNoData(band);
+  return value && value->IsSame(wanted);
 }
 
 // Each sets what differs, by the operations of the base class: a driver's own would write into the
@@ -74,8 +75,9 @@ bool CompleteCamera(GDALPamDataset& file, const GeoRef& model) {
 }
 
 bool CompleteNoData(GDALPamDataset& file, const RasterDef& def) {
-  for (const auto& [band, value] : def.noData) {
+  for (const auto& [band, number] : def.noData) {
     if (band >= def.bands) continue;
+    const NoDataNumber value = *NoDataOf(def, band);
     GDALRasterBandH const target =
         GDALRasterBand::ToHandle(file.GetRasterBand(static_cast<int>(band) + 1));
     if (!HasNoData(target, value) && !WriteNoDataBeside(target, value)) return false;
@@ -104,7 +106,7 @@ bool CompleteBeside(const std::string& path, const std::string& driver, const Ra
   if (withSideFile == nullptr) return false;
   const bool hasGeoRef = !def.geoRef || (CompleteGrid(*withSideFile, *def.geoRef, def) &&
                                          CompleteCamera(*withSideFile, *def.geoRef));
-  return hasGeoRef && CompleteNoData(*withSideFile, def) &&
+  return hasGeoRef && CompleteDetails(*withSideFile, def) && CompleteNoData(*withSideFile, def) &&
          CompleteHistograms(file.get(), histograms);
 }
 

@@ -65,7 +65,7 @@ unsigned CommonDataType(GDALDatasetH dataset, const std::string& name) {
   char** const others = GDALGetMetadata(dataset, "SUBDATASETS");
   FailWith(name, bands != 0 ? "a pixel type that can't be read"
                  : others != nullptr && *others != nullptr
-                     ? "holds several rasters: name one by SUBDATASET=<number>"
+                     ? "holds several rasters: name one by FILE|SUBDATASET=<number>"
                      : "holds no raster");
   return 0;
 }

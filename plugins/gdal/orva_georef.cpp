@@ -1,9 +1,9 @@
 #include "orva_georef.h"
 
 #include <cmath>
-#include <numbers>
 
 #include "commands/value_text.h"
+#include "georef/affine_link.h"
 #include "georef/std_georef.h"
 #include "orva_header.h"
 
@@ -90,21 +90,27 @@ GeoRefPtr FitGrid(const std::vector<TiePoint>& points, const CoordSys& system) {
   auto* const grid = new StdGeoRef;
   GeoRefPtr owner(grid);
   grid->SetCoordinateSystem(system);
-  grid->SetPixelSize(std::hypot(fit.xs, fit.ys), std::hypot(fit.xl, fit.yl));
-  constexpr double kDegrees = 180 / std::numbers::pi;
+  // The second axis is at right angles to the first, either way round.
+  const double angle = std::atan2(fit.ys, fit.xs);
+  grid->SetPixelSize(std::hypot(fit.xs, fit.ys),
+                     fit.xl * std::sin(angle) - fit.yl * std::cos(angle));
   constexpr double kNotTurned = 1e-9;  // degrees
-  const double turn = std::atan2(fit.ys, fit.xs) * kDegrees;
+  const double turn = angle / StdGeoRef::kRadiansPerDegree;
   grid->SetRotation(std::abs(turn) < kNotTurned ? 0 : turn);
   grid->SetTiePixel(mean.sample, mean.line);
   grid->SetTieMap(mean.x, mean.y);
 
   constexpr double kTolerance = 0.5;  // pixels
-  for (const TiePoint& point : points) {
-    double sample = 0, line = 0;
-    if (!grid->MapToPixel(point.x, point.y, sample, line) ||
-        !(std::hypot(sample - point.sample, line - point.line) <= kTolerance)) {
-      return {};
-    }
+  Array<double> places{ArrayDims(static_cast<unsigned>(points.size()), 2)};
+  for (unsigned i = 0; i < points.size(); ++i) {
+    places[2 * i] = points[i].x;
+    places[2 * i + 1] = points[i].y;
+  }
+  if (!InvertPixelToMap(*grid, places)) return {};
+  for (unsigned i = 0; i < points.size(); ++i) {
+    const double off =
+        std::hypot(places[2 * i] - points[i].sample, places[2 * i + 1] - points[i].line);
+    if (!(off <= kTolerance)) return {};
   }
   return owner;
 }

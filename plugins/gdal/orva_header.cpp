@@ -7,6 +7,8 @@
 
 #include "commands/value_text.h"
 #include "orva_georef.h"
+#include "raster/no_data_number.h"
+#include "raster/raster_details.h"
 
 namespace lumo::orva {
 namespace {
@@ -124,7 +126,8 @@ void WriteNoData(Header& header) {
 
 bool TakeNoData(const RasterDef& def, Header& header, std::string& fault) {
   for (const auto& [band, value] : def.noData) {
-    const std::string number = FormatValue(value).ToUTF8();
+    const std::string whole = NoDataOf(def, band)->whole;
+    const std::string number = whole.empty() ? FormatValue(value).ToUTF8() : whole;
     if (band < def.bands && FitsType(def.dataType, number)) {
       header.noData[band] = number;
       continue;
@@ -201,7 +204,13 @@ RasterDef MakeRasterDef(const Header& header) {
   def.interleave = header.layout.interleave;
   def.dataType = header.dataType;
   def.format = "ORVA";
-  for (const auto& [band, number] : header.noData) ParseNumber(number, def.noData[band]);
+  const bool isWhole =
+      def.dataType == kDataTypeOf<std::int64_t> || def.dataType == kDataTypeOf<std::uint64_t>;
+  for (const auto& [band, number] : header.noData) {
+    ParseNumber(number, def.noData[band]);
+    // The digits that a double lacks.
+    if (isWhole) def.metadata.Set(BandDetailPath(band, "NoDataValue"), String(number));
+  }
   def.SetGeoRef(header.geoRef);
   return def;
 }

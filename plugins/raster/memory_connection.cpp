@@ -4,6 +4,7 @@
 
 #include "georef/std_georef.h"
 #include "memory_reader.h"
+#include "raster/pixel_value.h"
 
 namespace lumo::memory {
 namespace {
@@ -36,6 +37,9 @@ bool Connection::Connect(const Array<String>& connStrings, const GeoRefPtr& geoR
   def_.format = "MemoryRaster";
   def_.SetGeoRef(geoRef ? geoRef : MakeGeoRef(block));
   if (metadata) def_.metadata = *metadata;
+  for (const auto& [band, value] : block.noData) {
+    if (band < def_.bands && FitsPixel(def_.dataType, value)) def_.noData[band] = value;
+  }
   connStrings_ = connStrings;
   block_ = std::move(block);
   return DispatchType(TwelveTypes{}, def_.dataType, [&]<typename T>() {

@@ -94,6 +94,20 @@ bool ReadFields(std::string_view text, Description& block) {
   return false;
 }
 
+/// Reads "NODATA=<band>:<value>,<band>:<value>".
+bool ReadNoData(const std::string& text, Description& block) {
+  const std::string list = text + ",";
+  FieldReader fields(list);
+  if (!fields.Take("NODATA")) return false;
+  while (!fields.Rest().empty()) {
+    unsigned band = 0;
+    double value = 0;
+    if (!fields.TakeNumber(band, ':') || !fields.TakeNumber(value, ',')) return false;
+    block.noData[band] = value;
+  }
+  return true;
+}
+
 /// What makes the block impossible; null when nothing does.
 const char* FindFault(Description& block) {
   FlatLayout& layout = block.layout;
@@ -123,7 +137,9 @@ const char* FindFault(Description& block) {
 bool ReadDescription(const Array<String>& connStrings, Description& block) {
   Array<String> rest;
   RemoveFormatNames(connStrings, rest);
-  if (rest.GetCount() != 1 || !ReadFields(rest[0].ToUTF8(), block)) {
+  const bool hasNoData = rest.GetCount() == 2;
+  if ((rest.GetCount() != 1 && !hasNoData) || !ReadFields(rest[0].ToUTF8(), block) ||
+      (hasNoData && !ReadNoData(rest[1].ToUTF8(), block))) {
     SetFault("MemoryRaster: the connection text doesn't describe a block");
     return false;
   }

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <map>
 #include <string>
 
 #include "foundation/array.h"
@@ -13,7 +14,8 @@ namespace lumo::memory {
 ///   PIXELDATA=address;NAME=text;SAMPLES=n;LINES=n;BANDS=n;INTERLEAVE=n;PIXELTYPE=n;
 ///   PIXELSIZE=x,y;TIEPTMAP=x,y;COORDSYS=text
 ///
-/// The address is hexadecimal, as printf writes a pointer.
+/// The address is hexadecimal, as printf writes a pointer. A second text may give no-data values:
+/// "NODATA=<band>:<value>,<band>:<value>".
 struct Description {
   void* pixels = nullptr;  ///< aligned for the pixel type; belongs to who made the text
   std::string name;
@@ -23,10 +25,11 @@ struct Description {
   double pixelSizeY = 0;
   double tieMapX = 0;
   double tieMapY = 0;
-  std::string coordSys;  ///< blank when there is none
+  std::string coordSys;               ///< blank when there is none
+  std::map<unsigned, double> noData;  ///< by band
 };
 
-/// Reads the one piece of connection strings that is no format's key. The block isn't touched.
+/// Reads the pieces of connection strings that are no format's key. The block isn't touched.
 /// False, with SetFault, for a text of another form, or a block that memory can't hold.
 bool ReadDescription(const Array<String>& connStrings, Description& block);
 

@@ -4,6 +4,8 @@
 
 #include "foundation/fault.h"
 #include "memory_connection.h"
+#include "raster/no_data_marker.h"
+#include "raster/pixel_value.h"
 
 namespace lumo::memory {
 
@@ -13,7 +15,13 @@ template <typename T>
 class Reader final : public RasterReader<T> {
  public:
   explicit Reader(Connection* connection)
-      : RasterReader<T>(connection), block_(connection->Block()) {}
+      : RasterReader<T>(connection), block_(connection->Block()) {
+    const lumo::RasterDef def = connection->RasterDef();
+    for (unsigned band = 0; band < block_.layout.bands; ++band) {
+      const auto value = def.noData.find(band);
+      noData_.push_back(value != def.noData.end() ? ToPixel<T>(value->second) : std::nullopt);
+    }
+  }
 
   bool OpBool() override { return true; }
   std::int32_t ReaderType() override { return 0; }
@@ -45,8 +53,10 @@ class Reader final : public RasterReader<T> {
     return Fail("no histograms");
   }
 
-  bool HasNoDataValue(unsigned) override { return false; }
-  T NoDataValue(unsigned) override { return T{}; }
+  bool HasNoDataValue(unsigned band) override {
+    return band < noData_.size() && noData_[band].has_value();
+  }
+  T NoDataValue(unsigned band) override { return HasNoDataValue(band) ? *noData_[band] : T{}; }
   bool CanInheritNoDataValues() override { return false; }
   void InheritNoDataValues(const lumo::RasterDef&) override {}
 
@@ -69,16 +79,22 @@ class Reader final : public RasterReader<T> {
 
   bool ReadPixels(unsigned left, unsigned top, unsigned width, unsigned height,
                   const Array<unsigned>& bands, unsigned level, T* pixels,
-                  unsigned char*) override {
-    return ForEachRow({block_.layout, left, top, width, height, bands}, level,
-                      [&](const FlatBlock& rows, std::uint64_t row, T* span) {
-                        T* const to = pixels + rows.BlockBegin(row);
-                        if (rows.Picks()) {
-                          rows.PickBands(row, span, to, sizeof(T));
-                        } else {
-                          std::copy_n(span, rows.RowElements(row), to);
-                        }
-                      });
+                  unsigned char* state) override {
+    const bool isRead = ForEachRow({block_.layout, left, top, width, height, bands}, level,
+                                   [&](const FlatBlock& rows, std::uint64_t row, T* span) {
+                                     T* const to = pixels + rows.BlockBegin(row);
+                                     if (rows.Picks()) {
+                                       rows.PickBands(row, span, to, sizeof(T));
+                                     } else {
+                                       std::copy_n(span, rows.RowElements(row), to);
+                                     }
+                                   });
+    if (!isRead) return false;
+    std::vector<std::optional<T>> values;
+    for (const unsigned band : bands) values.push_back(noData_[band]);
+    const NoDataMarker<T> marker(std::move(values), block_.layout.interleave, width, height);
+    marker.Mark(0, std::uint64_t{width} * height * bands.GetCount(), pixels, state);
+    return true;
   }
 
   bool WritePixels(unsigned left, unsigned top, unsigned width, unsigned height,
@@ -112,6 +128,7 @@ class Reader final : public RasterReader<T> {
   }
 
   const Description& block_;
+  std::vector<std::optional<T>> noData_;  // by band
   std::map<unsigned, lumo::Palette> palettes_;
 };
 

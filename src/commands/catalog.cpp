@@ -1,5 +1,6 @@
 #include "commands/catalog.h"
 
+#include "commands/catalog_owners.h"
 #include "foundation/library.h"
 
 namespace lumo {
@@ -32,6 +33,7 @@ void Add(const ObjectPtr& object) {
   const MutexLock lock = map.Lock();
   CatalogEntry& entry = map[uri];
   if (entry.count++ == 0) entry.object = object;
+  NoteOpen(uri);
 }
 
 ObjectPtr Find(const URI& uri) {
@@ -46,6 +48,7 @@ ObjectPtr Access(const URI& uri) {
   if (!map.HasKey(uri)) return {};
   CatalogEntry& entry = map[uri];
   ++entry.count;
+  NoteOpen(uri);
   return entry.object;
 }
 
@@ -55,6 +58,7 @@ void Release(const URI& uri) {
   const MutexLock lock = map.Lock();
   if (!map.HasKey(uri)) return;
   CatalogEntry& entry = map[uri];
+  NoteClose(uri, entry.count);
   if (--entry.count != 0) return;
   last = entry.object;
   map.Remove(uri);

@@ -21,12 +21,13 @@ bool PipeClient::Connect() {
   String name;
   if (dispatchPipe_.Write(kNewServerWord) != 0 && dispatchPipe_.Read(name) != 0) {
     serverPipe_.Reset(new NamedPipe(name));
+    serverGone_ = false;
   }
   return IsConnected();
 }
 
 void PipeClient::Disconnect() {
-  if (serverPipe_.IsNull() || !serverPipe_->ConnectWithin(patience_)) return;
+  if (serverPipe_.IsNull() || !serverPipe_->ConnectWithin(serverGone_ ? 0.0 : patience_)) return;
   serverPipe_->Write(kQuitWord);
   serverPipe_.Reset();
 }
@@ -37,8 +38,11 @@ void PipeClient::Shutdown() {
 
 bool PipeClient::Send(const String& request, String& reply) {
   reply = "";
-  if (!IsConnected() || !serverPipe_->ConnectWithin(patience_)) return false;
-  return serverPipe_->Write(request) != 0 && serverPipe_->Read(reply) != 0;
+  if (!IsConnected()) return false;
+  const bool answered = serverPipe_->ConnectWithin(serverGone_ ? 0.0 : patience_) &&
+                        serverPipe_->Write(request) != 0 && serverPipe_->Read(reply) != 0;
+  serverGone_ = !answered;
+  return answered;
 }
 
 Map<String, JobResult> PipeClient::Submit(const String& jobDocument) {

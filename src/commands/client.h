@@ -42,7 +42,8 @@ using ClientPtr = Pointer<Client>;
 /// The client of a PipeServerDispatch, in this process or in another.
 class VEXG_EXPORT PipeClient : public Client {
  public:
-  /// Seconds that each operation waits for a server.
+  /// Seconds that each operation waits for a server. A private server that did not answer is tried
+  /// once more by each later operation, without waiting: its name does not come back.
   static constexpr double kPatience = 30.0;
 
   /// @param name  of the dispatcher's pipe.
@@ -68,6 +69,7 @@ class VEXG_EXPORT PipeClient : public Client {
  private:
   NamedPipe dispatchPipe_;
   NamedPipePtr serverPipe_;
+  bool serverGone_ = false;  // the private server did not answer: nobody waits for it again
   double patience_;
   String note_;
 };

@@ -1,6 +1,7 @@
 #pragma once
 
 #include "commands/command.h"
+#include "commands/strict_checks.h"
 
 namespace lumo {
 
@@ -13,18 +14,37 @@ struct CommandDescriptor {
   String id;    ///< class name
   CommandPtr command;
   Set<CommandPtr> dependsOn;    ///< must be retired first
+  unsigned dependsOnFirst = 0;  ///< as many from the first of the job too; @ALL in a long job
   Map<String, String> inputs;   ///< input name to a literal or, with a leading $, a variable
   Map<String, String> outputs;  ///< output name to variable
+  Set<String> expanded;         ///< names of inputs whose texts hold variables
   IPC ipc;                      ///< abort flag and progress report of this command
+  unsigned position = 0;        ///< in the job, while it runs
+  String complaint;             ///< what the document gets wrong about the command; see JobChecks
+  String explanation;           ///< a better reason than the command's own for its failure
+
+  /// Why the command failed, in one line; empty when it did not, or did not say.
+  const String& GetReason() const {
+    return explanation.GetLength() != 0 ? explanation : command->GetReason();
+  }
 };
 
 using CommandDescriptorPtr = Pointer<CommandDescriptor>;
+
+/// How often a job looks for the nearest name in its own: each look goes over all of them, and a
+/// document may be wrong in a hundred thousand places.
+inline constexpr unsigned kMostHints = 100;
 
 /// A command of a document that names no command known here. It is no part of the job; a host may
 /// want to say so.
 struct UnknownCommand {
   String name;
   String id;
+  unsigned position = 0;  ///< commands of the job that stand before it
+
+  /// What is wrong with it, in one line.
+  /// @param withHint  with the nearest command that is known.
+  String GetReason(bool withHint) const;
 };
 
 /// Commands with their inputs, outputs and order, and the channel through which a host watches.
@@ -46,6 +66,8 @@ class VEXG_EXPORT Job {
   Deque<CommandDescriptorPtr> commands;  ///< in document order
   Map<String, unsigned> commandIndex;    ///< name to position in `commands`
   List<UnknownCommand> unknown;          ///< in document order
+  List<String> faults;                   ///< what is wrong with the document, a line each
+  JobChecks checks = JobChecks::kTold;   ///< how the commands' inputs are looked at
   bool tellsReasons = false;             ///< the result document says why commands failed
   IPCPtr ipc;                            ///< empty when the document named none that can be used
   IPC defaultIpc;

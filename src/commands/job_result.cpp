@@ -3,8 +3,15 @@
 #include <algorithm>
 #include <cmath>
 
+#include "foundation/near_name.h"
+
 namespace lumo {
 namespace {
+
+/// A reason may hold names of files, and they anything.
+String OneLine(const String& reason) {
+  return String(Printable(reason.ToUTF8()));
+}
 
 XMLElementPtr DescribeCommand(CommandDescriptor& descriptor, bool tellReason) {
   auto* const element = new JobResultWriterValue;
@@ -17,13 +24,40 @@ XMLElementPtr DescribeCommand(CommandDescriptor& descriptor, bool tellReason) {
   element->attributes["Wall"] = FormatDuration(end.wall - start.wall);
   element->attributes["CPU"] = FormatDuration(end.cpu - start.cpu);
   element->attributes["Usage"] = "0";
-  const String& reason = command.GetReason();
-  if (tellReason && reason.GetLength() != 0) element->attributes["Reason"] = reason;
+  const String& reason = descriptor.GetReason();
+  if (tellReason && reason.GetLength() != 0) element->attributes["Reason"] = OneLine(reason);
 
   Map<String, String> returns;
   command.GetReturns(returns);
   for (const auto& [name, value] : returns) element->AddReturn(name, value);
   return owner;
+}
+
+/// A command of the document that is no command here.
+XMLElementPtr DescribeUnknown(const UnknownCommand& command, bool withHint) {
+  const XMLElementPtr element(new XMLElement("Command"));
+  element->attributes["Name"] = command.name;
+  element->attributes["Result"] = GetResultWord(CommandResult::kNone);
+  element->attributes["Wall"] = FormatDuration(0.0);
+  element->attributes["CPU"] = FormatDuration(0.0);
+  element->attributes["Usage"] = "0";
+  element->attributes["Reason"] = command.GetReason(withHint);
+  return element;
+}
+
+/// What the document gets wrong, in elements Fault ahead of the commands.
+void AddFaults(const Job& job, XMLDocumentRoot& root) {
+  const auto add = [&](const String& reason) {
+    const XMLElementPtr fault(new XMLElement("Fault"));
+    fault->attributes["Reason"] = OneLine(reason);
+    root.children.PushBack(fault);
+  };
+  for (const String& fault : job.faults) add(fault);
+  if (job.checks == JobChecks::kStrict) return;  // the commands have failed with their complaints
+  for (const CommandDescriptorPtr& descriptor : job.commands) {
+    if (descriptor->complaint.GetLength() == 0) continue;
+    add("command \"" + descriptor->name + "\": " + descriptor->complaint);
+  }
 }
 
 }  // namespace
@@ -52,9 +86,21 @@ void JobResultWriterValue::AddReturn(const String& returnName, const String& val
 String JobResultWriter::Write() {
   XMLDocumentRoot root;
   root.name = "JobResult";
-  for (const CommandDescriptorPtr& descriptor : job_.commands) {
-    root.children.PushBack(DescribeCommand(*descriptor, job_.tellsReasons));
+  if (job_.tellsReasons) AddFaults(job_, root);
+  unsigned hints = kMostHints;
+  auto unknown = job_.unknown.begin();
+  const auto addUnknown = [&](unsigned position) {
+    for (; job_.tellsReasons && unknown != job_.unknown.end(); ++unknown) {
+      if (unknown->position > position) return;
+      root.children.PushBack(DescribeUnknown(*unknown, hints != 0));
+      if (hints != 0) --hints;
+    }
+  };
+  for (unsigned i = 0; i < job_.commands.GetCount(); ++i) {
+    addUnknown(i);
+    root.children.PushBack(DescribeCommand(*job_.commands[i], job_.tellsReasons));
   }
+  addUnknown(job_.commands.GetCount());
   XMLSimpleWriter writer;
   const String text = writer.Write(root);
   SetErrorState(writer);

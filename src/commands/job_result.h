@@ -31,7 +31,9 @@ class VEXG_EXPORT JobResultWriterValue : public XMLElement {
   XMLElement* returns_ = nullptr;
 };
 
-/// Writes the result document of a job that has run: a Command element for each, in order.
+/// Writes the result document of a job that has run: a Command element for each, in order. Where
+/// the job asked for reasons, commands of the document that are unknown here have one too, with the
+/// result None, and an element Fault for each thing that the document gets wrong stands before all.
 /// Failure: ObjectErrorIO and an empty text.
 class VEXG_EXPORT JobResultWriter : public ErrorState {
  public:

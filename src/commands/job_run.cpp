@@ -2,6 +2,11 @@
 
 #include <algorithm>
 #include <memory>
+#include <string_view>
+
+#include "commands/catalog_session.h"
+#include "commands/variable_text.h"
+#include "foundation/near_name.h"
 
 namespace lumo {
 namespace {
@@ -15,7 +20,7 @@ void NameLiterals(Job& job, JobVariables& variables) {
   unsigned counter = 0;
   for (const CommandDescriptorPtr& descriptor : job.commands) {
     for (auto& [inputName, value] : descriptor->inputs) {
-      if (IsVariable(value)) continue;
+      if (IsVariable(value) || descriptor->expanded.Contains(inputName)) continue;
       const String name = String::Format("TMP_VAR_%08x", counter++);
       variables.SetLiteral(name, MakeText(value));
       value = name;
@@ -23,25 +28,34 @@ void NameLiterals(Job& job, JobVariables& variables) {
   }
 }
 
-bool IsReady(const CommandDescriptor& descriptor) {
-  return std::all_of(descriptor.dependsOn.begin(), descriptor.dependsOn.end(),
-                     [](const CommandPtr& dependency) {
-                       return dependency->GetState() == CommandState::kRetired;
-                     });
-}
-
-bool AllRetired(const Job& job) {
-  return std::all_of(job.commands.begin(), job.commands.end(), [](const auto& descriptor) {
-    return descriptor->command->GetState() == CommandState::kRetired;
-  });
+/// Ends a command as failed that memory was too short for; never throws.
+void GiveUp(CommandDescriptor& descriptor) {
+  try {
+    descriptor.command->FailUnstarted("memory is short");
+  } catch (...) {
+    // It retires without a result.
+  }
 }
 
 /// The stages of one run with what they share. Each thread of the run holds it, as the last one may
 /// still be leaving the lock when the run returns.
 struct JobRun {
-  explicit JobRun(Job& job) : starter(job, variables), executor(variables), finisher(variables) {}
+  explicit JobRun(Job& job)
+      : variables(job),
+        starter(job, variables),
+        executor(variables, job.checks),
+        finisher(variables) {}
 
-  void Execute(CommandDescriptor* descriptor) { finisher.Write(executor.Process(descriptor)); }
+  catalog::Session* const session = catalog::CurrentSession();  // whose opens the job's are
+
+  /// Runs a command. It ends come what may, since the run waits for it.
+  void Execute(CommandDescriptor& descriptor) {
+    try {
+      executor.Process(&descriptor);
+    } catch (...) {
+      GiveUp(descriptor);
+    }
+  }
 
   JobVariables variables;
   JobStarter starter;
@@ -57,9 +71,11 @@ class JobExecutorThread : public SimpleThread {
 
   void Run() override {
     SetRunning();
+    const catalog::SessionScope session(run_->session);
     // What this command held up runs here, rather than on a thread that has to be made first.
-    for (CommandDescriptor* next = descriptor_; next != nullptr; next = run_->starter.TryNext()) {
-      run_->Execute(next);
+    while (descriptor_ != nullptr) {
+      run_->Execute(*descriptor_);
+      descriptor_ = run_->finisher.WriteAndTake(*descriptor_);
     }
   }
 
@@ -69,18 +85,129 @@ class JobExecutorThread : public SimpleThread {
 };
 
 void StartCommandThread(const std::shared_ptr<JobRun>& run, CommandDescriptor* descriptor) {
-  if (StartThread(SimpleThreadPtr(new JobExecutorThread(run, descriptor)))) return;
-  descriptor->command->FailUnstarted("the system gives no thread for the command");
+  try {
+    if (StartThread(SimpleThreadPtr(new JobExecutorThread(run, descriptor)))) return;
+    descriptor->command->FailUnstarted("the system gives no thread for the command");
+  } catch (...) {
+    GiveUp(*descriptor);
+  }
   run->finisher.Write(descriptor);
+}
+
+ValueKind KindOf(const CommandDescriptor& descriptor, const String& input) {
+  const CommandDeclaration* const declaration = descriptor.command->GetDeclaration();
+  if (declaration == nullptr) return ValueKind::kText;
+  for (const InputDeclaration& declared : declaration->inputs) {
+    if (input == declared.name) return declared.kind;
+  }
+  return ValueKind::kText;
+}
+
+std::string NameOf(const CommandDescriptor& descriptor) {
+  const String& name = descriptor.name.GetLength() != 0 ? descriptor.name : descriptor.id;
+  return std::string("\"").append(Printable(name.ToUTF8(), 80)).append("\"");
+}
+
+constexpr std::string_view kSkipped = "skipped, as ";
+
+/// Why a command that has ended without success gave nothing; the first of a chain stands for all.
+String ExplainFailure(const CommandDescriptor& writer) {
+  const std::string reason = writer.GetReason().ToUTF8();
+  if (reason.starts_with(kSkipped)) return writer.GetReason();
+  const bool isAborted = writer.command->GetResult() == CommandResult::kAborted;
+  return String(std::string(kSkipped) + NameOf(writer) + (isAborted ? " was aborted" : " failed"));
+}
+
+String ExplainOutput(const CommandDescriptor& writer, const String& variable) {
+  std::vector<std::string> known;
+  if (const CommandDeclaration* const declaration = writer.command->GetDeclaration()) {
+    for (const OutputDeclaration& output : declaration->outputs) known.emplace_back(output.name);
+  }
+  for (const auto& [output, target] : writer.outputs) {
+    const std::string name = output.ToUTF8();
+    if (target != variable) continue;
+    return String(NameOf(writer) + " gave no output " + Printable(name, 80) +
+                  (std::find(known.begin(), known.end(), name) == known.end()
+                       ? DidYouMean(name, known)
+                       : ""));
+  }
+  return {};
 }
 
 }  // namespace
 
-void JobVariables::FillInputs(const CommandDescriptor& descriptor, ParameterMap& inputs) {
-  const std::lock_guard lock(mutex_);
-  for (const auto& [inputName, variable] : descriptor.inputs) {
-    if (variable.GetLength() != 0) inputs[inputName].object = variables_[variable];
+JobVariables::JobVariables(Job& job) : schedule_(job) {
+  for (const CommandDescriptorPtr& descriptor : job.commands) {
+    for (const auto& [output, variable] : descriptor->outputs) {
+      writers_[variable].push_back(descriptor.Get());
+    }
   }
+}
+
+ObjectPtr JobVariables::FindOrMake(const String& variable) {
+  return variables_[variable];
+}
+
+/// Why `variable` holds nothing, as far as the job can tell.
+String JobVariables::ExplainEmpty(const CommandDescriptor& reader, const String& variable) {
+  const std::string name = Printable(variable.ToUTF8(), 80);
+  const auto found = writers_.find(variable);
+  if (found == writers_.end()) {
+    std::vector<std::string> known;
+    if (hints_ != 0) {
+      --hints_;
+      for (const auto& entry : writers_) known.push_back(entry.first.ToUTF8());
+    }
+    return String("nothing has written " + name + DidYouMean(variable.ToUTF8(), known));
+  }
+  // The last that stands before the reader, else the first of all.
+  const std::vector<const CommandDescriptor*>& writers = found->second;
+  const auto behind = std::partition_point(
+      writers.begin(), writers.end(),
+      [&](const CommandDescriptor* writer) { return writer->position < reader.position; });
+  const CommandDescriptor* const writer =
+      behind != writers.begin() ? *std::prev(behind) : writers.front();
+  if (writer == &reader) return String("nothing has written " + name + " before");
+  const Command& command = *writer->command;
+  if (command.GetState() != CommandState::kRetired) {
+    return String(NameOf(*writer) + " writes " + name +
+                  ", but has not ended yet; a DependsOn orders them");
+  }
+  if (command.GetResult() != CommandResult::kSuccess) return ExplainFailure(*writer);
+  return ExplainOutput(*writer, variable);
+}
+
+/// The text of an input with the values of its variables; empty, with the reason, when one of them
+/// holds none.
+ObjectPtr JobVariables::Expand(const CommandDescriptor& descriptor, const String& input,
+                               const String& text, String& why) {
+  String expanded;
+  const auto read = [&](const String& variable, String& value) {
+    const String* const found = FindText(FindOrMake(variable));
+    if (found != nullptr) {
+      value = *found;
+    } else if (why.GetLength() == 0) {
+      why = ExplainEmpty(descriptor, variable);
+    }
+    return found != nullptr;
+  };
+  if (!ExpandVariables(text, KindOf(descriptor, input), read, expanded)) return {};
+  return MakeText(expanded);
+}
+
+String JobVariables::FillInputs(const CommandDescriptor& descriptor, ParameterMap& inputs) {
+  const std::lock_guard lock(mutex_);
+  String why;
+  for (const auto& [inputName, variable] : descriptor.inputs) {
+    if (descriptor.expanded.Contains(inputName)) {
+      inputs[inputName].object = Expand(descriptor, inputName, variable, why);
+    } else if (variable.GetLength() != 0) {
+      const ObjectPtr object = FindOrMake(variable);
+      if (object.IsNull() && why.GetLength() == 0) why = ExplainEmpty(descriptor, variable);
+      inputs[inputName].object = object;
+    }
+  }
+  return why;
 }
 
 void JobVariables::TakeOutputs(const CommandDescriptor& descriptor, ParameterMap& results) {
@@ -92,60 +219,68 @@ void JobVariables::TakeOutputs(const CommandDescriptor& descriptor, ParameterMap
 
 void JobVariables::Close() {
   const std::lock_guard lock(mutex_);
-  over_ = true;
   variables_.Clear();
 }
 
-void JobVariables::Retire(Command& command) {
+void JobVariables::RetireLocked(CommandDescriptor& descriptor) {
+  descriptor.command->SetState(CommandState::kRetired);
+  schedule_.Retire(descriptor);
+}
+
+void JobVariables::Retire(CommandDescriptor& descriptor) {
   const std::lock_guard lock(mutex_);
-  command.SetState(CommandState::kRetired);
-  retired_.notify_all();
+  RetireLocked(descriptor);
+  changed_.notify_all();
+}
+
+CommandDescriptor* JobVariables::RetireAndTake(CommandDescriptor& descriptor) {
+  const std::lock_guard lock(mutex_);
+  RetireLocked(descriptor);
+  CommandDescriptor* const next = schedule_.TakeReady();
+  if (schedule_.HasReady() || schedule_.AllStarted()) changed_.notify_all();
+  return next;
+}
+
+CommandDescriptor* JobVariables::AwaitReady() {
+  std::unique_lock lock(mutex_);
+  changed_.wait(lock, [this] { return schedule_.HasReady() || schedule_.AllStarted(); });
+  return schedule_.TakeReady();
+}
+
+void JobVariables::AwaitEnd() {
+  std::unique_lock lock(mutex_);
+  changed_.wait(lock, [this] { return schedule_.AllRetired(); });
 }
 
 JobStarter::JobStarter(Job& job, JobVariables& variables)
-    : job_(job),
-      variables_(variables),
-      progress_(job.GetIPC().progress, AsyncCallbackPtr(), job.commands.GetCount()) {
+    : variables_(variables), progress_(job.GetIPC().progress, job.commands.GetCount()) {
   for (unsigned i = 0; i < job.commands.GetCount(); ++i) {
     job.commands[i]->ipc = IPC(job.GetIPC().abort, progress_.GetSlot(i));
   }
 }
 
-CommandDescriptor* JobStarter::Next() {
-  CommandDescriptor* ready = nullptr;
-  variables_.WaitUntil([&] {
-    ready = TakeReady();
-    return ready != nullptr || AllStarted();
-  });
-  return ready;
-}
-
-CommandDescriptor* JobStarter::TryNext() {
-  return variables_.WhileRunning([this] { return TakeReady(); });
-}
-
-/// Under the lock, so that a command is handed out once.
-CommandDescriptor* JobStarter::TakeReady() {
-  for (const CommandDescriptorPtr& descriptor : job_.commands) {
-    if (descriptor->command->GetState() == CommandState::kCreated && IsReady(*descriptor)) {
-      descriptor->command->SetState(CommandState::kStarted);
-      return descriptor.Get();
-    }
-  }
-  return nullptr;
-}
-
-bool JobStarter::AllStarted() const {
-  return std::none_of(job_.commands.begin(), job_.commands.end(), [](const auto& descriptor) {
-    return descriptor->command->GetState() == CommandState::kCreated;
-  });
-}
-
 CommandDescriptor* JobExecutor::Process(CommandDescriptor* descriptor) {
   if (descriptor == nullptr) return nullptr;
+  Command& command = *descriptor->command;
   ParameterMap inputs;
-  variables_.FillInputs(*descriptor, inputs);
-  ParameterMap& results = descriptor->command->Run(inputs, descriptor->ipc);
+  const String empty = variables_.FillInputs(*descriptor, inputs);
+  String misfit;
+  if (checks_ == JobChecks::kStrict && !descriptor->ipc.abort->IsSet()) {
+    misfit = descriptor->complaint;
+    const CommandDeclaration* const declaration = command.GetDeclaration();
+    if (misfit.GetLength() == 0) misfit = empty;
+    if (misfit.GetLength() == 0 && declaration != nullptr) {
+      misfit = FindMisfit(*declaration, inputs, descriptor->outputs);
+    }
+  }
+  if (misfit.GetLength() != 0) {
+    command.FailUnstarted(misfit);
+    descriptor->ipc.progress->Update(1.0);
+    return descriptor;
+  }
+  ParameterMap& results = command.Run(inputs, descriptor->ipc);
+  // "Input X holds no value" is true, but helps nobody.
+  if (command.GetResult() == CommandResult::kFailed) descriptor->explanation = empty;
   variables_.TakeOutputs(*descriptor, results);
   return descriptor;
 }
@@ -153,8 +288,13 @@ CommandDescriptor* JobExecutor::Process(CommandDescriptor* descriptor) {
 bool JobFinisher::Write(CommandDescriptor* descriptor) {
   if (descriptor == nullptr) return false;
   descriptor->ipc = IPC();
-  variables_.Retire(*descriptor->command);
+  variables_.Retire(*descriptor);
   return true;
+}
+
+CommandDescriptor* JobFinisher::WriteAndTake(CommandDescriptor& descriptor) {
+  descriptor.ipc = IPC();
+  return variables_.RetireAndTake(descriptor);
 }
 
 bool RunJob(Job& job) {
@@ -164,12 +304,13 @@ bool RunJob(Job& job) {
   const bool alone = job.commands.GetCount() == 1;
   while (CommandDescriptor* const descriptor = run->starter.Next()) {
     if (alone) {
-      run->Execute(descriptor);
+      run->Execute(*descriptor);
+      run->finisher.Write(descriptor);
     } else {
       StartCommandThread(run, descriptor);
     }
   }
-  run->variables.WaitUntil([&] { return AllRetired(job); });
+  run->variables.AwaitEnd();
   run->variables.Close();
   return true;
 }

@@ -1,26 +1,31 @@
 #pragma once
 
 #include <condition_variable>
+#include <map>
 #include <mutex>
 
-#include "commands/job.h"
+#include "commands/job_progress.h"
+#include "commands/job_schedule.h"
 #include "foundation/pipeline_stages.h"
-#include "foundation/progress.h"
 #include "foundation/thread.h"
 
 namespace lumo {
 
-/// What the stages of one run share: the variables through which outputs become inputs, and the
-/// news that a command has retired.
+/// What the stages of one run share: the variables through which outputs become inputs, and which
+/// command may start next.
 /// Threads: everything goes through its lock, which is never held while a command runs.
 class JobVariables {
  public:
+  explicit JobVariables(Job& job);
+
   /// Stores a literal; no other thread is there yet.
   void SetLiteral(const String& name, const ObjectPtr& value) { variables_[name] = value; }
 
   /// The objects that the inputs of `descriptor` name. A variable that nobody has written is made,
-  /// empty, so that the input exists and fails the command's own check.
-  void FillInputs(const CommandDescriptor& descriptor, ParameterMap& inputs);
+  /// empty, so that the input exists and fails the command's own check. Texts that hold variables
+  /// are put together.
+  /// @return why an input is empty, in one line; no text when none is.
+  String FillInputs(const CommandDescriptor& descriptor, ParameterMap& inputs);
 
   /// Stores the outputs of `descriptor`; a result that the command did not give is stored empty.
   void TakeOutputs(const CommandDescriptor& descriptor, ParameterMap& results);
@@ -28,29 +33,32 @@ class JobVariables {
   /// Ends the run: lets go of all objects.
   void Close();
 
-  /// Sets the state of the command to retired, and wakes the waiters.
-  void Retire(Command& command);
+  /// Retires a command, and wakes who waits.
+  void Retire(CommandDescriptor& descriptor);
 
-  /// Gives what `look` gives, which runs under the lock; null once the run is over, when the job
-  /// may be gone.
-  template <typename Look>
-  CommandDescriptor* WhileRunning(Look look) {
-    const std::lock_guard lock(mutex_);
-    return over_ ? nullptr : look();
-  }
+  /// Retires a command and gives the next that may start, its state set to started; null when there
+  /// is none now. After it the job may be gone.
+  CommandDescriptor* RetireAndTake(CommandDescriptor& descriptor);
 
-  /// Blocks until `done` gives true, which is asked at the start and after each retirement.
-  template <typename Done>
-  void WaitUntil(Done done) {
-    std::unique_lock lock(mutex_);
-    retired_.wait(lock, done);
-  }
+  /// Blocks until a command may start, and gives it; null when all have been handed out.
+  CommandDescriptor* AwaitReady();
+
+  /// Blocks until all commands have retired.
+  void AwaitEnd();
 
  private:
+  ObjectPtr FindOrMake(const String& variable);
+  ObjectPtr Expand(const CommandDescriptor& descriptor, const String& input, const String& text,
+                   String& why);
+  String ExplainEmpty(const CommandDescriptor& reader, const String& variable);
+  void RetireLocked(CommandDescriptor& descriptor);
+
   std::mutex mutex_;
-  std::condition_variable retired_;
+  std::condition_variable changed_;
   Map<String, ObjectPtr> variables_;
-  bool over_ = false;
+  std::map<String, std::vector<const CommandDescriptor*>> writers_;  // of a variable, in order
+  JobSchedule schedule_;
+  unsigned hints_ = kMostHints;
 };
 
 /// The first stage of a run: hands out the commands as what they depend on retires.
@@ -61,24 +69,18 @@ class JobStarter : public IPipelineReader<CommandDescriptor> {
 
   /// Blocks until a command may run, and gives the first such in document order with its state set
   /// to started; null when all have been handed out.
-  CommandDescriptor* Next() override;
-
-  /// As Next, without waiting: null also when no command may run yet.
-  CommandDescriptor* TryNext();
+  CommandDescriptor* Next() override { return variables_.AwaitReady(); }
 
  private:
-  CommandDescriptor* TakeReady();
-  bool AllStarted() const;
-
-  Job& job_;
   JobVariables& variables_;
-  ConcurrentProgressReport progress_;
+  JobProgress progress_;
 };
 
 /// The middle stage: runs one command, with its inputs out of the variables and its outputs back.
+/// In a strict job a command that is given what it can't read fails without running.
 class JobExecutor : public ISimplePipelineProcess<CommandDescriptor> {
  public:
-  explicit JobExecutor(JobVariables& variables) : variables_(variables) {}
+  JobExecutor(JobVariables& variables, JobChecks checks) : variables_(variables), checks_(checks) {}
 
   bool IsParallel() const override { return true; }
   bool IsOrdered() const override { return false; }
@@ -86,6 +88,7 @@ class JobExecutor : public ISimplePipelineProcess<CommandDescriptor> {
 
  private:
   JobVariables& variables_;
+  const JobChecks checks_;
 };
 
 /// The last stage: retires the command.
@@ -95,6 +98,10 @@ class JobFinisher : public IPipelineWriter<CommandDescriptor> {
 
   /// False for null.
   bool Write(CommandDescriptor* descriptor) override;
+
+  /// Retires the command and gives the next that may run, as JobStarter::Next; null when none may
+  /// run now. After it the job may be gone.
+  CommandDescriptor* WriteAndTake(CommandDescriptor& descriptor);
 
  private:
   JobVariables& variables_;

@@ -37,6 +37,11 @@ void NamedPipe::StopListening() {
   if (listener_ != nullptr) listener_->Stop();
 }
 
+void NamedPipe::FinishAnswers() {
+  connected_ = false;
+  if (listener_ != nullptr) listener_->Finish();
+}
+
 int NamedPipe::GetClientProcess() const {
   return connected_ ? listener_->GetClientProcess() : 0;
 }

@@ -50,6 +50,10 @@ class VEXG_EXPORT NamedPipe : public Lockable {
   /// Server side: has Create and Listen give false from now on.
   void StopListening();
 
+  /// Server side: ends the exchange before, and gives clients that go on reading what is left of
+  /// their answers, at the end of the server.
+  void FinishAnswers();
+
   /// Server side: the process of the client that Listen gave.
   int GetClientProcess() const;
 

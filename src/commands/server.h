@@ -1,5 +1,6 @@
 #pragma once
 
+#include "commands/catalog_session.h"
 #include "commands/named_pipe.h"
 #include "foundation/thread.h"
 
@@ -15,24 +16,44 @@ inline constexpr const char* kErrorWord = "@ERROR";    ///< the answer when ther
 class VEXG_EXPORT Server : public SimpleThread {};
 
 /// Serves one client over a private pipe: each message is a job document, which is run to its end
-/// and answered by its result document. It ends with "@QUIT", or with the client's process.
+/// and answered by its result document. It ends with "@QUIT", or with the client's process. The end
+/// of the process that sent a job raises the job's abort flag.
+///
+/// Failure: a message that memory is too short for is answered by "@ERROR", and the server goes on.
+///          A result document that is longer than a message may be is answered by a short one that
+///          says so.
 class VEXG_EXPORT PipeServer : public Server {
  public:
-  /// @param name  of the private pipe.
-  explicit PipeServer(const String& name) : pipe_(name) {}
+  /// @param name    of the private pipe.
+  /// @param client  number of the process whose end ends the server.
+  PipeServer(const String& name, int client);
 
   /// Takes the pipe's name, so that the client can connect before Run has begun.
-  /// @param clientProcess  whose end ends the server.
-  /// @return false when the name can't be had, or the process has gone.
-  bool Open(int clientProcess);
+  /// @return false when the name can't be had, or the client's process has gone.
+  bool Open();
   platform::PipeFault GetFault() const { return pipe_.GetFault(); }
+
+  /// Closes at the end what the client's jobs have opened and not closed.
+  void ReleaseOnQuit() { releaseOnQuit_ = true; }
 
   void Run() override;
 
+  /// Ends the server from another thread: it takes no further message, and ends after the one that
+  /// it is at.
+  void EndNow();
+
+  /// Changes the length of the longest answer, for tests.
+  void SetMaxAnswer(std::size_t bytes) { maxAnswer_ = bytes; }
+
  private:
+  bool Serve();
   bool Answer(const String& request);
+  void RunAndReply(const String& document);
 
   NamedPipe pipe_;
+  catalog::Session session_;
+  bool releaseOnQuit_ = false;
+  std::size_t maxAnswer_;
 };
 
 using PipeServerPtr = Pointer<PipeServer>;
@@ -59,6 +80,10 @@ class VEXG_EXPORT PipeServerDispatch : public ServerDispatch {
   bool Open();
   platform::PipeFault GetFault() const { return pipe_.GetFault(); }
 
+  /// Has the private servers that are made from now on close at their end what their clients have
+  /// opened and not closed; else it stays open, for any client to use and to close.
+  void SetReleaseOnQuit(bool release) { releaseOnQuit_ = release; }
+
   void Run() override;
   void Stop() override;
 
@@ -66,11 +91,13 @@ class VEXG_EXPORT PipeServerDispatch : public ServerDispatch {
   void EndNow();
 
  private:
+  bool Serve();
   bool StartServer(int clientProcess, String& serverName);
 
   String name_;
   NamedPipe pipe_;
   unsigned nextServer_ = 0;
+  bool releaseOnQuit_ = false;
 };
 
 /// The one dispatcher of the process. The first call makes it, under that name; later calls give
@@ -79,6 +106,10 @@ VEXG_EXPORT ServerDispatch& GetServerDispatch(const String& name);
 
 /// Raises the abort flag of every job that the private servers of this process are running.
 VEXG_EXPORT void AbortServedJobs();
+
+/// Ends all private servers of this process: they take no further message. Blocks until the jobs
+/// that are running have ended and the servers are gone. For a host whose dispatcher has ended.
+VEXG_EXPORT void EndServers();
 
 /// Blocks until no private server of this process is in the middle of a job.
 VEXG_EXPORT void WaitServedJobs();

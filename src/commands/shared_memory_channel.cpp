@@ -28,6 +28,10 @@ unsigned char* SharedMemory::GetData() const {
   return block_ != nullptr ? block_->GetData() : nullptr;
 }
 
+bool SharedMemory::WasCut() const {
+  return block_ != nullptr && block_->WasCut();
+}
+
 bool IsChannelElement(const String& element) {
   return element == "SHMIPC" || element == "ORVAIPC" || element == "TQFProcessIPC";
 }

@@ -20,13 +20,18 @@ class VEXG_EXPORT SharedMemory {
   SharedMemory& operator=(const SharedMemory&) = delete;
 
   /// Opens the block; a view that is open already is closed first.
-  /// @return false when there is no such block, or it is smaller than the size asked for.
+  /// @return false when this user has no such block, it is smaller than the size asked for, or
+  ///         memory for all of it can't be had.
   bool Open();
 
   /// First byte of the view; null when it isn't open.
   unsigned char* GetData() const;
   const String& GetName() const { return name_; }
   unsigned GetSize() const { return size_; }
+
+  /// True once the block turned out to have become shorter than the view, whose bytes are then this
+  /// process's own.
+  bool WasCut() const;
 
  private:
   String name_;

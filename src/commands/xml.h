@@ -56,10 +56,11 @@ class VEXG_EXPORT XMLElement {
   Deque<XMLElementPtr> children;
 };
 
-/// The root of a document to write; it has neither attributes nor text.
+/// The root of a document to write; it has no text.
 struct XMLDocumentRoot {
   String name;
   Deque<XMLElementPtr> children;
+  Map<String, String> attributes;  ///< none in the documents that have always been written
 };
 
 /// Writes a tree as an XML document in UTF-8, on one line. A character that XML can't carry is

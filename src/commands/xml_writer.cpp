@@ -59,14 +59,18 @@ class TreeWriter {
     formatter_ << XMLFormatter::NoEscapes << u"</" << Units(name) << u'>';
   }
 
-  void Element(const XMLElement& element) {
-    Open(element.name);
-    for (const auto& [name, value] : element.attributes) {
+  void Attributes(const Map<String, String>& attributes) {
+    for (const auto& [name, value] : attributes) {
       if (!XMLChar1_0::isValidName(Units(name))) throw std::invalid_argument("not an XML name");
       formatter_ << XMLFormatter::NoEscapes << u' ' << Units(name) << u"=\""
                  << XMLFormatter::AttrEscapes << Carried(value).c_str() << XMLFormatter::NoEscapes
                  << u'"';
     }
+  }
+
+  void Element(const XMLElement& element) {
+    Open(element.name);
+    Attributes(element.attributes);
     Children(element.name, element.children, element.text);
   }
 
@@ -95,6 +99,7 @@ String XMLSimpleWriter::Write(const XMLDocumentRoot& root) {
     if (!runtime.IsReady()) throw std::runtime_error("the library is being unloaded");
     TreeWriter writer;
     writer.Open(root.name);
+    writer.Attributes(root.attributes);
     writer.Children(root.name, root.children, String());
     return writer.Text();
   } catch (...) {

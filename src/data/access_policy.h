@@ -16,6 +16,7 @@ struct AccessPolicy {
   bool virtualFiles = true;  ///< names of files inside other files, or that stand for no file
   bool memory = true;        ///< names of memory addresses
   bool indirect = true;      ///< formats whose files name further files to read
+  bool special = true;       ///< devices, pipes and sockets, whose opening may never end
 };
 
 /// Takes over a policy for the process, before the first source is opened. False, with the fault
@@ -24,6 +25,16 @@ VEXG_EXPORT bool SetAccessPolicy(const AccessPolicy& policy);
 
 /// The policy in force, its roots resolved.
 VEXG_EXPORT AccessPolicy GetAccessPolicy();
+
+/// True when the process may reach the file at `path`, which may be a link and need not exist: it
+/// lies in one of the roots once all links are followed. The library's own folders, as the
+/// environment names them, may be read. Else tells the fault. Whatever opens files asks here, with
+/// the name that it is about to open.
+/// @param writing  the file is to be made, changed, renamed or removed.
+VEXG_EXPORT bool MayReachFile(const std::string& path, bool writing);
+
+/// True when a policy with roots is in force.
+VEXG_EXPORT bool AreFilesLimited();
 
 /// True when sources of the format may be opened and made; else tells the fault.
 VEXG_EXPORT bool MayUseFormat(const FormatRecord& format);
@@ -47,7 +58,9 @@ class VEXG_EXPORT AdmittedSourceScope {
   AdmittedSourceScope& operator=(const AdmittedSourceScope&) = delete;
 };
 
-/// True when all the pieces of a source's name may be used; else tells the fault.
+/// True when a source may be used; else tells the fault. Of the pieces that are no format's key the
+/// first is the source's name: a file, or a name that holds one ("HDF5:"a.h5"://band"). Further
+/// pieces NAME=VALUE are options, whose values count as files only where there is such a file.
 /// @param making  the source is to be made: it need not exist, its folder has to.
 VEXG_EXPORT bool MayUseSource(const Array<String>& connStrings, bool making);
 

@@ -78,36 +78,30 @@ void FreeLocalDataManager() {
 
 DataConnectionPtr DataManager::ConnectDirect(const Array<String>& connStrings,
                                              const GeoRefPtr& geoRef, const MetadataPtr& metadata) {
-  const MutexLock lock = Lock();
   return factory_.ConnectDirect(connStrings, geoRef, metadata);
 }
 
 DataConnectionPtr DataManager::CreateRasterDirect(const Array<String>& connStrings,
                                                   const RasterDef& def) {
-  const MutexLock lock = Lock();
   return factory_.CreateRasterDirect(connStrings, def);
 }
 
 DataConnectionPtr DataManager::CreateVectorDirect(const Array<String>& connStrings,
                                                   const VectorDef& def) {
-  const MutexLock lock = Lock();
   return factory_.CreateVectorDirect(connStrings, def);
 }
 
 DataConnectionPtr DataManager::Connect(const Array<String>& connStrings, const GeoRefPtr& geoRef,
                                        const MetadataPtr& metadata) {
-  const MutexLock lock = Lock();
   return factory_.Connect(connStrings, geoRef, metadata);
 }
 
 DataConnectionPtr DataManager::CreateRaster(const Array<String>& connStrings,
                                             const RasterDef& def) {
-  const MutexLock lock = Lock();
   return factory_.CreateRaster(connStrings, def);
 }
 
 void DataManager::ReleaseConnection(DataConnectionPtr& connection) {
-  const MutexLock lock = Lock();
   connection = DataConnectionPtr();
 }
 

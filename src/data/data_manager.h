@@ -8,7 +8,7 @@
 namespace lumo {
 
 /// Finds the format of a source and opens it, directly or behind a proxy. It is the factory that
-/// the rest of the library sees; a DataManager owns it and calls it under its lock.
+/// the rest of the library sees; a DataManager owns it.
 /// Failure: an empty pointer, with the fault text told.
 class VEXG_EXPORT MtDataConnectionFactory final : public DataConnectionFactory {
  public:
@@ -34,11 +34,15 @@ class VEXG_EXPORT MtDataConnectionFactory final : public DataConnectionFactory {
   DataConnectionPtr CreateVectorDirect(const Array<String>& connStrings, const VectorDef& def);
 };
 
-/// The gate to the plug-ins: one source is being opened at a time. There is one for the process,
-/// and one for each thread that serves a source.
+/// The gate to the plug-ins. There is one for the process, and one for each thread that serves a
+/// source.
+///
+/// Threads: any number may open sources at the same time. No lock is held while a plug-in is
+/// called,
+///          so that a source whose opening takes long, or never ends, holds up nobody else.
 class VEXG_EXPORT DataManager : public ErrorState, public Lockable {
  public:
-  // Each enters the lock and does what the factory's operation of the same name does.
+  // Each does what the factory's operation of the same name does.
   DataConnectionPtr ConnectDirect(const Array<String>& connStrings, const GeoRefPtr& geoRef,
                                   const MetadataPtr& metadata);
   DataConnectionPtr CreateRasterDirect(const Array<String>& connStrings, const RasterDef& def);
@@ -47,7 +51,7 @@ class VEXG_EXPORT DataManager : public ErrorState, public Lockable {
                             const MetadataPtr& metadata);
   DataConnectionPtr CreateRaster(const Array<String>& connStrings, const RasterDef& def);
 
-  /// Empties the pointer under the lock, so that the last reference to a connection goes there.
+  /// Empties the pointer; the last reference to a connection goes here.
   void ReleaseConnection(DataConnectionPtr& connection);
 
  private:

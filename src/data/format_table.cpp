@@ -5,10 +5,12 @@
 #include <exception>
 #include <filesystem>
 #include <mutex>
+#include <vector>
 
 #include "data/data_connection.h"
 #include "foundation/environment.h"
 #include "foundation/fault.h"
+#include "foundation/near_name.h"
 #include "platform/module.h"
 
 namespace lumo {
@@ -168,7 +170,10 @@ void LoadFormat(std::uint32_t row) {
 DataConnectionFactory* FactoryForFormat(const String& name) {
   FormatRecord* const record = FindFormat(name);
   if (record == nullptr) {
-    SetFault(name.ToUTF8() + ": no such format");
+    std::vector<std::string> known;
+    for (const FormatRecord& row : gCdfFormatRecords) known.push_back(row.name.ToUTF8());
+    const std::string text = name.ToUTF8();
+    SetFault(text + ": no such format" + DidYouMean(text, known));
     return nullptr;
   }
   LoadFormat(static_cast<std::uint32_t>(record - gCdfFormatRecords));

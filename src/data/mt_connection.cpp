@@ -43,16 +43,36 @@ MtConnection<Base>::~MtConnection() {
   server_.Stop();
 }
 
+/// @param made  the source is new: its files are what is there afterwards.
+template <typename Base>
+template <typename Open>
+bool MtConnection<Base>::Exchange(const Array<String>& connStrings, bool made, const Open& open) {
+  ForgetReaders();
+  auto opening = std::make_unique<OpenSource>(SourceStamp(connStrings));
+  const bool isOpen = open();
+  if (made) opening = std::make_unique<OpenSource>(SourceStamp(connStrings));
+  const std::lock_guard lock(sourceMutex_);
+  source_ = isOpen ? std::move(opening) : nullptr;
+  return isOpen;
+}
+
+template <typename Base>
+SourceStamp MtConnection<Base>::Stamp() {
+  const std::lock_guard lock(sourceMutex_);
+  return source_ != nullptr ? source_->GetStamp() : SourceStamp();
+}
+
 template <typename Base>
 bool MtConnection<Base>::Connect(const Array<String>& connStrings, const GeoRefPtr& geoRef,
                                  const MetadataPtr&) {
-  ForgetReaders();
-  return detail::CallServer(Server(), 2, "DcSrvCmdDcConnect", false,
-                            [&](DcSrvContext& context, bool& result) {
-                              result = Replace(context, [&](DataManager& manager) {
-                                return manager.ConnectDirect(connStrings, geoRef, MetadataPtr());
+  return Exchange(connStrings, false, [&] {
+    return detail::CallServer(Server(), 2, "DcSrvCmdDcConnect", false,
+                              [&](DcSrvContext& context, bool& result) {
+                                result = Replace(context, [&](DataManager& manager) {
+                                  return manager.ConnectDirect(connStrings, geoRef, MetadataPtr());
+                                });
                               });
-                            });
+  });
 }
 
 template <typename Base>
@@ -63,6 +83,8 @@ void MtConnection<Base>::Disconnect() {
                        result = bool(context.conn);
                        Replace(context, [](DataManager&) { return DataConnectionPtr(); });
                      });
+  const std::lock_guard lock(sourceMutex_);
+  source_.reset();
 }
 
 template <typename Base>
@@ -132,13 +154,14 @@ RasterDef MtRasterDataConnection::RasterDef() {
 
 bool MtRasterDataConnection::CreateRaster(const Array<String>& connStrings,
                                           const lumo::RasterDef& def) {
-  ForgetReaders();
-  return detail::CallServer(Server(), 10, "DcSrvCmdDcrCreateRaster", false,
-                            [&](DcSrvContext& context, bool& result) {
-                              result = Replace(context, [&](DataManager& manager) {
-                                return manager.CreateRasterDirect(connStrings, def);
+  return Exchange(connStrings, true, [&] {
+    return detail::CallServer(Server(), 10, "DcSrvCmdDcrCreateRaster", false,
+                              [&](DcSrvContext& context, bool& result) {
+                                result = Replace(context, [&](DataManager& manager) {
+                                  return manager.CreateRasterDirect(connStrings, def);
+                                });
                               });
-                            });
+  });
 }
 
 MtVectorDataConnection::~MtVectorDataConnection() {
@@ -168,12 +191,14 @@ bool MtVectorDataConnection::CreateVector(const Array<String>& connStrings,
                                           const lumo::VectorDef& def) {
   ForgetReaders();
   if (!MayUseSource(connStrings, true)) return false;
-  return detail::CallServer(Server(), 45, "DcSrvCmdDcrCreateVector", false,
-                            [&](DcSrvContext& context, bool& result) {
-                              result = Replace(context, [&](DataManager& manager) {
-                                return manager.CreateVectorDirect(connStrings, def);
+  return Exchange(connStrings, true, [&] {
+    return detail::CallServer(Server(), 45, "DcSrvCmdDcrCreateVector", false,
+                              [&](DcSrvContext& context, bool& result) {
+                                result = Replace(context, [&](DataManager& manager) {
+                                  return manager.CreateVectorDirect(connStrings, def);
+                                });
                               });
-                            });
+  });
 }
 
 }  // namespace lumo

@@ -1,6 +1,7 @@
 #pragma once
 
 #include "data/dc_srv.h"
+#include "data/open_sources.h"
 #include "data/raster_reader.h"
 #include "data/vector_reader.h"
 
@@ -40,13 +41,22 @@ class MtConnection : public Base {
   /// The source's thread; null when it could not be started.
   DcSrv* Server() { return running_ ? &server_ : nullptr; }
 
+  /// The files of the open source, as they were just before it was opened, or after it was made.
+  SourceStamp Stamp();
+
  protected:
   /// Lets go of the readers of the last source.
   virtual void ForgetReaders() = 0;
 
+  /// What `open` gives, which opens or makes a source in place of the one that is open.
+  template <typename Open>
+  bool Exchange(const Array<String>& connStrings, bool made, const Open& open);
+
  private:
   DcSrv server_;
   bool running_;
+  std::mutex sourceMutex_;
+  std::unique_ptr<OpenSource> source_;  // null while nothing is open
 };
 
 extern template class VEXG_EXPORT MtConnection<RasterDataConnection>;

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <array>
 #include <atomic>
 #include <tuple>
 
@@ -116,12 +117,30 @@ class RasterReader : public BasicRasterReader {
   bool WriteBlock(const SubRect& rect, const Array<unsigned>& bands, unsigned level,
                   Interleave interleave, const Array<T>& pixels, const Array<unsigned char>& state);
 
+  /// How often WriteBlock has handed pixels of a level to the source, well or not.
+  std::uint64_t WriteCount(unsigned level) const { return writes_[PlaceOf(level)]; }
+
+  // For which number of writes to its raster's pixels the values hold that the source stores: 0
+  // for those that it was opened with, UINT64_MAX for none. Whoever has new ones stored tells it.
+  std::uint64_t StatsHoldFor() const { return statsHoldFor_; }
+  void SetStatsHoldFor(std::uint64_t writes) { statsHoldFor_ = writes; }
+  std::uint64_t HistogramsHoldFor() const { return histogramsHoldFor_; }
+  void SetHistogramsHoldFor(std::uint64_t writes) { histogramsHoldFor_ = writes; }
+
  protected:
   RasterDataConnection* connection_;
 
  private:
   static constexpr std::int32_t kNotAsked = -2;
+  static constexpr unsigned kLevels = 32;
+  static unsigned PlaceOf(unsigned level) { return level < kLevels ? level : kLevels - 1; }
+  bool WriteNative(const SubRect& rect, const Array<unsigned>& bands, unsigned level,
+                   const T* pixels, const unsigned char* state);
+
   std::atomic<std::int32_t> nativeInterleave_{kNotAsked};
+  std::array<std::atomic<std::uint64_t>, kLevels> writes_{};
+  std::atomic<std::uint64_t> statsHoldFor_{0};
+  std::atomic<std::uint64_t> histogramsHoldFor_{0};
 };
 
 template <typename T>

@@ -75,8 +75,7 @@ bool RasterReader<T>::WriteBlock(const SubRect& rect, const Array<unsigned>& ban
   if (pixels.GetCount() < elements || state.GetCount() < elements) return false;
   const Interleave native = NativeInterleave();
   if (native == interleave || count == 1) {
-    return WritePixels(rect.left, rect.top, width, height, given, level, pixels.GetData(),
-                       state.GetData());
+    return WriteNative(rect, given, level, pixels.GetData(), state.GetData());
   }
   Array<T> nativePixels;
   Array<unsigned char> nativeState;
@@ -86,8 +85,18 @@ bool RasterReader<T>::WriteBlock(const SubRect& rect, const Array<unsigned>& ban
                            height, count, sizeof(T)) &&
          ConvertInterleave(state.GetData(), interleave, nativeState.GetData(), native, width,
                            height, count, 1) &&
-         WritePixels(rect.left, rect.top, width, height, given, level, nativePixels.GetData(),
-                     nativeState.GetData());
+         WriteNative(rect, given, level, nativePixels.GetData(), nativeState.GetData());
+}
+
+/// Counts once the pixels are there: what was computed meanwhile holds for a number before. A write
+/// that fails may have changed pixels too.
+template <typename T>
+bool RasterReader<T>::WriteNative(const SubRect& rect, const Array<unsigned>& bands, unsigned level,
+                                  const T* pixels, const unsigned char* state) {
+  const bool isWritten =
+      WritePixels(rect.left, rect.top, rect.Width(), rect.Height(), bands, level, pixels, state);
+  ++writes_[PlaceOf(level)];
+  return isWritten;
 }
 
 }  // namespace lumo

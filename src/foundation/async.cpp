@@ -1,5 +1,10 @@
 #include "foundation/async.h"
 
+#include <functional>
+#include <utility>
+
+#include "foundation/thread_roll.h"
+
 namespace lumo {
 namespace {
 
@@ -12,6 +17,20 @@ void RunAsync(const AsyncPtr& work) {
   }
   work->Finish();
 }
+
+/// An abort flag that wakes those who wait for work that it keeps from being started.
+class WakingAbortFlag final : public StandardAbortFlag {
+ public:
+  explicit WakingAbortFlag(std::function<void()> wake) : wake_(std::move(wake)) {}
+
+  void Set(const bool& abort) override {
+    StandardAbortFlag::Set(abort);
+    wake_();  // once the flag can be seen
+  }
+
+ private:
+  std::function<void()> wake_;
+};
 
 /// The queue of the process with the thread that serves it.
 class QueueExecutor {
@@ -35,14 +54,19 @@ class QueueExecutor {
 
     void Run() override {
       SetRunning();
+      ThreadRoll::Get().Stay();
       while (!StopRequested()) {
         AsyncPtr work;
         queue_.Pop(work);
         if (work.IsNull()) continue;
-        if (work->IsAborted()) {
-          work->Drop();
-        } else {
-          RunAsync(work);
+        try {
+          if (work->IsAborted()) {
+            work->Drop();
+          } else {
+            RunAsync(work);
+          }
+        } catch (...) {
+          // Of an observer's; the next item is not to suffer from it.
         }
       }
     }
@@ -148,7 +172,11 @@ void AggragateAsyncCallback::OnProgress(double progress) {
 AggragateAsync::AggragateAsync(unsigned children, const AsyncCallbackPtr& callback)
     : children_(ArrayDims(children)),
       childCallbacks_(ArrayDims(children)),
-      sharedAbort_(new StandardAbortFlag),
+      sharedAbort_(new WakingAbortFlag([this] {
+        for (const AsyncPtr& child : children_) {
+          if (!child.IsNull()) child->Drop();
+        }
+      })),
       outerCallback_(callback),
       progress_(GetIPC().progress, callback, children) {
   for (unsigned i = 0; i < childCallbacks_.GetCount(); ++i) {

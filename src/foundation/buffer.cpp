@@ -114,9 +114,10 @@ bool BasicBuffer::TakeHeaderAway() {
   return true;
 }
 
-void BasicBuffer::ForgetChanges() {
-  changedFrom_ = UINT64_MAX;
-  changedTo_ = 0;
+void BasicBuffer::ForgetLent() {
+  lentFrom_ = UINT64_MAX;
+  lentTo_ = 0;
+  flushed_.clear();
 }
 
 bool BasicBuffer::Flush() {
@@ -125,15 +126,21 @@ bool BasicBuffer::Flush() {
     SetErrorState(BufferWarningReadOnly());
     return true;
   }
-  if (changedFrom_ >= changedTo_) return true;
+  if (lentFrom_ >= lentTo_) return true;
+  const unsigned char* const first = &window_[InWindowBytes(lentFrom_)];
+  const std::size_t bytes = InWindowBytes(lentTo_) - InWindowBytes(lentFrom_);
+  const bool isInFile = flushedFrom_ == lentFrom_ && flushed_.size() == bytes &&
+                        std::equal(flushed_.begin(), flushed_.end(), first);
+  if (isInFile) return true;
   if (!TakeHeaderAway()) return false;
   std::string why;
-  const std::size_t bytes = (changedTo_ - changedFrom_) * elementSize_;
-  if (!file_->Write(PlaceOf(changedFrom_), &window_[(changedFrom_ - windowStart_) * elementSize_],
-                    bytes, &why)) {
-    return Fail(ObjectErrorIO(), why);
+  if (!file_->Write(PlaceOf(lentFrom_), first, bytes, &why)) return Fail(ObjectErrorIO(), why);
+  try {
+    flushed_.assign(first, first + bytes);
+    flushedFrom_ = lentFrom_;
+  } catch (const std::bad_alloc&) {
+    flushed_.clear();  // and the next flush writes them once more
   }
-  ForgetChanges();
   countIsStale_ = true;
   return true;
 }
@@ -149,7 +156,7 @@ bool BasicBuffer::MoveTo(std::uint64_t index) {
   }
   windowStart_ = pageStart > kMargin ? pageStart - kMargin : 0;
   windowCount_ = pageStart + reach - windowStart_;
-  ForgetChanges();
+  ForgetLent();
   if (LoadWindow()) return true;
   windowCount_ = 0;
   return false;

@@ -82,9 +82,9 @@ class VEXG_EXPORT BasicBuffer : public Object {
     return reinterpret_cast<T*>(window_.get())[index - windowStart_];
   }
 
-  void MarkChanged(std::uint64_t index) {
-    if (index < changedFrom_) changedFrom_ = index;
-    if (index >= changedTo_) changedTo_ = index + 1;
+  void MarkLent(std::uint64_t index) {
+    if (index < lentFrom_) lentFrom_ = index;
+    if (index >= lentTo_) lentTo_ = index + 1;
   }
 
  private:
@@ -94,7 +94,10 @@ class VEXG_EXPORT BasicBuffer : public Object {
   void OpenFile(const std::string& path);
   bool LoadWindow();
   bool TakeHeaderAway();
-  void ForgetChanges();
+  void ForgetLent();
+  std::size_t InWindowBytes(std::uint64_t index) const {
+    return static_cast<std::size_t>(index - windowStart_) * elementSize_;
+  }
   bool HeaderIsDue() const { return headerIsAway_ || header_ != knownHeader_; }
   std::uint64_t PlaceOf(std::uint64_t index) const { return header_.size() + index * elementSize_; }
 
@@ -108,8 +111,12 @@ class VEXG_EXPORT BasicBuffer : public Object {
   std::unique_ptr<unsigned char[]> window_;
   std::uint64_t windowStart_ = 0;
   std::uint64_t windowCount_ = 0;  // 0: none was loaded yet
-  std::uint64_t changedFrom_ = UINT64_MAX;
-  std::uint64_t changedTo_ = 0;
+  // Elements to which the owner may hold references that write, until the window moves.
+  std::uint64_t lentFrom_ = UINT64_MAX;
+  std::uint64_t lentTo_ = 0;
+  // What is in the file of the elements that were lent when the window was last flushed.
+  std::vector<unsigned char> flushed_;
+  std::uint64_t flushedFrom_ = 0;
   std::uint64_t count_ = 0;
   bool countIsStale_ = true;
   bool headerIsAway_ = false;  // there are zeros in its place in the file
@@ -154,10 +161,12 @@ class Buffer final : public BasicBuffer {
       : BasicBuffer(path, dims, kPageSize, kCreate,
                     std::is_same_v<T, unsigned> ? kLargeHeaderSize : kHeaderSize, sizeof(T)) {}
 
-  /// An element to write. The reference is good until an element outside the window is touched.
+  /// An element to write. The reference is good until an element outside the window is touched;
+  /// Count and Flush leave it good, and what is written through it afterwards goes to the file with
+  /// the next of them.
   T& Ref(std::uint64_t index) {
     if (!Holds(index) && !MoveTo(index)) return Nowhere();
-    MarkChanged(index);
+    MarkLent(index);
     return InWindow<T>(index);
   }
 

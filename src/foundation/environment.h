@@ -61,4 +61,15 @@ class VEXG_EXPORT EnvironmentImpl : public Context {};
 /// The one environment of the process, made at the first call and never destroyed.
 VEXG_EXPORT EnvironmentImpl& GetGlobalEnvironmentImpl();
 
+/// Fills the directories of the environment that nobody has set, as far as they can be found, for a
+/// program that has no surroundings of its own to tell of:
+///   kBinDirectory   the folder of this library, where its plug-ins lie;
+///   kMdfDirectory   "share/vexg/mdf" as it is built and installed beside the library;
+///   kXmlDirectory   "share/vexg";
+///   kGdalDirectory  $GDAL_DATA, else "share/gdal" beside the library or in /usr;
+///   kPeDirectory    "share/vexg/pedata", else "vexg/pedata" in $XDG_DATA_HOME or ~/.local/share:
+///                   making the second switches on the projection log of one user.
+/// A host calls it once, from one thread, before the first operation.
+VEXG_EXPORT void InitEnvironment();
+
 }  // namespace lumo

@@ -2,6 +2,8 @@
 
 #include <utility>
 
+#include "foundation/near_name.h"
+
 namespace lumo {
 namespace {
 
@@ -10,7 +12,8 @@ thread_local String tFault;
 }  // namespace
 
 void SetFault(const String& text) {
-  tFault = text;
+  // Names of files may hold anything, and the text goes to terminals and into lines.
+  tFault = text.GetLength() != 0 ? String(Printable(text.ToUTF8())) : text;
 }
 
 String TakeFault() {

@@ -2,16 +2,34 @@
 
 #include <utility>
 
+#include "foundation/thread_roll.h"
+
 namespace lumo {
+namespace {
+
+/// Runs the body of a thread. An exception ends there, and with it the thread, not the process.
+void RunGuarded(std::function<void()>& body) {
+  try {
+    body();
+  } catch (...) {
+    // Whoever waits for the thread's work sees that it isn't done; there is nobody else to tell.
+  }
+  body = nullptr;  // lets go of what it holds before the thread leaves
+}
+
+}  // namespace
 
 Thread::~Thread() {
-  if (thread_.joinable()) thread_.detach();
+  if (thread_.joinable()) ThreadRoll::Get().Keep(std::move(thread_));
 }
 
 bool Thread::Start(std::function<void()> body) {
   try {
-    if (thread_.joinable()) thread_.detach();
-    thread_ = std::thread(std::move(body));
+    if (thread_.joinable()) ThreadRoll::Get().Keep(std::move(thread_));
+    thread_ = std::thread([body = std::move(body)]() mutable {
+      RunGuarded(body);
+      ThreadRoll::Get().Leave();
+    });
     return true;
   } catch (...) {
     return false;
@@ -40,7 +58,11 @@ void SimpleThread::WaitEnded() const {
 
 bool StartThread(const SimpleThreadPtr& thread) {
   return Thread().Start([thread] {
-    thread->Run();
+    try {
+      thread->Run();
+    } catch (...) {
+      // It ends as one whose Run has returned.
+    }
     thread->End();
   });
 }

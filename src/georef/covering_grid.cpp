@@ -8,14 +8,15 @@ namespace lumo {
 namespace {
 
 /// A net of points over a raster, its edges among them.
-Array<double> NetOf(unsigned samples, unsigned lines) {
+/// @param corner  the pixel coordinates of the first pixel's corner.
+Array<double> NetOf(unsigned samples, unsigned lines, double corner) {
   constexpr unsigned kSteps = 40;
   Array<double> points{ArrayDims((kSteps + 1) * (kSteps + 1), 2)};
   double* at = points.GetData();
   for (unsigned j = 0; j <= kSteps; ++j) {
     for (unsigned i = 0; i <= kSteps; ++i) {
-      *at++ = samples * (static_cast<double>(i) / kSteps);
-      *at++ = lines * (static_cast<double>(j) / kSteps);
+      *at++ = corner + samples * (static_cast<double>(i) / kSteps);
+      *at++ = corner + lines * (static_cast<double>(j) / kSteps);
     }
   }
   return points;
@@ -27,7 +28,8 @@ GeoRefPtr CoveringGrid(const GeoRef& source, const CoordSys& system, double pixe
   if (source.Samples() == 0 || source.Lines() == 0) return {};
   const GeoRefPtr grid(new StdGeoRef);
   grid->SetCoordinateSystem(system);
-  Array<double> points = NetOf(source.Samples(), source.Lines());
+  Array<double> points =
+      NetOf(source.Samples(), source.Lines(), source.GetType() == GeoRef::kRpc ? -0.5 : 0.0);
   source.PixelToMap(points);
   if (!source.CoordinateSystem().IsEqual(system)) source.MapToMap(points, *grid);
   MapRect rect{HUGE_VAL, HUGE_VAL, -HUGE_VAL, -HUGE_VAL};

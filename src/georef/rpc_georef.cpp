@@ -287,14 +287,24 @@ GeoRefPtr RpcGeoRef::ResampledGeoRef(double pixelSizeX, double pixelSizeY) const
   const GeoRefPtr owner(resampled);
   const double fx = pixelSizeX / pixelSizeX_;
   const double fy = pixelSizeY / pixelSizeY_;
-  resampled->rpc_.sampleOffset /= fx;
-  resampled->rpc_.sampleScale /= fx;
-  resampled->sampleOffset_ /= fx;
-  resampled->rpc_.lineOffset /= fy;
-  resampled->rpc_.lineScale /= fy;
-  resampled->lineOffset_ /= fy;
+  resampled->Divide(fx, fy);
   resampled->SetDimensions(Truncated(samples_ / fx), Truncated(lines_ / fy));
   return owner;
+}
+
+void RpcGeoRef::Divide(double factorX, double factorY) {
+  rpc_.sampleOffset /= factorX;
+  rpc_.sampleScale /= factorX;
+  sampleOffset_ /= factorX;
+  rpc_.lineOffset /= factorY;
+  rpc_.lineScale /= factorY;
+  lineOffset_ /= factorY;
+}
+
+void RpcGeoRef::Resample(double factorX, double factorY) {
+  if (rpc_.lineOffset == RpcCoefficients::kNeverSet) return;
+  Divide(factorX, factorY);
+  SetDimensions(samples_, lines_);
 }
 
 void RpcGeoRef::SetCoefficients(const RpcCoefficients& coefficients) {

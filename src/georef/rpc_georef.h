@@ -75,6 +75,8 @@ class VEXG_EXPORT RpcGeoRef : public GeoRef {
   double LineScale() const { return lineScale_; }
   /// Origin of a subset, taken off the model's pixel, and the factors that come after that.
   void SetSubset(double sampleOffset, double lineOffset, double sampleScale, double lineScale);
+  /// Divides samples and lines of all positions by two factors. The size of the raster stays.
+  void Resample(double factorX, double factorY);
 
   const ElevationModelPtr& Dem() const { return dem_; }
   double DemHeightOffset() const { return demHeightOffset_; }
@@ -92,6 +94,7 @@ class VEXG_EXPORT RpcGeoRef : public GeoRef {
 
   bool CanConvert(Array<double>& points) const;
   MapRect GroundExtent() const;
+  void Divide(double factorX, double factorY);
   bool Carry(Array<double>& points, const CoordSys& from, const CoordSys& to) const;
 
   RpcCoefficients rpc_;

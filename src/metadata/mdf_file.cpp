@@ -99,6 +99,10 @@ Fault EntryDraft::TakeFormat(const std::string& name, std::u16string_view value)
     format_.sectionStarts.emplace(value);
   } else if (name == "frmt.end") {
     format_.sectionEnds.emplace(value);
+  } else if (name == "frmt.text") {
+    const std::u16string word = ToLower(value);
+    if (word != u"pieces" && word != u"joined") return "Invalid text value.";
+    format_.joinsTexts = word == u"joined";
   } else {
     return "Unknown mdf property.";
   }

@@ -20,6 +20,8 @@ struct MdfFormat {
   char16_t del = kNone;     ///< stands around values, such as a quote
   bool blankLists = false;  ///< values of entries with a count other than 1 may be lists
                             ///< that only blanks separate
+  bool joinsTexts = false;  ///< of XML: what stands between two tags is one text, and not as many
+                            ///< as the parser hands on
   std::set<std::u16string> sectionStarts;  ///< names that open a section, in upper case
   std::set<std::u16string> sectionEnds;    ///< names that close one
   String input = "UGH";  ///< the format's word, for what the parser says of itself

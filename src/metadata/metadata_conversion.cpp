@@ -2,6 +2,7 @@
 
 #include <algorithm>
 
+#include "metadata/metadata_parse_log.h"
 #include "metadata/metadata_text.h"
 #include "metadata/metadata_types.h"
 
@@ -31,6 +32,16 @@ std::vector<std::u16string_view> TokensOf(std::u16string_view text, const MdfEnt
   return SplitList(text, format);
 }
 
+/// True for an integer whose leading 0 makes it octal, and that a digit of 8 or 9 ends. It reads as
+/// what stands before that digit.
+/// @param read  how much of it was read.
+bool IsCutOctal(std::u16string_view token, std::size_t read) {
+  const std::u16string_view number = Trimmed(token, kBlanks);
+  const std::size_t first = number.find_first_not_of(u"+-");
+  return first != number.npos && number[first] == u'0' && read < token.size() &&
+         (token[read] == u'8' || token[read] == u'9');
+}
+
 template <typename T>
 bool ReadElement(std::u16string_view token, T& element) {
   if constexpr (std::is_same_v<T, String>) {
@@ -43,8 +54,14 @@ bool ReadElement(std::u16string_view token, T& element) {
     return true;
   } else {
     std::uint64_t value = 0;
-    if (ReadUnsigned(token, value) == 0) return false;
+    const std::size_t read = ReadUnsigned(token, value);
+    if (read == 0) return false;
     element = static_cast<T>(value);
+    if (IsCutOctal(token, read)) {
+      MetadataParseLog::Instance().Write(
+          MetadataParseLog::kErrors, "Mdf Translate - Warning: (%s) is octal up to (%s) \n",
+          ToString(token).ToUTF8().c_str(), ToString(token.substr(0, read)).ToUTF8().c_str());
+    }
     return true;
   }
 }

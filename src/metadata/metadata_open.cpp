@@ -2,6 +2,7 @@
 
 #include "foundation/environment.h"
 #include "foundation/fault.h"
+#include "foundation/near_name.h"
 #include "metadata/metadata.h"
 #include "metadata/metadata_formats.h"
 #include "metadata/metadata_parse_log.h"
@@ -43,7 +44,9 @@ const MetadataFormat* CheckStrings(const Array<String>& strings) {
   }
   const MetadataFormat* const format = FindMetadataFormat(strings[0]);
   if (format == nullptr) {
-    FailWith("\"" + word + "\" is no metadata format",
+    std::vector<std::string> known;
+    for (const MetadataFormat& row : GetMetadataFormats()) known.push_back(row.word);
+    FailWith("\"" + word + "\" is no metadata format" + DidYouMean(word, known),
              "Metadata::Open failed. Invalid format connection string: (%s)\n", word.c_str());
   }
   return format;

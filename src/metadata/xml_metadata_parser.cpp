@@ -54,11 +54,13 @@ void LogException(const char* what, const XMLCh* message) {
 /// Hears the events of the XML library.
 class MDXmlHandler final : public xercesc::DefaultHandler {
  public:
-  explicit MDXmlHandler(MetadataContainer& collection) : writer_(collection) {}
+  MDXmlHandler(MetadataContainer& collection, bool joinsTexts)
+      : writer_(collection), joinsTexts_(joinsTexts) {}
 
   void startElement(const XMLCh* const, const XMLCh* const, const XMLCh* const qname,
                     const xercesc::Attributes& attributes) override {
     if (writer_.Depth() >= kMaxDepth) throw RefusedDocument{"elements are nested too deep"};
+    PutPieces();
     writer_.StartElement(qname);
     for (XMLSize_t i = 0; i < attributes.getLength(); ++i) {
       const String value(attributes.getValue(i));
@@ -67,13 +69,17 @@ class MDXmlHandler final : public xercesc::DefaultHandler {
   }
 
   void endElement(const XMLCh* const, const XMLCh* const, const XMLCh* const) override {
+    PutPieces();
     writer_.EndElement();
   }
 
   void characters(const XMLCh* const units, const XMLSize_t count) override {
     const std::u16string_view text(units, count);
-    if (text.find_first_not_of(u"\t\n ") == text.npos) return;
-    Note(writer_.PutText(Cut(text)));
+    if (joinsTexts_) {
+      pieces_ += text;
+    } else {
+      Put(text);
+    }
   }
 
   void internalEntityDecl(const XMLCh* const, const XMLCh* const value) override {
@@ -98,6 +104,17 @@ class MDXmlHandler final : public xercesc::DefaultHandler {
  private:
   static String Cut(std::u16string_view text) { return ToString(Trimmed(text, u" \t\r\n")); }
 
+  void Put(std::u16string_view text) {
+    if (text.find_first_not_of(u"\t\n ") == text.npos) return;
+    Note(writer_.PutText(Cut(text)));
+  }
+
+  /// Puts what has come since the last tag.
+  void PutPieces() {
+    Put(pieces_);
+    pieces_.clear();
+  }
+
   void Note(bool stored) {
     if (stored) return;
     LogError({"Xml Parser: No place for a value of: (", ToString(writer_.Path()).ToUTF8(), ") \n"});
@@ -112,6 +129,8 @@ class MDXmlHandler final : public xercesc::DefaultHandler {
   }
 
   XmlPathWriter writer_;
+  const bool joinsTexts_;
+  std::u16string pieces_;  // of text since the last tag, where they are joined
   std::string firstError_;
 };
 
@@ -211,7 +230,7 @@ bool XmlMetadataParser::ParseDocument(const std::string& bytes) {
   const std::string name = isText ? "the document" : input_.ToUTF8();
   const XMLRuntime runtime;
   if (!runtime.IsReady()) return false;
-  MDXmlHandler handler(collection_);
+  MDXmlHandler handler(collection_, format_.joinsTexts);
   std::string fault;
   try {
     xercesc::SecurityManager security;

@@ -1,14 +1,19 @@
 #pragma once
 
+#include <memory>
+#include <optional>
+
 #include "raster/raster_def.h"
 #include "views/computed_raster.h"
+#include "views/warp_map.h"
 
 namespace lumo {
 
 /// Shows the area that two geo-referenced rasters have in common, as pixels of the first one on its
-/// grid, moved to the corner of the area. A pixel is valid where it is in both. Statistics and
-/// histograms are the view's own, of the pixels valid in both. Exists for pairs of one type of
-/// EightTypes.
+/// grid, moved to the corner of the area. Of a first raster that is turned, or has a camera alone,
+/// the grid stays where it is, and the area's pixels are cut out of it. A pixel is valid where it
+/// is in both. Statistics and histograms are the view's own, of the pixels valid in both. Exists
+/// for pairs of one type of EightTypes.
 ///
 /// Both rasters are read to the nearest pixel. A pixel that isn't valid may have any value.
 ///
@@ -47,12 +52,17 @@ class OverlapRaster final : public ComputedRaster<T> {
                   Array<unsigned char>&) override {
     return false;
   }
+  std::uint64_t WriteCount() const override;
 
  private:
   bool SetUp();
+  bool CutInMap(const RasterDef& second);
+  bool CutInPixels(const RasterDef& second);
 
   RasterPtr<U> second_;
   RasterDef def_;
+  std::optional<SubRect> part_;         // pixels of the first raster, where the view has just these
+  std::shared_ptr<const WarpMap> map_;  // to the second raster, where one has a camera alone
 };
 
 extern template class VEXG_EXPORT OverlapRaster<std::uint8_t, std::uint8_t>;

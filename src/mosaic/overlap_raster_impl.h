@@ -1,12 +1,15 @@
 #pragma once
 
 #include <algorithm>
+#include <array>
 #include <cmath>
-#include <optional>
+#include <vector>
 
+#include "data/block_shape.h"
+#include "georef/affine_link.h"
+#include "georef/derived_georef.h"
 #include "mosaic/overlap_raster.h"
 #include "raster/block_strides.h"
-#include "raster/interleave.h"
 #include "tasks/parallel_ranges.h"
 #include "views/reprojection.h"
 
@@ -59,6 +62,76 @@ inline void PixelsOf(const GeoRef& geoRef, const MapRect& rect, unsigned& sample
   };
   samples = span(0);
   lines = span(1);
+}
+
+/// The outline of a raster in the pixels of another one, counted from the corner of the first one.
+/// Points that can't be carried are left out.
+inline std::vector<std::array<double, 2>> OutlineIn(const GeoRef& other, const RasterDef& def) {
+  constexpr unsigned kPieces = 32;  // of an edge
+  const double corners[][2] = {{0, 0}, {1, 0}, {1, 1}, {0, 1}, {0, 0}};
+  const auto shiftOf = [](const GeoRef& model) {
+    return model.GetType() == GeoRef::kRpc ? 0.5 : 0.0;
+  };
+  Array<double> points{ArrayDims(4 * kPieces, 2)};
+  double* at = points.begin();
+  for (unsigned i = 0; i < 4 * kPieces; ++i) {
+    const double part = double(i % kPieces) / kPieces;
+    const auto& [fromX, fromY] = corners[i / kPieces];
+    const auto& [toX, toY] = corners[i / kPieces + 1];
+    *at++ = def.samples * (fromX + (toX - fromX) * part) - shiftOf(*def.geoRef);
+    *at++ = def.lines * (fromY + (toY - fromY) * part) - shiftOf(*def.geoRef);
+  }
+  CarryPixels(*def.geoRef, other, points);
+  std::vector<std::array<double, 2>> outline;
+  for (unsigned i = 0; i + 1 < points.GetCount(); i += 2) {
+    if (!std::isfinite(points[i]) || !std::isfinite(points[i + 1])) continue;
+    outline.push_back({points[i] + shiftOf(other), points[i + 1] + shiftOf(other)});
+  }
+  return outline;
+}
+
+/// The part of a polygon where a coordinate is not below, or not above, a limit (Sutherland and
+/// Hodgman, Reentrant polygon clipping, 1974).
+inline std::vector<std::array<double, 2>> ClipAt(const std::vector<std::array<double, 2>>& polygon,
+                                                 unsigned axis, double limit, bool isLower) {
+  std::vector<std::array<double, 2>> clipped;
+  const auto isInside = [&](const std::array<double, 2>& p) {
+    return isLower ? p[axis] >= limit : p[axis] <= limit;
+  };
+  for (std::size_t i = 0; i < polygon.size(); ++i) {
+    const auto &from = polygon[i], &to = polygon[(i + 1) % polygon.size()];
+    if (isInside(from)) clipped.push_back(from);
+    if (isInside(from) == isInside(to)) continue;
+    const double t = (limit - from[axis]) / (to[axis] - from[axis]);
+    std::array<double, 2> cut = {from[0] + t * (to[0] - from[0]), from[1] + t * (to[1] - from[1])};
+    cut[axis] = limit;
+    clipped.push_back(cut);
+  }
+  return clipped;
+}
+
+/// The pixels of the first raster whose centre lies in the rectangle of its pixels around what it
+/// has in common with the second one; nothing when there are none.
+inline std::optional<SubRect> CommonPixels(const RasterDef& first, const RasterDef& second) {
+  auto outline = OutlineIn(*first.geoRef, second);
+  const double sizes[] = {double(first.samples), double(first.lines)};
+  for (const unsigned axis : {0U, 1U}) {
+    outline = ClipAt(outline, axis, 0, true);
+    outline = ClipAt(outline, axis, sizes[axis], false);
+  }
+  if (outline.empty()) return std::nullopt;
+  unsigned low[2], high[2];
+  for (const unsigned axis : {0U, 1U}) {
+    const auto less = [axis](const auto& a, const auto& b) { return a[axis] < b[axis]; };
+    const auto [least, most] = std::ranges::minmax_element(outline, less);
+    constexpr double kNoise = 0.001;  // of a camera's inverse
+    const double from = std::ceil((*least)[axis] - 0.5 - kNoise);
+    const double to = std::floor((*most)[axis] - 0.5 + kNoise);
+    if (to < from) return std::nullopt;
+    low[axis] = static_cast<unsigned>(std::max(from, 0.0));
+    high[axis] = static_cast<unsigned>(std::min(to, sizes[axis] - 1));
+  }
+  return SubRect(low[0], low[1], high[0], high[1]);
 }
 
 }  // namespace detail
@@ -124,6 +197,21 @@ bool OverlapRaster<T, U>::SetUp() {
   def_ = this->Parent()->GetRasterDef();
   const RasterDef second = second_->GetRasterDef();
   if (def_.geoRef.IsNull() || second.geoRef.IsNull()) return false;
+  const bool isAlongTheMap = def_.geoRef->GetType() != GeoRef::kRpc && def_.geoRef->Rotation() == 0;
+  if (!(isAlongTheMap ? CutInMap(second) : CutInPixels(second))) return false;
+  const bool isCamera =
+      def_.geoRef->GetType() == GeoRef::kRpc || second.geoRef->GetType() == GeoRef::kRpc;
+  if (isCamera) {
+    map_ = std::make_shared<WarpMap>(def_.geoRef, second.geoRef, second.samples, second.lines,
+                                     WarpMap::kUsualTolerance);
+  }
+  return true;
+}
+
+/// Cuts the map rectangle of the first raster to that of the second one. The first pixel lies in
+/// the corner where the first raster's does.
+template <typename T, typename U>
+bool OverlapRaster<T, U>::CutInMap(const RasterDef& second) {
   GeoRef& geoRef = *def_.geoRef;  // a copy of our own
   const std::optional<MapRect> area = detail::ExtentIn(geoRef, def_);
   const std::optional<MapRect> other = detail::ExtentIn(geoRef, second);
@@ -131,7 +219,12 @@ bool OverlapRaster<T, U>::SetUp() {
   const MapRect clipped{std::max(area->minX, other->minX), std::max(area->minY, other->minY),
                         std::min(area->maxX, other->maxX), std::min(area->maxY, other->maxY)};
   if (!(clipped.minX < clipped.maxX && clipped.minY < clipped.maxY)) return false;
-  geoRef.SetTieMap(clipped.minX, clipped.maxY);
+  const double tieX = geoRef.PixelSizeX() > 0 ? clipped.minX : clipped.maxX;
+  const double tieY = geoRef.PixelSizeY() > 0 ? clipped.maxY : clipped.minY;
+  double x = 0, y = 0;
+  if (!geoRef.MapToPixel(tieX, tieY, x, y)) return false;
+  MoveCamera(geoRef, x, y);
+  geoRef.SetTieMap(tieX, tieY);
   geoRef.SetTiePixel(0, 0);
   detail::PixelsOf(geoRef, clipped, def_.samples, def_.lines);
   if (def_.samples == 0 || def_.lines == 0) return false;
@@ -139,9 +232,26 @@ bool OverlapRaster<T, U>::SetUp() {
   return true;
 }
 
+/// Cuts the pixels of the first raster, where its lines don't run along the map, to those that it
+/// has in common with the second one.
+template <typename T, typename U>
+bool OverlapRaster<T, U>::CutInPixels(const RasterDef& second) {
+  part_ = detail::CommonPixels(def_, second);
+  if (!part_) return false;
+  def_.samples = part_->Width();
+  def_.lines = part_->Height();
+  def_.SetGeoRef(PartGeoRef(*def_.geoRef, *part_, Form::kExact));
+  return true;
+}
+
 template <typename T, typename U>
 std::uint64_t OverlapRaster<T, U>::PixelCount(unsigned band, const IPC& ipc) {
   return this->Stats() != nullptr && band < def_.bands ? this->Stats()->PixelCount(band, ipc) : 0;
+}
+
+template <typename T, typename U>
+std::uint64_t OverlapRaster<T, U>::WriteCount() const {
+  return ComputedRaster<T>::WriteCount() + (second_ ? second_->WriteCount() : 0);
 }
 
 template <typename T, typename U>
@@ -166,26 +276,37 @@ bool OverlapRaster<T, U>::GetSubRect(const SubRect& rect, const Array<unsigned>&
   const unsigned lastX = def_.samples - 1, lastY = def_.lines - 1;
   const SubRect cut(std::min(rect.left, lastX), std::min(rect.top, lastY),
                     std::min(rect.right, lastX), std::min(rect.bottom, lastY));
-  const unsigned width = cut.Width(), height = cut.Height(), count = bands.GetCount();
-  const ArrayDims dims = BlockDims(interleave, width, height, count);
-  if (dims.count != std::uint64_t{width} * height * count) return false;
-  if (!pixels.Resize(dims) || !state.Resize(dims)) return false;
+  const BlockShape block(cut, bands, interleave);
+  if (!block.Size(pixels, state)) return false;
 
-  constexpr auto kNearest = PyramidResamplingMethod::kNearest;
   Array<T> firstPixels;
   Array<U> secondPixels;
   Array<unsigned char> firstState, secondState;
-  const auto read = [&]<typename P>(Raster<P>& raster, Array<P>& into, Array<unsigned char>& of) {
-    const Reprojection<P> reprojection(def_.geoRef, ReprojectionMethod::kPolynomial, kNearest);
-    return reprojection.Run(raster, cut, bands, Interleave::BIP, into, of) !=
+  const auto read = [&]<typename P>(Raster<P>& raster, const std::shared_ptr<const WarpMap>& map,
+                                    Array<P>& into, Array<unsigned char>& of) {
+    Reprojection<P> reprojection(def_.geoRef, ReprojectionMethod::kPolynomial,
+                                 PyramidResamplingMethod::kNearest);
+    reprojection.SetMap(map);
+    return reprojection.Run(raster, cut, block.bands, Interleave::BIP, into, of) !=
            Reprojection<P>::Outcome::kFailed;
   };
-  if (!read(*this->Parent(), firstPixels, firstState)) return false;
-  if (!read(*second_, secondPixels, secondState)) return false;
+  if (part_) {
+    const SubRect inFirst(cut.left + part_->left, cut.top + part_->top, cut.right + part_->left,
+                          cut.bottom + part_->top);
+    if (!this->Parent()->GetSubRect(inFirst, block.bands, Interleave::BIP, firstPixels,
+                                    firstState)) {
+      return false;
+    }
+  } else if (!read(*this->Parent(), {}, firstPixels, firstState)) {
+    return false;
+  }
+  if (!read(*second_, map_, secondPixels, secondState)) return false;
 
   OverlapRasterGetDataParallel<T> loop(
-      width, height, count, {firstPixels.GetData(), firstState.GetData(), secondState.GetData()},
-      BlockStrides(interleave, width, height, count), pixels.GetData(), state.GetData());
+      block.width, block.height, block.count,
+      {firstPixels.GetData(), firstState.GetData(), secondState.GetData()},
+      BlockStrides(interleave, block.width, block.height, block.count), pixels.GetData(),
+      state.GetData());
   RunParallelFor(loop);
   return true;
 }

@@ -6,17 +6,22 @@
 #include <compare>
 #include <cstring>
 #include <fcntl.h>
+#include <limits>
 #include <list>
 #include <mutex>
+#include <new>
 #include <poll.h>
 #include <set>
 #include <sys/file.h>
+#include <sys/resource.h>
 #include <sys/socket.h>
 #include <sys/stat.h>
 #include <sys/syscall.h>
 #include <sys/un.h>
+#include <utility>
 #include <vector>
 
+#include "platform/clock.h"
 #include "platform/message_frame.h"
 #include "platform/pipe_directory.h"
 
@@ -97,15 +102,47 @@ class SpareDescriptor {
   FileDescriptor spare_ = Reserve();
 };
 
+/// The bytes of the messages that clients have sent to the listeners of the process and that are
+/// not answered yet.
+std::atomic<std::size_t> gIncoming{0};
+
+/// A message's share of gIncoming.
+class IncomingShare {
+ public:
+  IncomingShare() = default;
+  ~IncomingShare() { Clear(); }
+  IncomingShare(const IncomingShare&) = delete;
+  IncomingShare& operator=(const IncomingShare&) = delete;
+
+  /// False when the message is one too many.
+  bool Set(std::size_t bytes, std::size_t limit) {
+    constexpr std::size_t kSmall = std::size_t{64} << 10;  // so that a word gets in at any time
+    gIncoming += bytes - bytes_;
+    bytes_ = bytes;
+    return bytes <= kSmall || gIncoming <= limit;
+  }
+
+  void Clear() {
+    gIncoming -= bytes_;
+    bytes_ = 0;
+  }
+
+ private:
+  std::size_t bytes_ = 0;
+};
+
 /// A client between its connecting and the end of its answer.
 struct Peer {
   FileDescriptor socket;
   FrameReader in;
+  IncomingShare share;
   std::string out;
   std::size_t sent = 0;
   bool answered = false;
+  double lastByte = MonotonicSeconds();  // or when somebody began to listen again
 
   bool IsSending() const { return sent < out.size(); }
+  bool IsIncomplete() const { return !answered && !in.IsWhole(); }
 };
 
 /// A socket bound to a path that nothing looks for, ready for clients, or not open.
@@ -122,6 +159,16 @@ FileDescriptor ListenAt(const std::string& path) {
   if (listen(socket.Get(), SOMAXCONN) == 0) return socket;
   unlink(path.c_str());
   return {};
+}
+
+/// How many clients one listener may have at a time, so that most of the descriptors of the process
+/// are left for what it does.
+unsigned MostClients() {
+  rlimit limit{};
+  if (getrlimit(RLIMIT_NOFILE, &limit) != 0) return std::numeric_limits<unsigned>::max();
+  constexpr rlim_t kShare = 4;
+  const rlim_t share = std::max<rlim_t>(limit.rlim_cur / kShare, 1);
+  return static_cast<unsigned>(std::min<rlim_t>(share, std::numeric_limits<int>::max()));
 }
 
 bool HasLivingServer(const std::string& path) {
@@ -158,6 +205,7 @@ FileDescriptor TakeName(const std::string& path, PipeFault& fault) {
 }  // namespace
 
 struct PipeListener::Impl {
+  ListenerLimits limits;
   PipeFile file;
   FileDescriptor socket;
   FileDescriptor watched;  // a process whose end ends the waiting
@@ -165,12 +213,19 @@ struct PipeListener::Impl {
   std::list<Peer> peers;        // all but the current one
   std::list<Peer> current;      // the client of the exchange, or none
   std::vector<pollfd> entries;  // kept from round to round
+  double waitEnd = MonotonicSeconds();
 
   bool PollRound();
+  int NextTimeout() const;
   void AcceptAll();
+  bool MakeRoom();
+  bool CloseMostSilent();
   void Serve(std::list<Peer>::iterator peer, short events);
+  bool Receive(Peer& peer) const;
+  void CloseIdle();
   void LimitUnread();
   void EndExchange();
+  void Drain();
 };
 
 PipeListener::PipeListener(std::unique_ptr<Impl> impl) : impl_(std::move(impl)) {}
@@ -179,8 +234,11 @@ PipeListener::~PipeListener() {
   OwnPipes::Get().Remove(impl_->file);
 }
 
-std::unique_ptr<PipeListener> PipeListener::Open(const std::string& name, PipeFault& fault) {
+std::unique_ptr<PipeListener> PipeListener::Open(const std::string& name, PipeFault& fault,
+                                                 const ListenerLimits& limits) {
   auto impl = std::make_unique<Impl>();
+  impl->limits = limits;
+  impl->limits.clients = std::min(limits.clients, MostClients());
   impl->file.path = PipePath(name);
   fault = PipeFault::kBadName;
   if (impl->file.path.empty()) return nullptr;
@@ -193,6 +251,9 @@ std::unique_ptr<PipeListener> PipeListener::Open(const std::string& name, PipeFa
 }
 
 bool PipeListener::Wait(std::string& message) {
+  // The time of an exchange, in which nobody listens, is nobody's silence.
+  const double unheard = MonotonicSeconds() - impl_->waitEnd;
+  for (Peer& peer : impl_->peers) peer.lastByte += unheard;
   impl_->EndExchange();
   while (!impl_->stopped) {
     const auto whole = std::find_if(impl_->peers.begin(), impl_->peers.end(),
@@ -200,11 +261,17 @@ bool PipeListener::Wait(std::string& message) {
     if (whole != impl_->peers.end()) {
       impl_->current.splice(impl_->current.end(), impl_->peers, whole);
       message = impl_->current.front().in.Take();
+      impl_->waitEnd = MonotonicSeconds();
       return true;
     }
     if (!impl_->PollRound()) return false;
   }
   return false;
+}
+
+void PipeListener::Finish() {
+  impl_->EndExchange();
+  impl_->Drain();
 }
 
 bool PipeListener::Reply(std::string_view message) {
@@ -235,6 +302,8 @@ void PipeListener::Impl::EndExchange() {
   if (current.empty()) return;
   Peer& peer = current.front();
   peer.answered = true;
+  peer.lastByte = MonotonicSeconds();
+  peer.share.Clear();
   if (peer.IsSending()) {
     peers.splice(peers.end(), current);
     LimitUnread();
@@ -255,15 +324,73 @@ void PipeListener::Impl::LimitUnread() {
   }
 }
 
+/// Gives what is left of answers to clients that go on reading, for the end of the listener.
+void PipeListener::Impl::Drain() {
+  peers.remove_if([](const Peer& peer) { return !peer.answered || !peer.IsSending(); });
+  while (!peers.empty()) {
+    entries.clear();
+    for (const Peer& peer : peers) entries.push_back({peer.socket.Get(), POLLOUT, 0});
+    const int ready =
+        poll(entries.data(), entries.size(), static_cast<int>(limits.drainSeconds * 1000.0));
+    if (ready == 0 || (ready < 0 && errno != EINTR)) return;
+    std::size_t index = 0;
+    for (auto peer = peers.begin(); peer != peers.end(); ++index) {
+      const auto next = std::next(peer);
+      if (entries[index].revents != 0) Serve(peer, entries[index].revents);
+      peer = next;
+    }
+  }
+}
+
+/// Closes the clients that have been silent for too long.
+void PipeListener::Impl::CloseIdle() {
+  const double since = MonotonicSeconds() - limits.idleSeconds;
+  peers.remove_if([&](const Peer& peer) { return peer.IsIncomplete() && peer.lastByte <= since; });
+}
+
+/// Milliseconds until a silent client is to be closed; -1 without one.
+int PipeListener::Impl::NextTimeout() const {
+  const bool isFull = peers.size() >= limits.clients;
+  double first = isFull ? MonotonicSeconds() + 1.0 : -1.0;
+  for (const Peer& peer : peers) {
+    const double end = peer.lastByte + limits.idleSeconds;
+    if (peer.IsIncomplete() && (first < 0.0 || end < first)) first = end;
+  }
+  if (first < 0.0) return -1;
+  return static_cast<int>(std::clamp(first - MonotonicSeconds(), 0.0, 1e6) * 1000.0) + 1;
+}
+
+/// Sees to it that one more client can come in; false when all those that are there are busy.
+bool PipeListener::Impl::MakeRoom() {
+  return peers.size() < limits.clients || CloseMostSilent();
+}
+
+/// Closes the client that has been silent for longest, or has not read its answer; false when there
+/// is none that does so for long.
+bool PipeListener::Impl::CloseMostSilent() {
+  constexpr double kPatience = 1.0;  // s, for a client that has only just connected
+  const double now = MonotonicSeconds();
+  auto most = peers.end();
+  for (auto peer = peers.begin(); peer != peers.end(); ++peer) {
+    if (peer->in.IsWhole()) continue;  // waits for its turn
+    const double patience = peer->answered ? limits.idleSeconds : kPatience;
+    if (now - peer->lastByte < patience) continue;
+    if (most == peers.end() || peer->lastByte < most->lastByte) most = peer;
+  }
+  if (most == peers.end()) return false;
+  peers.erase(most);
+  return true;
+}
+
 /// Waits for one round of events and serves them; false when the waiting is at its end.
 bool PipeListener::Impl::PollRound() {
   entries.clear();
-  entries.push_back({socket.Get(), POLLIN, 0});
+  entries.push_back({MakeRoom() ? socket.Get() : -1, POLLIN, 0});
   entries.push_back({watched.IsOpen() ? watched.Get() : -1, POLLIN, 0});
   for (const Peer& peer : peers) {
     entries.push_back({peer.socket.Get(), static_cast<short>(peer.answered ? POLLOUT : POLLIN), 0});
   }
-  if (poll(entries.data(), entries.size(), -1) < 0) return errno == EINTR;
+  if (poll(entries.data(), entries.size(), NextTimeout()) < 0) return errno == EINTR;
   if (stopped || entries[1].revents != 0) return false;
   std::size_t index = 2;
   for (auto peer = peers.begin(); peer != peers.end(); ++index) {
@@ -272,27 +399,41 @@ bool PipeListener::Impl::PollRound() {
     peer = next;
   }
   if (entries[0].revents != 0) AcceptAll();
+  CloseIdle();
   return true;
 }
 
 void PipeListener::Impl::Serve(std::list<Peer>::iterator peer, short events) {
   bool keep = false;
   if (peer->answered) {
+    const std::size_t before = peer->sent;
     keep = (events & (POLLERR | POLLHUP)) == 0 &&
            SendSome(peer->socket.Get(), peer->out, peer->sent) && peer->IsSending();
+    if (peer->sent != before) peer->lastByte = MonotonicSeconds();
   } else {
-    keep =
-        peer->in.IsWhole() || peer->in.Receive(peer->socket.Get()) != FrameReader::Status::kBroken;
+    keep = peer->in.IsWhole() || Receive(*peer);
   }
   if (!keep) peers.erase(peer);
 }
 
+/// Takes in what a client has sent; false when it is to be closed.
+bool PipeListener::Impl::Receive(Peer& peer) const {
+  try {
+    if (peer.in.Receive(peer.socket.Get()) == FrameReader::Status::kBroken) return false;
+    peer.lastByte = MonotonicSeconds();
+    return peer.share.Set(peer.in.GetReceived(), limits.incomingBytes);
+  } catch (const std::bad_alloc&) {
+    return false;  // the others go on
+  }
+}
+
 void PipeListener::Impl::AcceptAll() {
-  while (true) {
+  while (MakeRoom()) {
     FileDescriptor client(accept4(socket.Get(), nullptr, nullptr, SOCK_NONBLOCK | SOCK_CLOEXEC));
     if (!client.IsOpen()) {
       if (errno == EINTR || errno == ECONNABORTED) continue;
       if (errno != EMFILE && errno != ENFILE) return;
+      if (CloseMostSilent()) continue;
       if (SpareDescriptor::Get().RefuseClient(socket.Get())) continue;
       constexpr int kBreather = 10;  // ms, for descriptors to come back
       poll(nullptr, 0, kBreather);

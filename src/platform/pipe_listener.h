@@ -4,10 +4,25 @@
 
 namespace lumo::platform {
 
+/// What the clients of a listener can hold.
+struct ListenerLimits {
+  double idleSeconds = 30.0;  ///< without a byte, before the first message is whole
+  unsigned clients = 1024;    ///< connected at a time
+  double drainSeconds = 2.0;  ///< without a byte read, for what answers are left after Stop
+  /// Bytes of incoming messages, over all listeners of the process; small messages always get in.
+  std::size_t incomingBytes = 2 * kMaxMessageBytes;
+};
+
 /// The server's end of a pipe. It takes the messages of any number of clients, one exchange after
 /// the other: Wait gives the next message that is whole, Reply answers it. A client that is silent,
 /// slow, or does not read its answer keeps none of the others waiting; one that breaks the rules of
 /// the frame, or belongs to another user, is closed.
+///
+/// What clients can hold is bounded (see ListenerLimits): while Wait runs, a client that has not
+/// sent a whole message and stays silent is closed after a while, and, where there are too many
+/// clients, the one that has been silent for longest. The messages that all listeners of the
+/// process are taking in are bounded together; the client with whose message they would be too many
+/// is closed.
 ///
 /// The name is free again when the object goes, and after the death of the process that had it.
 /// Threads: one thread uses it; only Stop may come from another.
@@ -15,7 +30,8 @@ class VEXG_EXPORT PipeListener {
  public:
   /// Takes the name.
   /// @param fault  [out] why not, when null is returned.
-  static std::unique_ptr<PipeListener> Open(const std::string& name, PipeFault& fault);
+  static std::unique_ptr<PipeListener> Open(const std::string& name, PipeFault& fault,
+                                            const ListenerLimits& limits = {});
 
   ~PipeListener();
 
@@ -37,6 +53,10 @@ class VEXG_EXPORT PipeListener {
 
   /// Has this and every later Wait give false.
   void Stop();
+
+  /// Ends the exchange before, and gives clients that go on reading what is left of their answers;
+  /// for the end of the listener.
+  void Finish();
 
  private:
   struct Impl;

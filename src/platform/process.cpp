@@ -1,5 +1,8 @@
 #include "platform/process.h"
 
+#include <cstdio>
+#include <poll.h>
+#include <signal.h>
 #include <sys/ioctl.h>
 #include <sys/resource.h>
 #include <unistd.h>
@@ -26,6 +29,26 @@ void RaiseDescriptorLimit() {
 
 int ProcessNumber() {
   return getpid();
+}
+
+void SurviveClosedPipes() {
+  signal(SIGPIPE, SIG_IGN);
+}
+
+bool OutputIsClosed() {
+  pollfd entry{STDOUT_FILENO, 0, 0};
+  return poll(&entry, 1, 0) == 1 && (entry.revents & POLLERR) != 0;
+}
+
+void EndOfClosedPipe() {
+  signal(SIGPIPE, SIG_DFL);
+  raise(SIGPIPE);
+  EndProcess(1);
+}
+
+void EndProcess(int code) {
+  std::fflush(nullptr);
+  _exit(code);
 }
 
 }  // namespace lumo::platform

@@ -17,4 +17,17 @@ VEXG_EXPORT void RaiseDescriptorLimit();
 /// Number of this process in the system.
 VEXG_EXPORT int ProcessNumber();
 
+/// Has writing to a pipe that nobody reads any more fail instead of ending the process at once.
+VEXG_EXPORT void SurviveClosedPipes();
+
+/// True when standard output is a pipe that nobody reads any more.
+VEXG_EXPORT bool OutputIsClosed();
+
+/// Ends the process the way writing to a closed pipe does by itself.
+[[noreturn]] VEXG_EXPORT void EndOfClosedPipe();
+
+/// Ends the process at once, whatever its threads are doing; what the standard streams still hold
+/// is written before.
+[[noreturn]] VEXG_EXPORT void EndProcess(int code);
+
 }  // namespace lumo::platform

@@ -13,6 +13,7 @@
 #include <utility>
 
 #include "platform/file_descriptor.h"
+#include "platform/file_gate.h"
 #include "platform/file_moves.h"
 #include "platform/temporary_file.h"
 
@@ -91,7 +92,11 @@ int Transfer(std::uint64_t offset, std::span<const Piece> pieces, Call&& call) {
 }  // namespace
 
 std::unique_ptr<RandomAccessFile> RandomAccessFile::Open(const std::string& path, Access access,
-                                                         std::string* fault) {
+                                                         std::string* fault, Gate gate) {
+  if (gate == Gate::kAsk && !PassesFileGate(path, access == Access::kUpdate, fault)) {
+    errno = EACCES;
+    return nullptr;
+  }
   const int mode = (access == Access::kRead ? O_RDONLY : O_RDWR) | O_CLOEXEC | O_NONBLOCK;
   FileDescriptor file(RetryInterrupted([&] { return open(path.c_str(), mode); }));
   if (!file.IsOpen()) {
@@ -108,6 +113,10 @@ std::unique_ptr<RandomAccessFile> RandomAccessFile::Open(const std::string& path
 
 std::unique_ptr<RandomAccessFile> RandomAccessFile::CreateOrEmpty(const std::string& path,
                                                                   std::string* fault) {
+  if (!PassesFileGate(path, true, fault)) {
+    errno = EACCES;
+    return nullptr;
+  }
   constexpr int kMode = O_RDWR | O_CREAT | O_CLOEXEC | O_NONBLOCK;
   FileDescriptor file(RetryInterrupted([&] { return open(path.c_str(), kMode, kReadableByAll); }));
   if (!file.IsOpen()) {
@@ -125,6 +134,10 @@ std::unique_ptr<RandomAccessFile> RandomAccessFile::CreateOrEmpty(const std::str
 
 std::unique_ptr<RandomAccessFile> RandomAccessFile::Create(const std::string& path,
                                                            std::string* fault) {
+  if (!PassesFileGate(path, true, fault)) {
+    errno = EACCES;
+    return nullptr;
+  }
   constexpr int kMode = O_RDWR | O_CREAT | O_EXCL | O_CLOEXEC;
   FileDescriptor file(RetryInterrupted([&] { return open(path.c_str(), kMode, kReadableByAll); }));
   if (!file.IsOpen()) {

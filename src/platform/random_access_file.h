@@ -35,10 +35,14 @@ class VEXG_EXPORT RandomAccessFile {
     kUpdate,  ///< reading and writing
   };
 
+  /// Whether the file gate (file_gate.h) judges a file, or the caller has had it judged.
+  enum class Gate { kAsk, kPassed };
+
   /// Opens a regular file that exists.
   /// @param path  UTF-8.
   static std::unique_ptr<RandomAccessFile> Open(const std::string& path, Access access,
-                                                std::string* fault = nullptr);
+                                                std::string* fault = nullptr,
+                                                Gate gate = Gate::kAsk);
 
   /// Makes an empty file and opens it for kUpdate. Fails where there is one already.
   static std::unique_ptr<RandomAccessFile> Create(const std::string& path,

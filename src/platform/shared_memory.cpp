@@ -7,6 +7,7 @@
 #include <unistd.h>
 
 #include "platform/file_descriptor.h"
+#include "platform/memory_guard.h"
 
 namespace lumo::platform {
 namespace {
@@ -27,23 +28,41 @@ unsigned char* Map(int file, std::size_t size) {
   return view != MAP_FAILED ? static_cast<unsigned char*>(view) : nullptr;
 }
 
-bool HoldsAtLeast(int file, std::size_t size) {
+/// True for memory of this user's own that is as large as asked for.
+bool IsUsable(int file, std::size_t size) {
   struct stat status {};
-  return fstat(file, &status) == 0 && status.st_size >= 0 &&
-         static_cast<std::size_t>(status.st_size) >= size;
+  return fstat(file, &status) == 0 && S_ISREG(status.st_mode) && status.st_uid == geteuid() &&
+         status.st_size >= 0 && static_cast<std::size_t>(status.st_size) >= size;
+}
+
+/// Has the system give memory for all of a block now: one that only promises it would end in a bus
+/// error where the memory is short. What is there already stays.
+bool Reserve(int file, std::size_t size) {
+  return posix_fallocate(file, 0, static_cast<off_t>(size)) == 0;
 }
 
 }  // namespace
+
+SharedMemoryBlock::SharedMemoryBlock(unsigned char* data, std::size_t size, std::string ownedPath)
+    : data_(data),
+      size_(size),
+      ownedPath_(std::move(ownedPath)),
+      guard_(std::make_unique<MemoryGuard>(data, size)) {}
+
+bool SharedMemoryBlock::WasCut() const {
+  return guard_->WasCut();
+}
 
 std::unique_ptr<SharedMemoryBlock> SharedMemoryBlock::Open(const std::string& name,
                                                            std::size_t size) {
   const std::string path = SystemName(name);
   if (path.empty() || size == 0) return nullptr;
   const FileDescriptor file(shm_open(path.c_str(), O_RDWR, 0));
-  if (!file.IsOpen() || !HoldsAtLeast(file.Get(), size)) return nullptr;
+  if (!file.IsOpen() || !IsUsable(file.Get(), size) || !Reserve(file.Get(), size)) return nullptr;
   unsigned char* const data = Map(file.Get(), size);
   if (data == nullptr) return nullptr;
-  return std::unique_ptr<SharedMemoryBlock>(new SharedMemoryBlock(data, size, {}));
+  std::unique_ptr<SharedMemoryBlock> block(new SharedMemoryBlock(data, size, {}));
+  return block->guard_->IsActive() ? std::move(block) : nullptr;
 }
 
 std::unique_ptr<SharedMemoryBlock> SharedMemoryBlock::Create(const std::string& name,
@@ -52,17 +71,17 @@ std::unique_ptr<SharedMemoryBlock> SharedMemoryBlock::Create(const std::string& 
   if (path.empty() || size == 0) return nullptr;
   const FileDescriptor file(shm_open(path.c_str(), O_RDWR | O_CREAT | O_EXCL, S_IRUSR | S_IWUSR));
   if (!file.IsOpen()) return nullptr;
-  // Backed at once: a block that only promises its memory would end in a bus error later.
-  const bool backed = posix_fallocate(file.Get(), 0, static_cast<off_t>(size)) == 0;
-  unsigned char* const data = backed ? Map(file.Get(), size) : nullptr;
+  unsigned char* const data = Reserve(file.Get(), size) ? Map(file.Get(), size) : nullptr;
   if (data == nullptr) {
     shm_unlink(path.c_str());
     return nullptr;
   }
-  return std::unique_ptr<SharedMemoryBlock>(new SharedMemoryBlock(data, size, path));
+  std::unique_ptr<SharedMemoryBlock> block(new SharedMemoryBlock(data, size, path));
+  return block->guard_->IsActive() ? std::move(block) : nullptr;
 }
 
 SharedMemoryBlock::~SharedMemoryBlock() {
+  guard_.reset();
   munmap(data_, size_);
   if (!ownedPath_.empty()) shm_unlink(ownedPath_.c_str());
 }

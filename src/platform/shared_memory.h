@@ -8,8 +8,13 @@
 
 namespace lumo::platform {
 
+class MemoryGuard;
+
 /// A mapped view of a block of named memory. It stands in the system's table of names (on Linux
 /// /dev/shm), where a block is found by its name without a leading slash.
+///
+/// Another process may make the block shorter at any moment. Its bytes are zeros then, which nobody
+/// else sees, and WasCut() tells; the process lives on.
 ///
 /// Threads: the bytes are shared with other processes; access to them is the user's to order.
 class VEXG_EXPORT SharedMemoryBlock {
@@ -17,7 +22,8 @@ class VEXG_EXPORT SharedMemoryBlock {
   /// Opens a block that exists, for reading and writing.
   /// @param name  UTF-8; 1 to 255 bytes, without "/" or NUL.
   /// @param size  bytes to map, at least 1. The block may be larger.
-  /// @return null when there is no such block, it is smaller than `size`, or it can't be mapped.
+  /// @return null when there is no such block, it belongs to another user, it is smaller than
+  ///         `size`, memory for all of it can't be had, or it can't be mapped.
   static std::unique_ptr<SharedMemoryBlock> Open(const std::string& name, std::size_t size);
 
   /// Makes a block of zeros that only this user can open, and removes its name when destroyed.
@@ -31,13 +37,16 @@ class VEXG_EXPORT SharedMemoryBlock {
   unsigned char* GetData() const { return data_; }
   std::size_t GetSize() const { return size_; }
 
+  /// True once bytes of the block were asked for that it doesn't have any more.
+  bool WasCut() const;
+
  private:
-  SharedMemoryBlock(unsigned char* data, std::size_t size, std::string ownedPath)
-      : data_(data), size_(size), ownedPath_(std::move(ownedPath)) {}
+  SharedMemoryBlock(unsigned char* data, std::size_t size, std::string ownedPath);
 
   unsigned char* data_;
   std::size_t size_;
   std::string ownedPath_;  // removed at the end; empty for a block of somebody else
+  std::unique_ptr<MemoryGuard> guard_;
 };
 
 }  // namespace lumo::platform

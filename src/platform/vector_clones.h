@@ -7,6 +7,11 @@
 #if defined(__GNUC__) && !defined(__clang__) && defined(__x86_64__) && defined(__OPTIMIZE__) && \
     !defined(__SANITIZE_ADDRESS__) && !defined(__SANITIZE_THREAD__)
 #define VEXG_VECTOR_CLONES __attribute__((target_clones("avx2", "default"), optimize("O3")))
+/// The same for loops that choose between computed numbers: both may be computed, since nothing
+/// here asks which floating-point exceptions came up.
+#define VEXG_CHOOSING_VECTOR_CLONES \
+  __attribute__((target_clones("avx2", "default"), optimize("O3", "no-trapping-math")))
 #else
 #define VEXG_VECTOR_CLONES
+#define VEXG_CHOOSING_VECTOR_CLONES
 #endif

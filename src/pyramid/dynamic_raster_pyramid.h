@@ -10,8 +10,9 @@
 namespace lumo {
 
 /// The pyramid of one raster that has a reader for it: builds it in the background, and holds the
-/// statistics and histograms that the last build has left. Exists for TwelveTypes; for complex
-/// numbers there are neither.
+/// statistics and histograms that the last build has left, until pixels of the raster are written.
+/// A build that a write has overtaken leaves none. Exists for TwelveTypes; for complex numbers
+/// there are neither.
 ///
 /// Ownership: shares the connections. Its destructor aborts a build that goes on and waits for it.
 /// Threads:   every operation may be called on any thread. The lock is never held during a build.
@@ -52,6 +53,7 @@ class DynamicRasterPyramid final : public PyramidCallback<T> {
 
  private:
   bool IsRunning() const;
+  bool ResultsHold() const { return reader_->WriteCount(0) == writes_; }
   bool IsKeptByTheLibrary() const;
   AsyncPtr Start(const PyramidBuilderPtr& builder);
 
@@ -64,6 +66,7 @@ class DynamicRasterPyramid final : public PyramidCallback<T> {
   const MakeSourceRaster<T> makeRaster_;
   PyramidBuilderPtr builder_;  // that runs, or was the last one
   mutable bool isEndTaken_ = true;
+  std::uint64_t writes_ = 0;  // of the raster's pixels, when the last build began
   std::vector<RasterBandStats<T>> bandStats_;
   std::vector<RasterBandHistogram<T>> bandHistograms_;
 };

@@ -52,6 +52,7 @@ template <typename T>
 AsyncPtr DynamicRasterPyramid<T>::Start(const PyramidBuilderPtr& builder) {
   bandStats_.clear();
   bandHistograms_.clear();
+  writes_ = reader_->WriteCount(0);
   builder_ = builder;
   isEndTaken_ = false;
   return SubmitAsync(builder, true) ? AsyncPtr(builder) : AsyncPtr();
@@ -93,16 +94,17 @@ AsyncPtr DynamicRasterPyramid<T>::PyramidAsync() const {
 template <typename T>
 bool DynamicRasterPyramid<T>::StatsExist(unsigned band, unsigned mask) const {
   const std::lock_guard lock(lock_);
-  return !IsRunning() && std::ranges::any_of(bandStats_, [&](const RasterBandStats<T>& stats) {
-    return stats.band == band && (stats.mask & mask) == mask;
-  });
+  return !IsRunning() && ResultsHold() &&
+         std::ranges::any_of(bandStats_, [&](const RasterBandStats<T>& stats) {
+           return stats.band == band && (stats.mask & mask) == mask;
+         });
 }
 
 template <typename T>
 RasterBandStats<T> DynamicRasterPyramid<T>::BandStats(unsigned band) const {
   const std::lock_guard lock(lock_);
   for (const RasterBandStats<T>& stats : bandStats_) {
-    if (stats.band == band) return stats;
+    if (stats.band == band && ResultsHold()) return stats;
   }
   RasterBandStats<T> none;
   none.band = band;
@@ -116,7 +118,7 @@ Array<RasterBandHistogram<T>> DynamicRasterPyramid<T>::BandHistogram(unsigned ba
   if constexpr (std::is_arithmetic_v<T>) {
     const auto ofBand = [band](const auto& histogram) { return histogram.band == band; };
     const auto count = static_cast<unsigned>(std::ranges::count_if(bandHistograms_, ofBand));
-    if (count != 0 && list.Resize(ArrayDims(count))) {
+    if (count != 0 && ResultsHold() && list.Resize(ArrayDims(count))) {
       std::ranges::copy_if(bandHistograms_, list.begin(), ofBand);
     }
   }
@@ -158,8 +160,11 @@ template <typename T>
 void DynamicRasterPyramid<T>::TakeHistogram(const RasterHistogram<T>& histogram,
                                             HistogramSign sign) requires(std::is_arithmetic_v<T>) {
   Array<RasterBandHistogram<T>> all;
+  std::uint64_t writes = 0;
   {
     const std::lock_guard lock(lock_);
+    if (!ResultsHold()) return;
+    writes = writes_;
     for (unsigned band = 0; band < histogram.BandCount(); ++band) {
       RasterBandHistogram<T> taken = histogram.BandHistogram(band, band);
       taken.source = StatsSource::kDynamic;
@@ -170,15 +175,20 @@ void DynamicRasterPyramid<T>::TakeHistogram(const RasterHistogram<T>& histogram,
     }
     all = detail::ArrayOf(bandHistograms_);
   }
-  if (pyramidReader_->CanWriteHistogram()) pyramidReader_->WriteHistogram(all);
+  if (pyramidReader_->CanWriteHistogram() && pyramidReader_->WriteHistogram(all)) {
+    pyramidReader_->SetHistogramsHoldFor(writes);
+  }
 }
 
 template <typename T>
 void DynamicRasterPyramid<T>::TakeStats(const RasterStats<T>& stats) requires(
     std::is_arithmetic_v<T>) {
   Array<RasterBandStats<T>> all;
+  std::uint64_t writes = 0;
   {
     const std::lock_guard lock(lock_);
+    if (!ResultsHold()) return;
+    writes = writes_;
     for (unsigned band = 0; band < stats.Mins().GetCount(); ++band) {
       const auto same = std::ranges::find(bandStats_, band, &RasterBandStats<T>::band);
       if (same != bandStats_.end()) {
@@ -189,7 +199,9 @@ void DynamicRasterPyramid<T>::TakeStats(const RasterStats<T>& stats) requires(
     }
     all = detail::ArrayOf(bandStats_);
   }
-  if (pyramidReader_->CanWriteStats()) pyramidReader_->WriteStats(all);
+  if (pyramidReader_->CanWriteStats() && pyramidReader_->WriteStats(all)) {
+    pyramidReader_->SetStatsHoldFor(writes);
+  }
 }
 
 }  // namespace lumo

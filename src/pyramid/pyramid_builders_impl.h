@@ -10,6 +10,7 @@
 #include "pyramid/dynamic_raster_pyramid.h"
 #include "pyramid/pyramid_builders.h"
 #include "pyramid/pyramid_process.h"
+#include "stats/raster_histogram_impl.h"
 #include "stats/raster_histogram_process.h"
 
 namespace lumo {
@@ -43,6 +44,39 @@ class BuilderConnection {
   RasterDataConnectionPtr source_;
   RasterReaderPtr<T> reader_;
 };
+
+/// A histogram of some 256 bins for each band, whose sizes are whole numbers.
+template <typename T>
+RasterHistogramPtr<T> ToldHistogram(const Array<T>& mins, const Array<T>& maxes) {
+  constexpr double kBins = 255;
+  const unsigned bands = mins.GetCount();
+  Array<double> binSizes{ArrayDims(bands)};
+  for (unsigned band = 0; band < bands; ++band) {
+    const double range = static_cast<double>(maxes[band]) - static_cast<double>(mins[band]);
+    binSizes[band] = mins[band] != maxes[band] ? std::ceil(range / kBins) : 1.0;
+  }
+  return RasterHistogramPtr<T>(
+      new RasterHistogram<T>(bands, binSizes, mins, maxes, HistogramSign::kBoth));
+}
+
+/// A histogram of 256 bins for each band in the exact form; of integers one for each value where
+/// there are fewer.
+template <typename T>
+RasterHistogramPtr<T> ExactHistogram(const Array<T>& mins, const Array<T>& maxes) {
+  constexpr unsigned kBins = 256;
+  const unsigned bands = mins.GetCount();
+  Array<unsigned> binCounts{ArrayDims(bands)};
+  for (unsigned band = 0; band < bands; ++band) {
+    binCounts[band] = kBins;
+    if constexpr (std::is_integral_v<T>) {
+      if (mins[band] <= maxes[band] && ValuesBetween(mins[band], maxes[band]) < kBins) {
+        binCounts[band] = static_cast<unsigned>(ValuesBetween(mins[band], maxes[band]));
+      }
+    }
+  }
+  return RasterHistogramPtr<T>(
+      new RasterHistogram<T>(bands, binCounts, mins, maxes, HistogramSign::kBoth, Form::kExact));
+}
 
 /// Hands what a build has computed to the owner of the pyramid.
 template <typename T>
@@ -168,18 +202,15 @@ bool AsyncOrvaPyramidBuilder<T>::MakeHistogram(const Rasters& rasters) {
     level->SetStatsMode(StatsMode::kBasic);
     const IPC apart(GetIPC().abort, ProgressReportPtr(new StandardProgressReport));
     const unsigned bands = level->Bands();
-    Array<double> binSizes{ArrayDims(bands)};
     Array<T> mins{ArrayDims(bands)}, maxes{ArrayDims(bands)};
     for (unsigned band = 0; band < bands; ++band) {
       mins[band] = level->Min(band, apart);
       maxes[band] = level->Max(band, apart);
-      constexpr double kBins = 255;
-      const double range = static_cast<double>(maxes[band]) - static_cast<double>(mins[band]);
-      binSizes[band] = mins[band] != maxes[band] ? std::ceil(range / kBins) : 1.0;
     }
     if (IsAborted()) return true;
-    const RasterHistogramPtr<T> histogram(
-        new RasterHistogram<T>(bands, binSizes, mins, maxes, HistogramSign::kBoth));
+    const RasterHistogramPtr<T> histogram = order_.def.bins == Form::kExact
+                                                ? detail::ExactHistogram(mins, maxes)
+                                                : detail::ToldHistogram(mins, maxes);
     const RasterIteratorPtr<T> blocks(new RasterIteratorStream<T>(level));
     detail::BuildResults<T> results(owner_);
     RasterHistogramCallbackProcess<T> counting(blocks, histogram, stats_, &results, Share(1));

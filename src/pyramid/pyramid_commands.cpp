@@ -1,6 +1,7 @@
 #include <mutex>
 
 #include "foundation/fault.h"
+#include "pyramid/exact_levels.h"
 #include "raster/raster_command.h"
 #include "raster/raster_def.h"
 
@@ -16,7 +17,11 @@ const CommandDeclaration kGet{
     "Gives a level of the pyramid of a raster as a raster of its own.",
     {kUri,
      {"Level", Presence::kRequired, ValueKind::kInteger,
-      "halves samples and lines so many times; 0 is the size of the raster"}},
+      "halves samples and lines so many times; 0 is the size of the raster"},
+     {"Placing", Presence::kOptional, ValueKind::kWord,
+      "Told: pixels grow by the whole part of the quotient of the sizes; Exact: by 2^Level, as the "
+      "level's pixel x is the raster's pixel x * 2^Level",
+      "", &WordsIn<Form>}},
     {{"PyramidURI", ValueKind::kURI, "the level, by which further commands find it"}}};
 
 class GetRasterPyramidCommand final : public RasterCommand {
@@ -25,6 +30,7 @@ class GetRasterPyramidCommand final : public RasterCommand {
     const BasicRasterPtr raster = FindRaster();
     if (!raster) return Fail();
     const auto number = Read<unsigned>("Level");
+    const ExactLevels exactly(HasInput("Placing") && Read<Form>("Placing") == Form::kExact);
     BasicRasterPtr level;
     DispatchType(TwelveTypes{}, raster->DataType(), [&]<typename T>() {
       const RasterPtr<T> typed(raster);
@@ -79,14 +85,20 @@ const CommandDeclaration kBuild{
     "Builds the pyramid of a raster, with its statistics and a histogram, where it was opened.",
     {kUri,
      {"PyramidType", Presence::kRequired, ValueKind::kWord,
-      "ORVA: a file of the library's own; DRIVER: by the driver of the format"},
+      "ORVA: a file of the library's own; DRIVER: by the driver of the format", "",
+      &WordsIn<PyramidType>},
      {"PyramidResamplingMethod", Presence::kRequired, ValueKind::kWord,
-      "Impl, Nearest, Linear, Cubic or Majority; ORVA always takes every 2^level-th pixel"},
+      "Impl, Nearest, Linear, Cubic or Majority; ORVA always takes every 2^level-th pixel", "",
+      &WordsIn<PyramidResamplingMethod>},
      {"PyramidLevelMin", Presence::kRequired, ValueKind::kInteger, "first level; 0 is a copy"},
      {"PyramidLevelMax", Presence::kRequired, ValueKind::kInteger, "last level, up to 31"},
      {"PyramidCanBuild", Presence::kRequired, ValueKind::kBoolean, "of the description; not read"},
      {"TileDimensions", Presence::kRequired, ValueKind::kTiles,
-      "the levels are stored in squares of this height; of 9 bands and more in squares of 256"}},
+      "the levels are stored in squares of this height; of 9 bands and more in squares of 256"},
+     {"Bins", Presence::kOptional, ValueKind::kWord,
+      "of the histogram. Told: each a whole number wide, 256 at most; Exact: 256 that share the "
+      "range of the values, or one for each of fewer integers",
+      "", &WordsIn<Form>}},
     {}};
 
 class BuildRasterPyramidCommand final : public RasterCommand {
@@ -100,6 +112,7 @@ class BuildRasterPyramidCommand final : public RasterCommand {
     def.levelMin = Read<unsigned>("PyramidLevelMin");
     def.levelMax = Read<unsigned>("PyramidLevelMax");
     def.canBuild = Read<bool>("PyramidCanBuild");
+    def.bins = Read<Form>("Bins");
 
     auto* const observer = new BuildObserver(GetIPC());
     const AsyncCallbackPtr callback(observer);

@@ -53,6 +53,20 @@ struct RasterBandHistogram {
   StatsSource source = StatsSource::kUnknown;
   unsigned reserved = 0;
   HistogramSign sign = HistogramSign::kBoth;
+  Form bins = Form::kTold;  ///< how values found their bins; not compared, nor part of the text
+};
+
+/// Which values of which bands are to be counted, into which bins. RasterHistogram tells the bins
+/// of both forms.
+template <typename T>
+struct HistogramRequest {
+  T lower{};  ///< of the values that count, both inclusive
+  T upper{};
+  double binSize = 0;     ///< above 0: the width of a bin
+  unsigned binCount = 0;  ///< how many bins, where there is no size
+  Array<unsigned> bands;  ///< none: all
+  HistogramSign sign = HistogramSign::kBoth;
+  Form bins = Form::kTold;
 };
 
 /// Equal in everything but the bin size.

@@ -159,7 +159,23 @@ class Raster : public BasicRaster {
   /// raster may ignore. @return false unless the whole block was taken.
   virtual bool PutSubRect(const SubRect& rect, const Array<unsigned>& bands, Interleave interleave,
                           Array<T>& pixels, Array<unsigned char>& state) = 0;
+
+  /// Starts to count histograms, in either form of bins. Empty when that could not be started.
+  virtual AsyncPtr CountHistogram(const HistogramRequest<T>& request, const IPC& ipc);
+
+  /// How often pixels that this raster shows have been written, by whatever way: a view gives what
+  /// the rasters that it stands on give. Statistics and histograms hold for one such number.
+  virtual std::uint64_t WriteCount() const { return 0; }
 };
+
+template <typename T>
+AsyncPtr Raster<T>::CountHistogram(const HistogramRequest<T>& request, const IPC& ipc) {
+  if (request.bins != Form::kTold) return {};  // a class that knows no other form
+  const auto& [lower, upper, binSize, binCount, bands, sign, bins] = request;
+  if (binSize > 0) return HistogramByBinSize(lower, upper, binSize, bands, sign, ipc);
+  return bands.GetCount() != 0 ? HistogramByBinCount(lower, upper, binCount, bands, sign, ipc)
+                               : HistogramAllBands(lower, upper, binCount, sign, ipc);
+}
 
 extern template class VEXG_EXPORT Raster<std::uint8_t>;
 extern template class VEXG_EXPORT Raster<std::int8_t>;

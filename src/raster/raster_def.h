@@ -48,7 +48,8 @@ struct PyramidDef {
   unsigned levelMin = 0;
   unsigned levelMax = 0;
   bool canBuild = false;
-  unsigned level = 0;  ///< of the level that answers; 0 for the raster itself
+  unsigned level = 0;       ///< of the level that answers; 0 for the raster itself
+  Form bins = Form::kTold;  ///< of the histogram that a build counts
 
   friend bool operator==(const PyramidDef&, const PyramidDef&) = default;
 };

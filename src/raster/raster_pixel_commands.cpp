@@ -1,3 +1,5 @@
+#include <algorithm>
+
 #include "commands/shared_memory_channel.h"
 #include "foundation/fault.h"
 #include "raster/raster_command.h"
@@ -11,7 +13,7 @@ std::vector<InputDeclaration> BlockInputs() {
       {"SubRect", Presence::kRequired, ValueKind::kRectangle, "the block, pixels of the raster"},
       {"Bands", Presence::kRequired, ValueKind::kIntegerArray, "the bands, in any order"},
       {"Interleave", Presence::kRequired, ValueKind::kWord,
-       "BIP, BIL, BSQ: the order in memory; any other word for one band"},
+       "BIP, BIL, BSQ: the order in memory; any other word for one band", "", &WordsIn<Interleave>},
       {"PixelDataBufName", Presence::kRequired, ValueKind::kText, "named memory of the pixels"},
       {"PixelDataBufSize", Presence::kRequired, ValueKind::kInteger, "its size", "bytes"},
       {"PixelValueStateBufName", Presence::kRequired, ValueKind::kText,
@@ -21,6 +23,14 @@ std::vector<InputDeclaration> BlockInputs() {
 }
 
 const OutputDeclaration kFault{"Fault", ValueKind::kText, "why not, where Return is 0"};
+
+/// The elements of a block in memory of its own.
+template <typename T>
+Array<T> CopyOf(const Array<T>& block) {
+  Array<T> copy(block.GetDims());
+  if (copy.GetCount() == block.GetCount()) std::copy(block.begin(), block.end(), copy.begin());
+  return copy;
+}
 
 /// Moves a block of pixels between a raster and named memory of another process.
 class BlockCommand : public RasterCommand {
@@ -57,7 +67,10 @@ class BlockCommand : public RasterCommand {
     const ArrayDims dims(static_cast<unsigned>(elements));
     Array<T> pixels(reinterpret_cast<T*>(pixelMemory.GetData()), dims);
     Array<unsigned char> state(stateMemory.GetData(), dims);
-    const bool whole = transfer(raster, rect, bands, Read<Interleave>("Interleave"), pixels, state);
+    const auto memoryIsWhole = [&] { return IsWhole(pixelMemory) && IsWhole(stateMemory); };
+    const bool whole =
+        transfer(raster, rect, bands, Read<Interleave>("Interleave"), pixels, state, memoryIsWhole);
+    if (!memoryIsWhole()) return false;
     Write("Return", whole);
     if (!whole) Write("Fault", TakeFault());
     return true;
@@ -84,6 +97,13 @@ class BlockCommand : public RasterCommand {
              std::to_string(memory.GetSize()) + " bytes");
     return false;
   }
+
+  static bool IsWhole(const SharedMemory& memory) {
+    if (!memory.WasCut()) return true;
+    SetFault("the named memory " + memory.GetName().ToUTF8() +
+             " became smaller while it was in use");
+    return false;
+  }
 };
 
 const CommandDeclaration kGet{
@@ -96,7 +116,10 @@ const CommandDeclaration kGet{
 
 class GetRasterSubRectCommand final : public BlockCommand {
   CommandResult Execute() override {
-    return TransferBlock([](auto& raster, auto&&... block) { return raster.GetSubRect(block...); });
+    return TransferBlock([](auto& raster, const SubRect& rect, const Array<unsigned>& bands,
+                            Interleave interleave, auto& pixels, auto& state, const auto&) {
+      return raster.GetSubRect(rect, bands, interleave, pixels, state);
+    });
   }
 };
 
@@ -111,7 +134,19 @@ const CommandDeclaration kPut{
 
 class PutRasterSubRectCommand final : public BlockCommand {
   CommandResult Execute() override {
-    return TransferBlock([](auto& raster, auto&&... block) { return raster.PutSubRect(block...); });
+    return TransferBlock([](auto& raster, const SubRect& rect, const Array<unsigned>& bands,
+                            Interleave interleave, auto& pixels, auto& state,
+                            const auto& memoryIsWhole) {
+      // A copy is what is written: the zeros that come in place of memory that has gone are not to
+      // get into the raster.
+      auto ownPixels = CopyOf(pixels);
+      auto ownState = CopyOf(state);
+      if (ownPixels.GetCount() != pixels.GetCount() || ownState.GetCount() != state.GetCount()) {
+        SetFault("memory is short");
+        return false;
+      }
+      return memoryIsWhole() && raster.PutSubRect(rect, bands, interleave, ownPixels, ownState);
+    });
   }
 };
 

@@ -108,6 +108,8 @@ class ExtendedQueryRasterCommand final : public QueryCommand {
       noData[band] = hasNoData[band] ? raster.NoDataValue(band) : T();
       hasPalette[band] = raster.HasPalette(band);
       stats[band] = StatsMask::None;
+      // Of most bands nothing is at hand, and a source is asked for each answer on its thread.
+      if (raster.BandStats(band).mask == StatsMask::None) continue;
       for (unsigned bit = StatsMask::Cov; bit != 0; bit >>= 1) {
         if (raster.StatsExist(band, bit)) stats[band] |= bit;
       }

@@ -69,6 +69,8 @@ class RasterView : public Raster<T> {
                   Array<T>& pixels, Array<unsigned char>& state) override;
   bool PutSubRect(const SubRect& rect, const Array<unsigned>& bands, Interleave interleave,
                   Array<T>& pixels, Array<unsigned char>& state) override;
+  AsyncPtr CountHistogram(const HistogramRequest<T>& request, const IPC& ipc) override;
+  std::uint64_t WriteCount() const override;
 
  protected:
   const RasterPtr<T>& Parent() const { return parent_; }

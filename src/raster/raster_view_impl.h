@@ -274,4 +274,14 @@ bool RasterView<T>::PutSubRect(const SubRect& rect, const Array<unsigned>& bands
       [&](Raster<T>& parent) { return parent.PutSubRect(rect, bands, interleave, pixels, state); });
 }
 
+template <typename T>
+AsyncPtr RasterView<T>::CountHistogram(const HistogramRequest<T>& request, const IPC& ipc) {
+  return Ask([&](Raster<T>& parent) { return parent.CountHistogram(request, ipc); });
+}
+
+template <typename T>
+std::uint64_t RasterView<T>::WriteCount() const {
+  return Ask([](Raster<T>& parent) { return parent.WriteCount(); });
+}
+
 }  // namespace lumo

@@ -15,6 +15,9 @@ namespace lumo {
 /// the next call of any operation, and join those at hand unless an equal one is there. So does
 /// what a run had counted when it was aborted; one that failed leaves nothing.
 ///
+/// Those at hand hold for one Raster::WriteCount. Once pixels have been written they are gone, ones
+/// entered by hand as well, and a run that was under way then leaves nothing.
+///
 /// Exists for TwelveTypes; for complex numbers it is empty, counts nothing and keeps nothing.
 ///
 /// Ownership: the raster owns it and outlives it. It is to be one of the raster's last members: its
@@ -38,6 +41,7 @@ class DynamicRasterHistogram : public ErrorState {
                                HistogramSign sign, const IPC& ipc);
   AsyncPtr HistogramAllBands(T lower, T upper, unsigned binCount, HistogramSign sign,
                              const IPC& ipc);
+  AsyncPtr CountHistogram(const HistogramRequest<T>& request, const IPC& ipc);
   /// The run that goes on now; empty when none does.
   AsyncPtr HistogramAsync() const;
 
@@ -48,15 +52,15 @@ class DynamicRasterHistogram : public ErrorState {
 
  private:
   struct Run;
-  struct Request;
 
   bool CheckRunning() const;
-  AsyncPtr Start(const Request& request, const IPC& ipc);
+  void DropStale() const;
   void Append(const RasterBandHistogram<T>& histogram) const;
 
   mutable std::mutex lock_;  // guards all below
   Raster<T>* const raster_;
   mutable std::vector<RasterBandHistogram<T>> histograms_;
+  mutable std::uint64_t writes_ = 0;  // the histograms hold for this Raster::WriteCount
   mutable std::unique_ptr<Run> run_;
 };
 
@@ -78,6 +82,9 @@ class DynamicRasterHistogram<Complex<T>> : public ErrorState {
   }
   AsyncPtr HistogramAllBands(Complex<T> /*lower*/, Complex<T> /*upper*/, unsigned /*binCount*/,
                              HistogramSign /*sign*/, const IPC& /*ipc*/) {
+    return {};
+  }
+  AsyncPtr CountHistogram(const HistogramRequest<Complex<T>>& /*request*/, const IPC& /*ipc*/) {
     return {};
   }
   AsyncPtr HistogramAsync() const { return {}; }

@@ -8,23 +8,13 @@
 
 namespace lumo {
 
-/// What a run is to count: with a bin size above 0 by that, else by the bin count.
-template <typename T>
-struct DynamicRasterHistogram<T>::Request {
-  T lower;
-  T upper;
-  double binSize;
-  unsigned binCount;
-  Array<unsigned> bands;  // none: all
-  HistogramSign sign;
-};
-
 /// A run, with what its process works on.
 template <typename T>
 struct DynamicRasterHistogram<T>::Run {
   RasterIteratorPtr<T> iterator;
   RasterHistogramPtr<T> working;
   Pointer<RasterHistogramProcess<T>> process;
+  std::uint64_t writes = 0;  // Raster::WriteCount when it began
 };
 
 template <typename T>
@@ -38,9 +28,11 @@ DynamicRasterHistogram<T>::~DynamicRasterHistogram() {
   run_->process->WaitFinished();
 }
 
-/// True while a run goes on. One that has ended is taken over here. Under the lock.
+/// True while a run goes on. One that has ended is taken over here, and what no longer holds is
+/// dropped. Under the lock.
 template <typename T>
 bool DynamicRasterHistogram<T>::CheckRunning() const {
+  DropStale();
   if (!run_) return false;
   if (!run_->process->IsFinished()) return true;
   const std::unique_ptr<Run> run = std::move(run_);
@@ -48,11 +40,23 @@ bool DynamicRasterHistogram<T>::CheckRunning() const {
     SetFault(run->process->GetFault());
     return false;
   }
+  if (run->writes != writes_) {
+    SetFault("the pixels were written while they were counted");
+    return false;
+  }
   const Array<unsigned>& bands = run->iterator->Bands();
   for (unsigned i = 0; i < bands.GetCount(); ++i) {
     Append(run->working->BandHistogram(i, bands[i]));
   }
   return false;
+}
+
+template <typename T>
+void DynamicRasterHistogram<T>::DropStale() const {
+  const std::uint64_t writes = raster_->WriteCount();
+  if (writes == writes_) return;
+  histograms_.clear();
+  writes_ = writes;
 }
 
 /// Under the lock.
@@ -64,10 +68,12 @@ void DynamicRasterHistogram<T>::Append(const RasterBandHistogram<T>& histogram) 
 }
 
 template <typename T>
-AsyncPtr DynamicRasterHistogram<T>::Start(const Request& request, const IPC& ipc) {
+AsyncPtr DynamicRasterHistogram<T>::CountHistogram(const HistogramRequest<T>& request,
+                                                   const IPC& ipc) {
   const std::lock_guard lock(lock_);
   if (CheckRunning()) return {};
   auto run = std::make_unique<Run>();
+  run->writes = writes_;
   const RasterPtr<T> raster(raster_, true);  // the raster outlives the run
   run->iterator.Reset(request.bands.GetCount() == 0
                           ? new RasterIteratorStream<T>(raster)
@@ -81,10 +87,11 @@ AsyncPtr DynamicRasterHistogram<T>::Start(const Request& request, const IPC& ipc
   };
   const Array<T> mins = forEach(request.lower);
   const Array<T> maxes = forEach(request.upper);
-  run->working.Reset(
-      request.binSize > 0.0
-          ? new RasterHistogram<T>(bands, forEach(request.binSize), mins, maxes, request.sign)
-          : new RasterHistogram<T>(bands, forEach(request.binCount), mins, maxes, request.sign));
+  const bool bySize = request.binSize > 0.0;
+  run->working.Reset(bySize ? new RasterHistogram<T>(bands, forEach(request.binSize), mins, maxes,
+                                                     request.sign, request.bins)
+                            : new RasterHistogram<T>(bands, forEach(request.binCount), mins, maxes,
+                                                     request.sign, request.bins));
   if (!run->working->IsValid()) {
     SetFault("there is no memory for so many bins");
     return {};
@@ -99,20 +106,20 @@ template <typename T>
 AsyncPtr DynamicRasterHistogram<T>::HistogramByBinSize(T lower, T upper, double binSize,
                                                        const Array<unsigned>& bands,
                                                        HistogramSign sign, const IPC& ipc) {
-  return Start({lower, upper, binSize, 0, bands, sign}, ipc);
+  return CountHistogram({lower, upper, binSize, 0, bands, sign}, ipc);
 }
 
 template <typename T>
 AsyncPtr DynamicRasterHistogram<T>::HistogramByBinCount(T lower, T upper, unsigned binCount,
                                                         const Array<unsigned>& bands,
                                                         HistogramSign sign, const IPC& ipc) {
-  return Start({lower, upper, 0, binCount, bands, sign}, ipc);
+  return CountHistogram({lower, upper, 0, binCount, bands, sign}, ipc);
 }
 
 template <typename T>
 AsyncPtr DynamicRasterHistogram<T>::HistogramAllBands(T lower, T upper, unsigned binCount,
                                                       HistogramSign sign, const IPC& ipc) {
-  return Start({lower, upper, 0, binCount, {}, sign}, ipc);
+  return CountHistogram({lower, upper, 0, binCount, {}, sign}, ipc);
 }
 
 template <typename T>

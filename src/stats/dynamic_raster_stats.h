@@ -15,6 +15,10 @@ namespace lumo {
 /// result is taken over at the next call of any operation, and then replaces what stood before. A
 /// computation that was aborted, or failed, leaves what stood.
 ///
+/// What is at hand holds for one Raster::WriteCount. Once pixels have been written it is gone,
+/// values entered by hand as well, and a computation that was under way then gives nothing; a
+/// getter that waits for it starts another one.
+///
 /// Exists for TwelveTypes; for complex numbers it is empty, computes nothing and keeps nothing.
 ///
 /// Ownership: the raster owns it and outlives it. It is to be the raster's last member: its
@@ -67,6 +71,9 @@ class DynamicRasterStats : public ErrorState {
   using Entries = std::vector<RasterBandStats<T>>;
 
   bool CheckRunning() const;
+  void DropStale() const;
+  void TakeOver(const Run& run) const;
+  bool WasOvertaken() const;
   const RasterBandStats<T>* FindEntry(unsigned band, unsigned mask) const;
   template <typename Value>
   auto Get(unsigned band, unsigned bit, const IPC& ipc, const Value& value);
@@ -75,6 +82,8 @@ class DynamicRasterStats : public ErrorState {
   Raster<T>* const raster_;
   lumo::StatsMode mode_ = lumo::StatsMode::kBasic;
   mutable Entries entries_;
+  mutable std::uint64_t writes_ = 0;   // the entries hold for this Raster::WriteCount
+  mutable bool wasOvertaken_ = false;  // by a write, the last computation
   mutable std::unique_ptr<Run> run_;
 };
 

@@ -13,6 +13,7 @@ struct DynamicRasterStats<T>::Run {
   RasterStatsPtr<T> basic;
   ExtendedRasterStatsPtr<T> extended;
   Pointer<ProcessBuilder<Process>> process;
+  std::uint64_t writes = 0;  // Raster::WriteCount when it began
 
   const RasterStats<T>& Results() const { return extended ? *extended : *basic; }
 };
@@ -28,37 +29,53 @@ DynamicRasterStats<T>::~DynamicRasterStats() {
   run_->process->WaitFinished();
 }
 
-/// True while a computation runs. One that has ended is taken over here. Under the lock.
+/// True while a computation runs. One that has ended is taken over here, and what no longer holds
+/// is dropped. Under the lock.
 template <typename T>
 bool DynamicRasterStats<T>::CheckRunning() const {
+  DropStale();
   if (!run_) return false;
   if (!run_->process->IsFinished()) return true;
   const std::unique_ptr<Run> run = std::move(run_);
+  wasOvertaken_ = run->writes != writes_;
   if (run->process->HasError()) {
     SetFault(run->process->GetFault());
-    return false;
+  } else if (!wasOvertaken_) {
+    TakeOver(*run);
   }
-  const RasterStats<T>& results = run->Results();
+  return false;
+}
+
+template <typename T>
+void DynamicRasterStats<T>::DropStale() const {
+  const std::uint64_t writes = raster_->WriteCount();
+  if (writes == writes_) return;
+  entries_.clear();
+  writes_ = writes;
+}
+
+template <typename T>
+void DynamicRasterStats<T>::TakeOver(const Run& run) const {
+  const RasterStats<T>& results = run.Results();
   const unsigned bands = raster_->Bands();
   // After an abort there are no results.
-  if (results.BandCount() != bands || results.PixelCounts().GetCount() != bands) return false;
+  if (results.BandCount() != bands || results.PixelCounts().GetCount() != bands) return;
 
   Entries entries(bands);
   for (unsigned band = 0; band < bands; ++band) {
     RasterBandStats<T>& entry = entries[band];
     entry = results.BandStats(band);
-    if (!run->extended) continue;
+    if (!run.extended) continue;
     entry.mask = StatsMask::Extended;
     const auto row = [&](const Array<double>& matrix, Array<double>& into) {
       if (into.Resize(ArrayDims(bands))) {
         std::copy_n(matrix.GetData() + std::size_t{band} * bands, bands, into.begin());
       }
     };
-    row(run->extended->SumXY(), entry.sumXY);
-    row(run->extended->Cov(), entry.cov);
+    row(run.extended->SumXY(), entry.sumXY);
+    row(run.extended->Cov(), entry.cov);
   }
   entries_ = std::move(entries);
-  return false;
 }
 
 /// The entry of the band, when it has all bits of the mask. Under the lock.
@@ -82,6 +99,8 @@ AsyncPtr DynamicRasterStats<T>::StatsBuild(const IPC& ipc) {
   const std::lock_guard lock(lock_);
   if (CheckRunning()) return {};
   auto run = std::make_unique<Run>();
+  run->writes = writes_;
+  wasOvertaken_ = false;
   const RasterPtr<T> raster(raster_, true);  // the raster outlives the run
   run->iterator.Reset(new RasterIteratorStream<T>(raster));
   if (!run->iterator->IsValid()) return {};
@@ -160,11 +179,21 @@ auto DynamicRasterStats<T>::Get(unsigned band, unsigned bit, const IPC& ipc, con
     ipc.progress->Update(1.0);
     return result;
   }
-  AsyncPtr run = StatsBuild(ipc);
-  if (!run) run = StatsAsync();  // another getter's
-  if (run) run->WaitFinished();
-  find(result);
+  constexpr unsigned kAttempts = 16;
+  for (unsigned attempt = 0; attempt < kAttempts; ++attempt) {
+    AsyncPtr run = StatsBuild(ipc);
+    if (!run) run = StatsAsync();  // another getter's
+    if (run) run->WaitFinished();
+    if (find(result) || ipc.abort->IsSet() || !WasOvertaken()) return result;
+  }
+  SetFault("the pixels were written again and again while their statistics were computed");
   return result;
+}
+
+template <typename T>
+bool DynamicRasterStats<T>::WasOvertaken() const {
+  const std::lock_guard lock(lock_);
+  return wasOvertaken_;
 }
 
 template <typename T>

@@ -4,20 +4,77 @@
 #include <cstdint>
 #include <type_traits>
 
+#include "commands/value_text.h"
+
 namespace lumo {
 
-/// The bins of one band, and which values count.
+/// The bins of one band, and which values count. RasterHistogram tells the rules of both forms.
 template <typename T>
 struct HistogramBins {
+  __extension__ using WholeSpan = unsigned __int128;
+
   T lower{};  ///< of the values that count, both inclusive: within the bounds, and of the sign
   T upper{};
   T min{};                      ///< where the first bin begins
   double size = 1;              ///< of a bin; of integers a whole number, unless it is below 1
   std::uint64_t wholeSize = 1;  ///< of integers, where it isn't below 1
   std::uint32_t count = 0;      ///< of bins, below 2^31
+  Form form = Form::kTold;
+  // In the exact form a value so far above the first bin's begin is in bin above * parts / span,
+  // rounded down. Of integers both are whole where the bins were given by their number.
+  double parts = 1;
+  double span = 1;
+  WholeSpan wholeSpan = 1;  // the span of 64-bit integers, which may be 2^64; 0 unless it is whole
 
   /// The bin of a value; `count` for one that doesn't count.
-  [[gnu::always_inline]] std::uint32_t Find(T value) const {
+  std::uint32_t Find(T value) const {
+    return form == Form::kExact ? FindExactly(value) : FindAsTold(value);
+  }
+
+  [[gnu::always_inline]] std::uint32_t FindExactly(T value) const {
+    if constexpr (std::is_integral_v<T> && sizeof(T) == 8) {
+      if (value < lower || value > upper || count == 0) return count;
+      const std::uint64_t above =
+          static_cast<std::uint64_t>(value) - static_cast<std::uint64_t>(min);
+      const std::uint64_t last = count - 1;
+      std::uint64_t bin = last;
+      if (wholeSpan != 0) {
+        const auto exact =
+            static_cast<WholeSpan>(above) * static_cast<std::uint64_t>(parts) / wholeSpan;
+        if (exact < last) bin = static_cast<std::uint64_t>(exact);
+      } else {
+        const long double part = static_cast<long double>(above) / span;
+        if (part < static_cast<long double>(last)) bin = static_cast<std::uint64_t>(part);
+      }
+      return static_cast<std::uint32_t>(bin);
+    } else {
+      const auto v = static_cast<double>(value);
+      const auto begin = static_cast<double>(min);
+      const double last = count == 0 ? 0.0 : count - 1.0;
+      const double at = (v - begin) * parts;
+      double bin = at / span;
+      bin = bin < last ? bin : last;
+      bin = bin > 0.0 ? bin : 0.0;
+      bin = static_cast<double>(static_cast<std::int32_t>(bin));
+      // A quotient that was rounded may be one beside that of the edges, which decide.
+      const double from = std::is_integral_v<T> ? bin * span : begin + bin * span;
+      const double to = std::is_integral_v<T> ? (bin + 1.0) * span : begin + (bin + 1.0) * span;
+      const double place = std::is_integral_v<T> ? at : v;
+      const double above = bin + 1.0;
+      const double below = bin - 1.0;
+      bin = place >= to ? above : bin;
+      bin = place < from ? below : bin;
+      bin = bin < last ? bin : last;
+      const double most = count;
+      const double tooLow = v >= static_cast<double>(lower) ? 0.0 : most;
+      const double tooHigh = v <= static_cast<double>(upper) ? 0.0 : most;
+      bin = bin > tooLow ? bin : tooLow;
+      bin = bin > tooHigh ? bin : tooHigh;
+      return static_cast<std::uint32_t>(static_cast<std::int32_t>(bin));
+    }
+  }
+
+  [[gnu::always_inline]] std::uint32_t FindAsTold(T value) const {
     if constexpr (std::is_integral_v<T> && sizeof(T) == 8) {
       if (value < lower || value > upper) return count;
       const std::uint64_t above =

@@ -1,5 +1,8 @@
+#include <limits>
+
 #include "foundation/fault.h"
 #include "raster/raster_command.h"
+#include "stats/turn.h"
 
 namespace lumo {
 namespace {
@@ -11,15 +14,22 @@ const CommandDeclaration kCalculate{
     "Statistics",
     "Counts the histograms of bands; GetRasterHistogramCommand then has them.",
     {kUri,
-     {"LowerBound", Presence::kRequired, ValueKind::kNumber, "smallest value that counts"},
-     {"UpperBound", Presence::kRequired, ValueKind::kNumber, "largest value that counts"},
+     {"LowerBound", Presence::kRequired, ValueKind::kNumber,
+      "smallest value that counts; one that the pixel type can't hold is limited to it"},
+     {"UpperBound", Presence::kRequired, ValueKind::kNumber,
+      "largest value that counts; limited as well"},
      {"BinCount", Presence::kOptional, ValueKind::kInteger, "how many bins"},
      {"BinSize", Presence::kOptional, ValueKind::kNumber,
       "width of a bin, where there is no BinCount"},
      {"Bands", Presence::kOptional, ValueKind::kIntegerArray,
       "which bands; all when absent, with a BinCount"},
      {"Sign", Presence::kOptional, ValueKind::kWord,
-      "Both, Positive (0 and above), Negative; Both when absent"}},
+      "Both, Positive (0 and above), Negative; Both when absent", "", &WordsIn<HistogramSign>},
+     {"Bins", Presence::kOptional, ValueKind::kWord,
+      "Told: sizes of bin counts hold one bin less, integers have whole sizes, and values behind "
+      "the last bin do not count; Exact: every value within the bounds is in one bin",
+      "", &WordsIn<Form>},
+     WaitInput()},
     {}};
 
 class CalculateRasterHistogramCommand final : public RasterCommand {
@@ -34,32 +44,64 @@ class CalculateRasterHistogramCommand final : public RasterCommand {
     }
     const auto bands = Read<Array<unsigned>>("Bands");
     if (HasInput("Bands") && !CheckBands(*raster, bands)) return Fail();
-    AsyncPtr run;
+    const Turn turn(raster, Read<Waiting>("Wait"), GetIPC());
+    String why;
     const bool typed = DispatchType(TenTypes{}, raster->DataType(), [&]<typename T>() {
       const RasterPtr<T> source(raster);
-      if (source) run = Start(*source, bands);
+      if (source) why = Count(*source, bands, turn);
       return bool(source);
     });
     if (!typed) return Fail("histograms are of real numbers, and the raster has others");
-    if (!run) return Fail(FaultOr("the run could not be started"));
-    run->WaitFinished();
-    if (run->IsValid()) return run->IsAborted() ? Fail("the run was aborted") : Succeed();
-    raster->HistogramAsync();  // takes the run's fault over
-    return Fail(FaultOr("the pixels could not be counted"));
+    return why.GetLength() == 0 ? Succeed() : Fail(why);
   }
 
+  /// Counts, and gives no text, or why that could not be done.
   template <typename T>
-  AsyncPtr Start(Raster<T>& raster, const Array<unsigned>& bands) {
-    const T lower = Read<T>("LowerBound");
-    const T upper = Read<T>("UpperBound");
-    const auto sign = Read<HistogramSign>("Sign");
-    if (!HasInput("BinCount")) {
-      return raster.HistogramByBinSize(lower, upper, Read<double>("BinSize"), bands, sign,
-                                       GetIPC());
+  String Count(Raster<T>& raster, const Array<unsigned>& bands, const Turn& turn) {
+    HistogramRequest<T> request;
+    if (!ReadBounds(request)) {
+      return "LowerBound and UpperBound hold between them no value that pixels may have";
     }
-    const auto count = Read<unsigned>("BinCount");
-    if (!HasInput("Bands")) return raster.HistogramAllBands(lower, upper, count, sign, GetIPC());
-    return raster.HistogramByBinCount(lower, upper, count, bands, sign, GetIPC());
+    request.bands = bands;
+    request.sign = Read<HistogramSign>("Sign");
+    request.bins = Read<Form>("Bins");
+    if (HasInput("BinCount")) {
+      request.binCount = Read<unsigned>("BinCount");
+    } else {
+      request.binSize = Read<double>("BinSize");
+    }
+    const std::uint64_t writes = raster.WriteCount();
+    AsyncPtr run = raster.CountHistogram(request, GetIPC());
+    // Another run may have begun meanwhile.
+    while (!run && raster.HistogramAsync() && turn.AwaitRuns()) {
+      run = raster.CountHistogram(request, GetIPC());
+    }
+    if (!run) return FaultOr("the run could not be started");
+    run->WaitFinished();
+    if (run->IsValid() && run->IsAborted()) return "the run was aborted";
+    raster.HistogramAsync();  // takes the run over, and its fault
+    if (!run->IsValid()) return FaultOr("the pixels could not be counted");
+    if (raster.WriteCount() != writes) return "the pixels were written while they were counted";
+    return {};
+  }
+
+  /// Reads the bounds, limited to the pixel type. @return false when neither of them nor what lies
+  /// between is a value of it.
+  template <typename T>
+  bool ReadBounds(HistogramRequest<T>& request) {
+    const auto lower = Read<double>("LowerBound"), upper = Read<double>("UpperBound");
+    constexpr auto kLeast = std::numeric_limits<T>::lowest();
+    constexpr auto kMost = std::numeric_limits<T>::max();
+    // A double may be rounded up to the first value behind those of a 64-bit type.
+    const auto limited = [&](double bound, const char* name) {
+      if (bound < static_cast<double>(kLeast)) return kLeast;
+      if (bound > static_cast<double>(kMost)) return kMost;
+      if (bound == static_cast<double>(kMost) && Read<T>(name) == T()) return kMost;
+      return Read<T>(name);
+    };
+    request.lower = limited(lower, "LowerBound");
+    request.upper = limited(upper, "UpperBound");
+    return !(lower > static_cast<double>(kMost) || upper < static_cast<double>(kLeast));
   }
 
   /// The fault that was told; `text` when none was.
@@ -76,7 +118,8 @@ const CommandDeclaration kGet{
     "Statistics",
     "Gives the histograms at hand of bands.",
     {kUri,
-     {"Bands", Presence::kRequired, ValueKind::kIntegerArray, "the bands, in the order wanted"}},
+     {"Bands", Presence::kRequired, ValueKind::kIntegerArray, "the bands, in the order wanted"},
+     WaitInput()},
     {{"Histograms", ValueKind::kText,
       "array of histograms: band, sign, bin size, bins, bounds, source and counts of each"}}};
 
@@ -87,6 +130,7 @@ class GetRasterHistogramCommand final : public RasterCommand {
     if (!raster) return Fail();
     const auto bands = Read<Array<unsigned>>("Bands");
     if (!CheckBands(*raster, bands)) return Fail();
+    const Turn turn(raster, Read<Waiting>("Wait"), GetIPC());
     const bool typed = DispatchType(TenTypes{}, raster->DataType(), [&]<typename T>() {
       const RasterPtr<T> source(raster);
       if (source) WriteHistograms(*source, bands);
@@ -115,7 +159,8 @@ const CommandDeclaration kSet{"SetRasterBandHistogramCommand",
                               "Enters a known histogram of one band.",
                               {kUri,
                                {"RasterBandHistogram", Presence::kRequired, ValueKind::kText,
-                                "band, sign, bin size, bins, bounds, source and counts"}},
+                                "band, sign, bin size, bins, bounds, source and counts"},
+                               WaitInput()},
                               {}};
 
 class SetRasterBandHistogramCommand final : public RasterCommand {
@@ -123,6 +168,7 @@ class SetRasterBandHistogramCommand final : public RasterCommand {
     if (!CheckInputs()) return Fail();
     const BasicRasterPtr raster = FindRaster();
     if (!raster) return Fail();
+    const Turn turn(raster, Read<Waiting>("Wait"), GetIPC());
     const bool set = DispatchType(TenTypes{}, raster->DataType(), [&]<typename T>() {
       const RasterPtr<T> source(raster);
       const auto histogram = Read<RasterBandHistogram<T>>("RasterBandHistogram");
@@ -143,7 +189,7 @@ const CommandDeclaration kSave{
     "SaveRasterHistogramCommand",
     "Statistics",
     "Stores the histograms of a raster through its data source.",
-    {kUri},
+    {kUri, WaitInput()},
     {{"Return", ValueKind::kBoolean, "they are stored, or the source has no place for them"}}};
 
 class SaveRasterHistogramCommand final : public RasterCommand {
@@ -151,6 +197,7 @@ class SaveRasterHistogramCommand final : public RasterCommand {
     if (!CheckInputs()) return Fail();
     const BasicRasterPtr raster = FindRaster();
     if (!raster) return Fail();
+    const Turn turn(raster, Read<Waiting>("Wait"), GetIPC());
     Write("Return", raster->WriteHistogram());
     return Succeed();
   }

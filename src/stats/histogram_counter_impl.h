@@ -9,6 +9,27 @@
 namespace lumo {
 namespace detail {
 
+/// Sets what the exact form of the bins of a band needs.
+template <typename T>
+void SetExactBins(HistogramBins<T>& bins, T upper) {
+  bins.form = Form::kExact;
+  bins.span = bins.size;
+  if constexpr (std::is_integral_v<T>) {
+    // Sizes that were found from a number of bins have quotients without rounding.
+    if (upper < bins.min) return;
+    if (bins.size == ExactBinSize(bins.min, upper, std::max(bins.count, 1U))) {
+      const Int128 values = ValuesBetween(bins.min, upper);
+      bins.parts = bins.count;
+      bins.span = static_cast<double>(values);
+      bins.wholeSpan = static_cast<typename HistogramBins<T>::WholeSpan>(values);
+    } else if (std::trunc(bins.size) == bins.size && bins.size < 0x1p64) {
+      bins.wholeSpan = static_cast<std::uint64_t>(bins.size);
+    } else {
+      bins.wholeSpan = 0;
+    }
+  }
+}
+
 /// The bins of a band of `histogram`.
 template <typename T>
 HistogramBins<T> BinsOf(const RasterHistogram<T>& histogram, unsigned band) {
@@ -17,7 +38,9 @@ HistogramBins<T> BinsOf(const RasterHistogram<T>& histogram, unsigned band) {
   bins.upper = histogram.Max(band);
   bins.size = histogram.BinSize(band);
   bins.count = histogram.BinCount(band);
-  if constexpr (std::is_integral_v<T>) {
+  if (histogram.Bins() == Form::kExact) {
+    SetExactBins(bins, histogram.Max(band));
+  } else if constexpr (std::is_integral_v<T>) {
     constexpr auto kMost = static_cast<double>(std::numeric_limits<std::uint64_t>::max());
     if (!(bins.size > 0)) bins.size = 1;
     if (bins.size >= 1) {

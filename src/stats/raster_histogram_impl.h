@@ -18,19 +18,69 @@ void FillMissing(Array<E>& array, unsigned count) {
   std::fill(array.begin(), array.end(), E());
 }
 
+/// How many integers there are from `lower` to `upper`, both counted.
+template <typename T>
+Int128 ValuesBetween(T lower, T upper) {
+  return static_cast<Int128>(upper) - static_cast<Int128>(lower) + 1;
+}
+
+/// The size of `count` bins that share the values from `lower` to `upper`.
+template <typename T>
+double ExactBinSize(T lower, T upper, unsigned count) {
+  if constexpr (std::is_integral_v<T>) {
+    return static_cast<double>(ValuesBetween(lower, upper)) / count;
+  } else {
+    if (!(lower < upper)) return 1.0;
+    const double low = static_cast<double>(lower), high = static_cast<double>(upper);
+    double size = (high - low) / count;
+    if (!std::isfinite(size)) size = high / count - low / count;
+    return std::max(size, std::numeric_limits<double>::denorm_min());
+  }
+}
+
+/// How many bins of a size hold the values from `lower` to `upper`; `most` + 1 for more than
+/// `most`.
+template <typename T>
+unsigned ExactBinCount(T lower, T upper, double size, unsigned most) {
+  const double low = static_cast<double>(lower), high = static_cast<double>(upper);
+  double count = 0;
+  if constexpr (std::is_integral_v<T>) {
+    count = std::floor(static_cast<double>(ValuesBetween(lower, upper) - 1) / size) + 1;
+  } else {
+    // The last bin begins below the upper bound and ends at it or above.
+    count = std::max(std::ceil((high - low) / size), 1.0);
+    if (count > 1 && low + (count - 1) * size >= high) count -= 1;
+    if (low + count * size < high) count += 1;
+  }
+  return count <= most ? static_cast<unsigned>(count)
+                       : most + 1;  // and there is no memory for that
+}
+
 }  // namespace detail
 
 template <typename T>
 RasterHistogram<T>::RasterHistogram(unsigned bandCount, const Array<double>& binSizes,
-                                    const Array<T>& mins, const Array<T>& maxes, HistogramSign sign)
-    : bandCount_(bandCount), binSizes_(binSizes), mins_(mins), maxes_(maxes), sign_(sign) {
+                                    const Array<T>& mins, const Array<T>& maxes, HistogramSign sign,
+                                    Form bins)
+    : bandCount_(bandCount),
+      binSizes_(binSizes),
+      mins_(mins),
+      maxes_(maxes),
+      sign_(sign),
+      bins_(bins) {
   FillBins();
 }
 
 template <typename T>
 RasterHistogram<T>::RasterHistogram(unsigned bandCount, const Array<unsigned>& binCounts,
-                                    const Array<T>& mins, const Array<T>& maxes, HistogramSign sign)
-    : bandCount_(bandCount), binCounts_(binCounts), mins_(mins), maxes_(maxes), sign_(sign) {
+                                    const Array<T>& mins, const Array<T>& maxes, HistogramSign sign,
+                                    Form bins)
+    : bandCount_(bandCount),
+      binCounts_(binCounts),
+      mins_(mins),
+      maxes_(maxes),
+      sign_(sign),
+      bins_(bins) {
   FillBins();
 }
 
@@ -47,7 +97,11 @@ bool RasterHistogram<T>::FillBins() {
   }
   unsigned most = 0;
   for (unsigned band = 0; band < bandCount_; ++band) {
-    FillBand(band);
+    if (bins_ == Form::kExact) {
+      FillBandExactly(band);
+    } else {
+      FillBand(band);
+    }
     most = std::max(most, binCounts_[band]);
   }
   const ArrayDims dims = most == 0 ? ArrayDims() : ArrayDims(bandCount_, most);
@@ -92,6 +146,20 @@ void RasterHistogram<T>::FillBand(unsigned band) {
 }
 
 template <typename T>
+void RasterHistogram<T>::FillBandExactly(unsigned band) {
+  const T lower = mins_[band];
+  const T upper = maxes_[band];
+  unsigned& count = binCounts_[band];
+  double& size = binSizes_[band];
+  if (upper < lower) return;  // counts nothing
+  if (count != 0 && size == 0.0) {
+    size = detail::ExactBinSize(lower, upper, count);
+  } else if (count == 0 && size > 0.0) {
+    count = detail::ExactBinCount(lower, upper, size, kMostBins);
+  }
+}
+
+template <typename T>
 bool RasterHistogram<T>::CanCount() const {
   if constexpr (std::is_integral_v<T>) {
     for (unsigned band = 0; band < bandCount_; ++band) {
@@ -103,7 +171,7 @@ bool RasterHistogram<T>::CanCount() const {
 
 template <typename T>
 bool RasterHistogram<T>::Join(const RasterHistogram& other) {
-  if (bandCount_ != other.bandCount_ || sign_ != other.sign_ ||
+  if (bandCount_ != other.bandCount_ || sign_ != other.sign_ || bins_ != other.bins_ ||
       !std::equal(binCounts_.begin(), binCounts_.end(), other.binCounts_.begin(),
                   other.binCounts_.end())) {
     return false;
@@ -119,6 +187,7 @@ RasterBandHistogram<T> RasterHistogram<T>::BandHistogram(unsigned band,
   histogram.band = numberInRaster;
   histogram.source = StatsSource::kDynamic;
   histogram.sign = sign_;
+  histogram.bins = bins_;
   histogram.binCount = binCounts_[band];
   histogram.binSize = binSizes_[band];
   histogram.min = mins_[band];

@@ -1,6 +1,9 @@
+#include <algorithm>
+
 #include "foundation/fault.h"
 #include "foundation/progress.h"
 #include "raster/raster_command.h"
+#include "stats/turn.h"
 
 namespace lumo {
 namespace {
@@ -17,7 +20,10 @@ class ComputeStatsCommand : public RasterCommand {
     if (!raster) return Fail();
     const AsyncPtr pyramid = raster->PyramidAsync();
     if (pyramid) pyramid->WaitFinished();
+    const Turn turn(raster, Read<Waiting>("Wait"), GetIPC());
     raster->SetStatsMode(mode);
+    // While a computation goes on the mode stays what it was.
+    while (raster->StatsMode() != mode && turn.AwaitRuns()) raster->SetStatsMode(mode);
     const bool typed = DispatchType(TenTypes{}, raster->DataType(), [&]<typename T>() {
       const RasterPtr<T> source(raster);
       if (!source) return false;
@@ -42,6 +48,7 @@ class ComputeStatsCommand : public RasterCommand {
   RasterBandStats<T> Ask(Raster<T>& raster, unsigned band, bool extended, const Share& share) {
     RasterBandStats<T> stats;
     stats.min = raster.Min(band, share());
+    if (!raster.StatsExist(band, StatsMask::Min)) return stats;  // nor will the others
     stats.max = raster.Max(band, share());
     stats.mean = raster.Mean(band, share());
     stats.std = raster.Std(band, share());
@@ -55,7 +62,8 @@ class ComputeStatsCommand : public RasterCommand {
     }
     const RasterBandStats<T> whole = raster.BandStats(band);
     const unsigned mask = extended ? StatsMask::Extended : StatsMask::Basic;
-    return (whole.mask & mask) == mask ? whole : stats;
+    const bool hasPairs = whole.sumXY.GetCount() == bands && whole.cov.GetCount() == bands;
+    return (whole.mask & mask) == mask && (!extended || hasPairs) ? whole : stats;
   }
 
   template <typename T>
@@ -76,9 +84,12 @@ class ComputeStatsCommand : public RasterCommand {
     if (extended) {
       sumXY.Resize(ArrayDims(bands, bands));
       cov.Resize(ArrayDims(bands, bands));
+      std::fill(sumXY.begin(), sumXY.end(), 0.0);
+      std::fill(cov.begin(), cov.end(), 0.0);
     }
     for (unsigned band = 0; band < bands; ++band) {
       const RasterBandStats<T> stats = Ask(raster, band, extended, share);
+      if (!raster.StatsExist(band, StatsMask::Min)) break;
       min[band] = stats.min;
       max[band] = stats.max;
       mean[band] = stats.mean;
@@ -131,7 +142,7 @@ const CommandDeclaration kBasic{
     "GetBasicRasterStatsCommand",
     "Statistics",
     "Gives the statistics of each band, computed where they are not at hand.",
-    {kUri},
+    {kUri, WaitInput()},
     kBasicOutputs};
 
 class GetBasicRasterStatsCommand final : public ComputeStatsCommand {
@@ -144,7 +155,7 @@ const CommandDeclaration kExtended{
     "GetExtendedRasterStatsCommand",
     "Statistics",
     "Gives the statistics of each band and between bands, computed where they are not at hand.",
-    {kUri},
+    {kUri, WaitInput()},
     ExtendedOutputs()};
 
 class GetExtendedRasterStatsCommand final : public ComputeStatsCommand {
@@ -153,19 +164,22 @@ class GetExtendedRasterStatsCommand final : public ComputeStatsCommand {
 
 const CommandFactoryT<GetExtendedRasterStatsCommand> extendedFactory(kExtended);
 
-const CommandDeclaration kSetMode{"SetRasterStatsModeCommand",
-                                  "Statistics",
-                                  "Sets which statistics a raster computes.",
-                                  {kUri,
-                                   {"StatsMode", Presence::kRequired, ValueKind::kWord,
-                                    "DoBasic, or DoExtended: with those between bands"}},
-                                  {{"StatsMode", ValueKind::kWord, "the mode from now on"}}};
+const CommandDeclaration kSetMode{
+    "SetRasterStatsModeCommand",
+    "Statistics",
+    "Sets which statistics a raster computes.",
+    {kUri,
+     {"StatsMode", Presence::kRequired, ValueKind::kWord,
+      "DoBasic, or DoExtended: with those between bands", "", &WordsIn<StatsMode>},
+     WaitInput()},
+    {{"StatsMode", ValueKind::kWord, "the mode from now on"}}};
 
 class SetRasterStatsModeCommand final : public RasterCommand {
   CommandResult Execute() override {
     if (!CheckInputs()) return Fail();
     const BasicRasterPtr raster = FindRaster();
     if (!raster) return Fail();
+    const Turn turn(raster, Read<Waiting>("Wait"), GetIPC());
     raster->SetStatsMode(Read<StatsMode>("StatsMode"));
     Write("StatsMode", raster->StatsMode());
     return Succeed();
@@ -181,7 +195,8 @@ const CommandDeclaration kSetStats{"SetRasterBandStatsCommand",
                                     {"RasterBandStats", Presence::kRequired, ValueKind::kText,
                                      "band, mask, min, max, mean, deviation, sum, sum of squares, "
                                      "root mean square, and the arrays "
-                                     "of products and covariances"}},
+                                     "of products and covariances"},
+                                    WaitInput()},
                                    {}};
 
 class SetRasterBandStatsCommand final : public RasterCommand {
@@ -189,6 +204,7 @@ class SetRasterBandStatsCommand final : public RasterCommand {
     if (!CheckInputs()) return Fail();
     const BasicRasterPtr raster = FindRaster();
     if (!raster) return Fail();
+    const Turn turn(raster, Read<Waiting>("Wait"), GetIPC());
     const bool set = DispatchType(TenTypes{}, raster->DataType(), [&]<typename T>() {
       const RasterPtr<T> source(raster);
       const auto stats = Read<RasterBandStats<T>>("RasterBandStats");
@@ -206,7 +222,7 @@ const CommandDeclaration kSave{
     "SaveRasterStatsCommand",
     "Statistics",
     "Stores the statistics of a raster through its data source.",
-    {kUri},
+    {kUri, WaitInput()},
     {{"Return", ValueKind::kBoolean, "they are stored, or the source has no place for them"}}};
 
 class SaveRasterStatsCommand final : public RasterCommand {
@@ -214,6 +230,7 @@ class SaveRasterStatsCommand final : public RasterCommand {
     if (!CheckInputs()) return Fail();
     const BasicRasterPtr raster = FindRaster();
     if (!raster) return Fail();
+    const Turn turn(raster, Read<Waiting>("Wait"), GetIPC());
     Write("Return", raster->WriteStats());
     return Succeed();
   }

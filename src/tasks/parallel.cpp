@@ -7,6 +7,8 @@
 #include <oneapi/tbb/parallel_invoke.h>
 #include <oneapi/tbb/task_arena.h>
 
+#include "tasks/engine_arena.h"
+
 #if defined(__SANITIZE_THREAD__)
 #include <sanitizer/tsan_interface.h>
 #define VEXG_TSAN(call) call
@@ -106,6 +108,13 @@ struct TBBParallelFor3 {
   }
 };
 
+/// Runs `work` in the engine, and keeps this thread from taking up other work while it waits
+/// inside.
+template <typename Work>
+void Isolate(const Work& work) {
+  RunInEngine([&work] { tbb::this_task_arena::isolate(work); });
+}
+
 }  // namespace
 
 template <typename I>
@@ -113,9 +122,7 @@ void RunParallelFor(IParallelFor<I>& loop, unsigned grain, const AbortFlag* abor
   if (loop.Begin() >= loop.End()) return;
   const tbb::blocked_range<I> range(loop.Begin(), loop.End(), std::max(grain, 1U));
   LoopOrder order;
-  tbb::this_task_arena::isolate([&] {
-    tbb::parallel_for(range, TBBParallelFor<I>{&loop, abort, &order});
-  });
+  Isolate([&] { tbb::parallel_for(range, TBBParallelFor<I>{&loop, abort, &order}); });
 }
 
 template <typename I>
@@ -125,9 +132,7 @@ void RunParallelFor2(IParallelFor2<I>& loop, unsigned grain, const AbortFlag* ab
   const tbb::blocked_range2d<I> range(loop.Begin0(), loop.End0(), step, loop.Begin1(), loop.End1(),
                                       step);
   LoopOrder order;
-  tbb::this_task_arena::isolate([&] {
-    tbb::parallel_for(range, TBBParallelFor2<I>{&loop, abort, &order});
-  });
+  Isolate([&] { tbb::parallel_for(range, TBBParallelFor2<I>{&loop, abort, &order}); });
 }
 
 template <typename I>
@@ -139,18 +144,17 @@ void RunParallelFor3(IParallelFor3<I>& loop, const AbortFlag* abort) {
   const tbb::blocked_range3d<I> range(loop.Begin0(), loop.End0(), loop.Begin1(), loop.End1(),
                                       loop.Begin2(), loop.End2());
   LoopOrder order;
-  tbb::this_task_arena::isolate([&] {
-    tbb::parallel_for(range, TBBParallelFor3<I>{&loop, abort, &order});
-  });
+  Isolate([&] { tbb::parallel_for(range, TBBParallelFor3<I>{&loop, abort, &order}); });
 }
 
 void detail::InvokeBoth(WorkRef first, WorkRef second) {
   LoopOrder order;
-  tbb::parallel_invoke([&] { order.RunPart(first); }, [&] { order.RunPart(second); });
+  RunInEngine(
+      [&] { tbb::parallel_invoke([&] { order.RunPart(first); }, [&] { order.RunPart(second); }); });
 }
 
 void detail::Isolated(WorkRef work) {
-  tbb::this_task_arena::isolate(work);
+  Isolate(work);
 }
 
 template VEXG_EXPORT void RunParallelFor(IParallelFor<unsigned>&, unsigned, const AbortFlag*);

@@ -7,6 +7,7 @@
 #include <oneapi/tbb/task_arena.h>
 
 #include "foundation/library.h"
+#include "tasks/engine_arena.h"
 #include "tasks/pipeline.h"
 
 namespace lumo {
@@ -75,9 +76,9 @@ bool RunPipeline(IPipelineReader<T>& reader, std::span<ISimplePipelineProcess<T>
   // Inside a stage or a loop of another run, the wait must take up nothing of that. Elsewhere there
   // is nothing but this pipeline, and the wait helps with the loops of its stages.
   if (tbb::task::current_context() != nullptr) {
-    tbb::this_task_arena::isolate(run);
+    RunInEngine([&] { tbb::this_task_arena::isolate(run); });
   } else {
-    run();
+    RunInEngine(run);
   }
   return true;
 }

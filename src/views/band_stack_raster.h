@@ -10,7 +10,8 @@ namespace lumo {
 /// Shows the bands of several rasters of one pixel type as those of one raster, in order. Size and
 /// geo-reference are the first member's; a read goes to every member with the same rectangle. Min,
 /// max and the like of a band are its member's; what needs two bands, and histograms, are computed
-/// on the stack. Exists for EightTypes.
+/// on the stack, whatever the members have: their arrays are of their own bands alone. Exists for
+/// EightTypes.
 ///
 /// Ownership: shares the members, which do not know the stack.
 /// Threads:   every operation may run on many threads at once; nothing is stored per call.
@@ -64,8 +65,11 @@ class BandStackRaster final : public ComputedRaster<T> {
                   Array<T>& pixels, Array<unsigned char>& state) override;
   bool PutSubRect(const SubRect& rect, const Array<unsigned>& bands, Interleave interleave,
                   Array<T>& pixels, Array<unsigned char>& state) override;
+  std::uint64_t WriteCount() const override;
 
  private:
+  static constexpr unsigned kPairs = StatsMask::SumXY | StatsMask::Cov;
+
   /// Where a band of the stack comes from.
   struct Source {
     unsigned member;

@@ -2,7 +2,7 @@
 
 #include <algorithm>
 
-#include "raster/interleave.h"
+#include "data/block_shape.h"
 #include "views/band_stack_raster.h"
 
 namespace lumo {
@@ -97,8 +97,10 @@ RasterPtr<T> BandStackRaster<T>::PyramidLevel(unsigned level) {
 
 template <typename T>
 bool BandStackRaster<T>::StatsExist(unsigned band, unsigned mask) const {
-  return AskMember(
-      band, [&](Raster<T>& member, unsigned local) { return member.StatsExist(local, mask); });
+  if ((mask & kPairs) != 0 && !ComputedRaster<T>::StatsExist(band, mask & kPairs)) return false;
+  return AskMember(band, [&](Raster<T>& member, unsigned local) {
+    return member.StatsExist(local, mask & ~kPairs);
+  });
 }
 
 template <typename T>
@@ -191,8 +193,19 @@ template <typename T>
 RasterBandStats<T> BandStackRaster<T>::BandStats(unsigned band) const {
   RasterBandStats<T> stats =
       AskMember(band, [](Raster<T>& member, unsigned local) { return member.BandStats(local); });
+  const RasterBandStats<T> own = ComputedRaster<T>::BandStats(band);
   stats.band = band;
+  stats.sumXY = own.sumXY;
+  stats.cov = own.cov;
+  stats.mask = (stats.mask & ~kPairs) | (own.mask & kPairs);
   return stats;
+}
+
+template <typename T>
+std::uint64_t BandStackRaster<T>::WriteCount() const {
+  std::uint64_t writes = 0;  // no sum comes twice, since none of them ever falls
+  for (const auto& member : members_) writes += member->WriteCount();
+  return writes;
 }
 
 template <typename T>
@@ -233,26 +246,23 @@ template <typename T>
 bool BandStackRaster<T>::GetSubRect(const SubRect& rect, const Array<unsigned>& bands,
                                     Interleave interleave, Array<T>& pixels,
                                     Array<unsigned char>& state) {
-  if (!Knows(bands)) return false;
-  const Share first = ShareOf(sources_[bands[0]].member, bands);
-  if (first.bands.GetCount() == bands.GetCount()) {  // all of one member
-    return members_[sources_[bands[0]].member]->GetSubRect(rect, first.bands, interleave, pixels,
-                                                           state);
+  const BlockShape block(rect, bands, interleave);
+  if (!Knows(block.bands)) return false;
+  const Share first = ShareOf(sources_[block.bands[0]].member, block.bands);
+  if (first.bands.GetCount() == block.count) {  // all of one member
+    return members_[sources_[block.bands[0]].member]->GetSubRect(rect, first.bands, interleave,
+                                                                 pixels, state);
   }
-  const unsigned width = rect.Width(), height = rect.Height(), count = bands.GetCount();
-  const ArrayDims dims = BlockDims(interleave, width, height, count);
-  const std::size_t plane = std::size_t{width} * height;
+  const std::size_t plane = std::size_t{block.width} * block.height;
   Array<T> planes, part;
   Array<unsigned char> planeStates, partState;
-  const ArrayDims flat(dims.count);
-  if (!pixels.Resize(dims) || !state.Resize(dims) || !planes.Resize(flat) ||
-      !planeStates.Resize(flat)) {
-    return false;
-  }
+  const ArrayDims flat(block.dims.count);
+  if (!block.Size(pixels, state) || !planes.Resize(flat) || !planeStates.Resize(flat)) return false;
   for (unsigned member = 0; member < members_.size(); ++member) {
-    const Share share = ShareOf(member, bands);
+    const Share share = ShareOf(member, block.bands);
     if (share.bands.GetCount() == 0) continue;
-    if (!members_[member]->GetSubRect(rect, share.bands, Interleave::BSQ, part, partState)) {
+    if (!members_[member]->GetSubRect(rect, share.bands, Interleave::BSQ, part, partState) ||
+        part.GetCount() < plane * share.bands.GetCount()) {  // the member has cut the block
       return false;
     }
     for (unsigned i = 0; i < share.places.GetCount(); ++i) {
@@ -260,41 +270,34 @@ bool BandStackRaster<T>::GetSubRect(const SubRect& rect, const Array<unsigned>& 
       std::copy_n(&partState[i * plane], plane, &planeStates[share.places[i] * plane]);
     }
   }
-  return ConvertInterleave(planes.GetData(), Interleave::BSQ, pixels.GetData(), interleave, width,
-                           height, count, sizeof(T)) &&
-         ConvertInterleave(planeStates.GetData(), Interleave::BSQ, state.GetData(), interleave,
-                           width, height, count, 1);
+  return block.Convert(planes, planeStates, Interleave::BSQ, pixels, state, interleave);
 }
 
 template <typename T>
 bool BandStackRaster<T>::PutSubRect(const SubRect& rect, const Array<unsigned>& bands,
                                     Interleave interleave, Array<T>& pixels,
                                     Array<unsigned char>& state) {
-  const unsigned width = rect.Width(), height = rect.Height(), count = bands.GetCount();
-  const std::size_t plane = std::size_t{width} * height;
-  const ArrayDims flat(BlockDims(interleave, width, height, count).count);
-  Array<T> planes, part;
-  Array<unsigned char> planeStates, partState;
-  if (!Knows(bands) || pixels.GetCount() < flat.count || state.GetCount() < flat.count ||
-      !planes.Resize(flat) || !planeStates.Resize(flat) ||
-      !ConvertInterleave(pixels.GetData(), interleave, planes.GetData(), Interleave::BSQ, width,
-                         height, count, sizeof(T)) ||
-      !ConvertInterleave(state.GetData(), interleave, planeStates.GetData(), Interleave::BSQ, width,
-                         height, count, 1)) {
+  const BlockShape block(rect, bands, interleave);
+  const std::size_t plane = std::size_t{block.width} * block.height;
+  const ArrayDims flat(block.dims.count);
+  Array<T> planes;
+  Array<unsigned char> planeStates;
+  if (!Knows(block.bands) || !block.IsHeldBy(pixels, state) || !planes.Resize(flat) ||
+      !planeStates.Resize(flat) ||
+      !block.Convert(pixels, state, interleave, planes, planeStates, Interleave::BSQ)) {
     return false;
   }
-  for (unsigned member = 0; member < members_.size(); ++member) {
-    const Share share = ShareOf(member, bands);
-    const ArrayDims dims = BlockDims(Interleave::BSQ, width, height, share.bands.GetCount());
-    if (share.bands.GetCount() == 0) continue;
-    if (!part.Resize(dims) || !partState.Resize(dims)) return false;
-    for (unsigned i = 0; i < share.places.GetCount(); ++i) {
-      std::copy_n(&planes[share.places[i] * plane], plane, &part[i * plane]);
-      std::copy_n(&planeStates[share.places[i] * plane], plane, &partState[i * plane]);
-    }
-    if (!members_[member]->PutSubRect(rect, share.bands, Interleave::BSQ, part, partState)) {
-      return false;
-    }
+  // In the order of the list, neighbours of one member together: two members may stand on the same
+  // pixels, and then the last in the list stays.
+  for (unsigned first = 0, next = 0; first < block.count; first = next) {
+    const unsigned member = sources_[block.bands[first]].member;
+    while (next < block.count && sources_[block.bands[next]].member == member) ++next;
+    Array<unsigned> local{ArrayDims(next - first)};
+    for (unsigned i = first; i < next; ++i) local[i - first] = sources_[block.bands[i]].band;
+    const ArrayDims dims = BlockDims(Interleave::BSQ, block.width, block.height, next - first);
+    Array<T> part(&planes[first * plane], dims);
+    Array<unsigned char> partState(&planeStates[first * plane], dims);
+    if (!members_[member]->PutSubRect(rect, local, Interleave::BSQ, part, partState)) return false;
   }
   return true;
 }

@@ -3,8 +3,10 @@
 #include "commands/catalog.h"
 #include "data/access_policy.h"
 #include "data/data_manager.h"
+#include "data/file_uri.h"
 #include "foundation/fault.h"
 #include "views/reader_raster.h"
+#include "views/source_raster.h"
 
 namespace lumo {
 namespace {
@@ -22,10 +24,22 @@ bool BelongTogether(RasterDataConnection& source, RasterDataConnection& pyramid)
   return false;
 }
 
+/// False for a raster on a source whose files have changed since it was opened.
+bool IsUpToDate(const BasicRasterPtr& raster) {
+  const auto* const source = dynamic_cast<const SourceRaster*>(raster.Get());
+  return source == nullptr || source->IsUpToDate();
+}
+
 }  // namespace
 
+std::span<const EnumWord<SourceCheck>> WordsOf(SourceCheck) {
+  static constexpr EnumWord<SourceCheck> kWords[] = {{"Told", SourceCheck::kTold},
+                                                     {"Compared", SourceCheck::kCompared}};
+  return kWords;
+}
+
 BasicRasterPtr MakeReaderRaster(const DataConnectionPtr& connection,
-                                const DataConnectionPtr& pyramidConnection) {
+                                const DataConnectionPtr& pyramidConnection, const URI& uri) {
   const RasterDataConnectionPtr source(connection);
   if (!source) {
     if (connection) SetFault(connection->URI().ToUTF8() + ": the source is no raster");
@@ -41,7 +55,7 @@ BasicRasterPtr MakeReaderRaster(const DataConnectionPtr& connection,
     DispatchType(TwelveTypes{}, dispatch->DataType(), [&]<typename T>() {
       const RasterReaderPtr<T> pyramidReader =
           pyramidDispatch ? pyramidDispatch->Get<T>() : RasterReaderPtr<T>();
-      made.Reset(new ReaderRaster<T>(dispatch->Get<T>(), source, pyramidReader, pyramid));
+      made.Reset(new ReaderRaster<T>(dispatch->Get<T>(), source, pyramidReader, pyramid, uri));
       return true;
     });
   }
@@ -67,6 +81,26 @@ CatalogRasterRef::CatalogRasterRef(const Array<String>& connStrings, const GeoRe
   if (!raster) raster = MakeReaderRaster(connection);
   manager.ReleaseConnection(connection);
   Enter(raster);
+}
+
+CatalogRasterRef::CatalogRasterRef(const DataConnectionPtr& connection,
+                                   const DataConnectionPtr& pyramid, SourceCheck check)
+    : releaseOnDestroy_(false) {
+  const URI uri = connection->URI();
+  if (check == SourceCheck::kTold) {
+    BasicRasterPtr raster(catalog::Find(uri));
+    if (!raster) raster = MakeReaderRaster(connection, pyramid);
+    Enter(raster);
+    return;
+  }
+  // Each round looks at one more raster that has been opened on the source.
+  for (unsigned counter = 1;; ++counter) {
+    const URI counted = CountedURI(uri, counter);
+    const BasicRasterPtr raster(catalog::Find(counted));
+    if (raster && !IsUpToDate(raster)) continue;
+    Enter(raster ? raster : MakeReaderRaster(connection, pyramid, counted));
+    return;
+  }
 }
 
 CatalogRasterRef::~CatalogRasterRef() {

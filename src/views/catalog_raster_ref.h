@@ -1,9 +1,21 @@
 #pragma once
 
+#include <span>
+
+#include "commands/value_text.h"
 #include "data/data_connection.h"
 #include "raster/raster.h"
 
 namespace lumo {
+
+/// What a second open of a source does that is open already.
+enum class SourceCheck {
+  kTold,      ///< it shares the raster that stands on the source
+  kCompared,  ///< as long as the files of the source have not changed
+};
+
+/// "Told", "Compared".
+VEXG_EXPORT std::span<const EnumWord<SourceCheck>> WordsOf(SourceCheck);
 
 /// Holds an open raster while code works with it, and its place in the catalog: making one adds 1
 /// to the raster's count there.
@@ -19,6 +31,12 @@ class VEXG_EXPORT CatalogRasterRef {
   ///                  call; else on this thread.
   CatalogRasterRef(const Array<String>& connStrings, const GeoRefPtr& geoRef,
                    const MetadataPtr& metadata, bool useProxy, bool releaseOnDestroy);
+
+  /// The raster of a source that is open, as `check` says: one that the catalog knows already, or a
+  /// new one. Where the files of the source are not those any more that a raster of the catalog was
+  /// opened on, it is a new one, whose URI has a counter behind it.
+  CatalogRasterRef(const DataConnectionPtr& connection, const DataConnectionPtr& pyramid,
+                   SourceCheck check);
 
   ~CatalogRasterRef();
   CatalogRasterRef(const CatalogRasterRef&) = delete;
@@ -39,7 +57,9 @@ class VEXG_EXPORT CatalogRasterRef {
 
 /// The raster on an open source, and on the pyramid file of that source when there is one. Empty,
 /// with the fault text told, when a source is no raster or the pixel types differ.
+/// @param uri  in place of the source's, unless empty.
 VEXG_EXPORT BasicRasterPtr MakeReaderRaster(const DataConnectionPtr& connection,
-                                            const DataConnectionPtr& pyramidConnection = {});
+                                            const DataConnectionPtr& pyramidConnection = {},
+                                            const URI& uri = {});
 
 }  // namespace lumo

@@ -57,6 +57,7 @@ class ComplexRaster final : public ComputedRaster<T> {
   /// As Raster<T>::GetSubRect; a block needs an interleave.
   bool GetSubRect(const SubRect& rect, const Array<unsigned>& bands, Interleave interleave,
                   Array<T>& pixels, Array<unsigned char>& state) override;
+  std::uint64_t WriteCount() const override { return parent_ ? parent_->WriteCount() : 0; }
 
  private:
   RasterPtr<Complex<T>> parent_;  // the base has no parent: its type is another

@@ -12,10 +12,16 @@ namespace lumo {
 ///
 /// A class derived from it says StopComputing() first in its destructor: what is being computed
 /// reads the raster, which has to be whole until it has stopped.
+///
+/// A view that in one of its forms shows the statistics of its parent says so to the constructor:
+/// the operations on statistics and histograms then go to the parent like everything else.
 template <typename T>
 class ComputedRaster : public RasterView<T> {
  public:
-  explicit ComputedRaster(const RasterPtr<T>& parent = {});
+  /// Whose statistics and histograms the raster gives.
+  enum class StatsOf { kThis, kParent };
+
+  explicit ComputedRaster(const RasterPtr<T>& parent = {}, StatsOf statsOf = StatsOf::kThis);
   ~ComputedRaster() override;
 
   bool StatsExist(unsigned band, unsigned mask) const override;
@@ -23,7 +29,7 @@ class ComputedRaster : public RasterView<T> {
   AsyncPtr StatsAsync() const override;
   void SetStatsMode(lumo::StatsMode mode) override;
   lumo::StatsMode StatsMode() const override;
-  bool WriteStats() override { return false; }
+  bool WriteStats() override;
   void SetBandStats(const RasterBandStats<T>& stats) override;
   RasterBandStats<T> BandStats(unsigned band) const override;
   T Min(unsigned band, const IPC& ipc) override;
@@ -37,7 +43,7 @@ class ComputedRaster : public RasterView<T> {
   double Cov(unsigned band, unsigned otherBand, const IPC& ipc) override;
 
   AsyncPtr HistogramAsync() const override;
-  bool WriteHistogram() override { return false; }
+  bool WriteHistogram() override;
   void SetBandHistogram(const RasterBandHistogram<T>& histogram) override;
   Array<RasterBandHistogram<T>> BandHistogram(unsigned band) const override;
   AsyncPtr HistogramByBinSize(T lower, T upper, double binSize, const Array<unsigned>& bands,
@@ -46,6 +52,7 @@ class ComputedRaster : public RasterView<T> {
                                HistogramSign sign, const IPC& ipc) override;
   AsyncPtr HistogramAllBands(T lower, T upper, unsigned binCount, HistogramSign sign,
                              const IPC& ipc) override;
+  AsyncPtr CountHistogram(const HistogramRequest<T>& request, const IPC& ipc) override;
 
  protected:
   /// Ends what is being computed; nothing is at hand, or can be computed, from then on.
@@ -55,6 +62,12 @@ class ComputedRaster : public RasterView<T> {
   DynamicRasterHistogram<T>* Histogram() const { return histogram_.Get(); }
 
  private:
+  template <typename Own, typename Parents>
+  auto OfStats(const Own& own, const Parents& parents) const;
+  template <typename Own, typename Parents>
+  auto OfHistogram(const Own& own, const Parents& parents) const;
+
+  const StatsOf statsOf_;
   DynamicRasterStatsPtr<T> stats_;
   DynamicRasterHistogramPtr<T> histogram_;
 };

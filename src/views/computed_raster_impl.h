@@ -7,10 +7,12 @@
 namespace lumo {
 
 template <typename T>
-ComputedRaster<T>::ComputedRaster(const RasterPtr<T>& parent)
-    : RasterView<T>(parent),
-      stats_(new DynamicRasterStats<T>(this)),
-      histogram_(new DynamicRasterHistogram<T>(this)) {}
+ComputedRaster<T>::ComputedRaster(const RasterPtr<T>& parent, StatsOf statsOf)
+    : RasterView<T>(parent), statsOf_(statsOf) {
+  if (statsOf_ == StatsOf::kParent) return;
+  stats_.Reset(new DynamicRasterStats<T>(this));
+  histogram_.Reset(new DynamicRasterHistogram<T>(this));
+}
 
 template <typename T>
 ComputedRaster<T>::~ComputedRaster() {
@@ -23,121 +25,183 @@ void ComputedRaster<T>::StopComputing() {
   stats_ = DynamicRasterStatsPtr<T>();
 }
 
+/// What `own(statistics)` gives, 0 or empty once they have stopped; or what `parents()` does, where
+/// they are the parent's.
+template <typename T>
+template <typename Own, typename Parents>
+auto ComputedRaster<T>::OfStats(const Own& own, const Parents& parents) const {
+  using Result = decltype(own(*stats_));
+  if (statsOf_ == StatsOf::kParent) return parents();
+  return stats_ ? own(*stats_) : Result();
+}
+template <typename T>
+template <typename Own, typename Parents>
+auto ComputedRaster<T>::OfHistogram(const Own& own, const Parents& parents) const {
+  using Result = decltype(own(*histogram_));
+  if (statsOf_ == StatsOf::kParent) return parents();
+  return histogram_ ? own(*histogram_) : Result();
+}
+
 template <typename T>
 bool ComputedRaster<T>::StatsExist(unsigned band, unsigned mask) const {
-  return stats_ && stats_->StatsExist(band, mask);
+  return OfStats([&](auto& stats) { return stats.StatsExist(band, mask); },
+                 [&] { return RasterView<T>::StatsExist(band, mask); });
 }
 
 template <typename T>
 AsyncPtr ComputedRaster<T>::StatsBuild(const IPC& ipc) {
-  return stats_ ? stats_->StatsBuild(ipc) : AsyncPtr();
+  return OfStats([&](auto& stats) { return stats.StatsBuild(ipc); },
+                 [&] { return RasterView<T>::StatsBuild(ipc); });
 }
 
 template <typename T>
 AsyncPtr ComputedRaster<T>::StatsAsync() const {
-  return stats_ ? stats_->StatsAsync() : AsyncPtr();
+  return OfStats([&](auto& stats) { return stats.StatsAsync(); },
+                 [&] { return RasterView<T>::StatsAsync(); });
 }
 
 template <typename T>
 void ComputedRaster<T>::SetStatsMode(lumo::StatsMode mode) {
-  if (stats_) stats_->SetStatsMode(mode);
+  OfStats([&](auto& stats) { return stats.SetStatsMode(mode); },
+          [&] { return RasterView<T>::SetStatsMode(mode); });
 }
 
 template <typename T>
 lumo::StatsMode ComputedRaster<T>::StatsMode() const {
-  return stats_ ? stats_->StatsMode() : lumo::StatsMode::kBasic;
+  return OfStats([&](auto& stats) { return stats.StatsMode(); },
+                 [&] { return RasterView<T>::StatsMode(); });
+}
+
+template <typename T>
+bool ComputedRaster<T>::WriteStats() {
+  return statsOf_ == StatsOf::kParent && RasterView<T>::WriteStats();
 }
 
 template <typename T>
 void ComputedRaster<T>::SetBandStats(const RasterBandStats<T>& stats) {
-  if (stats_) stats_->SetBandStats(stats);
+  OfStats([&](auto& own) { return own.SetBandStats(stats); },
+          [&] { return RasterView<T>::SetBandStats(stats); });
 }
 
 template <typename T>
 RasterBandStats<T> ComputedRaster<T>::BandStats(unsigned band) const {
-  return stats_ ? stats_->BandStats(band) : RasterBandStats<T>();
+  return OfStats([&](auto& stats) { return stats.BandStats(band); },
+                 [&] { return RasterView<T>::BandStats(band); });
 }
 
 template <typename T>
 T ComputedRaster<T>::Min(unsigned band, const IPC& ipc) {
-  return stats_ ? stats_->Min(band, ipc) : T();
+  return OfStats([&](auto& stats) { return stats.Min(band, ipc); },
+                 [&] { return RasterView<T>::Min(band, ipc); });
 }
 
 template <typename T>
 T ComputedRaster<T>::Max(unsigned band, const IPC& ipc) {
-  return stats_ ? stats_->Max(band, ipc) : T();
+  return OfStats([&](auto& stats) { return stats.Max(band, ipc); },
+                 [&] { return RasterView<T>::Max(band, ipc); });
 }
 
 template <typename T>
 double ComputedRaster<T>::Mean(unsigned band, const IPC& ipc) {
-  return stats_ ? stats_->Mean(band, ipc) : 0.0;
+  return OfStats([&](auto& stats) { return stats.Mean(band, ipc); },
+                 [&] { return RasterView<T>::Mean(band, ipc); });
 }
 
 template <typename T>
 double ComputedRaster<T>::Std(unsigned band, const IPC& ipc) {
-  return stats_ ? stats_->Std(band, ipc) : 0.0;
+  return OfStats([&](auto& stats) { return stats.Std(band, ipc); },
+                 [&] { return RasterView<T>::Std(band, ipc); });
 }
 
 template <typename T>
 double ComputedRaster<T>::Sum(unsigned band, const IPC& ipc) {
-  return stats_ ? stats_->Sum(band, ipc) : 0.0;
+  return OfStats([&](auto& stats) { return stats.Sum(band, ipc); },
+                 [&] { return RasterView<T>::Sum(band, ipc); });
 }
 
 template <typename T>
 double ComputedRaster<T>::Sum2(unsigned band, const IPC& ipc) {
-  return stats_ ? stats_->Sum2(band, ipc) : 0.0;
+  return OfStats([&](auto& stats) { return stats.Sum2(band, ipc); },
+                 [&] { return RasterView<T>::Sum2(band, ipc); });
 }
 
 template <typename T>
 double ComputedRaster<T>::RMS(unsigned band, const IPC& ipc) {
-  return stats_ ? stats_->RMS(band, ipc) : 0.0;
+  return OfStats([&](auto& stats) { return stats.RMS(band, ipc); },
+                 [&] { return RasterView<T>::RMS(band, ipc); });
 }
 
 template <typename T>
 double ComputedRaster<T>::SumXY(unsigned band, unsigned otherBand, const IPC& ipc) {
-  return stats_ ? stats_->SumXY(band, otherBand, ipc) : 0.0;
+  return OfStats([&](auto& stats) { return stats.SumXY(band, otherBand, ipc); },
+                 [&] { return RasterView<T>::SumXY(band, otherBand, ipc); });
 }
 
 template <typename T>
 double ComputedRaster<T>::Cov(unsigned band, unsigned otherBand, const IPC& ipc) {
-  return stats_ ? stats_->Cov(band, otherBand, ipc) : 0.0;
+  return OfStats([&](auto& stats) { return stats.Cov(band, otherBand, ipc); },
+                 [&] { return RasterView<T>::Cov(band, otherBand, ipc); });
 }
 
 template <typename T>
 AsyncPtr ComputedRaster<T>::HistogramAsync() const {
-  return histogram_ ? histogram_->HistogramAsync() : AsyncPtr();
+  return OfHistogram([&](auto& histogram) { return histogram.HistogramAsync(); },
+                     [&] { return RasterView<T>::HistogramAsync(); });
+}
+
+template <typename T>
+bool ComputedRaster<T>::WriteHistogram() {
+  return statsOf_ == StatsOf::kParent && RasterView<T>::WriteHistogram();
 }
 
 template <typename T>
 void ComputedRaster<T>::SetBandHistogram(const RasterBandHistogram<T>& histogram) {
-  if (histogram_) histogram_->SetBandHistogram(histogram);
+  OfHistogram([&](auto& own) { return own.SetBandHistogram(histogram); },
+              [&] { return RasterView<T>::SetBandHistogram(histogram); });
 }
 
 template <typename T>
 Array<RasterBandHistogram<T>> ComputedRaster<T>::BandHistogram(unsigned band) const {
-  return histogram_ ? histogram_->BandHistogram(band) : Array<RasterBandHistogram<T>>();
+  return OfHistogram([&](auto& histogram) { return histogram.BandHistogram(band); },
+                     [&] { return RasterView<T>::BandHistogram(band); });
 }
 
 template <typename T>
 AsyncPtr ComputedRaster<T>::HistogramByBinSize(T lower, T upper, double binSize,
                                                const Array<unsigned>& bands, HistogramSign sign,
                                                const IPC& ipc) {
-  return histogram_ ? histogram_->HistogramByBinSize(lower, upper, binSize, bands, sign, ipc)
-                    : AsyncPtr();
+  return OfHistogram(
+      [&](auto& histogram) {
+        return histogram.HistogramByBinSize(lower, upper, binSize, bands, sign, ipc);
+      },
+      [&] { return RasterView<T>::HistogramByBinSize(lower, upper, binSize, bands, sign, ipc); });
 }
 
 template <typename T>
 AsyncPtr ComputedRaster<T>::HistogramByBinCount(T lower, T upper, unsigned binCount,
                                                 const Array<unsigned>& bands, HistogramSign sign,
                                                 const IPC& ipc) {
-  return histogram_ ? histogram_->HistogramByBinCount(lower, upper, binCount, bands, sign, ipc)
-                    : AsyncPtr();
+  return OfHistogram(
+      [&](auto& histogram) {
+        return histogram.HistogramByBinCount(lower, upper, binCount, bands, sign, ipc);
+      },
+      [&] { return RasterView<T>::HistogramByBinCount(lower, upper, binCount, bands, sign, ipc); });
 }
 
 template <typename T>
 AsyncPtr ComputedRaster<T>::HistogramAllBands(T lower, T upper, unsigned binCount,
                                               HistogramSign sign, const IPC& ipc) {
-  return histogram_ ? histogram_->HistogramAllBands(lower, upper, binCount, sign, ipc) : AsyncPtr();
+  return OfHistogram(
+      [&](auto& histogram) {
+        return histogram.HistogramAllBands(lower, upper, binCount, sign, ipc);
+      },
+      [&] { return RasterView<T>::HistogramAllBands(lower, upper, binCount, sign, ipc); });
+}
+
+template <typename T>
+AsyncPtr ComputedRaster<T>::CountHistogram(const HistogramRequest<T>& request, const IPC& ipc) {
+  return OfHistogram([&](auto& histogram) { return histogram.CountHistogram(request, ipc); },
+                     [&] { return RasterView<T>::CountHistogram(request, ipc); });
 }
 
 }  // namespace lumo

@@ -1,5 +1,7 @@
 #include "data/data_manager.h"
+#include "data/open_sources.h"
 #include "foundation/fault.h"
+#include "raster/raster_details.h"
 #include "views/raster_def_command.h"
 #include "views/temp_raster.h"
 
@@ -11,15 +13,27 @@ const CommandDeclaration kCreate{
     RasterDefInputs({{"ConnStr", Presence::kRequired, ValueKind::kTextList, "where it is made"},
                      {"Format", Presence::kOptional, ValueKind::kText, "key of the format"},
                      {"Interleave", Presence::kOptional, ValueKind::kWord,
-                      "BIP, BIL, BSQ: the order in the source"}}),
+                      "BIP, BIL, BSQ: the order in the source", "", &WordsIn<Interleave>},
+                     {"Details", Presence::kOptional, ValueKind::kWord,
+                      "of the raster in SrcURI, as far as the format has room for them. Told: "
+                      "none; Names: the names of bands; Bands: all of the bands and the raster, "
+                      "such as units, scales and further items; All: also the place, as control "
+                      "points",
+                      "", &WordsIn<KeptDetails>}}),
     PublishedOutputs()};
 
 class CreateRasterCommand final : public RasterDefCommand {
   CommandResult Execute() override {
     RasterDef def;
     if (!CheckInputs() || !ReadRasterDef(def)) return Fail();
-    return Publish(
-        MakeReaderRaster(GetGlobalDataManager().CreateRaster(Read<Array<String>>("ConnStr"), def)));
+    KeepDetails(def.metadata, Read<KeptDetails>("Details"));
+    const auto connStrings = Read<Array<String>>("ConnStr");
+    const SourceClaim claim(connStrings);
+    if (!claim.IsGranted()) {
+      return Fail("the source is open already, and left as it is: " +
+                  connStrings[connStrings.GetCount() - 1]);
+    }
+    return Publish(MakeReaderRaster(GetGlobalDataManager().CreateRaster(connStrings, def)));
   }
 };
 

@@ -25,6 +25,15 @@ String MemoryConnectionText(const void* pixelData, const String& name, unsigned 
   return std::string(address).append(name.ToUTF8()).append(numbers).append(coordSys.ToUTF8());
 }
 
+String MemoryNoDataText(const std::map<unsigned, double>& noData) {
+  std::string text = "NODATA=";
+  for (const auto& [band, value] : noData) {
+    if (text.back() != '=') text += ',';
+    text.append(std::to_string(band)).append(":").append(FormatValue(value).ToUTF8());
+  }
+  return String(text);
+}
+
 GeoRefPtr MakeStdGeoRef(double pixelSizeX, double pixelSizeY, double tieX, double tieY,
                         const String& coordSys) {
   const GeoRefPtr made(new StdGeoRef);

@@ -1,5 +1,7 @@
 #pragma once
 
+#include <cstdlib>
+#include <map>
 #include <memory>
 
 #include "views/computed_raster.h"
@@ -49,29 +51,39 @@ class MemoryRaster : public ComputedRaster<T> {
   /// The whole raster as one block.
   lumo::TileDimensions TileDimensions() const override;
 
- private:
+ protected:
   MemoryRaster(const RasterPtr<T>& opened, const GeoRefPtr& geoRef);
 
+ private:
   GeoRefPtr geoRef_;
   bool valid_ = false;
 };
 
-/// A MemoryRaster with a block of its own, whose pixels start with whatever the memory held.
+/// A MemoryRaster with a block of its own, whose pixels start as 0.
 template <typename T>
 class AutoMemoryRaster final : public MemoryRaster<T> {
  public:
+  /// @param noData  by band; a value that T can't hold counts as none.
   AutoMemoryRaster(const String& name, unsigned samples, unsigned lines, unsigned bands,
-                   Interleave interleave, const GeoRefPtr& geoRef);
+                   Interleave interleave, const GeoRefPtr& geoRef,
+                   const std::map<unsigned, double>& noData = {});
   ~AutoMemoryRaster() override;
 
   URI GetURI() const override { return this->DefaultURI("AutoMemoryRaster"); }
   RasterDef GetRasterDef() const override;
 
  private:
-  AutoMemoryRaster(const String& name, std::unique_ptr<T[]> block, unsigned samples, unsigned lines,
-                   unsigned bands, Interleave interleave, const GeoRefPtr& geoRef);
+  struct Freed {
+    void operator()(T* block) const { std::free(block); }
+  };
+  using Block = std::unique_ptr<T, Freed>;
 
-  std::unique_ptr<T[]> block_;
+  static Block Allocate(unsigned samples, unsigned lines, unsigned bands);
+  AutoMemoryRaster(const String& name, Block block, unsigned samples, unsigned lines,
+                   unsigned bands, Interleave interleave, const GeoRefPtr& geoRef,
+                   const std::map<unsigned, double>& noData);
+
+  Block block_;
 };
 
 extern template class VEXG_EXPORT MemoryRaster<std::uint8_t>;

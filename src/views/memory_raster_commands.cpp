@@ -7,7 +7,7 @@ namespace {
 const CommandDeclaration kCreate{
     "CreateMemoryRasterCommand", "Rasters", "Makes a raster in memory.",
     RasterDefInputs({{"Interleave", Presence::kOptional, ValueKind::kWord,
-                      "BIP, BIL, BSQ: the order in memory"}}),
+                      "BIP, BIL, BSQ: the order in memory", "", &WordsIn<Interleave>}}),
     PublishedOutputs()};
 
 class CreateMemoryRasterCommand final : public RasterDefCommand {
@@ -18,7 +18,7 @@ class CreateMemoryRasterCommand final : public RasterDefCommand {
     BasicRasterPtr made;
     const bool typed = DispatchType(EightTypes{}, def.dataType, [&]<typename T>() {
       made.Reset(new AutoMemoryRaster<T>("AutoMemoryRaster", def.samples, def.lines, def.bands,
-                                         def.interleave, def.geoRef));
+                                         def.interleave, def.geoRef, def.noData));
       return true;
     });
     return typed ? Publish(made) : Fail("DataType is no pixel type that a memory raster can have");

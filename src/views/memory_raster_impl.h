@@ -1,7 +1,6 @@
 #pragma once
 
 #include <cstdint>
-#include <new>
 
 #include "data/access_policy.h"
 #include "data/data_manager.h"
@@ -23,10 +22,14 @@ String MemoryConnectionText(const void* pixelData, const String& name, unsigned 
 GeoRefPtr MakeStdGeoRef(double pixelSizeX, double pixelSizeY, double tieX, double tieY,
                         const String& coordSys);
 
+/// The connection string of its no-data values: "NODATA=<band>:<value>,<band>:<value>".
+String MemoryNoDataText(const std::map<unsigned, double>& noData);
+
 /// Opens the block; empty, with the fault text told, when that can't be done.
 template <typename T>
 RasterPtr<T> OpenMemory(const String& name, T* pixelData, unsigned samples, unsigned lines,
-                        unsigned bands, Interleave interleave, const GeoRefPtr& geoRef) {
+                        unsigned bands, Interleave interleave, const GeoRefPtr& geoRef,
+                        const std::map<unsigned, double>& noData = {}) {
   if (pixelData == nullptr) return {};
   if (bands > 0xFFFF) {
     SetFault("a memory raster has no more than 65535 bands");
@@ -34,21 +37,11 @@ RasterPtr<T> OpenMemory(const String& name, T* pixelData, unsigned samples, unsi
   }
   const String text = MemoryConnectionText(pixelData, name, samples, lines, bands, interleave,
                                            kDataTypeOf<T>, geoRef);
+  Array<String> strings = ConnStrings({"MemoryRaster", text});
+  if (!noData.empty() && strings.Resize(ArrayDims(3))) strings[2] = MemoryNoDataText(noData);
   const OwnMemoryScope own;
-  return RasterPtr<T>(MakeReaderRaster(GetGlobalDataManager().Connect(
-      ConnStrings({"MemoryRaster", text}), GeoRefPtr(), MetadataPtr())));
-}
-
-/// A block for so many pixels; none, with the fault told, when there is no memory.
-template <typename T>
-std::unique_ptr<T[]> AllocateBlock(unsigned samples, unsigned lines, unsigned bands) {
-  const double bytes = 1.0 * samples * lines * bands * sizeof(T);  // may be beyond any integer
-  std::unique_ptr<T[]> block;
-  if (bytes > 0 && bytes < static_cast<double>(PTRDIFF_MAX)) {
-    block.reset(new (std::nothrow) T[std::size_t{samples} * lines * bands]);
-  }
-  if (!block) SetFault("there is no memory for the raster");
-  return block;
+  return RasterPtr<T>(
+      MakeReaderRaster(GetGlobalDataManager().Connect(strings, GeoRefPtr(), MetadataPtr())));
 }
 
 }  // namespace detail
@@ -95,16 +88,34 @@ lumo::TileDimensions MemoryRaster<T>::TileDimensions() const {
 template <typename T>
 AutoMemoryRaster<T>::AutoMemoryRaster(const String& name, unsigned samples, unsigned lines,
                                       unsigned bands, Interleave interleave,
-                                      const GeoRefPtr& geoRef)
-    : AutoMemoryRaster(name, detail::AllocateBlock<T>(samples, lines, bands), samples, lines, bands,
-                       interleave, geoRef) {}
+                                      const GeoRefPtr& geoRef,
+                                      const std::map<unsigned, double>& noData)
+    : AutoMemoryRaster(name, Allocate(samples, lines, bands), samples, lines, bands, interleave,
+                       geoRef, noData) {}
 
 template <typename T>
-AutoMemoryRaster<T>::AutoMemoryRaster(const String& name, std::unique_ptr<T[]> block,
-                                      unsigned samples, unsigned lines, unsigned bands,
-                                      Interleave interleave, const GeoRefPtr& geoRef)
-    : MemoryRaster<T>(name, block.get(), samples, lines, bands, interleave, geoRef),
+AutoMemoryRaster<T>::AutoMemoryRaster(const String& name, Block block, unsigned samples,
+                                      unsigned lines, unsigned bands, Interleave interleave,
+                                      const GeoRefPtr& geoRef,
+                                      const std::map<unsigned, double>& noData)
+    : MemoryRaster<T>(
+          detail::OpenMemory(name, block.get(), samples, lines, bands, interleave, geoRef, noData),
+          geoRef),
       block_(std::move(block)) {}
+
+/// A block for so many pixels; none, with the fault told, when there is no memory. All pixels are
+/// 0: memory that was in use before may hold anything.
+template <typename T>
+typename AutoMemoryRaster<T>::Block AutoMemoryRaster<T>::Allocate(unsigned samples, unsigned lines,
+                                                                  unsigned bands) {
+  const double bytes = 1.0 * samples * lines * bands * sizeof(T);  // may be beyond any integer
+  Block block;
+  if (bytes > 0 && bytes < static_cast<double>(PTRDIFF_MAX)) {
+    block.reset(static_cast<T*>(std::calloc(std::size_t{samples} * lines * bands, sizeof(T))));
+  }
+  if (!block) SetFault("there is no memory for the raster");
+  return block;
+}
 
 template <typename T>
 AutoMemoryRaster<T>::~AutoMemoryRaster() {

@@ -1,12 +1,50 @@
 #include <filesystem>
+#include <functional>
 
 #include "commands/catalog.h"
 #include "data/data_manager.h"
+#include "data/file_uri.h"
+#include "data/raster_reader.h"
+#include "foundation/abortable_call.h"
 #include "foundation/fault.h"
 #include "views/publish_raster.h"
+#include "views/reader_raster.h"
 
 namespace lumo {
 namespace {
+
+/// Which levels a raster shows that has some of its own beside a pyramid file.
+enum class LevelChoice : unsigned { kTold = 0, kBest = 1 };
+
+std::span<const EnumWord<LevelChoice>> WordsOf(LevelChoice) {
+  static constexpr EnumWord<LevelChoice> kWords[] = {{"Told", LevelChoice::kTold},
+                                                     {"Best", LevelChoice::kBest}};
+  return kWords;
+}
+
+std::vector<OutputDeclaration> OpenOutputs() {
+  std::vector<OutputDeclaration> outputs = PublishedOutputs();
+  outputs.push_back({"Note", ValueKind::kText,
+                     "what of the inputs had no effect, or which levels are shown where Levels is "
+                     "Best and there are two sets of them; only then"});
+  return outputs;
+}
+
+/// When the levels that a file has itself were last written.
+std::filesystem::file_time_type TimeOfOwnLevels(const std::string& path) {
+  std::error_code fault;
+  const auto beside = std::filesystem::last_write_time(path + ".ovr", fault);
+  return fault ? std::filesystem::last_write_time(path, fault) : beside;
+}
+
+/// True when the levels of a source itself are newer than those of a pyramid file, or finer.
+bool AreOwnLevelsBetter(BasicRasterReader& own, const std::string& path, BasicRasterReader& pyramid,
+                        const std::string& pyramidPath) {
+  if (!pyramid.PyramidExists() || own.PyramidLevelMin() < pyramid.PyramidLevelMin()) return true;
+  std::error_code fault;
+  const auto time = std::filesystem::last_write_time(pyramidPath, fault);
+  return !fault && TimeOfOwnLevels(path) > time;
+}
 
 const CommandDeclaration kOpen{
     "OpenRasterCommand",
@@ -18,8 +56,23 @@ const CommandDeclaration kOpen{
       "a pyramid file that belongs to it; one that isn't there yet can be built"},
      {"PyramidNew", Presence::kOptional, ValueKind::kBoolean,
       "1: a pyramid file that is there is not looked at, only replaced by a build"},
-     {"GeoRef", Presence::kOptional, ValueKind::kGeoRef, "in place of the source's own"}},
-    PublishedOutputs()};
+     {"GeoRef", Presence::kOptional, ValueKind::kGeoRef, "in place of the source's own"},
+     {"Levels", Presence::kOptional, ValueKind::kWord,
+      "of a source that has levels of its own beside a pyramid file. Told: those of the pyramid "
+      "file; Best: its own where they are newer, or begin with a finer one",
+      "", &WordsIn<LevelChoice>},
+     {"CheckSource", Presence::kOptional, ValueKind::kWord,
+      "Told: a source that is open is shared, whatever has become of its file; Compared: one whose "
+      "file is another one now, or has changed its size or time, gives a raster of its own, whose "
+      "URI has a counter behind it",
+      "", &WordsIn<SourceCheck>}},
+    OpenOutputs()};
+
+/// What the opening of a source gives.
+struct Opened {
+  DataConnectionPtr source;
+  DataConnectionPtr pyramid;
+};
 
 class OpenRasterCommand final : public PublishCommand {
   CommandResult Execute() override {
@@ -29,36 +82,81 @@ class OpenRasterCommand final : public PublishCommand {
       geoRef = Read<GeoRefPtr>("GeoRef");
       if (!geoRef) return Fail("GeoRef makes no geo-reference");
     }
-    const auto connStrings = Read<Array<String>>("ConnStr");
-    const auto pyramidStrings = Read<Array<String>>("PyramidConnStr");
-    if (pyramidStrings.GetCount() != 0) return OpenWithPyramid(connStrings, pyramidStrings, geoRef);
-    const CatalogRasterRef opened(connStrings, geoRef, MetadataPtr(), true, false);
-    return Publish(opened);
+    Opened opened;
+    if (!RunAbortable<Opened>(*GetIPC().abort, MakeOpening(geoRef), opened)) {
+      return Fail("aborted while the source was being opened");
+    }
+    if (!opened.source) return Fail();
+    if (opened.pyramid && Read<LevelChoice>("Levels") == LevelChoice::kBest &&
+        ChoosesOwn(opened.source, opened.pyramid)) {
+      opened.pyramid = DataConnectionPtr();
+    }
+    const CatalogRasterRef raster(opened.source, opened.pyramid, Read<SourceCheck>("CheckSource"));
+    if (opened.pyramid && raster.Raster() && PyramidOf(*raster.Raster()) != opened.pyramid->URI()) {
+      Write("Note", String("the raster is open already, without this pyramid; it is opened with it "
+                           "once everybody has closed it"));
+    }
+    return Publish(raster);
   }
 
-  CommandResult OpenWithPyramid(const Array<String>& connStrings,
-                                const Array<String>& pyramidStrings, const GeoRefPtr& geoRef) {
-    DataManager& manager = GetGlobalDataManager();
-    const DataConnectionPtr source = manager.Connect(connStrings, geoRef, MetadataPtr());
-    if (!source) return Fail();
-    const DataConnectionPtr pyramid =
-        ConnectPyramid(pyramidStrings, RasterDataConnectionPtr(source));
-    if (!pyramid) return Fail();
-    BasicRasterPtr raster(catalog::Find(source->URI()));
-    if (!raster) raster = MakeReaderRaster(source, pyramid);
-    return Publish(CatalogRasterRef(raster, false));
+  /// The opening with all that it needs, since it may outlive the command.
+  std::function<Opened()> MakeOpening(const GeoRefPtr& geoRef) const {
+    const auto sourceStrings = Read<Array<String>>("ConnStr");
+    const auto pyramidStrings = Read<Array<String>>("PyramidConnStr");
+    const auto isNew = Read<bool>("PyramidNew");
+    return [=] {
+      Opened opened;
+      opened.source = GetGlobalDataManager().Connect(sourceStrings, geoRef, MetadataPtr());
+      if (!opened.source || pyramidStrings.GetCount() == 0) return opened;
+      opened.pyramid =
+          ConnectPyramid(pyramidStrings, isNew, RasterDataConnectionPtr(opened.source));
+      return opened.pyramid ? opened : Opened();
+    };
+  }
+
+  /// True when the levels of the source itself are to be shown; notes which are where there are two
+  /// sets.
+  bool ChoosesOwn(const DataConnectionPtr& source, const DataConnectionPtr& pyramid) {
+    const auto own = ReaderOf(source), beside = ReaderOf(pyramid);
+    if (!own || !beside || !own->PyramidExists()) return false;
+    const std::string path = PathOfFileURI(source->URI());
+    const std::string pyramidPath = PathOfFileURI(pyramid->URI());
+    const bool isBetter = AreOwnLevelsBetter(*own, path, *beside, pyramidPath);
+    if (beside->PyramidExists()) {
+      Write("Note", String(path + ": has levels of its own and a pyramid file; " +
+                           (isBetter ? "its own are used, which are newer or begin with a finer one"
+                                     : "those of the pyramid file are used")));
+    }
+    return isBetter;
+  }
+
+  static Pointer<BasicRasterReader> ReaderOf(const DataConnectionPtr& connection) {
+    const RasterDataConnectionPtr source(connection);
+    const RasterReaderDispatchPtr dispatch =
+        source ? source->RasterReaderDispatch() : RasterReaderDispatchPtr();
+    return dispatch ? dispatch->GetBasic() : Pointer<BasicRasterReader>();
+  }
+
+  /// The source that the pyramid of an open raster was opened from; no text for none.
+  static URI PyramidOf(const BasicRaster& raster) {
+    URI uri;
+    DispatchType(TwelveTypes{}, raster.DataType(), [&]<typename T>() {
+      const auto* const reader = dynamic_cast<const ReaderRaster<T>*>(&raster);
+      if (reader != nullptr) uri = reader->PyramidURI();
+      return true;
+    });
+    return uri;
   }
 
   /// Opens a pyramid; one of the library's own that isn't there, or is to be replaced, has no file
   /// until it is built.
-  DataConnectionPtr ConnectPyramid(const Array<String>& strings,
-                                   const RasterDataConnectionPtr& source) {
+  static DataConnectionPtr ConnectPyramid(const Array<String>& strings, bool isNew,
+                                          const RasterDataConnectionPtr& source) {
     DataManager& manager = GetGlobalDataManager();
     Array<String> names;
     const bool isOurs = SplitConnStr(strings, names) == "Pyramid" && names.GetCount() != 0;
     std::error_code ignored;
-    if (!source || !isOurs ||
-        (!Read<bool>("PyramidNew") && std::filesystem::exists(names[0].ToUTF8(), ignored))) {
+    if (!source || !isOurs || (!isNew && std::filesystem::exists(names[0].ToUTF8(), ignored))) {
       return manager.Connect(strings, GeoRefPtr(), MetadataPtr());
     }
     RasterDef def = source->RasterDef();

@@ -3,7 +3,7 @@
 #include <optional>
 
 #include "raster/raster_def.h"
-#include "raster/raster_view.h"
+#include "views/computed_raster.h"
 #include "views/reprojection.h"
 
 namespace lumo {
@@ -21,17 +21,20 @@ struct ProjectedRasterOptions {
   ProjectedGrid grid = ProjectedGrid::kComputed;
   WarpSampling sampling = WarpSampling::kCorner;
   /// The no-data value of all bands, which pixels outside the parent have; otherwise the parent's.
+  /// With one that the pixel type can't hold, bands have none.
   std::optional<double> noData;
 };
 
 /// Shows its parent in the grid of another geo-reference. Nothing is computed until a block is
-/// asked for; see Reprojection. Statistics, histograms and palettes are the parent's. Exists for
-/// EightTypes.
+/// asked for; see Reprojection. Palettes are the parent's. Statistics and histograms are the view's
+/// own on an exact grid, computed from the pixels that it shows, and the parent's on a computed
+/// one. Exists for EightTypes.
 ///
-/// On an exact grid a polynomial that is off by more than an eighth of a pixel is replaced by
-/// polynomials of smaller rectangles, and a block that misses the parent is one of background
-/// pixels. On a computed grid each block has one polynomial, and a block that misses the parent is
-/// given as such but the read reports false.
+/// On an exact grid a pixel is the same whatever block it is read in: the polynomials belong to
+/// fixed squares of the grid, with no position off by more than an eighth of a pixel, see WarpMap.
+/// A block that misses the parent is one of background pixels. On a computed grid each block has a
+/// polynomial of its own, and a block that misses the parent is given as such but the read reports
+/// false.
 ///
 /// Ownership: shares the parent, which does not know the view; has copies of the geo-references.
 /// Threads:   every operation may run on many threads at once; nothing is stored per call.
@@ -39,12 +42,13 @@ struct ProjectedRasterOptions {
 ///            carried to the target makes a view without a parent: IsValid() is false and
 ///            operations give false, 0 or empty. Nothing can be written.
 template <typename T>
-class ProjectedRaster final : public RasterView<T> {
+class ProjectedRaster final : public ComputedRaster<T> {
  public:
   /// @param method      anything but kRigorous runs as kPolynomial.
   /// @param resampling  anything but kLinear and kCubic runs as kNearest.
   ProjectedRaster(const RasterPtr<T>& parent, const GeoRefPtr& target, ReprojectionMethod method,
                   PyramidResamplingMethod resampling, const ProjectedRasterOptions& options = {});
+  ~ProjectedRaster() override { this->StopComputing(); }
 
   URI GetURI() const override { return this->DefaultURI("ProjectedRaster"); }
   bool CanWrite() const override { return false; }

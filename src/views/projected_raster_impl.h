@@ -4,6 +4,9 @@
 #include <limits>
 
 #include "foundation/fault.h"
+#include "pyramid/exact_levels.h"
+#include "raster/pixel_value.h"
+#include "raster/raster_details.h"
 #include "views/projected_raster.h"
 
 namespace lumo {
@@ -26,7 +29,9 @@ template <typename T>
 ProjectedRaster<T>::ProjectedRaster(const RasterPtr<T>& parent, const GeoRefPtr& target,
                                     ReprojectionMethod method, PyramidResamplingMethod resampling,
                                     const ProjectedRasterOptions& options)
-    : RasterView<T>(parent),
+    : ComputedRaster<T>(parent, options.grid == ProjectedGrid::kExact
+                                    ? ComputedRaster<T>::StatsOf::kThis
+                                    : ComputedRaster<T>::StatsOf::kParent),
       target_(CloneOf(target)),
       method_(detail::KnownMethod(method)),
       resampling_(detail::KnownResampling(resampling)),
@@ -53,10 +58,11 @@ bool ProjectedRaster<T>::SetUp() {
   tiles_ = parent->TileDimensions();
   GeoRefPtr grid;
   if (options_.grid == ProjectedGrid::kExact) {
-    constexpr double kWarpTolerance = 0.125;
     constexpr unsigned kSquares = 256;
     grid = CloneOf(target_);
-    reprojection_.SetTolerance(kWarpTolerance);
+    const bool isRigorous = method_ == ReprojectionMethod::kRigorous;
+    reprojection_.SetMap(std::make_shared<WarpMap>(grid, def_.geoRef, def_.samples, def_.lines,
+                                                   isRigorous ? 0.0 : WarpMap::kUsualTolerance));
     def_.tileWidth = def_.tileHeight = kSquares;  // squares cover least of a turned source
   } else {
     grid = ComputedGrid(*def_.geoRef);
@@ -69,6 +75,7 @@ bool ProjectedRaster<T>::SetUp() {
   def_.samples = grid->Samples();
   def_.lines = grid->Lines();
   def_.SetGeoRef(grid);
+  KeepDetails(def_.metadata, KeptDetails::kBands);
   if (options_.noData) {
     for (unsigned band = 0; band < def_.bands; ++band) def_.noData[band] = *options_.noData;
     reprojection_.SetBackground(*options_.noData);
@@ -94,22 +101,26 @@ GeoRefPtr ProjectedRaster<T>::ComputedGrid(const GeoRef& source) const {
 
 template <typename T>
 bool ProjectedRaster<T>::HasNoDataValue(unsigned band) const {
-  return options_.noData ? band < def_.bands : RasterView<T>::HasNoDataValue(band);
+  if (!options_.noData) return ComputedRaster<T>::HasNoDataValue(band);
+  return band < def_.bands && ToPixel<T>(*options_.noData).has_value();
 }
 
 template <typename T>
 T ProjectedRaster<T>::NoDataValue(unsigned band) const {
-  return options_.noData ? static_cast<T>(*options_.noData) : RasterView<T>::NoDataValue(band);
+  return options_.noData ? ToPixel<T>(*options_.noData).value_or(T())
+                         : ComputedRaster<T>::NoDataValue(band);
 }
 
 template <typename T>
 RasterPtr<T> ProjectedRaster<T>::PyramidLevel(unsigned level) {
-  return OnLevel(RasterView<T>::PyramidLevel(level));
+  const ExactLevels exactly(options_.grid == ProjectedGrid::kExact);
+  return OnLevel(ComputedRaster<T>::PyramidLevel(level));
 }
 
 template <typename T>
 RasterPtr<T> ProjectedRaster<T>::StoredPyramidLevel(unsigned level) {
-  return OnLevel(RasterView<T>::StoredPyramidLevel(level));
+  const ExactLevels exactly(options_.grid == ProjectedGrid::kExact);
+  return OnLevel(ComputedRaster<T>::StoredPyramidLevel(level));
 }
 
 /// This view over a level of the parent; empty over none.

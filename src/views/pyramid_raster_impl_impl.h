@@ -1,8 +1,11 @@
 #pragma once
 
 #include <algorithm>
+#include <cmath>
 
 #include "foundation/fault.h"
+#include "georef/derived_georef.h"
+#include "pyramid/exact_levels.h"
 #include "raster/interleave.h"
 #include "views/pyramid_raster_impl.h"
 
@@ -16,26 +19,37 @@ PyramidRasterImpl<T>::PyramidRasterImpl(const Raster<T>& raster, const RasterRea
   def_ = reader_->RasterDef();
   def_.samples = reader_->Samples(level_);
   def_.lines = reader_->Lines(level_);
-  def_.geoRef = ReducedGeoRef(raster);
+  def_.geoRef = LevelGeoRef(raster);
 }
 
-/// The geo-reference of the raster for pixels of the level's size. Whole numbers of pixels make one
-/// of the level, so sizes grow by a whole factor; the tie point lies where it lay, as a fraction.
+/// The geo-reference of the raster for the pixels of the level. A pixel of it is the raster's pixel
+/// 2^level times as far; a store that holds levels of other sizes has spread the raster over them.
+/// In the told form the sizes of a grid's pixels grow by the whole part of the factor, and the tie
+/// pixel lies where it lay, as a fraction. A camera always goes by the exact factor.
 template <typename T>
-GeoRefPtr PyramidRasterImpl<T>::ReducedGeoRef(const Raster<T>& raster) const {
+GeoRefPtr PyramidRasterImpl<T>::LevelGeoRef(const Raster<T>& raster) const {
   const RasterDef full = raster.GetRasterDef();
   if (!full.geoRef) return {};
+  const GeoRef& model = *full.geoRef;
+  const auto factor = [&](unsigned whole, unsigned part) {
+    if (part == 0 || (level_ < 32 && part == whole >> level_)) {
+      return std::ldexp(1.0, static_cast<int>(level_));
+    }
+    return whole / static_cast<double>(part);
+  };
+  const GeoRefPtr reduced =
+      ReducedGeoRef(model, factor(raster.Samples(), def_.samples),
+                    factor(raster.Lines(), def_.lines), def_.samples, def_.lines);
+  if (ExactLevels::AreWanted() || model.GetType() == GeoRef::kRpc) return reduced;
   const auto atLeast1 = [](unsigned size) { return std::max(size, 1U); };
   const auto fraction = [&](unsigned part, unsigned whole) {
     return part / static_cast<double>(atLeast1(whole));
   };
-  GeoRef& geoRef = *full.geoRef;  // a copy of our own
-  geoRef.SetDimensions(def_.samples, def_.lines);
-  geoRef.SetPixelSize(geoRef.PixelSizeX() * (raster.Samples() / atLeast1(def_.samples)),
-                      geoRef.PixelSizeY() * (raster.Lines() / atLeast1(def_.lines)));
-  geoRef.SetTiePixel(geoRef.TiePixelX() * fraction(def_.samples, raster.Samples()),
-                     geoRef.TiePixelY() * fraction(def_.lines, raster.Lines()));
-  return full.geoRef;
+  reduced->SetPixelSize(model.PixelSizeX() * (raster.Samples() / atLeast1(def_.samples)),
+                        model.PixelSizeY() * (raster.Lines() / atLeast1(def_.lines)));
+  reduced->SetTiePixel(model.TiePixelX() * fraction(def_.samples, raster.Samples()),
+                       model.TiePixelY() * fraction(def_.lines, raster.Lines()));
+  return reduced;
 }
 
 template <typename T>
@@ -197,6 +211,12 @@ bool PyramidRasterImpl<T>::PutSubRect(const SubRect& rect, const Array<unsigned>
   if (!reader_ || !Holds(rect, bands)) return false;
   const std::lock_guard lock(writeLock_);
   return reader_->WriteBlock(rect, bands, level_, interleave, pixels, state);
+}
+
+template <typename T>
+std::uint64_t PyramidRasterImpl<T>::WriteCount() const {
+  if (!reader_) return 0;
+  return reader_->WriteCount(level_) + (level_ != 0 ? reader_->WriteCount(0) : 0);
 }
 
 }  // namespace lumo

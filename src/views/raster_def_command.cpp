@@ -3,6 +3,23 @@
 #include "foundation/fault.h"
 
 namespace lumo {
+namespace {
+
+/// The names of the types that a pixel can have.
+std::vector<const char*> DataTypeWords() {
+  static const std::vector<std::string> kNames = [] {
+    std::vector<std::string> names;
+    for (unsigned code = 0; code < 100; ++code) {
+      if (DataTypeBytes(code) != 0) names.push_back(DataTypeName(code).ToUTF8());
+    }
+    return names;
+  }();
+  std::vector<const char*> words;
+  for (const std::string& name : kNames) words.push_back(name.c_str());
+  return words;
+}
+
+}  // namespace
 
 bool RasterDefCommand::ReadRasterDef(RasterDef& def) const {
   if (HasInput("SrcURI")) {
@@ -45,17 +62,18 @@ bool RasterDefCommand::ReadGeoRef(RasterDef& def) const {
 }
 
 std::vector<InputDeclaration> RasterDefInputs(std::vector<InputDeclaration> own) {
-  own.insert(own.end(), {{"SrcURI", Presence::kOptional, ValueKind::kURI,
-                          "an open raster whose description is the start"},
-                         {"Samples", Presence::kOptional, ValueKind::kInteger, "pixels of a line"},
-                         {"Lines", Presence::kOptional, ValueKind::kInteger, "lines"},
-                         {"Bands", Presence::kOptional, ValueKind::kInteger, "bands"},
-                         {"DataType", Presence::kOptional, ValueKind::kWord, "pixel type"},
-                         {"HasNoDataValue", Presence::kOptional, ValueKind::kBooleanArray,
-                          "for each band, whether it has a no-data value"},
-                         {"NoDataValue", Presence::kOptional, ValueKind::kNumberArray,
-                          "no-data values of the bands, which have one then"},
-                         {"GeoRef", Presence::kOptional, ValueKind::kGeoRef, "the geo-reference"}});
+  own.insert(own.end(),
+             {{"SrcURI", Presence::kOptional, ValueKind::kURI,
+               "an open raster whose description is the start"},
+              {"Samples", Presence::kOptional, ValueKind::kInteger, "pixels of a line"},
+              {"Lines", Presence::kOptional, ValueKind::kInteger, "lines"},
+              {"Bands", Presence::kOptional, ValueKind::kInteger, "bands"},
+              {"DataType", Presence::kOptional, ValueKind::kWord, "pixel type", "", &DataTypeWords},
+              {"HasNoDataValue", Presence::kOptional, ValueKind::kBooleanArray,
+               "for each band, whether it has a no-data value"},
+              {"NoDataValue", Presence::kOptional, ValueKind::kNumberArray,
+               "no-data values of the bands, which have one then"},
+              {"GeoRef", Presence::kOptional, ValueKind::kGeoRef, "the geo-reference"}});
   return own;
 }
 

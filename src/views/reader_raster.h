@@ -1,9 +1,11 @@
 #pragma once
 
+#include <atomic>
 #include <mutex>
 
 #include "pyramid/dynamic_raster_pyramid.h"
 #include "views/computed_raster.h"
+#include "views/source_raster.h"
 
 namespace lumo {
 
@@ -14,28 +16,38 @@ namespace lumo {
 /// computed can be stored there. A second reader, when there is one, stands on a pyramid that the
 /// library keeps in a file of its own; where it has something it goes first.
 ///
+/// Once pixels have been written, what the source and the pyramid's file store of statistics and
+/// histograms is given no more. The pyramid's file loses it then, the source at the next
+/// WriteStats or WriteHistogram, unless it has lost it already.
+///
 /// Ownership: shares both connections, which stay open as long as the raster lives. The readers
 ///            belong to them.
 /// Threads:   every operation may run on many threads at once; one block is transferred at a time.
 /// Failure:   without a reader, operations give false, 0 or empty; those that a source refuses have
 ///            the fault text told.
 template <typename T>
-class ReaderRaster final : public ComputedRaster<T> {
+class ReaderRaster final : public ComputedRaster<T>, public SourceRaster {
  public:
   /// @param pyramidReader  may be empty, and then so is `pyramidConnection`. A source that is a
   ///                       pyramid file itself is its own.
+  /// @param uri            in place of the connection's, unless empty.
   ReaderRaster(const RasterReaderPtr<T>& reader, const RasterDataConnectionPtr& connection,
                const RasterReaderPtr<T>& pyramidReader = {},
-               const RasterDataConnectionPtr& pyramidConnection = {});
+               const RasterDataConnectionPtr& pyramidConnection = {}, const URI& uri = {});
   ~ReaderRaster() override;
 
   URI GetURI() const override;
+  bool IsUpToDate() const override;
   bool IsValid() const override { return Object::IsValid(); }
   bool CanWrite() const override;
   RasterDef GetRasterDef() const override;
 
   bool PyramidExists() const override;
   PyramidDef GetPyramidDef() const override;
+  /// The source that the pyramid was opened from; no text when it is the raster's own, or none.
+  lumo::URI PyramidURI() const {
+    return pyramidConnection_ ? pyramidConnection_->URI() : lumo::URI();
+  }
   AsyncPtr PyramidBuild(const PyramidDef& def, const lumo::TileDimensions& tiles,
                         const AsyncCallbackPtr& callback) override;
   AsyncPtr PyramidAsync() const override;
@@ -78,10 +90,15 @@ class ReaderRaster final : public ComputedRaster<T> {
                   Array<T>& pixels, Array<unsigned char>& state) override;
   bool PutSubRect(const SubRect& rect, const Array<unsigned>& bands, Interleave interleave,
                   Array<T>& pixels, Array<unsigned char>& state) override;
+  std::uint64_t WriteCount() const override { return reader_ ? reader_->WriteCount(0) : 0; }
 
  private:
   template <typename Call>
   bool AnyReader(const Call& call) const;
+  template <typename Call>
+  bool AnyReaderWithStats(const Call& call) const;
+  bool HistogramsHold(const RasterReaderPtr<T>& reader) const;
+  void DropStatsOfPyramid();
   template <typename Value, typename Computed>
   auto StatValue(unsigned band, unsigned bit, const IPC& ipc, const Value& value,
                  const Computed& computed);
@@ -99,6 +116,7 @@ class ReaderRaster final : public ComputedRaster<T> {
   unsigned lines_ = 0;
   unsigned bands_ = 0;
   lumo::TileDimensions tiles_;
+  std::atomic<bool> written_{false};  // something may have been, to the source
   std::mutex pixelLock_;
   std::mutex statsLock_;                // held while a getter of statistics computes
   DynamicRasterPyramidPtr<T> pyramid_;  // empty without a reader of a pyramid

@@ -2,6 +2,7 @@
 
 #include <algorithm>
 
+#include "data/mt_connection.h"
 #include "foundation/fault.h"
 #include "views/pyramid_raster_impl.h"
 #include "views/reader_raster.h"
@@ -12,7 +13,7 @@ template <typename T>
 ReaderRaster<T>::ReaderRaster(const RasterReaderPtr<T>& reader,
                               const RasterDataConnectionPtr& connection,
                               const RasterReaderPtr<T>& pyramidReader,
-                              const RasterDataConnectionPtr& pyramidConnection)
+                              const RasterDataConnectionPtr& pyramidConnection, const URI& uri)
     : connection_(connection),
       pyramidConnection_(pyramidConnection),
       reader_(reader),
@@ -29,7 +30,8 @@ ReaderRaster<T>::ReaderRaster(const RasterReaderPtr<T>& reader,
   if (pyramidReader_ && pyramidReader_->CanInheritNoDataValues()) {
     pyramidReader_->InheritNoDataValues(def);
   }
-  if (connection_) uri_ = connection_->URI();
+  uri_ = uri;
+  if (connection_ && uri_.GetLength() == 0) uri_ = connection_->URI();
   samples_ = def.samples;
   lines_ = def.lines;
   bands_ = def.bands;
@@ -54,6 +56,14 @@ URI ReaderRaster<T>::GetURI() const {
 }
 
 template <typename T>
+bool ReaderRaster<T>::IsUpToDate() const {
+  auto* const proxy = dynamic_cast<MtRasterDataConnection*>(connection_.Get());
+  if (proxy == nullptr) return true;
+  const SourceStamp opened = proxy->Stamp();
+  return written_ ? opened.HasSameFiles() : opened.IsCurrent();
+}
+
+template <typename T>
 bool ReaderRaster<T>::CanWrite() const {
   return reader_ && reader_->CanWritePixels(0);
 }
@@ -68,6 +78,19 @@ template <typename T>
 template <typename Call>
 bool ReaderRaster<T>::AnyReader(const Call& call) const {
   return (pyramidReader_ && call(*pyramidReader_)) || (reader_ && call(*reader_));
+}
+
+/// The same over readers whose stored statistics hold for the pixels as they are.
+template <typename T>
+template <typename Call>
+bool ReaderRaster<T>::AnyReaderWithStats(const Call& call) const {
+  const std::uint64_t writes = WriteCount();
+  return AnyReader([&](auto& reader) { return reader.StatsHoldFor() == writes && call(reader); });
+}
+
+template <typename T>
+bool ReaderRaster<T>::HistogramsHold(const RasterReaderPtr<T>& reader) const {
+  return reader && reader->HistogramsHoldFor() == WriteCount();
 }
 
 template <typename T>
@@ -133,7 +156,7 @@ bool ReaderRaster<T>::PyramidRefresh() {
 template <typename T>
 bool ReaderRaster<T>::StatsExist(unsigned band, unsigned mask) const {
   return ComputedRaster<T>::StatsExist(band, mask) ||
-         (pyramid_ && pyramid_->StatsExist(band, mask)) || AnyReader([&](auto& reader) {
+         (pyramid_ && pyramid_->StatsExist(band, mask)) || AnyReaderWithStats([&](auto& reader) {
            return (static_cast<unsigned>(reader.StatsMask()) & mask) == mask &&
                   reader.StatsExist(band) && (reader.ReadStats(band).mask & mask) == mask;
          });
@@ -145,11 +168,12 @@ RasterBandStats<T> ReaderRaster<T>::BandStats(unsigned band) const {
   if (stats.mask != StatsMask::None) return stats;
   if (pyramid_) stats = pyramid_->BandStats(band);
   if (stats.mask != StatsMask::None) return stats;
-  AnyReader([&](auto& reader) {
+  AnyReaderWithStats([&](auto& reader) {
     if (!reader.StatsExist(band)) return false;
     stats = reader.ReadStats(band);
     return true;
   });
+  stats.band = band;
   return stats;
 }
 
@@ -244,10 +268,18 @@ double ReaderRaster<T>::Cov(unsigned band, unsigned otherBand, const IPC& ipc) {
 
 template <typename T>
 bool ReaderRaster<T>::WriteStats() {
+  const std::uint64_t writes = WriteCount();
   Array<RasterBandStats<T>> all{ArrayDims(bands_)};
   for (unsigned band = 0; band < all.GetCount(); ++band) all[band] = BandStats(band);
-  return StoreIn(&RasterReader<T>::CanWriteStats,
-                 [&](auto& reader) { return reader.WriteStats(all); });
+  return StoreIn(&RasterReader<T>::CanWriteStats, [&](auto& reader) {
+    if (!reader.WriteStats(all)) return false;
+    // A source that did not take away what isn't given has it of other pixels, perhaps.
+    const bool hasOthers = std::any_of(all.begin(), all.end(), [&](const auto& stats) {
+      return stats.mask == StatsMask::None && reader.StatsExist(stats.band);
+    });
+    if (!hasOthers) reader.SetStatsHoldFor(writes);
+    return true;
+  });
 }
 
 template <typename T>
@@ -262,15 +294,16 @@ Array<RasterBandHistogram<T>> ReaderRaster<T>::BandHistogram(unsigned band) cons
         if (merged.Resize(ArrayDims(at + 1))) merged[at] = histogram;
       }
     };
-    if (pyramidReader_) join(pyramidReader_->Histogram(band));
+    if (HistogramsHold(pyramidReader_)) join(pyramidReader_->Histogram(band));
     join(ComputedRaster<T>::BandHistogram(band));
-    if (reader_) join(reader_->Histogram(band));
+    if (HistogramsHold(reader_)) join(reader_->Histogram(band));
   }
   return merged;
 }
 
 template <typename T>
 bool ReaderRaster<T>::WriteHistogram() {
+  const std::uint64_t writes = WriteCount();
   Array<RasterBandHistogram<T>> all;
   for (unsigned band = 0; band < bands_; ++band) {
     for (const RasterBandHistogram<T>& histogram : BandHistogram(band)) {
@@ -278,8 +311,14 @@ bool ReaderRaster<T>::WriteHistogram() {
       if (all.Resize(ArrayDims(at + 1))) all[at] = histogram;
     }
   }
-  return all.GetCount() == 0 || StoreIn(&RasterReader<T>::CanWriteHistogram,
-                                        [&](auto& reader) { return reader.WriteHistogram(all); });
+  const bool hasStale =
+      (reader_ && !HistogramsHold(reader_)) || (pyramidReader_ && !HistogramsHold(pyramidReader_));
+  if (all.GetCount() == 0 && !hasStale) return true;
+  return StoreIn(&RasterReader<T>::CanWriteHistogram, [&](auto& reader) {
+    if (!reader.WriteHistogram(all)) return false;
+    reader.SetHistogramsHoldFor(writes);
+    return true;
+  });
 }
 
 /// Stores something in the source and in the pyramid's file, as far as they can; having nowhere to
@@ -287,6 +326,7 @@ bool ReaderRaster<T>::WriteHistogram() {
 template <typename T>
 template <typename Can, typename Store>
 bool ReaderRaster<T>::StoreIn(const Can& can, const Store& store) {
+  written_ = true;
   for (const RasterReaderPtr<T>& reader : {reader_, pyramidReader_}) {
     if (reader && ((*reader).*can)() && !store(*reader)) return false;
   }
@@ -316,11 +356,13 @@ PalettePtr ReaderRaster<T>::Palette(unsigned band) const {
 
 template <typename T>
 bool ReaderRaster<T>::WritePalette(unsigned band, const PalettePtr& palette) {
+  written_ = true;
   return reader_ && palette && reader_->WritePalette(band, *palette);
 }
 
 template <typename T>
 bool ReaderRaster<T>::DeletePalette(unsigned band) {
+  written_ = true;
   return reader_ && reader_->DeletePalette(band);
 }
 
@@ -349,8 +391,37 @@ bool ReaderRaster<T>::PutSubRect(const SubRect& rect, const Array<unsigned>& ban
                                  Interleave interleave, Array<T>& pixels,
                                  Array<unsigned char>& state) {
   if (!reader_ || !Holds(rect, bands) || !CanWrite()) return false;
-  const std::lock_guard lock(pixelLock_);
-  return reader_->WriteBlock(rect, bands, 0, interleave, pixels, state);
+  written_ = true;
+  const std::uint64_t before = WriteCount();
+  bool isWritten = false;
+  {
+    const std::lock_guard lock(pixelLock_);
+    isWritten = reader_->WriteBlock(rect, bands, 0, interleave, pixels, state);
+  }
+  if (WriteCount() != before) DropStatsOfPyramid();
+  return isWritten;
+}
+
+/// Takes what the pyramid's file stores of the pixels before a write out of it, once. Where that
+/// can't be done it is not given all the same.
+template <typename T>
+void ReaderRaster<T>::DropStatsOfPyramid() {
+  constexpr std::uint64_t kNone = UINT64_MAX;  // a number of writes that there never is
+  if (!pyramidReader_ || pyramidReader_.Get() == reader_.Get() ||
+      (pyramidReader_->StatsHoldFor() == kNone && pyramidReader_->HistogramsHoldFor() == kNone)) {
+    return;
+  }
+  pyramidReader_->SetStatsHoldFor(kNone);
+  pyramidReader_->SetHistogramsHoldFor(kNone);
+  bool hasStats = false, hasHistograms = false;
+  Array<RasterBandStats<T>> none{ArrayDims(bands_)};
+  for (unsigned band = 0; band < none.GetCount(); ++band) {
+    none[band].band = band;
+    hasStats = hasStats || pyramidReader_->StatsExist(band);
+    hasHistograms = hasHistograms || pyramidReader_->Histogram(band).GetCount() != 0;
+  }
+  if (hasStats && pyramidReader_->CanWriteStats()) pyramidReader_->WriteStats(none);
+  if (hasHistograms && pyramidReader_->CanWriteHistogram()) pyramidReader_->WriteHistogram({});
 }
 
 }  // namespace lumo

@@ -7,9 +7,18 @@
 #include <vector>
 
 #include "raster/raster.h"
-#include "views/reprojection_geometry.h"
+#include "views/warp_map.h"
 
 namespace lumo {
+
+struct WarpLimits;
+class WarpPositions;
+template <typename T>
+class WarpParallel;
+template <typename T>
+struct WarpSource;
+template <typename T>
+struct WarpTarget;
 
 /// How a sampler reads the neighbours of a position.
 enum class WarpSampling : unsigned {
@@ -26,6 +35,14 @@ VEXG_EXPORT std::span<const EnumWord<WarpSampling>> WordsOf(WarpSampling);
 /// Shows pixels of a raster in the grid of another geo-reference: maps a rectangle of the grid back
 /// to the raster, reads what it covers, works out where every pixel falls, and resamples. Exists
 /// for EightTypes.
+///
+/// At first a polynomial is fitted to each rectangle that is asked for, so that a pixel's position
+/// depends on the rectangle too. With SetMap it depends on the pixel alone, as it always does
+/// within one coordinate system and by the rigorous method.
+///
+/// A pixel of the source holds the positions from its left and upper edge up to the next pixel's,
+/// that one's edge left out; WarpLimits::noise tells how positions by an affine map, or by the
+/// transforms of a WarpMap, are freed from the errors of arithmetic.
 ///
 /// Threads:   Reproject may run on many threads at once, where the raster allows it.
 /// Failure:   see Reproject. A polynomial that can't be fitted is replaced by the rigorous method
@@ -52,10 +69,11 @@ class Reprojection {
   /// Whether a position is taken at the centre of its pixel, as at first, or at its corner.
   void SetPixelCentres(bool at) { pixelCentres_ = at; }
   void SetSampling(WarpSampling sampling) { sampling_ = sampling; }
-  /// How far, in pixels of the source, a polynomial may be off at the points of its fit before the
-  /// rectangle is cut in two; without a limit at first.
-  void SetTolerance(double pixels) { tolerance_ = pixels; }
-  /// The value of pixels outside the source; at first the source's no-data value, or 0.
+  /// Has positions come from a map of the grid, of the raster that Reproject is given, and no
+  /// longer from the method.
+  void SetMap(std::shared_ptr<const WarpMap> map) { map_ = std::move(map); }
+  /// The value of pixels outside the source; at first, and with one that T can't hold, the source's
+  /// no-data value, or 0.
   void SetBackground(double value) { background_ = value; }
 
   /// Fills a rectangle of the grid from the raster.
@@ -77,10 +95,20 @@ class Reprojection {
   struct Work;
   struct Window;
 
+  struct MappedPart;
+
+  Outcome RunWhole(Work& work) const;
   Outcome RunPart(Work& work, const SubRectProj& part) const;
+  Outcome RunMapped(Work& work, const SubRectProj& part) const;
   Outcome RunHalves(Work& work, const SubRectProj& part) const;
   bool Fetch(Work& work, const SubRectProj& rect, Window& window) const;
   void SamplePart(Work& work, const Window& window, const SubRectProj& part) const;
+  void SampleMapped(Work& work, const Window& window, const MappedPart& mapped) const;
+  std::unique_ptr<WarpParallel<T>> MakeSampler(const WarpPositions& positions, unsigned lines,
+                                               const WarpLimits& limits,
+                                               const WarpSource<T>& source,
+                                               const WarpTarget<T>& target) const;
+  WarpLimits LimitsIn(const SubRectProj& pixels, double noise) const;
   std::unique_ptr<Window> TakeWindow() const;
   void GiveBack(std::unique_ptr<Window> window) const;
 
@@ -92,7 +120,7 @@ class Reprojection {
   GeoRefPtr outputGrid_;
   bool pixelCentres_ = true;
   WarpSampling sampling_ = WarpSampling::kCorner;
-  double tolerance_ = HUGE_VAL;
+  std::shared_ptr<const WarpMap> map_;
   std::optional<double> background_;
   mutable std::mutex windowsLock_;
   mutable std::vector<std::unique_ptr<Window>> windows_;  // not in use; their memory is used again

@@ -4,6 +4,7 @@
 #include <limits>
 #include <vector>
 
+#include "georef/affine_link.h"
 #include "georef/coordsys_log.h"
 
 namespace lumo {
@@ -14,7 +15,8 @@ struct Bounds {
   double minX = HUGE_VAL, minY = HUGE_VAL, maxX = -HUGE_VAL, maxY = -HUGE_VAL;
   bool isWhole = true;
 
-  explicit Bounds(const Array<double>& points) {
+  explicit Bounds(const Array<double>& points) { Add(points); }
+  void Add(const Array<double>& points) {
     for (unsigned i = 0; i + 1 < points.GetCount(); i += 2) {
       const double x = points[i], y = points[i + 1];
       if (!std::isfinite(x) || !std::isfinite(y)) {
@@ -97,6 +99,64 @@ Array<double> PixelPoints(const SubRectProj& rect) {
     }
   }
   return points.Take();
+}
+
+/// Points along each side of a net over a rectangle.
+constexpr unsigned kNet = 11;
+
+/// A net over a rectangle, line by line: what the edges and diagonals leave out.
+Array<double> NetPoints(const SubRectProj& rect) {
+  PointList points;
+  for (unsigned j = 0; j < kNet; ++j) {
+    for (unsigned i = 0; i < kNet; ++i) {
+      points.Add(rect.left + rect.Width() * (double(i) / (kNet - 1)),
+                 rect.top + rect.Height() * (double(j) / (kNet - 1)));
+    }
+  }
+  return points.Take();
+}
+
+/// True when two neighbours of a carried net lie more than half of the second raster apart: its
+/// left and right edges meet between them, as those of a global raster do at the date line.
+bool GoesRound(const Array<double>& net, unsigned samples) {
+  const auto isFar = [&](unsigned a, unsigned b) {
+    return std::isfinite(net[2 * a]) && std::isfinite(net[2 * b]) &&
+           std::abs(net[2 * a] - net[2 * b]) > samples / 2.0;
+  };
+  for (unsigned j = 0; j < kNet; ++j) {
+    for (unsigned i = 0; i < kNet; ++i) {
+      const unsigned at = j * kNet + i;
+      if (i + 1 < kNet && isFar(at, at + 1)) return true;
+      if (j + 1 < kNet && isFar(at, at + kNet)) return true;
+    }
+  }
+  return false;
+}
+
+/// Where the second raster has the poles that lie in a rectangle of the base grid, on every
+/// meridian.
+Array<double> PolePoints(const GeoRef& base, const SubRectProj& rect, const GeoRef& second) {
+  PointList points;
+  if (base.CoordinateSystem().Type() != 2 || second.CoordinateSystem().Type() == 0) return {};
+  for (const double latitude : {-90.0, 90.0}) {
+    PointList pole;
+    pole.Add(0, latitude);
+    Array<double> inBase = pole.Take();
+    base.CoordinateSystem().Project(inBase);
+    InvertPixelToMap(base, inBase);
+    const double x = inBase[0], y = inBase[1];
+    const bool isInside = x >= rect.left && x <= rect.left + rect.Width() && y >= rect.top &&
+                          y <= rect.top + rect.Height();
+    constexpr double kStep = 15;
+    for (double longitude = -180; isInside && longitude <= 180; longitude += kStep) {
+      points.Add(longitude, latitude);
+    }
+  }
+  Array<double> meridians = points.Take();
+  if (meridians.GetCount() == 0) return meridians;
+  second.CoordinateSystem().Project(meridians);
+  InvertPixelToMap(second, meridians);
+  return meridians;
 }
 
 /// A rounded coordinate inside 0 to size - 1.
@@ -215,8 +275,20 @@ CoveredRect BaseSubRectToSecSubRect(const GeoRef& base, const SubRectProj& rect,
                                     const GeoRef& second, unsigned samples, unsigned lines,
                                     PyramidResamplingMethod resampling, bool everyPixel) {
   Array<double> points = everyPixel ? PixelPoints(rect) : RectPoints(rect);
-  base.PixelToPixel(points, second);
-  const Bounds bounds(points);
+  CarryPixels(base, second, points);
+  Bounds bounds(points);
+  if (!base.CoordinateSystem().IsEqual(second.CoordinateSystem())) {
+    Array<double> net = NetPoints(rect);
+    CarryPixels(base, second, net);
+    bounds.Add(net);
+    const bool isWhole = bounds.isWhole;
+    if (GoesRound(net, samples)) {
+      bounds.minX = std::min(bounds.minX, 0.0);
+      bounds.maxX = std::max(bounds.maxX, double(samples));
+    }
+    bounds.Add(PolePoints(base, rect, second));
+    bounds.isWhole = isWhole;
+  }
   CoveredRect covered;
   covered.isPartial = !bounds.isWhole;
   const double lastX = bounds.maxX - 1, lastY = bounds.maxY - 1;
@@ -242,7 +314,7 @@ bool FitWarp(const GeoRef& grid, const SubRectProj& rect, const GeoRef& source,
              const SubRectProj& sourceRect, double centre, WarpPolynomial& fit) {
   const Array<double> inSource = BaseGrid(sourceRect, centre);
   Array<double> inGrid = inSource;
-  if (!source.PixelToPixel(inGrid, grid)) return false;
+  if (!CarryPixels(source, grid, inGrid)) return false;
   // All sides run from 0 to about 1 in the equations, which keeps them well conditioned.
   const auto width = static_cast<double>(rect.Width());
   const auto height = static_cast<double>(rect.Height());

@@ -70,10 +70,11 @@ struct CoveredRect {
 };
 
 /// The rectangle of the second raster, of samples by lines, that covers `rect` of the base grid,
-/// with the margin that the resampling reads, cut to the raster. A rectangle that misses it leaves
-/// a line in the log.
-/// @param everyPixel  carry all pixels, not some on the edges and the diagonals: for a small
-///                    rectangle that can be carried in part only.
+/// with the margin that the resampling reads, cut to the raster. It is found by points on the edges
+/// and diagonals of `rect`, by a net over it, and by the poles where they lie in it. Where the
+/// edges of a global raster meet in `rect`, the rectangle has its whole width. A rectangle that
+/// misses the raster leaves a line in the log.
+/// @param everyPixel  carry all pixels: for a small rectangle that can be carried in part only.
 VEXG_EXPORT CoveredRect BaseSubRectToSecSubRect(const GeoRef& base, const SubRectProj& rect,
                                                 const GeoRef& second, unsigned samples,
                                                 unsigned lines, PyramidResamplingMethod resampling,

@@ -1,12 +1,13 @@
 #pragma once
 
 #include <algorithm>
+#include <memory>
 #include <vector>
 
-#include "data/raster_reader.h"
+#include "data/block_shape.h"
 #include "foundation/fault.h"
 #include "georef/coordsys_log.h"
-#include "raster/interleave.h"
+#include "raster/pixel_value.h"
 #include "raster/raster_def.h"
 #include "stats/plane_kernels.h"
 #include "views/reprojection.h"
@@ -24,7 +25,8 @@ struct Reprojection<T>::Work {
   Array<unsigned> bands;
   Interleave interleave;
   std::vector<T> background;
-  WarpTarget<T> target;  // of the whole rectangle
+  WarpTarget<T> target;                // of the whole rectangle
+  std::shared_ptr<const WarpMap> map;  // of all positions, or empty
 };
 
 /// A block of the source.
@@ -40,6 +42,8 @@ namespace detail {
 /// Above it a rectangle is warped in parts, so that memory stays bounded when a small rectangle
 /// covers much of the source.
 constexpr std::uint64_t kWarpWindowBytes = std::uint64_t{96} << 20;
+/// A rectangle with more pixels is warped in parts, as their positions may have to be kept.
+constexpr std::int64_t kWarpMappedPixels = std::int64_t{1} << 20;
 /// Rectangles up to it are not cut any more.
 constexpr std::int64_t kWarpLeastSide = 32;
 
@@ -56,6 +60,12 @@ inline SubRectProj HalfOf(const SubRectProj& rect, bool second) {
 
 inline bool CanHalve(const SubRectProj& rect) {
   return std::max(rect.Width(), rect.Height()) > kWarpLeastSide;
+}
+
+inline void LogSourceRect(const SubRectProj& rect, const BasicRaster& source) {
+  LogCoordSys(CoordSysLog::kReprojection,
+              "Reproject:            Src Rect l:%d, r:%d, t:%d, b:%d, pyramid lvl: %d", rect.left,
+              rect.right, rect.top, rect.bottom, static_cast<int>(source.GetPyramidDef().level));
 }
 
 /// Makes pixels of a rectangle that lie outside the source.
@@ -85,7 +95,78 @@ WarpTarget<T> TargetOf(const WarpTarget<T>& whole, const SubRectProj& rect,
   return target;
 }
 
+/// A piece of a mapped part, or some lines of one, that is worked on by one thread.
+struct WarpStrip {
+  std::size_t piece;
+  SubRectProj rect;
+  std::size_t positions;  ///< where those of its pixels begin, when each is transformed
+};
+
+/// Runs `call(i)` for the numbers below a count, on many threads.
+template <typename Call>
+class EachParallel final : public ArrayParallelFor {
+ public:
+  EachParallel(std::size_t count, const Call& call)
+      : ArrayParallelFor(static_cast<unsigned>(count)), call_(call) {}
+  void Body(unsigned begin, unsigned end) override {
+    for (unsigned i = begin; i < end; ++i) call_(i);
+  }
+
+ private:
+  const Call& call_;
+};
+
+template <typename Call>
+void RunEach(std::size_t count, const Call& call) {
+  EachParallel<Call> loop(count, call);
+  RunParallelFor(loop, 1);
+}
+
 }  // namespace detail
+
+/// What the map says of a part.
+template <typename T>
+struct Reprojection<T>::MappedPart {
+  std::vector<WarpPiece> pieces;
+  std::vector<detail::WarpStrip> strips;
+  std::vector<double> positions;
+
+  MappedPart(const WarpMap& map, const SubRectProj& part) {
+    map.Cut(part, pieces);
+    std::size_t points = 0;
+    for (std::size_t i = 0; i < pieces.size(); ++i) {
+      const SubRectProj& rect = pieces[i].rect;
+      constexpr std::int64_t kPixelsOfStrip = 8192;
+      const auto lines = static_cast<std::int32_t>(
+          std::clamp<std::int64_t>(kPixelsOfStrip / rect.Width(), 1, rect.Height()));
+      for (std::int64_t top = rect.top; top <= rect.bottom; top += lines) {
+        const auto bottom = std::min<std::int64_t>(top + lines - 1, rect.bottom);
+        const SubRectProj strip(rect.left, static_cast<std::int32_t>(top), rect.right,
+                                static_cast<std::int32_t>(bottom));
+        strips.push_back({i, strip, points});
+        if (pieces[i].way == WarpPiece::Way::kTransform) {
+          points += 2 * static_cast<std::size_t>(strip.Width() * strip.Height());
+        }
+      }
+    }
+    positions.resize(points);
+    if (points == 0) return;
+    detail::RunEach(strips.size(), [&](unsigned i) {
+      if (pieces[strips[i].piece].way != WarpPiece::Way::kTransform) return;
+      map.Transform(strips[i].rect, &positions[strips[i].positions]);
+    });
+  }
+
+  /// The pixels of the source on which its positions fall.
+  WarpBounds Bounds(const RasterDef& source) const {
+    WarpBounds bounds(source.samples, source.lines);
+    for (const WarpPiece& piece : pieces) {
+      if (piece.way == WarpPiece::Way::kFit) bounds.AddFit(piece);
+    }
+    bounds.AddPositions(positions.data(), positions.size() / 2);
+    return bounds;
+  }
+};
 
 template <typename T>
 typename Reprojection<T>::Outcome Reprojection<T>::Run(Raster<T>& parent, const SubRect& rect,
@@ -96,14 +177,15 @@ typename Reprojection<T>::Outcome Reprojection<T>::Run(Raster<T>& parent, const 
   constexpr unsigned kMost = std::numeric_limits<std::int32_t>::max();
   RasterDef source = parent.GetRasterDef();
   if (!grid || !source.geoRef || rect.right > kMost || rect.bottom > kMost) return Outcome::kFailed;
-  const Array<unsigned> wanted = BandsOfBlock(bands, interleave);
-  const ArrayDims dims = BlockDims(interleave, rect.Width(), rect.Height(), wanted.GetCount());
-  if (!data.Resize(dims) || !state.Resize(dims)) return Outcome::kFailed;
+  const BlockShape block(rect, bands, interleave);
+  if (!block.Size(data, state)) return Outcome::kFailed;
+  const Array<unsigned>& wanted = block.bands;
   std::fill(state.begin(), state.end(), static_cast<unsigned char>(PixelValueState::Valid));
 
   std::vector<T> background(wanted.GetCount());
   for (unsigned i = 0; i < wanted.GetCount(); ++i) {
-    background[i] = background_                        ? static_cast<T>(*background_)
+    const std::optional<T> own = background_ ? ToPixel<T>(*background_) : std::nullopt;
+    background[i] = own                                ? *own
                     : parent.HasNoDataValue(wanted[i]) ? parent.NoDataValue(wanted[i])
                                                        : T();
   }
@@ -114,10 +196,10 @@ typename Reprojection<T>::Outcome Reprojection<T>::Run(Raster<T>& parent, const 
       data.GetData(), state.GetData(),
       BlockStrides(interleave, rect.Width(), rect.Height(), wanted.GetCount()), wanted.GetCount(),
       background.data()};
-  Work work{parent, *grid, std::move(source), whole, wanted, interleave, background, target};
+  Work work{parent, *grid, std::move(source), whole, wanted, interleave, background, target, map_};
   work.target.background = work.background.data();
 
-  const Outcome outcome = RunPart(work, whole);
+  const Outcome outcome = RunWhole(work);
   if (outcome == Outcome::kDone) return outcome;
   detail::FillBackground(work.target, whole);
   if (outcome == Outcome::kMissed) {
@@ -127,6 +209,21 @@ typename Reprojection<T>::Outcome Reprojection<T>::Run(Raster<T>& parent, const 
                 "Reproject: Error: GetSubRect on parent raster failed.");
   }
   return outcome;
+}
+
+template <typename T>
+typename Reprojection<T>::Outcome Reprojection<T>::RunWhole(Work& work) const {
+  const bool isEachTransformed = method_ == ReprojectionMethod::kRigorous && pixelCentres_;
+  if (!work.map && isEachTransformed) {
+    const CoveredRect covered =
+        BaseSubRectToSecSubRect(work.grid, work.rect, *work.source.geoRef, work.source.samples,
+                                work.source.lines, resampling_);
+    if (covered.misses && !covered.isPartial) return Outcome::kMissed;
+    const GeoRefPtr& grid = outputGrid_ ? outputGrid_ : target_;
+    work.map = std::make_shared<WarpMap>(grid, work.source.geoRef, work.source.samples,
+                                         work.source.lines, 0.0, Form::kTold);
+  }
+  return work.map ? RunMapped(work, work.rect) : RunPart(work, work.rect);
 }
 
 template <typename T>
@@ -146,10 +243,7 @@ typename Reprojection<T>::Outcome Reprojection<T>::RunPart(Work& work,
     return Outcome::kMissed;
   }
   const SubRectProj& from = covered.rect;
-  LogCoordSys(CoordSysLog::kReprojection,
-              "Reproject:            Src Rect l:%d, r:%d, t:%d, b:%d, pyramid lvl: %d", from.left,
-              from.right, from.top, from.bottom,
-              static_cast<int>(work.parent.GetPyramidDef().level));
+  detail::LogSourceRect(from, work.parent);
   const std::uint64_t bytes = static_cast<std::uint64_t>(from.Width() * from.Height()) *
                               work.bands.GetCount() * (sizeof(T) + 1);
   if (bytes > detail::kWarpWindowBytes && detail::CanHalve(part)) return RunHalves(work, part);
@@ -161,11 +255,66 @@ typename Reprojection<T>::Outcome Reprojection<T>::RunPart(Work& work,
 }
 
 template <typename T>
+typename Reprojection<T>::Outcome Reprojection<T>::RunMapped(Work& work,
+                                                             const SubRectProj& part) const {
+  if (part.Width() * part.Height() > detail::kWarpMappedPixels && detail::CanHalve(part)) {
+    return RunHalves(work, part);
+  }
+  const MappedPart mapped(*work.map, part);
+  const WarpBounds bounds = mapped.Bounds(work.source);
+  if (bounds.IsEmpty()) {
+    detail::FillBackground(detail::TargetOf(work.target, work.rect, part), part);
+    return Outcome::kMissed;
+  }
+  const SubRectProj from = bounds.Pixels(SamplingMargin(resampling_));
+  detail::LogSourceRect(from, work.parent);
+  const std::uint64_t bytes = static_cast<std::uint64_t>(from.Width() * from.Height()) *
+                              work.bands.GetCount() * (sizeof(T) + 1);
+  if (bytes > detail::kWarpWindowBytes && detail::CanHalve(part)) return RunHalves(work, part);
+  std::unique_ptr<Window> window = TakeWindow();
+  const bool fetched = Fetch(work, from, *window);
+  if (fetched) SampleMapped(work, *window, mapped);
+  GiveBack(std::move(window));
+  return fetched ? Outcome::kDone : Outcome::kFailed;
+}
+
+template <typename T>
+void Reprojection<T>::SampleMapped(Work& work, const Window& window,
+                                   const MappedPart& mapped) const {
+  const SubRectProj all(0, 0, static_cast<std::int32_t>(work.source.samples) - 1,
+                        static_cast<std::int32_t>(work.source.lines) - 1);
+  detail::RunEach(mapped.strips.size(), [&](unsigned i) {
+    const detail::WarpStrip& strip = mapped.strips[i];
+    const WarpPiece& piece = mapped.pieces[strip.piece];
+    const WarpTarget<T> target = detail::TargetOf(work.target, work.rect, strip.rect);
+    if (piece.way == WarpPiece::Way::kOutside) {
+      detail::FillBackground(target, strip.rect);
+      return;
+    }
+    // A polynomial moves edges by far more than noise.
+    const bool isTransform = piece.way == WarpPiece::Way::kTransform;
+    const double noise = work.map->IsAffine() ? WarpLimits::kAffineNoise
+                         : isTransform        ? WarpLimits::kTransformNoise
+                                              : 0.0;
+    const auto width = static_cast<unsigned>(strip.rect.Width());
+    const WarpPositions positions =
+        isTransform ? WarpPositions(&mapped.positions[strip.positions], width)
+                    : WarpPositions(piece.fit, width, double(strip.rect.left) - piece.originX + 0.5,
+                                    double(strip.rect.top) - piece.originY + 0.5);
+    const auto lines = static_cast<unsigned>(strip.rect.Height());
+    MakeSampler(positions, lines, LimitsIn(all, noise), window.source, target)->Body(0, lines);
+  });
+}
+
+template <typename T>
 typename Reprojection<T>::Outcome Reprojection<T>::RunHalves(Work& work,
                                                              const SubRectProj& part) const {
-  const Outcome first = RunPart(work, detail::HalfOf(part, false));
+  const auto run = [&](const SubRectProj& half) {
+    return work.map ? RunMapped(work, half) : RunPart(work, half);
+  };
+  const Outcome first = run(detail::HalfOf(part, false));
   if (first == Outcome::kFailed) return first;
-  const Outcome second = RunPart(work, detail::HalfOf(part, true));
+  const Outcome second = run(detail::HalfOf(part, true));
   return second == Outcome::kMissed ? first : second;
 }
 
@@ -215,11 +364,49 @@ bool Reprojection<T>::Fetch(Work& work, const SubRectProj& rect, Window& window)
 }
 
 template <typename T>
+WarpLimits Reprojection<T>::LimitsIn(const SubRectProj& pixels, double noise) const {
+  const bool isNearest = resampling_ == PyramidResamplingMethod::kNearest;
+  const bool isCorner = sampling_ == WarpSampling::kCorner;
+  const int last = isNearest && isCorner && method_ == ReprojectionMethod::kRigorous ? 0 : 1;
+  return {double(pixels.left),
+          double(pixels.top),
+          double(pixels.right) + last,
+          double(pixels.bottom) + last,
+          isNearest || isCorner ? 0.0 : 0.5,
+          noise};
+}
+
+template <typename T>
+std::unique_ptr<WarpParallel<T>> Reprojection<T>::MakeSampler(const WarpPositions& positions,
+                                                              unsigned lines,
+                                                              const WarpLimits& limits,
+                                                              const WarpSource<T>& source,
+                                                              const WarpTarget<T>& target) const {
+  const auto make = [&]<typename Sampler>() {
+    return std::make_unique<Sampler>(positions, lines, limits, source, target, sampling_);
+  };
+  if (resampling_ == PyramidResamplingMethod::kNearest) {
+    return make.template operator()<NearestNeighborParallel<T>>();
+  }
+  if (resampling_ == PyramidResamplingMethod::kLinear) {
+    return make.template operator()<LinearInterpolateParallel<T>>();
+  }
+  return make.template operator()<CubicInterpolateParallel<T>>();
+}
+
+template <typename T>
 void Reprojection<T>::SamplePart(Work& work, const Window& window, const SubRectProj& part) const {
   const GeoRef& source = *work.source.geoRef;
-  bool byPolynomial = method_ != ReprojectionMethod::kRigorous;
+  const auto width = static_cast<unsigned>(part.Width());
+  const bool isRigorous = method_ == ReprojectionMethod::kRigorous;
   WarpPolynomial fit;
-  if (byPolynomial) {
+  WarpPositions positions(work.grid, source, part, Centre());
+  const std::optional<AffineLink> affine =
+      isRigorous ? std::nullopt : FindAffineLink(work.grid, source);
+  if (affine) {
+    fit = PolynomialOf(*affine);
+    positions = WarpPositions(fit, width, part.left + Centre(), part.top + Centre());
+  } else if (!isRigorous) {
     const bool isWhole = part.Width() == work.rect.Width() && part.Height() == work.rect.Height();
     SubRectProj points = window.source.window;
     if (!isWhole) {
@@ -227,37 +414,16 @@ void Reprojection<T>::SamplePart(Work& work, const Window& window, const SubRect
           work.grid, part, source, work.source.samples, work.source.lines, resampling_);
       if (!covered.misses) points = covered.rect;
     }
-    byPolynomial = FitWarp(work.grid, part, source, points, Centre(), fit);
-    if (byPolynomial && fit.worst > tolerance_) {
-      if (detail::CanHalve(part)) {
-        SamplePart(work, window, detail::HalfOf(part, false));
-        SamplePart(work, window, detail::HalfOf(part, true));
-        return;
-      }
-      byPolynomial = false;
+    if (FitWarp(work.grid, part, source, points, Centre(), fit)) {
+      positions = WarpPositions(fit, width, Centre(), Centre());
     }
   }
-  const auto width = static_cast<unsigned>(part.Width());
-  const WarpPositions positions = byPolynomial ? WarpPositions(fit, width, Centre())
-                                               : WarpPositions(work.grid, source, part, Centre());
-  const bool isNearest = resampling_ == PyramidResamplingMethod::kNearest;
-  const bool isCorner = sampling_ == WarpSampling::kCorner;
-  const SubRectProj& from = window.source.window;
-  const int last = isNearest && isCorner && method_ == ReprojectionMethod::kRigorous ? 0 : 1;
-  const WarpLimits limits{double(from.left), double(from.top), double(from.right) + last,
-                          double(from.bottom) + last, isNearest || isCorner ? 0.0 : 0.5};
   const WarpTarget<T> target = detail::TargetOf(work.target, work.rect, part);
-  const auto lines = static_cast<unsigned>(part.Height());
-  if (isNearest) {
-    NearestNeighborParallel<T> loop(positions, lines, limits, window.source, target, sampling_);
-    RunParallelFor(loop);
-  } else if (resampling_ == PyramidResamplingMethod::kLinear) {
-    LinearInterpolateParallel<T> loop(positions, lines, limits, window.source, target, sampling_);
-    RunParallelFor(loop);
-  } else {
-    CubicInterpolateParallel<T> loop(positions, lines, limits, window.source, target, sampling_);
-    RunParallelFor(loop);
-  }
+  const auto sampler =
+      MakeSampler(positions, static_cast<unsigned>(part.Height()),
+                  LimitsIn(window.source.window, affine ? WarpLimits::kAffineNoise : 0.0),
+                  window.source, target);
+  RunParallelFor(*sampler);
 }
 
 }  // namespace lumo

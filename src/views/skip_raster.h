@@ -9,8 +9,9 @@ namespace lumo {
 /// (x * skipX, y * skipY) of the parent. What is left over at the right and at the bottom is not
 /// shown. Statistics are the view's own. Exists for EightTypes.
 ///
-/// A read asks the parent for the lines that it shows, each from the first pixel to the last; a
-/// write leaves the pixels between as they are.
+/// A read asks the parent for the lines that it shows, each from the first pixel to the last, and
+/// for those between where the parent is stored in tiles or strips; a write leaves the pixels
+/// between as they are.
 ///
 /// Ownership: shares the parent, which does not know the view.
 /// Threads:   every operation may run on many threads at once; nothing is stored per call.
@@ -50,6 +51,7 @@ class SkipRaster final : public ComputedRaster<T> {
 
  private:
   SubRect LineInParent(const SubRect& rect, unsigned line) const;
+  SubRect ReadAtOnce(const SubRect& rect, unsigned x, unsigned y, unsigned bands) const;
 
   RasterDef def_;
   unsigned skipX_;

@@ -2,7 +2,8 @@
 
 #include <algorithm>
 
-#include "raster/interleave.h"
+#include "data/block_shape.h"
+#include "georef/derived_georef.h"
 #include "views/skip_raster.h"
 
 namespace lumo {
@@ -17,10 +18,7 @@ SkipRaster<T>::SkipRaster(const RasterPtr<T>& parent, unsigned skipX, unsigned s
   def_.samples = parent->Samples() / skipX;
   def_.lines = parent->Lines() / skipY;
   if (def_.geoRef) {
-    GeoRef& geoRef = *def_.geoRef;
-    geoRef.SetDimensions(def_.samples, def_.lines);
-    geoRef.SetPixelSize(geoRef.PixelSizeX() * skipX, geoRef.PixelSizeY() * skipY);
-    geoRef.SetTiePixel(geoRef.TiePixelX() / skipX, geoRef.TiePixelY() / skipY);
+    def_.geoRef = ReducedGeoRef(*def_.geoRef, skipX, skipY, def_.samples, def_.lines);
   }
   if (topLevel) pyramidDef_ = parent->GetPyramidDef();
 }
@@ -48,60 +46,85 @@ SubRect SkipRaster<T>::LineInParent(const SubRect& rect, unsigned line) const {
   return {rect.left * skipX_, y, rect.right * skipX_, y};
 }
 
+/// What of a block is read with its pixel (x, y) as the first one: the lines that lie in the same
+/// row of the parent's tiles or strips, so that each of these is decoded once, and as many tiles of
+/// it as memory allows. Of a parent stored in lines no line is read in vain.
+template <typename T>
+SubRect SkipRaster<T>::ReadAtOnce(const SubRect& rect, unsigned x, unsigned y,
+                                  unsigned bands) const {
+  const unsigned tileHeight = std::max(def_.tileHeight, 1U);
+  const unsigned inTile = (tileHeight - 1 - y * skipY_ % tileHeight) / skipY_ + 1;
+  const unsigned bottom = y + std::min(inTile - 1, rect.bottom - y);
+  constexpr std::uint64_t kMostBytes = std::uint64_t{64} << 20;
+  const std::uint64_t columnBytes =
+      (std::uint64_t{bottom - y} * skipY_ + 1) * std::max(bands, 1U) * (sizeof(T) + 1);
+  const std::uint64_t tileWidth = std::max(def_.tileWidth, 1U);
+  const std::uint64_t columns =
+      std::max<std::uint64_t>(kMostBytes / columnBytes / tileWidth, 1) * tileWidth;
+  const std::uint64_t last =
+      (x * std::uint64_t{skipX_} / tileWidth * tileWidth + columns - 1) / skipX_;
+  const auto right = static_cast<unsigned>(std::clamp<std::uint64_t>(last, x, rect.right));
+  return {x, y, right, bottom};
+}
+
 template <typename T>
 bool SkipRaster<T>::GetSubRect(const SubRect& rect, const Array<unsigned>& bands,
                                Interleave interleave, Array<T>& pixels,
                                Array<unsigned char>& state) {
-  const unsigned width = rect.Width(), height = rect.Height(), count = bands.GetCount();
-  const ArrayDims dims = BlockDims(interleave, width, height, count);
+  const BlockShape block(rect, bands, interleave);
   if (!this->Parent() || rect.right >= Samples() || rect.bottom >= Lines() ||
-      !pixels.Resize(dims) || !state.Resize(dims)) {
+      !block.Size(pixels, state)) {
     return false;
   }
+  const unsigned count = block.count;
   const bool inOrder = interleave == Interleave::BIP || count == 1;
   Array<T> bip;
   Array<unsigned char> bipState;
-  const ArrayDims flat(dims.count);
+  const ArrayDims flat(block.dims.count);
   if (!inOrder && (!bip.Resize(flat) || !bipState.Resize(flat))) return false;
-  T* toPixel = inOrder ? pixels.GetData() : bip.GetData();
-  unsigned char* toState = inOrder ? state.GetData() : bipState.GetData();
+  T* const toPixels = inOrder ? pixels.GetData() : bip.GetData();
+  unsigned char* const toStates = inOrder ? state.GetData() : bipState.GetData();
 
-  Array<T> line;
-  Array<unsigned char> lineState;
-  for (unsigned y = rect.top; y <= rect.bottom; ++y) {
-    if (!this->Parent()->GetSubRect(LineInParent(rect, y), bands, Interleave::BIP, line,
-                                    lineState)) {
-      return false;
-    }
-    const std::size_t step = std::size_t{skipX_} * count;
-    for (unsigned x = 0; x < width; ++x) {
-      toPixel = std::copy_n(&line[x * step], count, toPixel);
-      toState = std::copy_n(&lineState[x * step], count, toState);
+  Array<T> read;
+  Array<unsigned char> readState;
+  SubRect part = rect;
+  for (unsigned y = rect.top; y <= rect.bottom; y = part.bottom + 1) {
+    for (unsigned x = rect.left; x <= rect.right; x = part.right + 1) {
+      part = ReadAtOnce(rect, x, y, count);
+      const SubRect inParent(part.left * skipX_, part.top * skipY_, part.right * skipX_,
+                             part.bottom * skipY_);
+      if (!this->Parent()->GetSubRect(inParent, block.bands, Interleave::BIP, read, readState)) {
+        return false;
+      }
+      const std::size_t step = std::size_t{skipX_} * count;
+      for (std::size_t line = 0; line < part.Height(); ++line) {
+        const std::size_t from = line * skipY_ * inParent.Width() * count;
+        const std::size_t to = ((y - rect.top + line) * block.width + (x - rect.left)) * count;
+        for (std::size_t i = 0; i < part.Width(); ++i) {
+          std::copy_n(&read[from + i * step], count, toPixels + to + i * count);
+          std::copy_n(&readState[from + i * step], count, toStates + to + i * count);
+        }
+      }
     }
   }
-  return inOrder || (ConvertInterleave(bip.GetData(), Interleave::BIP, pixels.GetData(), interleave,
-                                       width, height, count, sizeof(T)) &&
-                     ConvertInterleave(bipState.GetData(), Interleave::BIP, state.GetData(),
-                                       interleave, width, height, count, 1));
+  return inOrder || block.Convert(bip, bipState, Interleave::BIP, pixels, state, interleave);
 }
 
 template <typename T>
 bool SkipRaster<T>::PutSubRect(const SubRect& rect, const Array<unsigned>& bands,
                                Interleave interleave, Array<T>& pixels,
                                Array<unsigned char>& state) {
-  const unsigned width = rect.Width(), height = rect.Height(), count = bands.GetCount();
-  const ArrayDims flat(BlockDims(interleave, width, height, count).count);
+  const BlockShape block(rect, bands, interleave);
   if (!this->Parent() || rect.right >= Samples() || rect.bottom >= Lines() ||
-      pixels.GetCount() < flat.count || state.GetCount() < flat.count) {
+      !block.IsHeldBy(pixels, state)) {
     return false;
   }
+  const unsigned count = block.count;
+  const ArrayDims flat(block.dims.count);
   Array<T> bip;
   Array<unsigned char> bipState;
   if (!bip.Resize(flat) || !bipState.Resize(flat) ||
-      !ConvertInterleave(pixels.GetData(), interleave, bip.GetData(), Interleave::BIP, width,
-                         height, count, sizeof(T)) ||
-      !ConvertInterleave(state.GetData(), interleave, bipState.GetData(), Interleave::BIP, width,
-                         height, count, 1)) {
+      !block.Convert(pixels, state, interleave, bip, bipState, Interleave::BIP)) {
     return false;
   }
   const T* fromPixel = bip.GetData();
@@ -110,15 +133,15 @@ bool SkipRaster<T>::PutSubRect(const SubRect& rect, const Array<unsigned>& bands
   Array<unsigned char> lineState;
   for (unsigned y = rect.top; y <= rect.bottom; ++y) {
     const SubRect inParent = LineInParent(rect, y);
-    if (!this->Parent()->GetSubRect(inParent, bands, Interleave::BIP, line, lineState)) {
+    if (!this->Parent()->GetSubRect(inParent, block.bands, Interleave::BIP, line, lineState)) {
       return false;
     }
     const std::size_t step = std::size_t{skipX_} * count;
-    for (unsigned x = 0; x < width; ++x, fromPixel += count, fromState += count) {
+    for (unsigned x = 0; x < block.width; ++x, fromPixel += count, fromState += count) {
       std::copy_n(fromPixel, count, &line[x * step]);
       std::copy_n(fromState, count, &lineState[x * step]);
     }
-    if (!this->Parent()->PutSubRect(inParent, bands, Interleave::BIP, line, lineState)) {
+    if (!this->Parent()->PutSubRect(inParent, block.bands, Interleave::BIP, line, lineState)) {
       return false;
     }
   }

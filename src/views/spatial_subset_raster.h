@@ -1,5 +1,6 @@
 #pragma once
 
+#include "georef/derived_georef.h"
 #include "raster/raster_def.h"
 #include "views/computed_raster.h"
 
@@ -19,7 +20,8 @@ class SpatialSubsetRaster final : public ComputedRaster<T> {
  public:
   /// @param rect  pixels of the parent, corners inclusive and in any order; cut to the parent's
   ///              extent. One wholly outside leaves the strip of the parent's last column or line.
-  SpatialSubsetRaster(const RasterPtr<T>& parent, const SubRect& rect);
+  /// @param form  of the geo-reference, see PartGeoRef.
+  SpatialSubsetRaster(const RasterPtr<T>& parent, const SubRect& rect, Form form = Form::kTold);
   ~SpatialSubsetRaster() override { this->StopComputing(); }
 
   URI GetURI() const override { return this->DefaultURI("SpatialSubsetRaster"); }
@@ -42,6 +44,7 @@ class SpatialSubsetRaster final : public ComputedRaster<T> {
   SubRect InParent(const SubRect& rect) const;
 
   SubRect rect_;
+  Form form_;
   RasterDef def_;
 };
 

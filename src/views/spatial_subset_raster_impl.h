@@ -2,6 +2,8 @@
 
 #include <algorithm>
 
+#include "pyramid/exact_levels.h"
+#include "raster/raster_details.h"
 #include "views/spatial_subset_raster.h"
 
 namespace lumo {
@@ -20,14 +22,16 @@ inline SubRect CutTo(const SubRect& rect, unsigned samples, unsigned lines) {
 }  // namespace detail
 
 template <typename T>
-SpatialSubsetRaster<T>::SpatialSubsetRaster(const RasterPtr<T>& parent, const SubRect& rect)
-    : ComputedRaster<T>(parent) {
+SpatialSubsetRaster<T>::SpatialSubsetRaster(const RasterPtr<T>& parent, const SubRect& rect,
+                                            Form form)
+    : ComputedRaster<T>(parent), form_(form) {
   if (!parent || parent->Samples() == 0 || parent->Lines() == 0) return;
   rect_ = detail::CutTo(rect, parent->Samples(), parent->Lines());
   def_ = parent->GetRasterDef();
   def_.samples = rect_.Width();
   def_.lines = rect_.Height();
-  if (def_.geoRef) def_.SetGeoRef(def_.geoRef->SubRectGeoRef(rect_));
+  if (def_.geoRef) def_.SetGeoRef(PartGeoRef(*def_.geoRef, rect_, form_));
+  MovePlaceDetails(def_.metadata, rect_.left, rect_.top);
 }
 
 template <typename T>
@@ -42,7 +46,8 @@ RasterPtr<T> SpatialSubsetRaster<T>::PyramidLevel(unsigned level) {
     rect.left = std::min((rect.left + 1) >> 1, rect.right);
     rect.top = std::min((rect.top + 1) >> 1, rect.bottom);
   }
-  return RasterPtr<T>(new SpatialSubsetRaster(reduced, rect));
+  const Form form = ExactLevels::AreWanted() ? Form::kExact : form_;
+  return RasterPtr<T>(new SpatialSubsetRaster(reduced, rect, form));
 }
 
 template <typename T>

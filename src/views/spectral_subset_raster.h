@@ -6,7 +6,8 @@
 namespace lumo {
 
 /// Shows bands of its parent in an order of its own; one may come twice. Its statistics and
-/// histograms are the parent's, with the numbers of the bands translated. Exists for EightTypes.
+/// histograms are the parent's, with the numbers of the bands translated, those in arrays of values
+/// between bands as well. Exists for EightTypes.
 ///
 /// Ownership: shares the parent, which does not know the view.
 /// Threads:   every operation may run on many threads at once; nothing is stored per call.
@@ -43,6 +44,7 @@ class SpectralSubsetRaster final : public RasterView<T> {
                                HistogramSign sign, const IPC& ipc) override;
   AsyncPtr HistogramAllBands(T lower, T upper, unsigned binCount, HistogramSign sign,
                              const IPC& ipc) override;
+  AsyncPtr CountHistogram(const HistogramRequest<T>& request, const IPC& ipc) override;
 
   bool HasNoDataValue(unsigned band) const override;
   T NoDataValue(unsigned band) const override;

@@ -1,5 +1,9 @@
 #pragma once
 
+#include <algorithm>
+#include <vector>
+
+#include "raster/raster_details.h"
 #include "views/spectral_subset_raster.h"
 
 namespace lumo {
@@ -19,6 +23,7 @@ SpectralSubsetRaster<T>::SpectralSubsetRaster(const RasterPtr<T>& parent,
     const auto value = noData.find(map_[band]);
     if (value != noData.end()) def_.noData[band] = value->second;
   }
+  ChooseBandDetails(def_.metadata, map_);
 }
 
 template <typename T>
@@ -63,10 +68,63 @@ bool SpectralSubsetRaster<T>::DeletePalette(unsigned band) {
   return RasterView<T>::DeletePalette(InParent(band));
 }
 
+namespace detail {
+
+/// Takes a statistic between bands out of `mask` and empties its array.
+inline void DropPairs(Array<double>& values, unsigned& mask, unsigned bit) {
+  values = Array<double>();
+  mask &= ~bit;
+}
+
+/// Carries the entries of a band's array from the parent to a view of its bands `map`. Without an
+/// entry for one of them the view doesn't have the statistic.
+inline void PairsOfView(Array<double>& values, unsigned& mask, unsigned bit,
+                        const Array<unsigned>& map) {
+  if ((mask & bit) == 0) return;
+  Array<double> ofView{ArrayDims(map.GetCount())};
+  for (unsigned band = 0; band < map.GetCount(); ++band) {
+    if (map[band] >= values.GetCount()) return DropPairs(values, mask, bit);
+    ofView[band] = values[map[band]];
+  }
+  values = ofView;
+}
+
+/// Carries the entries of a band's array from the view to its parent. Those of bands that the view
+/// doesn't show are `known`, what the parent has already; where that lacks one, it gets none.
+inline void PairsOfParent(Array<double>& values, unsigned& mask, unsigned bit,
+                          const Array<unsigned>& map, const Array<double>& known, unsigned bands) {
+  if ((mask & bit) == 0) return;
+  Array<double> ofParent{ArrayDims(bands)};
+  std::vector<bool> isThere(bands);
+  for (unsigned band = 0; band < bands; ++band) {
+    isThere[band] = band < known.GetCount();
+    ofParent[band] = isThere[band] ? known[band] : 0.0;
+  }
+  for (unsigned i = 0; i < std::min(values.GetCount(), map.GetCount()); ++i) {
+    if (map[i] >= bands) continue;
+    ofParent[map[i]] = values[i];
+    isThere[map[i]] = true;
+  }
+  if (std::ranges::count(isThere, false) != 0) return DropPairs(values, mask, bit);
+  values = ofParent;
+}
+
+}  // namespace detail
+
 template <typename T>
 void SpectralSubsetRaster<T>::SetBandStats(const RasterBandStats<T>& stats) {
+  if (!this->Parent()) return;
   RasterBandStats<T> mapped = stats;
   mapped.band = InParent(stats.band);
+  const unsigned bands = this->Parent()->Bands();
+  const RasterBandStats<T> known = RasterView<T>::BandStats(mapped.band);
+  const auto knownOf = [&](unsigned bit, const Array<double>& values) {
+    return (known.mask & bit) != 0 ? values : Array<double>();
+  };
+  detail::PairsOfParent(mapped.sumXY, mapped.mask, StatsMask::SumXY, map_,
+                        knownOf(StatsMask::SumXY, known.sumXY), bands);
+  detail::PairsOfParent(mapped.cov, mapped.mask, StatsMask::Cov, map_,
+                        knownOf(StatsMask::Cov, known.cov), bands);
   RasterView<T>::SetBandStats(mapped);
 }
 
@@ -74,6 +132,8 @@ template <typename T>
 RasterBandStats<T> SpectralSubsetRaster<T>::BandStats(unsigned band) const {
   RasterBandStats<T> stats = RasterView<T>::BandStats(InParent(band));
   stats.band = band;
+  detail::PairsOfView(stats.sumXY, stats.mask, StatsMask::SumXY, map_);
+  detail::PairsOfView(stats.cov, stats.mask, StatsMask::Cov, map_);
   return stats;
 }
 
@@ -156,6 +216,14 @@ template <typename T>
 AsyncPtr SpectralSubsetRaster<T>::HistogramAllBands(T lower, T upper, unsigned binCount,
                                                     HistogramSign sign, const IPC& ipc) {
   return RasterView<T>::HistogramByBinCount(lower, upper, binCount, map_, sign, ipc);
+}
+
+template <typename T>
+AsyncPtr SpectralSubsetRaster<T>::CountHistogram(const HistogramRequest<T>& request,
+                                                 const IPC& ipc) {
+  HistogramRequest<T> mapped = request;
+  mapped.bands = request.bands.GetCount() != 0 ? InParent(request.bands) : map_;
+  return RasterView<T>::CountHistogram(mapped, ipc);
 }
 
 template <typename T>

@@ -1,3 +1,4 @@
+#include "raster/pixel_value.h"
 #include "views/band_stack_raster.h"
 #include "views/complex_raster.h"
 #include "views/projected_raster.h"
@@ -29,7 +30,11 @@ class ViewCommand : public PublishCommand {
       view = BasicRasterPtr(make(RasterPtr<T>(source)));
       return true;
     });
-    return typed ? Publish(view) : Fail("SrcURI: there is no such view on this pixel type");
+    if (!typed) return Fail("SrcURI: there is no such view on this pixel type");
+    if (view->IsValid() && (view->Samples() == 0 || view->Lines() == 0)) {
+      return Fail("the view would show no pixel of the raster");
+    }
+    return Publish(view);
   }
 };
 
@@ -38,14 +43,19 @@ const CommandDeclaration kSpatial{"CreateSpatialSubsetRasterCommand",
                                   "Shows a rectangle of a raster as a raster.",
                                   {kSource,
                                    {"SubRect", Presence::kRequired, ValueKind::kRectangle,
-                                    "pixels of the source; cut to its extent"}},
+                                    "pixels of the source; cut to its extent"},
+                                   {"Placing", Presence::kOptional, ValueKind::kWord,
+                                    "Told: the tie pixel of the geo-reference stays where it was; "
+                                    "Exact: the view lies where its pixels lie in the source",
+                                    "", &WordsIn<Form>}},
                                   PublishedOutputs()};
 
 class CreateSpatialSubsetRasterCommand final : public ViewCommand {
   CommandResult Execute() override {
     const auto rect = Read<SubRect>("SubRect");
+    const Form form = HasInput("Placing") ? Read<Form>("Placing") : Form::kTold;
     return PublishView([&]<typename T>(const RasterPtr<T>& source) {
-      return RasterPtr<T>(new SpatialSubsetRaster<T>(source, rect));
+      return RasterPtr<T>(new SpatialSubsetRaster<T>(source, rect, form));
     });
   }
 };
@@ -157,16 +167,17 @@ const CommandDeclaration kProjected{
     {kSource,
      {"GeoRef", Presence::kRequired, ValueKind::kGeoRef, "of type Std: the grid"},
      {"ReprojectionMethod", Presence::kRequired, ValueKind::kWord,
-      "Polynomial: fitted to each block; Rigorous: a transform of every pixel; Triangulation runs "
-      "as Polynomial",
+      "Polynomial: fitted to each block, or on an exact grid to its fixed squares; Rigorous: a "
+      "transform of every pixel; Triangulation runs as Polynomial",
       "", &WordsIn<ReprojectionMethod>},
      {"ResamplingMethod", Presence::kRequired, ValueKind::kWord,
       "Nearest, Linear or Cubic; others run as Nearest", "", &WordsIn<PyramidResamplingMethod>},
      {"PyramidURI", Presence::kOptional, ValueKind::kURI, "has no effect"},
      {"PyramidLevel", Presence::kOptional, ValueKind::kInteger, "has no effect"},
      {"Grid", Presence::kOptional, ValueKind::kWord,
-      "Told: all of the raster, with pixels as large as its own; Exact: the GeoRef with its own "
-      "size",
+      "Told: all of the raster, with pixels as large as its own, and its statistics; Exact: the "
+      "GeoRef with its own size, where a pixel is the same in every block, and statistics of the "
+      "pixels there",
       "", &WordsIn<ProjectedGrid>},
      {"Sampling", Presence::kOptional, ValueKind::kWord,
       "Told: linear and cubic weigh from the corners of pixels and round toward zero; Centred: "
@@ -188,6 +199,10 @@ class CreateProjectedRasterCommand final : public ViewCommand {
     if (HasInput("Grid")) options.grid = Read<ProjectedGrid>("Grid");
     if (HasInput("Sampling")) options.sampling = Read<WarpSampling>("Sampling");
     if (HasInput("NoData")) options.noData = Read<double>("NoData");
+    const BasicRasterPtr parent = options.noData ? FindRaster("SrcURI") : BasicRasterPtr();
+    if (parent && !FitsPixel(parent->DataType(), *options.noData)) {
+      return Fail("NoData: the pixel type can't hold this value");
+    }
     return PublishView([&]<typename T>(const RasterPtr<T>& source) {
       return RasterPtr<T>(new ProjectedRaster<T>(source, target, method, resampling, options));
     });

@@ -13,6 +13,9 @@ class LocalRaster final : public RasterView<T> {
   URI GetURI() const override {
     return this->Parent() ? this->Parent()->GetURI() : this->DefaultURI("LocalRaster");
   }
+  std::uint64_t PixelCount(unsigned band, const IPC& ipc) override {
+    return this->Parent() ? this->Parent()->PixelCount(band, ipc) : 0;
+  }
 };
 
 /// Gives a raster a second identity: an identifier of its own in the catalog, under which it can be
@@ -25,6 +28,9 @@ class VirtualRaster final : public RasterView<T> {
   explicit VirtualRaster(const RasterPtr<T>& source)
       : RasterView<T>(RasterPtr<T>(new LocalRaster<T>(source))) {}
   URI GetURI() const override { return this->DefaultURI("VirtualRaster"); }
+  std::uint64_t PixelCount(unsigned band, const IPC& ipc) override {
+    return this->Parent()->PixelCount(band, ipc);
+  }
 };
 
 }  // namespace lumo

@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <cmath>
 
+#include "georef/affine_link.h"
 #include "platform/vector_clones.h"
 
 namespace lumo {
@@ -17,12 +18,22 @@ std::vector<double>& Scratch() {
   return scratch;
 }
 
+/// Fills all of a chunk, whatever part of it is needed, so that a position has the same bits in
+/// whichever place of a chunk it comes.
 VEXG_VECTOR_CLONES
-void FillPolynomial(const double* k, double y, double firstX, unsigned count, double* out) {
+void FillPolynomial(const double* k, double y, double firstX, double* out) {
   const double onLine = k[0] + k[1] * y;
-  for (unsigned i = 0; i < count; ++i) {
+  for (unsigned i = 0; i < WarpChunk::kPixels; ++i) {
     const double x = firstX + i;
     out[i] = onLine + k[2] * x + k[3] * x * y;
+  }
+}
+
+VEXG_VECTOR_CLONES
+void Snap(double* positions, double noise) {
+  for (unsigned i = 0; i < WarpChunk::kPixels; ++i) {
+    const double near = std::floor(positions[i] * 2 + 0.5) / 2;
+    positions[i] = std::abs(positions[i] - near) < noise ? near : positions[i];
   }
 }
 
@@ -49,14 +60,18 @@ bool TakeAxisApart(const double* positions, unsigned count, double low, double h
 
 void WarpPositions::Reader::Read(unsigned line, unsigned x, unsigned count, double* positionX,
                                  double* positionY) {
-  if (positions_.grid_ == nullptr) {
-    const double centre = positions_.centre_;
-    FillPolynomial(positions_.fit_.u.data(), line + centre, x + centre, count, positionX);
-    FillPolynomial(positions_.fit_.v.data(), line + centre, x + centre, count, positionY);
+  const double* points = positions_.points_;
+  if (points == nullptr && positions_.grid_ == nullptr) {
+    const double y = line + positions_.firstY_, firstX = x + positions_.firstX_;
+    FillPolynomial(positions_.fit_.u.data(), y, firstX, positionX);
+    FillPolynomial(positions_.fit_.v.data(), y, firstX, positionY);
     return;
   }
-  if (line - first_ >= lines_) Transform(line);
-  const double* const points = &Scratch()[2 * (std::size_t{line - first_} * positions_.width_ + x)];
+  if (points == nullptr) {
+    if (line - first_ >= lines_) Transform(line);
+    points = Scratch().data();
+  }
+  points += 2 * (std::size_t{line - first_} * positions_.width_ + x);
   for (unsigned i = 0; i < count; ++i) {
     positionX[i] = points[2 * i];
     positionY[i] = points[2 * i + 1];
@@ -72,18 +87,21 @@ void WarpPositions::Reader::Transform(unsigned line) {
   scratch.resize(std::max(scratch.size(), 2 * std::size_t{lines_} * width));
   double* at = scratch.data();
   for (unsigned i = 0; i < lines_; ++i) {
-    const double y = positions_.top_ + static_cast<double>(line + i) + positions_.centre_;
+    const double y = positions_.firstY_ + static_cast<double>(line + i);
     for (unsigned x = 0; x < width; ++x) {
-      *at++ = positions_.left_ + static_cast<double>(x) + positions_.centre_;
+      *at++ = positions_.firstX_ + static_cast<double>(x);
       *at++ = y;
     }
   }
   Array<double> points(scratch.data(), ArrayDims(lines_ * width, 2));
-  positions_.grid_->PixelToPixel(points, *positions_.source_);
+  CarryPixels(*positions_.grid_, *positions_.source_, points);
 }
 
-void TakeApart(const double* positionX, const double* positionY, const WarpLimits& limits,
-               WarpChunk& chunk) {
+void TakeApart(double* positionX, double* positionY, const WarpLimits& limits, WarpChunk& chunk) {
+  if (limits.noise > 0) {
+    Snap(positionX, limits.noise);
+    Snap(positionY, limits.noise);
+  }
   std::uint8_t insideY[WarpChunk::kPixels];
   const bool allX = TakeAxisApart(positionX, chunk.count, limits.lowX, limits.highX, limits.shift,
                                   chunk.x, chunk.a, chunk.inside);

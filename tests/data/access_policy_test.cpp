@@ -21,7 +21,9 @@ TEST(AccessPolicy, KeepsSourcesInsideTheRoots) {
   const fs::path base(directory.Path());
   fs::create_directories(base / "in/deep");
   fs::create_directories(base / "in-not");
-  for (const char* name : {"in/a", "in/deep/b", "out", "in-not/c"}) std::ofstream(base / name) << 1;
+  fs::create_directories(base / "in/vsi_scenes");
+  for (const char* name : {"in/vsi_scenes/d", "in/a", "in/deep/b", "out", "in-not/c"})
+    std::ofstream(base / name) << 1;
   fs::create_symlink(base / "out", base / "in/leads-out");
   fs::create_symlink(base / "missing", base / "in/leads-nowhere");
   fs::create_directory_symlink(base / "in/deep", base / "in/leads-in");
@@ -45,7 +47,16 @@ TEST(AccessPolicy, KeepsSourcesInsideTheRoots) {
                {in("in-not/c"), false, false},
                {in("in/../out"), false, false},
                {in("in/../new"), true, false},
-               {"HDF5:" + in("in/a"), false, false},
+               {"HDF5:" + in("in/a"), false, true},
+               {"HDF5:\"" + in("in/a") + "\"://band", false, true},
+               {"HDF5:\"" + in("out") + "\"://band", false, false},
+               {"HDF5:" + in("out") + "://band", false, false},
+               {"HDF5:\"" + in("in/missing") + "\"://band", false, false},
+               {"file://" + in("in/a"), false, true},
+               {"file:" + in("out"), false, false},
+               {"file://localhost" + in("out"), false, false},
+               {in("in/vsi_scenes/d"), false, true},
+               {"/vsisubfile/0_10," + in("in/a"), false, false},
                {"/vsizip/" + in("in/a"), false, false},
                {"/vsicurl/http://x/y.tif", false, false},
                {"http://x/y.tif", false, false},
@@ -59,6 +70,23 @@ TEST(AccessPolicy, KeepsSourcesInsideTheRoots) {
     EXPECT_EQ(MayUseSource(ConnStrings({c.name}), c.making), c.allowed);
     EXPECT_EQ(TakeFault().GetLength() == 0, c.allowed);
   }
+  // Behind the name stand options, and names of places inside it.
+  const struct {
+    std::string piece;
+    bool allowed;
+  } pieces[] = {{"SUBDATASET=/group/band", true},
+                {"NUM_THREADS=2", true},
+                {"SUBDATASET=2", true},
+                {"FILE=" + in("in/a"), true},
+                {"FILE=" + in("out"), false},
+                {"FILE=/vsicurl/http://x", false},
+                {in("out"), false}};
+  for (const auto& c : pieces) {
+    EXPECT_EQ(MayUseSource(ConnStrings({String(in("in/a")), String(c.piece)}), false), c.allowed)
+        << c.piece;
+  }
+  EXPECT_TRUE(MayReachFile(in("in/missing"), true));
+  EXPECT_FALSE(MayReachFile(in("in/leads-nowhere"), true));
   const OwnMemoryScope own;
   EXPECT_TRUE(MayUseSource(ConnStrings({"MemoryRaster", "any text"}), false));
 }

@@ -2,7 +2,10 @@
 
 #include <chrono>
 #include <latch>
+#include <new>
 #include <thread>
+
+#include "foundation/thread_roll.h"
 
 namespace lumo {
 namespace {
@@ -166,6 +169,65 @@ TEST(AggragateAsync, ActsAsOne) {
   group.WaitFinished();
   EXPECT_FALSE(children[1]->IsStarted());
   EXPECT_THAT(recorder.said, testing::StartsWith("start "));
+}
+
+// Whoever raises the flag, who waits for a child that nobody will start any more must wake.
+TEST(AggragateAsync, AnAbortEndsTheWaitForAChildThatNeverStarts) {
+  using Raise = std::function<void(AggragateAsync&, AsyncPtr&)>;
+  const Raise raises[] = {
+      [](AggragateAsync&, AsyncPtr& other) { other->Abort(); },
+      [](AggragateAsync& group, AsyncPtr&) { group.GetSharedAbort()->Set(true); },
+      [](AggragateAsync& group, AsyncPtr&) { group.Abort(); },
+      [](AggragateAsync& group, AsyncPtr&) { group.GetChildCallback(0)->OnAbort(true); }};
+  for (const Raise& raise : raises) {
+    AggragateAsync group(2);
+    AsyncPtr children[2];
+    for (unsigned i = 0; i < 2; ++i) {
+      const IPC ipc(group.GetSharedAbort(), group.GetChildProgress(i));
+      children[i] = AsyncPtr(new Work(ipc, group.GetChildCallback(i)));
+      group.SetChild(i, children[i]);
+    }
+    SubmitAsync(children[0], false);
+    std::atomic<bool> woke{false};
+    std::thread waiting([&] {
+      group.WaitFinished();
+      woke = true;
+    });
+    std::this_thread::sleep_for(std::chrono::milliseconds(20));
+    EXPECT_FALSE(woke);
+    raise(group, children[0]);
+    waiting.join();  // or the test runs into its time limit
+  }
+}
+
+TEST(Threads, AreWaitedForToTheirEndAndKeepExceptionsIn) {
+  static std::atomic<bool> atEnd{false};
+  struct AtEnd {
+    ~AtEnd() {
+      std::this_thread::sleep_for(std::chrono::milliseconds(50));
+      atEnd = true;
+    }
+  };
+  ASSERT_TRUE(Thread().Start([] {
+    thread_local AtEnd last;  // goes after the body
+    static_cast<void>(last);
+    throw std::bad_alloc();
+  }));
+  EXPECT_TRUE(JoinThreads(10.0));
+  EXPECT_TRUE(atEnd);
+
+  std::latch leave(1);
+  ASSERT_TRUE(Thread().Start([&] { leave.wait(); }));
+  EXPECT_FALSE(JoinThreads(0.05));
+  leave.count_down();
+  EXPECT_TRUE(JoinThreads(10.0));
+
+  struct Thrower : SimpleThread {
+    void Run() override { throw std::bad_alloc(); }
+  };
+  const SimpleThreadPtr thrower(new Thrower);
+  ASSERT_TRUE(StartThread(thrower));
+  thrower->WaitEnded();
 }
 
 }  // namespace

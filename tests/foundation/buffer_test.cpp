@@ -46,6 +46,31 @@ TEST_F(Buffers, AFileIsTheHeaderAndThenTheElements) {
   EXPECT_EQ(FileBytes(path_), want);
 }
 
+TEST_F(Buffers, WritesThroughAReferenceAfterCountAndFlushAreKept) {
+  {
+    Buffer<unsigned> buffer(name_, ArrayDims(8), 16);
+    unsigned& first = buffer.Ref(0);
+    unsigned& third = buffer.Ref(2);
+    first = 1;
+    EXPECT_EQ(buffer.Count(), 3U);
+    third = 30;
+    EXPECT_TRUE(buffer.Flush());
+    first = 10;
+    EXPECT_EQ(buffer.At(5000), 0U);  // the window moves
+    unsigned& far = buffer.Ref(5000);
+    EXPECT_EQ(buffer.Count(), 5001U);
+    far = 7;
+    EXPECT_EQ(buffer.Count(), 5001U);
+    EXPECT_TRUE(buffer.Flush());
+    far = 8;
+    EXPECT_TRUE(buffer.Close());
+  }
+  Buffer<unsigned> again(name_, 16, BasicBuffer::kReadOnly);
+  EXPECT_EQ(again.At(0), 10U);
+  EXPECT_EQ(again.At(2), 30U);
+  EXPECT_EQ(again.At(5000), 8U);
+}
+
 TEST_F(Buffers, SizeOfTheHeader) {
   Buffer<unsigned>(name_, ArrayDims(1)).Ref(0) = 7;
   EXPECT_EQ(fs::file_size(path_), 65540U);

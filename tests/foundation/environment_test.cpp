@@ -1,9 +1,13 @@
 #include "foundation/environment.h"
 
+#include <cstdlib>
+#include <filesystem>
 #include <set>
 
 #include "commands/value_text.h"
 #include "foundation/color.h"
+#include "platform/module.h"
+#include "support/temporary_directory.h"
 
 namespace lumo {
 namespace {
@@ -17,6 +21,26 @@ TEST(Environment, KeepsTextsUnderKeys) {
   EXPECT_EQ(context.GetCount(), 1U);
   context[Context::kWorkingDirectory].text = "/tmp";
   EXPECT_TRUE(context.WorkingDirectory() == "/tmp");
+}
+
+TEST(Environment, InitFindsWhatNobodyHasSet) {
+  namespace fs = std::filesystem;
+  EnvironmentImpl& environment = GetGlobalEnvironmentImpl();
+  const auto path = [&](const ContextKey& key) { return fs::path(environment.Find(key).ToUTF8()); };
+  const test::TemporaryDirectory home;
+  fs::create_directories(home.Path() / "vexg/pedata");
+  setenv("XDG_DATA_HOME", home.Path().c_str(), 1);
+  environment[Environment::kXmlDirectory].text = "/chosen";
+  InitEnvironment();
+  EXPECT_TRUE(fs::exists(path(Environment::kBinDirectory) / platform::ModuleFileName("vexgdal")));
+  EXPECT_FALSE(fs::is_empty(path(Environment::kMdfDirectory)));
+  EXPECT_TRUE(fs::equivalent(path(Environment::kPeDirectory), home.Path() / "vexg/pedata"));
+  EXPECT_EQ(path(Environment::kXmlDirectory), "/chosen");
+  for (const ContextKey& key :
+       {Environment::kBinDirectory, Environment::kXmlDirectory, Environment::kPeDirectory,
+        Environment::kGdalDirectory, Environment::kMdfDirectory}) {
+    environment[key].text = "";
+  }
 }
 
 TEST(Color, TableHasItsFixedRows) {

@@ -25,8 +25,12 @@ class Run(unittest.TestCase):
         code, out, err = run("run", "--json", str(SOURCE / "examples/jobs/sum.xml"))
         self.assertEqual((code, err), (0, ""))
         first, second = json.loads(out)["commands"]
-        self.assertEqual((first["name"], first["return"]), ("bands", {"Count": "3", "Sum": "60"}))
-        self.assertEqual((second["result"], second["usage"]), ("Success", "0"))
+        self.assertEqual((first["name"], first["return"]), ("bands", {"Count": 3, "Sum": 60}))
+        self.assertEqual((second["result"], second["usage"]), ("Success", 0))
+        for command in (first, second):
+            for name in ("wall", "cpu"):
+                self.assertIsInstance(command[name], float)
+                self.assertLess(command[name], 60)
 
     def test_the_exit_code_tells_how_it_went(self):
         unknown = '<Job><Command Name="a" ID="X"/><Command Name="b" ID="ExampleWaitCommand"><Input Seconds="0"/></Command></Job>'
@@ -34,7 +38,7 @@ class Run(unittest.TestCase):
             ("fails", '<Job><Command Name="a" ID="ExampleSumCommand"/></Job>', 1, 'Result="Failed"',
              'vexg: command "a" (ExampleSumCommand) failed: input Values is missing\n'),
             ("bad value", '<Job><Command ID="ExampleSumCommand"><Input Values="1:9 [1] "/></Command></Job>',
-             1, 'Result="Failed"', "Values is not a number array"),
+             1, 'Result="Failed"', "is no number array"),
             ("unknown", unknown, 1, 'Name="b"', 'vexg: command "a" was left out: the ID "X" is unknown'),
             ("empty job", "<Job/>", 2, "<JobResult/>", "vexg: the job holds no Command\n"),
             ("cut", '<Job><Command Name="a"', 2, "", "standard input: not well formed: line 1, column"),

@@ -30,6 +30,17 @@ class Pyramids(PipeTest, FolderTest):
         self.fine("read", self.file, "--level", level, "-o", self.folder / "out.npy", "--overwrite", *options)
         return read_npy(self.folder / "out.npy")
 
+    def test_a_raster_that_is_open_without_its_pyramid_says_so(self):
+        self.fine("pyramid", "build", self.file)
+        pyramid = f'PyramidConnStr="Pyramid|{self.pyramid}"'
+        for first, second, notes in (("", pyramid, 1), (pyramid, pyramid, 0), (pyramid, "", 0)):
+            job = self.folder / "job.xml"
+            job.write_text(
+                f'<Job><Command Name="a" ID="OpenRasterCommand"><Input ConnStr="{self.file}" {first}/></Command>'
+                f'<Command Name="b" ID="OpenRasterCommand"><DependsOn Name="a"/><Input ConnStr="{self.file}" {second}/>'
+                "</Command></Job>")
+            self.assertEqual(self.fine("run", "-q", job).count("Note="), notes, (first, second))
+
     def files(self):
         return sorted(path.name for path in self.folder.iterdir())
 

@@ -43,7 +43,7 @@ class Stats(RasterTest):
                 for band, row in zip(bands, rows):
                     self.assertEqual(band["count"], int(row["valid pixels"]))
                     if band["count"] == 0:
-                        self.assertEqual([band[name] for name in ("min", "max", "mean", "std", "rms")], [0] * 5)
+                        self.assertEqual({band[name] for name in band if name not in ("band", "count")}, {None})
                         continue
                     self.assertEqual((band["min"], band["max"]), (float(row["min"]), float(row["max"])))
                     for name, fact in (("mean", "mean"), ("std", "deviation")):
@@ -75,6 +75,24 @@ class Stats(RasterTest):
         every = self.stats(DATA / "landsat7_olinda.tif")
         some = self.stats(DATA / "landsat7_olinda.tif", "--bands", "4,0")
         self.assertEqual(some, [every[4], every[0]])
+
+    def test_between_chosen_bands_are_those_of_all(self):
+        every = self.stats(DATA / "landsat7_olinda.tif", "--extended")
+        order = [3, 2, 1, 5]
+        some = self.stats(DATA / "landsat7_olinda.tif", "--bands", ",".join(map(str, order)), "--extended")
+        for band, got in zip(order, some):
+            for name in ("sumXY", "cov"):
+                self.assertEqual(got[name], [every[band][name][other] for other in order])
+            self.assertAlmostEqual(got["cov"][order.index(band)] / got["std"] ** 2, 1, delta=1e-12)
+
+    def test_no_valid_pixel_has_none(self):
+        table = self.fine("stats", DATA / "all-nodata.tif", "--extended").splitlines()
+        self.assertEqual(table[2].split(), ["0", "0"] + ["-"] * 7)
+        self.assertEqual(table[-1].split(), ["3"] + ["-"] * 4)
+        band = self.stats(DATA / "all-nodata.tif", "--extended")[0]
+        self.assertEqual((band["count"], band["min"], band["cov"]), (0, None, [None] * 4))
+        zeros = write_orva(self.folder / "zeros.dat", 3, 2, 1)
+        self.assertEqual(self.stats(zeros)[0]["max"], 0)
 
     def test_save_stores_them_where_the_format_keeps_them(self):
         for name in ("landsat7_u16_tiled.tif", "float_nan.tif", "landsat7.img", "flat.dat"):
@@ -115,7 +133,8 @@ class Hist(RasterTest):
 
     def test_counts_every_valid_value_once(self):
         cases = [("rgb1.tif", []), ("landsat7_u16_tiled.tif", ["--bands", "2,5", "--bins", "40"]),
-                 ("dem_int16.tif", ["--bin-size", "7"]), ("float_raster_with_nodata.tif", ["--bins", "7"]),
+                 ("dem_int16.tif", ["--bin-size", "7"]), ("rgb1.tif", ["--bin-size", "2.5"]),
+                 ("rgb1.tif", ["--bins", "100", "--lower", "-5", "--upper", "300"]), ("float_raster_with_nodata.tif", ["--bins", "7"]),
                  ("landsat7_f32_strip.tif", ["--bands", "1"]), ("float_nan.tif", ["--bins", "1"]),
                  ("landsat7_f32_strip.tif", ["--lower", "0.25", "--upper", "0.5", "--bins", "10"]),
                  ("dem_int16.tif", ["--lower", "10", "--upper", "19"]), ("all-nodata.tif", [])]
@@ -126,9 +145,10 @@ class Hist(RasterTest):
                     counts = [0] * len(band["counts"])
                     for value in self.values(DATA / file, band["band"]):
                         if low <= value <= high:
-                            # The difference is taken in the pixels' own precision.
-                            above = array.array("f", [value - low])[0] if isinstance(low, float) else value - low
-                            counts[int(above / size)] += 1
+                            at = min(int((value - low) / size), len(counts) - 1)
+                            at -= value < low + at * size
+                            at += at + 1 < len(counts) and value >= low + (at + 1) * size
+                            counts[at] += 1
                     self.assertEqual(band["counts"], counts)
                     self.assertLessEqual(low + size * (len(counts) - 1), high)
 
@@ -155,8 +175,8 @@ class Hist(RasterTest):
     def test_complaints(self):
         for options, words in ((["--bins", "9", "--bin-size", "1"], "exclude"), (["--bin-size", "0"], "above 0"),
                                (["--lower", "9", "--upper", "3"], "is above the upper"),
-                               (["--lower", "1.5"], "can't be 1.5"), (["--upper", "300"], "can't be 300"),
-                               (["--bin-size", "2.5"], "whole size")):
+                               (["--lower", "1.5"], "can't be 1.5"), (["--upper", "nan"], "can't be nan"),
+                               (["--lower", "300", "--upper", "400"], "no value that the pixels can have")):
             with self.subTest(words):
                 code, out, err = run("hist", str(DATA / "rgb1.tif"), *options)
                 self.assertEqual((code, out), (2, ""))
@@ -273,6 +293,37 @@ class Calibrate(RasterTest):
         by_job = out.read_bytes()
         self.fine(*arguments, "--overwrite")
         self.assertEqual(out.read_bytes(), by_job)
+
+
+
+class Waiting(FolderTest):
+    """Commands that compute over one raster at the same time."""
+
+    def job(self, wait):
+        raster = write_orva(self.folder / "raster", 2000, 2000, 2)
+        commands = "".join(
+            f'<Command Name="h{i}" ID="CalculateRasterHistogramCommand"><DependsOn Name="o"/>'
+            f'<Input URI="$r" LowerBound="0" UpperBound="255" BinCount="{i + 1}" {wait}/></Command>'
+            for i in range(4))
+        for name in ("GetBasicRasterStatsCommand", "GetExtendedRasterStatsCommand"):
+            commands += (f'<Command Name="{name}" ID="{name}"><DependsOn Name="o"/>'
+                         f'<Input URI="$r" {wait}/></Command>')
+        path = self.folder / "job.xml"
+        path.write_text(f'<Job><Command Name="o" ID="OpenRasterCommand"><Input ConnStr="{raster}"/>'
+                        f'<Output URI="$r"/></Command>{commands}</Job>')
+        return path
+
+    def test_they_wait_their_turn(self):
+        out = self.fine("run", "-q", "--json", self.job('Wait="Always"'))
+        returned = {command["name"]: command["return"] for command in json.loads(out)["commands"]}
+        self.assertIn("Cov", returned["GetExtendedRasterStatsCommand"])
+        self.assertEqual(returned["GetBasicRasterStatsCommand"]["Count"], [4000000, 4000000])
+        self.fails_in_part("run", "-q", self.job('Wait="Alwayz"'), words="did you mean Always?")
+
+    def fails_in_part(self, *arguments, words):
+        code, _, err = run(*map(str, arguments))
+        self.assertEqual(code, 1)
+        self.assertIn(words, err)
 
 
 if __name__ == "__main__":

@@ -139,6 +139,34 @@ TEST(XmlMetadataParser, GivesEveryValueAPath) {
   }
 }
 
+TEST(XmlMetadataParser, TakesPiecesOrWholeTexts) {
+  const struct {
+    const char* document;
+    const char* pieces;
+    const char* joined;
+  } cases[] = {
+      {"<a>x &amp; y</a>", "/a1/__text__/ x\n/a2/__text__/ & y\n", "/a/__text__/ x & y\n"},
+      {"<a>1<![CDATA[ 2]]><!-- no tag --> 3\n</a>",
+       "/a1/__text__/ 1\n/a2/__text__/ 2\n/a3/__text__/ 3\n", "/a/__text__/ 1 2 3\n"},
+      {"<a> <b>k&lt;l</b>\n<b>m</b> </a>",
+       "/a/b1/__text__/ k\n/a/b2/__text__/ <l\n/a/b3/__text__/ m\n",
+       "/a/b1/__text__/ k<l\n/a/b2/__text__/ m\n"},
+      {"<a>one<b/>two</a>", "/a1/__text__/ one\n/a2/__text__/ two\n",
+       "/a1/__text__/ one\n/a2/__text__/ two\n"},
+  };
+  for (const auto& c : cases) {
+    SCOPED_TRACE(c.document);
+    for (const bool joins : {false, true}) {
+      MdfFormat format;
+      format.xmlInputType = "XmlString";
+      format.joinsTexts = joins;
+      MetadataContainer collection;
+      ASSERT_TRUE(XmlMetadataParser(collection, format, c.document).Parse());
+      EXPECT_EQ(Texts(collection), joins ? c.joined : c.pieces);
+    }
+  }
+}
+
 TEST(XmlMetadataParser, NumbersUpToNinetyNine) {
   std::string document = "<a>";
   for (int i = 1; i <= 120; ++i) document += "<b>" + std::to_string(i) + "</b>";

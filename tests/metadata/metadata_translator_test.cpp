@@ -188,6 +188,25 @@ TEST(MetadataTranslator, FailsWhereAValueHasNoPlace) {
   EXPECT_FALSE(MetadataDefFileTranslator().TranslateAll({}, &target, &target, nullptr));
 }
 
+TEST(MetadataTranslator, LogsIntegersThatTheirZeroCutsShort) {
+  for (const auto& [text, want] : {std::pair("090", "int(1) 0"),
+                                   {"-0128", "int(1) -10"},
+                                   {"010", "int(1) 8"},
+                                   {"0x9", "int(1) 9"},
+                                   {"0", "int(1) 0"},
+                                   {"90", "int(1) 90"}}) {
+    SCOPED_TRACE(text);
+    test::gParseLog.Take();
+    MetadataContainer target;
+    ASSERT_TRUE(TranslateInto(target, Entry("/a/", "/v/", "INT", "cnt=1\n"), {{"/a/", text}}));
+    EXPECT_THAT(test::Values(target), testing::HasSubstr(want));
+    const bool isCut = std::string(text).find_first_of("89") != std::string::npos &&
+                       text[0] != '9' && text[1] != 'x';
+    EXPECT_EQ(test::gParseLog.Take().find(std::string("Warning: (") + text) != std::string::npos,
+              isCut);
+  }
+}
+
 TEST(MetadataTranslator, LogsWhatItMade) {
   test::gParseLog.Take();
   MetadataContainer target;

@@ -147,6 +147,78 @@ TEST_F(MessagePipe, RefusesMessagesThatAreTooLongOrEmpty) {
   server.join();
 }
 
+TEST_F(MessagePipe, ClosesThoseWhoStaySilent) {
+  ListenerLimits limits;
+  limits.idleSeconds = 0.3;
+  const auto listener = PipeListener::Open("a", fault, limits);
+  ASSERT_NE(listener, nullptr);
+  std::thread server([&] {
+    std::string message;
+    while (listener->Wait(message)) {
+      std::this_thread::sleep_for(std::chrono::milliseconds(500));  // nobody listens meanwhile
+      listener->Reply(message);
+    }
+  });
+  RawClient silent("a"), halfway("a"), slow("a");
+  halfway.Send(std::string("\x05\x00\x00\x00m", 5));
+  const auto ask = [](PipeConnection& client) {
+    std::string reply;
+    return client.Write("x") && client.Read(reply);
+  };
+  EXPECT_TRUE(ask(*PipeConnection::Connect("a", 0.0)));
+  RawClient steady("a");
+  const std::string frame("\x05\x00\x00\x00steady", 10);
+  for (const char byte : frame.substr(0, 8)) {
+    steady.Send(std::string(1, byte));
+    std::this_thread::sleep_for(std::chrono::milliseconds(100));
+  }
+  steady.Send("d");
+  EXPECT_FALSE(steady.IsClosed());  // an answer is what has come
+  EXPECT_TRUE(silent.IsClosed());
+  EXPECT_TRUE(halfway.IsClosed());
+  listener->Stop();
+  server.join();
+}
+
+TEST_F(MessagePipe, BoundsClientsAndWhatTheySendTogether) {
+  ListenerLimits limits;
+  limits.clients = 3;
+  limits.incomingBytes = 1 << 20;
+  const auto listener = PipeListener::Open("a", fault, limits);
+  const auto second = PipeListener::Open("b", fault, limits);
+  ASSERT_TRUE(listener && second);
+  std::vector<std::thread> servers;
+  for (PipeListener* const one : {listener.get(), second.get()}) {
+    servers.emplace_back([one] {
+      std::string message;
+      while (one->Wait(message)) one->Reply("r");
+    });
+  }
+  const auto ask = [](const char* name, const std::string& message) {
+    const auto client = PipeConnection::Connect(name, 5.0);
+    std::string reply;
+    return client != nullptr && client->Write(message) && client->Read(reply);
+  };
+  {
+    // Most of a large message waits at one listener: another one doesn't fit at the other.
+    RawClient large("a");
+    large.Send(std::string("\x00\x00\x0f\x00", 4) + std::string(900 << 10, 'x'));
+    std::this_thread::sleep_for(std::chrono::milliseconds(100));
+    EXPECT_FALSE(ask("b", std::string(300 << 10, 'y')));
+    EXPECT_TRUE(ask("b", "a word"));
+  }
+  std::this_thread::sleep_for(std::chrono::milliseconds(100));
+  EXPECT_TRUE(ask("b", std::string(300 << 10, 'y')));
+
+  std::vector<std::unique_ptr<RawClient>> silent;
+  for (int i = 0; i < 3; ++i) silent.push_back(std::make_unique<RawClient>("a"));
+  EXPECT_TRUE(ask("a", "x"));  // in place of the one that has been silent for longest
+  EXPECT_TRUE(silent[0]->IsClosed());
+  listener->Stop();
+  second->Stop();
+  for (std::thread& server : servers) server.join();
+}
+
 TEST_F(MessagePipe, ChecksNamesAndTheDirectory) {
   for (const char* name : {"", "a/b", "..", "a..b", ".hidden", "../x"}) {
     EXPECT_EQ(Open(name), nullptr) << name;

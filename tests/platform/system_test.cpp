@@ -1,7 +1,16 @@
+#include <algorithm>
+#include <atomic>
+#include <fcntl.h>
+#include <signal.h>
+#include <sys/mman.h>
+#include <sys/stat.h>
+#include <sys/wait.h>
+#include <thread>
 #include <unistd.h>
 
 #include "platform/clock.h"
 #include "platform/module.h"
+#include "platform/process_watch.h"
 #include "platform/shared_memory.h"
 
 namespace lumo::platform {
@@ -28,6 +37,70 @@ TEST(SharedMemoryBlock, IsFoundByNameAndOnlyAsLargeAsItIs) {
     EXPECT_EQ(SharedMemoryBlock::Create(bad, 10), nullptr) << bad;
     EXPECT_EQ(SharedMemoryBlock::Open(bad, 10), nullptr) << bad;
   }
+}
+
+TEST(SharedMemoryBlock, SurvivesWhoeverCutsIt) {
+  const std::string name = "vexg-cut-" + std::to_string(getpid());
+  const std::size_t size = 64 << 10;
+  const int file = shm_open(name.c_str(), O_RDWR | O_CREAT | O_EXCL, S_IRUSR | S_IWUSR);
+  ASSERT_GE(file, 0);
+  ASSERT_EQ(ftruncate(file, size), 0);
+  struct stat status {};
+  auto block = SharedMemoryBlock::Open(name, size);
+  ASSERT_NE(block, nullptr);
+  fstat(file, &status);
+  EXPECT_GE(static_cast<std::size_t>(status.st_blocks) * 512, size);  // it only promised before
+  const auto other = SharedMemoryBlock::Create(name + "-other", size);
+  ASSERT_NE(other, nullptr);
+  std::fill_n(block->GetData(), size, 5);
+  EXPECT_FALSE(block->WasCut());
+
+  ASSERT_EQ(ftruncate(file, 0), 0);
+  std::vector<std::thread> threads;
+  for (int i = 0; i < 4; ++i) {
+    threads.emplace_back([&, i] {
+      for (std::size_t at = i; at < size; at += 4) block->GetData()[at] += 1;
+    });
+  }
+  for (std::thread& thread : threads) thread.join();
+  EXPECT_TRUE(block->WasCut());
+  EXPECT_FALSE(other->WasCut());
+  EXPECT_EQ(SharedMemoryBlock::Open(name, 1), nullptr);
+  ASSERT_EQ(ftruncate(file, size), 0);
+  EXPECT_FALSE(SharedMemoryBlock::Open(name, size)->WasCut());
+  if (geteuid() == 0) {
+    ASSERT_EQ(fchown(file, 12345, 12345), 0);
+    EXPECT_EQ(SharedMemoryBlock::Open(name, size), nullptr);  // somebody else's
+  }
+  close(file);
+  shm_unlink(name.c_str());
+  // A bus error elsewhere ends the process as it always does.
+  EXPECT_EXIT(raise(SIGBUS), testing::KilledBySignal(SIGBUS), "");
+}
+
+TEST(ProcessWatch, TellsTheEndOfAnotherProcess) {
+  const pid_t child = fork();
+  if (child == 0) {
+    pause();
+    _exit(0);
+  }
+  std::atomic<int> told{0};
+  const auto until = [&](int count) {
+    for (int i = 0; i < 2000 && told < count; ++i) usleep(5'000);
+    return told == count;
+  };
+  ProcessWatch own(getpid(), [&] { told += 100; });
+  const ProcessWatch watch(child, [&] { ++told; });
+  {
+    const ProcessWatch dropped(child, [&] { told += 100; });
+  }
+  usleep(20'000);
+  EXPECT_EQ(told, 0);
+  kill(child, SIGKILL);
+  EXPECT_TRUE(until(1));
+  waitpid(child, nullptr, 0);
+  const ProcessWatch late(child, [&] { ++told; });  // of one that has ended already
+  EXPECT_TRUE(until(2));
 }
 
 TEST(Module, SaysWhyItCannotBeLoaded) {

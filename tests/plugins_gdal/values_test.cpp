@@ -353,6 +353,56 @@ TEST(GdalValues, ChangedPixelsEndTheStoredStatistics) {
   EXPECT_FALSE(ReaderOf<std::uint16_t>(source)->StatsExist(1));
 }
 
+TEST(GdalValues, ARasterGivesNoneOfThePixelsBeforeAWrite) {
+  const Copy copy("a.tif", "GTiff", GDT_Byte);
+  const auto open = [&] {
+    return RasterPtr<std::uint8_t>(MakeReaderRaster(DataConnectionPtr(OpenSource({copy.Path()}))));
+  };
+  const auto store = [&](Raster<std::uint8_t>& raster) {
+    raster.SetStatsMode(StatsMode::kExtended);
+    raster.Cov(0, 0, IPC());
+    raster.HistogramAllBands(0, 255, 256, HistogramSign::kBoth, IPC())->WaitFinished();
+    return raster.WriteStats() && raster.WriteHistogram();
+  };
+  const auto write = [&](Raster<std::uint8_t>& raster, std::uint8_t value) {
+    Array<std::uint8_t> pixels{ArrayDims(40, 50, 1)};
+    Array<unsigned char> states{ArrayDims(40, 50, 1)};
+    std::fill(pixels.begin(), pixels.end(), value);
+    std::fill(states.begin(), states.end(), static_cast<unsigned char>(0));
+    Array<unsigned> bands{ArrayDims(1)};
+    bands[0] = 0;
+    return raster.PutSubRect({0, 0, 49, 39}, bands, Interleave::BIP, pixels, states);
+  };
+  const auto storedMean = [&] {
+    const Peer peer(copy.Path());
+    const char* const mean = GDALGetMetadataItem(peer.Band(0), "STATISTICS_MEAN", nullptr);
+    return std::string(mean != nullptr ? mean : "");
+  };
+  ASSERT_TRUE(store(*open()));
+  ASSERT_NE(storedMean(), "");
+  {
+    const auto raster = open();
+    EXPECT_EQ(raster->Mean(0, IPC()), 24);  // of x % 10 + y
+    ASSERT_TRUE(write(*raster, 77)) << TakeFault().ToUTF8();
+    EXPECT_FALSE(raster->StatsExist(0, StatsMask::Min));
+    EXPECT_EQ(raster->BandStats(0).mask, StatsMask::None);
+    EXPECT_EQ(raster->BandHistogram(0).GetCount(), 0U);
+    EXPECT_EQ(raster->Mean(0, IPC()), 77);
+  }
+  EXPECT_EQ(storedMean(), "");
+  EXPECT_EQ(open()->BandHistogram(0).GetCount(), 0U);  // nor beside the file
+  {
+    const auto raster = open();
+    ASSERT_TRUE(store(*raster));
+    ASSERT_TRUE(write(*raster, 5));
+    EXPECT_TRUE(raster->WriteStats());  // of nothing
+    EXPECT_EQ(raster->Max(0, IPC()), 5);
+    EXPECT_TRUE(raster->WriteStats());
+    EXPECT_EQ(raster->BandStats(0).mean, 5);
+  }
+  EXPECT_EQ(storedMean(), "5");
+}
+
 TEST(GdalValues, AFileThatHasBecomeAnotherOneIsNotWritten) {
   const Copy copy("landsat7_u16_tiled.tif");
   auto source = OpenSource({copy.Path()});

@@ -249,23 +249,35 @@ TEST(OrvaHeader, PointsGiveTheGridWhereTheModelIsMissing) {
   const struct {
     const char* name;
     std::string more;
-    double size, rotation, x, y;  // x, y: of pixel (7, 5)
+    double sizeX, sizeY, rotation, x, y;  // x, y: of pixel (7, 5)
   } cases[] = {
       {"two points",
        "map points = {1, 1, 200, 100, 8, 6, 150, 170}\ncoordinate system string = {EPSG:31985}\n",
-       10, 0, 170, 150},
+       10, 10, 0, 170, 150},
       {"four corners, turned by 90 degrees",
        "map points = " +
            pointsOf([](double, double l) { return 100 + 2 * l; },
                     [](double s, double) { return 200 + 2 * s; }) +
            "\n",
-       2, 90, 110, 214},
+       2, 2, 90, 110, 214},
+      {"pixels that aren't square, turned",
+       "map points = " +
+           pointsOf([](double, double l) { return 100 + 3 * l; },
+                    [](double s, double) { return 200 + 2 * s; }) +
+           "\n",
+       2, 3, 90, 115, 214},
+      {"lines that go north",
+       "map points = " +
+           pointsOf([](double s, double) { return 100 + 10 * s; },
+                    [](double, double l) { return 200 + 10 * l; }) +
+           "\n",
+       10, -10, 0, 170, 250},
       {"latitude and longitude",
        "geo points = " +
            pointsOf([](double s, double) { return -35 + 0.5 * s; },
                     [](double, double l) { return -8 - 0.5 * l; }) +
            "\n",
-       0.5, 0, -31.5, -10.5},
+       0.5, 0.5, 0, -31.5, -10.5},
   };
   for (const auto& c : cases) {
     SCOPED_TRACE(c.name);
@@ -276,8 +288,8 @@ TEST(OrvaHeader, PointsGiveTheGridWhereTheModelIsMissing) {
     ASSERT_TRUE(source) << TakeFault().ToUTF8();
     const GeoRefPtr model = source->RasterDef().geoRef;
     ASSERT_TRUE(model);
-    EXPECT_NEAR(model->PixelSizeX(), c.size, 1e-9);
-    EXPECT_NEAR(model->PixelSizeY(), c.size, 1e-9);
+    EXPECT_NEAR(model->PixelSizeX(), c.sizeX, 1e-9);
+    EXPECT_NEAR(model->PixelSizeY(), c.sizeY, 1e-9);
     EXPECT_NEAR(model->Rotation(), c.rotation, 1e-6);
     double x = 0, y = 0;
     ASSERT_TRUE(model->PixelToMap(7, 5, x, y));

@@ -1,8 +1,15 @@
+#include "views/memory_raster.h"
+
+#include <cmath>
 #include <cstdio>
 #include <cwchar>
 
+#include "commands/catalog.h"
+#include "raster/pixel_value.h"
 #include "support/raster_sources.h"
+#include "support/run_command.h"
 #include "support/test_rasters.h"
+#include "views/spectral_subset_raster.h"
 
 namespace lumo::test {
 namespace {
@@ -113,6 +120,29 @@ TEST(MemoryRaster, APaletteLastsWithTheConnection) {
   EXPECT_FALSE(reader->HasPalette(0));
 }
 
+TEST(MemoryRaster, AWriteEndsStatisticsOfTheRasterAndItsViews) {
+  const RasterPtr<std::uint8_t> raster(
+      new AutoMemoryRaster<std::uint8_t>("block", 8, 4, 2, Interleave::BSQ, {}));
+  ASSERT_TRUE(raster->IsValid()) << TakeFault().ToUTF8();
+  const RasterPtr<std::uint8_t> view(
+      new SpectralSubsetRaster<std::uint8_t>(raster, MakeArray<unsigned>({1, 0})));
+  for (const std::uint8_t value : {5, 77}) {
+    Array<std::uint8_t> pixels{BlockDims(Interleave::BIP, 8, 4, 2)};
+    Array<unsigned char> states{pixels.GetDims()};
+    std::fill(pixels.begin(), pixels.end(), value);
+    std::fill(states.begin(), states.end(), static_cast<unsigned char>(0));
+    ASSERT_TRUE(raster->PutSubRect({0, 0, 7, 3}, MakeArray<unsigned>({0, 1}), Interleave::BIP,
+                                   pixels, states));
+    EXPECT_FALSE(raster->StatsExist(0, StatsMask::Mean));
+    EXPECT_EQ(view->BandHistogram(1).GetCount(), 0U);
+    EXPECT_EQ(raster->Mean(0, IPC()), value);
+    EXPECT_EQ(view->Max(1, IPC()), value);
+    view->HistogramAllBands(0, 255, 256, HistogramSign::kBoth, IPC())->WaitFinished();
+    ASSERT_EQ(raster->BandHistogram(0).GetCount(), 1U);
+    EXPECT_EQ(raster->BandHistogram(0)[0].counts[value], 32U);
+  }
+}
+
 TEST(MemoryRaster, TextsOfAnotherFormAreRefused) {
   alignas(8) unsigned char memory[64] = {};
   const std::string good = Describe(memory, "n", 2, 2, 2, 0, 2, 1, 1, 0, 0, "x");
@@ -174,6 +204,72 @@ TEST(MemoryRaster, IsNotTakenForAnotherFormatNorMade) {
   def.format = "MemoryRaster";
   EXPECT_FALSE(CreateSource({text}, def));
   EXPECT_EQ(TakeFault().ToUTF8(), "MemoryRaster: a block of memory is opened, not made");
+}
+
+/// The raster that a command made, as one of Byte.
+RasterPtr<std::uint8_t> MadeBytes(const CommandOutcome& made) {
+  return RasterPtr<std::uint8_t>(catalog::Find(ParseValue<URI>(String(made.outputs.at("URI")))));
+}
+
+TEST(MemoryRaster, TheCommandGivesNoDataValuesAndZeroes) {
+  constexpr unsigned kSide = 64, kMemoryBands = 3;
+  {
+    std::vector<unsigned char> dirty(std::size_t{kSide} * kSide * kMemoryBands, 0xAB);
+    EXPECT_EQ(dirty[1], 0xAB);  // memory that the raster may get next
+  }
+  const std::map<std::string, std::string> size{
+      {"Samples", "64"}, {"Lines", "64"}, {"Bands", "3"}, {"DataType", "Byte"}};
+  auto inputs = size;
+  inputs["HasNoDataValue"] = "1:3 [1 0 1] ";
+  inputs["NoDataValue"] = "1:1 [7] ";
+  const CommandOutcome made = RunCommand("CreateMemoryRasterCommand", inputs);
+  ASSERT_TRUE(made.Succeeded()) << made.reason;
+  // A template's values go on; one that a Byte can't hold equals no pixel.
+  const CommandOutcome like =
+      RunCommand("CreateMemoryRasterCommand",
+                 {{"SrcURI", made.outputs.at("URI")}, {"NoDataValue", "1:2 [7 -9999] "}});
+  ASSERT_TRUE(like.Succeeded()) << like.reason;
+  const struct {
+    const CommandOutcome& outcome;
+    std::vector<int> noData;  // by band; -1 for none
+  } cases[] = {{made, {7, -1, 0}}, {like, {7, -1, 0}}};
+  for (const auto& c : cases) {
+    const RasterPtr<std::uint8_t> raster = MadeBytes(c.outcome);
+    ASSERT_TRUE(raster);
+    Array<unsigned> bands{ArrayDims(kMemoryBands)};
+    for (unsigned band = 0; band < kMemoryBands; ++band) bands[band] = band;
+    Array<std::uint8_t> pixels;
+    Array<unsigned char> state;
+    const SubRect all(0, 0, kSide - 1, kSide - 1);
+    ASSERT_TRUE(raster->GetSubRect(all, bands, Interleave::BSQ, pixels, state));
+    for (const std::uint8_t pixel : pixels) ASSERT_EQ(pixel, 0);
+    pixels[0] = 7;                    // band 0
+    pixels[kSide * kSide + 1] = 241;  // band 1: -9999 in eight bits
+    ASSERT_TRUE(raster->PutSubRect(all, bands, Interleave::BSQ, pixels, state));
+    ASSERT_TRUE(raster->GetSubRect(all, bands, Interleave::BSQ, pixels, state));
+    for (unsigned i = 0; i < pixels.GetCount(); ++i) {
+      const int noData = c.noData[i / (kSide * kSide)];
+      ASSERT_EQ(state[i], pixels[i] == noData ? PixelValueState::NoData : PixelValueState::Valid);
+    }
+    for (unsigned band = 0; band < kMemoryBands; ++band) {
+      EXPECT_EQ(raster->HasNoDataValue(band), c.noData[band] >= 0) << band;
+    }
+  }
+  for (const CommandOutcome* outcome : {&like, &made}) {
+    RunCommand("CloseRasterCommand", {{"URI", outcome->outputs.at("URI")}});
+  }
+}
+
+TEST(MemoryRaster, NumbersBecomePixelsOnlyWhereTheyFit) {
+  EXPECT_EQ(ToPixel<std::uint8_t>(-9999.0), std::nullopt);
+  EXPECT_EQ(ToPixel<std::uint8_t>(255.5), std::nullopt);
+  EXPECT_EQ(ToPixel<std::int16_t>(-32768.0), std::int16_t{-32768});
+  EXPECT_EQ(ToPixel<std::int64_t>(std::string("-9223372036854775807")), -9223372036854775807);
+  EXPECT_EQ(ToPixel<std::int64_t>(9223372036854775808.0), std::nullopt);
+  EXPECT_EQ(ToPixel<std::uint64_t>(std::string("18446744073709551615")), 18446744073709551615U);
+  EXPECT_EQ(ToPixel<float>(1e300), std::nullopt);
+  EXPECT_TRUE(std::isnan(*ToPixel<float>(std::string("nan"))));
+  EXPECT_EQ(ToPixel<std::int32_t>(std::string("seven")), std::nullopt);
 }
 
 }  // namespace

@@ -212,6 +212,70 @@ TEST(PyramidBuild, LeavesStatisticsAndAHistogramOfASmallLevel) {
   }
 }
 
+TEST(PyramidBuild, CountsExactBinsWhenAskedTo) {
+  PyramidScene scene;
+  scene.Fake().samples = 300;
+  scene.Fake().lines = 100;
+  const auto ask = [&]<typename T>(T) {
+    const RasterPtr<T> raster = scene.Open<T>();
+    PyramidDef def;
+    def.levelMax = 1;
+    def.resamplingMethod = PyramidResamplingMethod::kNearest;
+    def.bins = Form::kExact;
+    const AsyncPtr build = raster->PyramidBuild(def, TileDimensions{64, 64}, {});
+    build->WaitFinished();
+    const auto histograms = raster->BandHistogram(1);
+    EXPECT_EQ(histograms.GetCount(), 1U);
+    std::vector<unsigned long long> want(256);
+    const double span = RampValue<double>(299, 99, 1) - RampValue<double>(0, 0, 1);
+    for (unsigned y = 0; y < 100; ++y)
+      for (unsigned x = 0; x < 300; ++x) {
+        const double above = RampValue<double>(x, y, 1) - RampValue<double>(0, 0, 1);
+        const double parts = std::is_integral_v<T> ? span + 1 : span;
+        ++want[std::min<std::size_t>(255, static_cast<std::size_t>(above * 256 / parts))];
+      }
+    EXPECT_EQ(std::vector(histograms[0].counts.begin(), histograms[0].counts.end()), want);
+    std::filesystem::remove(scene.Path());
+  };
+  ask(std::int32_t());
+  ask(float());
+}
+
+TEST(PyramidBuild, AWriteEndsWhatThePyramidTellsOfThePixels) {
+  PyramidScene scene;
+  scene.Fake().samples = 300;
+  scene.Fake().lines = 100;
+  RasterPtr<std::int32_t> raster = scene.Open<std::int32_t>();
+  ASSERT_TRUE(PyramidScene::Build(*raster, 1, 2, 64));
+  ASSERT_TRUE(raster->StatsExist(0, StatsMask::Basic));
+  const auto write = [&] {
+    Array<std::int32_t> pixels{ArrayDims(1, 1, 1)};
+    Array<unsigned char> state{ArrayDims(1, 1, 1)};
+    pixels[0] = RampValue<std::int32_t>(7, 5, 0);  // the fake takes no other value there
+    state[0] = 0;
+    Array<unsigned> bands{ArrayDims(1)};
+    bands[0] = 0;
+    return raster->PutSubRect({7, 5, 7, 5}, bands, Interleave::BIP, pixels, state);
+  };
+  const auto expectNone = [&] {
+    EXPECT_FALSE(raster->StatsExist(0, StatsMask::Mean));
+    EXPECT_EQ(raster->BandStats(0).mask & StatsMask::Mean, 0U);
+    EXPECT_EQ(raster->BandHistogram(0).GetCount(), 0U);
+  };
+  ASSERT_TRUE(write());
+  expectNone();
+  raster = RasterPtr<std::int32_t>();
+  raster = scene.Open<std::int32_t>();
+  expectNone();                                         // out of the file too
+  ASSERT_TRUE(PyramidScene::Build(*raster, 1, 2, 64));  // after a write they come anew
+  EXPECT_TRUE(raster->StatsExist(0, StatsMask::Basic));
+  ASSERT_TRUE(write());
+  expectNone();
+  EXPECT_NE(raster->Mean(0, IPC()), 0);
+  EXPECT_TRUE(raster->WriteStats());
+  EXPECT_TRUE(raster->StatsExist(0, StatsMask::Basic));
+}
+
 /// Aborts a build when it has come half way.
 class AbortHalfWay final : public AsyncCallback {
  public:

@@ -1,6 +1,7 @@
 #include <cmath>
 #include <random>
 
+#include "stats/exact_stats_accumulator.h"
 #include "stats/raster_histogram_process.h"
 #include "support/test_rasters.h"
 #include "tasks/thread_limit.h"
@@ -130,6 +131,99 @@ void ExpectBins(T lower, T upper, double size, unsigned count, double wantSize, 
   EXPECT_EQ(bins->BinSize(0), wantSize);
   EXPECT_EQ(bins->BinCount(0), wantCount);
   EXPECT_EQ(bins->Max(0), wantUpper);
+}
+
+/// The bin of the exact form by its definition, with the edges that bounds and size say.
+template <typename T>
+std::size_t ExactBin(T value, const RasterHistogram<T>& bins) {
+  const std::size_t last = bins.BinCount(0) - 1;
+  if constexpr (std::is_integral_v<T>) {
+    // In whole numbers where the size is one, or a share of all values.
+    const auto above = static_cast<Int128>(value) - static_cast<Int128>(bins.Min(0));
+    const auto all = static_cast<Int128>(bins.Max(0)) - static_cast<Int128>(bins.Min(0)) + 1;
+    if (bins.BinSize(0) == static_cast<double>(all) / bins.BinCount(0)) {
+      return static_cast<std::size_t>(above * bins.BinCount(0) / all);
+    }
+    return std::min(last,
+                    static_cast<std::size_t>(static_cast<long double>(above) / bins.BinSize(0)));
+  } else {
+    std::size_t bin = 0;
+    const auto edge = [&](std::size_t i) {
+      return static_cast<double>(bins.Min(0)) + static_cast<double>(i) * bins.BinSize(0);
+    };
+    while (bin < last && static_cast<double>(value) >= edge(bin + 1)) ++bin;
+    return bin;
+  }
+}
+
+TYPED_TEST(HistogramOfType, ExactBinsHoldEveryValueWithinTheBounds) {
+  using T = TypeParam;
+  const T low = std::is_unsigned_v<T> ? T(3) : T(-45);
+  const T high = sizeof(T) == 1 ? T(120) : T(900);
+  const auto scene = MakeScene<T>(1, Interleave::BIP);
+  for (const auto& [size, count] : {std::pair(0.0, 1U),
+                                    {0.0, 7U},
+                                    {0.0, 100U},
+                                    {0.0, 256U},
+                                    {0.0, 3000U},
+                                    {1.0, 0U},
+                                    {2.5, 0U},
+                                    {0.3, 0U},
+                                    {1e9, 0U}}) {
+    SCOPED_TRACE(testing::Message() << size << ' ' << count);
+    const RasterHistogramPtr<T> working(
+        size > 0 ? new RasterHistogram<T>(1, Each(1, size), Each(1, low), Each(1, high),
+                                          HistogramSign::kBoth, Form::kExact)
+                 : new RasterHistogram<T>(1, Each(1, count), Each(1, low), Each(1, high),
+                                          HistogramSign::kBoth, Form::kExact));
+    ASSERT_TRUE(Count(scene, MakeArray<unsigned>({0}), working));
+    EXPECT_EQ(working->Max(0), high);
+    const auto edge = [&](unsigned bin) {
+      return static_cast<double>(low) + bin * working->BinSize(0);
+    };
+    const double end = static_cast<double>(high) + (std::is_integral_v<T> ? 1 : 0);
+    EXPECT_LT(edge(working->BinCount(0) - 1), end);
+    EXPECT_GE(edge(working->BinCount(0)), high - 1e-12 * high);  // which the last bin holds anyway
+    std::vector<unsigned long long> want(working->BinCount(0));
+    for (std::size_t i = 0; i < scene->pixels.size(); ++i) {
+      const T v = scene->pixels[i];
+      if (scene->states[i] == 0 && v >= low && v <= high) ++want[ExactBin(v, *working)];
+    }
+    const auto counts = working->BandHistogram(0, 0).counts;
+    EXPECT_EQ(std::vector<unsigned long long>(counts.begin(), counts.end()), want);
+  }
+}
+
+TEST(RasterHistogram, ExactBinsAtTheEnds) {
+  const auto count = []<typename T>(const std::vector<T>& values, std::type_identity_t<T> lower,
+                                    std::type_identity_t<T> upper, double size, unsigned bins) {
+    const Pointer<OrderedTestRaster<T>> scene(
+        new OrderedTestRaster<T>(static_cast<unsigned>(values.size()), 1, 1, Interleave::BIP));
+    scene->pixels = values;
+    const RasterHistogramPtr<T> working(
+        size > 0 ? new RasterHistogram<T>(1, Each(1, size), Each(1, lower), Each(1, upper),
+                                          HistogramSign::kBoth, Form::kExact)
+                 : new RasterHistogram<T>(1, Each(1, bins), Each(1, lower), Each(1, upper),
+                                          HistogramSign::kBoth, Form::kExact));
+    EXPECT_TRUE(Count(scene, MakeArray<unsigned>({0}), working));
+    const auto counts = working->BandHistogram(0, 0).counts;
+    return std::vector<unsigned long long>(counts.begin(), counts.end());
+  };
+  using Counts = std::vector<unsigned long long>;
+  const float above = std::nextafter(1.0F, 2.0F), below = std::nextafter(0.5F, 0.0F);
+  EXPECT_EQ(count(std::vector{0.0F, -0.0F, 0.5F, below, 1.0F, above}, 0.0F, 1.0F, 0, 2),
+            (Counts{3, 2}));
+  EXPECT_EQ(count(std::vector{0.0, 0.25, 1.0}, 0.0, 1.0, 0.25, 0), (Counts{1, 1, 0, 1}));
+  EXPECT_EQ(count(std::vector{3.0, 3.0, 4.0}, 3.0, 3.0, 0, 4), (Counts{2, 0, 0, 0}));
+  // 0.3 is three tenths: below the edge 3 * 0.1, which is rounded up.
+  EXPECT_EQ(count(std::vector{0.3, 0.6, 0.7}, 0.0, 1.0, 0.1, 0),
+            (Counts{0, 0, 1, 0, 0, 1, 1, 0, 0, 0}));
+  EXPECT_EQ(
+      count(std::vector<std::int64_t>{INT64_MIN, -1, 0, INT64_MAX}, INT64_MIN, INT64_MAX, 0, 2),
+      (Counts{2, 2}));
+  EXPECT_EQ(count(std::vector<std::uint64_t>{0, UINT64_MAX / 3, UINT64_MAX}, 0, UINT64_MAX, 0, 3),
+            (Counts{2, 0, 1}));  // the second bin begins at 6148914691236517205.33
+  EXPECT_EQ(count(std::vector<std::uint8_t>{7, 8}, 7, 8, 0, 4), (Counts{1, 0, 1, 0}));
 }
 
 TEST(RasterHistogram, FindsItsBins) {

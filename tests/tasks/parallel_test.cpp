@@ -2,10 +2,15 @@
 
 #include <atomic>
 #include <bit>
+#include <chrono>
+#include <cstdlib>
+#include <filesystem>
 #include <numeric>
 #include <random>
 #include <stdexcept>
+#include <thread>
 
+#include "foundation/library.h"
 #include "tasks/array_operations.h"
 #include "tasks/parallel_ranges.h"
 #include "tasks/thread_limit.h"
@@ -335,6 +340,37 @@ TEST(ArrayOperations, InterpolateInATable) {
   RunParallelFor(wrong);
   EXPECT_EQ(wrong.GetErrorState().code, ParallelError::Code);
   EXPECT_EQ(out.GetErrorState().code, ArrayErrorInvalidArray::Code);
+}
+
+/// Meets as many threads as there are parts, or gives up after a while.
+struct Meeting : ArrayParallelFor {
+  using ArrayParallelFor::ArrayParallelFor;
+  void Body(unsigned, unsigned) override {
+    ++here;
+    for (int i = 0; i < 500 && here < End(); ++i) {
+      std::this_thread::sleep_for(std::chrono::milliseconds(10));
+    }
+  }
+  std::atomic<unsigned> here{0};
+};
+
+// Run by the test below in a process of its own, as the hint is read at load.
+TEST(ThreadsHint, DISABLED_MeetsAllThreads) {
+  const auto threads = static_cast<unsigned>(GetThreadsHint());
+  Meeting meeting(threads);
+  const double start = WallSeconds();
+  RunParallelFor(meeting, 1);
+  EXPECT_EQ(meeting.here, threads);
+  EXPECT_LT(WallSeconds() - start, 4.0);  // nobody has given up
+}
+
+TEST(ThreadsHint, MayAskForMoreThanThereAreCores) {
+  const int threads = GetProcessingCores() + 3;
+  const std::string command = "LUMO_THREADS_HINT=" + std::to_string(threads) + " " +
+                              std::filesystem::read_symlink("/proc/self/exe").string() +
+                              " --gtest_also_run_disabled_tests"
+                              " --gtest_filter=ThreadsHint.DISABLED_MeetsAllThreads >/dev/null";
+  EXPECT_EQ(std::system(command.c_str()), 0);
 }
 
 }  // namespace

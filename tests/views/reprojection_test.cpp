@@ -2,6 +2,7 @@
 
 #include <cmath>
 #include <numbers>
+#include <numeric>
 
 #include "commands/catalog.h"
 #include "georef/rpc_georef.h"
@@ -188,6 +189,13 @@ TEST(Reprojection, LeavesOutNeighboursThatAreNotValid) {
   }
 }
 
+template <typename T>
+std::shared_ptr<WarpMap> MapOf(const GeoRefPtr& grid, const PlacedRaster<T>& raster,
+                               double tolerance) {
+  return std::make_shared<WarpMap>(grid, raster.geoRef, raster.Samples(), raster.Lines(),
+                                   tolerance);
+}
+
 /// A raster whose two bands are the position of each pixel's centre.
 Pointer<PlacedRaster<double>> MakePositions(const GeoRefPtr& grid) {
   return MakePlaced<double>(
@@ -226,7 +234,7 @@ TEST(Reprojection, FindsPositionsAcrossCoordinateSystems) {
   const auto near = Reproject(fitted, *raster, rect, {0, 1});
   Reprojection<double> bounded(grid, kPolynomial, kLinear);
   bounded.SetSampling(WarpSampling::kCentred);
-  bounded.SetTolerance(0.001);  // cuts the rectangle
+  bounded.SetMap(MapOf(grid, *raster, 0.001));  // cuts the squares
   const auto nearer = Reproject(bounded, *raster, rect, {0, 1});
   double worst = 0, worstNearer = 0;
   for (unsigned i = 0; i < exact.pixels.GetCount(); ++i) {
@@ -259,7 +267,7 @@ TEST(Reprojection, ShowsAGlobeWithoutWhatIsBehindIt) {
   for (const auto method : {kRigorous, kPolynomial}) {
     Reprojection<double> reprojection(grid, method, kLinear);
     reprojection.SetSampling(WarpSampling::kCentred);
-    reprojection.SetTolerance(0.125);
+    reprojection.SetMap(MapOf(grid, *raster, method == kRigorous ? 0.0 : 0.125));
     reprojection.SetBackground(-1);
     const auto block = Reproject(reprojection, *raster, {0, 0, 139, 139}, {0, 1});
     ASSERT_TRUE(block.whole);
@@ -370,6 +378,36 @@ TEST(ProjectedRaster, ExactGridsNeverFailOutside) {
 
   ProjectedRaster<float> computed(raster, grid, kPolynomial, kLinear);
   EXPECT_FALSE(Read(computed, {100, 100, 109, 109}).whole);
+}
+
+TEST(ProjectedRaster, GivesStatisticsOfItsOwnPixelsOnAnExactGrid) {
+  class Source final : public ComputedRaster<float> {
+   public:
+    using ComputedRaster::ComputedRaster;
+    ~Source() override { StopComputing(); }
+  };
+  const RasterPtr<float> source(new Source(RasterPtr<float>(
+      MakePlaced<float>(MakeGrid(0, 0, 1, 20, 20), 1,
+                        [](unsigned x, unsigned y, unsigned) { return 100.0F * y + x; }))));
+  const GeoRefPtr grid = MakeGrid(5, -3, 1, 4, 2);  // samples 5 to 8 of lines 3 and 4
+  ProjectedRaster<float> exact(source, grid, kPolynomial, kNearest,
+                               {ProjectedGrid::kExact, WarpSampling::kCentred, {}});
+  const auto all = Read(exact, AllOf(exact));
+  ASSERT_TRUE(all.whole);
+  const double mean = std::accumulate(all.pixels.begin(), all.pixels.end(), 0.0) / 8;
+  EXPECT_EQ(mean, 356.5);  // 350 + (5 + 6 + 7 + 8) / 4
+  EXPECT_EQ(exact.Mean(0, IPC()), mean);
+  EXPECT_EQ(exact.BandStats(0).pixelCount, 8U);
+  exact.HistogramAllBands(0, 1000, 2, HistogramSign::kBoth, IPC())->WaitFinished();
+  EXPECT_EQ(exact.BandHistogram(0)[0].counts[0], 8U);
+  EXPECT_FALSE(source->StatsExist(0, StatsMask::Mean));
+  EXPECT_FALSE(exact.WriteStats());
+
+  ProjectedRaster<float> told(source, grid, kPolynomial, kNearest);
+  EXPECT_EQ(told.Mean(0, IPC()), 959.5);  // of all of the source
+  EXPECT_TRUE(source->StatsExist(0, StatsMask::Mean));
+  told.HistogramAllBands(0, 1000, 2, HistogramSign::kBoth, IPC())->WaitFinished();
+  EXPECT_EQ(source->BandHistogram(0).GetCount(), 1U);
 }
 
 TEST(CreateProjectedRasterCommand, TakesItsWords) {

@@ -124,6 +124,11 @@ TEST(BandStackRaster, ShowsTheBandsOfAll) {
   Array<unsigned char> state;
   EXPECT_FALSE(
       stack.GetSubRect({0, 0, 1, 1}, MakeArray<unsigned>({5}), Interleave::BIP, pixels, state));
+  // A block without an axis for bands has the first of them, of whichever member.
+  ASSERT_TRUE(stack.GetSubRect({2, 1, 4, 2}, MakeArray<unsigned>({3, 0, 4, 1}), Interleave::None,
+                               pixels, state));
+  EXPECT_EQ(pixels.GetDims(), ArrayDims(2, 3));
+  EXPECT_EQ(pixels[5], RampValue<int>(4, 2, 1));
   EXPECT_EQ(stack.NoDataValue(3), RampValue<int>(77, 0, 1));
   EXPECT_FALSE(BandStackRaster<int>(Array<RasterPtr<int>>()).IsValid());
 }

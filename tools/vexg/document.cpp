@@ -91,6 +91,7 @@ const XMLElement* Document::FindChannel() const {
 String Document::Write() const {
   XMLDocumentRoot root;
   root.name = root_->name;
+  root.attributes = root_->attributes;
   root.children = root_->children;
   return XMLSimpleWriter().Write(root);
 }

@@ -31,7 +31,7 @@ class Document {
   /// The channel element that counts, which is the last; null when there is none.
   const XMLElement* FindChannel() const;
 
-  /// The document as a text again; what stood on its root beside the name is left out.
+  /// The document as a text again; text on its root itself is left out.
   String Write() const;
 
  private:

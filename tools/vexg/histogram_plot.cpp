@@ -5,7 +5,7 @@
 
 #include <fmt/format.h>
 
-#include "png_writer.h"
+#include "picture_writer.h"
 
 namespace lumo::host {
 namespace {
@@ -150,9 +150,9 @@ void HistogramPlot::Fill(unsigned left, unsigned top, unsigned right, unsigned b
 }
 
 void HistogramPlot::Write(const OutputFile& output) const {
-  PngWriter png(output, kWidth, height_, 1, 8);
-  for (unsigned y = 0; y < height_; ++y) png.WriteLine(&pixels_[std::size_t{y} * kWidth]);
-  png.Close();
+  const auto writer = MakePictureWriter(output, kWidth, height_, 1);
+  for (unsigned y = 0; y < height_; ++y) writer->WriteLine(&pixels_[std::size_t{y} * kWidth]);
+  writer->Close();
 }
 
 }  // namespace lumo::host

@@ -26,7 +26,7 @@ class HistogramPlot {
   /// Bytes that the picture takes at most.
   std::uint64_t GetBytes() const { return pixels_.size(); }
 
-  /// Writes the picture, a PNG.
+  /// Writes the picture, in the format that the output's name tells.
   void Write(const OutputFile& output) const;
 
  private:

@@ -20,6 +20,8 @@ class JobChannel {
   void AddTo(XMLElement& job) const;
 
   void Abort();
+  /// True once somebody, at either end, has raised the abort flag.
+  bool IsAborted() const { return !watched_.IsNull() && watched_->abort->IsSet(); }
   ProgressReportPtr GetProgress() const;
 
  private:

@@ -12,11 +12,11 @@ namespace lumo::host {
 
 using Json = nlohmann::ordered_json;
 
-/// A number of JSON, or a text for one that JSON has no number for.
+/// A number of JSON. NaN and infinities, which JSON can't hold, are null.
 template <typename T>
 Json NumberAsJson(T value) {
   if constexpr (std::is_floating_point_v<T>) {
-    if (!std::isfinite(value)) return FormatValue(value).ToUTF8();
+    if (!std::isfinite(value)) return {};
     return static_cast<double>(value);
   } else {
     return value;

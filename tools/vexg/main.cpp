@@ -1,15 +1,18 @@
 #include <algorithm>
 #include <exception>
-#include <filesystem>
 #include <iostream>
 #include <map>
 
 #include <CLI/CLI.hpp>
 
+#include "data/access_policy.h"
 #include "foundation/environment.h"
 #include "foundation/library.h"
+#include "foundation/near_name.h"
+#include "option_values.h"
 #include "platform/debug_output.h"
 #include "platform/module.h"
+#include "platform/process.h"
 #include "verb.h"
 
 namespace lumo::host {
@@ -25,6 +28,8 @@ std::map<std::string, Verb>& Verbs() {
   return verbs;
 }
 
+bool gIsLenient = false;
+
 /// Loads libraries of commands; what they hold registers itself.
 void LoadLibraries(const std::vector<std::string>& files) {
   for (const std::string& file : files) {
@@ -37,24 +42,6 @@ void LoadLibraries(const std::vector<std::string>& files) {
   }
 }
 
-/// Tells the library where the definition files of metadata lie: beside it, as they are built and
-/// installed.
-void FindResources() {
-  const std::filesystem::path library = platform::LibraryDirectory();
-  for (const char* const share : {"../share/vexg", VEXG_SHARE_FROM_LIBRARY}) {
-    const std::filesystem::path folder = (library / share / "mdf").lexically_normal();
-    std::error_code ignored;
-    if (!std::filesystem::is_directory(folder, ignored)) continue;
-    GetGlobalEnvironmentImpl()[Environment::kMdfDirectory].text = String(folder.string() + "/");
-    return;
-  }
-}
-
-std::string OneLine(std::string text) {
-  std::replace(text.begin(), text.end(), '\n', ' ');
-  return text;
-}
-
 int Run(int argc, char** argv) {
   CLI::App app("Processing core for remote-sensing images: runs jobs of named commands.", "vexg");
   app.set_version_flag("--version", std::string("vexg ") + GetLibraryVersion());
@@ -65,20 +52,30 @@ int Run(int argc, char** argv) {
       ->type_name("FILE")
       ->allow_extra_args(false);
 
+  app.add_flag("--lenient", gIsLenient,
+               "Let jobs read what can't be read as 0 or nothing, and pass over unknown names");
+
   std::map<const CLI::App*, VerbRegistration::Work> works;
   for (const auto& [name, verb] : Verbs()) {
     CLI::App* const sub = app.add_subcommand(name, verb.summary);
     works[sub] = verb.setup(*sub);
   }
+  const std::vector<std::string> arguments =
+      JoinLists(app, std::vector<std::string>(argv + 1, argv + argc));
   try {
-    app.parse(argc, argv);
+    std::vector<std::string> line = arguments;
+    std::reverse(line.begin(), line.end());  // as the parser takes them
+    app.parse(line);
   } catch (const CLI::ParseError& error) {
     if (error.get_exit_code() == 0) return app.exit(error);  // help or version
-    throw HostError(kExitUsage, OneLine(error.what()) + "; see vexg --help");
+    throw HostError(kExitUsage, DescribeBadLine(app, arguments, error));
   }
   LoadLibraries(libraries);
-  FindResources();
+  InitEnvironment();
   VEXInit();
+  AccessPolicy policy;
+  policy.special = false;  // nobody waits for a pipe that nobody writes to
+  SetAccessPolicy(policy);
   const int code = works.at(app.get_subcommands().front())();
   if (!std::cout.flush()) throw HostError(kExitFailed, "standard output can't be written");
   return code;
@@ -91,15 +88,22 @@ VerbRegistration::VerbRegistration(const char* name, const char* summary, Setup 
 }
 
 void Say(const std::string& line) {
-  platform::DebugOutput("vexg: " + line + "\n");
+  platform::DebugOutput("vexg: " + Printable(line) + "\n");
+}
+
+bool ChecksAreStrict() {
+  return !gIsLenient;
 }
 
 }  // namespace lumo::host
 
 int main(int argc, char** argv) {
+  lumo::platform::SurviveClosedPipes();
   try {
     return lumo::host::Run(argc, argv);
   } catch (const lumo::host::HostError& error) {
+    // What was in the making is gone by now. Who has closed the pipe knows why there is no more.
+    if (lumo::platform::OutputIsClosed()) lumo::platform::EndOfClosedPipe();
     lumo::host::Say(error.what());
     return error.code;
   } catch (const std::exception& error) {

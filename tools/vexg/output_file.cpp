@@ -70,7 +70,8 @@ OutputFile::OutputFile(const std::string& file, bool overwrite,
 
 void OutputFile::RefuseInput(const std::string& input) {
   std::error_code fault;
-  const fs::path source = InResolvedFolder(input);
+  // "FILE|NAME=VALUE" is a raster in a file.
+  const fs::path source = InResolvedFolder(input.substr(0, input.find('|')));
   const fs::path target = InResolvedFolder(target_);
   const auto isSame = [&](const fs::path& a, const fs::path& b) {
     return a == b || fs::equivalent(a, b, fault);

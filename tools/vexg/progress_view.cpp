@@ -2,14 +2,27 @@
 
 #include <algorithm>
 #include <chrono>
+#include <exception>
 
 #include <nlohmann/json.hpp>
 
 #include "platform/debug_output.h"
+#include "platform/interrupt.h"
 #include "platform/process.h"
 
 namespace lumo::host {
 namespace {
+
+const char* WordOf(Outcome outcome) {
+  switch (outcome) {
+    case Outcome::kFailed:
+      return "failed";
+    case Outcome::kAborted:
+      return "aborted";
+    default:
+      return "done";
+  }
+}
 
 std::string Bar(double progress) {
   constexpr unsigned kAround = 9;  // brackets, blanks and the percentage
@@ -32,7 +45,7 @@ ProgressStyle ChooseProgressStyle(const std::string& word, bool quiet) {
 }
 
 ProgressView::ProgressView(const ProgressReportPtr& report, ProgressStyle style)
-    : report_(report), style_(style) {
+    : report_(report), style_(style), exceptions_(std::uncaught_exceptions()) {
   if (style_ != ProgressStyle::kNone) thread_ = std::thread([this] { Watch(); });
 }
 
@@ -44,26 +57,42 @@ ProgressView::~ProgressView() {
   }
   wake_.notify_one();
   thread_.join();
-  Show(true);
+  ShowEnd();
 }
 
 void ProgressView::Watch() {
   constexpr auto kInterval = std::chrono::milliseconds(50);
   std::unique_lock lock(mutex_);
   do {
-    Show(false);
+    Show();
   } while (!wake_.wait_for(lock, kInterval, [this] { return ended_; }));
 }
 
-void ProgressView::Show(bool last) {
+void ProgressView::Show() {
   const double progress = std::clamp(report_->GetProgress(), 0.0, 1.0);
   const int percent = static_cast<int>(progress * 100.0);
-  const bool changed = percent != shownPercent_;
+  if (percent == shownPercent_ || percent == 100) return;  // the end shows all of it
   shownPercent_ = percent;
+  Print(progress, nullptr);
+}
+
+void ProgressView::ShowEnd() {
+  if (std::uncaught_exceptions() > exceptions_) {
+    outcome_ = platform::WasInterrupted() ? Outcome::kAborted : Outcome::kFailed;
+  }
+  Print(std::clamp(report_->GetProgress(), 0.0, 1.0), WordOf(outcome_));
+}
+
+/// @param ended  how the run ended; null while it goes on.
+void ProgressView::Print(double progress, const char* ended) {
   if (style_ == ProgressStyle::kBar) {
-    if (changed || last) platform::DebugOutput(Bar(progress) + (last ? "\n" : ""));
-  } else if (changed) {
-    platform::DebugOutput(nlohmann::json{{"progress", progress}}.dump() + "\n");
+    std::string line = Bar(progress);
+    if (ended != nullptr && outcome_ != Outcome::kDone) line += std::string(", ") + ended;
+    platform::DebugOutput(line + (ended != nullptr ? "\n" : ""));
+  } else {
+    nlohmann::ordered_json line{{"progress", progress}};
+    if (ended != nullptr) line["ended"] = ended;
+    platform::DebugOutput(line.dump() + "\n");
   }
 }
 

@@ -5,6 +5,7 @@
 #include <CLI/CLI.hpp>
 
 #include "commands/job_parser.h"
+#include "option_values.h"
 #include "verb.h"
 
 namespace lumo::host {
@@ -29,7 +30,7 @@ void RasterJobOptions::AddTo(CLI::App& app) {
 
 void RasterJobOptions::AddProgressTo(CLI::App& app) {
   app.add_option("--progress", progress, "How progress shows on standard error")
-      ->check(CLI::IsMember({"auto", "bar", "json", "none"}))
+      ->transform(OneOf({"auto", "bar", "json", "none"}))
       ->capture_default_str();
   app.add_flag("-q,--quiet", quiet, "Show no progress");
 }
@@ -66,6 +67,7 @@ String JobDraft::Write(const JobChannel* channel) const {
   if (channel != nullptr) channel->AddTo(job);
   XMLDocumentRoot document;
   document.name = root_.name;
+  if (ChecksAreStrict()) document.attributes["Checks"] = FormatValue(JobChecks::kStrict);
   for (const XMLElementPtr& child : job.children) document.children.PushBack(child);
   for (const XMLElementPtr& child : root_.children) document.children.PushBack(child);
   return XMLSimpleWriter().Write(document);
@@ -97,6 +99,9 @@ ProgressReportPtr JobSession::GetProgress() const {
 
 void JobSession::CheckInterrupt() const {
   if (ipc_.abort->IsSet()) throw HostError(kExitFailed, "interrupted; nothing was written");
+  if (channel_ && channel_->IsAborted()) {
+    throw HostError(kExitFailed, "the job was aborted; nothing was written");
+  }
 }
 
 JobResults JobSession::Run(const JobDraft& draft) {
@@ -105,7 +110,16 @@ JobResults JobSession::Run(const JobDraft& draft) {
   NoteOpenRasters(draft, results);
   CheckInterrupt();
   CheckResults(draft, results);
+  SayNotes(draft, results);
   return results;
+}
+
+/// Says what the opening of a raster noted, once.
+void JobSession::SayNotes(const JobDraft& draft, const JobResults& results) {
+  for (const JobDraft::StepInfo& step : draft.GetSteps()) {
+    const std::string note = results.Find(step.name).returns.Find("Note").ToUTF8();
+    if (step.opens.GetLength() != 0 && !note.empty() && said_.insert(note).second) Say(note);
+  }
 }
 
 /// @param watched  with the progress and the abort flag of the session.
@@ -132,6 +146,14 @@ void JobSession::NoteOpenRasters(const JobDraft& draft, const JobResults& result
   }
 }
 
+/// Says which inputs had no effect.
+void JobSession::SayNotes(const JobDraft& draft, const JobResults& results) const {
+  for (const JobDraft::StepInfo& step : draft.GetSteps()) {
+    const String note = results.Find(step.name).returns.Find("Note");
+    if (note.GetLength() != 0) Say("note: " + note.ToUTF8());
+  }
+}
+
 void JobSession::CheckResults(const JobDraft& draft, const JobResults& results) const {
   for (const JobDraft::StepInfo& step : draft.GetSteps()) {
     const std::string id = step.id.ToUTF8();
@@ -153,6 +175,12 @@ void JobSession::CloseAll() {
   }
   open_.clear();
   Execute(draft, false);
+}
+
+JobResults RunOnServer(const ServerOptions& server, const JobDraft& draft) {
+  RasterJobOptions options;
+  options.server = server;
+  return JobSession(options).Run(draft);
 }
 
 }  // namespace lumo::host

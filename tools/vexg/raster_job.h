@@ -1,6 +1,7 @@
 #pragma once
 
 #include <memory>
+#include <set>
 #include <string>
 #include <vector>
 
@@ -84,7 +85,9 @@ class JobSession {
  private:
   String Execute(const JobDraft& draft, bool watched);
   void NoteOpenRasters(const JobDraft& draft, const JobResults& results);
+  void SayNotes(const JobDraft& draft, const JobResults& results) const;
   void CheckResults(const JobDraft& draft, const JobResults& results) const;
+  void SayNotes(const JobDraft& draft, const JobResults& results);
   void CloseAll();
 
   IPC ipc_;  // of jobs in this process; its flag is that of all
@@ -92,7 +95,11 @@ class JobSession {
   std::unique_ptr<ServerLink> link_;  // null: in this process
   std::unique_ptr<platform::InterruptWatch> interrupts_;
   std::vector<String> open_;  // URIs
+  std::set<std::string> said_;
 };
+
+/// Has a server run a job of one verb. Throws HostError as a JobSession does.
+JobResults RunOnServer(const ServerOptions& server, const JobDraft& draft);
 
 /// How far one command of a job has come, where the commands run one after the other.
 class StepProgress final : public ProgressReport {

@@ -1,5 +1,6 @@
 #include "raster_source.h"
 
+#include <algorithm>
 #include <charconv>
 #include <filesystem>
 
@@ -8,8 +9,10 @@
 
 #include "data/file_uri.h"
 #include "data/format_table.h"
+#include "option_values.h"
 #include "raster/pixel_types.h"
 #include "verb.h"
+#include "views/catalog_raster_ref.h"
 
 namespace lumo::host {
 namespace {
@@ -39,6 +42,14 @@ void SourceOptions::AddTo(CLI::App& app) {
 void SourceOptions::AddFormatTo(CLI::App& app) {
   app.add_option("--input-format", format, "Key of its format, see vexg formats; else detected")
       ->type_name("KEY");
+  app.add_option("--subdataset", subdataset,
+                 "Which of the rasters in the file: its number, from 1, or the end of its name; as "
+                 "FILE|SUBDATASET=N")
+      ->type_name("N|NAME");
+}
+
+std::string FileOf(const SourceOptions& source) {
+  return source.file.substr(0, source.file.find('|'));
 }
 
 std::string AbsoluteName(const std::string& file) {
@@ -54,17 +65,31 @@ std::string AbsoluteName(const std::string& file) {
 }
 
 Array<String> ConnStringsOf(const SourceOptions& source) {
-  const std::string name = AbsoluteName(source.file);
-  if (source.format.empty()) return ConnStrings({String(name)});
-  if (FindFormat(String(source.format)) == nullptr) {
-    throw HostError(kExitUsage, "--input-format: there is no format \"" + source.format +
-                                    "\"; see vexg formats");
+  std::vector<String> pieces;
+  if (!source.format.empty()) pieces.emplace_back(FormatKey("--input-format", source.format));
+  std::string rest = source.file;
+  std::size_t bar = rest.find('|');
+  pieces.emplace_back(AbsoluteName(rest.substr(0, bar)));
+  while (bar != rest.npos) {
+    rest.erase(0, bar + 1);
+    bar = rest.find('|');
+    pieces.emplace_back(rest.substr(0, bar));
+    if (pieces.back().ToUTF8().find('=') == std::string::npos) {
+      throw HostError(kExitUsage, source.file +
+                                      ": behind a | stands NAME=VALUE; a file whose name "
+                                      "holds a | has to be renamed");
+    }
   }
-  return ConnStrings({String(source.format), String(name)});
+  if (!source.subdataset.empty()) pieces.emplace_back("SUBDATASET=" + source.subdataset);
+  Array<String> strings{ArrayDims(static_cast<unsigned>(pieces.size()))};
+  std::copy(pieces.begin(), pieces.end(), strings.begin());
+  return strings;
 }
 
 void AddOpen(JobDraft& draft, const std::string& name, const SourceOptions& source) {
-  draft.Open(name, "OpenRasterCommand").AddInput("ConnStr", ConnStringsOf(source));
+  JobWriterCommand& open = draft.Open(name, "OpenRasterCommand");
+  open.AddInput("ConnStr", ConnStringsOf(source));
+  open.AddInput("CheckSource", SourceCheck::kCompared);
 }
 
 std::string PyramidPathOf(const std::string& file) {
@@ -91,17 +116,24 @@ std::string FindPyramid(const std::string& file) {
 
 }  // namespace
 
-void AddOpenWithPyramid(JobDraft& draft, const std::string& name, const SourceOptions& source) {
+void AddOpenWithPyramid(JobDraft& draft, const std::string& name, const SourceOptions& source,
+                        const char* levels) {
   JobWriterCommand& open = draft.Open(name, "OpenRasterCommand");
   open.AddInput("ConnStr", ConnStringsOf(source));
-  const std::string pyramid = FindPyramid(source.file);
-  if (!pyramid.empty()) open.AddInput("PyramidConnStr", ConnStrings({"Pyramid", String(pyramid)}));
+  open.AddInput("CheckSource", SourceCheck::kCompared);
+  // A pyramid beside a file is of the raster that the file gives without further words.
+  const bool isPlain = source.subdataset.empty() && source.file.find('|') == std::string::npos;
+  const std::string pyramid = isPlain ? FindPyramid(source.file) : std::string();
+  if (pyramid.empty()) return;
+  open.AddInput("PyramidConnStr", ConnStrings({"Pyramid", String(pyramid)}));
+  open.AddInput("Levels", String(levels));
 }
 
 void AddLevel(JobDraft& draft, const std::string& name, const String& raster, unsigned level) {
   JobWriterCommand& command = draft.Open(name, "GetRasterPyramidCommand", "PyramidURI");
   command.AddInput("URI", raster);
   command.AddInput("Level", level);
+  command.AddInput("Placing", Form::kExact);
 }
 
 void AddBandView(JobDraft& draft, const std::string& name, const String& raster,
@@ -112,7 +144,8 @@ void AddBandView(JobDraft& draft, const std::string& name, const String& raster,
 }
 
 std::string PathOf(const String& uri) {
-  return PathOfFileURI(ParseValue<URI>(uri));
+  const std::string path = PathOfFileURI(ParseValue<URI>(uri));
+  return path.substr(0, path.find('|'));  // a raster in a file
 }
 
 void AddQuery(JobDraft& draft, const std::string& name, const String& raster) {

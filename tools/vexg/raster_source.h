@@ -12,8 +12,9 @@ namespace lumo::host {
 
 /// A raster source as the command line names it.
 struct SourceOptions {
-  std::string file;
-  std::string format;  ///< key; empty: to be detected
+  std::string file;          ///< "FILE", or "FILE|NAME=VALUE" with pieces of a connection string
+  std::string format;        ///< key; empty: to be detected
+  std::string subdataset{};  ///< number or name of one of the rasters in the file; empty for none
 
   void AddTo(CLI::App& app);
   void AddFormatTo(CLI::App& app);
@@ -22,6 +23,9 @@ struct SourceOptions {
 /// `file` as a server with another working directory finds it. Names that aren't paths, such as
 /// addresses, stay as they are. Throws HostError for one that a job document can't carry.
 std::string AbsoluteName(const std::string& file);
+
+/// The file of a source, without the pieces behind it.
+std::string FileOf(const SourceOptions& source);
 
 /// The connection strings of a source.
 Array<String> ConnStringsOf(const SourceOptions& source);
@@ -57,7 +61,10 @@ std::string PyramidPathOf(const std::string& file);
 
 /// AddOpen, with the pyramid file beside the raster where there is one. One that is older than the
 /// raster tells of other pixels: it is left out, and the user hears of it.
-void AddOpenWithPyramid(JobDraft& draft, const std::string& name, const SourceOptions& source);
+/// @param levels  which are shown of a raster that has levels of its own as well: Best or Told, see
+///                OpenRasterCommand.
+void AddOpenWithPyramid(JobDraft& draft, const std::string& name, const SourceOptions& source,
+                        const char* levels = "Best");
 
 /// Adds the command that shows a level of the pyramid of a raster, into the variable "$" name.
 /// @param raster  a variable or URI.

@@ -5,6 +5,7 @@
 #include <CLI/CLI.hpp>
 
 #include "data/format_table.h"
+#include "option_values.h"
 #include "raster/pixel_types.h"
 #include "verb.h"
 
@@ -42,6 +43,8 @@ void TargetOptions::AddTo(CLI::App& app, const std::string& meaning) {
                  "Key of its format, see vexg formats; by default from its name's ending")
       ->type_name("KEY");
   app.add_flag("--overwrite", overwrite, "Replace files that are there");
+  app.add_flag("--strict", strict,
+               "Fail, and make nothing, where the format does not keep all that is put in");
 }
 
 std::string ChooseFormat(const TargetOptions& target) {
@@ -52,9 +55,7 @@ std::string ChooseFormat(const TargetOptions& target) {
                                     ": the name's ending tells no format; give --format, one "
                                     "of vexg formats");
   }
-  if (FindFormat(String(target.format)) != nullptr) return target.format;
-  throw HostError(kExitUsage,
-                  "--format: there is no format \"" + target.format + "\"; see vexg formats");
+  return FormatKey("--format", target.format);
 }
 
 std::uint64_t BytesInFile(const std::string& format, unsigned dataType, std::uint64_t samples,
@@ -62,11 +63,18 @@ std::uint64_t BytesInFile(const std::string& format, unsigned dataType, std::uin
   return Compresses(format) ? 0 : samples * lines * bands * DataTypeBytes(dataType);
 }
 
-JobWriterCommand& AddCreate(JobDraft& draft, const TargetPlace& place, const String& like) {
+JobWriterCommand& AddCreate(JobDraft& draft, const TargetPlace& place, const String& like,
+                            const char* details, const std::vector<double>& noData) {
   JobWriterCommand& create = draft.Open("target", "CreateRasterCommand");
   create.AddInput("ConnStr", ConnStrings({String(AbsoluteName(place.file))}));
   create.AddVariableInput("SrcURI", like);
   create.AddInput("Format", String(place.format));
+  create.AddInput("Details", String(details));
+  if (!noData.empty()) {
+    Array<double> values{ArrayDims(static_cast<unsigned>(noData.size()))};
+    std::copy(noData.begin(), noData.end(), values.begin());
+    create.AddInput("NoDataValue", values);
+  }
   return create;
 }
 
@@ -79,19 +87,13 @@ void CheckClosed(const JobResults& results) {
   if (fault.GetLength() != 0) throw HostError(kExitFailed, fault.ToUTF8());
 }
 
-RasterInfo CheckMade(JobSession& session, const TargetPlace& made, const std::string& shown,
-                     const RasterInfo& wanted) {
-  JobDraft draft;
-  AddOpen(draft, "made", {made.file, made.format});
-  AddQuery(draft, "made", "$made");
-  draft.Close("close", "$made");
-  RasterInfo info = ReadInfo(session.Run(draft), "made");
-  if (info.samples != wanted.samples || info.lines != wanted.lines || info.bands != wanted.bands ||
-      info.dataType != wanted.dataType) {
-    throw HostError(kExitFailed, shown + ": the format " + made.format +
+void CheckSame(const RasterInfo& made, const RasterInfo& wanted, const std::string& format,
+               const std::string& shown) {
+  if (made.samples != wanted.samples || made.lines != wanted.lines || made.bands != wanted.bands ||
+      made.dataType != wanted.dataType) {
+    throw HostError(kExitFailed, shown + ": the format " + format +
                                      " did not keep the raster's size, bands or pixel type");
   }
-  return info;
 }
 
 ProgressReportPtr ProgressOfStep(const JobSession& session, const JobDraft& draft,

@@ -1,6 +1,7 @@
 #pragma once
 
 #include <string>
+#include <vector>
 
 #include "output_file.h"
 #include "raster_source.h"
@@ -12,6 +13,7 @@ struct TargetOptions {
   std::string output;
   std::string format;  ///< key; empty: as the name's ending tells
   bool overwrite = false;
+  bool strict = false;  ///< what the format does not keep is a failure
 
   /// @param meaning  what the file is, for the help.
   void AddTo(CLI::App& app, const std::string& meaning);
@@ -34,7 +36,10 @@ struct TargetPlace {
 /// Adds the command that makes a raster, into the variable "$target". Further inputs are the
 /// caller's.
 /// @param like  a variable or URI: the raster whose description is the start.
-JobWriterCommand& AddCreate(JobDraft& draft, const TargetPlace& place, const String& like);
+/// @param details  which of its details the raster gets: a word of KeptDetails.
+/// @param noData   of the first bands; others have that of the description.
+JobWriterCommand& AddCreate(JobDraft& draft, const TargetPlace& place, const String& like,
+                            const char* details, const std::vector<double>& noData);
 
 /// Adds the command that ends the making of "$target".
 void AddCloseTarget(JobDraft& draft);
@@ -42,11 +47,11 @@ void AddCloseTarget(JobDraft& draft);
 /// Throws HostError when what AddCloseTarget added told a fault.
 void CheckClosed(const JobResults& results);
 
-/// Opens a raster that was made and gives what it is. Throws HostError where it isn't of the size,
-/// bands and pixel type that were wanted.
+/// Throws HostError when a raster that was made isn't of the size, bands and pixel type that were
+/// wanted.
 /// @param shown  what the user calls the file.
-RasterInfo CheckMade(JobSession& session, const TargetPlace& made, const std::string& shown,
-                     const RasterInfo& wanted);
+void CheckSame(const RasterInfo& made, const RasterInfo& wanted, const std::string& format,
+               const std::string& shown);
 
 /// Progress of the step of this name, of a draft whose steps run one after the other.
 ProgressReportPtr ProgressOfStep(const JobSession& session, const JobDraft& draft,

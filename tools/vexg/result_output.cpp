@@ -1,59 +1,113 @@
 #include "result_output.h"
 
+#include <algorithm>
 #include <cstdio>
 #include <iostream>
 
 #include <CLI/CLI.hpp>
-#include <nlohmann/json.hpp>
 
 #include "commands/command.h"
+#include "option_values.h"
 #include "platform/process.h"
+#include "value_json.h"
 #include "verb.h"
 
 namespace lumo::host {
 namespace {
 
-std::string ToJson(const Document& result) {
-  nlohmann::ordered_json commands = nlohmann::ordered_json::array();
-  for (const XMLElementPtr& command : result.GetRoot().children) {
-    const auto attribute = [&](const char* name) {
-      return command->attributes.Find(name).ToUTF8();
-    };
-    nlohmann::ordered_json returns = nlohmann::ordered_json::object();
-    for (const XMLElementPtr& child : command->children) {
-      for (const auto& [name, value] : child->attributes) returns[name.ToUTF8()] = value.ToUTF8();
-    }
-    commands.push_back({{"name", attribute("Name")},
-                        {"result", attribute("Result")},
-                        {"wall", attribute("Wall")},
-                        {"cpu", attribute("CPU")},
-                        {"usage", attribute("Usage")},
-                        {"return", returns}});
+constexpr const char* kFault = "Fault";
+
+/// Says why a command failed.
+void SayReason(const NamedCommand& command, const XMLElement& result) {
+  const std::string word = result.attributes.Find("Result").ToUTF8();
+  const std::string reason = result.attributes.Find("Reason").ToUTF8();
+  if (word == "None" && !reason.empty()) {
+    Say("command \"" + command.name + "\" was left out: " + reason + "; see vexg commands");
+  } else if (word == "Failed") {
+    Say("command \"" + command.name + "\" (" + command.id + ") failed" +
+        (reason.empty() ? "" : ": " + reason));
   }
-  return nlohmann::ordered_json{{"commands", commands}}.dump(2) + "\n";
 }
 
 bool IsKnownHere(const NamedCommand& command) {
   return GetCommandRegistry().HasKey(command.id);
 }
 
-/// The commands of the job that have no counterpart in the result. Both lists have the same order
-/// and only names to compare; where names repeat, one that is unknown here too is the likelier.
-std::vector<NamedCommand> FindDropped(const std::vector<NamedCommand>& asked,
-                                      const std::vector<NamedCommand>& answered) {
-  std::vector<NamedCommand> dropped;
+/// The commands of a job by what became of them, in order.
+struct MatchedCommands {
+  std::vector<NamedCommand> answered;  ///< as many as the result has, if it is of this job
+  std::vector<NamedCommand> dropped;   ///< without a counterpart in the result
+};
+
+/// Both lists have the same order and only names to compare; where names repeat, a command that is
+/// unknown here too is the likelier to have been dropped.
+MatchedCommands MatchCommands(const std::vector<NamedCommand>& asked,
+                              const std::vector<NamedCommand>& answered) {
+  MatchedCommands matched;
   std::size_t missing = asked.size() - std::min(asked.size(), answered.size());
   std::size_t next = 0;
   for (const NamedCommand& command : asked) {
     const bool matches = next < answered.size() && answered[next].name == command.name;
     if (matches && (missing == 0 || IsKnownHere(command))) {
+      matched.answered.push_back(command);
       ++next;
     } else {
-      dropped.push_back(command);
+      matched.dropped.push_back(command);
       if (missing != 0) --missing;
     }
   }
-  return dropped;
+  return matched;
+}
+
+/// How the value of a returned output is to be read, by its name; text for what isn't declared.
+ValueKind KindOf(const CommandDeclaration* command, const String& output) {
+  if (command == nullptr) return ValueKind::kText;
+  for (const OutputDeclaration& declared : command->outputs) {
+    if (output == declared.name) return declared.kind;
+  }
+  return ValueKind::kText;
+}
+
+/// What a command declares; null for one that is unknown here.
+const CommandDeclaration* FindDeclaration(const NamedCommand& command) {
+  if (!IsKnownHere(command)) return nullptr;
+  return &GetCommandRegistry().Find(String(command.id))->GetDeclaration();
+}
+
+Json AsJson(const XMLElement& command, const CommandDeclaration* declaration) {
+  const auto attribute = [&](const char* name) { return command.attributes.Find(name); };
+  Json returns = Json::object();
+  for (const XMLElementPtr& child : command.children) {
+    for (const auto& [name, value] : child->attributes) {
+      returns[name.ToUTF8()] = ValueAsJson(value, KindOf(declaration, name));
+    }
+  }
+  Json entry{{"name", attribute("Name").ToUTF8()},
+             {"result", attribute("Result").ToUTF8()},
+             {"wall", SecondsAsJson(attribute("Wall"))},
+             {"cpu", SecondsAsJson(attribute("CPU"))},
+             {"usage", ValueAsJson(attribute("Usage"), ValueKind::kNumber)}};
+  if (command.attributes.HasKey("Reason")) entry["reason"] = attribute("Reason").ToUTF8();
+  entry["return"] = returns;
+  return entry;
+}
+
+std::string ToJson(const Document& job, const Document& result) {
+  const std::vector<NamedCommand> matched =
+      MatchCommands(job.GetCommands(), result.GetCommands()).answered;
+  Json commands = Json::array(), faults = Json::array();
+  for (const XMLElementPtr& child : result.GetRoot().children) {
+    if (child->name == kFault) {
+      faults.push_back(child->attributes.Find("Reason").ToUTF8());
+      continue;
+    }
+    const bool isMatched = commands.size() < matched.size();
+    commands.push_back(
+        AsJson(*child, isMatched ? FindDeclaration(matched[commands.size()]) : nullptr));
+  }
+  Json all{{"commands", commands}};
+  if (!faults.empty()) all["faults"] = faults;
+  return all.dump(2) + "\n";
 }
 
 }  // namespace
@@ -94,7 +148,7 @@ void JobOptions::AddTo(CLI::App& app) {
       ->type_name("FILE");
   app.add_flag("--json", json, "Give the result as JSON");
   app.add_option("--progress", progress, "How progress shows on standard error")
-      ->check(CLI::IsMember({"auto", "bar", "json", "none"}))
+      ->transform(OneOf({"auto", "bar", "json", "none"}))
       ->capture_default_str();
   app.add_flag("-q,--quiet", quiet, "Show no progress");
 }
@@ -109,8 +163,12 @@ Document ReadJob(const JobOptions& options, String& text) {
   return {text, source};
 }
 
-void WriteResult(const String& resultDocument, bool json, Output& output) {
-  output.Write(json ? ToJson(Document(resultDocument, "the result"))
+bool AsksForStrictChecks(const Document& job) {
+  return ChecksAreStrict() && !job.GetRoot().attributes.HasKey("Checks");
+}
+
+void WriteResult(const Document& job, const String& resultDocument, bool json, Output& output) {
+  output.Write(json ? ToJson(job, Document(resultDocument, "the result"))
                     : resultDocument.ToUTF8() + "\n");
 }
 
@@ -122,15 +180,40 @@ int ExitCodeOf(const Document& job, const String& resultDocument) {
   }
   const Document result(resultDocument, "the result");
   bool failed = false;
-  for (const NamedCommand& command : FindDropped(asked, result.GetCommands())) {
+  for (const NamedCommand& command : MatchCommands(asked, result.GetCommands()).dropped) {
     Say("command \"" + command.name + "\" was left out: the ID \"" + command.id +
         "\" is unknown; see vexg commands");
     failed = true;
   }
+  auto next = asked.begin();
   for (const XMLElementPtr& command : result.GetRoot().children) {
+    if (command->name == kFault) {
+      Say("the job: " + command->attributes.Find("Reason").ToUTF8());
+      failed = failed || ChecksAreStrict();
+    }
+    if (command->name != "Command") continue;
     if (command->attributes.Find("Result") != "Success") failed = true;
+    while (next != asked.end() && next->name != command->attributes.Find("Name").ToUTF8()) ++next;
+    if (next != asked.end()) SayReason(*next++, *command);
   }
   return failed ? kExitFailed : kExitSuccess;
+}
+
+Outcome OutcomeOf(const String& resultDocument, bool aborted) {
+  if (aborted) return Outcome::kAborted;
+  const Document result(resultDocument, "the result");
+  const auto& commands = result.GetRoot().children;
+  const bool succeeded =
+      std::all_of(commands.begin(), commands.end(), [](const XMLElementPtr& command) {
+        return command->name != "Command" || command->attributes.Find("Result") == "Success";
+      });
+  return succeeded ? Outcome::kDone : Outcome::kFailed;
+}
+
+int ExitCodeAfter(Outcome outcome, int code) {
+  if (outcome != Outcome::kAborted) return code;
+  Say("the job was aborted; what it made is not whole");
+  return kExitFailed;
 }
 
 }  // namespace lumo::host

@@ -5,6 +5,7 @@
 #include <string>
 
 #include "document.h"
+#include "progress_view.h"
 
 namespace CLI {
 class App;
@@ -25,6 +26,8 @@ class Output {
 
   /// Writes all of it. Throws HostError.
   void Write(const std::string& text);
+
+  bool IsStandardOutput() const { return file_.empty(); }
 
  private:
   std::string file_;
@@ -47,12 +50,29 @@ struct JobOptions {
 /// any Command is answered with a bare result; see ExitCodeOf.
 Document ReadJob(const JobOptions& options, String& text);
 
-/// Writes the result document, or the same as JSON:
-/// {"commands": [{"name", "result", "wall", "cpu", "usage", "return": {name: value}}]}.
-void WriteResult(const String& resultDocument, bool json, Output& output);
+/// True when the commands of a job are to be checked strictly: the job says nothing of its checks,
+/// and the user has not asked for lenient ones.
+bool AsksForStrictChecks(const Document& job);
 
-/// Says which commands of the job left no trace in its result, as their IDs are unknown.
+/// Writes the result document, or the same as JSON:
+/// {"commands": [{"name", "result", "wall", "cpu", "usage", "reason", "return": {name: value}}],
+/// "faults": [text]}; "reason" and "faults" only where there are some, "wall" and "cpu" in seconds,
+/// and values as ValueAsJson gives them for what their commands declare. The values of a command
+/// that is unknown here are texts.
+/// @param job  whose result it is.
+void WriteResult(const Document& job, const String& resultDocument, bool json, Output& output);
+
+/// Says what is wrong with the document, why commands failed, and which of them left no trace in
+/// the result, as their IDs are unknown to a server that doesn't say so.
 /// @return how the program ends: success, a failed or unknown command, or a job without any.
 int ExitCodeOf(const Document& job, const String& resultDocument);
+
+/// How a job ended that has this result. One that was aborted may look like a success, as a command
+/// that was in its middle does.
+Outcome OutcomeOf(const String& resultDocument, bool aborted);
+
+/// Says of an aborted job that its result is not whole, and gives the exit code for it; else gives
+/// `code`.
+int ExitCodeAfter(Outcome outcome, int code);
 
 }  // namespace lumo::host

@@ -30,6 +30,9 @@ class HostError : public std::runtime_error {
 /// Writes one line of the program's own to standard error.
 void Say(const std::string& line);
 
+/// True unless the user asked for --lenient: jobs have their inputs checked before they run.
+bool ChecksAreStrict();
+
 /// One verb of the command line. A static object beside the verb's code puts it into the list.
 ///
 /// `setup` adds options to the verb's part of the command line and gives the function that does the

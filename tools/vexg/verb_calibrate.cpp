@@ -9,9 +9,10 @@
 #include <CLI/CLI.hpp>
 #include <fmt/format.h>
 
+#include "keeping.h"
 #include "metadata_source.h"
+#include "option_values.h"
 #include "raster/pixel_types.h"
-#include "raster_target.h"
 #include "verb.h"
 
 namespace lumo::host {
@@ -114,6 +115,18 @@ void RefuseMissing(const Options& options) {
   }
 }
 
+/// Questions constants that can hardly be meant.
+void QuestionOdd(const Options& options) {
+  if (options.quantity != "reflectance") return;
+  constexpr double kLeast = 0.9, kMost = 1.1;  // the earth keeps within 0.983 and 1.017
+  if (*options.distance < kLeast || *options.distance > kMost) {
+    Say(
+        fmt::format("note: {}: {} astronomical units; the earth is 0.983 to 1.017 of them from the "
+                    "sun",
+                    NameOf(options, "--distance"), *options.distance));
+  }
+}
+
 /// Refuses constants that give no image.
 void RefuseImpossible(const Options& options) {
   if (options.quantity != "reflectance") return;
@@ -182,32 +195,26 @@ unsigned TypeCode(const Options& options) {
   const bool known = DispatchType(EightTypes{}, code, []<typename T>() { return true; });
   if (known) return code;
   throw HostError(kExitUsage, "--type: \"" + options.type +
-                                  "\" is none of Byte, SByte, Int16, UInt16, Int32, UInt32, "
+                                  "\" is none of Byte, Char, Int16, UInt16, Int32, UInt32, "
                                   "Single, Double");
 }
 
-/// What the result has in the place of pixels without data: a floating-point type NaN, which no
-/// result can be; else the value of the source.
-void AddNoData(JobWriterCommand& create, const RasterInfo& info, unsigned type) {
-  bool has = false;
-  for (const bool band : info.hasNoData) has = has || band;
-  const bool isReal = type == kDataTypeOf<float> || type == kDataTypeOf<double>;
-  if (!has || !isReal) return;
-  Array<double> values{ArrayDims(info.bands)};
-  for (double& value : values) value = std::numeric_limits<double>::quiet_NaN();
-  create.AddInput("HasNoDataValue", info.hasNoData);
-  create.AddInput("NoDataValue", values);
+bool IsReal(unsigned type) {
+  return type == kDataTypeOf<float> || type == kDataTypeOf<double>;
 }
 
 /// The whole of the work as one document.
-/// @param file  to make.
-JobDraft MakeDraft(const Options& options, const TargetPlace& place, const RasterInfo& info) {
+/// @param file    to make.
+/// @param noData  of bands, in the place of pixels that are not valid.
+JobDraft MakeDraft(const Options& options, const TargetPlace& place, const RasterInfo& info,
+                   const FillValues& noData) {
   JobDraft draft;
   AddOpen(draft, "source", options.source);
-  JobWriterCommand& create = AddCreate(draft, place, "$source");
+  AddQuery(draft, "source", "$source");
+  AddDetailsQuery(draft, "source", "$source");
   const unsigned type = TypeCode(options);
+  JobWriterCommand& create = AddCreate(draft, place, "$source", "Names", noData);
   create.AddInput("DataType", DataTypeName(type));
-  AddNoData(create, info, type);
   JobWriterCommand& calibrate = draft.Step(kCalibrateStep, CommandOf(options.quantity));
   calibrate.AddInput("SourceURI", String("$source"));
   calibrate.AddInput("CalibratedURI", String("$target"));
@@ -219,43 +226,60 @@ JobDraft MakeDraft(const Options& options, const TargetPlace& place, const Raste
   }
   calibrate.AddInput("ScaleFactor", options.scale);
   AddCloseTarget(draft);
+  if (!IsReal(type)) AddValidityQuery(draft, "source", "$source");
   draft.Close("close.source", "$source");
   return draft;
+}
+
+/// The no-data value of a result: of a floating-point type NaN, which no result can be; of others
+/// that of the source, unless another one is chosen.
+FillValues NoDataOf(const Options& options, unsigned bands, const FillValues& chosen) {
+  if (IsReal(TypeCode(options))) return FillValues(bands, std::numeric_limits<double>::quiet_NaN());
+  return chosen;
+}
+
+/// What the result shall hold. No results that are pixels with data are NaN: of floating-point
+/// types nothing need be counted.
+RasterContents Wanted(const Options& options, const JobResults& results) {
+  RasterContents put = ReadContents(results, "source");
+  put.info.dataType = TypeCode(options);
+  std::erase_if(put.details, [](const std::string& detail) {
+    return detail.find("/Description=") == detail.npos;
+  });
+  if (!IsReal(put.info.dataType)) put.valid = ReadValidPixels(results, "source.validity");
+  return put;
 }
 
 /// Makes the result in the output's folder. Throws what went wrong.
 void MakeResult(JobSession& session, const Options& options, const TargetPlace& place,
                 const OutputFile& output, const RasterInfo& info) {
-  const JobDraft draft = MakeDraft(options, place, info);
-  JobResults results;
-  {
-    const ProgressView view(ProgressOfStep(session, draft, kCalibrateStep),
-                            options.job.GetProgressStyle());
-    results = session.Run(draft);
-  }
-  CheckClosed(results);
-  RasterInfo wanted = info;
-  wanted.dataType = TypeCode(options);
-  CheckMade(session, place, output.GetShownName(), wanted);
+  Losses losses(output.GetShownName(), place.format, options.target.strict);
+  MadeRaster raster = MakeKept(session, place, losses, true, [&](const FillValues& noData) {
+    const JobDraft draft = MakeDraft(options, place, info, NoDataOf(options, info.bands, noData));
+    JobResults results;
+    {
+      const ProgressView view(ProgressOfStep(session, draft, kCalibrateStep),
+                              options.job.GetProgressStyle());
+      results = session.Run(draft);
+    }
+    CheckClosed(results);
+    return Wanted(options, results);
+  });
+  raster.put.info.hasNoData = raster.made.info.hasNoData;  // the source's are of another quantity
+  raster.isFilled = true;
+  CompareKept(raster, losses);
   session.CheckInterrupt();
+  losses.Settle();
 }
 
-/// Says what the numbers of the result may not hold.
-void NoteLimits(const Options& options, const RasterInfo& info) {
-  const unsigned type = TypeCode(options);
-  if (type == kDataTypeOf<float> || type == kDataTypeOf<double>) return;
-  if (options.quantity != "reflectance" && std::trunc(options.scale) != options.scale) {
-    throw HostError(kExitUsage,
-                    fmt::format("--scale: {} would be cut to {}, as the result is of {}",
-                                options.scale, std::trunc(options.scale), options.type));
-  }
-  for (const bool has : info.hasNoData) {
-    if (!has) continue;
-    Say(options.target.output +
-        ": note: a result that happens to be the no-data value is no data; --type Single keeps "
-        "them apart");
+/// Refuses a scale that the result's type would cut.
+void CheckScale(const Options& options) {
+  if (IsReal(TypeCode(options)) || options.quantity == "reflectance" ||
+      std::trunc(options.scale) == options.scale) {
     return;
   }
+  throw HostError(kExitUsage, fmt::format("--scale: {} would be cut to {}, as the result is of {}",
+                                          options.scale, std::trunc(options.scale), options.type));
 }
 
 int Calibrate(Options& options) {
@@ -273,6 +297,7 @@ int Calibrate(Options& options) {
   } else {
     RefuseMissing(options);
     RefuseImpossible(options);
+    QuestionOdd(options);
   }
   const std::string format = ChooseFormat(options.target);
   OutputFile output(options.target.output, options.target.overwrite, inputs);
@@ -282,13 +307,18 @@ int Calibrate(Options& options) {
     const std::string taken = TakeConstants(options, opened);
     RefuseMissing(options);
     RefuseImpossible(options);
+    QuestionOdd(options);
     Say(taken);
   }
   output.RefuseInput(PathOf(opened.Find("source").returns.Find("URI")));
   const RasterInfo info = ReadInfo(opened, "source");
-  NoteLimits(options, info);
+  CheckScale(options);
   if (options.job.printJob) {
-    std::cout << MakeDraft(options, {output.GetName(), format}, info).Write().ToUTF8() << '\n';
+    std::cout << MakeDraft(options, {output.GetName(), format}, info,
+                           NoDataOf(options, info.bands, {}))
+                     .Write()
+                     .ToUTF8()
+              << '\n';
     return kExitSuccess;
   }
   output.Begin(BytesInFile(format, TypeCode(options), info.samples, info.lines, info.bands));
@@ -317,12 +347,12 @@ const VerbRegistration registration(
           "Constants are one value for each band, or one for all. Radiance is DN * gain + offset, "
           "0 where that is below 0; reflectance is that at the top of the atmosphere; temperature "
           "is that of a black body, in the unit of K2. The result is --scale times as large. "
-          "Pixels without data stay so; in a result of Single or Double they are NaN.\n"
+          "Pixels that are not valid stay so; in a result of Single or Double they are NaN.\n"
           "Example: vexg calibrate reflectance scene.tif reflectance.tif --gain 0.76,0.8,0.62 "
           "--offset -1.5,-2.8,-1.2 --irradiance 1970,1843,1555 --sun-elevation 49.6 --distance "
           "1.012\n");
       app.add_option("quantity", options->quantity, "radiance, reflectance or temperature")
-          ->check(CLI::IsMember({"radiance", "reflectance", "temperature"}))
+          ->transform(OneOf({"radiance", "reflectance", "temperature"}))
           ->required();
       options->source.AddTo(app);
       options->target.AddTo(app, "The calibrated raster");
@@ -336,14 +366,18 @@ const VerbRegistration registration(
                   "Solar irradiance outside the atmosphere, in the unit of radiance (reflectance)");
       app.add_option("--sun-elevation", options->sunElevation,
                      "Of the sun above the horizon, in degrees (reflectance)")
-          ->type_name("DEG");
+          ->type_name("DEG")
+          ->transform(NumberWithUnit({"degrees", "degree", "deg", "\u00b0"}));
       app.add_option("--distance", options->distance,
                      "From the earth to the sun, in astronomical units (reflectance)")
-          ->type_name("AU");
+          ->type_name("AU")
+          ->transform(NumberWithUnit({"astronomical units", "au", "ua"}));
       AddConstant(app, "--k1", options->k1, "First thermal constant (temperature)");
       AddConstant(app, "--k2", options->k2, "Second thermal constant, in kelvins (temperature)");
       app.add_option("--scale", options->scale, "Factor on the result")->capture_default_str();
-      app.add_option("--type", options->type, "Pixel type of the result")->capture_default_str();
+      app.add_option("--type", options->type, "Pixel type of the result")
+          ->transform(PixelTypeName())
+          ->capture_default_str();
       options->job.AddTo(app);
       options->job.AddProgressTo(app);
       return VerbRegistration::Work([options] { return Calibrate(*options); });

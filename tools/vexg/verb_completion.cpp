@@ -3,6 +3,7 @@
 
 #include <CLI/CLI.hpp>
 
+#include "option_values.h"
 #include "verb.h"
 
 namespace lumo::host {
@@ -60,7 +61,7 @@ const VerbRegistration registration(
     "completion", "Prints a script with which a shell completes command lines", [](CLI::App& app) {
       const auto shell = std::make_shared<std::string>();
       app.footer("Example: eval \"$(vexg completion bash)\"\n");
-      app.add_option("shell", *shell, "The shell")->check(CLI::IsMember({"bash"}))->required();
+      app.add_option("shell", *shell, "The shell")->transform(OneOf({"bash"}))->required();
       return VerbRegistration::Work([&app, shell] {
         std::cout << BashScript(*app.get_parent());
         return int{kExitSuccess};

@@ -5,9 +5,10 @@
 #include <fmt/format.h>
 
 #include "foundation/color.h"
+#include "keeping.h"
+#include "option_values.h"
 #include "palette_reading.h"
 #include "raster/pixel_types.h"
-#include "raster_target.h"
 #include "verb.h"
 
 namespace lumo::host {
@@ -54,7 +55,9 @@ constexpr const char* kCopyStep = "copy";
 
 /// The copying as a whole: opens the source, stands views on it, makes the copy and closes all.
 /// @param target  the file to make.
-JobDraft MakeDraft(const Options& options, const Plan& plan, const std::string& target) {
+/// @param noData  of bands, in the place of pixels that are not valid.
+JobDraft MakeDraft(const Options& options, const Plan& plan, const std::string& target,
+                   const FillValues& noData) {
   JobDraft draft;
   AddOpen(draft, "source", options.source);
   std::vector<String> opened{"$source"};
@@ -62,6 +65,7 @@ JobDraft MakeDraft(const Options& options, const Plan& plan, const std::string& 
     JobWriterCommand& view = draft.Open("part", "CreateSpatialSubsetRasterCommand");
     view.AddVariableInput("SrcURI", opened.back());
     view.AddInput("SubRect", plan.rect);
+    view.AddInput("Placing", Form::kExact);
     opened.emplace_back("$part");
   }
   if (plan.choosesBands) {
@@ -70,7 +74,8 @@ JobDraft MakeDraft(const Options& options, const Plan& plan, const std::string& 
   }
   const String shown = opened.back();
   AddQuery(draft, "shown", shown);
-  JobWriterCommand& create = AddCreate(draft, {target, plan.format}, shown);
+  AddDetailsQuery(draft, "shown", shown);
+  JobWriterCommand& create = AddCreate(draft, {target, plan.format}, shown, "All", noData);
   if (!options.interleave.empty()) {
     create.AddInput("Interleave", ParseInterleave(options.interleave));
   }
@@ -84,6 +89,7 @@ JobDraft MakeDraft(const Options& options, const Plan& plan, const std::string& 
   JobWriterCommand& copy = draft.Step(kCopyStep, "CopyRasterCommand");
   copy.AddVariableInput("SrcURI", shown);
   copy.AddVariableInput("DstURI", "$target");
+  copy.AddInput("Invalid", String(noData.empty() ? "Told" : "NoData"));
   AddCloseTarget(draft);
   for (auto raster = opened.rbegin(); raster != opened.rend(); ++raster) {
     draft.Close("close." + raster->ToUTF8().substr(1), *raster);
@@ -91,38 +97,21 @@ JobDraft MakeDraft(const Options& options, const Plan& plan, const std::string& 
   return draft;
 }
 
-bool SameNoData(const RasterInfo& a, const RasterInfo& b) {
-  for (unsigned band = 0; band < a.bands; ++band) {
-    if (a.hasNoData[band] != b.hasNoData[band]) return false;
-  }
-  const auto values = ParseValue<Array<double>>(a.noData);
-  const auto others = ParseValue<Array<double>>(b.noData);
-  for (unsigned band = 0; band < a.bands; ++band) {
-    if (!a.hasNoData[band] || band >= values.GetCount() || band >= others.GetCount()) continue;
-    const bool bothNaN = values[band] != values[band] && others[band] != others[band];
-    if (values[band] != others[band] && !bothNaN) return false;
-  }
-  return true;
-}
-
-/// Opens the copy and looks at it: throws when it is another raster, and says what the format did
-/// not keep.
-void CheckCopy(JobSession& session, const Options& options, const Plan& plan,
-               const OutputFile& output, const RasterInfo& wanted) {
-  const RasterInfo made =
-      CheckMade(session, {output.GetWorkName(), plan.format}, output.GetShownName(), wanted);
-  const auto note = [&](const std::string& what) {
-    Say(output.GetShownName() + ": note: the format " + plan.format + " does not keep " + what);
-  };
-  if (!SameNoData(wanted, made)) note("the no-data values as they are");
-  if (wanted.geoRef && !wanted.geoRef->IsEqual(made.geoRef)) note("the geo-reference as it is");
+/// Adds what the format did not keep to the losses.
+void CompareCopy(const Options& options, const Plan& plan, const MadeRaster& raster,
+                 Losses& losses) {
+  CompareKept(raster, losses);
+  const RasterInfo& made = raster.made.info;
   for (const BandPalette& entry : plan.palettes) {
-    if (!made.hasPalette[entry.band]) note("the palette of band " + std::to_string(entry.band));
+    if (!made.hasPalette[entry.band]) {
+      losses.Add("the palette of band " + std::to_string(entry.band));
+    }
   }
   const bool ordered = !options.interleave.empty() && made.bands > 1;
   if (ordered && made.interleave != ParseInterleave(options.interleave)) {
-    note("the order " + options.interleave);
+    losses.Add("the order " + options.interleave);
   }
+  if (plan.format == "JPEG") losses.Add("the values of pixels exactly");
 }
 
 Plan MakePlan(JobSession& session, const Options& options, const String& raster,
@@ -145,16 +134,24 @@ Plan MakePlan(JobSession& session, const Options& options, const String& raster,
 /// Makes the copy in the output's folder. Throws what went wrong.
 void MakeCopy(JobSession& session, const Options& options, const Plan& plan,
               const OutputFile& output) {
-  const JobDraft draft = MakeDraft(options, plan, output.GetWorkName());
-  JobResults results;
-  {
-    const ProgressView view(ProgressOfStep(session, draft, kCopyStep),
-                            options.job.GetProgressStyle());
-    results = session.Run(draft);
-  }
-  CheckClosed(results);
-  CheckCopy(session, options, plan, output, ReadInfo(results, "shown"));
+  Losses losses(output.GetShownName(), plan.format, options.target.strict);
+  const MadeRaster raster = MakeKept(
+      session, {output.GetWorkName(), plan.format}, losses, true, [&](const FillValues& noData) {
+        const JobDraft draft = MakeDraft(options, plan, output.GetWorkName(), noData);
+        JobResults results;
+        {
+          const ProgressView view(ProgressOfStep(session, draft, kCopyStep),
+                                  options.job.GetProgressStyle());
+          results = session.Run(draft);
+        }
+        CheckClosed(results);
+        RasterContents put = ReadContents(results, "shown");
+        put.valid = ReadValidPixels(results, kCopyStep);
+        return put;
+      });
+  CompareCopy(options, plan, raster, losses);
   session.CheckInterrupt();
+  losses.Settle();
 }
 
 int Copy(const Options& options) {
@@ -170,7 +167,7 @@ int Copy(const Options& options) {
   const RasterInfo info = ReadInfo(opened, "source");
   const Plan plan = MakePlan(session, options, raster, info);
   if (options.job.printJob) {
-    std::cout << MakeDraft(options, plan, output.GetName()).Write().ToUTF8() << '\n';
+    std::cout << MakeDraft(options, plan, output.GetName(), {}).Write().ToUTF8() << '\n';
     return kExitSuccess;
   }
   output.Begin(BytesInFile(plan.format, info.dataType, plan.rect.Width(), plan.rect.Height(),
@@ -188,8 +185,10 @@ const VerbRegistration registration(
     "copy", "Copies a raster into a new file, of the same or another format", [](CLI::App& app) {
       const auto options = std::make_shared<Options>();
       app.footer(
-          "The copy keeps pixel type, no-data values, geo-reference and palettes, as far as its "
-          "format can; what it can't is said.\n"
+          "The copy keeps which pixels are valid, pixel type, no-data values, geo-reference, "
+          "palettes, names, units and scales of bands and metadata items, as far as its format "
+          "can; "
+          "what it can't is said, and with --strict a failure.\n"
           "Example: vexg copy scene.tif part.dat --format ORVA --rect 0,0,99,49 --bands 2,1,0\n");
       options->source.AddTo(app);
       options->target.AddTo(app, "The copy");
@@ -199,9 +198,10 @@ const VerbRegistration registration(
       app.add_option("--bands", options->bands, "Bands in the order wanted, from 0; all by default")
           ->type_name("B,B…");
       app.add_option("--interleave", options->interleave, "Order of the pixels in the copy")
-          ->check(CLI::IsMember({"bip", "bil", "bsq"}));
+          ->transform(OneOf({"bip", "bil", "bsq"}));
       app.add_option("--type", options->type, "Pixel type that the source has to have")
-          ->type_name("TYPE");
+          ->type_name("TYPE")
+          ->transform(PixelTypeName());
       options->job.AddTo(app);
       options->job.AddProgressTo(app);
       return VerbRegistration::Work([options] { return Copy(*options); });

@@ -5,6 +5,7 @@
 
 #include "command_text.h"
 #include "commands/command.h"
+#include "foundation/near_name.h"
 #include "verb.h"
 
 namespace lumo::host {
@@ -23,7 +24,14 @@ int Help(CLI::App& app, const std::string& name) {
   const auto verbs = app.get_parent()->get_subcommands(
       [&](const CLI::App* verb) { return verb->get_name() == name; });
   if (verbs.empty()) {
-    throw HostError(kExitUsage, "there is no command \"" + name + "\"; see vexg commands");
+    std::vector<std::string> known;
+    for (const auto& entry : GetCommandRegistry()) known.push_back(entry.first.ToUTF8());
+    for (const CLI::App* verb :
+         app.get_parent()->get_subcommands([](const CLI::App*) { return true; })) {
+      known.push_back(verb->get_name());
+    }
+    throw HostError(kExitUsage, "there is no command \"" + name + "\"" + DidYouMean(name, known) +
+                                    "; see vexg commands");
   }
   std::cout << verbs.front()->help(app.get_parent()->get_name());
   return kExitSuccess;

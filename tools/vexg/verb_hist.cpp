@@ -8,10 +8,14 @@
 #include <CLI/CLI.hpp>
 #include <fmt/format.h>
 
+#include "foundation/near_name.h"
 #include "histogram_plot.h"
 #include "json_number.h"
+#include "picture_writer.h"
 #include "raster/band_values.h"
 #include "raster_target.h"
+#include "stats/raster_histogram.h"
+#include "stats/turn.h"
 #include "verb.h"
 
 namespace lumo::host {
@@ -41,38 +45,41 @@ struct BandBins {
   unsigned band = 0;
   T lower{};
   T upper{};
-  double size = 1;
+  unsigned askedCount = 0;  ///< how many bins are asked for; 0: bins of the size
+  double size = 0;
   std::vector<std::uint64_t> counts;
 
   bool HasBinsOf(const BandBins& other) const {
-    return lower == other.lower && upper == other.upper && size == other.size;
+    return lower == other.lower && upper == other.upper && size == other.size &&
+           askedCount == other.askedCount;
   }
 };
 
-/// A bound of the command line as a pixel value.
+/// A bound of the command line as a pixel value; the nearest one for a bound beyond them all.
 template <typename T>
 T BoundAs(double value, const char* option) {
-  if constexpr (std::is_floating_point_v<T>) {
-    if (std::isfinite(value) && std::isfinite(static_cast<T>(value))) return static_cast<T>(value);
-  } else {
-    const bool fits = value >= static_cast<double>(std::numeric_limits<T>::min()) &&
-                      value <= static_cast<double>(std::numeric_limits<T>::max());
-    if (fits && std::trunc(value) == value) return static_cast<T>(value);
+  if (value <= static_cast<double>(std::numeric_limits<T>::lowest())) {
+    return std::numeric_limits<T>::lowest();
   }
+  if (value >= static_cast<double>(std::numeric_limits<T>::max())) {
+    return std::numeric_limits<T>::max();
+  }
+  const bool isWhole = std::trunc(value) == value;
+  if (!std::isnan(value) && (std::is_floating_point_v<T> || isWhole)) return static_cast<T>(value);
   throw HostError(kExitUsage, fmt::format("{}: the pixels can't be {}", option, value));
 }
 
-/// The bin size that holds both bounds in `bins` bins at most. Whole numbers get bins of whole
-/// numbers.
+/// How many values lie between two bounds, both counted; of whole numbers.
 template <typename T>
-double SizeOf(T lower, T upper, unsigned bins) {
-  double span = static_cast<double>(upper) - static_cast<double>(lower);
-  if constexpr (std::is_integral_v<T>) return std::ceil((span + 1) / bins);
-  if (!(span > 0)) return 1.0;
-  span = std::max(span, static_cast<double>(upper - lower));  // the larger of both roundings
-  double size = span / bins;
-  while (std::trunc(span / size) + 1 > bins) size = std::nextafter(size, HUGE_VAL);
-  return size;
+double ValuesBetween(T lower, T upper) {
+  return static_cast<double>(upper) - static_cast<double>(lower) + 1;
+}
+
+template <typename T>
+Array<T> ArrayOfOne(T value) {
+  Array<T> array{ArrayDims(1)};
+  array[0] = value;
+  return array;
 }
 
 template <typename T>
@@ -107,6 +114,12 @@ class HistogramJob {
 
  private:
   std::vector<BandBins<T>> ChooseBins() {
+    const bool isBeyond =
+        options_.lower.value_or(0) > static_cast<double>(std::numeric_limits<T>::max()) ||
+        options_.upper.value_or(0) < static_cast<double>(std::numeric_limits<T>::lowest());
+    if (isBeyond) {
+      throw HostError(kExitUsage, "between the bounds there is no value that the pixels can have");
+    }
     Array<T> lowest{bands_.GetDims()}, highest{bands_.GetDims()};
     constexpr bool kIsByte = sizeof(T) == 1;
     if (!kIsByte && !(options_.lower && options_.upper)) ReadExtremes(lowest, highest);
@@ -123,19 +136,35 @@ class HistogramJob {
                                                 "one, {}",
                                                 bins.band, bins.lower, bins.upper));
       }
-      bins.size = options_.binSize
-                      ? *options_.binSize
-                      : SizeOf(bins.lower, bins.upper, options_.bins.value_or(kUsualBins));
-      CheckSize(bins);
+      ChooseSize(bins);
       all.push_back(bins);
     }
     return all;
   }
 
-  void CheckSize(const BandBins<T>& bins) const {
-    if (std::is_integral_v<T> && std::trunc(bins.size) != bins.size) {
-      throw HostError(kExitUsage, "--bin-size: bins of whole numbers have a whole size");
+  /// Bins of the size that is asked for, or as many as are; by default 256, or of whole numbers
+  /// those of the smallest whole size that makes no more.
+  void ChooseSize(BandBins<T>& bins) const {
+    constexpr bool kIsWhole = std::is_integral_v<T>;
+    if (options_.binSize) {
+      bins.size = *options_.binSize;
+      CheckSize(bins);
+      return;
     }
+    if (kIsWhole && !options_.bins) {
+      bins.size = std::ceil(ValuesBetween(bins.lower, bins.upper) / kUsualBins);
+      return;
+    }
+    bins.askedCount = options_.bins.value_or(kUsualBins);
+    if (kIsWhole && ValuesBetween(bins.lower, bins.upper) < bins.askedCount) {
+      bins.askedCount = static_cast<unsigned>(ValuesBetween(bins.lower, bins.upper));
+    }
+    bins.size = RasterHistogram<T>(1, ArrayOfOne(bins.askedCount), ArrayOfOne(bins.lower),
+                                   ArrayOfOne(bins.upper), HistogramSign::kBoth, Form::kExact)
+                    .BinSize(0);
+  }
+
+  void CheckSize(const BandBins<T>& bins) const {
     const double span = static_cast<double>(bins.upper) - static_cast<double>(bins.lower);
     if (span / bins.size >= kMostBins) {
       throw HostError(kExitUsage, fmt::format("--bin-size: from {} to {} there would be more than "
@@ -148,7 +177,9 @@ class HistogramJob {
   void ReadExtremes(Array<T>& lowest, Array<T>& highest) {
     JobDraft draft;
     AddBandView(draft, "bands", raster_, bands_);
-    draft.Step(kStatsStep, "GetBasicRasterStatsCommand").AddVariableInput("URI", "$bands");
+    JobWriterCommand& stats = draft.Step(kStatsStep, "GetBasicRasterStatsCommand");
+    stats.AddVariableInput("URI", "$bands");
+    stats.AddInput("Wait", Waiting::kAlways);
     draft.Close("close.bands", "$bands");
     const ProgressView view(ProgressOfStep(session_, draft, kStatsStep),
                             options_.job.GetProgressStyle());
@@ -182,8 +213,14 @@ class HistogramJob {
       count.AddInput("URI", raster);
       count.AddInput("LowerBound", bands[i].lower);
       count.AddInput("UpperBound", bands[i].upper);
-      count.AddInput("BinSize", bands[i].size);
+      if (bands[i].askedCount != 0) {
+        count.AddInput("BinCount", bands[i].askedCount);
+      } else {
+        count.AddInput("BinSize", bands[i].size);
+      }
       count.AddInput("Bands", list);
+      count.AddInput("Bins", Form::kExact);
+      count.AddInput("Wait", Waiting::kAlways);
     }
     for (const BandBins<T>& bins : bands) {
       Array<unsigned> band{ArrayDims(1)};
@@ -191,8 +228,12 @@ class HistogramJob {
       JobWriterCommand& get = draft.Step(NameOf(bins), "GetRasterHistogramCommand");
       get.AddInput("URI", raster);
       get.AddInput("Bands", band);
+      get.AddInput("Wait", Waiting::kAlways);
     }
-    if (options_.save) draft.Step("save", "SaveRasterHistogramCommand").AddInput("URI", raster);
+    if (!options_.save) return;
+    JobWriterCommand& save = draft.Step("save", "SaveRasterHistogramCommand");
+    save.AddInput("URI", raster);
+    save.AddInput("Wait", Waiting::kAlways);
   }
 
   JobDraft MakeDraft(const std::vector<BandBins<T>>& bands) const {
@@ -210,23 +251,26 @@ class HistogramJob {
     return draft;
   }
 
-  /// A raster may have more histograms than those asked for.
+  /// A raster may have more histograms than those asked for. One that was stored may have the same
+  /// bounds and sizes, and bins of the told form; the one that was counted comes last.
   void TakeCounts(const JobResults& results, std::vector<BandBins<T>>& bands) const {
     for (BandBins<T>& bins : bands) {
       const auto found = ParseValue<Array<RasterBandHistogram<T>>>(
           results.Find(String(NameOf(bins))).returns.Find("Histograms"));
+      const RasterBandHistogram<T>* chosen = nullptr;
       for (const RasterBandHistogram<T>& histogram : found) {
-        if (histogram.band != bins.band || histogram.sign != HistogramSign::kBoth ||
-            histogram.min != bins.lower || histogram.max != bins.upper ||
-            histogram.binSize != bins.size) {
-          continue;
-        }
-        bins.counts.assign(histogram.counts.begin(), histogram.counts.end());
-        break;
+        const bool isAskedFor = histogram.band == bins.band &&
+                                histogram.sign == HistogramSign::kBoth &&
+                                histogram.min == bins.lower && histogram.max == bins.upper &&
+                                histogram.binSize == bins.size;
+        const bool isBetter = chosen == nullptr || histogram.source == StatsSource::kDynamic;
+        if (isAskedFor && isBetter) chosen = &histogram;
       }
-      if (!bins.counts.empty()) continue;
-      throw HostError(kExitFailed, fmt::format("{}: there is no histogram of band {}",
-                                               options_.source.file, bins.band));
+      if (chosen == nullptr) {
+        throw HostError(kExitFailed, fmt::format("{}: there is no histogram of band {}",
+                                                 options_.source.file, bins.band));
+      }
+      bins.counts.assign(chosen->counts.begin(), chosen->counts.end());
     }
   }
 
@@ -243,7 +287,7 @@ class HistogramJob {
   }
 
   std::string AsText(const std::vector<BandBins<T>>& bands) const {
-    std::string text = options_.source.file + "\n";
+    std::string text = Printable(options_.source.file) + "\n";
     for (const BandBins<T>& bins : bands) {
       const std::uint64_t counted =
           std::accumulate(bins.counts.begin(), bins.counts.end(), std::uint64_t{0});
@@ -285,6 +329,7 @@ int Hist(const Options& options) {
   }
   std::optional<OutputFile> output;
   if (!options.output.empty()) {
+    CheckPictureName(options.output);
     output.emplace(options.output, options.overwrite, std::vector{options.source.file});
   }
   JobSession session(options.job);
@@ -311,7 +356,10 @@ const VerbRegistration registration(
       app.footer(
           "Without bounds, the bins reach from the smallest to the largest value of each band, or "
           "over all values of an 8-bit type; there are 256, or fewer where whole numbers fill "
-          "fewer bins of one whole size. Values outside the bounds do not count. With --json: "
+          "fewer bins of one whole size. Every value within the bounds is in one bin; the last bin "
+          "holds the upper bound too. Values outside the bounds do not count; bounds that the "
+          "pixels "
+          "can't reach are limited to what they can. With --json: "
           "\"file\" and \"bands\", a list of objects with \"band\", \"min\", \"max\", \"binSize\" "
           "and \"counts\". -o draws them.\n"
           "Example: vexg hist scene.tif --bands 0,1,2 -o scene-histogram.png\n");
@@ -319,11 +367,11 @@ const VerbRegistration registration(
       app.add_option("--bands", options->bands, "Bands, from 0; all by default")->type_name("B,B…");
       app.add_option("--lower", options->lower, "Smallest value that counts")->type_name("VALUE");
       app.add_option("--upper", options->upper, "Largest value that counts")->type_name("VALUE");
-      app.add_option("--bins", options->bins, "How many bins at most")
+      app.add_option("--bins", options->bins, "How many bins; no more than there are whole numbers")
           ->check(CLI::Range(1U, kMostBins));
       app.add_option("--bin-size", options->binSize, "Width of a bin")->type_name("SIZE");
-      app.add_option("-o,--output", options->output, "A picture of the histograms")
-          ->type_name("OUT.png");
+      app.add_option("-o,--output", options->output, "A picture of the histograms, a PNG or JPEG")
+          ->type_name("OUT.png|jpg");
       app.add_flag("--overwrite", options->overwrite, "Replace a picture that is there");
       app.add_flag("--save", options->save, "Store the histograms with the raster");
       app.add_flag("--json", options->json, "As JSON");

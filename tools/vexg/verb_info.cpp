@@ -5,6 +5,7 @@
 #include <CLI/CLI.hpp>
 #include <fmt/format.h>
 
+#include "foundation/near_name.h"
 #include "json_number.h"
 #include "raster_source.h"
 #include "verb.h"
@@ -19,6 +20,16 @@ struct Options {
   bool json = false;
 };
 
+/// A no-data value, which may be NaN or infinite: these are words, since null says that there is
+/// none.
+template <typename T>
+Json NoDataValueAsJson(const T& value) {
+  if constexpr (std::is_floating_point_v<T>) {
+    if (!std::isfinite(value)) return FormatValue(value).ToUTF8();
+  }
+  return NumberAsJson(value);
+}
+
 /// For each band its no-data value, or null.
 Json NoDataAsJson(const RasterInfo& info) {
   Json list = Json::array();
@@ -26,7 +37,7 @@ Json NoDataAsJson(const RasterInfo& info) {
     const auto values = ParseValue<Array<T>>(info.noData);
     for (unsigned band = 0; band < info.bands; ++band) {
       const bool has = info.hasNoData[band] && band < values.GetCount();
-      list.push_back(has ? NumberAsJson(values[band]) : Json());
+      list.push_back(has ? NoDataValueAsJson(values[band]) : Json());
     }
     return true;
   });
@@ -169,7 +180,7 @@ std::string GeoRefAsText(const RasterInfo& info) {
 }
 
 std::string AsText(const std::string& file, const RasterInfo& info) {
-  std::string text = fmt::format("{}\n", file);
+  std::string text = fmt::format("{}\n", Printable(file));
   text += fmt::format("  format         {}\n", info.format.ToUTF8());
   text += fmt::format("  size           {} samples, {} lines, {} bands\n", info.samples, info.lines,
                       info.bands);
@@ -193,7 +204,9 @@ JobDraft MakeDraft(const SourceOptions& source) {
 
 int PrintJobs(const Options& options) {
   for (const std::string& file : options.files) {
-    std::cout << MakeDraft({file, options.source.format}).Write().ToUTF8() << '\n';
+    std::cout
+        << MakeDraft({file, options.source.format, options.source.subdataset}).Write().ToUTF8()
+        << '\n';
   }
   return kExitSuccess;
 }
@@ -207,7 +220,8 @@ int Info(const Options& options) {
   for (const std::string& file : options.files) {
     try {
       const RasterInfo info =
-          ReadInfo(session.Run(MakeDraft({file, options.source.format})), "raster");
+          ReadInfo(session.Run(MakeDraft({file, options.source.format, options.source.subdataset})),
+                   "raster");
       if (options.json) {
         all.push_back(AsJson(file, info));
       } else {

@@ -4,6 +4,7 @@
 #include <CLI/CLI.hpp>
 #include <fmt/format.h>
 
+#include "foundation/near_name.h"
 #include "json_number.h"
 #include "metadata/metadata_types.h"
 #include "metadata_source.h"
@@ -102,14 +103,16 @@ std::vector<Value> ReadValues(JobSession& session, const String& uri,
   return values;
 }
 
+/// @param isJson  what no number of JSON can be becomes null; otherwise its word.
 template <typename T>
-Json ElementAsJson(const T& element) {
+Json ElementAsJson(const T& element, bool isJson) {
   if constexpr (std::is_same_v<T, String>) {
     return element.ToUTF8();
-  } else if constexpr (std::is_same_v<T, float>) {
-    // The digits that tell the float apart, not those of the double nearest to it.
-    return std::isfinite(element) ? Json::parse(FormatValue(element).ToUTF8())
-                                  : NumberAsJson(element);
+  } else if constexpr (std::is_floating_point_v<T>) {
+    if (!std::isfinite(element)) return isJson ? Json() : Json(FormatValue(element).ToUTF8());
+    // The digits that tell a float apart, not those of the double nearest to it.
+    return std::is_same_v<T, float> ? Json::parse(FormatValue(element).ToUTF8())
+                                    : NumberAsJson(element);
   } else {
     return NumberAsJson(element);
   }
@@ -117,7 +120,7 @@ Json ElementAsJson(const T& element) {
 
 /// Elements as a list, of rows as a list of lists.
 template <typename T>
-Json ArrayAsJson(const Value& value) {
+Json ArrayAsJson(const Value& value, bool isJson) {
   const auto elements = ParseValue<Array<T>>(value.text);
   if (elements.GetCount() != value.size) {
     Say(value.path + ": a text holds |, so the texts of this list can't be told apart");
@@ -128,16 +131,17 @@ Json ArrayAsJson(const Value& value) {
     const bool startsRow =
         value.columns != 0 && (list.empty() || list.back().size() == value.columns);
     if (startsRow) list.push_back(Json::array());
-    (value.columns != 0 ? list.back() : list).push_back(ElementAsJson(element));
+    (value.columns != 0 ? list.back() : list).push_back(ElementAsJson(element, isJson));
   }
   return list;
 }
 
-Json AsJson(const Value& value) {
+Json AsJson(const Value& value, bool isJson) {
   Json json = value.text.ToUTF8();
   DispatchMetadataType(value.type, [&]<typename T>() {
     const bool isSingle = value.size == 1 && value.columns == 0;
-    json = isSingle ? ElementAsJson(ParseValue<T>(value.text)) : ArrayAsJson<T>(value);
+    json =
+        isSingle ? ElementAsJson(ParseValue<T>(value.text), isJson) : ArrayAsJson<T>(value, isJson);
     return true;
   });
   return json;
@@ -169,7 +173,7 @@ int PrintMetadata(const Options& options) {
   constexpr std::size_t kWidest = 48;  // longer paths push their values to the right
   std::size_t width = 0;
   for (const Value& value : ReadValues(session, uri, ReadPaths(options, results))) {
-    values[value.path] = AsJson(value);
+    values[value.path] = AsJson(value, options.json);
     width = std::max(width, std::min(value.path.size(), kWidest));
   }
   if (options.json) {
@@ -178,7 +182,7 @@ int PrintMetadata(const Options& options) {
     return kExitSuccess;
   }
   for (const auto& [path, value] : values.items()) {
-    std::cout << fmt::format("{:<{}}  {}\n", path, width, AsText(value));
+    std::cout << fmt::format("{:<{}}  {}\n", Printable(path), width, Printable(AsText(value)));
   }
   return kExitSuccess;
 }

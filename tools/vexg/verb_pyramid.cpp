@@ -9,8 +9,10 @@
 
 #include "data/format_table.h"
 #include "json_number.h"
+#include "option_values.h"
 #include "raster_target.h"
 #include "verb.h"
+#include "views/catalog_raster_ref.h"
 
 namespace lumo::host {
 namespace {
@@ -29,7 +31,7 @@ struct Options {
 
   bool IsDriver() const { return type == "DRIVER"; }
   std::string PyramidPath() const {
-    return output.empty() ? PyramidPathOf(source.file) : AbsoluteName(output);
+    return output.empty() ? PyramidPathOf(FileOf(source)) : AbsoluteName(output);
   }
 };
 
@@ -73,6 +75,7 @@ Array<String> PyramidStrings(const Options& options) {
 JobDraft OpenToBuild(const Options& options) {
   JobDraft draft;
   JobWriterCommand& open = draft.Open("raster", "OpenRasterCommand");
+  open.AddInput("CheckSource", SourceCheck::kCompared);
   open.AddInput("ConnStr", ConnStringsOf(options.source));
   open.AddInput("PyramidConnStr", PyramidStrings(options));
   if (!options.IsDriver()) open.AddInput("PyramidNew", true);
@@ -88,6 +91,7 @@ void AddBuild(JobDraft& draft, const Options& options, const String& raster, con
   build.AddInput("PyramidLevelMax", levels.last);
   build.AddInput("PyramidCanBuild", true);
   build.AddInput("TileDimensions", TileDimensions{options.side, options.side});
+  build.AddInput("Bins", Form::kExact);
 }
 
 int Build(const Options& options) {
@@ -117,10 +121,11 @@ int Build(const Options& options) {
 /// Opens the raster with the pyramid that the options name, or that lies beside it.
 void AddOpenToLook(JobDraft& draft, const Options& options) {
   if (options.output.empty() && !options.IsDriver()) {
-    AddOpenWithPyramid(draft, "raster", options.source);
+    AddOpenWithPyramid(draft, "raster", options.source, "Told");
     return;
   }
   JobWriterCommand& open = draft.Open("raster", "OpenRasterCommand");
+  open.AddInput("CheckSource", SourceCheck::kCompared);
   open.AddInput("ConnStr", ConnStringsOf(options.source));
   if (!options.IsDriver()) open.AddInput("PyramidConnStr", PyramidStrings(options));
 }
@@ -202,6 +207,7 @@ int Delete(const Options& options) {
                       std::filesystem::exists(options.PyramidPath());
   JobDraft draft;
   JobWriterCommand& open = draft.Open("raster", "OpenRasterCommand");
+  open.AddInput("CheckSource", SourceCheck::kCompared);
   if (isFile && !options.IsDriver()) {
     open.AddInput("ConnStr", ConnStrings({"Pyramid", String(options.PyramidPath())}));
   } else {
@@ -236,24 +242,24 @@ const VerbRegistration registration(
           "Example: vexg pyramid build scene.tif --levels 1-5\n");
       app.add_option("action", options->action, "build, info or delete")
           ->type_name("ACTION")
-          ->check(CLI::IsMember({"build", "info", "delete"}))
+          ->transform(OneOf({"build", "info", "delete"}))
           ->required();
       options->source.AddTo(app);
       app.add_option("--levels", options->levels,
                      "First and last level; by default from 1 to that smaller than 512 pixels")
           ->type_name("A-B");
       app.add_option("--type", options->type, "Who keeps the pyramid; ORVA by default")
-          ->check(CLI::IsMember({"ORVA", "DRIVER"}));
+          ->transform(OneOf({"ORVA", "DRIVER"}));
       app.add_option("--output", options->output, "The pyramid file; FILE.pyr by default")
           ->type_name("PATH");
       app.add_option("--method", options->method, "How a driver reduces pixels")
-          ->check(CLI::IsMember({"Nearest", "Linear", "Cubic", "Majority"}))
+          ->transform(OneOf({"Nearest", "Linear", "Cubic", "Majority"}))
           ->capture_default_str();
       app.add_option("--tile", options->side, "Side of the squares that levels are stored in")
           ->check(CLI::Range(1U, 2048U))
           ->capture_default_str();
       app.add_option("--compression", options->compression, "Of a pyramid file; LZ4 by default")
-          ->check(CLI::IsMember({"LZ4", "NONE"}));
+          ->transform(OneOf({"LZ4", "NONE"}));
       app.add_flag("--json", options->json, "info as JSON");
       options->job.AddTo(app);
       options->job.AddProgressTo(app);

@@ -9,7 +9,7 @@
 #include "block_reader.h"
 #include "output_file.h"
 #include "palette_reading.h"
-#include "png_writer.h"
+#include "picture_writer.h"
 #include "quicklook_picture.h"
 #include "verb.h"
 
@@ -99,16 +99,19 @@ void PrintJob(const Options& options, const Shown& shown, const Array<unsigned>&
   std::cout << draft.Write().ToUTF8() << '\n';
 }
 
-void WritePng(const OutputFile& output, const QuicklookPicture& picture,
-              const QuicklookPicture::Bytes& bytes) {
-  PngWriter png(output, picture.GetWidth(), picture.GetHeight(), bytes.channels, 8);
+void WritePicture(const OutputFile& output, const QuicklookPicture& picture,
+                  const QuicklookPicture::Bytes& bytes) {
+  const auto writer =
+      MakePictureWriter(output, picture.GetWidth(), picture.GetHeight(), bytes.channels);
   const std::size_t lineBytes = std::size_t{picture.GetWidth()} * bytes.channels;
-  for (std::size_t y = 0; y < picture.GetHeight(); ++y) png.WriteLine(&bytes.pixels[y * lineBytes]);
-  png.Close();
+  for (std::size_t y = 0; y < picture.GetHeight(); ++y)
+    writer->WriteLine(&bytes.pixels[y * lineBytes]);
+  writer->Close();
 }
 
 int Quicklook(const Options& options) {
   const QuicklookPicture::Stretch stretch = ParseStretch(options.stretch);
+  CheckPictureName(options.output);
   OutputFile output(options.output, options.overwrite, {options.source.file});
   JobSession session(options.job);
   const JobResults opened = session.Run(OpenDraft(options));
@@ -136,8 +139,9 @@ int Quicklook(const Options& options) {
       [&](const SubRect& block) { picture.Take(block, reader.GetPixels(), reader.GetStates()); });
   const bool inColors =
       bands.GetCount() == 1 && info.hasPalette[bands[0]] && options.stretch.empty();
-  WritePng(output, picture,
-           inColors ? picture.Draw(ReadPalette(session, raster, bands[0])) : picture.Draw(stretch));
+  WritePicture(
+      output, picture,
+      inColors ? picture.Draw(ReadPalette(session, raster, bands[0])) : picture.Draw(stretch));
   output.Commit();
   return kExitSuccess;
 }
@@ -147,11 +151,11 @@ const VerbRegistration registration(
       const auto options = std::make_shared<Options>();
       app.footer(
           "A band with a palette shows its colours, unless --stretch is given. Pixels without data "
-          "are transparent.\n"
+          "are transparent; in a JPEG white.\n"
           "Example: vexg quicklook scene.tif scene.png --bands 3,2,1 --stretch 1,99\n");
       options->source.AddTo(app);
-      app.add_option("output", options->output, "The picture, a PNG")
-          ->type_name("OUT.png")
+      app.add_option("output", options->output, "The picture, a PNG or JPEG as its name tells")
+          ->type_name("OUT.png|jpg")
           ->required();
       app.add_option("--bands", options->bands,
                      "One band, or red,green,blue; by default 2,1,0 of four bands or more, 0,1,2 "

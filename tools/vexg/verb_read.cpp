@@ -7,6 +7,7 @@
 
 #include "block_reader.h"
 #include "npy_writer.h"
+#include "option_values.h"
 #include "output_file.h"
 #include "png_writer.h"
 #include "raster/pixel_types.h"
@@ -170,6 +171,14 @@ class MaskOutput {
   std::optional<NpySink> sink_;
 };
 
+/// True when a mask or a region excludes some of the pixels that were read. What a no-data value
+/// says, the values say themselves.
+bool AnyExcluded(const unsigned char* states, std::uint64_t count) {
+  unsigned char any = 0;
+  for (std::uint64_t i = 0; i < count; ++i) any |= states[i];
+  return (any & (PixelValueState::Masked | PixelValueState::OutsideROI)) != 0;
+}
+
 int Read(const Options& options) {
   const bool isPng = EndsWith(options.output, ".png");
   if (!isPng && !EndsWith(options.output, ".npy")) {
@@ -195,14 +204,22 @@ int Read(const Options& options) {
   const String source =
       options.level == 0 ? raster : opened.Find("level").returns.Find("PyramidURI");
   BlockReader reader(session, source, request.info, options.source.file);
+  bool isExcluded = false;
   reader.ReadAll(blocks, request.bands, request.interleave, options.job.GetProgressStyle(),
                  [&](const SubRect& block) {
                    pixels->Write(block, reader.GetPixels());
                    mask.Write(block, reader.GetStates());
+                   const std::uint64_t count =
+                       std::uint64_t{block.Width()} * block.Height() * request.bands.GetCount();
+                   isExcluded = isExcluded || AnyExcluded(reader.GetStates(), count);
                  });
   pixels->Close();
   mask.Commit();
   output.Commit();
+  if (isExcluded && options.mask.empty()) {
+    Say(options.output +
+        ": note: a mask excludes some of these pixels; --mask OUT.npy tells which");
+  }
   return kExitSuccess;
 }
 
@@ -224,7 +241,7 @@ const VerbRegistration registration(
       app.add_option("--bands", options->bands, "Bands in the order wanted, from 0; all by default")
           ->type_name("B,B…");
       app.add_option("--interleave", options->interleave, "Order of the array")
-          ->check(CLI::IsMember({"bip", "bil", "bsq"}))
+          ->transform(OneOf({"bip", "bil", "bsq"}))
           ->capture_default_str();
       app.add_option("--mask", options->mask,
                      "A second array, of a byte for each value: 0 valid, else the sum of 1 no "

@@ -12,32 +12,27 @@
 namespace lumo::host {
 namespace {
 
-void SayWhyCommandsFailed(const Job& job) {
-  for (const CommandDescriptorPtr& descriptor : job.commands) {
-    const Command& command = *descriptor->command;
-    if (command.GetResult() != CommandResult::kFailed) continue;
-    const std::string reason = command.GetReason().ToUTF8();
-    Say("command \"" + descriptor->name.ToUTF8() + "\" (" + descriptor->id.ToUTF8() + ") failed" +
-        (reason.empty() ? "" : ": " + reason));
-  }
-}
-
 int RunJobFile(const JobOptions& options) {
   String text;
   const Document document = ReadJob(options, text);
   Output output(options.output);
   Job job;
   JobParser(job).Parse(text);
+  job.tellsReasons = true;
+  if (AsksForStrictChecks(document)) job.checks = JobChecks::kStrict;
+  const AbortFlagPtr abort = job.GetIPC().abort;
+  String result;
+  auto outcome = Outcome::kDone;
   {
-    const platform::InterruptWatch interrupts([&] { job.GetIPC().abort->Set(true); });
-    const ProgressView view(job.GetIPC().progress,
-                            ChooseProgressStyle(options.progress, options.quiet));
+    const platform::InterruptWatch interrupts([&] { abort->Set(true); }, output.IsStandardOutput());
+    ProgressView view(job.GetIPC().progress, ChooseProgressStyle(options.progress, options.quiet));
     RunJob(job);
+    result = JobResultWriter(job).Write();
+    outcome = OutcomeOf(result, abort->IsSet());
+    view.SetOutcome(outcome);
   }
-  SayWhyCommandsFailed(job);
-  const String result = JobResultWriter(job).Write();
-  WriteResult(result, options.json, output);
-  return ExitCodeOf(document, result);
+  WriteResult(document, result, options.json, output);
+  return ExitCodeAfter(outcome, ExitCodeOf(document, result));
 }
 
 const VerbRegistration registration(

@@ -1,13 +1,22 @@
 #include <algorithm>
+#include <cstdlib>
 #include <memory>
 
 #include <CLI/CLI.hpp>
 
+#include "commands/catalog_session.h"
+#include "commands/served_jobs.h"
 #include "commands/server.h"
 #include "data/access_policy.h"
+#include "data/format_table.h"
+#include "foundation/environment.h"
 #include "foundation/fault.h"
+#include "foundation/thread_roll.h"
+#include "option_values.h"
+#include "platform/file_fence.h"
 #include "platform/interrupt.h"
 #include "platform/message_pipe.h"
+#include "platform/module.h"
 #include "platform/pipe_listener.h"
 #include "platform/process.h"
 #include "server_options.h"
@@ -35,6 +44,7 @@ std::string WhyNot(platform::PipeFault fault, const std::string& name) {
 struct ServeOptions {
   std::string name = kDefaultServer;
   bool quiet = false;
+  bool shared = false;
   std::vector<std::string> roots;
   std::vector<std::string> allowed;
 
@@ -42,6 +52,36 @@ struct ServeOptions {
     return std::find(allowed.begin(), allowed.end(), what) != allowed.end();
   }
 };
+
+void AddVariable(std::vector<std::string>& paths, const char* name) {
+  if (const char* const value = std::getenv(name)) paths.emplace_back(value);
+}
+
+/// Has the kernel keep the server to the roots too: a library that opens a file by itself can't
+/// reach further then.
+void FenceIn(bool quiet) {
+  for (std::uint32_t row = 0; row < kFormatCount; ++row) LoadFormat(row);
+  TakeFault();  // of formats that have no plug-in here
+  const AccessPolicy policy = GetAccessPolicy();
+  const EnvironmentImpl& folders = GetGlobalEnvironmentImpl();
+  platform::FileFence fence;
+  fence.network = policy.network;
+  fence.writable = policy.roots;
+  fence.writable.push_back(folders.Find(Environment::kPeDirectory).ToUTF8());
+  AddVariable(fence.writable, "metadata_parse_log_dir");
+  fence.readable.push_back(platform::LibraryDirectory());
+  for (const ContextKey& key : {Environment::kBinDirectory, Environment::kXmlDirectory,
+                                Environment::kGdalDirectory, Environment::kMdfDirectory}) {
+    fence.readable.push_back(folders.Find(key).ToUTF8());
+  }
+  for (const char* const name : {"PROJ_DATA", "PROJ_LIB", "GDAL_DATA", "GDAL_DRIVER_PATH"}) {
+    AddVariable(fence.readable, name);
+  }
+  std::string fault;
+  if (!platform::RaiseFileFence(fence, fault) && !quiet) {
+    Say("--root is kept by the server alone, not by the kernel: " + fault);
+  }
+}
 
 /// Keeps the jobs of clients to what the user named.
 void LimitAccess(const ServeOptions& options) {
@@ -51,19 +91,25 @@ void LimitAccess(const ServeOptions& options) {
   policy.virtualFiles = options.Allows("virtual");
   policy.memory = options.Allows("memory");
   policy.indirect = options.Allows("indirect");
-  if (SetAccessPolicy(policy)) return;
-  throw HostError(kExitUsage, "--root: " + TakeFault().ToUTF8());
+  policy.special = options.Allows("special");
+  if (!SetAccessPolicy(policy)) {
+    throw HostError(kExitUsage, "--root: " + TakeFault().ToUTF8());
+  }
+  if (!policy.roots.empty()) FenceIn(options.quiet);
 }
 
 int Serve(const ServeOptions& options) {
+  constexpr double kPatience = 5.0;  // s, for threads that are on their way out
   const std::string& name = options.name;
   LimitAccess(options);
   platform::RaiseDescriptorLimit();
   auto& dispatch = dynamic_cast<PipeServerDispatch&>(GetServerDispatch(String(name)));
+  dispatch.SetReleaseOnQuit(!options.shared);
+  bool allGone = false;
   {
     const platform::InterruptWatch interrupts([&] {
       dispatch.EndNow();
-      AbortServedJobs();
+      ServedJobs::Get().AbortFromNowOn();
     });
     if (!dispatch.Open() && !dispatch.StopRequested()) {
       throw HostError(kExitFailed, WhyNot(dispatch.GetFault(), name));
@@ -71,9 +117,14 @@ int Serve(const ServeOptions& options) {
     if (!options.quiet)
       Say("serving \"" + name + "\"; end it with vexg stop " + name + " or Ctrl-C");
     dispatch.Run();
-    WaitServedJobs();
+    // No new messages, then no jobs, then no clients; only then can what they have opened go.
+    EndServers();
+    for (const String& fault : catalog::Empty()) Say(fault.ToUTF8());
+    allGone = JoinThreads(kPatience);
   }
   platform::RemoveOwnPipes();
+  // A thread that hangs in a source has no part in the end: the process ends around it.
+  if (!allGone) platform::EndProcess(kExitSuccess);
   return kExitSuccess;
 }
 
@@ -86,6 +137,9 @@ const VerbRegistration registration(
           "Example: vexg serve --root /data/scenes --root /data/results\n");
       app.add_option("name", options->name, "Name of the server")->capture_default_str();
       app.add_flag("-q,--quiet", options->quiet, "Say nothing at the start");
+      app.add_flag(
+          "--shared", options->shared,
+          "What a client opened stays open when it goes, for other clients to use and close");
       app.add_option("--root", options->roots,
                      "A folder in which jobs open and make files; may come again; all folders when "
                      "absent")
@@ -93,10 +147,10 @@ const VerbRegistration registration(
           ->allow_extra_args(false);
       app.add_option("--allow", options->allowed,
                      "What jobs may use beside plain files: network, virtual (files inside other "
-                     "files), memory (addresses), indirect (formats whose files name other files); "
-                     "may come again")
+                     "files), memory (addresses), indirect (formats whose files name other files), "
+                     "special (devices and pipes); may come again")
           ->type_name("WHAT")
-          ->check(CLI::IsMember({"network", "virtual", "memory", "indirect"}))
+          ->transform(OneOf({"network", "virtual", "memory", "indirect", "special"}))
           ->allow_extra_args(false);
       return VerbRegistration::Work([options] { return Serve(*options); });
     });

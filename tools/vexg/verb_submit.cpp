@@ -26,17 +26,21 @@ int SubmitJobFile(const JobOptions& options, const ServerOptions& server) {
   Document document = ReadJob(options, text);
   Output output(options.output);
   JobChannel channel = ChannelOf(document);
+  document.GetRoot().AddChild("Reasons");
+  if (AsksForStrictChecks(document)) document.GetRoot().attributes["Checks"] = "Strict";
   ServerLink link(server);
   String result;
+  auto outcome = Outcome::kDone;
   {
-    const platform::InterruptWatch interrupts([&] { channel.Abort(); });
+    const platform::InterruptWatch interrupts([&] { channel.Abort(); }, output.IsStandardOutput());
     link.Connect();
-    const ProgressView view(channel.GetProgress(),
-                            ChooseProgressStyle(options.progress, options.quiet));
+    ProgressView view(channel.GetProgress(), ChooseProgressStyle(options.progress, options.quiet));
     result = link.Run(document.Write());
+    outcome = OutcomeOf(result, channel.IsAborted());
+    view.SetOutcome(outcome);
   }
-  WriteResult(result, options.json, output);
-  return ExitCodeOf(document, result);
+  WriteResult(document, result, options.json, output);
+  return ExitCodeAfter(outcome, ExitCodeOf(document, result));
 }
 
 const VerbRegistration registration(

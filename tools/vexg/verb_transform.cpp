@@ -11,7 +11,9 @@
 #include <CLI/CLI.hpp>
 #include <fmt/format.h>
 
+#include "georef/affine_link.h"
 #include "georef/std_georef.h"
+#include "option_values.h"
 #include "raster_source.h"
 #include "verb.h"
 
@@ -103,7 +105,7 @@ class RasterCarrier final : public Carrier {
 
   void Carry(Array<double>& points) const override {
     if (inverse_) {
-      geoRef_->MapToPixel(points);
+      InvertPixelToMap(*geoRef_, points);
       Shift(points, -firstPixel_);
     } else {
       Shift(points, firstPixel_);
@@ -269,8 +271,9 @@ const VerbRegistration registration(
       app.add_option("file", options->source.file, "A raster: from its pixels to its map")
           ->type_name("FILE");
       app.add_flag("--inverse", options->inverse, "From the map of the file to its pixels");
-      app.add_option("--from", options->from, "The system of the input: WKT, EPSG:n or PROJ");
-      app.add_option("--to", options->to, "The system of the output");
+      app.add_option("--from", options->from, "The system of the input: WKT, EPSG:n or PROJ")
+          ->transform(CoordSysName());
+      app.add_option("--to", options->to, "The system of the output")->transform(CoordSysName());
       options->source.AddFormatTo(app);
       options->job.AddTo(app);
       return VerbRegistration::Work([options] { return Transform(*options); });

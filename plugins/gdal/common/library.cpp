@@ -5,6 +5,7 @@
 #include <map>
 #include <mutex>
 
+#include "common/file_guard.h"
 #include "common/file_system.h"
 #include "common/messages.h"
 #include "foundation/environment.h"
@@ -37,6 +38,7 @@ void StartGdal() {
     Silence();
     InstallFileSystem();
     GDALAllRegister();
+    InstallFileGuard();
   });
 }
 

@@ -11,12 +11,16 @@ namespace lumo::gdal {
 /// it is the innermost.
 class Messages {
  public:
-  Messages();
+  /// What is made of warnings by which codecs tell that pixels are damaged.
+  enum class Damage { kIsWarned, kIsError };
+
+  explicit Messages(Damage damage = Damage::kIsWarned);
   ~Messages();
   Messages(const Messages&) = delete;
   Messages& operator=(const Messages&) = delete;
 
-  /// True when GDAL told an error, or a file operation failed that it did not tell of.
+  /// True when GDAL told an error, or a file operation failed that it did not tell of or, as when a
+  /// file beside the raster could not be saved, only warned of.
   bool HasError() const { return !error_.empty() || faults_.First() != nullptr; }
   bool HasWarning() const { return !warning_.empty(); }
 
@@ -39,6 +43,7 @@ class Messages {
   struct Handler;
 
   FileFaults faults_;
+  const Damage damage_;
   std::string error_;
   std::string warning_;
 };

@@ -5,7 +5,10 @@
 #include <filesystem>
 #include <string_view>
 
+#include "common/file_guard.h"
+#include "common/hdf5_files.h"
 #include "common/messages.h"
+#include "data/access_policy.h"
 #include "data/file_uri.h"
 
 namespace lumo::gdal {
@@ -63,14 +66,33 @@ std::string FindSubdataset(GDALDatasetH dataset, const Source& source) {
   return {};
 }
 
+bool IsHdf5(const Format& format) {
+  return std::any_of(format.drivers.begin(), format.drivers.end(),
+                     [](const std::string& driver) { return driver.starts_with("HDF5"); });
+}
+
+/// The file behind a source's name, which may have the form HDF5:"file"://place.
+std::string FileOf(const Source& source) {
+  if (source.isFile) return source.name;
+  const std::size_t open = source.name.find('"');
+  const std::size_t close = open != std::string::npos ? source.name.find('"', open + 1) : open;
+  if (close != std::string::npos) return source.name.substr(open + 1, close - open - 1);
+  const std::size_t first = source.name.find(':');
+  const std::size_t place = source.name.find("://");
+  return first < place ? source.name.substr(first + 1, place - first - 1) : source.name;
+}
+
 DatasetPtr OpenName(const std::string& name, const Source& source, const Format& format,
                     unsigned openFlags) {
   const Messages messages;
+  ForgetRefusals();
   const auto drivers = ListOf(format.drivers);
   const auto options = ListOf(source.openOptions);
   DatasetPtr dataset(GDALOpenEx(name.c_str(), openFlags | GDAL_OF_VERBOSE_ERROR, drivers.data(),
                                 options.data(), nullptr));
   if (dataset == nullptr) messages.Fail(source.name, "GDAL can't open it");
+  if (!WasRefusedNothing()) return nullptr;
+  if (dataset != nullptr && !MayReachAllFiles(dataset.get())) return nullptr;
   return dataset;
 }
 
@@ -119,6 +141,7 @@ bool IsOfFormat(const Source& source, const Format& format, unsigned openFlags) 
 }
 
 DatasetPtr OpenDataset(const Source& source, const Format& format, unsigned openFlags) {
+  if (AreFilesLimited() && IsHdf5(format) && !MayReachHdf5Files(FileOf(source))) return nullptr;
   DatasetPtr dataset = OpenName(source.name, source, format, openFlags);
   if (dataset == nullptr || source.subdataset.empty()) return dataset;
   const std::string inner = FindSubdataset(dataset.get(), source);

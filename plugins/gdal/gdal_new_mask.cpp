@@ -1,0 +1,113 @@
+#include "gdal_new_mask.h"
+
+#include <algorithm>
+#include <cpl_conv.h>
+#include <cpl_string.h>
+#include <cpl_vsi.h>
+
+#include "common/messages.h"
+#include "common/setting.h"
+
+namespace lumo::gdal {
+namespace {
+
+/// Up to this size a mask waits in memory.
+constexpr double kMaxBytesInMemory = 64 << 20;
+constexpr unsigned char kValid = 255;
+
+}  // namespace
+
+NewMask::~NewMask() {
+  mask_.reset();
+  if (isFile_) VSIUnlink(scratch_.c_str());
+}
+
+bool NewMask::Begin() {
+  const Messages messages;
+  isFile_ = 1.0 * samples_ * lines_ > kMaxBytesInMemory;
+  CPLStringList options;
+  if (isFile_) {
+    options.SetNameValue("COMPRESS", "DEFLATE");
+    options.SetNameValue("TILED", "YES");
+    options.SetNameValue("BIGTIFF", "IF_SAFER");
+  }
+  mask_.reset(GDALCreate(GDALGetDriverByName(isFile_ ? "GTiff" : "MEM"), scratch_.c_str(),
+                         static_cast<int>(samples_), static_cast<int>(lines_), 1, GDT_Byte,
+                         options.List()));
+  return (mask_ != nullptr &&
+          GDALFillRaster(GDALGetRasterBand(mask_.get(), 1), kValid, 0) == CE_None) ||
+         messages.Fail(scratch_, "a mask can't be made");
+}
+
+bool NewMask::Take(const BlockPlace& place, const std::vector<unsigned char>& excluded,
+                   bool isWhole) {
+  if (excluded.empty() && (IsEmpty() || !isWhole)) return true;
+  if (IsEmpty() && !Begin()) return false;
+  const Messages messages;
+  const auto at = [](unsigned number) { return static_cast<int>(number); };
+  GDALRasterBandH const band = GDALGetRasterBand(mask_.get(), 1);
+  std::vector<unsigned char> values(std::size_t{place.width} * place.height, kValid);
+  const auto transfer = [&](GDALRWFlag direction) {
+    return GDALRasterIO(band, direction, at(place.left), at(place.top), at(place.width),
+                        at(place.height), values.data(), at(place.width), at(place.height),
+                        GDT_Byte, 0, 0) == CE_None;
+  };
+  bool done = isWhole || transfer(GF_Read);
+  for (std::size_t i = 0; i < excluded.size(); ++i) {
+    if (excluded[i] != 0) values[i] = 0;
+  }
+  done = done && transfer(GF_Write);
+  return (done && !messages.HasError()) || messages.Fail(scratch_, "a mask can't be written");
+}
+
+/// Excludes the pixels of a line that hold the no-data values of all bands.
+bool NewMask::Excluded(GDALDatasetH file, int line, std::vector<unsigned char>& row) const {
+  const auto width = static_cast<int>(samples_);
+  std::vector<unsigned char> any(samples_), band(samples_);
+  for (int i = 1; i <= GDALGetRasterCount(file); ++i) {
+    GDALRasterBandH const source = GDALGetRasterBand(file, i);
+    if ((GDALGetMaskFlags(source) & GMF_NODATA) == 0) return true;
+    if (GDALRasterIO(GDALGetMaskBand(source), GF_Read, 0, line, width, 1, band.data(), width, 1,
+                     GDT_Byte, 0, 0) != CE_None) {
+      return false;
+    }
+    for (std::size_t x = 0; x < any.size(); ++x) any[x] |= band[x];
+  }
+  for (std::size_t x = 0; x < any.size(); ++x) {
+    if (any[x] == 0) row[x] = 0;
+  }
+  return true;
+}
+
+bool NewMask::WriteTo(const std::string& path, const std::string& driver) {
+  if (IsEmpty()) return true;
+  const Messages messages;
+  const char* const drivers[] = {driver.c_str(), nullptr};
+  const bool isInside = driver == "GTiff";
+  const Setting inside("GDAL_TIFF_INTERNAL_MASK", isInside ? "YES" : "NO");
+  // Before the file has a mask, it is the no-data values that GDAL goes by.
+  const DatasetPtr before(GDALOpenEx(path.c_str(), GDAL_OF_RASTER, drivers, nullptr, nullptr));
+  const DatasetPtr file(GDALOpenEx(path.c_str(), GDAL_OF_RASTER | (isInside ? GDAL_OF_UPDATE : 0U),
+                                   drivers, nullptr, nullptr));
+  if (before == nullptr || file == nullptr ||
+      GDALCreateDatasetMaskBand(file.get(), GMF_PER_DATASET) != CE_None) {
+    return messages.Fail(path, "the format takes no mask");
+  }
+  GDALRasterBandH const source = GDALGetRasterBand(mask_.get(), 1);
+  GDALRasterBandH const target = GDALGetMaskBand(GDALGetRasterBand(file.get(), 1));
+  const auto width = static_cast<int>(samples_);
+  std::vector<unsigned char> row(samples_);
+  for (int line = 0; line < static_cast<int>(lines_); ++line) {
+    if (GDALRasterIO(source, GF_Read, 0, line, width, 1, row.data(), width, 1, GDT_Byte, 0, 0) !=
+            CE_None ||
+        !Excluded(before.get(), line, row) ||
+        GDALRasterIO(target, GF_Write, 0, line, width, 1, row.data(), width, 1, GDT_Byte, 0, 0) !=
+            CE_None) {
+      return messages.Fail(path, "the mask can't be written");
+    }
+  }
+  GDALFlushCache(file.get());
+  return !messages.HasError() || messages.Fail(path);
+}
+
+}  // namespace lumo::gdal

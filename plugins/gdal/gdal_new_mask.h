@@ -1,0 +1,49 @@
+#pragma once
+
+#include <memory>
+#include <string>
+#include <vector>
+
+#include "common/source.h"
+#include "gdal_raster.h"
+
+namespace lumo::gdal {
+
+/// The mask of a raster that is being made: which of its pixels are not valid though neither their
+/// values nor an alpha band tell so. It costs nothing until the first such pixel comes.
+///
+/// Failure: false, with the fault told.
+class NewMask {
+ public:
+  /// @param scratch  the name of a file for masks that are too large for memory.
+  NewMask(std::string scratch, unsigned samples, unsigned lines)
+      : scratch_(std::move(scratch)), samples_(samples), lines_(lines) {}
+  ~NewMask();
+  NewMask(const NewMask&) = delete;
+  NewMask& operator=(const NewMask&) = delete;
+
+  bool IsEmpty() const { return mask_ == nullptr; }
+
+  /// Takes in a block.
+  /// @param excluded  a byte for each pixel of the block, not 0 where it is to be excluded; empty
+  ///                  when none is.
+  /// @param isWhole   the block has all bands: pixels that it doesn't exclude are valid again.
+  bool Take(const BlockPlace& place, const std::vector<unsigned char>& excluded, bool isWhole);
+
+  /// Gives the mask to a finished raster file: into a TIFF file, beside any other one. Pixels that
+  /// hold the no-data values of all bands are excluded as well, since other programs look at the
+  /// mask alone.
+  bool WriteTo(const std::string& path, const std::string& driver);
+
+ private:
+  bool Begin();
+  bool Excluded(GDALDatasetH file, int line, std::vector<unsigned char>& row) const;
+
+  const std::string scratch_;
+  const unsigned samples_;
+  const unsigned lines_;
+  DatasetPtr mask_;  // one band: 0 excluded, else 255
+  bool isFile_ = false;
+};
+
+}  // namespace lumo::gdal

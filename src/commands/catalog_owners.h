@@ -1,0 +1,24 @@
+#pragma once
+
+#include <map>
+
+#include "commands/catalog_session.h"
+
+// Who has opened what, beside the catalog's own counts. For the catalog's sources only; everything
+// is called under the lock of the catalog.
+
+namespace lumo::catalog {
+
+/// Opens of one object by session; what the catalog counts beyond them is nobody's.
+using Owners = std::map<const Session*, unsigned>;
+
+std::map<URI, Owners>& AllOwners();
+
+/// Notes one more open of this thread's session.
+void NoteOpen(const URI& uri);
+
+/// Notes that one open goes.
+/// @param count  opens that the catalog counts before.
+void NoteClose(const URI& uri, unsigned count);
+
+}  // namespace lumo::catalog

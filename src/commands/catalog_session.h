@@ -1,0 +1,61 @@
+#pragma once
+
+#include <vector>
+
+#include "foundation/string.h"
+
+namespace lumo::catalog {
+
+/// The opens of one client in the catalog. What a thread adds while a SessionScope of it lives, and
+/// all threads of a job that such a thread runs, counts as the client's.
+///
+/// Where a client closes what another one has opened, one of its own opens goes first, then one
+/// that is nobody's, then another client's. Threads: any. It outlives its scopes.
+class VEXG_EXPORT Session {
+ public:
+  /// @param client  number of the client's process.
+  explicit Session(int client) : client_(client) {}
+  /// What is still open is nobody's from now on.
+  ~Session();
+  Session(const Session&) = delete;
+  Session& operator=(const Session&) = delete;
+
+  int GetClient() const { return client_; }
+
+  /// Closes all that the client has opened and not closed.
+  void ReleaseAll();
+
+ private:
+  const int client_;
+};
+
+/// While one lives, the opens of this thread are those of a session; null for nobody's.
+class VEXG_EXPORT SessionScope {
+ public:
+  explicit SessionScope(Session* session);
+  ~SessionScope();
+  SessionScope(const SessionScope&) = delete;
+  SessionScope& operator=(const SessionScope&) = delete;
+
+ private:
+  Session* before_;
+};
+
+/// The session of this thread; null for none.
+VEXG_EXPORT Session* CurrentSession();
+
+/// The opens of one object that belong to one client.
+struct OpenObject {
+  URI uri;
+  unsigned opens = 0;
+  int client = 0;  ///< number of its process; 0 for nobody's
+};
+
+/// All that is open, by whom, in the order of the identifiers.
+VEXG_EXPORT std::vector<OpenObject> ListOpenObjects();
+
+/// Closes everything, whoever opened it, for the end of a program.
+/// @return the fault texts of sources that could not be finished.
+VEXG_EXPORT std::vector<String> Empty();
+
+}  // namespace lumo::catalog

@@ -1,0 +1,65 @@
+#pragma once
+
+#include <chrono>
+#include <condition_variable>
+#include <functional>
+#include <memory>
+#include <mutex>
+
+#include "foundation/fault.h"
+#include "foundation/run_controls.h"
+#include "foundation/thread.h"
+
+namespace lumo {
+
+/// Runs a call that may block for ever, as the opening of a file does, so that an abort ends the
+/// wait for it: the call runs on a thread of its own, and whoever asked goes on without it when the
+/// flag is raised. What the call gives then is dropped on its thread, whenever that is.
+///
+/// The flag may lie in memory of another process, which can't wake anybody: it is looked at every
+/// now and then.
+///
+/// @param call    holds copies of all that it uses. An exception of it gives no result.
+/// @param result  [out] what the call gives; stays as it is otherwise. The call's fault text
+/// becomes
+///                this thread's.
+/// @return false when the wait was given up.
+template <typename Result>
+bool RunAbortable(const AbortFlag& abort, std::function<Result()> call, Result& result) {
+  struct Shared {
+    std::mutex mutex;
+    std::condition_variable ended;
+    bool done = false;
+    Result result{};
+    String fault;
+  };
+  const auto shared = std::make_shared<Shared>();
+  const auto run = [shared, call = std::move(call)] {
+    Result made{};
+    String fault;
+    try {
+      TakeFault();
+      made = call();
+    } catch (...) {
+      // The caller sees that there is no result.
+    }
+    fault = TakeFault();
+    const std::lock_guard lock(shared->mutex);
+    shared->result = std::move(made);
+    shared->fault = fault;
+    shared->done = true;
+    shared->ended.notify_all();
+  };
+  if (!Thread().Start(run)) run();  // then it can't be given up
+
+  constexpr auto kLook = std::chrono::milliseconds(20);
+  std::unique_lock lock(shared->mutex);
+  while (!shared->ended.wait_for(lock, kLook, [&] { return shared->done; })) {
+    if (abort.IsSet()) return false;
+  }
+  result = std::move(shared->result);
+  if (shared->fault.GetLength() != 0) SetFault(shared->fault);
+  return true;
+}
+
+}  // namespace lumo

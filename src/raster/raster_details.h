@@ -1,0 +1,60 @@
+#pragma once
+
+#include <string>
+#include <vector>
+
+#include "commands/value_text.h"
+#include "foundation/array.h"
+#include "metadata/metadata.h"
+
+// What a raster tells of itself beside the fields of its RasterDef. It travels in the metadata of
+// the RasterDef as internal entries, all of them texts:
+//
+//   Bands/<n>/NoDataValue    the no-data value of band n, from 0, exactly; of 64-bit integers
+//   Bands/<n>/Description    its name
+//   Bands/<n>/Unit           of its values
+//   Bands/<n>/Scale, Offset  value = pixel * Scale + Offset
+//   Bands/<n>/Meaning        "Alpha", "Red", ...: the name of a colour interpretation
+//   Bands/<n>/Items/<name>   further items
+//   Items/<name>             further items of the raster
+//   Grid                     the six numbers of a grid that no geo-reference can tell
+//   CoordSys                 WKT of a system of the Grid, the Points, or of nothing
+//   Points/<n>               a ground control point: pixel, line, x, y, z; from the upper left
+//   corner
+//
+// A format's reader enters them, views choose and move them, a format's writer keeps them.
+
+namespace lumo {
+
+/// Which details of its template a raster gets that is made like another one.
+enum class KeptDetails : unsigned {
+  kTold = 0,   ///< none
+  kNames = 1,  ///< the names of bands: the values are others
+  kBands = 2,  ///< all but those of the place
+  kAll = 3
+};
+
+VEXG_EXPORT std::span<const EnumWord<KeptDetails>> WordsOf(KeptDetails);
+
+/// The path of a detail.
+/// @param name  as in the list above.
+VEXG_EXPORT String DetailPath(const std::string& name);
+VEXG_EXPORT String BandDetailPath(unsigned band, const std::string& name);
+
+/// The text of a detail; no text where it isn't told.
+VEXG_EXPORT std::string FindDetail(const Metadata& metadata, const String& path);
+
+/// The names of all details that are told, in order.
+VEXG_EXPORT std::vector<std::string> DetailNames(const Metadata& metadata);
+
+/// Gives the details of bands another order.
+/// @param bands  which one each band was before; one may come twice.
+VEXG_EXPORT void ChooseBandDetails(Metadata& metadata, const Array<unsigned>& bands);
+
+/// Moves the details of the place to an origin that lies at a pixel of the raster.
+VEXG_EXPORT void MovePlaceDetails(Metadata& metadata, unsigned left, unsigned top);
+
+/// Drops the details that aren't kept. The exact no-data values stay.
+VEXG_EXPORT void KeepDetails(Metadata& metadata, KeptDetails kept);
+
+}  // namespace lumo

@@ -1,0 +1,15 @@
+#pragma once
+
+namespace lumo {
+
+/// What a raster on a source of its own can say of the source.
+class SourceRaster {
+ public:
+  virtual ~SourceRaster() = default;
+
+  /// True while the files of the source are the ones that were opened. Files that this raster has
+  /// written to are, whatever they hold; any others must not have changed.
+  virtual bool IsUpToDate() const = 0;
+};
+
+}  // namespace lumo
