@@ -419,7 +419,7 @@ class Run {
     Expect(pixels.IsUnhurt() && state.IsUnhurt(), "a write leaves its block");
     Expect(put == HasBlocks(model, order), "a block inside is written");
     if (!put) return;
-    // Of a band that comes twice the last place stands.
+    // The last place of a band that comes twice stands.
     for (unsigned i = 0; i < n; ++i)
       for (unsigned y = 0; y < h; ++y)
         for (unsigned x = 0; x < w; ++x)

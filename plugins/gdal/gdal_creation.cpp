@@ -126,8 +126,8 @@ std::vector<unsigned char> FillValueOf(const RasterDef& def) {
   return bytes;
 }
 
-/// What a TIFF file is told of the meaning of its bands. Without it GDAL takes the fourth of four
-/// bands of bytes for alpha.
+/// Adds the options that tell a TIFF file what its bands mean. Without them GDAL takes the fourth
+/// of four bands of bytes for alpha.
 void AddMeaning(const RasterDef& def, CPLStringList& options) {
   if (IsInColors(def)) options.SetNameValue("PHOTOMETRIC", "RGB");
   if (def.bands < 2) return;
@@ -141,7 +141,7 @@ bool HoldsSignedBytes(GDALDriverH driver) {
   return list != nullptr && std::string(list).find("SIGNEDBYTE") != std::string::npos;
 }
 
-/// What a format keeps of a definition in any case.
+/// The part of a definition that a format keeps in any case.
 RasterDef AsKept(const std::string& driver, const RasterDef& def) {
   RasterDef kept = def;
   const Maker* const maker = FindMaker(driver);

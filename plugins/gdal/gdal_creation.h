@@ -79,7 +79,7 @@ class NewRaster {
   NewMask mask_;
   std::string scratch_;  // the TIFF file that the copy is made from
   std::vector<std::optional<StoredHistogram>> histograms_;  // which a copy leaves behind
-  /// What the format is given to keep; the rest goes beside the file.
+  /// The part that the format is given to keep; the rest goes beside the file.
   enum class Given { kNothing, kBands, kAll } given_ = Given::kAll;
   bool keepsAlpha_ = false;
   bool isDoomed_ = false;

@@ -78,7 +78,7 @@ void VisitItems(GDALMajorObjectH object, const Enter& enter) {
   }
 }
 
-/// What a band means where that has a name of its own.
+/// The name of a band's meaning, where it has one of its own.
 std::string MeaningOf(GDALRasterBandH band) {
   const GDALColorInterp meaning = GDALGetRasterColorInterpretation(band);
   const bool isPlain =
@@ -135,7 +135,7 @@ void ReadPlace(GDALDatasetH dataset, bool hasGrid, Metadata& metadata) {
   }
 }
 
-/// What a definition tells beside its fields, sorted by what it is of.
+/// The details that a definition has beside its fields, sorted by what they belong to.
 struct Wanted {
   explicit Wanted(const RasterDef& def) : bands(def.bands) {
     for (const std::string& name : DetailNames(def.metadata)) {
@@ -155,7 +155,7 @@ struct Wanted {
         coordSys = text;
       }
     }
-    // What the geo-reference tells goes before.
+    // The geo-reference goes before them.
     const bool isPlaced = def.geoRef && (def.geoRef->GetType() == GeoRef::kStd ||
                                          def.geoRef->GetType() == GeoRef::kStdRpc);
     if (isPlaced) {

@@ -7,7 +7,7 @@
 
 namespace lumo::gdal {
 
-/// What a band says.
+/// The no-data value that a band declares.
 std::optional<NoDataNumber> ReadNoData(GDALRasterBandH band);
 
 /// Gives a band a no-data value. One that no pixel of 64 bits can hold is left out. False when GDAL

@@ -288,7 +288,7 @@ bool OpenRaster::Transfer(GDALRWFlag direction, const BlockPlace& place, void* p
 }
 
 bool OpenRaster::Read(const BlockPlace& place, void* pixels) {
-  // What was read of damaged data waits in GDAL's cache as if it were whole, and codecs warn once.
+  // GDAL's cache holds what was read of damaged data as if it were whole, and codecs warn once.
   if (isDamaged_ && !isUpdated_) {
     isThreaded_ = false;
     isPlain_ = true;
@@ -299,7 +299,7 @@ bool OpenRaster::Read(const BlockPlace& place, void* pixels) {
   isDamaged_ = CheckPlace(place) != nullptr;
   const bool isShortCut = !isPlain_ && !isUpdated_ && format_.drivers.front() == "GTiff";
   if (!isShortCut || !isDamaged_) return false;
-  // What a thread of GDAL has to say reaches nobody, and a read past its cache says nothing. A
+  // Messages of a thread of GDAL's reach nobody, and a read past its cache says nothing. A
   // plain one says it here.
   isThreaded_ = false;
   isPlain_ = true;

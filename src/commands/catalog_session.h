@@ -15,7 +15,7 @@ class VEXG_EXPORT Session {
  public:
   /// @param client  number of the client's process.
   explicit Session(int client) : client_(client) {}
-  /// What is still open is nobody's from now on.
+  /// Leaves what is still open to nobody.
   ~Session();
   Session(const Session&) = delete;
   Session& operator=(const Session&) = delete;

@@ -42,7 +42,7 @@ struct UnknownCommand {
   String id;
   unsigned position = 0;  ///< commands of the job that stand before it
 
-  /// What is wrong with it, in one line.
+  /// The complaint about it, in one line.
   /// @param withHint  with the nearest command that is known.
   String GetReason(bool withHint) const;
 };

@@ -48,7 +48,7 @@ class MtConnection : public Base {
   /// Lets go of the readers of the last source.
   virtual void ForgetReaders() = 0;
 
-  /// What `open` gives, which opens or makes a source in place of the one that is open.
+  /// Gives the result of `open`, which opens or makes a source in place of the one that is open.
   template <typename Open>
   bool Exchange(const Array<String>& connStrings, bool made, const Open& open);
 

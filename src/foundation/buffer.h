@@ -114,7 +114,7 @@ class VEXG_EXPORT BasicBuffer : public Object {
   // Elements to which the owner may hold references that write, until the window moves.
   std::uint64_t lentFrom_ = UINT64_MAX;
   std::uint64_t lentTo_ = 0;
-  // What is in the file of the elements that were lent when the window was last flushed.
+  // The elements that were lent, as the file holds them since the window was last flushed.
   std::vector<unsigned char> flushed_;
   std::uint64_t flushedFrom_ = 0;
   std::uint64_t count_ = 0;

@@ -294,7 +294,7 @@ class Damage(FolderTest):
                     self.assertEqual((code, len(err.strip().splitlines())), (1, 1), err)
                     self.assertIn(path.name, err)
                     self.assertFalse((self.folder / line[-1]).exists() and line[0] != "stats")
-        # What lies before the damage can be read.
+        # The lines before the damage can be read.
         self.fine("read", files[0], "-o", self.folder / "top.npy", "--rect", "0,0,99,19")
 
     def test_harmless_warnings_stay_so(self):

@@ -102,7 +102,7 @@ int main(int argc, char** argv) {
   try {
     return lumo::host::Run(argc, argv);
   } catch (const lumo::host::HostError& error) {
-    // What was in the making is gone by now. Who has closed the pipe knows why there is no more.
+    // Nothing in the making is left by now. Who has closed the pipe knows why there is no more.
     if (lumo::platform::OutputIsClosed()) lumo::platform::EndOfClosedPipe();
     lumo::host::Say(error.what());
     return error.code;

@@ -11,7 +11,7 @@ namespace lumo::gdal {
 /// it is the innermost.
 class Messages {
  public:
-  /// What is made of warnings by which codecs tell that pixels are damaged.
+  /// How warnings count by which codecs tell that pixels are damaged.
   enum class Damage { kIsWarned, kIsError };
 
   explicit Messages(Damage damage = Damage::kIsWarned);
