@@ -1,5 +1,6 @@
 #pragma once
 
+#include "data/band_answers.h"
 #include "data/dc_srv_call.h"
 #include "data/mt_connection.h"
 
@@ -56,21 +57,21 @@ class MtRasterReader final : public RasterReader<T> {
   }
   bool PyramidBuild(std::int32_t levelMin, std::int32_t levelMax, std::int32_t resamplingMethod,
                     const TileDimensions& tiles) override {
-    return Call<bool>(22, "DcSrvCmdRrPyramidBuild", [&](auto& reader) {
+    return Change(22, "DcSrvCmdRrPyramidBuild", [&](auto& reader) {
       return reader.PyramidBuild(levelMin, levelMax, resamplingMethod, tiles);
     });
   }
   bool PyramidRebuild() override {
-    return Call<bool>(23, "DcSrvCmdRrPyramidRebuild",
-                      [](auto& reader) { return reader.PyramidRebuild(); });
+    return Change(23, "DcSrvCmdRrPyramidRebuild",
+                  [](auto& reader) { return reader.PyramidRebuild(); });
   }
   bool PyramidDelete() override {
-    return Call<bool>(24, "DcSrvCmdRrPyramidDelete",
-                      [](auto& reader) { return reader.PyramidDelete(); });
+    return Change(24, "DcSrvCmdRrPyramidDelete",
+                  [](auto& reader) { return reader.PyramidDelete(); });
   }
   bool PyramidRefresh() override {
-    return Call<bool>(25, "DcSrvCmdRrPyramidRefresh",
-                      [](auto& reader) { return reader.PyramidRefresh(); });
+    return Change(25, "DcSrvCmdRrPyramidRefresh",
+                  [](auto& reader) { return reader.PyramidRefresh(); });
   }
 
   std::int32_t StatsMask() override {
@@ -78,8 +79,8 @@ class MtRasterReader final : public RasterReader<T> {
                               [](auto& reader) { return reader.StatsMask(); });
   }
   bool StatsExist(unsigned band) override {
-    return Call<bool>(27, "DcSrvCmdRrStatsExist",
-                      [&](auto& reader) { return reader.StatsExist(band); });
+    return Ask(statsExist_, 27, "DcSrvCmdRrStatsExist", band,
+               [](auto& reader, unsigned each) { return reader.StatsExist(each); });
   }
   RasterBandStats<T> ReadStats(unsigned band) override {
     return Call<RasterBandStats<T>>(28, "DcSrvCmdRrReadStats",
@@ -90,8 +91,8 @@ class MtRasterReader final : public RasterReader<T> {
                       [](auto& reader) { return reader.CanWriteStats(); });
   }
   bool WriteStats(const Array<RasterBandStats<T>>& stats) override {
-    return Call<bool>(30, "DcSrvCmdRrWriteStats",
-                      [&](auto& reader) { return reader.WriteStats(stats); });
+    return Change(30, "DcSrvCmdRrWriteStats",
+                  [&](auto& reader) { return reader.WriteStats(stats); });
   }
   Array<RasterBandHistogram<T>> Histogram(unsigned band) override {
     return Call<Array<RasterBandHistogram<T>>>(
@@ -102,44 +103,44 @@ class MtRasterReader final : public RasterReader<T> {
                       [](auto& reader) { return reader.CanWriteHistogram(); });
   }
   bool WriteHistogram(const Array<RasterBandHistogram<T>>& histograms) override {
-    return Call<bool>(33, "DcSrvCmdRrWriteHistogram",
-                      [&](auto& reader) { return reader.WriteHistogram(histograms); });
+    return Change(33, "DcSrvCmdRrWriteHistogram",
+                  [&](auto& reader) { return reader.WriteHistogram(histograms); });
   }
 
   bool HasNoDataValue(unsigned band) override {
-    return Call<bool>(34, "DcSrvCmdRrHasNoDataValue",
-                      [&](auto& reader) { return reader.HasNoDataValue(band); });
+    return Ask(hasNoDataValue_, 34, "DcSrvCmdRrHasNoDataValue", band,
+               [](auto& reader, unsigned each) { return reader.HasNoDataValue(each); });
   }
   T NoDataValue(unsigned band) override {
-    return Call<T>(35, "DcSrvCmdRrNoDataValue",
-                   [&](auto& reader) { return reader.NoDataValue(band); });
+    return Ask(noDataValue_, 35, "DcSrvCmdRrNoDataValue", band,
+               [](auto& reader, unsigned each) { return reader.NoDataValue(each); });
   }
   bool CanInheritNoDataValues() override {
     return Call<bool>(36, "DcSrvCmdRrCanInheritNoDataValues",
                       [](auto& reader) { return reader.CanInheritNoDataValues(); });
   }
   void InheritNoDataValues(const lumo::RasterDef& from) override {
-    Call<bool>(37, "DcSrvCmdRrInheritNoDataValues", [&](auto& reader) {
+    Change(37, "DcSrvCmdRrInheritNoDataValues", [&](auto& reader) {
       reader.InheritNoDataValues(from);
       return true;
     });
   }
 
   bool HasPalette(unsigned band) override {
-    return Call<bool>(38, "DcSrvCmdRrHasPalette",
-                      [&](auto& reader) { return reader.HasPalette(band); });
+    return Ask(hasPalette_, 38, "DcSrvCmdRrHasPalette", band,
+               [](auto& reader, unsigned each) { return reader.HasPalette(each); });
   }
   lumo::Palette Palette(unsigned band) override {
     return Call<lumo::Palette>(39, "DcSrvCmdRrPalette",
                                [&](auto& reader) { return reader.Palette(band); });
   }
   bool DeletePalette(unsigned band) override {
-    return Call<bool>(40, "DcSrvCmdRrDeletePalette",
-                      [&](auto& reader) { return reader.DeletePalette(band); });
+    return Change(40, "DcSrvCmdRrDeletePalette",
+                  [&](auto& reader) { return reader.DeletePalette(band); });
   }
   bool WritePalette(unsigned band, const lumo::Palette& palette) override {
-    return Call<bool>(41, "DcSrvCmdRrWritePalette",
-                      [&](auto& reader) { return reader.WritePalette(band, palette); });
+    return Change(41, "DcSrvCmdRrWritePalette",
+                  [&](auto& reader) { return reader.WritePalette(band, palette); });
   }
 
   bool ReadPixels(unsigned left, unsigned top, unsigned width, unsigned height,
@@ -156,16 +157,16 @@ class MtRasterReader final : public RasterReader<T> {
   bool WritePixels(unsigned left, unsigned top, unsigned width, unsigned height,
                    const Array<unsigned>& bands, unsigned level, const T* pixels,
                    const unsigned char* state) override {
-    return Call<bool>(44, "DcSrvCmdRrWritePixels", [&](auto& reader) {
+    return Change(44, "DcSrvCmdRrWritePixels", [&](auto& reader) {
       return reader.WritePixels(left, top, width, height, bands, level, pixels, state);
     });
   }
 
  private:
-  /// Runs `body` with the plug-in's reader of type T on the source's thread; Result() when there is
-  /// no such reader.
+  /// Runs `body(reader, result)` with the plug-in's reader of type T on the source's thread; gives
+  /// Result() when there is no such reader.
   template <typename Result, typename Body>
-  Result Call(std::int32_t code, const char* name, Body&& body) {
+  Result CallWith(std::int32_t code, const char* name, Body&& body) {
     return detail::CallServer(
         proxy_->Server(), code, name, Result(), [&](DcSrvContext& context, Result& result) {
           const RasterDataConnectionPtr source(context.conn);
@@ -173,11 +174,47 @@ class MtRasterReader final : public RasterReader<T> {
           const RasterReaderDispatchPtr dispatch = source->RasterReaderDispatch();
           if (!dispatch) return;
           const RasterReaderPtr<T> reader = dispatch->template Get<T>();
-          if (reader) result = body(*reader);
+          if (reader) body(*reader, result);
         });
   }
 
+  /// Gives `body(reader)`.
+  template <typename Result, typename Body>
+  Result Call(std::int32_t code, const char* name, Body&& body) {
+    return CallWith<Result>(code, name,
+                            [&](auto& reader, Result& result) { result = body(reader); });
+  }
+
+  /// Gives `body(reader, band)`, asked ahead where one band is asked about after another.
+  template <typename Value, typename Body>
+  Value Ask(BandAnswers<Value>& answers, std::int32_t code, const char* name, unsigned band,
+            const Body& body) {
+    return answers.Get(band, [&](unsigned first, unsigned count) {
+      using Values = std::vector<Value>;
+      return CallWith<Values>(code, name, [&](auto& reader, Values& values) {
+        const unsigned bands = count > 1 ? reader.Bands() : 0;
+        const unsigned end = bands > first ? first + std::min(count, bands - first) : first + 1;
+        for (unsigned each = first; each < end; ++each) values.push_back(body(reader, each));
+      });
+    });
+  }
+
+  /// Gives `body(reader)`, after which bands may answer otherwise.
+  template <typename Body>
+  bool Change(std::int32_t code, const char* name, Body&& body) {
+    const bool isDone = Call<bool>(code, name, body);
+    statsExist_.Forget();
+    hasNoDataValue_.Forget();
+    noDataValue_.Forget();
+    hasPalette_.Forget();
+    return isDone;
+  }
+
   MtRasterDataConnection* proxy_;
+  BandAnswers<bool> statsExist_;
+  BandAnswers<bool> hasNoDataValue_;
+  BandAnswers<T> noDataValue_;
+  BandAnswers<bool> hasPalette_;
 };
 
 }  // namespace lumo

@@ -61,6 +61,8 @@ class Names(FolderTest):
                 self.assertEqual(file.read_bytes(), before)
         self.fails(1, "none of them 7", "info", file, "--subdataset", "7")
         self.fails(2, "NAME=VALUE", "info", f"{file}|oops")
+        self.assertIn("10 samples, 15 lines, 1 bands", self.fine("info", DATA / "rotated.tif", "--subdataset", "1"))
+        self.fails(1, "is one raster, and holds no 2", "info", DATA / "rotated.tif", "--subdataset", "2")
 
 
 @needs_data

@@ -90,6 +90,16 @@ class Placing(FolderTest):
             self.fine("run", document)
             told = subprocess.run(["gdalinfo", copy], capture_output=True, text=True, check=True).stdout
             self.assertIn(f"Pixel Size = ({size}.0", told)
+        part = self.folder / "part.tif"
+        self.fine("copy", scene, part, "--level", "3", "--rect", "10,20,59,79")
+        told = subprocess.run(["gdalinfo", part], capture_output=True, text=True, check=True).stdout
+        self.assertIn("Size is 50, 60", told)
+        self.assertIn("Pixel Size = (240.0", told)
+        self.assertIn("Origin = (302400.0", told)
+        self.fine("read", part, "-o", self.folder / "part.npy")
+        self.fine("read", scene, "-o", self.folder / "scene.npy", "--rect", "80,160,479,639")
+        pixels, whole = read_npy(self.folder / "part.npy")[2], read_npy(self.folder / "scene.npy")[2]
+        self.assertEqual(pixels, b"".join(whole[y * 400:(y + 1) * 400:8] for y in range(0, 480, 8)))
         printed = self.fine("read", scene, "--level", "8", "-o", self.folder / "o.npy", "--print-job")
         self.assertIn('Placing="Exact"', printed)
 

@@ -107,6 +107,10 @@ class ValidityTest(FolderTest):
                                "-co", "ALPHA=NO", self.sources["alpha"])
         self.fine("copy", plain, self.folder / "plain2.tif")
         self.assertEqual(self.count(self.folder / "plain2.tif"), 240 * 173)
+        # PNG takes the fourth band for alpha, as it takes the second of two.
+        for bands, last in ((("--bands", "0,1,2,3"), 3), (("--bands", "2,0"), 1)):
+            self.fails(1, f"band {last} as such, which is an alpha band there", "copy", plain,
+                       self.folder / "plain.png", *bands, "--strict")
 
     def test_calibrated_pixels_keep_it(self):
         for name in self.sources:

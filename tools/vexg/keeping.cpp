@@ -172,6 +172,10 @@ void CompareDetails(const MadeRaster& raster, Losses& losses) {
     const bool isKept = found != made.end() && IsSameDetail(name, text, found->second);
     if (!isKept && lost.insert(kind).second) losses.Add(kind);
   }
+  const unsigned last = raster.made.info.bands - 1;
+  if (IsAlpha(made, last) && !IsAlpha(SplitDetails(raster.put.details), last)) {
+    losses.Add(fmt::format("band {} as such, which is an alpha band there", last));
+  }
 }
 
 /// @param isFilled  bands that had no value may have one.

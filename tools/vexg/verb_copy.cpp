@@ -22,6 +22,7 @@ struct Options {
   std::string bands;
   std::string interleave;
   std::string type;
+  unsigned level = 0;  ///< of the source's pyramid; 0: the source itself
 };
 
 /// A colour table of the copy.
@@ -53,14 +54,24 @@ std::vector<BandPalette> ReadPalettes(JobSession& session, const String& raster,
 
 constexpr const char* kCopyStep = "copy";
 
+/// Opens the source, and the level that is copied, and gives the variables of what is open.
+std::vector<String> AddSource(JobDraft& draft, const Options& options) {
+  if (options.level == 0) {
+    AddOpen(draft, "source", options.source);
+    return {"$source"};
+  }
+  AddOpenWithPyramid(draft, "source", options.source);
+  AddLevel(draft, "level", "$source", options.level);
+  return {"$source", "$level"};
+}
+
 /// The copying as a whole: opens the source, stands views on it, makes the copy and closes all.
 /// @param target  the file to make.
 /// @param noData  of bands, in the place of pixels that are not valid.
 JobDraft MakeDraft(const Options& options, const Plan& plan, const std::string& target,
                    const FillValues& noData) {
   JobDraft draft;
-  AddOpen(draft, "source", options.source);
-  std::vector<String> opened{"$source"};
+  std::vector<String> opened = AddSource(draft, options);
   if (plan.isPart) {
     JobWriterCommand& view = draft.Open("part", "CreateSpatialSubsetRasterCommand");
     view.AddVariableInput("SrcURI", opened.back());
@@ -159,12 +170,13 @@ int Copy(const Options& options) {
   OutputFile output(options.target.output, options.target.overwrite, {options.source.file});
   JobSession session(options.job);
   JobDraft opening;
-  AddOpen(opening, "source", options.source);
-  AddQuery(opening, "source", "$source");
+  AddQuery(opening, "shown", AddSource(opening, options).back());
   const JobResults opened = session.Run(opening);
-  const String raster = opened.Find("source").returns.Find("URI");
-  output.RefuseInput(PathOf(raster));
-  const RasterInfo info = ReadInfo(opened, "source");
+  const String source = opened.Find("source").returns.Find("URI");
+  output.RefuseInput(PathOf(source));
+  const String raster =
+      options.level == 0 ? source : opened.Find("level").returns.Find("PyramidURI");
+  const RasterInfo info = ReadInfo(opened, "shown");
   const Plan plan = MakePlan(session, options, raster, info);
   if (options.job.printJob) {
     std::cout << MakeDraft(options, plan, output.GetName(), {}).Write().ToUTF8() << '\n';
@@ -197,6 +209,10 @@ const VerbRegistration registration(
           ->type_name("L,T,R,B");
       app.add_option("--bands", options->bands, "Bands in the order wanted, from 0; all by default")
           ->type_name("B,B…");
+      app.add_option("--level", options->level,
+                     "Level of its pyramid: 0 the raster itself, each further one half the size")
+          ->check(CLI::Range(0U, 31U))
+          ->capture_default_str();
       app.add_option("--interleave", options->interleave, "Order of the pixels in the copy")
           ->transform(OneOf({"bip", "bil", "bsq"}));
       app.add_option("--type", options->type, "Pixel type that the source has to have")

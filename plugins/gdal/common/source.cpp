@@ -4,6 +4,7 @@
 #include <cctype>
 #include <filesystem>
 #include <string_view>
+#include <utility>
 
 #include "common/file_guard.h"
 #include "common/hdf5_files.h"
@@ -48,7 +49,8 @@ URI MakeURI(const Source& source, const std::vector<std::string>& pieces) {
   return URI(String(text));
 }
 
-/// GDAL's name of a raster inside an open file; empty, with the fault told, when it holds no such.
+/// GDAL's name of a raster inside an open file, which for a file of one raster is that of the file;
+/// empty, with the fault told, when it holds no such.
 std::string FindSubdataset(GDALDatasetH dataset, const Source& source) {
   const std::string& wanted = source.subdataset;
   const bool isNumber = std::all_of(wanted.begin(), wanted.end(),
@@ -60,6 +62,11 @@ std::string FindSubdataset(GDALDatasetH dataset, const Source& source) {
         GDALGetMetadataItem(dataset, ("SUBDATASET_" + number + "_NAME").c_str(), "SUBDATASETS");
     if (name == nullptr) break;
     if (isNumber ? number == wanted : std::string(name).ends_with(wanted)) return name;
+  }
+  if (count == 0 && GDALGetRasterCount(dataset) != 0) {
+    if (wanted == "1") return GDALGetDescription(dataset);
+    FailWith(source.name, "is one raster, and holds no " + wanted);
+    return {};
   }
   std::string what = "holds " + std::to_string(count) + " rasters in the file, none of them ";
   FailWith(source.name, what.append(wanted));
@@ -145,7 +152,8 @@ DatasetPtr OpenDataset(const Source& source, const Format& format, unsigned open
   DatasetPtr dataset = OpenName(source.name, source, format, openFlags);
   if (dataset == nullptr || source.subdataset.empty()) return dataset;
   const std::string inner = FindSubdataset(dataset.get(), source);
-  return inner.empty() ? nullptr : OpenName(inner, source, format, openFlags);
+  if (inner.empty()) return nullptr;
+  return inner == source.name ? std::move(dataset) : OpenName(inner, source, format, openFlags);
 }
 
 }  // namespace lumo::gdal
