@@ -8,6 +8,7 @@
 #include <set>
 
 #include "common/messages.h"
+#include "foundation/abandonment.h"
 #include "foundation/fault.h"
 #include "gdal_details.h"
 #include "gdal_georef.h"
@@ -332,9 +333,10 @@ bool NewRaster::Describe(GDALDatasetH dataset) const {
 }
 
 bool NewRaster::Finish(DatasetPtr dataset) {
-  if (isDoomed_) {
+  if (isDoomed_ || IsAbandoning()) {
     dataset.reset();
-    return Fail("not made, since some of its pixels could not be written");
+    return Fail(isDoomed_ ? "not made, since some of its pixels could not be written"
+                          : "not made, as it was given up");
   }
   const Messages messages;
   if (FindMaker(driver_)->isCopied) {

@@ -3,6 +3,7 @@
 #include <filesystem>
 
 #include "data/format_table.h"
+#include "foundation/abandonment.h"
 #include "foundation/fault.h"
 #include "platform/file_moves.h"
 #include "platform/temporary_file.h"
@@ -103,7 +104,7 @@ std::unique_ptr<File> File::Create(const std::string& path, const RasterDef& def
 bool File::Close() {
   if (!isNew_) return true;
   isNew_ = false;
-  if (failed_) {
+  if (failed_ || IsAbandoning()) {
     Discard();
     return false;
   }

@@ -4,6 +4,7 @@
 
 #include "common/coordsys.h"
 #include "common/messages.h"
+#include "foundation/abandonment.h"
 #include "foundation/fault.h"
 #include "georef/std_georef.h"
 #include "platform/file_moves.h"
@@ -127,7 +128,7 @@ bool Layer::Close() {
   const bool isWhole =
       isDoomed_ ? FailWith(Name(), "not made, since some of its shapes could not be written")
                 : !messages.HasError() || messages.Fail(Name());
-  const bool isPlaced = isWhole && TakePlace();
+  const bool isPlaced = isWhole && !IsAbandoning() && TakePlace();
   if (!isPlaced) Discard();
   temporary_.clear();
   return isPlaced;

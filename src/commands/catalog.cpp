@@ -61,6 +61,7 @@ void Release(const URI& uri) {
   NoteClose(uri, entry.count);
   if (--entry.count != 0) return;
   last = entry.object;
+  Unfinished().erase(uri);
   map.Remove(uri);
 }
 

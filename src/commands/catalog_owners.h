@@ -1,6 +1,7 @@
 #pragma once
 
 #include <map>
+#include <set>
 
 #include "commands/catalog_session.h"
 
@@ -13,6 +14,9 @@ namespace lumo::catalog {
 using Owners = std::map<const Session*, unsigned>;
 
 std::map<URI, Owners>& AllOwners();
+
+/// What jobs opened that were aborted, and that nobody has closed since.
+std::set<URI>& Unfinished();
 
 /// Notes one more open of this thread's session.
 void NoteOpen(const URI& uri);

@@ -5,6 +5,7 @@
 
 #include "commands/catalog.h"
 #include "commands/catalog_owners.h"
+#include "foundation/abandonment.h"
 #include "foundation/fault.h"
 
 namespace lumo::catalog {
@@ -31,6 +32,11 @@ std::vector<URI> Forget(const Session& session) {
   return opens;
 }
 
+bool IsUnfinished(const URI& uri) {
+  const MutexLock lock = GetGlobalDataMap().Lock();
+  return Unfinished().contains(uri);
+}
+
 }  // namespace
 
 std::map<URI, Owners>& AllOwners() {
@@ -38,8 +44,15 @@ std::map<URI, Owners>& AllOwners() {
   return owners;
 }
 
+std::set<URI>& Unfinished() {
+  static auto& unfinished = *new std::set<URI>;
+  return unfinished;
+}
+
 void NoteOpen(const URI& uri) {
-  if (tSession != nullptr) ++AllOwners()[uri][tSession];
+  if (tSession == nullptr) return;
+  ++AllOwners()[uri][tSession];
+  tSession->opensOfJob_.insert(uri);
 }
 
 void NoteClose(const URI& uri, unsigned count) {
@@ -64,7 +77,25 @@ void Session::ReleaseAll() {
     const MutexLock lock = GetGlobalDataMap().Lock();
     opens = Forget(*this);
   }
-  for (const URI& uri : opens) Release(uri);  // they count as nobody's now
+  // They count as nobody's now.
+  for (const URI& uri : opens) {
+    const AbandonScope abandonment(IsUnfinished(uri));
+    Release(uri);
+  }
+}
+
+void Session::BeginJob() {
+  const MutexLock lock = GetGlobalDataMap().Lock();
+  opensOfJob_.clear();
+}
+
+void Session::EndJob(bool isAborted) {
+  auto& map = GetGlobalDataMap();
+  const MutexLock lock = map.Lock();
+  for (const URI& uri : opensOfJob_) {
+    if (isAborted && map.HasKey(uri)) Unfinished().insert(uri);
+  }
+  opensOfJob_.clear();
 }
 
 SessionScope::SessionScope(Session* session) : before_(tSession) {
@@ -98,18 +129,23 @@ std::vector<String> Empty() {
   auto& map = GetGlobalDataMap();
   while (true) {
     ObjectPtr last;  // goes after the lock
+    bool isUnfinished = false;
     {
       const MutexLock lock = map.Lock();
       if (map.GetCount() == 0) return faults;
       const URI uri = map.begin()->first;
       last = map.begin()->second.object;
       AllOwners().erase(uri);
+      isUnfinished = Unfinished().erase(uri) != 0;
       map.Remove(uri);
     }
     TakeFault();
-    last = ObjectPtr();
+    {
+      const AbandonScope abandonment(isUnfinished || IsAbandoning());
+      last = ObjectPtr();
+    }
     const String fault = TakeFault();
-    if (fault.GetLength() != 0) faults.push_back(fault);
+    if (fault.GetLength() != 0 && !isUnfinished) faults.push_back(fault);
   }
 }
 

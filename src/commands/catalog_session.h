@@ -1,5 +1,6 @@
 #pragma once
 
+#include <set>
 #include <vector>
 
 #include "foundation/string.h"
@@ -22,11 +23,20 @@ class VEXG_EXPORT Session {
 
   int GetClient() const { return client_; }
 
-  /// Closes all that the client has opened and not closed.
+  /// Closes all that the client has opened and not closed. New sources that a job of its had opened
+  /// which was aborted are not put in their places: they may not be whole.
   void ReleaseAll();
 
+  /// Begins the job whose opens are told to EndJob.
+  void BeginJob();
+  /// @param isAborted  what the job opened and nobody closes is given up in the end.
+  void EndJob(bool isAborted);
+
  private:
+  friend void NoteOpen(const URI& uri);
+
   const int client_;
+  std::set<URI> opensOfJob_;  // under the lock of the catalog
 };
 
 /// While one lives, the opens of this thread are those of a session; null for nobody's.
@@ -54,7 +64,8 @@ struct OpenObject {
 /// All that is open, by whom, in the order of the identifiers.
 VEXG_EXPORT std::vector<OpenObject> ListOpenObjects();
 
-/// Closes everything, whoever opened it, for the end of a program.
+/// Closes everything, whoever opened it, for the end of a program. What aborted jobs left open is
+/// given up.
 /// @return the fault texts of sources that could not be finished.
 VEXG_EXPORT std::vector<String> Empty();
 

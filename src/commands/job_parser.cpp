@@ -1,5 +1,8 @@
 #include "commands/job_parser.h"
 
+#include <algorithm>
+#include <map>
+
 #include "commands/shared_memory_channel.h"
 #include "foundation/near_name.h"
 
@@ -26,6 +29,13 @@ void JobParser::Parse(const String& document) {
 }
 
 void JobParser::StartElement(const String& name, const Attributes& attributes) {
+  // A misspelt attribute first: what it leaves out is complained of too.
+  if (name != "Job" && name != "Command") NoteAttributes(name, attributes);
+  StartKnownElement(name, attributes);
+  if (name == "Job" || name == "Command") NoteAttributes(name, attributes);  // they begin anew
+}
+
+void JobParser::StartKnownElement(const String& name, const Attributes& attributes) {
   if (name == "Job") {
     StartJob(attributes);
   } else if (name == "Command") {
@@ -70,7 +80,32 @@ void JobParser::NoteElement(const String& name) {
   const std::string text = name.ToUTF8();
   const std::string didYouMean = DidYouMean(text, kElements);
   if (didYouMean.empty()) return;
-  const std::string what = "the element " + text + " means nothing" + didYouMean;
+  Note("the element " + text + " means nothing" + didYouMean);
+}
+
+/// Notes attributes that are nearly one of those that the element has.
+void JobParser::NoteAttributes(const String& element, const Attributes& attributes) {
+  static const std::map<std::string, std::vector<std::string>> kAttributes{
+      {"Job", {kChecks}},
+      {"Command", {"ID", "Name"}},
+      {"DependsOn", {"Name"}},
+      {"SHMIPC", {"Name", "Size", "AbortOffset", "ProgressOffset"}},
+      {"ORVAIPC", {"Name", "Size"}},
+      {"TQFProcessIPC", {"Name"}}};
+  const auto found = kAttributes.find(element.ToUTF8());
+  if (found == kAttributes.end()) return;
+  const std::vector<std::string>& known = found->second;
+  for (const auto& [name, value] : attributes) {
+    const std::string text = name.ToUTF8();
+    if (std::find(known.begin(), known.end(), text) != known.end()) continue;
+    const std::string didYouMean = DidYouMean(text, known);
+    if (didYouMean.empty()) continue;
+    Note("the attribute " + text + " of " + found->first + " means nothing" + didYouMean);
+  }
+}
+
+/// Notes what is wrong with the command, or the document, that is being read.
+void JobParser::Note(const std::string& what) {
   if (current_.IsNull()) {
     job_.faults.PushBack(String(what));
   } else {
@@ -88,6 +123,12 @@ void JobParser::AddInputs(const Attributes& attributes) {
   const bool isExpanded = attributes.Find(kExpand) == "1";
   for (const auto& [name, value] : attributes) {
     if (isExpanded && name == kExpand) continue;
+    const std::string text = name.ToUTF8();
+    if (text == "Expand" || text == "EXPAND") {
+      Complain("the attribute " + text + " of Input means nothing; did you mean expand?");
+    } else if (text == kExpand) {
+      Complain("expand=\"" + Printable(value.ToUTF8(), 80) + "\" means nothing; expand=\"1\" does");
+    }
     current_->inputs[name] = value;
     if (isExpanded) {
       current_->expanded.Insert(name);

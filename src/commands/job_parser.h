@@ -26,9 +26,12 @@ class VEXG_EXPORT JobParser : public XMLSimpleParser {
   void EndElement(const String& name) override;
 
  private:
+  void StartKnownElement(const String& name, const Map<String, String>& attributes);
   void StartJob(const Map<String, String>& attributes);
   void AddInputs(const Map<String, String>& attributes);
   void NoteElement(const String& name);
+  void NoteAttributes(const String& element, const Map<String, String>& attributes);
+  void Note(const std::string& what);
   void Complain(const std::string& what);
   void StartCommand(const Map<String, String>& attributes);
   void EndCommand();

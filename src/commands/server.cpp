@@ -155,7 +155,9 @@ void PipeServer::RunAndReply(const String& document) {
   const int client = pipe_.GetClientProcess();
   const ServedJob served(job, client);
   const platform::ProcessWatch watch(client, [&job] { job.GetIPC().abort->Set(true); });
+  session_.BeginJob();
   RunJob(job);
+  session_.EndJob(job.GetIPC().abort->IsSet());
   pipe_.Write(DescribeResult(job, maxAnswer_));
 }
 

@@ -44,7 +44,7 @@ bool IsInteger(std::string_view token) {
 
 bool IsNumber(std::string_view token) {
   if (token == "nan" || token == "inf" || token == "-inf" || token == "-nan") return true;
-  if (token.starts_with('+')) token.remove_prefix(1);
+  if (token.starts_with('+') && !token.starts_with("+-")) token.remove_prefix(1);
   const bool isPlain = token.find_first_not_of("0123456789+-.eE") == token.npos;
   double value = 0;
   const auto [end, fault] = std::from_chars(token.data(), token.data() + token.size(), value);
@@ -124,15 +124,34 @@ bool AreTiles(std::string_view text) {
   return AreAll(tokens, IsInteger) && (mode == "Invariable" || mode == "Variable");
 }
 
+bool IsByte(std::string_view token) {
+  std::uint8_t value = 0;
+  const auto [end, fault] = std::from_chars(token.data(), token.data() + token.size(), value);
+  return fault == std::errc() && end == token.data() + token.size();
+}
+
+/// "name red green blue alpha null".
+bool IsColor(std::string_view text) {
+  Tokens tokens = SplitAtBlanks(text);
+  if (tokens.size() != 6 || !IsBoolean(tokens.back())) return false;
+  return AreAll(Tokens(tokens.begin() + 1, tokens.end() - 1), IsByte);
+}
+
 bool IsPalette(std::string_view text) {
   text = Trimmed(text);
   const std::size_t open = text.find('[');
-  if (open == text.npos || !text.ends_with(']') || !IsInteger(Trimmed(text.substr(0, open)))) {
-    return false;
+  if (open == text.npos || !text.ends_with(']')) return false;
+  const std::string_view count = Trimmed(text.substr(0, open));
+  if (!IsInteger(count)) return false;
+  std::uint64_t colors = 0;
+  std::string_view rest = Trimmed(text.substr(open + 1, text.size() - open - 2));
+  for (; !rest.empty(); ++colors) {
+    const std::size_t end = rest.find(')');
+    if (!rest.starts_with('(') || end == rest.npos || !IsColor(rest.substr(1, end - 1)))
+      return false;
+    rest = Trimmed(rest.substr(end + 1));
   }
-  std::uint64_t count = 0;
-  std::from_chars(text.data(), text.data() + open, count);
-  return static_cast<std::uint64_t>(std::count(text.begin(), text.end(), '(')) >= count;
+  return std::to_string(colors) == count;
 }
 
 bool Fits(const InputDeclaration& input, std::string_view text) {
@@ -227,6 +246,11 @@ String FindMisfit(const CommandDeclaration& declaration, const ParameterMap& inp
   for (const auto& [name, variable] : outputs) {
     const std::string misfit = UnknownName("output", name, declaration.outputs);
     if (!misfit.empty()) return String(misfit);
+    const std::string target = variable.ToUTF8();
+    if (!target.empty() && !target.starts_with('$')) {
+      return String("output " + name.ToUTF8() + ": " + Quoted(target) +
+                    " is no variable, which begins with $");
+    }
   }
   for (const InputDeclaration& input : declaration.inputs) {
     const String* const text = FindText(inputs.Find(input.name).object);

@@ -3,6 +3,7 @@
 #include <exception>
 
 #include "data/data_manager.h"
+#include "foundation/abandonment.h"
 #include "foundation/errors.h"
 #include "foundation/fault.h"
 
@@ -43,6 +44,7 @@ bool DcSrv::Stop() {
 }
 
 void DcSrv::Execute(DcSrvCmd& cmd) {
+  cmd.abandons_ = IsAbandoning();
   queue_.Push(&cmd);
   {
     std::unique_lock lock(cmd.mutex_);
@@ -67,6 +69,7 @@ void DcSrv::Serve(MTQueue<DcSrvCmd*>& queue) {
 
 void DcSrv::Run(DcSrvCmd& cmd, DcSrvContext& context) {
   TakeFault();
+  const AbandonScope abandonment(cmd.abandons_);
   try {
     cmd.Execute(context);
   } catch (const std::exception& thrown) {

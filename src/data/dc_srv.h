@@ -35,8 +35,9 @@ class VEXG_EXPORT DcSrvCmd {
   const char* const name_;
   std::mutex mutex_;
   std::condition_variable replied_;
-  bool done_ = false;  // the reply
-  String fault_;       // what the thread told while it ran this
+  bool done_ = false;      // the reply
+  bool abandons_ = false;  // as the thread that it works for
+  String fault_;           // what the thread told while it ran this
 };
 
 /// The thread of one open source, and the queue by which calls reach it. All calls into a plug-in's

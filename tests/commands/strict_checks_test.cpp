@@ -31,7 +31,7 @@ TEST(StrictChecks, TakeWhatTheReadersReadAndNothingElse) {
        {"", "ten", "1.5", "-1", "4294967296", "1 2", "0x10", "7a"}},
       {ValueKind::kNumber,
        {"0", "-1.5", "1e3", "nan", "-inf", " 2 "},
-       {"", "one", "1,5", "1.5m", "1e999", "1 2", "--1"}},
+       {"", "one", "1,5", "1.5m", "1e999", "1 2", "--1", "+-1"}},
       {ValueKind::kBoolean, {"0", "1"}, {"", "true", "2", "yes"}},
       {ValueKind::kWord, {"DoBasic", "DoExtended"}, {"", "dobasic", "Basic"}},
       {ValueKind::kURI, {"[a.tif] ", "[]", "[a b]"}, {"", "a.tif", "[a", "[a]b"}},
@@ -47,6 +47,10 @@ TEST(StrictChecks, TakeWhatTheReadersReadAndNothingElse) {
        {"1:2 [[a] [b c] ] ", "1:1 [[a]]"},
        {"1:2 [[a] ]", "[a] [b]", "1:1 [a]"}},
       {ValueKind::kTiles, {"256 256 0 0 0 0 0 Variable"}, {"256 256", "256 256 0 0 0 0 0 Never"}},
+      {ValueKind::kPalette,
+       {"0 [] ", "1 [(red 255 0 0 255 0) ] ", "2 [(a 1 2 3 4 0)(b 0 0 0 0 1)]"},
+       {"", "1 []", "1 [(red x 0 0 255 0) ] ", "1 [(red 256 0 0 255 0) ] ", "1 [(red 1 2 3) ] ",
+        "1 [((( ] ", "2 [(red 255 0 0 255 0) ] ", "1 [(dark red 255 0 0 255 0) ] "}},
       {ValueKind::kText, {"", "anything"}, {}},
   };
   for (const auto& c : cases) {
@@ -73,6 +77,10 @@ TEST(StrictChecks, NameTheMistakeAndRunNothing) {
   } cases[] = {
       {"<Input Text=\"x\" Times=\"two\"/>", "input Times: \"two\" is no integer", ""},
       {"<Input Text=\"x\" Tims=\"2\"/>", "there is no input Tims; did you mean Times?", ""},
+      {"<Input Text=\"x\"/><Output Text=\"v\"/>", "output Text: \"v\" is no variable", ""},
+      {"<Input Text=\"x\" Expand=\"1\"/>", "means nothing; did you mean expand?", ""},
+      {"<DependsOn name=\"b\"/><Input Text=\"x\"/>",
+       "the attribute name of DependsOn means nothing; did you mean Name?", ""},
       {"<Input Text=\"x\"/><Output Txt=\"$v\"/>", "there is no output Txt; did you mean Text?", ""},
       {"<Input Text=\"x\"/><DependsOn Name=\"b\"/>", "no command before this one is called \"b\"",
        ""},

@@ -199,13 +199,23 @@ class Roots(PipeTest, FolderTest):
         self.serve("test", "--root", self.inside, "--allow", "network")
         secret = self.outside / "secret.xml"
         secret.write_text("<Dimap_Document><a>secret</a></Dimap_Document>")
-        word = "PLEIADES_DIM"
+        shutil.copy(secret, self.inside / "plain.xml")
+        (self.inside / "link.xml").symlink_to(secret)
+
+        def read(kind, name):
+            return self.submit(
+                '<Job><Reasons/><Command Name="m" ID="CreateMetadataCommand">'
+                f'<Input ConnStr="PLEIADESDIM|{name}|{kind}"/></Command></Job>')["m"]
+
+        self.assertEqual(read("XmlUrl", f"file://{self.inside}/plain.xml")["Result"], "Success")
+        for name in (secret, self.inside / "link.xml"):
+            self.assertIn("allowed here", read("XmlFile", name)["Reason"])
         for name in (f"file://{secret}", f"file:{secret}", f"file://localhost{secret}",
-                     f"FILE://{secret}", f"file://{self.inside}/%2e%2e/out/secret.xml"):
-            result = self.submit(
-                '<Job><Reasons/><Command Name="m" ID="AccessMetadataCommand">'
-                f'<Input ConnStr="{word}|{name}|XmlUrl" CONNSTR="{word}|{name}|XmlUrl"/></Command></Job>')
-            self.assertEqual(result["m"]["Result"], "Failed", name)
+                     f"FILE://{secret}", f"file://{self.inside}/link.xml",
+                     f"file://{self.inside}/%2e%2e/out/secret.xml"):
+            result = read("XmlUrl", name)
+            self.assertEqual(result["Result"], "Failed", name)
+            self.assertRegex(result["Reason"], "allowed here|no address")
 
     def test_the_kernel_keeps_the_server_too(self):
         self.serve("test", "--root", self.inside)

@@ -322,6 +322,30 @@ class Clients(Server):
         self.assertEqual((copy.returncode, err), (1, "vexg: the job was aborted; nothing was written\n"))
         self.assertEqual(list(self.folder.glob("*copy.dat*")), [])
 
+    def test_what_an_aborted_job_made_does_not_pass_for_whole(self):
+        self.serve()
+        big = write_orva(self.folder / "big.dat", 20000, 20000, 1)
+        last = '<DependsOn Name="@ALL"/>'
+        job = (f'<Job><Command Name="o" ID="OpenRasterCommand"><Input ConnStr="{big}"/><Output URI="$u"/></Command>'
+               f'<Command Name="n" ID="CreateRasterCommand">{last}<Input SrcURI="$u" ConnStr="{self.folder}/new.tif"'
+               ' Format="TIFF"/><Output URI="$n"/></Command>'
+               f'<Command Name="c" ID="CopyRasterCommand">{last}<Input SrcURI="$u" DstURI="$n"/></Command>'
+               f'<Command Name="x" ID="CloseRasterCommand">{last}<Input URI="$n"/></Command></Job>')
+        for end in ("abort", "kill"):
+            client = start("submit", "--server", "test", "-")
+            client.stdin.write(job)
+            client.stdin.close()
+            self.until(lambda: any("CopyRaster" in entry["commands"] for entry in self.jobs()))
+            if end == "kill":
+                client.kill()
+            else:
+                run("abort", "test", str(self.jobs()[0]["job"]))
+            client.wait(timeout=30)
+            client.stdout.close()
+            client.stderr.close()
+            self.until(lambda: json.loads(run("open", "test", "--json")[1]) == [])
+            self.until(lambda: list(self.folder.glob("new.tif*")) == [])
+
     def test_a_closed_output_aborts_the_job_and_leaves_nothing(self):
         self.serve()
         for verb in (["submit", "--server", "test", "-"], ["run", "-"]):

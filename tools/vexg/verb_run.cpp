@@ -2,8 +2,10 @@
 
 #include <CLI/CLI.hpp>
 
+#include "commands/catalog_session.h"
 #include "commands/job_parser.h"
 #include "commands/job_result.h"
+#include "foundation/abandonment.h"
 #include "platform/interrupt.h"
 #include "progress_view.h"
 #include "result_output.h"
@@ -27,6 +29,10 @@ int RunJobFile(const JobOptions& options) {
     const platform::InterruptWatch interrupts([&] { abort->Set(true); }, output.IsStandardOutput());
     ProgressView view(job.GetIPC().progress, ChooseProgressStyle(options.progress, options.quiet));
     RunJob(job);
+    if (abort->IsSet()) {
+      const AbandonScope abandonment;  // of files that aren't whole
+      catalog::Empty();
+    }
     result = JobResultWriter(job).Write();
     outcome = OutcomeOf(result, abort->IsSet());
     view.SetOutcome(outcome);
