@@ -14,13 +14,14 @@ IPCPtr KeepUsable(Channel* channel) {
 
 }  // namespace
 
-SharedMemory::SharedMemory(const String& name, unsigned size) : name_(name), size_(size) {}
+SharedMemory::SharedMemory(const String& name, unsigned size, std::size_t used)
+    : name_(name), size_(size), used_(used) {}
 
 SharedMemory::~SharedMemory() = default;
 
 bool SharedMemory::Open() {
   block_.reset();
-  block_ = platform::SharedMemoryBlock::Open(name_.ToUTF8(), size_);
+  block_ = platform::SharedMemoryBlock::Open(name_.ToUTF8(), size_, used_);
   return block_ != nullptr;
 }
 

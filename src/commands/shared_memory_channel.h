@@ -1,5 +1,6 @@
 #pragma once
 
+#include <cstddef>
 #include <memory>
 
 #include "foundation/containers.h"
@@ -14,7 +15,9 @@ class SharedMemoryBlock;
 /// A view of a block of named memory that another process made and owns.
 class VEXG_EXPORT SharedMemory {
  public:
-  SharedMemory(const String& name, unsigned size);
+  /// @param size  bytes that the block has at least.
+  /// @param used  its first bytes that are used; all of `size` when 0.
+  SharedMemory(const String& name, unsigned size, std::size_t used = 0);
   virtual ~SharedMemory();
   SharedMemory(const SharedMemory&) = delete;
   SharedMemory& operator=(const SharedMemory&) = delete;
@@ -36,13 +39,17 @@ class VEXG_EXPORT SharedMemory {
  private:
   String name_;
   unsigned size_;
+  std::size_t used_;
   std::unique_ptr<platform::SharedMemoryBlock> block_;
 };
 
 /// A SharedMemory that is opened when it is made.
 class VEXG_EXPORT ConnectSharedMemory : public SharedMemory {
  public:
-  ConnectSharedMemory(const String& name, unsigned size) : SharedMemory(name, size) { Open(); }
+  ConnectSharedMemory(const String& name, unsigned size, std::size_t used = 0)
+      : SharedMemory(name, size, used) {
+    Open();
+  }
 };
 
 /// An abort flag and a progress report in a block of named memory, through which another process

@@ -54,14 +54,15 @@ bool SharedMemoryBlock::WasCut() const {
 }
 
 std::unique_ptr<SharedMemoryBlock> SharedMemoryBlock::Open(const std::string& name,
-                                                           std::size_t size) {
+                                                           std::size_t size, std::size_t used) {
   const std::string path = SystemName(name);
   if (path.empty() || size == 0) return nullptr;
   const FileDescriptor file(shm_open(path.c_str(), O_RDWR, 0));
-  if (!file.IsOpen() || !IsUsable(file.Get(), size) || !Reserve(file.Get(), size)) return nullptr;
-  unsigned char* const data = Map(file.Get(), size);
+  if (!file.IsOpen() || used > size || !IsUsable(file.Get(), size)) return nullptr;
+  const std::size_t mapped = used != 0 ? used : size;
+  unsigned char* const data = Reserve(file.Get(), mapped) ? Map(file.Get(), mapped) : nullptr;
   if (data == nullptr) return nullptr;
-  std::unique_ptr<SharedMemoryBlock> block(new SharedMemoryBlock(data, size, {}));
+  std::unique_ptr<SharedMemoryBlock> block(new SharedMemoryBlock(data, mapped, {}));
   return block->guard_->IsActive() ? std::move(block) : nullptr;
 }
 

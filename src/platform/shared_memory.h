@@ -21,10 +21,12 @@ class VEXG_EXPORT SharedMemoryBlock {
  public:
   /// Opens a block that exists, for reading and writing.
   /// @param name  UTF-8; 1 to 255 bytes, without "/" or NUL.
-  /// @param size  bytes to map, at least 1. The block may be larger.
+  /// @param size  bytes that the block has at least, 1 or more.
+  /// @param used  its first bytes that are mapped, and memory had for; all of `size` when 0.
   /// @return null when there is no such block, it belongs to another user, it is smaller than
-  ///         `size`, memory for all of it can't be had, or it can't be mapped.
-  static std::unique_ptr<SharedMemoryBlock> Open(const std::string& name, std::size_t size);
+  ///         `size`, memory for the used bytes can't be had, or they can't be mapped.
+  static std::unique_ptr<SharedMemoryBlock> Open(const std::string& name, std::size_t size,
+                                                 std::size_t used = 0);
 
   /// Makes a block of zeros that only this user can open, and removes its name when destroyed.
   /// @return null when the name is taken or not allowed, or memory is short.

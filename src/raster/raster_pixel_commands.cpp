@@ -60,8 +60,10 @@ class BlockCommand : public RasterCommand {
       return TooSmall("PixelDataBufSize", elements * sizeof(T));
     if (stateBytes < elements) return TooSmall("PixelValueStateBufSize", elements);
 
-    const ConnectSharedMemory pixelMemory(Read<String>("PixelDataBufName"), pixelBytes);
-    const ConnectSharedMemory stateMemory(Read<String>("PixelValueStateBufName"), stateBytes);
+    const ConnectSharedMemory pixelMemory(Read<String>("PixelDataBufName"), pixelBytes,
+                                          elements * sizeof(T));
+    const ConnectSharedMemory stateMemory(Read<String>("PixelValueStateBufName"), stateBytes,
+                                          elements);
     if (pixelMemory.GetData() == nullptr) return NoMemory(pixelMemory);
     if (stateMemory.GetData() == nullptr) return NoMemory(stateMemory);
     const ArrayDims dims(static_cast<unsigned>(elements));

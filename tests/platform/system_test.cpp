@@ -50,6 +50,12 @@ TEST(SharedMemoryBlock, SurvivesWhoeverCutsIt) {
   ASSERT_NE(block, nullptr);
   fstat(file, &status);
   EXPECT_GE(static_cast<std::size_t>(status.st_blocks) * 512, size);  // it only promised before
+  ASSERT_EQ(ftruncate(file, 100 * size), 0);
+  const auto part = SharedMemoryBlock::Open(name, 100 * size, 2 * size);
+  ASSERT_NE(part, nullptr);
+  EXPECT_EQ(part->GetSize(), 2 * size);
+  fstat(file, &status);
+  EXPECT_LT(static_cast<std::size_t>(status.st_blocks) * 512, 3 * size);  // no more than is used
   const auto other = SharedMemoryBlock::Create(name + "-other", size);
   ASSERT_NE(other, nullptr);
   std::fill_n(block->GetData(), size, 5);
