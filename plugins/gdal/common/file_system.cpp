@@ -221,6 +221,7 @@ class FileSystem final : public VSIFilesystemHandler {
     errno = 0;
     VSIVirtualHandle* const file = isNew ? OpenNew(path) : OpenOld(path, isForWriting);
     if (file != nullptr) return file;
+    if (errno == EISDIR) return plain_.Open(path, access, setError, options);  // devices, pipes
     const int code = errno != 0 ? errno : EIO;
     if (!IsAnswer(code, isForWriting && !isNew)) FileFaults::Note(path, code);
     if (setError) {

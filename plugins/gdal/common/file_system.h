@@ -8,8 +8,7 @@ namespace lumo::gdal {
 /// - an interrupted or short call is carried on, and every failure is noted (FileFaults), also of
 ///   calls whose result a driver does not look at;
 /// - a side file (".aux.xml") that is written anew is made beside the old one, which it replaces
-///   when it is whole;
-/// - only regular files open.
+///   when it is whole.
 void InstallFileSystem();
 
 }  // namespace lumo::gdal
