@@ -16,7 +16,7 @@ import unittest.mock
 import xml.etree.ElementTree as ElementTree
 
 import vexg_client
-from support import SOURCE, PipeTest, run, start, write_orva
+from support import SANITIZED, SOURCE, PipeTest, run, start, write_orva
 
 WAIT = '<Command Name="w" ID="ExampleWaitCommand"><Input Seconds="60"/></Command>'
 SUM = '<Job><Command Name="s" ID="ExampleSumCommand"><Input Values="1:2 [1 2] "/></Command></Job>'
@@ -314,7 +314,7 @@ class Clients(Server):
 
     def test_an_aborted_verb_leaves_no_output(self):
         self.serve()
-        big = write_orva(self.folder / "big.dat", 20000, 20000, 1)
+        big = write_orva(self.folder / "big.dat", 40000, 40000, 1)
         copy = start("copy", str(big), str(self.folder / "copy.dat"), "--server", "test")
         self.until(lambda: any("CopyRaster" in job["commands"] for job in self.jobs()))
         self.assertEqual(run("abort", "test", str(self.jobs()[0]["job"]))[0], 0)
@@ -324,7 +324,7 @@ class Clients(Server):
 
     def test_what_an_aborted_job_made_does_not_pass_for_whole(self):
         self.serve()
-        big = write_orva(self.folder / "big.dat", 20000, 20000, 1)
+        big = write_orva(self.folder / "big.dat", 40000, 40000, 1)
         last = '<DependsOn Name="@ALL"/>'
         job = (f'<Job><Command Name="o" ID="OpenRasterCommand"><Input ConnStr="{big}"/><Output URI="$u"/></Command>'
                f'<Command Name="n" ID="CreateRasterCommand">{last}<Input SrcURI="$u" ConnStr="{self.folder}/new.tif"'
@@ -362,6 +362,7 @@ class Clients(Server):
 
 
 class Limits(Server):
+    @unittest.skipIf(SANITIZED, "sanitizers take address space without end")
     def test_memory_that_is_short_ends_a_message_and_not_the_server(self):
         limit = 1 << 30
         self.serve(preexec_fn=lambda: resource.setrlimit(resource.RLIMIT_AS, (limit, limit)))

@@ -14,6 +14,7 @@ import zlib
 SOURCE = pathlib.Path(os.environ["VEXG_SOURCE"])
 BUILD = pathlib.Path(os.environ["VEXG_BUILD"])
 VEXG = BUILD / "bin" / "vexg"
+SANITIZED = os.environ.get("VEXG_SANITIZE", "") != ""
 EXAMPLES = BUILD / "lib" / "libvexg_example_commands.so"
 DATA = pathlib.Path(os.environ.get("VEXG_DATA", SOURCE / "../shared/data")).resolve()
 
