@@ -5,6 +5,7 @@
 #include <filesystem>
 #include <mutex>
 #include <string_view>
+#include <utility>
 
 #include "data/file_uri.h"
 #include "foundation/environment.h"
@@ -21,6 +22,7 @@ AccessPolicy gPolicy;
 std::atomic<bool> gAreFilesLimited{false};
 thread_local unsigned tOwnMemory = 0;
 thread_local unsigned tAdmitted = 0;
+thread_local String tRefusal;
 
 bool IsOneOf(std::string_view text, std::initializer_list<std::string_view> list) {
   return std::find(list.begin(), list.end(), text) != list.end();
@@ -241,6 +243,14 @@ bool SetAccessPolicy(const AccessPolicy& policy) {
   gAreFilesLimited = !resolved.roots.empty();
   platform::SetFileGate(gAreFilesLimited ? PassGate : nullptr);
   return true;
+}
+
+void NoteRefusal(const String& text) {
+  tRefusal = text;
+}
+
+String TakeRefusal() {
+  return std::exchange(tRefusal, String());
 }
 
 bool AreFilesLimited() {

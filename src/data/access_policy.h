@@ -33,6 +33,12 @@ VEXG_EXPORT AccessPolicy GetAccessPolicy();
 /// @param writing  the file is to be made, changed, renamed or removed.
 VEXG_EXPORT bool MayReachFile(const std::string& path, bool writing);
 
+/// Keeps the refusal of a file that a library opened on this thread, for whoever called it.
+VEXG_EXPORT void NoteRefusal(const String& text);
+
+/// Takes the refusal off the thread; no text when there was none since the last call.
+VEXG_EXPORT String TakeRefusal();
+
 /// True when a policy with roots is in force.
 VEXG_EXPORT bool AreFilesLimited();
 

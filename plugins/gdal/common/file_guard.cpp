@@ -15,8 +15,6 @@ namespace {
 
 namespace fs = std::filesystem;
 
-thread_local String tRefusal;
-
 /// GDAL's own folder of tables, which it may read whatever the policy says.
 bool IsDataFile(const std::string& path) {
   static const std::string folder = [] {
@@ -40,7 +38,7 @@ bool May(const char* path, bool writing) {
   std::error_code missing;
   const bool isThere = fs::exists(fs::symlink_status(path, missing));
   if (!writing && (!isThere || fs::is_directory(path, missing))) return false;
-  tRefusal = refusal;
+  NoteRefusal(refusal);
   CPLError(CE_Failure, CPLE_OpenFailed, "%s", refusal.ToUTF8().c_str());
   return false;
 }
@@ -132,8 +130,9 @@ class ClosedFiles final : public VSIFilesystemHandler {
   bool IsAllowed(const char* path) const {
     if (GetAccessPolicy().*allowed_) return true;
     errno = EACCES;
-    tRefusal = String(std::string(path) + ": not allowed here");
-    CPLError(CE_Failure, CPLE_OpenFailed, "%s", tRefusal.ToUTF8().c_str());
+    const std::string refusal = std::string(path) + ": not allowed here";
+    NoteRefusal(String(refusal));
+    CPLError(CE_Failure, CPLE_OpenFailed, "%s", refusal.c_str());
     return false;
   }
 
@@ -169,14 +168,13 @@ void InstallFileGuard() {
 }
 
 void ForgetRefusals() {
-  tRefusal = String();
+  TakeRefusal();
 }
 
 bool WasRefusedNothing() {
-  if (tRefusal.GetLength() == 0) return true;
-  SetFault(tRefusal);
-  ForgetRefusals();
-  return false;
+  const String refusal = TakeRefusal();
+  if (refusal.GetLength() != 0) SetFault(refusal);
+  return refusal.GetLength() == 0;
 }
 
 bool MayReachAllFiles(GDALDatasetH dataset) {
