@@ -5,6 +5,15 @@
 #include <iterator>
 
 namespace lumo {
+namespace {
+
+/// Joins what has left when the library goes: no later thread comes that would.
+struct JoinAtEnd {
+  ~JoinAtEnd() { ThreadRoll::Get().JoinLeft(); }
+};
+const JoinAtEnd gJoinAtEnd;
+
+}  // namespace
 
 ThreadRoll& ThreadRoll::Get() {
   static auto& roll = *new ThreadRoll;
@@ -26,12 +35,19 @@ std::vector<std::thread> ThreadRoll::TakeLeft() {
 }
 
 void ThreadRoll::Keep(std::thread thread) {
-  std::vector<std::thread> left;
   {
     const std::lock_guard lock(mutex_);
     kept_.push_back(std::move(thread));
-    left = TakeLeft();
     changed_.notify_all();
+  }
+  JoinLeft();
+}
+
+void ThreadRoll::JoinLeft() {
+  std::vector<std::thread> left;
+  {
+    const std::lock_guard lock(mutex_);
+    left = TakeLeft();
   }
   for (std::thread& one : left) one.join();
 }

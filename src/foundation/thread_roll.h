@@ -28,6 +28,9 @@ class ThreadRoll {
   /// See JoinThreads.
   bool Join(double seconds);
 
+  /// Joins the threads that have left, without waiting for others.
+  void JoinLeft();
+
  private:
   std::vector<std::thread> TakeLeft();
   bool AllStay() const;
