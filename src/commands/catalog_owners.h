@@ -15,7 +15,7 @@ using Owners = std::map<const Session*, unsigned>;
 
 std::map<URI, Owners>& AllOwners();
 
-/// What jobs opened that were aborted, and that nobody has closed since.
+/// Objects that aborted jobs opened, and that nobody has closed since.
 std::set<URI>& Unfinished();
 
 /// Notes one more open of this thread's session.

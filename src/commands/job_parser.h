@@ -10,7 +10,7 @@ namespace lumo {
 /// with its children, and noted in the job's list of unknown commands. An element Reasons asks the
 /// result document to say why commands failed. The attribute Checks of Job is a JobChecks.
 ///
-/// What the document gets wrong without being malformed is noted beside: an element or attribute
+/// Notes what the document gets wrong without being malformed: an element or attribute
 /// that is nearly one of those known in the job's faults, and what concerns one command, such as a
 /// DependsOn without an earlier command of that name, as the command's complaint.
 ///

@@ -45,7 +45,7 @@ XMLElementPtr DescribeUnknown(const UnknownCommand& command, bool withHint) {
   return element;
 }
 
-/// What the document gets wrong, in elements Fault ahead of the commands.
+/// Writes what the document gets wrong, in elements Fault ahead of the commands.
 void AddFaults(const Job& job, XMLDocumentRoot& root) {
   const auto add = [&](const String& reason) {
     const XMLElementPtr fault(new XMLElement("Fault"));

@@ -11,9 +11,9 @@
 
 namespace lumo {
 
-/// What the stages of one run share: the variables through which outputs become inputs, and which
-/// command may start next.
-/// Threads: everything goes through its lock, which is never held while a command runs.
+/// Holds all that the stages of one run share: the variables through which outputs become inputs,
+/// and which command may start next. Threads: everything goes through its lock, which is never held
+/// while a command runs.
 class JobVariables {
  public:
   explicit JobVariables(Job& job);

@@ -16,7 +16,7 @@ enum class JobChecks { kTold, kStrict };
 /// "Told", "Strict".
 VEXG_EXPORT std::span<const EnumWord<JobChecks>> WordsOf(JobChecks);
 
-/// What is wrong with the names and values of a command's inputs and the names of its outputs, in
+/// The first fault in the names and values of a command's inputs and the names of its outputs, in
 /// one line; no text when all of them can be read as they are declared. An input that holds no text
 /// is left to the command.
 /// @param outputs  output name to variable, as in a job.

@@ -196,7 +196,7 @@ bool IsOption(const std::string& piece, std::string& value) {
   return isName;
 }
 
-/// What a place inside a file is called is no file, even if there is one of that name.
+/// The name of a place inside a file is no file, even if there is one of that name.
 bool MayUseOption(const std::string& piece, const std::string& value, const AccessPolicy& policy) {
   if (piece.starts_with("SUBDATASET=") || value.empty()) return true;
   const bool leadsOn = Exists(value) || IsVirtualName(value) || HoldsAddress(value);

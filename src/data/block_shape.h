@@ -5,9 +5,9 @@
 
 namespace lumo {
 
-/// What a block of pixels holds that is asked for, or given, under an interleave: bands, size and
-/// the shape of its arrays. Without an interleave it holds the first band alone, however many are
-/// named (see BandsOfBlock).
+/// The contents of a block of pixels that is asked for, or given, under an interleave: bands, size
+/// and the shape of its arrays. Without an interleave it holds the first band alone, however many
+/// are named (see BandsOfBlock).
 struct BlockShape {
   BlockShape(const SubRect& rect, const Array<unsigned>& named, Interleave order)
       : interleave(order),

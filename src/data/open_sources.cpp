@@ -10,7 +10,7 @@
 namespace lumo {
 namespace {
 
-/// What is open or about to be made.
+/// The sources that are open or about to be made.
 struct Sources {
   std::mutex mutex;
   std::set<const SourceStamp*> stamps;

@@ -12,7 +12,7 @@ struct FileFault {
   std::string path;  ///< as the operation had it
   int code = 0;      ///< the system's number, as errno has it
 
-  /// What the code means, in the system's words.
+  /// The meaning of the code, in the system's words.
   VEXG_EXPORT std::string Text() const;
 };
 

@@ -93,7 +93,7 @@ bool AllowAll(Ruleset& rules, const std::vector<std::string>& paths, std::uint64
   return allowed;
 }
 
-/// What libraries of the system read, and what the process shares with its clients.
+/// Places that libraries of the system read, and that the process shares with its clients.
 bool AllowSystem(Ruleset& rules, bool network) {
   std::vector<std::string> read{
       "/usr",          "/lib",          "/lib64",        "/etc/ld.so.cache", "/etc/localtime",

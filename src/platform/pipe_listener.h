@@ -4,7 +4,7 @@
 
 namespace lumo::platform {
 
-/// What the clients of a listener can hold.
+/// Bounds on what the clients of a listener can hold.
 struct ListenerLimits {
   double idleSeconds = 30.0;  ///< without a byte, before the first message is whole
   unsigned clients = 1024;    ///< connected at a time

@@ -11,7 +11,7 @@
 namespace lumo {
 namespace {
 
-/// What becomes of the values of pixels that are not valid.
+/// How the values of pixels that are not valid are copied.
 enum class InvalidPixels : unsigned {
   kTold = 0,   ///< they are copied
   kNoData = 1  ///< the target's no-data value takes their place, where a band has one
@@ -23,7 +23,7 @@ std::span<const EnumWord<InvalidPixels>> WordsOf(InvalidPixels) {
   return kWords;
 }
 
-/// What the middle stage of a copy does, and what it found.
+/// The orders of the middle stage of a copy, and what it found.
 template <typename T>
 struct CopyPlan : Object {
   explicit CopyPlan(unsigned bands) : valid(bands), fill(bands) {}

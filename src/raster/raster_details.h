@@ -7,8 +7,8 @@
 #include "foundation/array.h"
 #include "metadata/metadata.h"
 
-// What a raster tells of itself beside the fields of its RasterDef. It travels in the metadata of
-// the RasterDef as internal entries, all of them texts:
+// Details are all that a raster tells of itself beside the fields of its RasterDef. They travel in
+// the metadata of the RasterDef as internal entries, all of them texts:
 //
 //   Bands/<n>/NoDataValue    the no-data value of band n, from 0, exactly; of 64-bit integers
 //   Bands/<n>/Description    its name

@@ -8,7 +8,7 @@
 
 namespace lumo {
 
-/// What a second open of a source does that is open already.
+/// The effect of a second open of a source that is open already.
 enum class SourceCheck {
   kTold,      ///< it shares the raster that stands on the source
   kCompared,  ///< as long as the files of the source have not changed

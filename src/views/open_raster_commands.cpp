@@ -68,7 +68,7 @@ const CommandDeclaration kOpen{
       "", &WordsIn<SourceCheck>}},
     OpenOutputs()};
 
-/// What the opening of a source gives.
+/// The result of opening a source.
 struct Opened {
   DataConnectionPtr source;
   DataConnectionPtr pyramid;

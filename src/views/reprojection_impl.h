@@ -124,7 +124,7 @@ void RunEach(std::size_t count, const Call& call) {
 
 }  // namespace detail
 
-/// What the map says of a part.
+/// The pieces that the map makes of a part.
 template <typename T>
 struct Reprojection<T>::MappedPart {
   std::vector<WarpPiece> pieces;

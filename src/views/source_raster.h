@@ -2,7 +2,7 @@
 
 namespace lumo {
 
-/// What a raster on a source of its own can say of the source.
+/// A raster on a source of its own, as it speaks of the source.
 class SourceRaster {
  public:
   virtual ~SourceRaster() = default;

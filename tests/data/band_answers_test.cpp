@@ -26,7 +26,7 @@ TEST(BandAnswers, AreThoseOfTheSourceInAnyOrderAndAfterChanges) {
   walk(0, kBands);
   EXPECT_LT(calls, 100u);
 
-  // What is asked out of its turn, or by few, comes from the source itself.
+  // An answer out of its turn, or to few questions, comes from the source itself.
   offset = 7;
   walk(100, 100 + answers.kPatience);
   walk(5, 6);

@@ -11,7 +11,7 @@
 #include "views/spatial_subset_raster.h"
 #include "views/spectral_subset_raster.h"
 
-// What a view, a level or an overlap shows lies where it lies in the source, whatever the model.
+// The pixels of a view, a level or an overlap lie where it lies in the source, whatever the model.
 
 namespace lumo::test {
 namespace {

@@ -10,8 +10,8 @@
 
 namespace lumo::host {
 
-/// What libjpeg works on. It writes into memory, so that only its own errors jump back into Guard;
-/// nothing that has a destructor may stand between.
+/// The state that libjpeg works on. It writes into memory, so that only its own errors jump back
+/// into Guard; nothing that has a destructor may stand between.
 struct JpegWriter::Impl {
   explicit Impl(const OutputFile& output) : file(output), shown(output.GetShownName()) {
     jpeg.err = jpeg_std_error(&errors);

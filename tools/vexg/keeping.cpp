@@ -135,7 +135,7 @@ bool IsSameSystem(const std::string& a, const std::string& b) {
   return first.SetFromString(String(a)) && second.SetFromString(String(b)) && first.IsEqual(second);
 }
 
-/// What the user calls a kind of detail; null for what is compared elsewhere.
+/// The user's name for a kind of detail; null for what is compared elsewhere.
 const char* KindOf(const std::string& name) {
   static constexpr std::pair<const char*, const char*> kKinds[] = {
       {"/NoDataValue", nullptr},           {"/Description", "the names of bands"},

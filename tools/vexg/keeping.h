@@ -9,7 +9,7 @@
 
 namespace lumo::host {
 
-/// What a raster file that is made does not keep of what was put in.
+/// The losses of a raster file that is made, against what was put in.
 class Losses {
  public:
   /// @param shown   what the user calls the file.
@@ -32,7 +32,7 @@ class Losses {
   std::vector<std::string> lost_;
 };
 
-/// What a raster holds that a format may lose.
+/// The contents of a raster that a format may lose.
 struct RasterContents {
   RasterInfo info;
   std::vector<std::uint64_t> valid;  ///< valid pixels of each band; empty: not counted
@@ -50,12 +50,12 @@ void AddDetailsQuery(JobDraft& draft, const std::string& name, const String& ras
 void AddValidityQuery(JobDraft& draft, const std::string& name, const String& raster,
                       bool withValues = false);
 
-/// What AddQuery and AddDetailsQuery said of a raster.
+/// The answers of AddQuery and AddDetailsQuery about a raster.
 RasterContents ReadContents(const JobResults& results, const std::string& name);
-/// What a command of AddValidityQuery, or one that copies, counted.
+/// The counts of a command of AddValidityQuery, or of one that copies.
 std::vector<std::uint64_t> ReadValidPixels(const JobResults& results, const std::string& step);
 
-/// What a file that was made holds, with what was put in.
+/// The contents of a file that was made, with those that were put in.
 struct MadeRaster {
   RasterContents put;
   RasterContents made;

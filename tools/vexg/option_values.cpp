@@ -32,7 +32,7 @@ std::optional<std::string> FindWord(const Strings& words, const std::string& tex
   return {};
 }
 
-/// What other programs call the words of ours.
+/// Names that other programs have for words of ours.
 std::string Translate(const std::string& text) {
   static const std::map<std::string, std::string> kNames{{"bilinear", "linear"},
                                                          {"bicubic", "cubic"},

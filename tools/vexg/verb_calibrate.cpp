@@ -238,8 +238,8 @@ FillValues NoDataOf(const Options& options, unsigned bands, const FillValues& ch
   return chosen;
 }
 
-/// What the result shall hold. No results that are pixels with data are NaN: of floating-point
-/// types nothing need be counted.
+/// The contents that the result shall have. No results that are pixels with data are NaN: of
+/// floating-point types nothing need be counted.
 RasterContents Wanted(const Options& options, const JobResults& results) {
   RasterContents put = ReadContents(results, "source");
   put.info.dataType = TypeCode(options);
