@@ -89,61 +89,52 @@ int Transfer(std::uint64_t offset, std::span<const Piece> pieces, Call&& call) {
   return 0;
 }
 
+/// False, with errno and the fault told, when the file gate refuses the file.
+bool IsLetThrough(const std::string& path, bool writing, std::string* fault) {
+  if (PassesFileGate(path, writing, fault)) return true;
+  errno = EACCES;
+  return false;
+}
+
+/// Opens a regular file; none, with errno and the fault told, when that fails.
+FileDescriptor OpenRegular(const std::string& path, int mode, std::string* fault) {
+  FileDescriptor file(RetryInterrupted(
+      [&] { return open(path.c_str(), mode | O_CLOEXEC | O_NONBLOCK, kReadableByAll); }));
+  if (!file.IsOpen()) {
+    FailBySystem(fault, path, errno);
+  } else if (!IsRegular(file.Get())) {
+    file.Close();
+    Fail(fault, path, "not a file");
+    errno = EISDIR;
+  }
+  return file;
+}
+
 }  // namespace
 
 std::unique_ptr<RandomAccessFile> RandomAccessFile::Open(const std::string& path, Access access,
                                                          std::string* fault, Gate gate) {
-  if (gate == Gate::kAsk && !PassesFileGate(path, access == Access::kUpdate, fault)) {
-    errno = EACCES;
-    return nullptr;
-  }
-  const int mode = (access == Access::kRead ? O_RDONLY : O_RDWR) | O_CLOEXEC | O_NONBLOCK;
-  FileDescriptor file(RetryInterrupted([&] { return open(path.c_str(), mode); }));
-  if (!file.IsOpen()) {
-    FailBySystem(fault, path, errno);
-    return nullptr;
-  }
-  if (!IsRegular(file.Get())) {
-    Fail(fault, path, "not a file");
-    errno = EISDIR;
-    return nullptr;
-  }
+  const bool writing = access == Access::kUpdate;
+  if (gate == Gate::kAsk && !IsLetThrough(path, writing, fault)) return nullptr;
+  FileDescriptor file = OpenRegular(path, writing ? O_RDWR : O_RDONLY, fault);
+  if (!file.IsOpen()) return nullptr;
   return std::unique_ptr<RandomAccessFile>(new RandomAccessFile(path, file.Release()));
 }
 
 std::unique_ptr<RandomAccessFile> RandomAccessFile::CreateOrEmpty(const std::string& path,
                                                                   std::string* fault) {
-  if (!PassesFileGate(path, true, fault)) {
-    errno = EACCES;
-    return nullptr;
-  }
-  constexpr int kMode = O_RDWR | O_CREAT | O_CLOEXEC | O_NONBLOCK;
-  FileDescriptor file(RetryInterrupted([&] { return open(path.c_str(), kMode, kReadableByAll); }));
-  if (!file.IsOpen()) {
-    FailBySystem(fault, path, errno);
-    return nullptr;
-  }
-  if (!IsRegular(file.Get())) {
-    Fail(fault, path, "not a file");
-    errno = EISDIR;
-    return nullptr;
-  }
+  if (!IsLetThrough(path, true, fault)) return nullptr;
+  FileDescriptor file = OpenRegular(path, O_RDWR | O_CREAT, fault);
+  if (!file.IsOpen()) return nullptr;
   std::unique_ptr<RandomAccessFile> opened(new RandomAccessFile(path, file.Release()));
   return opened->SetSize(0, fault) ? std::move(opened) : nullptr;
 }
 
 std::unique_ptr<RandomAccessFile> RandomAccessFile::Create(const std::string& path,
                                                            std::string* fault) {
-  if (!PassesFileGate(path, true, fault)) {
-    errno = EACCES;
-    return nullptr;
-  }
-  constexpr int kMode = O_RDWR | O_CREAT | O_EXCL | O_CLOEXEC;
-  FileDescriptor file(RetryInterrupted([&] { return open(path.c_str(), kMode, kReadableByAll); }));
-  if (!file.IsOpen()) {
-    FailBySystem(fault, path, errno);
-    return nullptr;
-  }
+  if (!IsLetThrough(path, true, fault)) return nullptr;
+  FileDescriptor file = OpenRegular(path, O_RDWR | O_CREAT | O_EXCL, fault);
+  if (!file.IsOpen()) return nullptr;
   return std::unique_ptr<RandomAccessFile>(new RandomAccessFile(path, file.Release()));
 }
 
