@@ -51,4 +51,8 @@ void EndProcess(int code) {
   _exit(code);
 }
 
+void DropProcess(int code) {
+  _exit(code);
+}
+
 }  // namespace lumo::platform

@@ -30,4 +30,8 @@ VEXG_EXPORT bool OutputIsClosed();
 /// is written before.
 [[noreturn]] VEXG_EXPORT void EndProcess(int code);
 
+/// The same, without what the standard streams still hold: no thread that is in the middle of
+/// writing it is waited for.
+[[noreturn]] VEXG_EXPORT void DropProcess(int code);
+
 }  // namespace lumo::platform

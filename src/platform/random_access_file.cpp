@@ -176,7 +176,11 @@ bool RandomAccessFile::Write(std::uint64_t offset, std::span<const ConstFilePiec
   const int error = Transfer(offset, pieces, [this](const iovec* at, int count, off_t place) {
     return pwritev(descriptor_, at, count, place);
   });
-  return error == 0 || FailBySystem(fault, path_, error == kEnded ? ENOSPC : error);
+  if (error != 0) return FailBySystem(fault, path_, error == kEnded ? ENOSPC : error);
+  std::uint64_t bytes = 0;
+  for (const ConstFilePiece& piece : pieces) bytes += piece.bytes;
+  writeBack_.Count(descriptor_, bytes);
+  return true;
 }
 
 bool RandomAccessFile::GetSize(std::uint64_t& bytes, std::string* fault) const {

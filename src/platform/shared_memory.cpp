@@ -2,6 +2,8 @@
 
 #include <cerrno>
 #include <fcntl.h>
+#include <mutex>
+#include <set>
 #include <sys/mman.h>
 #include <sys/stat.h>
 #include <unistd.h>
@@ -11,6 +13,26 @@
 
 namespace lumo::platform {
 namespace {
+
+/// The blocks that this process has made and not yet taken away.
+struct OwnBlocks {
+  std::mutex mutex;
+  std::set<std::string> paths;
+
+  static OwnBlocks& Get() {
+    static auto* const blocks = new OwnBlocks;  // for threads that outlast static objects
+    return *blocks;
+  }
+  void Add(const std::string& path) {
+    const std::lock_guard lock(mutex);
+    paths.insert(path);
+  }
+  void Remove(const std::string& path) {
+    const std::lock_guard lock(mutex);
+    paths.erase(path);
+    shm_unlink(path.c_str());
+  }
+};
 
 /// The system's form of a block's name; empty when the name is not allowed.
 std::string SystemName(const std::string& name) {
@@ -47,7 +69,9 @@ SharedMemoryBlock::SharedMemoryBlock(unsigned char* data, std::size_t size, std:
     : data_(data),
       size_(size),
       ownedPath_(std::move(ownedPath)),
-      guard_(std::make_unique<MemoryGuard>(data, size)) {}
+      guard_(std::make_unique<MemoryGuard>(data, size)) {
+  if (!ownedPath_.empty()) OwnBlocks::Get().Add(ownedPath_);
+}
 
 bool SharedMemoryBlock::WasCut() const {
   return guard_->WasCut();
@@ -84,7 +108,13 @@ std::unique_ptr<SharedMemoryBlock> SharedMemoryBlock::Create(const std::string& 
 SharedMemoryBlock::~SharedMemoryBlock() {
   guard_.reset();
   munmap(data_, size_);
-  if (!ownedPath_.empty()) shm_unlink(ownedPath_.c_str());
+  if (!ownedPath_.empty()) OwnBlocks::Get().Remove(ownedPath_);
+}
+
+void RemoveOwnSharedMemory() {
+  OwnBlocks& blocks = OwnBlocks::Get();
+  const std::lock_guard lock(blocks.mutex);
+  for (const std::string& path : blocks.paths) shm_unlink(path.c_str());
 }
 
 }  // namespace lumo::platform

@@ -78,6 +78,8 @@ struct Owner {
 
   std::string Text() const { return machine + "-" + run + "-" + process + "-" + start; }
 
+  bool IsSelf() const { return Text() == Self().Text(); }
+
   /// True when the process ran on this machine and runs no more.
   bool HasEnded() const {
     const Owner self = Self();
@@ -95,10 +97,10 @@ std::string TemporaryName(const std::string& beginning, std::string_view ending)
   return beginning.substr(0, kMaxNameBytes - rest.size()) + rest;
 }
 
-/// The entries beside `path` that TemporaryName named in processes that have ended; they may have a
+/// The entries beside `path` that TemporaryName named in processes that `isMeant`; they may have a
 /// further ending.
-std::vector<std::string> FindAbandoned(const std::string& path, const std::string& beginning,
-                                       std::string_view ending) {
+std::vector<std::string> FindNamed(const std::string& path, const std::string& beginning,
+                                   std::string_view ending, bool (Owner::*isMeant)() const) {
   std::vector<std::string> found;
   const fs::path folder = fs::path(path).parent_path();
   std::error_code fault;
@@ -110,13 +112,20 @@ std::vector<std::string> FindAbandoned(const std::string& path, const std::strin
     const std::string_view middle =
         std::string_view(name).substr(start, name.find(ending, start) - start);
     const auto owner = Owner::Parse(middle);
-    if (owner && owner->HasEnded()) found.push_back(at->path().string());
+    if (owner && ((*owner).*isMeant)()) found.push_back(at->path().string());
   }
   return found;
 }
 
 std::string NameOf(const std::string& path) {
   return fs::path(path).filename().string();
+}
+
+void RemoveNamed(const std::string& path, bool (Owner::*isMeant)() const) {
+  std::error_code ignored;
+  for (const std::string& file : FindNamed(path, NameOf(path), kFileEnding, isMeant)) {
+    fs::remove(file, ignored);
+  }
 }
 
 std::string HiddenNameOf(const std::string& path) {
@@ -133,15 +142,22 @@ std::string TemporaryFolderBeside(const std::string& path) {
   return (fs::path(path).parent_path() / TemporaryName(HiddenNameOf(path), kFolderEnding)).string();
 }
 
+bool IsTemporaryFolderIn(const std::string& folder, const std::string& place) {
+  const std::string name = NameOf(folder);
+  return fs::path(folder).parent_path() == fs::path(place) && name.starts_with('.') &&
+         name.ends_with(kFolderEnding);
+}
+
 void RemoveAbandonedFiles(const std::string& path) {
-  std::error_code ignored;
-  for (const std::string& file : FindAbandoned(path, NameOf(path), kFileEnding)) {
-    fs::remove(file, ignored);
-  }
+  RemoveNamed(path, &Owner::HasEnded);
+}
+
+void RemoveOwnFiles(const std::string& path) {
+  RemoveNamed(path, &Owner::IsSelf);
 }
 
 std::vector<std::string> FindAbandonedFolders(const std::string& path) {
-  return FindAbandoned(path, HiddenNameOf(path), kFolderEnding);
+  return FindNamed(path, HiddenNameOf(path), kFolderEnding, &Owner::HasEnded);
 }
 
 }  // namespace lumo::platform

@@ -92,6 +92,11 @@ void AddOpen(JobDraft& draft, const std::string& name, const SourceOptions& sour
   open.AddInput("CheckSource", SourceCheck::kCompared);
 }
 
+std::vector<std::string> FilesOfSavedValues(const SourceOptions& source) {
+  const std::string file = FileOf(source);
+  return {file, file + ".hdr", file + ".aux.xml", file + ".pyr"};
+}
+
 std::string PyramidPathOf(const std::string& file) {
   return AbsoluteName(file) + ".pyr";
 }
