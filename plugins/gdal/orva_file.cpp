@@ -91,7 +91,8 @@ std::unique_ptr<File> File::Create(const std::string& path, const RasterDef& def
   platform::RemoveAbandonedFiles(path);
   platform::RemoveAbandonedFiles(HeaderPath(path));
   file->older_ = platform::IdentifyFile(path);
-  file->replaces_ = file->older_.exists || std::filesystem::exists(HeaderPath(path), missing);
+  file->hadHeader_ = platform::IdentifyFile(HeaderPath(path)).exists;
+  file->replaces_ = file->older_.exists || file->hadHeader_;
   file->pixels_ = RandomAccessFile::Create(
       file->replaces_ ? platform::TemporaryPathBeside(path) : path, &fault);
   file->isNew_ = file->pixels_ != nullptr;
@@ -134,7 +135,9 @@ bool File::TakePlace(const std::string& newHeader, std::string& fault) {
   const platform::FolderLock lock(path_);
   if (!lock.IsHeld(&fault)) return false;
   const platform::FileIdentity now = platform::IdentifyFile(path_);
-  if (replaces_ ? now.exists && !now.IsSameFile(older_) : !pixels_->HasName()) {
+  const bool hasHeader = platform::IdentifyFile(HeaderPath(path_)).exists;
+  if ((replaces_ ? now.exists && !now.IsSameFile(older_) : !pixels_->HasName()) ||
+      (hasHeader && !hadHeader_)) {
     fault = path_ + ": was replaced by another program meanwhile";
     return false;
   }

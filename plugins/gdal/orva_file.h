@@ -61,6 +61,7 @@ class File {
   std::unique_ptr<platform::RandomAccessFile> pixels_;
   std::string whyReadOnly_;       // "path: what"; empty where the pixels can be written
   platform::FileIdentity older_;  // that a new raster takes the place of
+  bool hadHeader_ = false;        // when the new raster was begun
   bool isNew_ = false;            // has no header yet
   bool replaces_ = false;         // lies beside `path_` until it is whole
   bool failed_ = false;           // gets no header any more

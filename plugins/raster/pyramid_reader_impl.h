@@ -11,6 +11,7 @@
 #include "platform/random_access_file.h"
 #include "pyramid_reader.h"
 #include "raster/no_data_marker.h"
+#include "raster/raster_details.h"
 #include "tasks/parallel.h"
 
 namespace lumo::pyramid {
@@ -34,6 +35,9 @@ template <typename T>
 lumo::RasterDef Reader<T>::RasterDef() {
   lumo::RasterDef def = pyramid_.Def();
   if (!def.geoRef && values_.geoRef) def.SetGeoRef(values_.geoRef);
+  if (!values_.fileState.empty()) {
+    def.metadata.Set(DetailPath("FileState"), String(values_.fileState));
+  }
   def.noData.clear();
   for (const auto& [band, value] : values_.noData) {
     if constexpr (std::is_arithmetic_v<T>) {
@@ -108,6 +112,7 @@ bool Reader<T>::PyramidRefresh() {
   Values<T> fresh;  // statistics come once they are computed
   fresh.noData = values_.noData;
   fresh.geoRef = values_.geoRef;
+  fresh.fileState = inheritedState_;
   const bool isThere = pyramid_.Refresh(fresh.Write(), kHasStats);
   return LoadValues() && isThere;
 }
@@ -199,6 +204,7 @@ void Reader<T>::InheritNoDataValues(const lumo::RasterDef& from) {
     }
   }
   values_.geoRef = CloneOf(from.geoRef);
+  inheritedState_ = FindDetail(from.metadata, DetailPath("FileState"));
 }
 
 template <typename T>

@@ -3,9 +3,11 @@
 #include <cerrno>
 #include <filesystem>
 #include <utility>
+#include <vector>
 
 #include "platform/file_swap.h"
 #include "platform/folder_lock.h"
+#include "platform/random_access_file.h"
 #include "platform/temporary_file.h"
 
 namespace lumo {
@@ -14,6 +16,24 @@ namespace {
 namespace fs = std::filesystem;
 
 thread_local StagedFiles* tStaged = nullptr;
+
+/// Makes a new file of what another holds. False with errno set.
+bool Copy(const std::string& from, const std::string& to) {
+  using platform::RandomAccessFile;
+  const auto source = RandomAccessFile::Open(from, RandomAccessFile::Access::kRead);
+  const auto target = source != nullptr ? RandomAccessFile::Create(to) : nullptr;
+  if (target == nullptr) return false;
+  constexpr std::size_t kPieceBytes = 1 << 20;
+  std::vector<char> piece(kPieceBytes);
+  std::uint64_t place = 0;
+  for (std::size_t got = kPieceBytes; got == kPieceBytes; place += got) {
+    if (!source->ReadUpTo(place, piece.data(), piece.size(), got) ||
+        !target->Write(place, piece.data(), got)) {
+      return false;
+    }
+  }
+  return target->Close();
+}
 
 }  // namespace
 
@@ -57,18 +77,14 @@ std::string StagedFiles::Stage(const std::string& path, bool isNew) {
     return {};
   }
   Entry& entry = EntryOf(path);
-  if (isNew) {
-    entry.isRemoved = false;
-  } else if (!isKnown) {
-    std::error_code fault, ignored;
-    if (!fs::copy_file(path, entry.place, fault)) {
-      fs::remove(entry.place, ignored);
-      entries_.erase(path);
-      errno = fault ? fault.value() : EIO;
-      return {};
-    }
-  }
-  return entry.place;
+  if (isNew) entry.isRemoved = false;
+  if (isNew || isKnown || Copy(path, entry.place)) return entry.place;
+  const int code = errno;
+  std::error_code ignored;
+  fs::remove(entry.place, ignored);
+  entries_.erase(path);
+  errno = code;
+  return {};
 }
 
 bool StagedFiles::Remove(const std::string& path) {
