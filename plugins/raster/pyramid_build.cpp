@@ -103,10 +103,19 @@ bool Build::Fail(const std::string& fault) const {
   return false;
 }
 
-/// Tells a fault of the file by the path that its user knows.
-bool Build::FailBy(const std::string& fault) const {
-  SetFault(fault.starts_with(temporary_) ? path_ + fault.substr(temporary_.size()) : fault);
+/// Ends the build: tells a fault of the file, by the path that its user knows, now and later.
+bool Build::FailBy(const std::string& fault) {
+  isOver_ = true;
+  fault_ = fault.starts_with(temporary_) ? path_ + fault.substr(temporary_.size()) : fault;
+  SetFault(fault_);
   return false;
+}
+
+bool Build::HasFailed() const {
+  if (!isOver_ || hasPlace_) return false;
+  const std::lock_guard lock(lock_);
+  if (!fault_.empty()) SetFault(fault_);
+  return true;
 }
 
 std::uint64_t Build::TileValues(const TilePlace& place) const {
@@ -237,13 +246,14 @@ bool Build::Complete(const std::string& values) {
 }
 
 bool Build::TakePlace() {
+  const std::lock_guard guard(lock_);
   isOver_ = true;
   std::string fault;
   const platform::FolderLock lock(path_);
   if (!lock.IsHeld(&fault)) return FailBy(fault);
   const platform::FileIdentity now = platform::IdentifyFile(path_);
   if (now.exists && !now.IsSameFile(older_)) {
-    return Fail("another program has built it meanwhile");
+    return FailBy(path_ + ": another program has built it meanwhile");
   }
   hasPlace_ = now.exists ? platform::RenameFile(temporary_, path_, &fault)
                          : platform::RenameToNew(temporary_, path_, &fault);

@@ -70,6 +70,8 @@ class Build {
   bool TakePlace();
   /// Nothing happens to it any more.
   bool IsOver() const { return isOver_; }
+  /// True when it has ended without its place; tells the fault.
+  bool HasFailed() const;
   void GiveUp() { isOver_ = true; }
 
  private:
@@ -80,7 +82,7 @@ class Build {
   Build(const std::string& path, const Header& header);
   bool Open();
   bool Fail(const std::string& fault) const;
-  bool FailBy(const std::string& fault) const;
+  bool FailBy(const std::string& fault);
   void Pack(const TileRow& tiles, unsigned index, Packed& packed) const;
   std::uint64_t TileValues(const TilePlace& place) const;
 
@@ -92,6 +94,7 @@ class Build {
   const void* beginner_ = nullptr;
   std::set<const void*> writers_;
   std::set<const void*> pastWriters_;
+  std::string fault_;
   std::unique_ptr<platform::RandomAccessFile> file_;
   std::array<std::vector<TileEntry>, kLevelCount> indices_;
   std::uint64_t end_ = kDataBegin;

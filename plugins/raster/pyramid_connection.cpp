@@ -158,7 +158,8 @@ bool Connection::BeginBuild(const Header& wanted) {
 
 bool Connection::Refresh(const std::string& values, bool getsStats) {
   const bool isWhole = build_ != nullptr && !build_->IsOver() && build_->IsWhole();
-  if (isWhole && !build_->Complete(values)) {
+  if (isWhole) build_->Complete(values);
+  if (build_ != nullptr && build_->HasFailed()) {
     LeaveBuild();
     return false;
   }

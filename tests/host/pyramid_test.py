@@ -98,10 +98,11 @@ class Pyramids(PipeTest, FolderTest):
         os.utime(other, (1e9, 1e9))
         changes = {
             "an older file of the same size": lambda: shutil.copy2(other, self.file),
-            "an older file under the name": lambda: (shutil.copy2(other, self.folder / "new"),
+            "an older file under the name": lambda: (shutil.copy(other, self.folder / "new"),
+                                                     os.utime(self.folder / "new", (9e8, 9e8)),
                                                      os.replace(self.folder / "new", self.file)),
             "a nanosecond": lambda: os.utime(self.file, ns=(self.file.stat().st_mtime_ns - 1,) * 2),
-            "a byte": lambda: self.file.open("ab").write(b"x"),
+            "a byte": lambda: self.file.write_bytes(self.pixels + b"x"),
         }
         for name, change in changes.items():
             with self.subTest(name):
