@@ -2,11 +2,13 @@
 
 #include <algorithm>
 #include <cmath>
+#include <cpl_minixml.h>
 #include <filesystem>
 
 #include "common/file_guard.h"
 #include "common/messages.h"
 #include "foundation/fault.h"
+#include "foundation/warnings.h"
 #include "gdal_band_values.h"
 #include "gdal_creation.h"
 #include "gdal_georef.h"
@@ -102,6 +104,31 @@ bool DriverUpdates(const Format& format) {
   return creates != nullptr && std::string(creates) == "YES";
 }
 
+/// Warns of files beside a raster that GDAL passes over without a word, since they are damaged or
+/// of something else.
+void WarnOfUnusedFiles(const std::string& name, const RasterLevel& full) {
+  const Messages messages;  // GDAL's words on them would not say that they are left out
+  std::error_code ignored;
+  const auto warn = [&](const char* suffix, const char* what) {
+    AddWarning(name + suffix + ": " + what + "; it is left out");
+  };
+  if (std::filesystem::is_regular_file(name + ".aux.xml", ignored)) {
+    CPLXMLNode* const tree = CPLParseXMLFile((name + ".aux.xml").c_str());
+    if (tree == nullptr && !messages.Files().FirstOf(name + ".aux.xml")) {
+      warn(".aux.xml", "isn't whole");
+    }
+    CPLDestroyXMLNode(tree);
+  }
+  GDALRasterBandH const band = full.bands.front();
+  if (HasLevelFile(name) && GDALGetOverviewCount(band) == 0) {
+    warn(".ovr", "holds no levels that can be read");
+  }
+  if (std::filesystem::is_regular_file(name + ".msk", ignored) &&
+      (GDALGetMaskFlags(band) & GMF_ALL_VALID) != 0) {
+    warn(".msk", "holds no mask that can be read");
+  }
+}
+
 }  // namespace
 
 OpenRaster::OpenRaster(const Format& format, const Source& source)
@@ -114,7 +141,9 @@ OpenRaster::~OpenRaster() {
 std::unique_ptr<OpenRaster> OpenRaster::Open(const Format& format, const Source& source) {
   std::unique_ptr<OpenRaster> raster(new OpenRaster(format, source));
   DatasetPtr dataset = OpenToRead(format, source, raster->isThreaded_);
-  return raster->TakeDataset(std::move(dataset)) ? std::move(raster) : nullptr;
+  if (!raster->TakeDataset(std::move(dataset))) return nullptr;
+  if (source.isFile) WarnOfUnusedFiles(source.name, raster->levels_.at(0));
+  return raster;
 }
 
 std::unique_ptr<OpenRaster> OpenRaster::Create(const Format& format, const Source& source,
