@@ -104,20 +104,26 @@ bool DriverUpdates(const Format& format) {
   return creates != nullptr && std::string(creates) == "YES";
 }
 
-/// Warns of files beside a raster that GDAL passes over without a word, since they are damaged or
-/// of something else.
+/// False for a file of values beside a raster that GDAL would pass over without a word.
+bool IsSideFileWhole(const std::string& path) {
+  std::error_code ignored;
+  if (!std::filesystem::is_regular_file(path, ignored)) return true;
+  const Messages messages;
+  CPLXMLNode* const tree = CPLParseXMLFile(path.c_str());
+  const bool isWhole = tree != nullptr && CPLGetXMLNode(tree, "=PAMDataset") != nullptr;
+  CPLDestroyXMLNode(tree);
+  return isWhole;
+}
+
+/// Warns of files beside a raster that are left out, since they are damaged or of something else.
 void WarnOfUnusedFiles(const std::string& name, const RasterLevel& full) {
   const Messages messages;  // GDAL's words on them would not say that they are left out
   std::error_code ignored;
   const auto warn = [&](const char* suffix, const char* what) {
     AddWarning(name + suffix + ": " + what + "; it is left out");
   };
-  if (std::filesystem::is_regular_file(name + ".aux.xml", ignored)) {
-    CPLXMLNode* const tree = CPLParseXMLFile((name + ".aux.xml").c_str());
-    if (tree == nullptr && !messages.Files().FirstOf(name + ".aux.xml")) {
-      warn(".aux.xml", "isn't whole");
-    }
-    CPLDestroyXMLNode(tree);
+  if (!IsSideFileWhole(name + ".aux.xml") && messages.Files().First() == nullptr) {
+    warn(".aux.xml", "isn't whole");
   }
   GDALRasterBandH const band = full.bands.front();
   if (HasLevelFile(name) && GDALGetOverviewCount(band) == 0) {
@@ -444,6 +450,11 @@ bool OpenRaster::ChangeStored(const std::function<bool()>& change) {
   std::string busy;
   if (!lock.IsHeld(&busy)) return FailWith(Name(), busy);
   if (levels_.empty() || !Reopen()) return false;
+  // What could not be read would be lost when the file beside the raster is written anew.
+  if (messages.Files().First() != nullptr) return messages.Fail(Name());
+  if (!IsSideFileWhole(Name() + ".aux.xml")) {
+    return FailWith(Name() + ".aux.xml", "isn't whole, and stays as it is");
+  }
   TakeFault();
   const bool isChanged = change();
   if (isChanged) GDALFlushCache(dataset_.get());  // which warns where it can't

@@ -328,7 +328,8 @@ TEST(GdalFaults, ADamagedFileBesideARasterIsAWarning) {
     TakeWarnings();
     ASSERT_TRUE(OpenSource({path}));
     EXPECT_TRUE(TakeWarnings().empty());
-    PutContents(path + c.suffix, "<PAMDataset><Metadata>cut off");
+    const std::string damaged = "<PAMDataset><Metadata>cut off";
+    PutContents(path + c.suffix, damaged);
     const auto source = OpenSource({path});
     ASSERT_TRUE(ReadsWhole(source));
     EXPECT_EQ(TakeWarnings(),
