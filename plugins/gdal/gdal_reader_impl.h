@@ -261,17 +261,15 @@ RasterBandStats<T> Reader<T>::ReadStats(unsigned band) {
 template <typename T>
 bool Reader<T>::WriteStats(const Array<RasterBandStats<T>>& stats) {
   if constexpr (kHasStats) {
-    const Messages messages;
     raster_.NoteStatistics();
-    for (const RasterBandStats<T>& band : stats) {
-      constexpr unsigned kWhole =
-          StatsMask::Min | StatsMask::Max | StatsMask::Mean | StatsMask::Std;
-      if (!raster_.HasBand(band.band) || (band.mask & kWhole) != kWhole) continue;
-      if (!WriteStoredStats(raster_.Band(band.band), detail::ToStored(band))) {
-        return messages.Fail(raster_.Name());
-      }
-    }
-    return FlushBandValues();
+    return raster_.ChangeStored([&] {
+      return std::all_of(stats.begin(), stats.end(), [&](const RasterBandStats<T>& band) {
+        constexpr unsigned kWhole =
+            StatsMask::Min | StatsMask::Max | StatsMask::Mean | StatsMask::Std;
+        return !raster_.HasBand(band.band) || (band.mask & kWhole) != kWhole ||
+               WriteStoredStats(raster_.Band(band.band), detail::ToStored(band));
+      });
+    });
   }
   return false;
 }
@@ -303,27 +301,22 @@ bool Reader<T>::WriteHistogram(const Array<RasterBandHistogram<T>>& histograms) 
       const RasterBandHistogram<T>*& choice = chosen[histogram.band];
       if (choice == nullptr || choice->source == StatsSource::kNative) choice = &histogram;
     }
-    const Messages messages;
     for (unsigned band = 0; band < raster_.Bands(); ++band) {
-      if (!isAskedFor[band]) continue;
-      if (chosen[band] == nullptr) {
+      if (isAskedFor[band] && chosen[band] == nullptr) {
         return FailWith(raster_.Name(), "only histograms of both signs can be stored");
       }
-      if (!WriteStoredHistogram(raster_.Band(band), detail::ToStored(*chosen[band]))) {
-        return messages.Fail(raster_.Name());
-      }
     }
-    return FlushBandValues();
+    return raster_.ChangeStored([&] {
+      for (unsigned band = 0; band < raster_.Bands(); ++band) {
+        if (chosen[band] == nullptr) continue;
+        if (!WriteStoredHistogram(raster_.Band(band), detail::ToStored(*chosen[band]))) {
+          return false;
+        }
+      }
+      return true;
+    });
   }
   return false;
-}
-
-/// Brings what was set onto the disk; GDAL reports as a warning that it could not.
-template <typename T>
-bool Reader<T>::FlushBandValues() {
-  const Messages messages;
-  GDALFlushCache(raster_.Dataset());
-  return !messages.HasError() || messages.Fail(raster_.Name());
 }
 
 template <typename T>
@@ -361,11 +354,12 @@ template <typename T>
 bool Reader<T>::ChangePalette(unsigned band, const lumo::Palette* palette) {
   if (!raster_.HasBand(band)) return FailWith(raster_.Name(), "has no such band");
   if (raster_.CanWrite() && !raster_.OpenForUpdate()) return false;
-  const Messages messages;
-  if (!gdal::WritePalette(raster_.Band(band), palette)) return messages.Fail(raster_.Name());
-  if (HasPalette(band) == (palette != nullptr)) return FlushBandValues();
-  if (palette != nullptr) gdal::WritePalette(raster_.Band(band), nullptr);
-  return FailWith(raster_.Name(), "the format keeps no such palette");
+  return raster_.ChangeStored([&] {
+    if (!gdal::WritePalette(raster_.Band(band), palette)) return false;
+    if (HasPalette(band) == (palette != nullptr)) return true;
+    if (palette != nullptr) gdal::WritePalette(raster_.Band(band), nullptr);
+    return FailWith(raster_.Name(), "the format keeps no such palette");
+  });
 }
 
 template <typename T>

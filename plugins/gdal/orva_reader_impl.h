@@ -1,5 +1,6 @@
 #pragma once
 
+#include "data/merge_values.h"
 #include "foundation/fault.h"
 #include "orva_pixels.h"
 #include "orva_reader.h"
@@ -67,15 +68,7 @@ bool Reader<T>::WriteStats(const Array<RasterBandStats<T>>& stats) {
   for (const RasterBandStats<T>& band : stats) {
     if (band.band >= Bands()) return Fail("statistics of a band that isn't there");
   }
-  return Change([&](BandValues<T>& values) {
-    for (const RasterBandStats<T>& band : stats) {
-      if (band.mask == StatsMask::None) {
-        values.stats.erase(band.band);
-      } else {
-        values.stats[band.band] = band;
-      }
-    }
-  });
+  return Change([&](BandValues<T>& values) { MergeStats(stats, values_.stats, values.stats); });
 }
 
 template <typename T>
@@ -100,7 +93,7 @@ bool Reader<T>::WriteHistogram(const Array<RasterBandHistogram<T>>& histograms) 
       return Fail("a histogram without counts");
   }
   return Change([&](BandValues<T>& values) {
-    values.histograms.assign(histograms.begin(), histograms.end());
+    MergeHistograms(histograms, values_.histograms, values.histograms);
   });
 }
 

@@ -77,7 +77,8 @@ class Reader final : public PlainRasterReader<T> {
 
   Connection& pyramid_;
   Values<T> values_;
-  bool isInherited_ = false;  // the no-data values are those of the raster
+  bool isInherited_ = false;    // the no-data values are those of the raster
+  std::string inheritedState_;  // of the file of the raster
 };
 
 extern template class Reader<std::uint8_t>;

@@ -2,13 +2,16 @@
 
 #include <algorithm>
 #include <atomic>
+#include <cerrno>
 #include <mutex>
 #include <optional>
 
+#include "data/merge_values.h"
 #include "foundation/fault.h"
 #include "platform/random_access_file.h"
 #include "pyramid_reader.h"
 #include "raster/no_data_marker.h"
+#include "raster/raster_details.h"
 #include "tasks/parallel.h"
 
 namespace lumo::pyramid {
@@ -32,6 +35,9 @@ template <typename T>
 lumo::RasterDef Reader<T>::RasterDef() {
   lumo::RasterDef def = pyramid_.Def();
   if (!def.geoRef && values_.geoRef) def.SetGeoRef(values_.geoRef);
+  if (!values_.fileState.empty()) {
+    def.metadata.Set(DetailPath("FileState"), String(values_.fileState));
+  }
   def.noData.clear();
   for (const auto& [band, value] : values_.noData) {
     if constexpr (std::is_arithmetic_v<T>) {
@@ -106,15 +112,21 @@ bool Reader<T>::PyramidRefresh() {
   Values<T> fresh;  // statistics come once they are computed
   fresh.noData = values_.noData;
   fresh.geoRef = values_.geoRef;
-  const bool isThere = pyramid_.Refresh(fresh.Write());
+  fresh.fileState = inheritedState_;
+  const bool isThere = pyramid_.Refresh(fresh.Write(), kHasStats);
   return LoadValues() && isThere;
 }
 
 template <typename T>
 bool Reader<T>::CanChangeValues() const {
   using platform::RandomAccessFile;
-  return pyramid_.File() != nullptr &&
-         RandomAccessFile::Open(pyramid_.Path(), RandomAccessFile::Access::kUpdate) != nullptr;
+  if (pyramid_.File() == nullptr) return false;
+  errno = 0;
+  if (RandomAccessFile::Open(pyramid_.PathShown(), RandomAccessFile::Access::kUpdate) != nullptr) {
+    return true;
+  }
+  // Any other reason is one for a write to fail by.
+  return errno != EACCES && errno != EPERM && errno != EROFS;
 }
 
 /// Lets `change` change the values that the file has now, and keeps them when they are stored.
@@ -122,16 +134,15 @@ template <typename T>
 template <typename F>
 bool Reader<T>::Change(F&& change) {
   if (pyramid_.File() == nullptr) return pyramid_.Fail("there is no pyramid");
-  const bool stored =
-      ChangeValues(pyramid_.Path(), [&](const std::string& before, std::string& after) {
-        Values<T> values;
-        if (!values.Read(before, pyramid_.Def().bands)) {
-          return pyramid_.Fail("the values of its bands can't be read");
-        }
-        change(values);
-        after = values.Write();
-        return true;
-      });
+  const bool stored = pyramid_.ChangeValues([&](const std::string& before, std::string& after) {
+    Values<T> values;
+    if (!values.Read(before, pyramid_.Def().bands)) {
+      return pyramid_.Fail("the values of its bands can't be read");
+    }
+    change(values);
+    after = values.Write();
+    return true;
+  });
   return stored && PyramidRefresh();
 }
 
@@ -147,15 +158,7 @@ bool Reader<T>::WriteStats(const Array<RasterBandStats<T>>& stats) {
   for (const RasterBandStats<T>& band : stats) {
     if (band.band >= this->Bands()) return pyramid_.Fail("statistics of a band that isn't there");
   }
-  return Change([&](Values<T>& values) {
-    for (const RasterBandStats<T>& band : stats) {
-      if (band.mask == lumo::StatsMask::None) {
-        values.stats.erase(band.band);
-      } else {
-        values.stats[band.band] = band;
-      }
-    }
-  });
+  return Change([&](Values<T>& values) { MergeStats(stats, values_.stats, values.stats); });
 }
 
 template <typename T>
@@ -177,8 +180,9 @@ bool Reader<T>::WriteHistogram(const Array<RasterBandHistogram<T>>& histograms) 
       return pyramid_.Fail("a histogram that can't be one of its bands");
     }
   }
-  return Change(
-      [&](Values<T>& values) { values.histograms.assign(histograms.begin(), histograms.end()); });
+  return Change([&](Values<T>& values) {
+    MergeHistograms(histograms, values_.histograms, values.histograms);
+  });
 }
 
 template <typename T>
@@ -200,6 +204,7 @@ void Reader<T>::InheritNoDataValues(const lumo::RasterDef& from) {
     }
   }
   values_.geoRef = CloneOf(from.geoRef);
+  inheritedState_ = FindDetail(from.metadata, DetailPath("FileState"));
 }
 
 template <typename T>
@@ -229,7 +234,8 @@ bool Reader<T>::WritePixels(unsigned left, unsigned top, unsigned width, unsigne
   const unsigned band = header.BandGroups() == 1 ? 0 : bands[0];
   const auto columns = static_cast<unsigned>((right - 1) / tiling.side) - column + 1;
   return build.Write(
-      {{level, column, row, band}, columns, reinterpret_cast<const unsigned char*>(pixels), state});
+      {{level, column, row, band}, columns, reinterpret_cast<const unsigned char*>(pixels), state},
+      &pyramid_);
 }
 
 /// A block to read: where it lies in the level, and in the caller's memory.

@@ -6,6 +6,7 @@
 #include "foundation/abandonment.h"
 #include "foundation/errors.h"
 #include "foundation/fault.h"
+#include "foundation/warnings.h"
 
 namespace lumo {
 namespace {
@@ -51,6 +52,7 @@ void DcSrv::Execute(DcSrvCmd& cmd) {
     cmd.replied_.wait(lock, [&] { return cmd.done_; });
   }
   if (cmd.fault_.GetLength() != 0) SetFault(cmd.fault_);
+  for (const std::string& warning : cmd.warnings_) AddWarning(warning);
 }
 
 void DcSrv::Serve(MTQueue<DcSrvCmd*>& queue) {
@@ -69,6 +71,7 @@ void DcSrv::Serve(MTQueue<DcSrvCmd*>& queue) {
 
 void DcSrv::Run(DcSrvCmd& cmd, DcSrvContext& context) {
   TakeFault();
+  TakeWarnings();
   const AbandonScope abandonment(cmd.abandons_);
   try {
     cmd.Execute(context);
@@ -78,6 +81,7 @@ void DcSrv::Run(DcSrvCmd& cmd, DcSrvContext& context) {
     SetFault(std::string(cmd.name_) + ": gave up without a reason");
   }
   cmd.fault_ = TakeFault();
+  cmd.warnings_ = TakeWarnings();
 }
 
 void DcSrv::Reply(DcSrvCmd& cmd) {

@@ -152,18 +152,27 @@ void DynamicRasterPyramid<T>::OnLevelsWritten() {
 }
 
 template <typename T>
-void DynamicRasterPyramid<T>::Refresh() {
-  pyramidReader_->PyramidRefresh();
+bool DynamicRasterPyramid<T>::Refresh() {
+  return pyramidReader_->PyramidRefresh();
+}
+
+/// False, with the fault told, when the raster has been written to since the build began: nothing
+/// that was computed on the way is known to hold. Under the lock.
+template <typename T>
+bool DynamicRasterPyramid<T>::CanTakeResults() const {
+  if (ResultsHold()) return true;
+  SetFault(connection_->URI().ToUTF8() + ": was written to while its pyramid was built");
+  return false;
 }
 
 template <typename T>
-void DynamicRasterPyramid<T>::TakeHistogram(const RasterHistogram<T>& histogram,
+bool DynamicRasterPyramid<T>::TakeHistogram(const RasterHistogram<T>& histogram,
                                             HistogramSign sign) requires(std::is_arithmetic_v<T>) {
   Array<RasterBandHistogram<T>> all;
   std::uint64_t writes = 0;
   {
     const std::lock_guard lock(lock_);
-    if (!ResultsHold()) return;
+    if (!CanTakeResults()) return false;
     writes = writes_;
     for (unsigned band = 0; band < histogram.BandCount(); ++band) {
       RasterBandHistogram<T> taken = histogram.BandHistogram(band, band);
@@ -175,19 +184,20 @@ void DynamicRasterPyramid<T>::TakeHistogram(const RasterHistogram<T>& histogram,
     }
     all = detail::ArrayOf(bandHistograms_);
   }
-  if (pyramidReader_->CanWriteHistogram() && pyramidReader_->WriteHistogram(all)) {
-    pyramidReader_->SetHistogramsHoldFor(writes);
-  }
+  if (!pyramidReader_->CanWriteHistogram()) return true;
+  if (!pyramidReader_->WriteHistogram(all)) return false;
+  pyramidReader_->SetHistogramsHoldFor(writes);
+  return true;
 }
 
 template <typename T>
-void DynamicRasterPyramid<T>::TakeStats(const RasterStats<T>& stats) requires(
+bool DynamicRasterPyramid<T>::TakeStats(const RasterStats<T>& stats) requires(
     std::is_arithmetic_v<T>) {
   Array<RasterBandStats<T>> all;
   std::uint64_t writes = 0;
   {
     const std::lock_guard lock(lock_);
-    if (!ResultsHold()) return;
+    if (!CanTakeResults()) return false;
     writes = writes_;
     for (unsigned band = 0; band < stats.Mins().GetCount(); ++band) {
       const auto same = std::ranges::find(bandStats_, band, &RasterBandStats<T>::band);
@@ -199,9 +209,10 @@ void DynamicRasterPyramid<T>::TakeStats(const RasterStats<T>& stats) requires(
     }
     all = detail::ArrayOf(bandStats_);
   }
-  if (pyramidReader_->CanWriteStats() && pyramidReader_->WriteStats(all)) {
-    pyramidReader_->SetStatsHoldFor(writes);
-  }
+  if (!pyramidReader_->CanWriteStats()) return true;
+  if (!pyramidReader_->WriteStats(all)) return false;
+  pyramidReader_->SetStatsHoldFor(writes);
+  return true;
 }
 
 }  // namespace lumo

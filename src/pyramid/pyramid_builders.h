@@ -79,6 +79,7 @@ class AsyncOrvaPyramidBuilder final : public PyramidBuilder {
  private:
   struct Rasters;
 
+  bool Build();
   bool Open(Rasters& rasters);
   bool MakeLevels(const Rasters& rasters);
   bool MakeHistogram(const Rasters& rasters);

@@ -85,13 +85,21 @@ class BuildResults final : public HistogramCallback<T> {
   explicit BuildResults(DynamicRasterPyramid<T>& owner) : owner_(owner) {}
   void TakeResults(const RasterStatsPtr<T>& stats, const RasterHistogramPtr<T>& histogram,
                    HistogramSign sign) override {
-    owner_.TakeHistogram(*histogram, sign);
-    owner_.TakeStats(*stats);
+    areStored_ = owner_.TakeHistogram(*histogram, sign) && owner_.TakeStats(*stats);
+    fault_ = TakeFault();
     owner_.Refresh();
+  }
+
+  /// False, with the fault told, unless the owner took them and could store them.
+  bool AreStored() const {
+    if (!areStored_ && fault_.GetLength() != 0) SetFault(fault_);
+    return areStored_;
   }
 
  private:
   DynamicRasterPyramid<T>& owner_;
+  bool areStored_ = false;
+  String fault_;
 };
 
 }  // namespace detail
@@ -159,12 +167,25 @@ bool AsyncOrvaPyramidBuilder<T>::Open(Rasters& rasters) {
 
 template <typename T>
 void AsyncOrvaPyramidBuilder<T>::Execute() {
+  if (!Build() || IsAborted()) return;
+  // The store's other connection has gone: what is whole takes its place.
+  if (!owner_.Refresh()) Fail("the pyramid could not take its place");
+}
+
+/// False when something failed. True as well after an abort.
+template <typename T>
+bool AsyncOrvaPyramidBuilder<T>::Build() {
+  const auto fail = [this](const char* otherwise) {
+    this->Fail(otherwise);
+    return false;
+  };
   Rasters rasters(order_);
-  if (!Open(rasters)) return Fail("the raster or its pyramid can't be opened again");
-  if (!MakeLevels(rasters)) return Fail("the levels could not be made");
-  if (IsAborted()) return;
-  if (!rasters.full->PyramidRefresh()) return Fail("the levels are not whole");
-  if (!MakeHistogram(rasters)) return Fail("the histogram of a level could not be counted");
+  if (!Open(rasters)) return fail("the raster or its pyramid can't be opened again");
+  if (!MakeLevels(rasters)) return fail("the levels could not be made");
+  if (IsAborted()) return true;
+  if (!rasters.full->PyramidRefresh()) return fail("the levels are not whole");
+  if (!MakeHistogram(rasters)) return fail("the statistics could not be stored");
+  return true;
 }
 
 /// Writes the levels; with them, or behind them, the statistics. True as well after an abort.
@@ -214,7 +235,7 @@ bool AsyncOrvaPyramidBuilder<T>::MakeHistogram(const Rasters& rasters) {
     const RasterIteratorPtr<T> blocks(new RasterIteratorStream<T>(level));
     detail::BuildResults<T> results(owner_);
     RasterHistogramCallbackProcess<T> counting(blocks, histogram, stats_, &results, Share(1));
-    return counting.RunProcess(counting.kHere);
+    return counting.RunProcess(counting.kHere) && (IsAborted() || results.AreStored());
   } else {
     return true;  // complex pixels have none
   }

@@ -4,6 +4,8 @@
 
 #include "data/mt_connection.h"
 #include "foundation/fault.h"
+#include "raster/raster_details.h"
+#include "views/file_state.h"
 #include "views/pyramid_raster_impl.h"
 #include "views/reader_raster.h"
 
@@ -28,7 +30,11 @@ ReaderRaster<T>::ReaderRaster(const RasterReaderPtr<T>& reader,
   }
   const RasterDef def = reader_->RasterDef();
   if (pyramidReader_ && pyramidReader_->CanInheritNoDataValues()) {
-    pyramidReader_->InheritNoDataValues(def);
+    RasterDef told = def;
+    told.metadata = Metadata();
+    const std::string state = connection_ ? FileStateOf(*connection_) : std::string();
+    if (!state.empty()) told.metadata.Set(DetailPath("FileState"), String(state));
+    pyramidReader_->InheritNoDataValues(told);
   }
   uri_ = uri;
   if (connection_ && uri_.GetLength() == 0) uri_ = connection_->URI();

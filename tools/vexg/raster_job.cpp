@@ -136,6 +136,8 @@ void JobSession::SayNotes(const JobDraft& draft, const JobResults& results) {
   for (const JobDraft::StepInfo& step : draft.GetSteps()) {
     const std::string note = results.Find(step.name).returns.Find("Note").ToUTF8();
     if (step.opens.GetLength() != 0 && !note.empty() && said_.insert(note).second) Say(note);
+    const std::string warning = results.Find(step.name).returns.Find("Warning").ToUTF8();
+    if (!warning.empty() && said_.insert(warning).second) Say("warning: " + warning);
   }
 }
 

@@ -63,8 +63,8 @@ std::string PyramidPathOf(const std::string& file);
 /// header, its side file, its pyramid.
 std::vector<std::string> FilesOfSavedValues(const SourceOptions& source);
 
-/// AddOpen, with the pyramid file beside the raster where there is one. One that is older than the
-/// raster tells of other pixels: it is left out, and the user hears of it.
+/// AddOpen, with the pyramid file beside the raster where there is one. One that was not built from
+/// the raster as it is tells of other pixels: it is left out, and the user hears of it.
 /// @param levels  which are shown of a raster that has levels of its own as well: Best or Told, see
 ///                OpenRasterCommand.
 void AddOpenWithPyramid(JobDraft& draft, const std::string& name, const SourceOptions& source,

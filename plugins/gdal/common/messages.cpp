@@ -102,6 +102,11 @@ std::string WithoutName(std::string text, const std::string& name) {
 
 bool Messages::Fail(const std::string& name, const char* otherwise) const {
   const std::string text = Text();  // into some of which GDAL itself puts the name
+  const FileFault* const fault = faults_.First();
+  if (fault != nullptr && fault->path.starts_with(name + ".")) {  // a file beside it
+    SetFault(text);
+    return false;
+  }
   return FailWith(name, text.empty() ? otherwise : WithoutName(text, name));
 }
 
