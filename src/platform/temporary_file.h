@@ -17,6 +17,10 @@ VEXG_EXPORT std::string TemporaryPathBeside(const std::string& path);
 /// The same for a folder, whose name is hidden.
 VEXG_EXPORT std::string TemporaryFolderBeside(const std::string& path);
 
+/// `text` with the names made here replaced by those of the files that they stand for, which alone
+/// tell a user something.
+VEXG_EXPORT std::string WithoutTemporaryNames(std::string text);
+
 /// Removes the files that TemporaryPathBeside named for `path` in a process of this machine that
 /// has ended. Those of other machines, and what can't be removed, stay.
 VEXG_EXPORT void RemoveAbandonedFiles(const std::string& path);

@@ -1,6 +1,7 @@
 #include "result_output.h"
 
 #include <algorithm>
+#include <cerrno>
 #include <cstdio>
 #include <iostream>
 
@@ -8,7 +9,9 @@
 
 #include "commands/command.h"
 #include "option_values.h"
-#include "platform/process.h"
+#include "platform/file_moves.h"
+#include "platform/memory_shortage.h"
+#include "platform/temporary_file.h"
 #include "value_json.h"
 #include "verb.h"
 
@@ -114,11 +117,15 @@ std::string ToJson(const Document& job, const Document& result) {
 
 Output::Output(const std::string& file) : file_(file == "-" ? "" : file) {
   if (file_.empty()) return;
-  unfinished_ = file_ + "." + std::to_string(platform::ProcessNumber()) + ".part";
+  platform::RemoveAbandonedFiles(file_);
+  unfinished_ = platform::TemporaryPathBeside(file_);
+  errno = 0;
   stream_.open(unfinished_, std::ios::binary | std::ios::trunc);
   if (!stream_) {
+    const int code = errno;
     unfinished_.clear();
-    throw HostError(kExitUsage, file_ + ": can't be written; nothing was run");
+    throw HostError(kExitUsage, file_ + ": can't be written: " + platform::SystemErrorText(code) +
+                                    "; nothing was run");
   }
 }
 
@@ -132,11 +139,14 @@ void Output::Write(const std::string& text) {
     if (!std::cout) throw HostError(kExitFailed, "standard output can't be written");
     return;
   }
+  errno = 0;
   stream_ << text;
   stream_.close();
-  if (!stream_ || std::rename(unfinished_.c_str(), file_.c_str()) != 0) {
-    throw HostError(kExitFailed, file_ + ": can't be written");
+  if (!stream_) {
+    throw HostError(kExitFailed, file_ + ": can't be written: " + platform::SystemErrorText(errno));
   }
+  std::string why;
+  if (!platform::RenameFile(unfinished_, file_, &why)) throw HostError(kExitFailed, why);
   unfinished_.clear();
 }
 
