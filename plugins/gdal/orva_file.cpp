@@ -5,6 +5,8 @@
 #include "data/format_table.h"
 #include "foundation/abandonment.h"
 #include "foundation/fault.h"
+#include "foundation/file_faults.h"
+#include "platform/file_moves.h"
 #include "platform/file_swap.h"
 #include "platform/folder_lock.h"
 #include "platform/temporary_file.h"
@@ -215,13 +217,15 @@ std::string FindPath(const Array<String>& connStrings) {
 }
 
 bool HasHeader(const std::string& path) {
-  const auto file = RandomAccessFile::Open(HeaderPath(path), RandomAccessFile::Access::kRead);
+  const std::string header = HeaderPath(path);
+  const auto file = RandomAccessFile::Open(header, RandomAccessFile::Access::kRead);
   char start[5] = {};
-  std::uint64_t bytes = 0;
-  if (file == nullptr || !file->GetSize(bytes) || bytes < sizeof start ||
-      !file->Read(0, start, sizeof start)) {
+  std::size_t bytes = 0;
+  if (file == nullptr || !file->ReadUpTo(0, start, sizeof start, bytes)) {
+    FileFaults::NoteUnread(header);
     return false;
   }
+  if (bytes < sizeof start) return false;
   return std::string_view(start, 4) == "ORVA" && (start[4] == '\n' || start[4] == '\r');
 }
 

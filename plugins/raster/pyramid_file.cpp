@@ -1,6 +1,7 @@
 #include "pyramid_file.h"
 
 #include "foundation/fault.h"
+#include "foundation/file_faults.h"
 #include "platform/folder_lock.h"
 #include "raster/pixel_types.h"
 
@@ -177,7 +178,12 @@ bool ChangeValues(
 bool IsPyramidFile(const std::string& path) {
   const auto file = RandomAccessFile::Open(path, RandomAccessFile::Access::kRead);
   StoredHeader stored{};
-  return file != nullptr && file->Read(0, stored.magic, sizeof stored.magic) && HasMagic(stored);
+  std::size_t bytes = 0;
+  if (file == nullptr || !file->ReadUpTo(0, stored.magic, sizeof stored.magic, bytes)) {
+    FileFaults::NoteUnread(path);
+    return false;
+  }
+  return bytes == sizeof stored.magic && HasMagic(stored);
 }
 
 }  // namespace lumo::pyramid

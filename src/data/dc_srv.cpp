@@ -1,11 +1,10 @@
 #include "data/dc_srv.h"
 
-#include <exception>
-
 #include "data/data_manager.h"
 #include "foundation/abandonment.h"
 #include "foundation/errors.h"
 #include "foundation/fault.h"
+#include "foundation/thrown.h"
 #include "foundation/warnings.h"
 
 namespace lumo {
@@ -75,10 +74,8 @@ void DcSrv::Run(DcSrvCmd& cmd, DcSrvContext& context) {
   const AbandonScope abandonment(cmd.abandons_);
   try {
     cmd.Execute(context);
-  } catch (const std::exception& thrown) {
-    SetFault(std::string(cmd.name_) + ": " + thrown.what());
   } catch (...) {
-    SetFault(std::string(cmd.name_) + ": gave up without a reason");
+    SetFault(std::string(cmd.name_) + ": " + DescribeException());
   }
   cmd.fault_ = TakeFault();
   cmd.warnings_ = TakeWarnings();

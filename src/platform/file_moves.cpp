@@ -5,11 +5,11 @@
 #include <fcntl.h>
 #include <linux/fs.h>
 #include <sys/syscall.h>
-#include <system_error>
 #include <unistd.h>
 
 #include "platform/durability.h"
 #include "platform/file_descriptor.h"
+#include "platform/memory_shortage.h"
 
 namespace lumo::platform {
 namespace {
@@ -17,7 +17,7 @@ namespace {
 /// Tells why a call on `path` failed; errno stays.
 bool FailOn(const std::string& path, std::string* fault) {
   const int code = errno;
-  if (fault != nullptr) *fault = path + ": " + std::generic_category().message(code);
+  if (fault != nullptr) *fault = path + ": " + SystemErrorText(code);
   errno = code;
   return false;
 }

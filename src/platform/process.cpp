@@ -31,8 +31,9 @@ int ProcessNumber() {
   return getpid();
 }
 
-void SurviveClosedPipes() {
+void SurviveFailedWrites() {
   signal(SIGPIPE, SIG_IGN);
+  signal(SIGXFSZ, SIG_IGN);
 }
 
 bool OutputIsClosed() {

@@ -8,13 +8,13 @@
 #include <fcntl.h>
 #include <sys/stat.h>
 #include <sys/uio.h>
-#include <system_error>
 #include <unistd.h>
 #include <utility>
 
 #include "platform/file_descriptor.h"
 #include "platform/file_gate.h"
 #include "platform/file_moves.h"
+#include "platform/memory_shortage.h"
 #include "platform/temporary_file.h"
 
 namespace lumo::platform {
@@ -28,7 +28,7 @@ bool Fail(std::string* fault, const std::string& path, const std::string& what) 
 }
 
 bool FailBySystem(std::string* fault, const std::string& path, int error) {
-  Fail(fault, path, std::generic_category().message(error));
+  Fail(fault, path, SystemErrorText(error));
   errno = error;
   return false;
 }

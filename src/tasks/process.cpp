@@ -8,6 +8,7 @@
 
 #include "foundation/fault.h"
 #include "foundation/grow_array.h"
+#include "platform/memory_shortage.h"
 #include "tasks/pipeline_impl.h"
 #include "tasks/process_stages.h"
 
@@ -126,6 +127,7 @@ bool CustomProcess<Initializer, Stage, Terminator>::Run(ArgList& args) {
     if (fault.GetLength() != 0) SetFault(fault);
     return false;
   } catch (const std::bad_alloc&) {
+    platform::NoteMemoryShortage();
     SetErrorState(ObjectErrorOutOfMemory());
     return false;
   }

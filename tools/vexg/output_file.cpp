@@ -65,6 +65,7 @@ OutputFile::OutputFile(const std::string& file, const OutputRules& rules)
   std::error_code fault;
   if (!target_.has_filename()) Refuse("is no name of a file");
   if (!fs::is_directory(target_.parent_path(), fault)) {
+    if (fault && fault != std::errc::no_such_file_or_directory) Refuse(fault.message());
     Refuse("there is no folder " + target_.parent_path().string());
   }
   const fs::file_status status = fs::status(target_, fault);
@@ -131,10 +132,12 @@ void OutputFile::Begin(std::uint64_t bytes) {
 }
 
 std::string OutputFile::InUsersWords(std::string message) const {
-  const std::string work = GetWorkName();
-  for (std::size_t at = 0; (at = message.find(work, at)) != std::string::npos;) {
-    message.replace(at, work.size(), shown_);
-    at += shown_.size();
+  for (const std::string& name : {GetWorkName(), GetName()}) {
+    if (name == shown_) continue;
+    for (std::size_t at = 0; (at = message.find(name, at)) != std::string::npos;) {
+      message.replace(at, name.size(), shown_);
+      at += shown_.size();
+    }
   }
   return message;
 }
