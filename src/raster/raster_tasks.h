@@ -48,43 +48,8 @@ class RasterWriteTask final : public SequentialTask {
   RasterIteratorPtr<T> iterator_;
 };
 
-extern template class VEXG_EXPORT TilePool<std::uint8_t>;
-extern template class VEXG_EXPORT TilePool<std::int8_t>;
-extern template class VEXG_EXPORT TilePool<std::uint16_t>;
-extern template class VEXG_EXPORT TilePool<std::int16_t>;
-extern template class VEXG_EXPORT TilePool<std::uint32_t>;
-extern template class VEXG_EXPORT TilePool<std::int32_t>;
-extern template class VEXG_EXPORT TilePool<float>;
-extern template class VEXG_EXPORT TilePool<double>;
-extern template class VEXG_EXPORT TilePool<std::uint64_t>;
-extern template class VEXG_EXPORT TilePool<std::int64_t>;
-extern template class VEXG_EXPORT TilePool<Complex<float>>;
-extern template class VEXG_EXPORT TilePool<Complex<double>>;
-
-extern template class VEXG_EXPORT RasterReadTask<std::uint8_t>;
-extern template class VEXG_EXPORT RasterReadTask<std::int8_t>;
-extern template class VEXG_EXPORT RasterReadTask<std::uint16_t>;
-extern template class VEXG_EXPORT RasterReadTask<std::int16_t>;
-extern template class VEXG_EXPORT RasterReadTask<std::uint32_t>;
-extern template class VEXG_EXPORT RasterReadTask<std::int32_t>;
-extern template class VEXG_EXPORT RasterReadTask<float>;
-extern template class VEXG_EXPORT RasterReadTask<double>;
-extern template class VEXG_EXPORT RasterReadTask<std::uint64_t>;
-extern template class VEXG_EXPORT RasterReadTask<std::int64_t>;
-extern template class VEXG_EXPORT RasterReadTask<Complex<float>>;
-extern template class VEXG_EXPORT RasterReadTask<Complex<double>>;
-
-extern template class VEXG_EXPORT RasterWriteTask<std::uint8_t>;
-extern template class VEXG_EXPORT RasterWriteTask<std::int8_t>;
-extern template class VEXG_EXPORT RasterWriteTask<std::uint16_t>;
-extern template class VEXG_EXPORT RasterWriteTask<std::int16_t>;
-extern template class VEXG_EXPORT RasterWriteTask<std::uint32_t>;
-extern template class VEXG_EXPORT RasterWriteTask<std::int32_t>;
-extern template class VEXG_EXPORT RasterWriteTask<float>;
-extern template class VEXG_EXPORT RasterWriteTask<double>;
-extern template class VEXG_EXPORT RasterWriteTask<std::uint64_t>;
-extern template class VEXG_EXPORT RasterWriteTask<std::int64_t>;
-extern template class VEXG_EXPORT RasterWriteTask<Complex<float>>;
-extern template class VEXG_EXPORT RasterWriteTask<Complex<double>>;
+VEXG_EXTERN(TWELVE, TilePool);
+VEXG_EXTERN(TWELVE, RasterReadTask);
+VEXG_EXTERN(TWELVE, RasterWriteTask);
 
 }  // namespace lumo

@@ -2,7 +2,7 @@
 
 #include "foundation/type_code.h"
 #include "raster/interleave.h"
-#include "raster/tile_impl.h"
+#include "raster/tile_body.h"
 
 namespace lumo {
 namespace {
@@ -155,28 +155,8 @@ template <typename T>
 const unsigned Tile<T>::TypeCode =
     GloballyUniqueObjectTypeCode(String("Tile<" + DataTypeName(kDataTypeOf<T>).ToUTF8() + ">"));
 
-template class Tile<std::uint8_t>;
-template class Tile<std::int8_t>;
-template class Tile<std::uint16_t>;
-template class Tile<std::int16_t>;
-template class Tile<std::uint32_t>;
-template class Tile<std::int32_t>;
-template class Tile<float>;
-template class Tile<double>;
-template class Tile<std::uint64_t>;
-template class Tile<std::int64_t>;
-template class Tile<Complex<float>>;
-template class Tile<Complex<double>>;
-
-template class TileFromTemplate<std::uint8_t>;
-template class TileFromTemplate<std::int8_t>;
-template class TileFromTemplate<std::uint16_t>;
-template class TileFromTemplate<std::int16_t>;
-template class TileFromTemplate<std::uint32_t>;
-template class TileFromTemplate<std::int32_t>;
-template class TileFromTemplate<float>;
-template class TileFromTemplate<double>;
-
+VEXG_INSTANCES(TWELVE, Tile);
+VEXG_INSTANCES(EIGHT, TileFromTemplate);
 template class TileFromTemplateBorder<double>;
 
 }  // namespace lumo

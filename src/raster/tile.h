@@ -167,28 +167,8 @@ class TileFromTemplateBorder final : public Tile<T> {
                          unsigned bottom);
 };
 
-extern template class VEXG_EXPORT Tile<std::uint8_t>;
-extern template class VEXG_EXPORT Tile<std::int8_t>;
-extern template class VEXG_EXPORT Tile<std::uint16_t>;
-extern template class VEXG_EXPORT Tile<std::int16_t>;
-extern template class VEXG_EXPORT Tile<std::uint32_t>;
-extern template class VEXG_EXPORT Tile<std::int32_t>;
-extern template class VEXG_EXPORT Tile<float>;
-extern template class VEXG_EXPORT Tile<double>;
-extern template class VEXG_EXPORT Tile<std::uint64_t>;
-extern template class VEXG_EXPORT Tile<std::int64_t>;
-extern template class VEXG_EXPORT Tile<Complex<float>>;
-extern template class VEXG_EXPORT Tile<Complex<double>>;
-
-extern template class VEXG_EXPORT TileFromTemplate<std::uint8_t>;
-extern template class VEXG_EXPORT TileFromTemplate<std::int8_t>;
-extern template class VEXG_EXPORT TileFromTemplate<std::uint16_t>;
-extern template class VEXG_EXPORT TileFromTemplate<std::int16_t>;
-extern template class VEXG_EXPORT TileFromTemplate<std::uint32_t>;
-extern template class VEXG_EXPORT TileFromTemplate<std::int32_t>;
-extern template class VEXG_EXPORT TileFromTemplate<float>;
-extern template class VEXG_EXPORT TileFromTemplate<double>;
-
+VEXG_EXTERN(TWELVE, Tile);
+VEXG_EXTERN(EIGHT, TileFromTemplate);
 extern template class VEXG_EXPORT TileFromTemplateBorder<double>;
 
 }  // namespace lumo

@@ -94,48 +94,9 @@ class RasterHistogramCallbackProcess final
   ManagedTask<RasterHistogramAccumulateTask<T>> accumulate_;
 };
 
-extern template class VEXG_EXPORT RasterHistogramAccumulateTask<std::uint8_t>;
-extern template class VEXG_EXPORT RasterHistogramAccumulateTask<std::int8_t>;
-extern template class VEXG_EXPORT RasterHistogramAccumulateTask<std::uint16_t>;
-extern template class VEXG_EXPORT RasterHistogramAccumulateTask<std::int16_t>;
-extern template class VEXG_EXPORT RasterHistogramAccumulateTask<std::uint32_t>;
-extern template class VEXG_EXPORT RasterHistogramAccumulateTask<std::int32_t>;
-extern template class VEXG_EXPORT RasterHistogramAccumulateTask<float>;
-extern template class VEXG_EXPORT RasterHistogramAccumulateTask<double>;
-extern template class VEXG_EXPORT RasterHistogramAccumulateTask<std::uint64_t>;
-extern template class VEXG_EXPORT RasterHistogramAccumulateTask<std::int64_t>;
-
-extern template class VEXG_EXPORT RasterHistogramProcess<std::uint8_t>;
-extern template class VEXG_EXPORT RasterHistogramProcess<std::int8_t>;
-extern template class VEXG_EXPORT RasterHistogramProcess<std::uint16_t>;
-extern template class VEXG_EXPORT RasterHistogramProcess<std::int16_t>;
-extern template class VEXG_EXPORT RasterHistogramProcess<std::uint32_t>;
-extern template class VEXG_EXPORT RasterHistogramProcess<std::int32_t>;
-extern template class VEXG_EXPORT RasterHistogramProcess<float>;
-extern template class VEXG_EXPORT RasterHistogramProcess<double>;
-extern template class VEXG_EXPORT RasterHistogramProcess<std::uint64_t>;
-extern template class VEXG_EXPORT RasterHistogramProcess<std::int64_t>;
-
-extern template class VEXG_EXPORT HistogramCallback<std::uint8_t>;
-extern template class VEXG_EXPORT HistogramCallback<std::int8_t>;
-extern template class VEXG_EXPORT HistogramCallback<std::uint16_t>;
-extern template class VEXG_EXPORT HistogramCallback<std::int16_t>;
-extern template class VEXG_EXPORT HistogramCallback<std::uint32_t>;
-extern template class VEXG_EXPORT HistogramCallback<std::int32_t>;
-extern template class VEXG_EXPORT HistogramCallback<float>;
-extern template class VEXG_EXPORT HistogramCallback<double>;
-extern template class VEXG_EXPORT HistogramCallback<std::uint64_t>;
-extern template class VEXG_EXPORT HistogramCallback<std::int64_t>;
-
-extern template class VEXG_EXPORT RasterHistogramCallbackProcess<std::uint8_t>;
-extern template class VEXG_EXPORT RasterHistogramCallbackProcess<std::int8_t>;
-extern template class VEXG_EXPORT RasterHistogramCallbackProcess<std::uint16_t>;
-extern template class VEXG_EXPORT RasterHistogramCallbackProcess<std::int16_t>;
-extern template class VEXG_EXPORT RasterHistogramCallbackProcess<std::uint32_t>;
-extern template class VEXG_EXPORT RasterHistogramCallbackProcess<std::int32_t>;
-extern template class VEXG_EXPORT RasterHistogramCallbackProcess<float>;
-extern template class VEXG_EXPORT RasterHistogramCallbackProcess<double>;
-extern template class VEXG_EXPORT RasterHistogramCallbackProcess<std::uint64_t>;
-extern template class VEXG_EXPORT RasterHistogramCallbackProcess<std::int64_t>;
+VEXG_EXTERN(TEN, RasterHistogramAccumulateTask);
+VEXG_EXTERN(TEN, RasterHistogramProcess);
+VEXG_EXTERN(TEN, HistogramCallback);
+VEXG_EXTERN(TEN, RasterHistogramCallbackProcess);
 
 }  // namespace lumo

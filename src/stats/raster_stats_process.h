@@ -39,70 +39,9 @@ class RasterStatsProcess final : public ProcessBuilder<Process> {
   ManagedTask<RasterStatsAccumulateTask<T, Stats>> accumulate_;
 };
 
-extern template class VEXG_EXPORT
-    RasterStatsAccumulateTask<std::uint8_t, RasterStats<std::uint8_t>>;
-extern template class VEXG_EXPORT RasterStatsAccumulateTask<std::int8_t, RasterStats<std::int8_t>>;
-extern template class VEXG_EXPORT
-    RasterStatsAccumulateTask<std::uint16_t, RasterStats<std::uint16_t>>;
-extern template class VEXG_EXPORT
-    RasterStatsAccumulateTask<std::int16_t, RasterStats<std::int16_t>>;
-extern template class VEXG_EXPORT
-    RasterStatsAccumulateTask<std::uint32_t, RasterStats<std::uint32_t>>;
-extern template class VEXG_EXPORT
-    RasterStatsAccumulateTask<std::int32_t, RasterStats<std::int32_t>>;
-extern template class VEXG_EXPORT RasterStatsAccumulateTask<float, RasterStats<float>>;
-extern template class VEXG_EXPORT RasterStatsAccumulateTask<double, RasterStats<double>>;
-extern template class VEXG_EXPORT
-    RasterStatsAccumulateTask<std::uint64_t, RasterStats<std::uint64_t>>;
-extern template class VEXG_EXPORT
-    RasterStatsAccumulateTask<std::int64_t, RasterStats<std::int64_t>>;
-
-extern template class VEXG_EXPORT
-    RasterStatsAccumulateTask<std::uint8_t, ExtendedRasterStats<std::uint8_t>>;
-extern template class VEXG_EXPORT
-    RasterStatsAccumulateTask<std::int8_t, ExtendedRasterStats<std::int8_t>>;
-extern template class VEXG_EXPORT
-    RasterStatsAccumulateTask<std::uint16_t, ExtendedRasterStats<std::uint16_t>>;
-extern template class VEXG_EXPORT
-    RasterStatsAccumulateTask<std::int16_t, ExtendedRasterStats<std::int16_t>>;
-extern template class VEXG_EXPORT
-    RasterStatsAccumulateTask<std::uint32_t, ExtendedRasterStats<std::uint32_t>>;
-extern template class VEXG_EXPORT
-    RasterStatsAccumulateTask<std::int32_t, ExtendedRasterStats<std::int32_t>>;
-extern template class VEXG_EXPORT RasterStatsAccumulateTask<float, ExtendedRasterStats<float>>;
-extern template class VEXG_EXPORT RasterStatsAccumulateTask<double, ExtendedRasterStats<double>>;
-extern template class VEXG_EXPORT
-    RasterStatsAccumulateTask<std::uint64_t, ExtendedRasterStats<std::uint64_t>>;
-extern template class VEXG_EXPORT
-    RasterStatsAccumulateTask<std::int64_t, ExtendedRasterStats<std::int64_t>>;
-
-extern template class VEXG_EXPORT RasterStatsProcess<std::uint8_t, RasterStats<std::uint8_t>>;
-extern template class VEXG_EXPORT RasterStatsProcess<std::int8_t, RasterStats<std::int8_t>>;
-extern template class VEXG_EXPORT RasterStatsProcess<std::uint16_t, RasterStats<std::uint16_t>>;
-extern template class VEXG_EXPORT RasterStatsProcess<std::int16_t, RasterStats<std::int16_t>>;
-extern template class VEXG_EXPORT RasterStatsProcess<std::uint32_t, RasterStats<std::uint32_t>>;
-extern template class VEXG_EXPORT RasterStatsProcess<std::int32_t, RasterStats<std::int32_t>>;
-extern template class VEXG_EXPORT RasterStatsProcess<float, RasterStats<float>>;
-extern template class VEXG_EXPORT RasterStatsProcess<double, RasterStats<double>>;
-extern template class VEXG_EXPORT RasterStatsProcess<std::uint64_t, RasterStats<std::uint64_t>>;
-extern template class VEXG_EXPORT RasterStatsProcess<std::int64_t, RasterStats<std::int64_t>>;
-
-extern template class VEXG_EXPORT
-    RasterStatsProcess<std::uint8_t, ExtendedRasterStats<std::uint8_t>>;
-extern template class VEXG_EXPORT RasterStatsProcess<std::int8_t, ExtendedRasterStats<std::int8_t>>;
-extern template class VEXG_EXPORT
-    RasterStatsProcess<std::uint16_t, ExtendedRasterStats<std::uint16_t>>;
-extern template class VEXG_EXPORT
-    RasterStatsProcess<std::int16_t, ExtendedRasterStats<std::int16_t>>;
-extern template class VEXG_EXPORT
-    RasterStatsProcess<std::uint32_t, ExtendedRasterStats<std::uint32_t>>;
-extern template class VEXG_EXPORT
-    RasterStatsProcess<std::int32_t, ExtendedRasterStats<std::int32_t>>;
-extern template class VEXG_EXPORT RasterStatsProcess<float, ExtendedRasterStats<float>>;
-extern template class VEXG_EXPORT RasterStatsProcess<double, ExtendedRasterStats<double>>;
-extern template class VEXG_EXPORT
-    RasterStatsProcess<std::uint64_t, ExtendedRasterStats<std::uint64_t>>;
-extern template class VEXG_EXPORT
-    RasterStatsProcess<std::int64_t, ExtendedRasterStats<std::int64_t>>;
+VEXG_EXTERN(TEN, RasterStatsAccumulateTask, RasterStats);
+VEXG_EXTERN(TEN, RasterStatsAccumulateTask, ExtendedRasterStats);
+VEXG_EXTERN(TEN, RasterStatsProcess, RasterStats);
+VEXG_EXTERN(TEN, RasterStatsProcess, ExtendedRasterStats);
 
 }  // namespace lumo

@@ -8,7 +8,7 @@
 
 #include "foundation/fault.h"
 #include "foundation/grow_array.h"
-#include "tasks/pipeline_impl.h"
+#include "tasks/pipeline_body.h"
 #include "tasks/process_stages.h"
 
 namespace lumo {
