@@ -170,7 +170,7 @@ bool Build::Write(const TileRow& tiles, const void* writer) {
   if (isComplete_ || isOver_) return Fail("the pyramid is whole: it isn't written any more");
   const TilePlace& first = tiles.first;
   std::vector<Packed> packed(tiles.columns);
-  lumo::detail::ForEachPart(tiles.columns, [&](unsigned i) { Pack(tiles, i, packed[i]); });
+  ParallelFor(tiles.columns, nullptr, [&](unsigned i) { Pack(tiles, i, packed[i]); });
 
   std::vector<platform::ConstFilePiece> pieces;
   std::uint64_t end = end_;

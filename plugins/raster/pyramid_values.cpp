@@ -107,17 +107,7 @@ std::string Values<T>::Write() const {
   return std::move(out).str();
 }
 
-template struct Values<std::uint8_t>;
-template struct Values<std::int8_t>;
-template struct Values<std::uint16_t>;
-template struct Values<std::int16_t>;
-template struct Values<std::uint32_t>;
-template struct Values<std::int32_t>;
-template struct Values<float>;
-template struct Values<double>;
-template struct Values<std::uint64_t>;
-template struct Values<std::int64_t>;
-template struct Values<Complex<float>>;
-template struct Values<Complex<double>>;
+#define VALUES(T) template struct Values<T>;
+VEXG_FOR(TWELVE, VALUES);
 
 }  // namespace lumo::pyramid

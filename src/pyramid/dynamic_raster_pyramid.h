@@ -77,17 +77,6 @@ class DynamicRasterPyramid final : public PyramidCallback<T> {
 template <typename T>
 using DynamicRasterPyramidPtr = Pointer<DynamicRasterPyramid<T>>;
 
-extern template class VEXG_EXPORT DynamicRasterPyramid<std::uint8_t>;
-extern template class VEXG_EXPORT DynamicRasterPyramid<std::int8_t>;
-extern template class VEXG_EXPORT DynamicRasterPyramid<std::uint16_t>;
-extern template class VEXG_EXPORT DynamicRasterPyramid<std::int16_t>;
-extern template class VEXG_EXPORT DynamicRasterPyramid<std::uint32_t>;
-extern template class VEXG_EXPORT DynamicRasterPyramid<std::int32_t>;
-extern template class VEXG_EXPORT DynamicRasterPyramid<float>;
-extern template class VEXG_EXPORT DynamicRasterPyramid<double>;
-extern template class VEXG_EXPORT DynamicRasterPyramid<std::uint64_t>;
-extern template class VEXG_EXPORT DynamicRasterPyramid<std::int64_t>;
-extern template class VEXG_EXPORT DynamicRasterPyramid<Complex<float>>;
-extern template class VEXG_EXPORT DynamicRasterPyramid<Complex<double>>;
+VEXG_EXTERN(TWELVE, DynamicRasterPyramid);
 
 }  // namespace lumo

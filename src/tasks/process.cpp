@@ -9,8 +9,9 @@
 #include "foundation/fault.h"
 #include "foundation/grow_array.h"
 #include "platform/memory_shortage.h"
-#include "tasks/pipeline_impl.h"
+#include "tasks/pipeline_body.h"
 #include "tasks/process_stages.h"
+#include "tasks/thread_limit.h"
 
 namespace lumo {
 
@@ -121,7 +122,9 @@ bool CustomProcess<Initializer, Stage, Terminator>::Run(ArgList& args) {
     Initializer initializer(*this, pool);
     Terminator terminator(*this, pool);
     BeginRun();
-    const bool ran = RunPipeline<TaskToken>(initializer, chain, terminator, GetTaskCount());
+    unsigned tokens = 0;
+    for (const auto& stage : stages) tokens += stage->IsParallel() ? ThreadLimit::GetCurrent() : 1;
+    const bool ran = RunPipeline<TaskToken>(initializer, chain, terminator, tokens);
     if (ran && !HasFailed()) return true;
     const String fault = GetFault();
     if (fault.GetLength() != 0) SetFault(fault);

@@ -3,8 +3,8 @@
 #include <algorithm>
 #include <limits>
 
+#include "stats/exact_bins.h"
 #include "stats/histogram_counter.h"
-#include "stats/raster_histogram_impl.h"
 
 namespace lumo {
 namespace detail {

@@ -293,7 +293,7 @@ bool Reader<T>::CopyTiles(const Block& block) {
   std::mutex lock;  // of the fault
   std::string fault;
   std::atomic<bool> failed{false};
-  lumo::detail::ForEachPart(static_cast<unsigned>(places.size()), [&](unsigned i) {
+  ParallelFor(static_cast<unsigned>(places.size()), nullptr, [&](unsigned i) {
     std::string why;
     if (failed || CopyTile(block, places[i], why)) return;
     failed = true;

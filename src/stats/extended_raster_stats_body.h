@@ -5,7 +5,6 @@
 #include <vector>
 
 #include "stats/extended_raster_stats.h"
-#include "stats/raster_stats_impl.h"
 
 namespace lumo {
 

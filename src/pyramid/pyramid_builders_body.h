@@ -10,7 +10,8 @@
 #include "pyramid/dynamic_raster_pyramid.h"
 #include "pyramid/pyramid_builders.h"
 #include "pyramid/pyramid_process.h"
-#include "stats/raster_histogram_impl.h"
+#include "stats/exact_bins.h"
+#include "stats/raster_histogram.h"
 #include "stats/raster_histogram_process.h"
 
 namespace lumo {
