@@ -17,7 +17,13 @@ class DcSrvCmdExit final : public DcSrvCmd {
 
 /// Holds the data manager of the thread.
 struct LocalManagerScope {
-  LocalManagerScope() { GetLocalDataManager(); }
+  LocalManagerScope() noexcept {
+    try {
+      GetLocalDataManager();
+    } catch (...) {
+      NoteException();
+    }
+  }
   ~LocalManagerScope() { FreeLocalDataManager(); }
 };
 
@@ -55,6 +61,7 @@ void DcSrv::Execute(DcSrvCmd& cmd) {
 void DcSrv::Serve(MTQueue<DcSrvCmd*>& queue) {
   DcSrvCmd* last = nullptr;
   {
+    // Made by the first command that needs one where memory is short now.
     const LocalManagerScope manager;
     DcSrvContext context;
     while (!context.exit) {
@@ -70,11 +77,15 @@ void DcSrv::Run(DcSrvCmd& cmd, DcSrvContext& context) {
   TakeFault();
   const AbandonScope abandonment(cmd.abandons_);
   try {
-    cmd.Execute(context);
+    try {
+      cmd.Execute(context);
+    } catch (...) {
+      SetFault(std::string(cmd.name_) + ": " + DescribeException());
+    }
+    cmd.fault_ = TakeFault();
   } catch (...) {
-    SetFault(std::string(cmd.name_) + ": " + DescribeException());
+    NoteException();  // there is no memory for words either; the caller is answered all the same
   }
-  cmd.fault_ = TakeFault();
 }
 
 void DcSrv::Reply(DcSrvCmd& cmd) {
