@@ -11,6 +11,7 @@
 #include "foundation/near_name.h"
 #include "option_values.h"
 #include "platform/debug_output.h"
+#include "platform/interrupt.h"
 #include "platform/module.h"
 #include "platform/process.h"
 #include "verb.h"
@@ -97,8 +98,9 @@ bool ChecksAreStrict() {
 
 }  // namespace lumo::host
 
-int main(int argc, char** argv) {
-  lumo::platform::SurviveClosedPipes();
+namespace {
+
+int RunAndSay(int argc, char** argv) {
   try {
     return lumo::host::Run(argc, argv);
   } catch (const lumo::host::HostError& error) {
@@ -110,4 +112,14 @@ int main(int argc, char** argv) {
     lumo::host::Say(error.what());
     return lumo::host::kExitFailed;
   }
+}
+
+}  // namespace
+
+int main(int argc, char** argv) {
+  lumo::platform::SurviveClosedPipes();
+  const int code = RunAndSay(argc, argv);
+  // Work in the background that was aborted may still be about to end.
+  if (lumo::platform::WasInterrupted()) lumo::platform::EndProcess(code);
+  return code;
 }
