@@ -272,7 +272,7 @@ void Outputs::Commit(const std::function<void()>& onTheWay) {
   const Interruption::Hold hold(interruption_);
   onTheWay();
   MoveAll(moved);
-  interruption_.SetDone();
+  if (!moved.empty()) interruption_.SetDone();
 }
 
 void Outputs::MoveAll(const std::vector<MovedFiles>& moved) {
