@@ -106,8 +106,8 @@ class HistogramJob {
     if (options_.json || output == nullptr) {
       std::cout << (options_.json ? AsJson(bands).dump(2) + "\n" : AsText(bands));
     }
-    if (options_.save && !ParseValue<bool>(results.Find("save").returns.Find("Return"))) {
-      throw HostError(kExitFailed, options_.source.file + ": the histograms could not be saved");
+    if (options_.save) {
+      CheckReturn(results, "save", options_.source.file + ": the histograms could not be saved");
     }
     return kExitSuccess;
   }

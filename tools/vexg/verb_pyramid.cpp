@@ -221,9 +221,9 @@ int Delete(const Options& options) {
     return kExitSuccess;
   }
   JobSession session(options.job);
-  const JobResults results = session.Run(draft);
-  if (ParseValue<bool>(results.Find("delete").returns.Find("Return"))) return kExitSuccess;
-  throw HostError(kExitFailed, options.source.file + ": there is no pyramid to delete");
+  CheckReturn(session.Run(draft), "delete",
+              options.source.file + ": there is no pyramid to delete");
+  return kExitSuccess;
 }
 
 int Run(const Options& options) {

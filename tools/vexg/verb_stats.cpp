@@ -219,8 +219,8 @@ int Stats(const Options& options) {
       ReadTable(results.Find(kStatsStep).returns, options, bands, info.dataType);
   std::cout << (options.json ? AsJson(options.source.file, table).dump(2) + "\n"
                              : AsText(options.source.file, table));
-  if (options.save && !ParseValue<bool>(results.Find("save").returns.Find("Return"))) {
-    throw HostError(kExitFailed, options.source.file + ": the statistics could not be saved");
+  if (options.save) {
+    CheckReturn(results, "save", options.source.file + ": the statistics could not be saved");
   }
   return kExitSuccess;
 }
