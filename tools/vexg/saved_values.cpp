@@ -25,8 +25,7 @@ void SaveValues(JobSession& session, const SourceOptions& source, const char* co
   draft.Close(kCloseStep, raster);
   const JobResults results = session.Run(draft, Interrupts::kWait);
   CheckClosed(results, kCloseStep);
-  if (ParseValue<bool>(results.Find(kSaveStep).returns.Find("Return"))) return;
-  throw HostError(kExitFailed, source.file + ": the " + what + " could not be saved");
+  CheckReturn(results, kSaveStep, source.file + ": the " + what + " could not be saved");
 }
 
 }  // namespace lumo::host
