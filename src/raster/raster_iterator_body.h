@@ -34,10 +34,9 @@ bool RasterIterator<T>::Read(unsigned column, unsigned row, Tile<T>& tile) {
   Placement placement;
   if (!IsValid() || !Place(column, row, placement)) return false;
   const TileDimensions& size = placement.tile;
-  const bool sized = size.HasBorders() || order_ == Interleave::BIP
-                         ? tile.Resize(size)
-                         : tile.ResizeInOrder(size.width, size.height, size.bands, order_);
-  if (!sized) return false;
+  if (!(size.HasBorders() ? tile.Resize(size) : tile.ResizeForOverwrite(size, order_))) {
+    return false;
+  }
   tile.SetOrigin({placement.x, placement.y});
   tile.SetIndex({column, row});
   if (size.HasBorders()) return ReadBordered(placement, tile);

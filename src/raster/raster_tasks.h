@@ -1,5 +1,6 @@
 #pragma once
 
+#include <mutex>
 #include <vector>
 
 #include "raster/raster_iterator.h"
@@ -8,8 +9,8 @@
 namespace lumo {
 
 /// Tiles that are used again: a tile is free when nobody but the pool holds it any more. It keeps
-/// as many as were in use at once, which in a process are the tokens in flight. Threads: one user;
-/// the tiles may be let go on any thread.
+/// as many as were in use at once, which in a process are the tokens in flight. Threads: tiles may
+/// be taken, and let go, on any.
 template <typename T>
 class TilePool {
  public:
@@ -17,7 +18,8 @@ class TilePool {
   TilePtr<T> Take();
 
  private:
-  std::vector<TilePtr<T>> tiles_;
+  std::mutex mutex_;
+  std::vector<TilePtr<T>> tiles_;  // under mutex_
 };
 
 /// The first stage of a process over a raster: reads the tiles row by row, left to right, and gives

@@ -6,6 +6,7 @@ namespace lumo {
 
 template <typename T>
 TilePtr<T> TilePool<T>::Take() {
+  const std::lock_guard lock(mutex_);
   for (TilePtr<T>& tile : tiles_) {
     if (tile.GetCount() == 1) return tile;
   }

@@ -38,23 +38,25 @@ bool BasicTile::IsA(unsigned typeCode) const {
 
 bool BasicTile::Resize(unsigned width, unsigned height, unsigned bands, unsigned left,
                        unsigned right, unsigned top, unsigned bottom) {
-  return Size({width, height, bands, left, right, top, bottom, 0});
+  return Resize(TileDimensions{width, height, bands, left, right, top, bottom, 0});
 }
 
 bool BasicTile::Resize(unsigned width, unsigned height, unsigned bands, unsigned border) {
-  return Size({width, height, bands, border, border, border, border, 0});
+  return Resize(TileDimensions{width, height, bands, border, border, border, border, 0});
 }
 
 bool BasicTile::Resize(unsigned width, unsigned height, unsigned bands) {
-  return Size({width, height, bands, 0, 0, 0, 0, 0});
+  return Resize(TileDimensions{width, height, bands});
 }
 
 bool BasicTile::Resize(const TileDimensions& dimensions) {
-  return Size(dimensions);
+  if (!Size(dimensions, Interleave::BIP)) return false;
+  std::ranges::fill(state_, static_cast<unsigned char>(State::Valid));
+  return true;
 }
 
-bool BasicTile::ResizeInOrder(unsigned width, unsigned height, unsigned bands, Interleave order) {
-  return Size({width, height, bands}, order);
+bool BasicTile::ResizeForOverwrite(const TileDimensions& dimensions, Interleave order) {
+  return Size(dimensions, order);
 }
 
 bool BasicTile::Size(const TileDimensions& dimensions, Interleave order) {
@@ -66,10 +68,7 @@ bool BasicTile::Size(const TileDimensions& dimensions, Interleave order) {
                         FullWidth() <= kMost && FullHeight() <= kMost;
   const ArrayDims dims = BlockDims(order, static_cast<unsigned>(FullWidth()),
                                    static_cast<unsigned>(FullHeight()), dimensions.bands);
-  if (possible && ResizePixels(dims) && state_.Resize(dims)) {
-    std::ranges::fill(state_, static_cast<unsigned char>(State::Valid));
-    return true;
-  }
+  if (possible && ResizePixels(dims) && state_.Resize(dims)) return true;
   ResizePixels(ArrayDims());
   state_.Resize(ArrayDims());
   origin_ = {};

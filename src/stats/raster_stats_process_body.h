@@ -1,8 +1,7 @@
 #pragma once
 
+#include "raster/tile_functions.h"
 #include "stats/raster_stats_process.h"
-#include "stats/tile_strips.h"
-#include "tasks/parallel_ranges.h"
 
 namespace lumo {
 
@@ -10,48 +9,34 @@ namespace lumo {
 /// little beside them.
 template <typename T>
 std::size_t LeastStripPixels(const RasterStats<T>& stats) {
-  constexpr std::size_t kValues = 16 * 1024;
-  return kValues / std::max(stats.BandCount(), 1U) + 1;
+  return LeastStripPixels(stats.BandCount());
 }
 template <typename T>
 std::size_t LeastStripPixels(const ExtendedRasterStats<T>& /*stats*/) {
   return 2048;
 }
 
-/// The statistics of a tile, of as many bands as `total` has.
+/// Gives the statistics of a part of a tile: empty where it has another number of bands, or there
+/// is no memory for them.
 template <typename T, typename Stats>
-class ParallelRasterStatsAccumulate final : public ArrayParallelReduce<Stats> {
- public:
-  /// @param tile  outlives the loop, and so does `total`.
-  ParallelRasterStatsAccumulate(const Tile<T>& tile, const Stats& total)
-      : ParallelRasterStatsAccumulate(tile, total, TileStrips(tile, LeastStripPixels(total))) {}
+struct ParallelRasterStatsAccumulate {
+  unsigned bands;
 
-  Stats Identity() override { return Stats(total_.BandCount()); }
-
-  void Join(Stats& left, const Stats& right) override {
-    if (!left.Merge(right)) this->Fail();
+  std::optional<Stats> operator()(const Tile<T>& tile, const TilePart& part) const {
+    std::optional<Stats> stats(bands);
+    const bool taken = tile.Bands() == bands && stats->Accumulate(tile, part.rowFrom, part.rowTo,
+                                                                  part.columnFrom, part.columnTo);
+    if (!taken) stats.reset();
+    return stats;
   }
+};
 
-  Stats Accumulate(unsigned begin, unsigned end) override {
-    Stats part(total_.BandCount());
-    for (unsigned i = begin; i < end && !this->Failed(); ++i) {
-      const TilePart strip = strips_.Strip(i);
-      if (!part.Accumulate(tile_, strip.rowFrom, strip.rowTo, strip.columnFrom, strip.columnTo)) {
-        this->Fail();
-      }
-    }
-    return part;
+/// Joins statistics.
+struct MergeStats {
+  template <typename Stats>
+  bool operator()(Stats& left, const Stats& right) const {
+    return left.Merge(right);
   }
-
- private:
-  ParallelRasterStatsAccumulate(const Tile<T>& tile, const Stats& total, const TileStrips& strips)
-      : ArrayParallelReduce<Stats>(strips.Count()), tile_(tile), total_(total), strips_(strips) {
-    if (tile.Bands() != total.BandCount()) this->Fail();
-  }
-
-  const Tile<T>& tile_;
-  const Stats& total_;
-  const TileStrips strips_;
 };
 
 template <typename T, typename Stats>
@@ -73,11 +58,11 @@ bool RasterStatsAccumulateTask<T, Stats>::Execute(ArgList& args) {
     SetErrorState(TaskErrorBadArgs());
     return false;
   }
-  ParallelRasterStatsAccumulate<T, Stats> loop(*tile, *stats_);
-  Stats ofTile;
-  RunParallelReduce(loop, ofTile, GetAbortFlag());
-  const std::lock_guard lock(mergeLock_);
-  if (!loop.HasError() && stats_->Merge(ofTile)) return true;
+  const ParallelRasterStatsAccumulate<T, Stats> part{stats_->BandCount()};
+  const std::optional<Stats> ofTile = ReduceStrips<Stats>(
+      *tile, LeastStripPixels(*stats_), GetAbortFlag(),
+      [&](const TilePart& strip) { return part(*tile, strip); }, MergeStats());
+  if (IsAborted() || (ofTile && stats_->Merge(*ofTile))) return true;
   SetErrorState(TaskError());
   return false;
 }
@@ -85,19 +70,19 @@ bool RasterStatsAccumulateTask<T, Stats>::Execute(ArgList& args) {
 template <typename T, typename Stats>
 RasterStatsProcess<T, Stats>::RasterStatsProcess(const RasterIteratorPtr<T>& iterator,
                                                  const Pointer<Stats>& stats, const IPC& ipc)
-    : ProcessBuilder("RasterStatsProcess", ipc) {
+    : TileProcess("RasterStatsProcess", ipc), stats_(stats) {
   stats->Reset(iterator->BandCount());
-  Process& process = GetPipeline();
-  const ArgID iteratorId = process.TakeSetupArg();
-  const ArgID statsId = process.TakeSetupArg();
-  const ArgID tile = process.TakeTokenArg();
-  const bool placed =
-      process.AddTask(0, TaskDescriptor(&read_, ArgIDs({tile}), ArgIDs({iteratorId}))) &&
-      process.AddTask(1, TaskDescriptor(&accumulate_, ArgIDs({tile}), ArgIDs({statsId})));
-  SetArg(iteratorId, iterator);
-  SetArg(statsId, stats);
-  process.SetTotalTokens(std::uint64_t{iterator->Columns()} * iterator->Rows());
-  if (placed) SetBuilt();
+  const std::tuple tiles{Read(iterator)};
+  AddReduction(*this, "RasterStatsAccumulateTask", tiles, *stats_,
+               ParallelRasterStatsAccumulate<T, Stats>{stats->BandCount()}, MergeStats(),
+               LeastStripPixels(*stats));
+  Close();
+}
+
+template <typename T, typename Stats>
+void RasterStatsProcess<T, Stats>::Execute() {
+  TileProcess::Execute();
+  if (!HasError() && !IsAborted() && !stats_->Finish()) SetErrorState(AsyncErrorExecuteFailed());
 }
 
 }  // namespace lumo

@@ -7,9 +7,9 @@
 #include "data/block_shape.h"
 #include "foundation/fault.h"
 #include "georef/coordsys_log.h"
+#include "raster/pixel_states.h"
 #include "raster/pixel_value.h"
 #include "raster/raster_def.h"
-#include "stats/plane_kernels.h"
 #include "views/reprojection.h"
 #include "views/warp_samplers.h"
 
@@ -102,26 +102,6 @@ struct WarpStrip {
   std::size_t positions;  ///< where those of its pixels begin, when each is transformed
 };
 
-/// Runs `call(i)` for the numbers below a count, on many threads.
-template <typename Call>
-class EachParallel final : public ArrayParallelFor {
- public:
-  EachParallel(std::size_t count, const Call& call)
-      : ArrayParallelFor(static_cast<unsigned>(count)), call_(call) {}
-  void Body(unsigned begin, unsigned end) override {
-    for (unsigned i = begin; i < end; ++i) call_(i);
-  }
-
- private:
-  const Call& call_;
-};
-
-template <typename Call>
-void RunEach(std::size_t count, const Call& call) {
-  EachParallel<Call> loop(count, call);
-  RunParallelFor(loop, 1);
-}
-
 }  // namespace detail
 
 /// The pieces that the map makes of a part.
@@ -151,7 +131,7 @@ struct Reprojection<T>::MappedPart {
     }
     positions.resize(points);
     if (points == 0) return;
-    detail::RunEach(strips.size(), [&](unsigned i) {
+    ParallelFor(static_cast<unsigned>(strips.size()), nullptr, [&](unsigned i) {
       if (pieces[strips[i].piece].way != WarpPiece::Way::kTransform) return;
       map.Transform(strips[i].rect, &positions[strips[i].positions]);
     });
@@ -283,7 +263,7 @@ void Reprojection<T>::SampleMapped(Work& work, const Window& window,
                                    const MappedPart& mapped) const {
   const SubRectProj all(0, 0, static_cast<std::int32_t>(work.source.samples) - 1,
                         static_cast<std::int32_t>(work.source.lines) - 1);
-  detail::RunEach(mapped.strips.size(), [&](unsigned i) {
+  ParallelFor(static_cast<unsigned>(mapped.strips.size()), nullptr, [&](unsigned i) {
     const detail::WarpStrip& strip = mapped.strips[i];
     const WarpPiece& piece = mapped.pieces[strip.piece];
     const WarpTarget<T> target = detail::TargetOf(work.target, work.rect, strip.rect);
