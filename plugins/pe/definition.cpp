@@ -9,7 +9,9 @@
 #include <unordered_map>
 
 #include "description.h"
+#include "foundation/fault.h"
 #include "georef/coordsys_log.h"
+#include "platform/random_access_file.h"
 #include "proj_context.h"
 
 namespace lumo::pe {
@@ -46,6 +48,25 @@ PjPtr CreateAny(PJ_CONTEXT* context, const std::string& given) {
   }
   if (text.rfind("urn:ogc:def:crs:", 0) == 0) return PjPtr(proj_create(context, text.c_str()));
   return CreateFromCode(context, text);
+}
+
+/// Tells the fault when PROJ's database can't be read, without which most systems are unknown.
+void TellOfDatabase(PJ_CONTEXT* context) {
+  if (proj_context_get_database_metadata(context, "EPSG.VERSION") != nullptr) return;
+  const char* const path = proj_context_get_database_path(context);
+  std::string why;
+  if (path != nullptr && *path != '\0') {
+    platform::RandomAccessFile::Open(path, platform::RandomAccessFile::Access::kRead, &why,
+                                     platform::RandomAccessFile::Gate::kPassed);
+  }
+  SetFault(why.empty() ? "the database of coordinate systems, proj.db, can't be read" : why);
+}
+
+/// CreateAny, and the fault where it fails for want of the database.
+PjPtr CreateOrTell(PJ_CONTEXT* context, const std::string& text) {
+  PjPtr made = CreateAny(context, text);
+  if (made == nullptr) TellOfDatabase(context);
+  return made;
 }
 
 bool IsGeographic(PJ_TYPE type) {
@@ -127,7 +148,7 @@ void FillHorizontal(PJ_CONTEXT* context, const Horizontal& parts, Definition& ma
 DefinitionPtr ReadDefinition(const std::string& text) {
   static std::atomic<std::uint64_t> ids{0};
   PJ_CONTEXT* const context = ThreadContext();
-  PjPtr system = CreateAny(context, text);
+  PjPtr system = CreateOrTell(context, text);
   if (system == nullptr || proj_is_crs(system.get()) == 0) return nullptr;
   auto made = std::make_shared<Definition>();
   made->id = ++ids;

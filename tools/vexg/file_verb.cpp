@@ -63,11 +63,13 @@ int FileVerb::Run() {
   } catch (const HostError& error) {
     throw HostError(error.code, outputs.InUsersWords(error.what()));
   }
+  const std::string description = Describe(), remark = Remark();
   outputs.Commit([&] {
     session.CheckInterrupt();
     Save(session);
   });
-  Tell();
+  std::cout << description;
+  if (!remark.empty()) Say(remark);
   session.GetInterruption().SetDone();
   if (session.IsInterrupted()) Say(session.GetInterruption().Describe());
   return kExitSuccess;

@@ -22,7 +22,7 @@ namespace lumo::host {
 /// 6. Disks without room for the outputs are refused.
 /// 7. Make makes the outputs, under names of their own, and looks at them.
 /// 8. Save changes things in place; then all outputs take their places, or none.
-/// 9. Tell prints.
+/// 9. What Describe and Remark gave before that is printed.
 ///
 /// A failure in any of them leaves what was there before. An interrupt ends each of them within a
 /// fifth of a second, and the user hears what has become of the files.
@@ -69,7 +69,10 @@ class FileVerb {
   virtual std::uint64_t GetBytes(std::size_t /*output*/) const { return 0; }
   virtual void Make(JobSession& session, const Outputs& outputs) = 0;
   virtual void Save(JobSession& /*session*/) {}
-  virtual void Tell() {}
+  /// What is printed on standard output, made before anything changes.
+  virtual std::string Describe() const { return {}; }
+  /// What is said on standard error, made before anything changes.
+  virtual std::string Remark() const { return {}; }
 
   const SourceOptions& GetSource() const { return source_; }
   SourceOptions& GetSource() { return source_; }

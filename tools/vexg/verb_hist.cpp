@@ -1,6 +1,5 @@
 #include <algorithm>
 #include <cmath>
-#include <iostream>
 #include <memory>
 #include <numeric>
 #include <optional>
@@ -375,12 +374,9 @@ class HistVerb final : public FileVerb {
     if (saves_) SaveValues(session, GetSource(), kSaveCommand, raster_, "histograms");
   }
 
-  void Tell() override {
-    if (isJson_) {
-      std::cout << histograms_->AsJson().dump(2) << '\n';
-    } else if (output_.empty()) {
-      std::cout << histograms_->AsText();
-    }
+  std::string Describe() const override {
+    if (isJson_) return histograms_->AsJson().dump(2) + "\n";
+    return output_.empty() ? histograms_->AsText() : std::string();
   }
 
   Options options_;

@@ -189,9 +189,9 @@ class ReadVerb final : public FileVerb {
     return std::make_unique<NpySink>(output, request_, request_.info.dataType);
   }
 
-  void Tell() override {
-    if (!isExcluded_ || !mask_.empty()) return;
-    Say(output_ + ": note: a mask excludes some of these pixels; --mask OUT.npy tells which");
+  std::string Remark() const override {
+    if (!isExcluded_ || !mask_.empty()) return {};
+    return output_ + ": note: a mask excludes some of these pixels; --mask OUT.npy tells which";
   }
 
   std::string output_, mask_, rect_, bands_;

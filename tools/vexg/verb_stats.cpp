@@ -1,5 +1,3 @@
-#include <iostream>
-
 #include <CLI/CLI.hpp>
 #include <fmt/format.h>
 
@@ -238,9 +236,9 @@ class StatsVerb final : public FileVerb {
     if (saves_) SaveValues(session, GetSource(), kSaveCommand, raster_, "statistics");
   }
 
-  void Tell() override {
-    std::cout << (isJson_ ? AsJson(GetSource().file, table_).dump(2) + "\n"
-                          : AsText(GetSource().file, table_));
+  std::string Describe() const override {
+    return isJson_ ? AsJson(GetSource().file, table_).dump(2) + "\n"
+                   : AsText(GetSource().file, table_);
   }
 
   std::string bandsText_;

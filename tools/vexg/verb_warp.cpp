@@ -8,6 +8,7 @@
 #include <CLI/CLI.hpp>
 #include <fmt/format.h>
 
+#include "foundation/fault.h"
 #include "georef/covering_grid.h"
 #include "option_values.h"
 #include "raster/pixel_value.h"
@@ -177,7 +178,10 @@ class WarpVerb final : public RasterVerb {
       return GridOfFile(session, to_);
     }
     CoordSys system;
+    TakeFault();
     if (!system.SetFromString(String(to_))) {
+      const std::string why = TakeFault().ToUTF8();
+      if (!why.empty()) throw HostError(kExitFailed, "--to " + to_ + ": " + why);
       throw HostError(kExitUsage, "--to: neither a file nor a coordinate system: " + to_);
     }
     if (info.geoRef->CoordinateSystem().IsEmpty()) {
