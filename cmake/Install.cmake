@@ -4,7 +4,7 @@ include(CMakePackageConfigHelpers)
 install(TARGETS vexg EXPORT vexgTargets
         LIBRARY DESTINATION ${CMAKE_INSTALL_LIBDIR})
 install(DIRECTORY ${PROJECT_SOURCE_DIR}/src/ DESTINATION ${CMAKE_INSTALL_INCLUDEDIR}/vexg
-        FILES_MATCHING PATTERN "*.h" PATTERN "*_impl.h" EXCLUDE
+        FILES_MATCHING PATTERN "*.h" PATTERN "*_body.h" EXCLUDE
         REGEX "platform/(file_descriptor|message_frame|pipe_directory).h" EXCLUDE)
 install(DIRECTORY ${PROJECT_SOURCE_DIR}/resources/ DESTINATION ${CMAKE_INSTALL_DATADIR}/vexg)
 install(EXPORT vexgTargets NAMESPACE vexg:: DESTINATION ${CMAKE_INSTALL_LIBDIR}/cmake/vexg)

@@ -51,6 +51,13 @@ class BesideBand : public GDALPamRasterBand {
   }
 };
 
+class BesideDataset : public GDALPamDataset {
+ public:
+  static void DropUnsaved(GDALPamDataset& dataset) {
+    dataset.*(&BesideDataset::nPamFlags) &= ~GPF_DIRTY;
+  }
+};
+
 struct ColorTableDeleter {
   void operator()(void* table) const { GDALDestroyColorTable(table); }
 };
@@ -156,6 +163,11 @@ bool WritePalette(GDALRasterBandH band, const Palette* palette) {
     GDALSetColorEntry(table.get(), static_cast<int>(i), &entry);
   }
   return GDALSetRasterColorTable(band, table.get()) == CE_None;
+}
+
+void DropUnsaved(GDALDatasetH dataset) {
+  auto* const withSideFile = dynamic_cast<GDALPamDataset*>(GDALDataset::FromHandle(dataset));
+  if (withSideFile != nullptr) BesideDataset::DropUnsaved(*withSideFile);
 }
 
 }  // namespace lumo::gdal

@@ -48,4 +48,8 @@ bool HasPalette(GDALRasterBandH band);
 /// @param palette  null takes the colour table away.
 bool WritePalette(GDALRasterBandH band, const Palette* palette);
 
+/// Forgets what was set for the file beside a raster and isn't stored there, so that closing the
+/// raster doesn't store it.
+void DropUnsaved(GDALDatasetH dataset);
+
 }  // namespace lumo::gdal

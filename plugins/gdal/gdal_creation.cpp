@@ -15,7 +15,9 @@
 #include "gdal_no_data.h"
 #include "gdal_side_file.h"
 #include "gdal_types.h"
-#include "platform/file_moves.h"
+#include "orva_file.h"
+#include "platform/file_swap.h"
+#include "platform/folder_lock.h"
 #include "platform/random_access_file.h"
 #include "platform/temporary_file.h"
 
@@ -156,6 +158,7 @@ NewRaster::NewRaster(std::string driver, const std::string& path, const RasterDe
     : driver_(std::move(driver)),
       path_(path),
       def_(AsKept(driver_, def)),
+      older_(platform::IdentifyFile(path)),
       temporary_(TemporaryPath(path)),
       mask_(platform::TemporaryPathBeside(path), def.samples, def.lines) {}
 
@@ -179,6 +182,20 @@ std::string NewRaster::Shown(const std::string& text) const {
     }
   }
   return shown;
+}
+
+/// Tells the fault of this thread by the user's name.
+bool NewRaster::ShowFault() const {
+  SetFault(Shown(TakeFault().ToUTF8()));
+  return false;
+}
+
+bool NewRaster::ReadPixels(const BlockPlace& place, void* pixels) const {
+  return pixels_->Read(place, pixels) || ShowFault();
+}
+
+bool NewRaster::WritePixels(const BlockPlace& place, const void* pixels) {
+  return pixels_->Write(place, pixels) || ShowFault();
 }
 
 bool NewRaster::Fail(const std::string& what) const {
@@ -216,6 +233,7 @@ bool NewRaster::CheckTarget() const {
   if (type.isSignedByte && !HoldsSignedBytes(GDALGetDriverByName(driver_.c_str()))) {
     return Fail("the format can't hold signed bytes");
   }
+  platform::RemoveAbandonedFiles(path_);
   std::string why;
   if (!platform::WriteNewFile(temporary_, "", &why)) {
     SetFault(Shown(why));
@@ -278,7 +296,7 @@ DatasetPtr NewRaster::MakeDirectly() {
   DatasetPtr dataset(GDALCreate(GDALGetDriverByName(driver_.c_str()), temporary_.c_str(),
                                 static_cast<int>(def_.samples), static_cast<int>(def_.lines),
                                 static_cast<int>(def_.bands), type.type, options.List()));
-  if (dataset == nullptr || !Describe(dataset.get())) {
+  if (dataset == nullptr || !Describe(dataset.get()) || messages.HasError()) {
     Fail(messages.Text());
     return nullptr;
   }
@@ -293,11 +311,19 @@ DatasetPtr NewRaster::BeginPixels(DatasetPtr dataset) {
       CSLFetchNameValueDef(GDALGetMetadata(dataset.get(), "IMAGE_STRUCTURE"), "INTERLEAVE", "BAND"),
       "PIXEL");
   dataset.reset();
-  pixels_ = TiffPixels::Begin(temporary_, def_, byPixel, fill);
+  if (messages.HasError()) {
+    Fail(messages.Text());
+    return nullptr;
+  }
+  if (!TiffPixels::Begin(temporary_, def_, byPixel, fill, pixels_)) {
+    ShowFault();
+    return nullptr;
+  }
   dataset.reset(
       GDALOpenEx(temporary_.c_str(), GDAL_OF_RASTER | GDAL_OF_UPDATE, nullptr, nullptr, nullptr));
-  if (dataset == nullptr) Fail(messages.Text());
-  return dataset;
+  if (dataset != nullptr && !messages.HasError()) return dataset;
+  Fail(messages.Text());
+  return nullptr;
 }
 
 DatasetPtr NewRaster::MakeForCopy() {
@@ -344,10 +370,7 @@ bool NewRaster::Finish(DatasetPtr dataset) {
   } else {
     dataset.reset();
     if (messages.HasError()) return Fail(messages.Text());
-    if (pixels_ != nullptr && !pixels_->Finish()) {
-      SetFault(Shown(TakeFault().ToUTF8()));
-      return false;
-    }
+    if (pixels_ != nullptr && !pixels_->Finish()) return ShowFault();
     pixels_.reset();
   }
   return WriteBeside() && WriteMask() && IsWhole() && TakePlace();
@@ -378,9 +401,7 @@ bool NewRaster::WriteBeside() const {
 }
 
 bool NewRaster::WriteMask() {
-  if (mask_.WriteTo(temporary_, driver_)) return true;
-  SetFault(Shown(TakeFault().ToUTF8()));
-  return false;
+  return mask_.WriteTo(temporary_, driver_) || ShowFault();
 }
 
 /// Opens the file once more and reads its last pixel: not every driver reports a disk that is full.
@@ -404,38 +425,67 @@ bool NewRaster::IsWhole() const {
       return Fail(messages.Text());
     }
   }
-  return true;
+  return !messages.HasError() || Fail(messages.Text());
 }
 
-/// The new file comes onto the disk before an old one goes.
+/// The new file comes onto the disk before an old one goes; the older one comes back, with what it
+/// had beside it, when something fails.
 bool NewRaster::TakePlace() const {
   std::string why;
-  if (Exists(path_)) {
+  if (older_.exists) {
     const auto file = platform::RandomAccessFile::Open(
         temporary_, platform::RandomAccessFile::Access::kUpdate, &why);
     if (file == nullptr || !file->Flush(&why)) return Fail(why);
   }
-  if (driver_ == "HFA") {  // the names of further files stand inside
-    for (const char* const suffix : kSideFiles) Remove(path_ + suffix);
-    const Messages messages;
-    GDALDriverH const driver = GDALGetDriverByName(driver_.c_str());
-    if (GDALRenameDataset(driver, path_.c_str(), temporary_.c_str()) != CE_None) {
-      return Fail(messages.Text());
-    }
-  } else if (!platform::RenameFile(temporary_, path_, &why)) {
+  const platform::FolderLock lock(path_);
+  if (!lock.IsHeld(&why)) return Fail(why);
+  const platform::FileIdentity now = platform::IdentifyFile(path_);
+  if (now.exists && !now.IsSameFile(older_)) return Fail("was made by another program meanwhile");
+  platform::FileSwap swap;
+  if (!MoveFiles(swap, why)) {
     SetFault(Shown(why));
     return false;
   }
-  // What the older file had beside it tells of other pixels.
+  swap.Keep();
+  return true;
+}
+
+bool NewRaster::MoveFiles(platform::FileSwap& swap, std::string& why) const {
+  // A header of our own format would tell of the new file as if it were the older one.
+  if (orva::HasHeader(path_) && !swap.MoveAside(orva::HeaderPath(path_), &why)) return false;
+  // What the older file has beside it tells of other pixels.
   for (const char* const suffix : kSideFiles) {
-    if (!Exists(temporary_ + suffix)) {
-      if (driver_ != "HFA") Remove(path_ + suffix);  // GDAL has moved what was beside it
-    } else if (!platform::RenameFile(temporary_ + suffix, path_ + suffix, &why)) {
-      SetFault(Shown(why));
+    if (!swap.MoveAside(path_ + suffix, &why)) return false;
+  }
+  if (!(driver_ == "HFA" ? MoveImagine(swap, why) : swap.MoveIn(temporary_, path_, &why))) {
+    return false;
+  }
+  for (const char* const suffix : kSideFiles) {
+    if (Exists(temporary_ + suffix) && !swap.MoveIn(temporary_ + suffix, path_ + suffix, &why)) {
       return false;
     }
   }
   return true;
+}
+
+/// Moves an Imagine file. Where its pixels lie in a file of their own, whose name stands inside,
+/// GDAL does it.
+bool NewRaster::MoveImagine(platform::FileSwap& swap, std::string& why) const {
+  const auto pixelsOf = [](const std::string& path) {
+    return fs::path(path).replace_extension(".ige").string();
+  };
+  if (!swap.MoveAside(pixelsOf(path_), &why)) return false;
+  if (!Exists(pixelsOf(temporary_))) return swap.MoveIn(temporary_, path_, &why);
+  if (!swap.MoveAside(path_, &why)) return false;
+  const Messages messages;
+  GDALDriverH const driver = GDALGetDriverByName(driver_.c_str());
+  if (GDALRenameDataset(driver, path_.c_str(), temporary_.c_str()) == CE_None &&
+      !messages.HasError()) {
+    return true;
+  }
+  why = path_ + ": " + messages.Text();
+  for (const std::string& half : {path_, pixelsOf(path_)}) Remove(half);
+  return false;
 }
 
 }  // namespace lumo::gdal

@@ -8,6 +8,8 @@
 #include "common/source.h"
 #include "gdal_band_values.h"
 #include "gdal_new_mask.h"
+#include "platform/file_identity.h"
+#include "platform/file_swap.h"
 #include "raster/raster_def.h"
 #include "tiff_pixels.h"
 
@@ -35,8 +37,10 @@ class NewRaster {
   NewRaster(const NewRaster&) = delete;
   NewRaster& operator=(const NewRaster&) = delete;
 
-  /// Where the pixels go; null when they go into the dataset.
-  TiffPixels* Pixels() const { return pixels_.get(); }
+  /// True when the pixels go past the dataset, by the operations that follow.
+  bool HasPixels() const { return pixels_ != nullptr; }
+  bool ReadPixels(const BlockPlace& place, void* pixels) const;
+  bool WritePixels(const BlockPlace& place, const void* pixels);
 
   /// The definition as far as the format keeps it.
   const RasterDef& Definition() const { return def_; }
@@ -68,13 +72,17 @@ class NewRaster {
   bool WriteMask();
   bool IsWhole() const;
   bool TakePlace() const;
+  bool MoveFiles(platform::FileSwap& swap, std::string& why) const;
+  bool MoveImagine(platform::FileSwap& swap, std::string& why) const;
   std::string Shown(const std::string& text) const;
   bool Fail(const std::string& what) const;
+  bool ShowFault() const;
 
   const std::string driver_;
   const std::string path_;
   const RasterDef def_;
-  const std::string temporary_;  // of the format, beside the place
+  const platform::FileIdentity older_;  // that stands at the place
+  const std::string temporary_;         // of the format, beside the place
   std::unique_ptr<TiffPixels> pixels_;
   NewMask mask_;
   std::string scratch_;  // the TIFF file that the copy is made from

@@ -1,7 +1,6 @@
 #include "gdal_masks.h"
 
 #include <algorithm>
-#include <new>
 
 namespace lumo::gdal {
 
@@ -25,12 +24,7 @@ Masks::Masks(const RasterLevel& level, const Array<unsigned>& bands) {
 
 bool Masks::Apply(const BlockPlace& place, GSpacing pixel, GSpacing line, GSpacing band,
                   unsigned char* state) const {
-  std::vector<unsigned char> values;
-  try {
-    values.resize(std::size_t{place.width} * place.height);
-  } catch (const std::bad_alloc&) {
-    return false;
-  }
+  std::vector<unsigned char> values(std::size_t{place.width} * place.height);
   for (const Mask& mask : masks_) {
     const auto at = [](unsigned number) { return static_cast<int>(number); };
     if (GDALRasterIO(mask.band, GF_Read, at(place.left), at(place.top), at(place.width),

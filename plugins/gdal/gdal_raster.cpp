@@ -2,16 +2,21 @@
 
 #include <algorithm>
 #include <cmath>
+#include <cpl_minixml.h>
 #include <filesystem>
 
 #include "common/file_guard.h"
 #include "common/messages.h"
 #include "foundation/fault.h"
+#include "foundation/warnings.h"
+#include "gdal_band_values.h"
 #include "gdal_creation.h"
 #include "gdal_georef.h"
 #include "gdal_masks.h"
 #include "gdal_open.h"
+#include "gdal_overviews.h"
 #include "gdal_types.h"
+#include "platform/folder_lock.h"
 #include "platform/random_access_file.h"
 
 namespace lumo::gdal {
@@ -99,6 +104,37 @@ bool DriverUpdates(const Format& format) {
   return creates != nullptr && std::string(creates) == "YES";
 }
 
+/// False for a file of values beside a raster that GDAL would pass over without a word.
+bool IsSideFileWhole(const std::string& path) {
+  std::error_code ignored;
+  if (!std::filesystem::is_regular_file(path, ignored)) return true;
+  const Messages messages;
+  CPLXMLNode* const tree = CPLParseXMLFile(path.c_str());
+  const bool isWhole = tree != nullptr && CPLGetXMLNode(tree, "=PAMDataset") != nullptr;
+  CPLDestroyXMLNode(tree);
+  return isWhole;
+}
+
+/// Warns of files beside a raster that are left out, since they are damaged or of something else.
+void WarnOfUnusedFiles(const std::string& name, const RasterLevel& full) {
+  const Messages messages;  // GDAL's words on them would not say that they are left out
+  std::error_code ignored;
+  const auto warn = [&](const char* suffix, const char* what) {
+    AddWarning(name + suffix + ": " + what + "; it is left out");
+  };
+  if (!IsSideFileWhole(name + ".aux.xml") && messages.Files().First() == nullptr) {
+    warn(".aux.xml", "isn't whole");
+  }
+  GDALRasterBandH const band = full.bands.front();
+  if (HasLevelFile(name) && GDALGetOverviewCount(band) == 0) {
+    warn(".ovr", "holds no levels that can be read");
+  }
+  if (std::filesystem::is_regular_file(name + ".msk", ignored) &&
+      (GDALGetMaskFlags(band) & GMF_ALL_VALID) != 0) {
+    warn(".msk", "holds no mask that can be read");
+  }
+}
+
 }  // namespace
 
 OpenRaster::OpenRaster(const Format& format, const Source& source)
@@ -111,7 +147,9 @@ OpenRaster::~OpenRaster() {
 std::unique_ptr<OpenRaster> OpenRaster::Open(const Format& format, const Source& source) {
   std::unique_ptr<OpenRaster> raster(new OpenRaster(format, source));
   DatasetPtr dataset = OpenToRead(format, source, raster->isThreaded_);
-  return raster->TakeDataset(std::move(dataset)) ? std::move(raster) : nullptr;
+  if (!raster->TakeDataset(std::move(dataset))) return nullptr;
+  if (source.isFile) WarnOfUnusedFiles(source.name, raster->levels_.at(0));
+  return raster;
 }
 
 std::unique_ptr<OpenRaster> OpenRaster::Create(const Format& format, const Source& source,
@@ -137,7 +175,7 @@ bool OpenRaster::TakeDataset(DatasetPtr dataset) {
   interleave_ = ReadInterleave(dataset_.get());
   FindLevels();
   // The overviews are looked for only now, and a file may name one anywhere.
-  return WasRefusedNothing();
+  return IsWithoutFault(messages, source_) && WasRefusedNothing();
 }
 
 /// Takes the dataset of a raster that was open before: its reader goes by what it was then.
@@ -256,9 +294,9 @@ const RasterLevel* OpenRaster::CheckPlace(const BlockPlace& place) const {
 bool OpenRaster::Transfer(GDALRWFlag direction, const BlockPlace& place, void* pixels) const {
   const RasterLevel* const level = CheckPlace(place);
   if (level == nullptr) return false;
-  if (newRaster_ != nullptr && newRaster_->Pixels() != nullptr) {
-    TiffPixels& target = *newRaster_->Pixels();
-    return direction == GF_Read ? target.Read(place, pixels) : target.Write(place, pixels);
+  if (newRaster_ != nullptr && newRaster_->HasPixels()) {
+    return direction == GF_Read ? newRaster_->ReadPixels(place, pixels)
+                                : newRaster_->WritePixels(place, pixels);
   }
   const Messages messages(Messages::Damage::kIsError);
   const GDALDataType type = PixelTypeOf(dataType_).type;
@@ -347,15 +385,19 @@ void OpenRaster::ForgetStatistics(const Array<unsigned>& bands) {
   mayHavePairs_ = false;
 }
 
-bool OpenRaster::ReadMasks(const BlockPlace& place, unsigned char* state) const {
+bool OpenRaster::ReadMasks(const BlockPlace& place, unsigned char* state) {
   const RasterLevel* const level = CheckPlace(place);
   if (level == nullptr) return false;
   const Messages messages(Messages::Damage::kIsError);
   const Masks masks(*level, place.bands);
-  if (!masks.IsNeeded()) return true;
+  if (!masks.IsNeeded()) return !messages.HasError() || messages.Fail(Name());
   const Strides strides(interleave_, place, 1);
-  return masks.Apply(place, strides.pixel, strides.line, strides.band, state) ||
-         messages.Fail(Name(), "the mask can't be read");
+  if (masks.Apply(place, strides.pixel, strides.line, strides.band, state) &&
+      !messages.HasError()) {
+    return true;
+  }
+  isDamaged_ = true;
+  return messages.Fail(Name(), "the mask can't be read");
 }
 
 bool OpenRaster::BuildOverviews(const char* method, unsigned levelMin, unsigned levelMax) {
@@ -365,22 +407,34 @@ bool OpenRaster::BuildOverviews(const char* method, unsigned levelMin, unsigned 
     factors.push_back(1 << level);
   }
   if (factors.empty()) return FailWith(Name(), "no levels asked for");
-  const Messages messages(Messages::Damage::kIsError);
-  const bool hadLevels = levels_.size() > 1;
-  const CPLErr result = GDALBuildOverviews(dataset_.get(), method, static_cast<int>(factors.size()),
-                                           factors.data(), 0, nullptr, nullptr, nullptr);
-  GDALFlushCache(dataset_.get());
-  FindLevels();
-  if (result == CE_None && !messages.HasError()) return true;
-  messages.Fail(Name());
+  // Levels inside a file that is being written can only be made there.
+  const bool isInside = isUpdated_ && levels_.size() > 1 && !HasLevelFile(Name());
+  if (isInside) {
+    const bool isBuilt = gdal::BuildOverviews(dataset_.get(), method, factors, Name());
+    FindLevels();
+    return isBuilt;
+  }
+  if (isUpdated_) {
+    const Messages messages;
+    dataset_.reset();
+    isUpdated_ = false;
+    if (messages.HasError()) return messages.Fail(Name());
+  }
+  const bool isBuilt = BuildOverviewsBeside(source_, format_, method, factors);
   const String fault = TakeFault();
-  if (!hadLevels) DeleteOverviews();  // a half-made one would pass for a whole one
-  SetFault(fault);
-  return false;
+  const bool isOpen = Reopen();
+  if (!isBuilt) SetFault(fault);
+  return isBuilt && isOpen;
 }
 
-bool OpenRaster::FindLevelsAnew() {
-  if (isUpdated_ || levels_.empty()) return !levels_.empty();
+/// Opens the raster anew, as it was opened.
+bool OpenRaster::Reopen() {
+  if (isUpdated_) {
+    const Messages messages;
+    dataset_.reset();
+    if (messages.HasError()) return messages.Fail(Name());
+    return TakeAgain(OpenDataset(source_, format_, GDAL_OF_RASTER | GDAL_OF_UPDATE));
+  }
   bool isThreaded = false;
   DatasetPtr dataset = OpenToRead(format_, source_, isThreaded);
   if (dataset == nullptr) return false;  // what is open stays
@@ -389,12 +443,43 @@ bool OpenRaster::FindLevelsAnew() {
   return TakeAgain(std::move(dataset));
 }
 
+bool OpenRaster::ChangeStored(const std::function<bool()>& change) {
+  const Messages messages;
+  if (newRaster_ != nullptr) return change() || messages.Fail(Name());
+  const platform::FolderLock lock(Name());
+  std::string busy;
+  if (!lock.IsHeld(&busy)) return FailWith(Name(), busy);
+  if (levels_.empty() || !Reopen()) return false;
+  // What could not be read would be lost when the file beside the raster is written anew.
+  if (messages.Files().First() != nullptr) return messages.Fail(Name());
+  if (!IsSideFileWhole(Name() + ".aux.xml")) {
+    return FailWith(Name() + ".aux.xml", "isn't whole, and stays as it is");
+  }
+  TakeFault();
+  const bool isChanged = change();
+  if (isChanged) GDALFlushCache(dataset_.get());  // which warns where it can't
+  if (isChanged && !messages.HasError()) return true;
+  String fault = TakeFault();
+  if (fault.GetLength() == 0) {
+    messages.Fail(Name());
+    fault = TakeFault();
+  }
+  DropUnsaved(dataset_.get());
+  Reopen();
+  SetFault(fault);
+  return false;
+}
+
+bool OpenRaster::FindLevelsAnew() {
+  return isUpdated_ || levels_.empty() ? !levels_.empty() : Reopen();
+}
+
 bool OpenRaster::DeleteOverviews() {
   const Messages messages;
   const CPLErr result =
       GDALBuildOverviews(dataset_.get(), "NONE", 0, nullptr, 0, nullptr, nullptr, nullptr);
   FindLevels();
-  return result == CE_None || messages.Fail(Name());
+  return (result == CE_None && !messages.HasError()) || messages.Fail(Name());
 }
 
 }  // namespace lumo::gdal

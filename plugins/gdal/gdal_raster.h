@@ -1,5 +1,6 @@
 #pragma once
 
+#include <functional>
 #include <map>
 #include <memory>
 
@@ -75,13 +76,17 @@ class OpenRaster {
   /// Carries a block to the caller's memory, in the raster's interleave.
   bool Read(const BlockPlace& place, void* pixels);
   bool Write(const BlockPlace& place, const void* pixels);
+  /// Lets `change` change values that the raster, or the file beside it, stores of its bands, and
+  /// stores them. It sees what others have stored by now, and nobody else stores anything
+  /// meanwhile; when it fails nothing has changed.
+  bool ChangeStored(const std::function<bool()>& change);
   /// Says that statistics are being stored, those between bands perhaps among them.
   void NoteStatistics() { mayHavePairs_ = true; }
   /// Lets the mask of a raster that is being made exclude pixels of a block; see NewMask::Take.
   bool ExcludeFromNew(const BlockPlace& place, const std::vector<unsigned char>& excluded);
 
   /// Sets state bits where a mask or an alpha band of the source excludes pixels.
-  bool ReadMasks(const BlockPlace& place, unsigned char* state) const;
+  bool ReadMasks(const BlockPlace& place, unsigned char* state);
 
   bool BuildOverviews(const char* method, unsigned levelMin, unsigned levelMax);
   bool DeleteOverviews();
@@ -92,6 +97,7 @@ class OpenRaster {
   OpenRaster(const Format& format, const Source& source);
   bool TakeDataset(DatasetPtr dataset);
   bool TakeAgain(DatasetPtr dataset);
+  bool Reopen();
   void FindLevels();
   bool Transfer(GDALRWFlag direction, const BlockPlace& place, void* pixels) const;
   const RasterLevel* CheckPlace(const BlockPlace& place) const;

@@ -1,18 +1,7 @@
-#include "gdal_reader_impl.h"
+#include "gdal_reader_body.h"
 
 namespace lumo::gdal {
 
-template class Reader<std::uint8_t>;
-template class Reader<std::int8_t>;
-template class Reader<std::uint16_t>;
-template class Reader<std::int16_t>;
-template class Reader<std::uint32_t>;
-template class Reader<std::int32_t>;
-template class Reader<float>;
-template class Reader<double>;
-template class Reader<std::uint64_t>;
-template class Reader<std::int64_t>;
-template class Reader<Complex<float>>;
-template class Reader<Complex<double>>;
+VEXG_INSTANCES(TWELVE, Reader);
 
 }  // namespace lumo::gdal

@@ -69,7 +69,6 @@ class Reader final : public PlainRasterReader<T> {
   static constexpr bool kHasStats = std::is_arithmetic_v<T>;
 
   bool ChangePalette(unsigned band, const lumo::Palette* palette);
-  bool FlushBandValues();
   std::vector<unsigned char> FindUntold(const BlockPlace& place, const T* pixels,
                                         const unsigned char* state) const;
 

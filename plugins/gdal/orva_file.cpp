@@ -5,7 +5,10 @@
 #include "data/format_table.h"
 #include "foundation/abandonment.h"
 #include "foundation/fault.h"
+#include "foundation/file_faults.h"
 #include "platform/file_moves.h"
+#include "platform/file_swap.h"
+#include "platform/folder_lock.h"
 #include "platform/temporary_file.h"
 
 namespace lumo::orva {
@@ -39,7 +42,7 @@ void RemoveFile(const std::string& path) {
 bool File::Fail(const std::string& fault) const {
   // A new raster lies beside its place at first; its user knows only the place.
   const std::string shown = pixels_ != nullptr ? pixels_->Path() : path_;
-  SetFault(fault.starts_with(shown) ? path_ + fault.substr(shown.size()) : fault);
+  SetFault(fault.starts_with(shown + ": ") ? path_ + fault.substr(shown.size()) : fault);
   return false;
 }
 
@@ -54,9 +57,9 @@ std::unique_ptr<File> File::Open(const std::string& path) {
   std::unique_ptr<File> file(new File(path));
   if (!file->LoadHeader(file->header_)) return nullptr;
   std::string fault;
-  file->pixels_ = RandomAccessFile::Open(path, RandomAccessFile::Access::kUpdate);
-  file->canWrite_ = file->pixels_ != nullptr;
-  if (!file->canWrite_) {
+  file->pixels_ =
+      RandomAccessFile::Open(path, RandomAccessFile::Access::kUpdate, &file->whyReadOnly_);
+  if (!file->CanWrite()) {
     file->pixels_ = RandomAccessFile::Open(path, RandomAccessFile::Access::kRead, &fault);
   }
   std::uint64_t bytes = 0;
@@ -87,8 +90,11 @@ std::unique_ptr<File> File::Create(const std::string& path, const RasterDef& def
     file->Fail(path + ": not a file");
     return nullptr;
   }
-  file->replaces_ =
-      std::filesystem::exists(path, missing) || std::filesystem::exists(HeaderPath(path), missing);
+  platform::RemoveAbandonedFiles(path);
+  platform::RemoveAbandonedFiles(HeaderPath(path));
+  file->older_ = platform::IdentifyFile(path);
+  file->hadHeader_ = platform::IdentifyFile(HeaderPath(path)).exists;
+  file->replaces_ = file->older_.exists || file->hadHeader_;
   file->pixels_ = RandomAccessFile::Create(
       file->replaces_ ? platform::TemporaryPathBeside(path) : path, &fault);
   file->isNew_ = file->pixels_ != nullptr;
@@ -96,7 +102,6 @@ std::unique_ptr<File> File::Create(const std::string& path, const RasterDef& def
     file->Fail(fault);
     return nullptr;
   }
-  file->canWrite_ = true;
   file->failed_ = false;
   return file;
 }
@@ -108,7 +113,7 @@ bool File::Close() {
     Discard();
     return false;
   }
-  if (!pixels_->HasName()) return true;  // its user deleted it
+  if (!pixels_->HasName() && !platform::IdentifyFile(path_).exists) return true;  // deleted
   if (Publish()) return true;
   Discard();
   return false;
@@ -120,18 +125,32 @@ bool File::Publish() {
   std::string fault;
   const std::string headerPath = HeaderPath(path_);
   const std::string newHeader = platform::TemporaryPathBeside(headerPath);
-  if (!pixels_->Flush(&fault) ||
-      !platform::WriteNewFile(newHeader, header_.text.Format(), &fault)) {
-    return Fail(fault);
+  const bool isWritten =
+      pixels_->Flush(&fault) && platform::WriteNewFile(newHeader, header_.text.Format(), &fault);
+  if (isWritten && TakePlace(newHeader, fault)) return true;
+  RemoveFile(newHeader);
+  return Fail(fault.starts_with(newHeader) ? headerPath + fault.substr(newHeader.size()) : fault);
+}
+
+/// Puts both files to their places, unless another raster was made there meanwhile.
+bool File::TakePlace(const std::string& newHeader, std::string& fault) {
+  const platform::FolderLock lock(path_);
+  if (!lock.IsHeld(&fault)) return false;
+  const platform::FileIdentity now = platform::IdentifyFile(path_);
+  const bool hasHeader = platform::IdentifyFile(HeaderPath(path_)).exists;
+  if ((replaces_ ? now.exists && !now.IsSameFile(older_) : !pixels_->HasName()) ||
+      (hasHeader && !hadHeader_)) {
+    fault = path_ + ": was replaced by another program meanwhile";
+    return false;
   }
-  const std::string oldHeader = platform::TemporaryPathBeside(headerPath);
-  const bool hadHeader = replaces_ && platform::RenameFile(headerPath, oldHeader);
-  const bool placed = !replaces_ || platform::RenameFile(pixels_->Path(), path_, &fault);
-  const bool done = placed && platform::RenameFile(newHeader, headerPath, &fault);
-  if (!done) RemoveFile(newHeader);
-  if (hadHeader && placed) RemoveFile(oldHeader);
-  if (hadHeader && !placed) platform::RenameFile(oldHeader, headerPath);
-  return done || Fail(fault);
+  platform::FileSwap swap;
+  if (!swap.MoveAside(HeaderPath(path_), &fault) ||
+      (replaces_ && !swap.MoveIn(pixels_->Path(), path_, &fault)) ||
+      !swap.MoveIn(newHeader, HeaderPath(path_), &fault)) {
+    return false;
+  }
+  swap.Keep();
+  return true;
 }
 
 void File::Discard() {
@@ -151,20 +170,32 @@ bool File::Write(std::uint64_t offset, std::span<const platform::ConstFilePiece>
 }
 
 bool File::ChangeHeader(const std::function<bool(Header&)>& change) {
-  if (!canWrite_) return Fail(path_ + ": opened for reading only");
-  if (!isNew_ && !pixels_->HasName()) return Fail(path_ + ": replaced since it was opened");
+  if (!CanWrite()) return Fail(whyReadOnly_);
   Header header = header_;
-  if (!isNew_ && !LoadHeader(header)) return false;
-  const std::string before = header.text.Format();
-  if (!change(header)) return false;
-  const std::string text = header.text.Format();
-  std::string fault;
-  if (text.size() > kMaxHeaderBytes) return Fail(HeaderPath(path_) + ": too much for a header");
-  if (!isNew_ && text != before && !platform::ReplaceFile(HeaderPath(path_), text, &fault)) {
-    return Fail(fault);
+  std::string text, fault;
+  if (isNew_) {
+    if (!ChangeText(header, change, text)) return false;
+  } else {
+    const platform::FolderLock lock(path_);
+    if (!lock.IsHeld(&fault)) return Fail(fault);
+    if (!pixels_->HasName()) return Fail(path_ + ": replaced since it was opened");
+    if (!LoadHeader(header)) return false;
+    const std::string before = header.text.Format();
+    if (!ChangeText(header, change, text)) return false;
+    if (text != before && !platform::ReplaceFile(HeaderPath(path_), text, &fault)) {
+      return Fail(fault);
+    }
   }
   header_.text = std::move(header.text);
   return true;
+}
+
+/// @param text  [out] of the changed header.
+bool File::ChangeText(Header& header, const std::function<bool(Header&)>& change,
+                      std::string& text) const {
+  if (!change(header)) return false;
+  text = header.text.Format();
+  return text.size() <= kMaxHeaderBytes || Fail(HeaderPath(path_) + ": too much for a header");
 }
 
 std::string FindPath(const Array<String>& connStrings) {
@@ -186,13 +217,15 @@ std::string FindPath(const Array<String>& connStrings) {
 }
 
 bool HasHeader(const std::string& path) {
-  const auto file = RandomAccessFile::Open(HeaderPath(path), RandomAccessFile::Access::kRead);
+  const std::string header = HeaderPath(path);
+  const auto file = RandomAccessFile::Open(header, RandomAccessFile::Access::kRead);
   char start[5] = {};
-  std::uint64_t bytes = 0;
-  if (file == nullptr || !file->GetSize(bytes) || bytes < sizeof start ||
-      !file->Read(0, start, sizeof start)) {
+  std::size_t bytes = 0;
+  if (file == nullptr || !file->ReadUpTo(0, start, sizeof start, bytes)) {
+    FileFaults::NoteUnread(header);
     return false;
   }
+  if (bytes < sizeof start) return false;
   return std::string_view(start, 4) == "ORVA" && (start[4] == '\n' || start[4] == '\r');
 }
 

@@ -4,6 +4,7 @@
 #include <memory>
 
 #include "orva_header.h"
+#include "platform/file_identity.h"
 #include "platform/random_access_file.h"
 
 namespace lumo::orva {
@@ -11,7 +12,8 @@ namespace lumo::orva {
 /// An ORVA raster on the disk: the file with the pixels, and its header.
 ///
 /// A new raster has no header until Close: what breaks before leaves no raster. Where it takes the
-/// place of an older one, that stays as it is until then.
+/// place of an older one, that stays as it is until then, and when the change fails. Of two that
+/// are made at one place, the second to be closed fails.
 /// Failure: false or null, with SetFault.
 class File {
  public:
@@ -33,7 +35,7 @@ class File {
   /// Absolute, with links resolved.
   const std::string& Path() const { return path_; }
   const Header& GetHeader() const { return header_; }
-  bool CanWrite() const { return canWrite_; }
+  bool CanWrite() const { return whyReadOnly_.empty(); }
 
   bool Read(std::uint64_t offset, std::span<const platform::FilePiece> pieces) const;
   /// A failure to write dooms a new raster.
@@ -41,23 +43,28 @@ class File {
 
   /// Lets `change` change the text of a header, unless it gives false, with SetFault. The header of
   /// a raster which has one is read again before, since another connection may have written it, and
-  /// is written when it has changed.
+  /// is written when it has changed; nobody else changes it meanwhile.
   bool ChangeHeader(const std::function<bool(Header&)>& change);
 
  private:
   explicit File(std::string path) : path_(std::move(path)) {}
   bool Fail(const std::string& fault) const;
   bool LoadHeader(Header& header) const;
+  bool ChangeText(Header& header, const std::function<bool(Header&)>& change,
+                  std::string& text) const;
   bool Publish();
+  bool TakePlace(const std::string& newHeader, std::string& fault);
   void Discard();
 
   const std::string path_;
   Header header_;
   std::unique_ptr<platform::RandomAccessFile> pixels_;
-  bool canWrite_ = false;
-  bool isNew_ = false;     // has no header yet
-  bool replaces_ = false;  // lies beside `path_` until it is whole
-  bool failed_ = false;    // gets no header any more
+  std::string whyReadOnly_;       // "path: what"; empty where the pixels can be written
+  platform::FileIdentity older_;  // that a new raster takes the place of
+  bool hadHeader_ = false;        // when the new raster was begun
+  bool isNew_ = false;            // has no header yet
+  bool replaces_ = false;         // lies beside `path_` until it is whole
+  bool failed_ = false;           // gets no header any more
 };
 
 /// The file that connection strings name: the one piece that is no format's key, without ".hdr" at

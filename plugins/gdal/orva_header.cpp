@@ -240,17 +240,7 @@ bool ParseNumber(const std::string& text, T& value) {
   }
 }
 
-template bool ParseNumber(const std::string&, std::uint8_t&);
-template bool ParseNumber(const std::string&, std::int8_t&);
-template bool ParseNumber(const std::string&, std::uint16_t&);
-template bool ParseNumber(const std::string&, std::int16_t&);
-template bool ParseNumber(const std::string&, std::uint32_t&);
-template bool ParseNumber(const std::string&, std::int32_t&);
-template bool ParseNumber(const std::string&, float&);
-template bool ParseNumber(const std::string&, double&);
-template bool ParseNumber(const std::string&, std::uint64_t&);
-template bool ParseNumber(const std::string&, std::int64_t&);
-template bool ParseNumber(const std::string&, Complex<float>&);
-template bool ParseNumber(const std::string&, Complex<double>&);
+#define PARSE_NUMBER(T) template bool ParseNumber(const std::string&, T&);
+VEXG_FOR(TWELVE, PARSE_NUMBER);
 
 }  // namespace lumo::orva

@@ -35,13 +35,15 @@ class Reader final : public RasterReader<T> {
   /// What the stored statistics of all bands hold; everything while none are stored.
   std::int32_t StatsMask() override;
   bool StatsExist(unsigned band) override { return values_.stats.contains(band); }
-  bool CanWriteStats() override { return kHasStats && file_.CanWrite(); }
-  bool CanWriteHistogram() override { return kHasStats && file_.CanWrite(); }
+  /// The format has room for them; whether the file lets itself be written, the write tells.
+  bool CanWriteStats() override { return kHasStats; }
+  bool CanWriteHistogram() override { return kHasStats; }
   RasterBandStats<T> ReadStats(unsigned band) override;
-  /// The statistics of each band in the list take the place of those that are stored for it.
+  /// The statistics of each band in the list take the place of those that are stored for it. One
+  /// without any takes away what this reader knows of, not what somebody else has stored since.
   bool WriteStats(const Array<RasterBandStats<T>>& stats) override;
   Array<RasterBandHistogram<T>> Histogram(unsigned band) override;
-  /// The histograms take the place of all that are stored.
+  /// The histograms take the place of all that this reader knows of.
   bool WriteHistogram(const Array<RasterBandHistogram<T>>& histograms) override;
 
   bool HasNoDataValue(unsigned band) override { return noData_.contains(band); }

@@ -120,17 +120,7 @@ void BandValues<T>::Write(HeaderText& text) const {
   WritePalettes(palettes, text);
 }
 
-template struct BandValues<std::uint8_t>;
-template struct BandValues<std::int8_t>;
-template struct BandValues<std::uint16_t>;
-template struct BandValues<std::int16_t>;
-template struct BandValues<std::uint32_t>;
-template struct BandValues<std::int32_t>;
-template struct BandValues<float>;
-template struct BandValues<double>;
-template struct BandValues<std::uint64_t>;
-template struct BandValues<std::int64_t>;
-template struct BandValues<Complex<float>>;
-template struct BandValues<Complex<double>>;
+#define BAND_VALUES(T) template struct BandValues<T>;
+VEXG_FOR(TWELVE, BAND_VALUES);
 
 }  // namespace lumo::orva

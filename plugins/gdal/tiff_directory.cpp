@@ -43,6 +43,9 @@ class Directory {
  public:
   explicit Directory(platform::RandomAccessFile& file) : file_(file) {}
 
+  /// Why a read or write of the file has failed; no text while none has.
+  const std::string& Fault() const { return fault_; }
+
   bool Read() {
     struct {
       char order[2];
@@ -52,7 +55,7 @@ class Directory {
     } header;
     static_assert(sizeof header == 16);
     const char* const native = std::endian::native == std::endian::little ? "II" : "MM";
-    if (!file_.Read(0, &header, sizeof header) || std::memcmp(header.order, native, 2) != 0) {
+    if (!Get(0, &header, sizeof header) || std::memcmp(header.order, native, 2) != 0) {
       return false;
     }
     isBig_ = header.version == 43;
@@ -65,7 +68,7 @@ class Directory {
     const auto at = entries_.find(tag);
     std::uint64_t value = 0;
     if (at == entries_.end() || at->second.valueBytes == 0) return absent;
-    return file_.Read(at->second.offset, &value, at->second.valueBytes) ? value : absent;
+    return Get(at->second.offset, &value, at->second.valueBytes) ? value : absent;
   }
 
   bool Has(Tag tag) const { return entries_.contains(tag); }
@@ -77,7 +80,7 @@ class Directory {
     }
     const Entry& entry = at->second;
     std::vector<unsigned char> bytes(entry.count * entry.valueBytes);
-    if (!file_.Read(entry.offset, bytes.data(), bytes.size())) return false;
+    if (!Get(entry.offset, bytes.data(), bytes.size())) return false;
     for (std::size_t i = 0; i < bytes.size(); i += entry.valueBytes) {
       std::uint64_t found = 0;
       std::memcpy(&found, &bytes[i], entry.valueBytes);  // of this machine's order, little endian
@@ -98,19 +101,23 @@ class Directory {
       const std::uint64_t value = valueOf(i);
       std::memcpy(&bytes[i * entry.valueBytes], &value, entry.valueBytes);
     }
-    return file_.Write(entry.offset, bytes.data(), bytes.size());
+    return file_.Write(entry.offset, bytes.data(), bytes.size(), &fault_);
   }
 
  private:
+  bool Get(std::uint64_t offset, void* to, std::size_t bytes) const {
+    return file_.Read(offset, to, bytes, &fault_);
+  }
+
   bool ReadEntries(std::uint64_t offset) {
     std::uint64_t count = 0;
     const unsigned countBytes = isBig_ ? 8 : 2;
     const unsigned entryBytes = isBig_ ? 20 : 12;
     constexpr std::uint64_t kMostEntries = 4096;
-    if (!file_.Read(offset, &count, countBytes) || count > kMostEntries) return false;
+    if (!Get(offset, &count, countBytes) || count > kMostEntries) return false;
     std::vector<unsigned char> bytes(count * entryBytes);
     offset += countBytes;
-    if (!file_.Read(offset, bytes.data(), bytes.size())) return false;
+    if (!Get(offset, bytes.data(), bytes.size())) return false;
     for (std::uint64_t i = 0; i < count; ++i) {
       ReadEntry(&bytes[i * entryBytes], offset + i * entryBytes);
     }
@@ -137,6 +144,7 @@ class Directory {
   }
 
   platform::RandomAccessFile& file_;
+  mutable std::string fault_;
   bool isBig_ = false;
   std::map<std::uint16_t, Entry> entries_;
 };
@@ -163,29 +171,36 @@ bool IsOfLayout(const Directory& directory, TiffLayout& layout) {
 
 }  // namespace
 
-bool PlaceBlocks(platform::RandomAccessFile& file, TiffLayout& layout) {
-  if constexpr (std::endian::native != std::endian::little) return false;
+Placing PlaceBlocks(platform::RandomAccessFile& file, TiffLayout& layout, std::string& fault) {
+  if constexpr (std::endian::native != std::endian::little) return Placing::kUnsuited;
   Directory directory(file);
+  const auto fail = [&] {
+    if (fault.empty()) fault = directory.Fault();
+    return fault.empty() ? Placing::kUnsuited : Placing::kFailed;
+  };
   std::uint64_t bytes = 0;
-  if (!directory.Read() || !IsOfLayout(directory, layout) || !file.GetSize(bytes)) return false;
+  if (!directory.Read() || !IsOfLayout(directory, layout) || !file.GetSize(bytes, &fault)) {
+    return fail();
+  }
   const Tag offsets = layout.isTiled ? kTileOffsets : kStripOffsets;
   const Tag counts = layout.isTiled ? kTileByteCounts : kStripByteCounts;
   if (!directory.AreAll(offsets, 0, layout.Blocks()) ||
-      !directory.AreAll(counts, 0, layout.Blocks())) {
-    return false;
+      !directory.AreAll(counts, 0, layout.Blocks()) || !directory.Fault().empty()) {
+    return fail();
   }
   layout.start = (bytes + kAlignment - 1) / kAlignment * kAlignment;
   const auto fits = [&](Tag tag, std::uint64_t most) {
     return directory.ValueBytes(tag) == 8 || most >> (8 * directory.ValueBytes(tag)) == 0;
   };
   if (!fits(offsets, layout.End()) || !fits(counts, layout.blockHeight * layout.RowBytes())) {
-    return false;
+    return Placing::kUnsuited;
   }
-  return file.SetSize(layout.End()) &&
-         directory.Set(offsets, [&](std::uint64_t block) { return layout.OffsetOf(block); }) &&
-         directory.Set(counts, [&](std::uint64_t block) {
-           return layout.LinesOf(block) * layout.RowBytes();
-         });
+  const bool isDone =
+      file.SetSize(layout.End(), &fault) &&
+      directory.Set(offsets, [&](std::uint64_t block) { return layout.OffsetOf(block); }) &&
+      directory.Set(counts,
+                    [&](std::uint64_t block) { return layout.LinesOf(block) * layout.RowBytes(); });
+  return isDone ? Placing::kDone : fail();
 }
 
 }  // namespace lumo::gdal

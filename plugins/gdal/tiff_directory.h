@@ -5,12 +5,19 @@
 
 namespace lumo::gdal {
 
+/// The outcome of PlaceBlocks.
+enum class Placing {
+  kDone,
+  kUnsuited,  ///< the file isn't of the layout, or has blocks already; it is as it was
+  kFailed,    ///< the file can't be read or written; nobody may go by its directory any more
+};
+
 /// Gives each block of a TIFF file its place, behind all that the file holds: the file is made long
-/// enough, and its directory told. The layout's `start` is set.
+/// enough, and its directory told. The layout's `start` is set. A file of another machine's byte
+/// order is unsuited.
 ///
-/// False, with the file as it was, where the file isn't of the layout, of another machine's byte
-/// order or has blocks already; false too when it can't be written.
 /// Source: TIFF 6.0, sections 2, 8 and 15; the BigTIFF extension for files beyond 4 GiB.
-bool PlaceBlocks(platform::RandomAccessFile& file, TiffLayout& layout);
+/// @param fault  [out] of one that failed: "path: what".
+Placing PlaceBlocks(platform::RandomAccessFile& file, TiffLayout& layout, std::string& fault);
 
 }  // namespace lumo::gdal

@@ -63,21 +63,29 @@ void CarryBands(const TiffLayout& layout, const BlockPlace& place, unsigned widt
 
 }  // namespace
 
-std::unique_ptr<TiffPixels> TiffPixels::Begin(const std::string& path, const RasterDef& def,
-                                              bool byPixel,
-                                              const std::vector<unsigned char>& fill) {
-  auto file = platform::RandomAccessFile::Open(path, platform::RandomAccessFile::Access::kUpdate);
-  if (file == nullptr) return nullptr;
+bool TiffPixels::Begin(const std::string& path, const RasterDef& def, bool byPixel,
+                       const std::vector<unsigned char>& fill,
+                       std::unique_ptr<TiffPixels>& pixels) {
+  pixels.reset();
+  std::string fault;
+  auto file =
+      platform::RandomAccessFile::Open(path, platform::RandomAccessFile::Access::kUpdate, &fault);
   TiffLayout layout;
   layout.samples = def.samples;
   layout.lines = def.lines;
   layout.bands = def.bands;
   layout.element = static_cast<unsigned>(fill.size());
   layout.byPixel = byPixel;
-  if (!PlaceBlocks(*file, layout)) return nullptr;
+  const Placing placing = file != nullptr ? PlaceBlocks(*file, layout, fault) : Placing::kFailed;
+  if (placing == Placing::kFailed) {
+    SetFault(fault);
+    return false;
+  }
+  if (placing == Placing::kUnsuited) return true;
   // Strips follow each other without a gap: as good as one.
   if (!layout.isTiled) layout.blockHeight = layout.lines;
-  return std::unique_ptr<TiffPixels>(new TiffPixels(std::move(file), layout, fill));
+  pixels.reset(new TiffPixels(std::move(file), layout, fill));
+  return true;
 }
 
 TiffPixels::TiffPixels(std::unique_ptr<platform::RandomAccessFile> file, const TiffLayout& layout,
@@ -217,14 +225,16 @@ void TiffPixels::NoteWritten(const Run& run) {
 }
 
 bool TiffPixels::Finish() {
-  if (fillRow_.empty()) return true;
-  for (std::uint64_t block = 0; block < layout_.Blocks(); ++block) {
+  for (std::uint64_t block = 0; !fillRow_.empty() && block < layout_.Blocks(); ++block) {
     Run run{};
     run.block = block;
     run.height = layout_.LinesOf(block);
     if (!FillRows(run)) return false;
   }
-  return true;
+  std::string why;
+  if (file_->Close(&why)) return true;
+  SetFault(why);
+  return false;
 }
 
 }  // namespace lumo::gdal

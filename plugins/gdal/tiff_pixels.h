@@ -55,17 +55,18 @@ struct TiffLayout {
 /// nobody writes are the fill value. Failure: false, with the fault told.
 class TiffPixels {
  public:
-  /// Null, with no fault, for a file that can't be filled like this.
+  /// False when the file can't be read or written.
   /// @param path  a closed TIFF file without any block.
   /// @param fill  bytes of one value.
-  static std::unique_ptr<TiffPixels> Begin(const std::string& path, const RasterDef& def,
-                                           bool byPixel, const std::vector<unsigned char>& fill);
+  /// @param pixels  [out] null for a file that can't be filled like this.
+  static bool Begin(const std::string& path, const RasterDef& def, bool byPixel,
+                    const std::vector<unsigned char>& fill, std::unique_ptr<TiffPixels>& pixels);
 
   /// Carries a block, inside the raster, in the interleave of the file.
   bool Write(const BlockPlace& place, const void* pixels);
   bool Read(const BlockPlace& place, void* pixels);
 
-  /// Fills what was not written.
+  /// Fills what was not written, and closes the file.
   bool Finish();
 
  private:

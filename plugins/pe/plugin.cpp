@@ -1,5 +1,7 @@
 #include <filesystem>
 
+#include "foundation/fault.h"
+#include "foundation/thrown.h"
 #include "georef/coordsys_log.h"
 #include "proj_context.h"
 #include "proj_coordsys.h"
@@ -18,6 +20,7 @@ CoordSysImpl* Create(const std::string& text) {
     lumo::LogCoordSys(lumo::CoordSysLog::kSystems, "fetched: %s", text.c_str());
     return new lumo::pe::ProjCoordSys(std::move(definition));
   } catch (...) {
+    lumo::LogCoordSys(lumo::CoordSysLog::kErrors, "%s", lumo::DescribeException().c_str());
     return nullptr;
   }
 }

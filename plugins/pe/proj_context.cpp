@@ -1,10 +1,13 @@
 #include "proj_context.h"
 
 #include <mutex>
+#include <new>
+#include <string_view>
 #include <unordered_map>
 #include <vector>
 
 #include "georef/coordsys_log.h"
+#include "platform/memory_shortage.h"
 
 namespace lumo::pe {
 namespace {
@@ -14,13 +17,19 @@ constexpr std::size_t kMostTransforms = 128;  // a thread keeps
 std::mutex gDirectoryMutex;
 std::string gDirectory;
 
+/// PROJ says in words alone that it was short of memory.
 void LogFromProj(void*, int, const char* text) {
+  const std::string_view words = text;
+  if (words.find("bad_alloc") != words.npos || words.find("out of memory") != words.npos) {
+    platform::NoteMemoryShortage();
+  }
   LogCoordSys(CoordSysLog::kErrors, "%s", text);
 }
 
 /// What a thread keeps. The transforms go before the context that they belong to.
 struct ThreadState {
   ThreadState() : context(proj_context_create()) {
+    if (context == nullptr) throw std::bad_alloc();
     proj_context_set_enable_network(context, 0);
     proj_context_use_proj4_init_rules(context, 1);
     proj_log_func(context, nullptr, LogFromProj);
@@ -64,7 +73,11 @@ PJ* CachedTransform(const std::string& key, const std::function<PjPtr(PJ_CONTEXT
   const auto at = state.transforms.find(key);
   if (at != state.transforms.end()) return at->second.get();
   if (state.transforms.size() >= kMostTransforms) state.transforms.clear();
-  return state.transforms.emplace(key, make(state.context)).first->second.get();
+  const platform::MemoryWatch memory;
+  PjPtr made = make(state.context);
+  // What memory was too short for is not what can't be made.
+  if (made == nullptr && memory.WasShort()) throw std::bad_alloc();
+  return state.transforms.emplace(key, std::move(made)).first->second.get();
 }
 
 }  // namespace lumo::pe

@@ -5,6 +5,8 @@
 #include <cstdio>
 #include <cstring>
 
+#include "foundation/fault.h"
+#include "foundation/thrown.h"
 #include "georef/coordsys_log.h"
 #include "proj_context.h"
 
@@ -39,6 +41,17 @@ void MarkFailed(const PointSpan& points) {
     if (std::isfinite(points.X(i)) && std::isfinite(points.Y(i))) continue;
     points.X(i) = HUGE_VAL;
     points.Y(i) = HUGE_VAL;
+  }
+}
+
+/// What `find` gives; null, with the shortage noted, where memory is too short to make it.
+template <typename Find>
+PJ* FindOrNull(Find&& find) {
+  try {
+    return find();
+  } catch (...) {
+    LogCoordSys(CoordSysLog::kErrors, "%s", DescribeException().c_str());
+    return nullptr;
   }
 }
 
@@ -89,8 +102,10 @@ std::string Key(char kind, std::uint64_t id) {
 
 /// From a system's geographic coordinates to its map coordinates; the other way is its inverse.
 PJ* Projection(const Definition& system) {
-  return CachedTransform(Key('p', system.id), [&system](PJ_CONTEXT* context) {
-    return MakeTransform(context, system.geodeticText, system.mapText, nullptr);
+  return FindOrNull([&system] {
+    return CachedTransform(Key('p', system.id), [&system](PJ_CONTEXT* context) {
+      return MakeTransform(context, system.geodeticText, system.mapText, nullptr);
+    });
   });
 }
 
@@ -189,7 +204,7 @@ void ProjCoordSys::GeoTransform(const String& target, Array<double>& points, Arr
     LogCoordSys(CoordSysLog::kTransformValues, "first in: %.12g %.12g", span.X(0), span.Y(0));
   }
   FromDegrees(*definition_, span);
-  Run(DatumTransform(*definition_, *to, area), PJ_FWD, span);
+  Run(FindOrNull([&] { return DatumTransform(*definition_, *to, area); }), PJ_FWD, span);
   ToDegrees(*to, span);
   if (span.count != 0) {
     LogCoordSys(CoordSysLog::kTransformValues, "first out: %.12g %.12g", span.X(0), span.Y(0));

@@ -7,6 +7,7 @@
 
 #include "foundation/fault.h"
 #include "platform/file_moves.h"
+#include "platform/folder_lock.h"
 #include "platform/temporary_file.h"
 #include "raster/pixel_types.h"
 #include "raster/raster_enums.h"
@@ -30,7 +31,7 @@ class Registry {
     const std::lock_guard lock(lock_);
     const auto at = builds_.find(path);
     const std::shared_ptr<Build> build = at != builds_.end() ? at->second.lock() : nullptr;
-    return build != nullptr && !build->IsCommitted() ? build : nullptr;
+    return build != nullptr && !build->IsOver() ? build : nullptr;
   }
 
   void Enter(const std::string& path, const std::shared_ptr<Build>& build) {
@@ -52,8 +53,10 @@ std::shared_ptr<Build> Build::Find(const std::string& path) {
   return Registry::Get().Find(path);
 }
 
-std::shared_ptr<Build> Build::Begin(const std::string& path, const Header& header) {
+std::shared_ptr<Build> Build::Begin(const std::string& path, const Header& header,
+                                    const void* beginner) {
   std::shared_ptr<Build> build(new Build(path, header));
+  build->beginner_ = beginner;
   const char* const impossible = FindFault(header);
   if (impossible != nullptr) {
     build->Fail(impossible);
@@ -73,13 +76,17 @@ std::shared_ptr<Build> Build::Begin(const std::string& path, const Header& heade
   return build;
 }
 
+Build::Build(const std::string& path, const Header& header)
+    : path_(path),
+      temporary_(platform::TemporaryPathBeside(path)),
+      older_(platform::IdentifyFile(path)),
+      header_(header) {}
+
 bool Build::Open() {
+  platform::RemoveAbandonedFiles(path_);
   std::string fault;
-  file_ = RandomAccessFile::Create(platform::TemporaryPathBeside(path_), &fault);
-  if (file_ == nullptr) {
-    SetFault(fault);
-    return false;
-  }
+  file_ = RandomAccessFile::Create(temporary_, &fault);
+  if (file_ == nullptr) return FailBy(fault);
   for (unsigned level = header_.levelMin; level <= header_.levelMax; ++level) {
     indices_[level].resize(header_.TileCount(level));
     missing_ += indices_[level].size();
@@ -88,12 +95,27 @@ bool Build::Open() {
 }
 
 Build::~Build() {
-  if (file_ != nullptr && !isCommitted_) std::remove(file_->Path().c_str());
+  if (!hasPlace_ && (file_ != nullptr || isComplete_)) std::remove(temporary_.c_str());
 }
 
 bool Build::Fail(const std::string& fault) const {
   SetFault(path_ + ": " + fault);
   return false;
+}
+
+/// Ends the build: tells a fault of the file, by the path that its user knows, now and later.
+bool Build::FailBy(const std::string& fault) {
+  isOver_ = true;
+  fault_ = fault.starts_with(temporary_) ? path_ + fault.substr(temporary_.size()) : fault;
+  SetFault(fault_);
+  return false;
+}
+
+bool Build::HasFailed() const {
+  if (!isOver_ || hasPlace_) return false;
+  const std::lock_guard lock(lock_);
+  if (!fault_.empty()) SetFault(fault_);
+  return true;
 }
 
 std::uint64_t Build::TileValues(const TilePlace& place) const {
@@ -142,12 +164,13 @@ void Build::Pack(const TileRow& tiles, unsigned index, Packed& packed) const {
                               : Checksum(first.data, first.bytes, last.data, last.bytes);
 }
 
-bool Build::Write(const TileRow& tiles) {
+bool Build::Write(const TileRow& tiles, const void* writer) {
   const std::lock_guard lock(lock_);
-  if (isCommitted_) return Fail("the pyramid is whole: it isn't written any more");
+  writers_.insert(writer);
+  if (isComplete_ || isOver_) return Fail("the pyramid is whole: it isn't written any more");
   const TilePlace& first = tiles.first;
   std::vector<Packed> packed(tiles.columns);
-  lumo::detail::ForEachPart(tiles.columns, [&](unsigned i) { Pack(tiles, i, packed[i]); });
+  ParallelFor(tiles.columns, nullptr, [&](unsigned i) { Pack(tiles, i, packed[i]); });
 
   std::vector<platform::ConstFilePiece> pieces;
   std::uint64_t end = end_;
@@ -159,10 +182,7 @@ bool Build::Write(const TileRow& tiles) {
     }
   }
   std::string fault;
-  if (!file_->Write(end_, pieces, &fault)) {
-    SetFault(fault);
-    return false;
-  }
+  if (!file_->Write(end_, pieces, &fault)) return FailBy(fault);
   end_ = end;
   for (unsigned i = 0; i < tiles.columns; ++i) {
     TileEntry& entry = indices_[first.level][header_.TileNumber(first.level, first.column + i,
@@ -177,9 +197,27 @@ bool Build::IsWhole() const {
   return missing_ == 0;
 }
 
-bool Build::Commit(const std::string& values) {
+void Build::Leave(const void* self) {
   const std::lock_guard lock(lock_);
-  if (isCommitted_) return true;
+  if (self == beginner_) beginner_ = nullptr;
+  if (writers_.erase(self) != 0) pastWriters_.insert(self);
+}
+
+bool Build::MayTakePlace(const void* self) const {
+  const std::lock_guard lock(lock_);
+  return (beginner_ == nullptr || beginner_ == self) &&
+         std::ranges::all_of(writers_, [&](const void* writer) { return writer == self; });
+}
+
+bool Build::IsOfAnother(const void* self) const {
+  const std::lock_guard lock(lock_);
+  const auto isOther = [&](const void* writer) { return writer != self; };
+  return std::ranges::any_of(writers_, isOther) || std::ranges::any_of(pastWriters_, isOther);
+}
+
+bool Build::Complete(const std::string& values) {
+  const std::lock_guard lock(lock_);
+  if (isComplete_) return true;
   if (!IsWhole()) return Fail("the levels are not whole yet");
   Header header = header_;
   header.sequence = 0;
@@ -199,15 +237,27 @@ bool Build::Commit(const std::string& values) {
   header.fileBytes = end_;
   const StoredHeader stored = Store(header);
   isWritten = isWritten && file_->Write(kHeaderPlaces[0], &stored, sizeof stored, &fault) &&
-              platform::RenameFile(file_->Path(), path_, &fault);
-  if (!isWritten) {
-    SetFault(fault);
-    return false;
-  }
-  isCommitted_ = true;
+              file_->Close(&fault);
+  if (!isWritten) return FailBy(fault);
+  isComplete_ = true;
   file_.reset();
   for (std::vector<TileEntry>& index : indices_) index = {};
   return true;
+}
+
+bool Build::TakePlace() {
+  const std::lock_guard guard(lock_);
+  isOver_ = true;
+  std::string fault;
+  const platform::FolderLock lock(path_);
+  if (!lock.IsHeld(&fault)) return FailBy(fault);
+  const platform::FileIdentity now = platform::IdentifyFile(path_);
+  if (now.exists && !now.IsSameFile(older_)) {
+    return FailBy(path_ + ": another program has built it meanwhile");
+  }
+  hasPlace_ = now.exists ? platform::RenameFile(temporary_, path_, &fault)
+                         : platform::RenameToNew(temporary_, path_, &fault);
+  return hasPlace_ || FailBy(fault);
 }
 
 }  // namespace lumo::pyramid

@@ -1,17 +1,21 @@
 #pragma once
 
 #include <atomic>
+#include <set>
 
+#include "platform/file_identity.h"
 #include "pyramid_file.h"
 
 namespace lumo::pyramid {
 
-/// A pyramid file in the making. It lies beside its place under a temporary name, and takes the
-/// place once every tile of every level is written: until then the file that stands there stays as
-/// it is. One that is let go before takes its temporary file away.
+/// A pyramid file in the making. It lies beside its place under a temporary name, and is whole once
+/// every tile of every level is written and Complete was called. Then it can be read and given
+/// values there, until it takes its place: up to that moment the file that stands there stays as it
+/// is. One that is let go before takes its temporary file away.
 ///
 /// Connections of this process that belong to one path meet at one build: that which has begun it,
-/// and that which writes the pixels.
+/// and that which writes the pixels. Of the builds of several processes the first one to be whole
+/// takes the place.
 /// Threads: any.
 /// Failure: false or null, with SetFault.
 class Build {
@@ -19,7 +23,9 @@ class Build {
   /// Begins a build, in place of an older one that is not being written to.
   /// @param path    absolute, with links resolved.
   /// @param header  the raster and the levels wanted.
-  static std::shared_ptr<Build> Begin(const std::string& path, const Header& header);
+  /// @param beginner  tells it from others, until it has left.
+  static std::shared_ptr<Build> Begin(const std::string& path, const Header& header,
+                                      const void* beginner);
   /// The build of a path that is under way; null when there is none.
   static std::shared_ptr<Build> Find(const std::string& path);
 
@@ -37,32 +43,66 @@ class Build {
     const unsigned char* states;
   };
   /// Packs and writes tiles. Of states, those stay that tell more than that there is no data.
-  bool Write(const TileRow& tiles);
+  /// @param writer  tells the writers apart, until each has left.
+  bool Write(const TileRow& tiles, const void* writer);
+  void Leave(const void* self);
+  /// True for the one that may give the file its place: that which has begun it, or after that has
+  /// left anyone, once nobody else writes.
+  bool MayTakePlace(const void* self) const;
+  /// True when somebody else has written.
+  bool IsOfAnother(const void* self) const;
 
   /// True when every tile is written.
   bool IsWhole() const;
-  /// Gives the file its place, when it is whole; true as well when it has that already.
+  /// Makes a file of what is written, when that is whole; true as well when it is one already.
   /// @param values  text of the values of bands.
-  bool Commit(const std::string& values);
-  bool IsCommitted() const { return isCommitted_; }
+  bool Complete(const std::string& values);
+  bool IsComplete() const { return isComplete_; }
+  /// Where the file lies until it takes its place.
+  const std::string& TemporaryPath() const { return temporary_; }
+
+  /// Notes that values were stored in the file, or could not be.
+  void NoteValues(bool areStored) { values_ = areStored ? values_ + 1 : kLost; }
+  /// True when values were stored in the file, and none failed to be.
+  bool HasValues() const { return values_ > 0; }
+
+  /// Gives a complete file its place, unless another was put there since the build began.
+  bool TakePlace();
+  /// Nothing happens to it any more.
+  bool IsOver() const { return isOver_; }
+  /// True when it has ended without its place; tells the fault.
+  bool HasFailed() const;
+  void GiveUp() { isOver_ = true; }
 
  private:
   struct Packed;
 
-  Build(const std::string& path, const Header& header) : path_(path), header_(header) {}
+  static constexpr int kLost = -1000;
+
+  Build(const std::string& path, const Header& header);
   bool Open();
   bool Fail(const std::string& fault) const;
+  bool FailBy(const std::string& fault);
   void Pack(const TileRow& tiles, unsigned index, Packed& packed) const;
   std::uint64_t TileValues(const TilePlace& place) const;
 
   const std::string path_;
+  const std::string temporary_;
+  const platform::FileIdentity older_;  // that stands at the place
   Header header_;
-  std::mutex lock_;  // of what follows
+  mutable std::mutex lock_;  // of what follows
+  const void* beginner_ = nullptr;
+  std::set<const void*> writers_;
+  std::set<const void*> pastWriters_;
+  std::string fault_;
   std::unique_ptr<platform::RandomAccessFile> file_;
   std::array<std::vector<TileEntry>, kLevelCount> indices_;
   std::uint64_t end_ = kDataBegin;
   std::atomic<std::uint64_t> missing_{0};  // tiles
-  std::atomic<bool> isCommitted_{false};
+  std::atomic<bool> isComplete_{false};
+  std::atomic<bool> isOver_{false};
+  std::atomic<bool> hasPlace_{false};
+  std::atomic<int> values_{0};  // how often they were stored
 };
 
 }  // namespace lumo::pyramid

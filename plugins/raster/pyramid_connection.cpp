@@ -115,7 +115,7 @@ bool Connection::MakeReader() {
 
 void Connection::Disconnect() {
   PlainRasterConnection::Disconnect();
-  build_.reset();
+  LeaveBuild();
   file_.reset();
   cache_.Clear();
   def_.Clear();
@@ -123,8 +123,11 @@ void Connection::Disconnect() {
 
 /// Opens what stands on the disk, in place of what was open.
 bool Connection::OpenFile() {
-  std::unique_ptr<PyramidFile> file = PyramidFile::Open(path_);
-  if (file == nullptr) return false;
+  std::unique_ptr<PyramidFile> file = PyramidFile::Open(PathShown());
+  if (file == nullptr) {
+    ShowFault();
+    return false;
+  }
   if (!IsOf(file->GetHeader(), def_)) return Fail("has become the pyramid of another raster");
   file_ = std::move(file);
   cache_.Clear();
@@ -132,31 +135,67 @@ bool Connection::OpenFile() {
   return true;
 }
 
-bool Connection::BeginBuild(const Header& wanted) {
+void Connection::LeaveBuild() {
+  if (build_ != nullptr) build_->Leave(this);
   build_.reset();
+}
+
+const std::string& Connection::PathShown() const {
+  return IsPending() ? build_->TemporaryPath() : path_;
+}
+
+bool Connection::BeginBuild(const Header& wanted) {
+  LeaveBuild();
   Header header = wanted;
   header.samples = def_.samples;
   header.lines = def_.lines;
   header.bands = def_.bands;
   header.dataType = def_.dataType;
   header.compression = compression_;
-  build_ = Build::Begin(path_, header);
+  build_ = Build::Begin(path_, header, this);
   return build_ != nullptr;
 }
 
-bool Connection::Refresh(const std::string& values) {
-  if (build_ != nullptr && build_->IsWhole() && !build_->Commit(values)) return false;
-  if (build_ != nullptr && (build_->IsCommitted() || build_.use_count() == 1)) build_.reset();
-  if (file_ != nullptr && file_->IsCurrent()) return true;
+bool Connection::Refresh(const std::string& values, bool getsStats) {
+  const bool isWhole = build_ != nullptr && !build_->IsOver() && build_->IsWhole();
+  if (isWhole) build_->Complete(values);
+  if (build_ != nullptr && build_->HasFailed()) {
+    LeaveBuild();
+    return false;
+  }
+  if (isWhole && build_->MayTakePlace(this)) {
+    const bool isMissing = getsStats && build_->IsOfAnother(this) && !build_->HasValues();
+    const bool hasPlace = !isMissing && build_->TakePlace();
+    if (isMissing) build_->GiveUp();
+    LeaveBuild();
+    if (!isMissing && !hasPlace) return false;
+  }
+  if (build_ != nullptr && (build_->IsOver() || build_.use_count() == 1)) LeaveBuild();
+  if (file_ != nullptr && file_->IsCurrent() && file_->Path() == PathShown()) return true;
   std::error_code ignored;
-  if (std::filesystem::exists(path_, ignored)) return OpenFile();
+  if (std::filesystem::exists(PathShown(), ignored)) return OpenFile();
   file_.reset();
   cache_.Clear();
   return Fail("there is no pyramid");
 }
 
+bool Connection::ChangeValues(const std::function<bool(const std::string&, std::string&)>& change) {
+  const std::shared_ptr<Build> pending = IsPending() ? build_ : nullptr;
+  const bool isStored = pyramid::ChangeValues(PathShown(), change);
+  if (pending != nullptr) pending->NoteValues(isStored);
+  if (!isStored) ShowFault();
+  return isStored;
+}
+
+/// Tells the fault of this thread by the path that the user knows.
+void Connection::ShowFault() const {
+  const std::string fault = TakeFault().ToUTF8();
+  const std::string& shown = PathShown();
+  SetFault(fault.starts_with(shown) ? path_ + fault.substr(shown.size()) : fault);
+}
+
 bool Connection::Delete() {
-  build_.reset();
+  LeaveBuild();
   file_.reset();
   cache_.Clear();
   if (!IsPyramidFile(path_)) return Fail("there is no pyramid");

@@ -30,18 +30,27 @@ class Connection final : public PlainRasterConnection {
   Build* GetBuild() const { return build_.get(); }
 
   bool BeginBuild(const Header& wanted);
-  /// Takes a build that is whole to its place, and opens what stands there then. A build that is
-  /// not whole ends, unless another connection writes to it.
-  /// @param values  for a build that is taken to its place.
+  /// Completes a build that is whole, and shows it. It takes its place unless another connection
+  /// has written it and is still open; where it lies until then it may get its statistics, without
+  /// which it goes. A build that is not whole ends, unless another connection writes to it.
+  /// @param values  for a build that is completed.
+  /// @param getsStats  statistics are made of such pixels.
   /// @return whether there is a file.
-  bool Refresh(const std::string& values);
+  bool Refresh(const std::string& values, bool getsStats);
+  /// Where the file lies that is shown.
+  const std::string& PathShown() const;
+  /// Lets `change` change the values of the file that is shown.
+  bool ChangeValues(const std::function<bool(const std::string&, std::string&)>& change);
   bool Delete();
 
   bool Fail(const std::string& fault) const;
 
  private:
+  void ShowFault() const;
   bool Begin(const Array<String>& connStrings);
   bool OpenFile();
+  bool IsPending() const { return build_ != nullptr && build_->IsComplete() && !build_->IsOver(); }
+  void LeaveBuild();
   bool MakeReader();
 
   std::string path_;

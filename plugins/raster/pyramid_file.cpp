@@ -1,6 +1,8 @@
 #include "pyramid_file.h"
 
 #include "foundation/fault.h"
+#include "foundation/file_faults.h"
+#include "platform/folder_lock.h"
 #include "raster/pixel_types.h"
 
 namespace lumo::pyramid {
@@ -146,9 +148,12 @@ bool WriteValues(RandomAccessFile& file, const Header& before, const std::string
 bool ChangeValues(
     const std::string& path,
     const std::function<bool(const std::string& before, std::string& after)>& change) {
-  static std::mutex lock;  // one at a time in this process
-  const std::lock_guard guard(lock);
   std::string fault;
+  const platform::FolderLock lock(path);
+  if (!lock.IsHeld(&fault)) {
+    SetFault(fault);
+    return false;
+  }
   const auto file = RandomAccessFile::Open(path, RandomAccessFile::Access::kUpdate, &fault);
   Header header;
   if (file == nullptr || !ReadHeader(*file, header, fault)) {
@@ -162,7 +167,10 @@ bool ChangeValues(
   }
   if (Checksum(before.data(), before.size()) != header.values.checksum) before.clear();
   if (!change(before, after)) return false;
-  if (after == before || WriteValues(*file, header, after, fault)) return true;
+  std::uint64_t bytes = 0;
+  if (after == before) return true;
+  if (file->GetSize(bytes, &fault) && WriteValues(*file, header, after, fault)) return true;
+  if (bytes != 0) file->SetSize(bytes);  // what stands there has not changed
   SetFault(fault);
   return false;
 }
@@ -170,7 +178,12 @@ bool ChangeValues(
 bool IsPyramidFile(const std::string& path) {
   const auto file = RandomAccessFile::Open(path, RandomAccessFile::Access::kRead);
   StoredHeader stored{};
-  return file != nullptr && file->Read(0, stored.magic, sizeof stored.magic) && HasMagic(stored);
+  std::size_t bytes = 0;
+  if (file == nullptr || !file->ReadUpTo(0, stored.magic, sizeof stored.magic, bytes)) {
+    FileFaults::NoteUnread(path);
+    return false;
+  }
+  return bytes == sizeof stored.magic && HasMagic(stored);
 }
 
 }  // namespace lumo::pyramid

@@ -42,6 +42,8 @@ class PyramidFile {
   /// Text of the values of bands.
   const std::string& Values() const { return values_; }
 
+  const std::string& Path() const { return file_->Path(); }
+
   /// False when another file has taken the place of this one, or other values were stored in it.
   bool IsCurrent() const;
 

@@ -77,20 +77,10 @@ class Reader final : public PlainRasterReader<T> {
 
   Connection& pyramid_;
   Values<T> values_;
-  bool isInherited_ = false;  // the no-data values are those of the raster
+  bool isInherited_ = false;    // the no-data values are those of the raster
+  std::string inheritedState_;  // of the file of the raster
 };
 
-extern template class Reader<std::uint8_t>;
-extern template class Reader<std::int8_t>;
-extern template class Reader<std::uint16_t>;
-extern template class Reader<std::int16_t>;
-extern template class Reader<std::uint32_t>;
-extern template class Reader<std::int32_t>;
-extern template class Reader<float>;
-extern template class Reader<double>;
-extern template class Reader<std::uint64_t>;
-extern template class Reader<std::int64_t>;
-extern template class Reader<Complex<float>>;
-extern template class Reader<Complex<double>>;
+VEXG_EXTERN_HIDDEN(TWELVE, Reader);
 
 }  // namespace lumo::pyramid

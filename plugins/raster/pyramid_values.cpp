@@ -11,6 +11,7 @@ constexpr const char* kNoData = "nodata";
 constexpr const char* kStats = "statistics";
 constexpr const char* kHistogram = "histogram";
 constexpr const char* kGeoRef = "georeference";
+constexpr const char* kFile = "file";
 
 template <typename T>
 bool ReadValue(std::istream& in, T& value) {
@@ -36,6 +37,13 @@ bool ReadLine(const std::string& word, std::istream& in, unsigned bands, Values<
   if (word == kGeoRef) {
     in >> values.geoRef;
     return bool(values.geoRef);
+  }
+  if (word == kFile) {
+    std::uint64_t bytes = 0;
+    std::int64_t time = 0;
+    if (!ReadNumber(in, bytes) || !ReadNumber(in, time)) return false;
+    values.fileState = std::to_string(bytes) + " " + std::to_string(time);
+    return true;
   }
   if (word == kNoData) {
     unsigned band = 0;
@@ -81,6 +89,7 @@ bool Values<T>::Read(const std::string& text, unsigned bands) {
 template <typename T>
 std::string Values<T>::Write() const {
   std::ostringstream out = MakeTextWriter();
+  if (!fileState.empty()) out << kFile << ' ' << fileState << '\n';
   if (geoRef) out << kGeoRef << ' ' << geoRef << '\n';
   for (const auto& [band, value] : noData) {
     out << kNoData << ' ' << band << ' ';
@@ -98,17 +107,7 @@ std::string Values<T>::Write() const {
   return std::move(out).str();
 }
 
-template struct Values<std::uint8_t>;
-template struct Values<std::int8_t>;
-template struct Values<std::uint16_t>;
-template struct Values<std::int16_t>;
-template struct Values<std::uint32_t>;
-template struct Values<std::int32_t>;
-template struct Values<float>;
-template struct Values<double>;
-template struct Values<std::uint64_t>;
-template struct Values<std::int64_t>;
-template struct Values<Complex<float>>;
-template struct Values<Complex<double>>;
+#define VALUES(T) template struct Values<T>;
+VEXG_FOR(TWELVE, VALUES);
 
 }  // namespace lumo::pyramid

@@ -21,7 +21,8 @@ struct Values {
   std::map<unsigned, T> noData;
   std::map<unsigned, RasterBandStats<T>> stats;  ///< by band; none for complex T
   std::vector<RasterBandHistogram<T>> histograms;
-  GeoRefPtr geoRef;  ///< of the raster; may be empty
+  GeoRefPtr geoRef;       ///< of the raster; may be empty
+  std::string fileState;  ///< of the raster when the levels were built; may be empty
 };
 
 }  // namespace lumo::pyramid

@@ -5,9 +5,9 @@
 
 namespace lumo {
 
-/// Computes a raster from another one by a formula, tile by tile: RasterReadTask, a task that runs
-/// the formula over the lines of a tile in parallel, RasterWriteTask. Pixels that are not valid are
-/// not computed; they get the target's no-data value, or 0 where it has none, and keep their state.
+/// Computes a raster from another one by a formula, tile by tile (see MapTiles). Pixels that are
+/// not valid are not computed; they get the target's no-data value, or 0 where it has none, and
+/// keep their state.
 ///
 /// Exists for all pairs of EightTypes.
 /// @param name     of the process.

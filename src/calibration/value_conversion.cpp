@@ -5,6 +5,7 @@
 #include <type_traits>
 
 #include "platform/vector_clones.h"
+#include "raster/pixel_types.h"
 
 namespace lumo {
 namespace {
@@ -67,21 +68,9 @@ void FromDoubles(const double* from, T* to, std::size_t count) {
   }
 }
 
-template void ToDoubles(const std::uint8_t*, double*, std::size_t);
-template void ToDoubles(const std::int8_t*, double*, std::size_t);
-template void ToDoubles(const std::uint16_t*, double*, std::size_t);
-template void ToDoubles(const std::int16_t*, double*, std::size_t);
-template void ToDoubles(const std::uint32_t*, double*, std::size_t);
-template void ToDoubles(const std::int32_t*, double*, std::size_t);
-template void ToDoubles(const float*, double*, std::size_t);
-template void ToDoubles(const double*, double*, std::size_t);
-template void FromDoubles(const double*, std::uint8_t*, std::size_t);
-template void FromDoubles(const double*, std::int8_t*, std::size_t);
-template void FromDoubles(const double*, std::uint16_t*, std::size_t);
-template void FromDoubles(const double*, std::int16_t*, std::size_t);
-template void FromDoubles(const double*, std::uint32_t*, std::size_t);
-template void FromDoubles(const double*, std::int32_t*, std::size_t);
-template void FromDoubles(const double*, float*, std::size_t);
-template void FromDoubles(const double*, double*, std::size_t);
+#define CONVERSIONS(T)                                     \
+  template void ToDoubles(const T*, double*, std::size_t); \
+  template void FromDoubles(const double*, T*, std::size_t);
+VEXG_FOR(EIGHT, CONVERSIONS);
 
 }  // namespace lumo

@@ -1,11 +1,11 @@
 #include "commands/command.h"
 
-#include <exception>
-
 #include "commands/catalog.h"
 #include "foundation/fault.h"
 #include "foundation/library.h"
+#include "foundation/thrown.h"
 #include "platform/clock.h"
+#include "platform/memory_shortage.h"
 
 namespace lumo {
 namespace {
@@ -53,13 +53,18 @@ ParameterMap& Command::Run(const ParameterMap& inputs, const IPC& ipc) {
 }
 
 CommandResult Command::ExecuteGuarded() {
+  const platform::MemoryWatch memory;
+  CommandResult result = CommandResult::kFailed;
   try {
-    return Execute();
-  } catch (const std::exception& error) {
-    return Fail(error.what());
+    result = Execute();
   } catch (...) {
-    return Fail("an unknown exception");
+    result = Fail(DescribeException());
   }
+  if (!memory.WasShort() || result == CommandResult::kAborted) return result;
+  // Whatever a library made of it: what was computed without the memory is not to be believed.
+  reason_ = String();
+  results_.Clear();
+  return Fail(platform::kOutOfMemory);
 }
 
 void Command::GetReturns(Map<String, String>& returns) {

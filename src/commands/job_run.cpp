@@ -7,6 +7,7 @@
 #include "commands/catalog_session.h"
 #include "commands/variable_text.h"
 #include "foundation/near_name.h"
+#include "platform/memory_shortage.h"
 
 namespace lumo {
 namespace {
@@ -31,7 +32,7 @@ void NameLiterals(Job& job, JobVariables& variables) {
 /// Ends a command as failed that memory was too short for; never throws.
 void GiveUp(CommandDescriptor& descriptor) {
   try {
-    descriptor.command->FailUnstarted("memory is short");
+    descriptor.command->FailUnstarted(platform::kOutOfMemory);
   } catch (...) {
     // It retires without a result.
   }
@@ -87,7 +88,7 @@ class JobExecutorThread : public SimpleThread {
 void StartCommandThread(const std::shared_ptr<JobRun>& run, CommandDescriptor* descriptor) {
   try {
     if (StartThread(SimpleThreadPtr(new JobExecutorThread(run, descriptor)))) return;
-    descriptor->command->FailUnstarted("the system gives no thread for the command");
+    descriptor->command->FailUnstarted(platform::kOutOfMemory);  // which a thread takes
   } catch (...) {
     GiveUp(*descriptor);
   }

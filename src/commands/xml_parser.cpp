@@ -1,4 +1,5 @@
 #include <cstring>
+#include <new>
 #include <string>
 
 #include <xercesc/framework/MemBufInputSource.hpp>
@@ -6,10 +7,14 @@
 #include <xercesc/sax/AttributeList.hpp>
 #include <xercesc/sax/HandlerBase.hpp>
 #include <xercesc/sax/SAXParseException.hpp>
+#include <xercesc/util/OutOfMemoryException.hpp>
 #include <xercesc/util/SecurityManager.hpp>
 
 #include "commands/xml.h"
 #include "commands/xml_runtime.h"
+#include "foundation/fault.h"
+#include "foundation/thrown.h"
+#include "platform/memory_shortage.h"
 
 namespace lumo {
 namespace {
@@ -96,7 +101,7 @@ void XMLSimpleParser::Parse(const String& document) {
   if (length > kMaxXMLBytes) return SetFault("the document is too large");
 
   const XMLRuntime runtime;
-  if (!runtime.IsReady()) return SetFault("the library is being unloaded");
+  if (!runtime.IsReady()) return SetFault("the XML parser is not ready");
   XercesXMLHandler handler(*this);
   try {
     IsolatedParser parser(handler);
@@ -107,6 +112,11 @@ void XMLSimpleParser::Parse(const String& document) {
     if (parser.getErrorCount() != 0) SetFault("the document is not well formed");
   } catch (const RefusedDocument& refused) {
     SetFault(refused.why);
+  } catch (const xercesc::OutOfMemoryException&) {
+    platform::NoteMemoryShortage();
+    SetFault(platform::kOutOfMemory);
+  } catch (const std::bad_alloc&) {
+    SetFault(DescribeException().c_str());
   } catch (...) {
     SetFault(handler.GetFault().GetLength() != 0 ? handler.GetFault()
                                                  : String("the document can't be parsed"));

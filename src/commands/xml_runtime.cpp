@@ -1,8 +1,14 @@
 #include "commands/xml_runtime.h"
 
 #include <mutex>
+#include <new>
+#include <utility>
 
+#include <xercesc/util/PanicHandler.hpp>
 #include <xercesc/util/PlatformUtils.hpp>
+#include <xercesc/util/XMLUni.hpp>
+
+#include "platform/memory_shortage.h"
 
 namespace lumo {
 namespace {
@@ -15,16 +21,27 @@ std::shared_mutex& Mutex() {
 
 bool gReady = false;
 
+/// Lets the library's loading go on without its parser, where the default would end the process.
+class LeavingPanicHandler final : public xercesc::PanicHandler {
+ public:
+  void panic(const PanicReasons) override { throw std::bad_alloc(); }
+};
+
 struct LoadTime {
   LoadTime() {
+    static LeavingPanicHandler handler;
     const std::unique_lock lock(Mutex());
-    xercesc::XMLPlatformUtils::Initialize();
-    gReady = true;
+    try {
+      xercesc::XMLPlatformUtils::Initialize(xercesc::XMLUni::fgXercescDefaultLocale, nullptr,
+                                            &handler);
+      gReady = true;
+    } catch (...) {
+      platform::NoteMemoryShortage();  // no document can be parsed then
+    }
   }
   ~LoadTime() {
     const std::unique_lock lock(Mutex());
-    gReady = false;
-    xercesc::XMLPlatformUtils::Terminate();
+    if (std::exchange(gReady, false)) xercesc::XMLPlatformUtils::Terminate();
   }
 };
 

@@ -1,11 +1,11 @@
 #include "data/dc_srv.h"
 
-#include <exception>
-
 #include "data/data_manager.h"
 #include "foundation/abandonment.h"
 #include "foundation/errors.h"
 #include "foundation/fault.h"
+#include "foundation/thrown.h"
+#include "foundation/warnings.h"
 
 namespace lumo {
 namespace {
@@ -51,6 +51,7 @@ void DcSrv::Execute(DcSrvCmd& cmd) {
     cmd.replied_.wait(lock, [&] { return cmd.done_; });
   }
   if (cmd.fault_.GetLength() != 0) SetFault(cmd.fault_);
+  for (const std::string& warning : cmd.warnings_) AddWarning(warning);
 }
 
 void DcSrv::Serve(MTQueue<DcSrvCmd*>& queue) {
@@ -69,15 +70,15 @@ void DcSrv::Serve(MTQueue<DcSrvCmd*>& queue) {
 
 void DcSrv::Run(DcSrvCmd& cmd, DcSrvContext& context) {
   TakeFault();
+  TakeWarnings();
   const AbandonScope abandonment(cmd.abandons_);
   try {
     cmd.Execute(context);
-  } catch (const std::exception& thrown) {
-    SetFault(std::string(cmd.name_) + ": " + thrown.what());
   } catch (...) {
-    SetFault(std::string(cmd.name_) + ": gave up without a reason");
+    SetFault(std::string(cmd.name_) + ": " + DescribeException());
   }
   cmd.fault_ = TakeFault();
+  cmd.warnings_ = TakeWarnings();
 }
 
 void DcSrv::Reply(DcSrvCmd& cmd) {

@@ -2,6 +2,8 @@
 
 #include <condition_variable>
 #include <mutex>
+#include <string>
+#include <vector>
 
 #include "data/data_connection.h"
 #include "foundation/thread.h"
@@ -38,6 +40,7 @@ class VEXG_EXPORT DcSrvCmd {
   bool done_ = false;      // the reply
   bool abandons_ = false;  // as the thread that it works for
   String fault_;           // what the thread told while it ran this
+  std::vector<std::string> warnings_;
 };
 
 /// The thread of one open source, and the queue by which calls reach it. All calls into a plug-in's
@@ -56,7 +59,7 @@ class VEXG_EXPORT DcSrv : public ErrorState {
   bool Stop();
 
   /// Runs `cmd` on the thread and waits for it. An exception out of the plug-in ends there. The
-  /// fault text of the call becomes this thread's. Start must have succeeded.
+  /// fault text and the warnings of the call become this thread's. Start must have succeeded.
   void Execute(DcSrvCmd& cmd);
 
  private:

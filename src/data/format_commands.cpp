@@ -3,6 +3,7 @@
 #include "commands/command.h"
 #include "data/data_connection.h"
 #include "foundation/fault.h"
+#include "foundation/thrown.h"
 
 namespace lumo {
 namespace {
@@ -13,7 +14,7 @@ bool IsAvailable(DataConnectionFactory& factory) {
     if (factory.IsAvailable()) return true;
     SetFault("the format can't be used on this machine");
   } catch (...) {
-    SetFault("the plug-in failed when it was asked");
+    SetFault("the plug-in failed when it was asked: " + DescribeException());
   }
   return false;
 }

@@ -11,6 +11,7 @@
 #include "foundation/environment.h"
 #include "foundation/fault.h"
 #include "foundation/near_name.h"
+#include "foundation/thrown.h"
 #include "platform/module.h"
 
 namespace lumo {
@@ -46,10 +47,8 @@ DataConnectionFactory* AskForFactory(const platform::Module& module, FormatRecor
     DataConnectionFactory* const factory = create(&record);
     if (factory == nullptr) SetFault(library + ": doesn't serve " + record.name.ToUTF8());
     return factory;
-  } catch (const std::exception& thrown) {
-    SetFault(library + ": " + thrown.what());
   } catch (...) {
-    SetFault(library + ": gave up without a reason");
+    SetFault(library + ": " + DescribeException());
   }
   return nullptr;
 }

@@ -3,6 +3,7 @@
 #include "data/access_policy.h"
 #include "data/data_manager.h"
 #include "foundation/fault.h"
+#include "foundation/thrown.h"
 
 // What this floor does for Metadata::Open.
 
@@ -24,7 +25,7 @@ bool ReadConnection(const Array<String>& connStrings, const String& mdfPath,
   try {
     read = connection->GetMetadata(mdfPath, store);
   } catch (...) {
-    SetFault("the plug-in failed when it was asked for its metadata");
+    SetFault("the plug-in failed when it was asked for its metadata: " + DescribeException());
   }
   manager.ReleaseConnection(connection);
   return read;

@@ -3,8 +3,8 @@
 #include "data/access_policy.h"
 #include "data/data_manager.h"
 #include "data/dc_srv_call.h"
-#include "data/mt_raster_reader_impl.h"
-#include "data/mt_vector_reader_impl.h"
+#include "data/mt_raster_reader_body.h"
+#include "data/mt_vector_reader_body.h"
 
 namespace lumo {
 namespace {

@@ -1,4 +1,3 @@
-#include <exception>
 #include <filesystem>
 #include <vector>
 
@@ -6,6 +5,9 @@
 #include "data/data_manager.h"
 #include "data/mt_connection.h"
 #include "foundation/fault.h"
+#include "foundation/file_faults.h"
+#include "foundation/thrown.h"
+#include "platform/memory_shortage.h"
 
 namespace lumo {
 namespace {
@@ -15,10 +17,8 @@ template <typename Call>
 auto Guarded(Call&& call) -> decltype(call()) {
   try {
     return call();
-  } catch (const std::exception& thrown) {
-    SetFault(std::string("the plug-in failed: ") + thrown.what());
   } catch (...) {
-    SetFault("the plug-in failed without a reason");
+    SetFault("the plug-in failed: " + DescribeException());
   }
   return {};
 }
@@ -28,16 +28,33 @@ DataConnectionPtr TryConnect(DataConnectionFactory& factory, const Array<String>
   return Guarded([&] { return factory.Connect(connStrings, geoRef, metadata); });
 }
 
+std::string Describe(const FileFault& fault) {
+  return fault.path + ": " + fault.Text();
+}
+
 /// The factories that recognise the source, in the order of the table.
-std::vector<DataConnectionFactory*> FindWilling(const Array<String>& connStrings) {
+/// @param unread  [out] why a file could not be read that had to be, to recognise the source. Where
+///                that is the source's own file, the formats that follow are not asked: what they
+///                make of it is nothing to go by.
+std::vector<DataConnectionFactory*> FindWilling(const Array<String>& connStrings, String& unread) {
   std::vector<DataConnectionFactory*> willing;
+  std::error_code fault;
+  const std::string own = connStrings.GetCount() != 0
+                              ? std::filesystem::absolute(connStrings[0].ToUTF8(), fault).string()
+                              : std::string();
+  const FileFaults faults;
   for (std::uint32_t row = 0; row < kFormatCount; ++row) {
     if (!MayUseFormat(gCdfFormatRecords[row])) continue;
     LoadFormat(row);
     DataConnectionFactory* const factory = GetFactory(gCdfFormatRecords[row]);
     if (factory == nullptr) continue;
     if (Guarded([&] { return factory->CanConnect(connStrings); })) willing.push_back(factory);
+    if (const FileFault* const found = faults.FirstOf(own)) {
+      unread = Describe(*found);
+      return {};
+    }
   }
+  if (faults.First() != nullptr) unread = Describe(*faults.First());
   return willing;
 }
 
@@ -48,7 +65,7 @@ String DescribeUnrecognised(const Array<String>& connStrings) {
   std::error_code fault;
   const auto status = std::filesystem::status(name, fault);
   if (fault && status.type() != std::filesystem::file_type::not_found) {
-    return name + ": " + fault.message();
+    return name + ": " + platform::SystemErrorText(fault.value());
   }
   if (!std::filesystem::exists(status)) return name + ": no such file";
   if (std::filesystem::is_directory(status)) return name + ": is a directory in no known format";
@@ -76,9 +93,12 @@ DataConnectionPtr MtDataConnectionFactory::ConnectDirect(const Array<String>& co
     if (factory == nullptr) return {};
     return TryConnect(*factory, connStrings, geoRef, metadata);
   }
-  const std::vector<DataConnectionFactory*> willing = FindWilling(connStrings);
+  String unread;
+  const std::vector<DataConnectionFactory*> willing = FindWilling(connStrings, unread);
   TakeFault();  // of rows that don't load: they are none of this source's
-  if (willing.empty()) SetFault(DescribeUnrecognised(connStrings));
+  if (willing.empty()) {
+    SetFault(unread.GetLength() != 0 ? unread : DescribeUnrecognised(connStrings));
+  }
   if (willing.size() == 1) {
     const DataConnectionPtr made = TryConnect(*willing.front(), connStrings, geoRef, metadata);
     if (made) return made;

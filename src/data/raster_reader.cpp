@@ -1,4 +1,4 @@
-#include "data/raster_reader_impl.h"
+#include "data/raster_reader_body.h"
 
 namespace lumo {
 
@@ -8,17 +8,6 @@ Array<unsigned> BandsOfBlock(const Array<unsigned>& bands, Interleave interleave
   return kept;
 }
 
-template class RasterReader<std::uint8_t>;
-template class RasterReader<std::int8_t>;
-template class RasterReader<std::uint16_t>;
-template class RasterReader<std::int16_t>;
-template class RasterReader<std::uint32_t>;
-template class RasterReader<std::int32_t>;
-template class RasterReader<float>;
-template class RasterReader<double>;
-template class RasterReader<std::uint64_t>;
-template class RasterReader<std::int64_t>;
-template class RasterReader<Complex<float>>;
-template class RasterReader<Complex<double>>;
+VEXG_INSTANCES(TWELVE, RasterReader);
 
 }  // namespace lumo

@@ -180,17 +180,6 @@ class VEXG_EXPORT RasterReaderDispatch : public ErrorState {
   unsigned dataType_ = 0;
 };
 
-extern template class VEXG_EXPORT RasterReader<std::uint8_t>;
-extern template class VEXG_EXPORT RasterReader<std::int8_t>;
-extern template class VEXG_EXPORT RasterReader<std::uint16_t>;
-extern template class VEXG_EXPORT RasterReader<std::int16_t>;
-extern template class VEXG_EXPORT RasterReader<std::uint32_t>;
-extern template class VEXG_EXPORT RasterReader<std::int32_t>;
-extern template class VEXG_EXPORT RasterReader<float>;
-extern template class VEXG_EXPORT RasterReader<double>;
-extern template class VEXG_EXPORT RasterReader<std::uint64_t>;
-extern template class VEXG_EXPORT RasterReader<std::int64_t>;
-extern template class VEXG_EXPORT RasterReader<Complex<float>>;
-extern template class VEXG_EXPORT RasterReader<Complex<double>>;
+VEXG_EXTERN(TWELVE, RasterReader);
 
 }  // namespace lumo

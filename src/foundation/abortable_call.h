@@ -9,6 +9,7 @@
 #include "foundation/fault.h"
 #include "foundation/run_controls.h"
 #include "foundation/thread.h"
+#include "foundation/thrown.h"
 
 namespace lumo {
 
@@ -40,10 +41,10 @@ bool RunAbortable(const AbortFlag& abort, std::function<Result()> call, Result& 
     try {
       TakeFault();
       made = call();
+      fault = TakeFault();
     } catch (...) {
-      // The caller sees that there is no result.
+      fault = DescribeException();  // and no result
     }
-    fault = TakeFault();
     const std::lock_guard lock(shared->mutex);
     shared->result = std::move(made);
     shared->fault = fault;

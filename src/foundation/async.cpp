@@ -3,7 +3,9 @@
 #include <functional>
 #include <utility>
 
+#include "foundation/fault.h"
 #include "foundation/thread_roll.h"
+#include "foundation/thrown.h"
 
 namespace lumo {
 namespace {
@@ -13,6 +15,7 @@ void RunAsync(const AsyncPtr& work) {
   try {
     work->Execute();
   } catch (...) {
+    DescribeException();  // which notes a shortage of memory
     work->SetErrorState(AsyncErrorExecuteFailed());
   }
   work->Finish();

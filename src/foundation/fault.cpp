@@ -3,6 +3,7 @@
 #include <utility>
 
 #include "foundation/near_name.h"
+#include "platform/temporary_file.h"
 
 namespace lumo {
 namespace {
@@ -13,7 +14,11 @@ thread_local String tFault;
 
 void SetFault(const String& text) {
   // Names of files may hold anything, and the text goes to terminals and into lines.
-  tFault = text.GetLength() != 0 ? String(Printable(text.ToUTF8())) : text;
+  if (text.GetLength() == 0) {
+    tFault = text;
+  } else {
+    tFault = Printable(platform::WithoutTemporaryNames(text.ToUTF8()));
+  }
 }
 
 String TakeFault() {

@@ -1,7 +1,9 @@
 #include "foundation/file_faults.h"
 
-#include <system_error>
+#include <cerrno>
 #include <vector>
+
+#include "platform/memory_shortage.h"
 
 namespace lumo {
 namespace {
@@ -15,7 +17,7 @@ thread_local unsigned tListeners = 0;
 }  // namespace
 
 std::string FileFault::Text() const {
-  return std::generic_category().message(code);
+  return platform::SystemErrorText(code);
 }
 
 FileFaults::FileFaults() : begin_(tFaults.size()) {
@@ -39,6 +41,13 @@ const FileFault* FileFaults::FirstOf(const std::string& path) const {
 
 void FileFaults::Clear() {
   begin_ = tFaults.size();
+}
+
+void FileFaults::NoteUnread(const std::string& path) {
+  const int code = errno;
+  const bool isAbsent =
+      code == 0 || code == ENOENT || code == ENOTDIR || code == EISDIR || code == ENAMETOOLONG;
+  if (!isAbsent) Note(path, code);
 }
 
 void FileFaults::Note(const std::string& path, int code) {

@@ -42,6 +42,9 @@ class VEXG_EXPORT FileFaults {
   /// Notes a fault. It is kept only while some FileFaults lives on this thread.
   static void Note(const std::string& path, int code);
 
+  /// Notes what errno says of a call that was to read a file, unless it is that there is none.
+  static void NoteUnread(const std::string& path);
+
  private:
   std::size_t begin_;
 };

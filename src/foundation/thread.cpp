@@ -2,7 +2,10 @@
 
 #include <utility>
 
+#include "foundation/fault.h"
 #include "foundation/thread_roll.h"
+#include "foundation/thrown.h"
+#include "platform/memory_shortage.h"
 
 namespace lumo {
 namespace {
@@ -13,6 +16,7 @@ void RunGuarded(std::function<void()>& body) {
     body();
   } catch (...) {
     // Whoever waits for the thread's work sees that it isn't done; there is nobody else to tell.
+    DescribeException();  // which notes a shortage of memory
   }
   body = nullptr;  // lets go of what it holds before the thread leaves
 }
@@ -32,6 +36,7 @@ bool Thread::Start(std::function<void()> body) {
     });
     return true;
   } catch (...) {
+    platform::NoteMemoryShortage();  // which a thread takes
     return false;
   }
 }
@@ -61,7 +66,7 @@ bool StartThread(const SimpleThreadPtr& thread) {
     try {
       thread->Run();
     } catch (...) {
-      // It ends as one whose Run has returned.
+      DescribeException();  // it ends as one whose Run has returned
     }
     thread->End();
   });

@@ -6,6 +6,7 @@
 #include <optional>
 
 #include "foundation/fault.h"
+#include "foundation/thrown.h"
 #include "metadata/metadata_parse_log.h"
 #include "metadata/metadata_text.h"
 #include "platform/unicode.h"
@@ -282,7 +283,7 @@ bool ReadMdfText(std::u16string_view text, const String& path, MdfFormat& format
     SetFault(told);
   } catch (...) {
     LogFault(reader, path, nullptr);
-    SetFault("a definition file could not be read");
+    SetFault("a definition file could not be read: " + DescribeException());
   }
   return false;
 }

@@ -1,5 +1,7 @@
 #include "metadata/metadata.h"
 
+#include "foundation/fault.h"
+#include "foundation/thrown.h"
 #include "foundation/type_code.h"
 #include "metadata/metadata_parse_log.h"
 
@@ -67,6 +69,7 @@ void Metadata::Remove(const String& path) {
       Write([&](MetadataContainer& store) { return store.Remove(path); });
     }
   } catch (...) {
+    SetFault(DescribeException());
     SetErrorState(ObjectErrorOutOfMemory());
   }
 }

@@ -3,6 +3,7 @@
 #include "foundation/environment.h"
 #include "foundation/fault.h"
 #include "foundation/near_name.h"
+#include "foundation/thrown.h"
 #include "metadata/metadata.h"
 #include "metadata/metadata_formats.h"
 #include "metadata/metadata_parse_log.h"
@@ -139,6 +140,7 @@ bool Metadata::Open(const Array<String>& connectionStrings) {
     return ReadSource(*format, connectionStrings, mdfPath, read) &&
            Write([&](MetadataContainer& store) { return store.Merge(*read); });
   } catch (...) {
+    SetFault(DescribeException());
     SetErrorState(ObjectErrorOutOfMemory());
     return false;
   }

@@ -3,6 +3,7 @@
 #include <utility>
 
 #include "foundation/fault.h"
+#include "foundation/thrown.h"
 #include "metadata/metadata_conversion.h"
 #include "metadata/metadata_parse_log.h"
 #include "metadata/metadata_parser.h"
@@ -106,7 +107,7 @@ bool MetadataDefFileTranslator::TranslateAll(const std::vector<MdfEntry>& entrie
   } catch (...) {
     log.Write(MetadataParseLog::kErrors,
               "Mdf Translate - Error: unknown exception caught.  Line: (%s) \n", line().c_str());
-    SetFault("metadata could not be translated");
+    SetFault("metadata could not be translated: " + DescribeException());
   }
   return false;
 }

@@ -12,15 +12,18 @@
 #include <xercesc/sax2/SAX2XMLReader.hpp>
 #include <xercesc/sax2/XMLReaderFactory.hpp>
 #include <xercesc/util/BinInputStream.hpp>
+#include <xercesc/util/OutOfMemoryException.hpp>
 #include <xercesc/util/SecurityManager.hpp>
 #include <xercesc/util/XMLURL.hpp>
 #include <xercesc/util/XMLUni.hpp>
 
 #include "commands/xml_runtime.h"
 #include "foundation/fault.h"
+#include "foundation/thrown.h"
 #include "metadata/metadata_parse_log.h"
 #include "metadata/metadata_text.h"
 #include "metadata/xml_path_writer.h"
+#include "platform/memory_shortage.h"
 
 namespace lumo {
 namespace {
@@ -248,7 +251,11 @@ bool XmlMetadataParser::ParseDocument(const std::string& bytes) {
     LogException("XMLException", error.getMessage());
   } catch (const xercesc::SAXParseException& error) {
     LogException("SAXParseException", error.getMessage());
+  } catch (const xercesc::OutOfMemoryException&) {
+    platform::NoteMemoryShortage();
+    fault = platform::kOutOfMemory;
   } catch (...) {
+    fault = DescribeException();
     LogError({"Xml Parser: Unexpected Exception \n"});
   }
   if (fault.empty()) fault = handler.FirstError();

@@ -65,13 +65,6 @@ class OverlapRaster final : public ComputedRaster<T> {
   std::shared_ptr<const WarpMap> map_;  // to the second raster, where one has a camera alone
 };
 
-extern template class VEXG_EXPORT OverlapRaster<std::uint8_t, std::uint8_t>;
-extern template class VEXG_EXPORT OverlapRaster<std::int8_t, std::int8_t>;
-extern template class VEXG_EXPORT OverlapRaster<std::uint16_t, std::uint16_t>;
-extern template class VEXG_EXPORT OverlapRaster<std::int16_t, std::int16_t>;
-extern template class VEXG_EXPORT OverlapRaster<std::uint32_t, std::uint32_t>;
-extern template class VEXG_EXPORT OverlapRaster<std::int32_t, std::int32_t>;
-extern template class VEXG_EXPORT OverlapRaster<float, float>;
-extern template class VEXG_EXPORT OverlapRaster<double, double>;
+VEXG_EXTERN(EIGHT, OverlapRaster, std::type_identity_t);
 
 }  // namespace lumo

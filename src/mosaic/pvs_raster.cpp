@@ -1,14 +1,7 @@
-#include "mosaic/pvs_raster_impl.h"
+#include "mosaic/pvs_raster_body.h"
 
 namespace lumo {
 
-template class PVSRaster<std::uint8_t>;
-template class PVSRaster<std::int8_t>;
-template class PVSRaster<std::uint16_t>;
-template class PVSRaster<std::int16_t>;
-template class PVSRaster<std::uint32_t>;
-template class PVSRaster<std::int32_t>;
-template class PVSRaster<float>;
-template class PVSRaster<double>;
+VEXG_INSTANCES(EIGHT, PVSRaster);
 
 }  // namespace lumo

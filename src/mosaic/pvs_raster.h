@@ -49,13 +49,6 @@ class PVSRaster final : public ComputedRaster<T> {
   RasterDef def_;
 };
 
-extern template class VEXG_EXPORT PVSRaster<std::uint8_t>;
-extern template class VEXG_EXPORT PVSRaster<std::int8_t>;
-extern template class VEXG_EXPORT PVSRaster<std::uint16_t>;
-extern template class VEXG_EXPORT PVSRaster<std::int16_t>;
-extern template class VEXG_EXPORT PVSRaster<std::uint32_t>;
-extern template class VEXG_EXPORT PVSRaster<std::int32_t>;
-extern template class VEXG_EXPORT PVSRaster<float>;
-extern template class VEXG_EXPORT PVSRaster<double>;
+VEXG_EXTERN(EIGHT, PVSRaster);
 
 }  // namespace lumo

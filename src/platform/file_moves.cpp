@@ -5,10 +5,11 @@
 #include <fcntl.h>
 #include <linux/fs.h>
 #include <sys/syscall.h>
-#include <system_error>
 #include <unistd.h>
 
+#include "platform/durability.h"
 #include "platform/file_descriptor.h"
+#include "platform/memory_shortage.h"
 
 namespace lumo::platform {
 namespace {
@@ -16,7 +17,7 @@ namespace {
 /// Tells why a call on `path` failed; errno stays.
 bool FailOn(const std::string& path, std::string* fault) {
   const int code = errno;
-  if (fault != nullptr) *fault = path + ": " + std::generic_category().message(code);
+  if (fault != nullptr) *fault = path + ": " + SystemErrorText(code);
   errno = code;
   return false;
 }
@@ -30,13 +31,12 @@ bool LacksFlags() {
   return errno == EINVAL || errno == ENOSYS;
 }
 
-}  // namespace
-
-bool RenameFile(const std::string& from, const std::string& to, std::string* fault) {
-  return std::rename(from.c_str(), to.c_str()) == 0 || FailOn(to, fault);
+std::string FolderOf(const std::string& path) {
+  const std::size_t slash = path.rfind('/');
+  return slash == std::string::npos ? "." : slash == 0 ? "/" : path.substr(0, slash);
 }
 
-bool RenameToNew(const std::string& from, const std::string& to, std::string* fault) {
+bool MoveToNew(const std::string& from, const std::string& to, std::string* fault) {
   if (Rename(from, to, RENAME_NOREPLACE)) return true;
   if (!LacksFlags()) return FailOn(to, fault);
   // A second name can't replace anything either.
@@ -44,8 +44,44 @@ bool RenameToNew(const std::string& from, const std::string& to, std::string* fa
   return unlink(from.c_str()) == 0 || FailOn(from, fault);
 }
 
+}  // namespace
+
+bool RenameFile(const std::string& from, const std::string& to, std::string* fault) {
+  if (!IsDurable()) return std::rename(from.c_str(), to.c_str()) == 0 || FailOn(to, fault);
+  if (!SyncPath(from, fault)) return false;
+  // The older file keeps a name until the move is on the disk, so that it can be taken back.
+  const bool isExchanged = Rename(from, to, RENAME_EXCHANGE);
+  if (!isExchanged && std::rename(from.c_str(), to.c_str()) != 0) return FailOn(to, fault);
+  if (SyncPath(FolderOf(to), fault)) {
+    if (isExchanged) unlink(from.c_str());
+    return true;
+  }
+  const int code = errno;
+  Rename(to, from, isExchanged ? RENAME_EXCHANGE : RENAME_NOREPLACE);
+  errno = code;
+  return false;
+}
+
+bool RenameToNew(const std::string& from, const std::string& to, std::string* fault,
+                 MoveSync sync) {
+  const bool isDurable = sync == MoveSync::kWhereDurable && IsDurable();
+  if (isDurable && !SyncPath(from, fault)) return false;
+  if (!MoveToNew(from, to, fault)) return false;
+  if (!isDurable || SyncPath(FolderOf(to), fault)) return true;
+  const int code = errno;
+  Rename(to, from, RENAME_NOREPLACE);
+  errno = code;
+  return false;
+}
+
 bool ExchangeFiles(const std::string& a, const std::string& b, std::string* fault) {
-  return Rename(a, b, RENAME_EXCHANGE) || FailOn(b, fault);
+  if (IsDurable() && !SyncPath(a, fault)) return false;
+  if (!Rename(a, b, RENAME_EXCHANGE)) return FailOn(b, fault);
+  if (!IsDurable() || SyncPath(FolderOf(b), fault)) return true;
+  const int code = errno;
+  Rename(a, b, RENAME_EXCHANGE);
+  errno = code;
+  return false;
 }
 
 bool SyncPath(const std::string& path, std::string* fault) {

@@ -89,4 +89,8 @@ bool WasInterrupted() {
   return gInterrupted;
 }
 
+void IgnoreInterrupts() {
+  for (const int number : {SIGINT, SIGTERM}) signal(number, SIG_IGN);
+}
+
 }  // namespace lumo::platform

@@ -30,4 +30,7 @@ class VEXG_EXPORT InterruptWatch {
 /// True once the function of an InterruptWatch was called.
 VEXG_EXPORT bool WasInterrupted();
 
+/// Has the process take no notice of such requests any more, as it is about to end by itself.
+VEXG_EXPORT void IgnoreInterrupts();
+
 }  // namespace lumo::platform

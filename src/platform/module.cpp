@@ -1,16 +1,21 @@
 #include "platform/module.h"
 
+#include <cerrno>
+#include <cstring>
 #include <dlfcn.h>
+
+#include "platform/memory_shortage.h"
 
 namespace lumo::platform {
 
 Module Module::Load(const std::string& path, std::string* fault) {
   Module module;
   module.handle_ = dlopen(path.c_str(), RTLD_NOW | RTLD_LOCAL);
-  if (module.handle_ == nullptr && fault != nullptr) {
-    const char* const why = dlerror();
-    *fault = why != nullptr ? why : path;
-  }
+  if (module.handle_ != nullptr) return module;
+  const char* const told = dlerror();
+  std::string why = told != nullptr ? told : path;
+  if (why.find(std::strerror(ENOMEM)) != why.npos) why = path + ": " + SystemErrorText(ENOMEM);
+  if (fault != nullptr) *fault = why;
   return module;
 }
 

@@ -31,8 +31,9 @@ int ProcessNumber() {
   return getpid();
 }
 
-void SurviveClosedPipes() {
+void SurviveFailedWrites() {
   signal(SIGPIPE, SIG_IGN);
+  signal(SIGXFSZ, SIG_IGN);
 }
 
 bool OutputIsClosed() {
@@ -48,6 +49,10 @@ void EndOfClosedPipe() {
 
 void EndProcess(int code) {
   std::fflush(nullptr);
+  _exit(code);
+}
+
+void DropProcess(int code) {
   _exit(code);
 }
 

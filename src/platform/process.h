@@ -17,8 +17,10 @@ VEXG_EXPORT void RaiseDescriptorLimit();
 /// Number of this process in the system.
 VEXG_EXPORT int ProcessNumber();
 
-/// Has writing to a pipe that nobody reads any more fail instead of ending the process at once.
-VEXG_EXPORT void SurviveClosedPipes();
+/// Has writing to a pipe that nobody reads any more, or beyond the size that a file may have
+/// (ulimit -f), fail instead of ending the process at once. For a program to ask for: the library
+/// leaves the signals of its host as they are.
+VEXG_EXPORT void SurviveFailedWrites();
 
 /// True when standard output is a pipe that nobody reads any more.
 VEXG_EXPORT bool OutputIsClosed();
@@ -29,5 +31,9 @@ VEXG_EXPORT bool OutputIsClosed();
 /// Ends the process at once, whatever its threads are doing; what the standard streams still hold
 /// is written before.
 [[noreturn]] VEXG_EXPORT void EndProcess(int code);
+
+/// The same, without what the standard streams still hold: no thread that is in the middle of
+/// writing it is waited for.
+[[noreturn]] VEXG_EXPORT void DropProcess(int code);
 
 }  // namespace lumo::platform

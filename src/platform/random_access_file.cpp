@@ -8,13 +8,13 @@
 #include <fcntl.h>
 #include <sys/stat.h>
 #include <sys/uio.h>
-#include <system_error>
 #include <unistd.h>
 #include <utility>
 
 #include "platform/file_descriptor.h"
 #include "platform/file_gate.h"
 #include "platform/file_moves.h"
+#include "platform/memory_shortage.h"
 #include "platform/temporary_file.h"
 
 namespace lumo::platform {
@@ -28,7 +28,7 @@ bool Fail(std::string* fault, const std::string& path, const std::string& what) 
 }
 
 bool FailBySystem(std::string* fault, const std::string& path, int error) {
-  Fail(fault, path, std::generic_category().message(error));
+  Fail(fault, path, SystemErrorText(error));
   errno = error;
   return false;
 }
@@ -176,7 +176,11 @@ bool RandomAccessFile::Write(std::uint64_t offset, std::span<const ConstFilePiec
   const int error = Transfer(offset, pieces, [this](const iovec* at, int count, off_t place) {
     return pwritev(descriptor_, at, count, place);
   });
-  return error == 0 || FailBySystem(fault, path_, error == kEnded ? ENOSPC : error);
+  if (error != 0) return FailBySystem(fault, path_, error == kEnded ? ENOSPC : error);
+  std::uint64_t bytes = 0;
+  for (const ConstFilePiece& piece : pieces) bytes += piece.bytes;
+  writeBack_.Count(descriptor_, bytes);
+  return true;
 }
 
 bool RandomAccessFile::GetSize(std::uint64_t& bytes, std::string* fault) const {

@@ -7,6 +7,7 @@
 #include <string>
 #include <string_view>
 
+#include "platform/durability.h"
 #include "platform/export.h"
 
 namespace lumo::platform {
@@ -101,6 +102,7 @@ class VEXG_EXPORT RandomAccessFile {
 
   const std::string path_;
   int descriptor_;  // below 0: closed
+  WriteBack writeBack_;
 };
 
 /// Makes a file that holds `content`, on the disk when this returns; none when it fails.

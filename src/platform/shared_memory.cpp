@@ -2,15 +2,40 @@
 
 #include <cerrno>
 #include <fcntl.h>
+#include <filesystem>
+#include <mutex>
+#include <set>
 #include <sys/mman.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
 #include "platform/file_descriptor.h"
 #include "platform/memory_guard.h"
+#include "platform/memory_shortage.h"
+#include "platform/owned_name.h"
 
 namespace lumo::platform {
 namespace {
+
+/// The blocks that this process has made and not yet taken away.
+struct OwnBlocks {
+  std::mutex mutex;
+  std::set<std::string> paths;
+
+  static OwnBlocks& Get() {
+    static auto* const blocks = new OwnBlocks;  // for threads that outlast static objects
+    return *blocks;
+  }
+  void Add(const std::string& path) {
+    const std::lock_guard lock(mutex);
+    paths.insert(path);
+  }
+  void Remove(const std::string& path) {
+    const std::lock_guard lock(mutex);
+    paths.erase(path);
+    shm_unlink(path.c_str());
+  }
+};
 
 /// The system's form of a block's name; empty when the name is not allowed.
 std::string SystemName(const std::string& name) {
@@ -25,7 +50,9 @@ std::string SystemName(const std::string& name) {
 unsigned char* Map(int file, std::size_t size) {
   void* const view =
       mmap(nullptr, size, PROT_READ | PROT_WRITE, MAP_SHARED | MAP_POPULATE, file, 0);
-  return view != MAP_FAILED ? static_cast<unsigned char*>(view) : nullptr;
+  if (view != MAP_FAILED) return static_cast<unsigned char*>(view);
+  if (errno == ENOMEM || errno == EAGAIN) NoteMemoryShortage();
+  return nullptr;
 }
 
 /// True for memory of this user's own that is as large as asked for.
@@ -38,7 +65,21 @@ bool IsUsable(int file, std::size_t size) {
 /// Has the system give memory for all of a block now: one that only promises it would end in a bus
 /// error where the memory is short. What is there already stays.
 bool Reserve(int file, std::size_t size) {
-  return posix_fallocate(file, 0, static_cast<off_t>(size)) == 0;
+  int code = EINTR;
+  while (code == EINTR) code = posix_fallocate(file, 0, static_cast<off_t>(size));
+  if (code == ENOMEM || code == ENOSPC) NoteMemoryShortage();  // its file system is memory
+  return code == 0;
+}
+
+/// Unlinks the blocks that killed processes of this user have left, which would keep their memory
+/// until the machine is started again.
+void RemoveAbandonedBlocks() {
+  std::error_code fault;
+  for (std::filesystem::directory_iterator at("/dev/shm", fault), end; !fault && at != end;
+       at.increment(fault)) {
+    const std::string name = at->path().filename().string();
+    if (name.starts_with("vexg-") && IsAbandoned(name)) shm_unlink(("/" + name).c_str());
+  }
 }
 
 }  // namespace
@@ -47,7 +88,9 @@ SharedMemoryBlock::SharedMemoryBlock(unsigned char* data, std::size_t size, std:
     : data_(data),
       size_(size),
       ownedPath_(std::move(ownedPath)),
-      guard_(std::make_unique<MemoryGuard>(data, size)) {}
+      guard_(std::make_unique<MemoryGuard>(data, size)) {
+  if (!ownedPath_.empty()) OwnBlocks::Get().Add(ownedPath_);
+}
 
 bool SharedMemoryBlock::WasCut() const {
   return guard_->WasCut();
@@ -68,6 +111,8 @@ std::unique_ptr<SharedMemoryBlock> SharedMemoryBlock::Open(const std::string& na
 
 std::unique_ptr<SharedMemoryBlock> SharedMemoryBlock::Create(const std::string& name,
                                                              std::size_t size) {
+  static std::once_flag cleared;
+  std::call_once(cleared, RemoveAbandonedBlocks);
   const std::string path = SystemName(name);
   if (path.empty() || size == 0) return nullptr;
   const FileDescriptor file(shm_open(path.c_str(), O_RDWR | O_CREAT | O_EXCL, S_IRUSR | S_IWUSR));
@@ -84,7 +129,13 @@ std::unique_ptr<SharedMemoryBlock> SharedMemoryBlock::Create(const std::string& 
 SharedMemoryBlock::~SharedMemoryBlock() {
   guard_.reset();
   munmap(data_, size_);
-  if (!ownedPath_.empty()) shm_unlink(ownedPath_.c_str());
+  if (!ownedPath_.empty()) OwnBlocks::Get().Remove(ownedPath_);
+}
+
+void RemoveOwnSharedMemory() {
+  OwnBlocks& blocks = OwnBlocks::Get();
+  const std::lock_guard lock(blocks.mutex);
+  for (const std::string& path : blocks.paths) shm_unlink(path.c_str());
 }
 
 }  // namespace lumo::platform

@@ -51,4 +51,8 @@ class VEXG_EXPORT SharedMemoryBlock {
   std::unique_ptr<MemoryGuard> guard_;
 };
 
+/// Takes away the names of all blocks that this process has made, for a process that ends in the
+/// middle of its work.
+VEXG_EXPORT void RemoveOwnSharedMemory();
+
 }  // namespace lumo::platform

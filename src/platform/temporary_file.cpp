@@ -1,16 +1,10 @@
 #include "platform/temporary_file.h"
 
-#include <atomic>
-#include <cerrno>
-#include <charconv>
-#include <csignal>
-#include <cstdint>
 #include <filesystem>
-#include <fstream>
-#include <iterator>
-#include <optional>
 #include <string_view>
-#include <unistd.h>
+
+#include "platform/owned_name.h"
+#include "platform/unfinished_folders.h"
 
 namespace lumo::platform {
 namespace {
@@ -21,84 +15,17 @@ constexpr std::string_view kFileEnding = ".tmp";
 constexpr std::string_view kFolderEnding = ".part";
 constexpr std::size_t kMaxNameBytes = 255;
 
-std::string FirstLine(const char* file) {
-  std::ifstream stream(file);
-  std::string line;
-  std::getline(stream, line);
-  return line;
-}
-
-/// A short text in place of a long one (FNV-1a, 32 bits).
-std::string Digest(std::string_view text) {
-  std::uint32_t hash = 2166136261U;
-  for (const char letter : text) {
-    hash ^= static_cast<unsigned char>(letter);
-    hash *= 16777619U;
-  }
-  char digits[8];
-  const auto end = std::to_chars(std::begin(digits), std::end(digits), hash, 16).ptr;
-  return std::string(std::begin(digits), end);
-}
-
-/// When a process began, in the system's ticks since it was started; none when there is no such.
-std::optional<std::string> StartOf(const std::string& process) {
-  const std::string line = FirstLine(("/proc/" + process + "/stat").c_str());
-  // The name of the program, in parentheses, may hold blanks; the start is 20 fields behind it.
-  std::size_t at = line.rfind(')');
-  if (at == std::string::npos) return std::nullopt;
-  constexpr int kFields = 20;
-  for (int field = 0; field < kFields && at != std::string::npos; ++field) {
-    at = line.find(' ', at + 1);
-  }
-  if (at == std::string::npos) return std::nullopt;
-  return line.substr(at + 1, line.find(' ', at + 1) - at - 1);
-}
-
-/// One process of one run of one machine, as names hold it: "machine-run-process-start".
-struct Owner {
-  std::string machine, run, process, start;
-
-  static Owner Self() {
-    const std::string process = std::to_string(getpid());
-    return {Digest(FirstLine("/etc/machine-id")),
-            Digest(FirstLine("/proc/sys/kernel/random/boot_id")), process,
-            StartOf(process).value_or("0")};
-  }
-
-  static std::optional<Owner> Parse(std::string_view text) {
-    Owner owner;
-    for (std::string* const part : {&owner.machine, &owner.run, &owner.process, &owner.start}) {
-      const std::size_t dash = text.find('-');
-      *part = text.substr(0, dash);
-      if (part->empty() || part->find_first_not_of("0123456789abcdef") != part->npos) return {};
-      text.remove_prefix(dash == text.npos ? text.size() : dash + 1);
-    }
-    return owner;
-  }
-
-  std::string Text() const { return machine + "-" + run + "-" + process + "-" + start; }
-
-  /// True when the process ran on this machine and runs no more.
-  bool HasEnded() const {
-    const Owner self = Self();
-    if (machine != self.machine) return false;
-    return run != self.run || StartOf(process) != start;
-  }
-};
-
 /// "beginning.owner-number.ending", no longer than names may be.
 std::string TemporaryName(const std::string& beginning, std::string_view ending) {
-  static std::atomic<unsigned> count{0};
-  std::string rest(".");
-  rest += Owner::Self().Text() + "-" + std::to_string(count++);
+  std::string rest = OwnedName("");
   rest += ending;
   return beginning.substr(0, kMaxNameBytes - rest.size()) + rest;
 }
 
-/// The entries beside `path` that TemporaryName named in processes that have ended; they may have a
-/// further ending.
-std::vector<std::string> FindAbandoned(const std::string& path, const std::string& beginning,
-                                       std::string_view ending) {
+/// The entries beside `path` that TemporaryName named in processes whose mark `isMeant`; they may
+/// have a further ending.
+std::vector<std::string> FindNamed(const std::string& path, const std::string& beginning,
+                                   std::string_view ending, bool (*isMeant)(std::string_view)) {
   std::vector<std::string> found;
   const fs::path folder = fs::path(path).parent_path();
   std::error_code fault;
@@ -107,16 +34,39 @@ std::vector<std::string> FindAbandoned(const std::string& path, const std::strin
     const std::string name = at->path().filename().string();
     const std::size_t start = beginning.size() + 1;
     if (!name.starts_with(beginning + ".") || name.find(ending, start) == name.npos) continue;
-    const std::string_view middle =
-        std::string_view(name).substr(start, name.find(ending, start) - start);
-    const auto owner = Owner::Parse(middle);
-    if (owner && owner->HasEnded()) found.push_back(at->path().string());
+    if (isMeant(name.substr(beginning.size()))) found.push_back(at->path().string());
   }
   return found;
 }
 
+/// Takes the mark and ending of a file's name away, which stand at `at`, and what stands behind
+/// them where it only repeats the ending of the name.
+void RemoveFileMark(std::string& text, std::size_t at, std::size_t length) {
+  text.erase(at, length);
+  const std::size_t dot = text.find_last_of("./", at == 0 ? 0 : at - 1);
+  if (at == 0 || dot == text.npos || text[dot] != '.') return;
+  const std::string ending = text.substr(dot, at - dot);
+  if (text.compare(at, ending.size(), ending) == 0) text.erase(at, ending.size());
+}
+
+/// Takes a hidden folder out of a path: its name ends at `end`.
+std::size_t RemoveFolder(std::string& text, std::size_t at, std::size_t end) {
+  const std::size_t slash = text.rfind('/', at);
+  const std::size_t start = slash == text.npos ? 0 : slash;
+  if (slash == text.npos && end < text.size() && text[end] == '/') ++end;
+  text.erase(start, end - start);
+  return start;
+}
+
 std::string NameOf(const std::string& path) {
   return fs::path(path).filename().string();
+}
+
+void RemoveNamed(const std::string& path, bool (*isMeant)(std::string_view)) {
+  std::error_code ignored;
+  for (const std::string& file : FindNamed(path, NameOf(path), kFileEnding, isMeant)) {
+    fs::remove(file, ignored);
+  }
 }
 
 std::string HiddenNameOf(const std::string& path) {
@@ -130,18 +80,43 @@ std::string TemporaryPathBeside(const std::string& path) {
 }
 
 std::string TemporaryFolderBeside(const std::string& path) {
-  return (fs::path(path).parent_path() / TemporaryName(HiddenNameOf(path), kFolderEnding)).string();
+  std::string made =
+      (fs::path(path).parent_path() / TemporaryName(HiddenNameOf(path), kFolderEnding)).string();
+  KeepUnfinishedFolder(made);
+  return made;
+}
+
+std::string WithoutTemporaryNames(std::string text) {
+  for (std::size_t at = text.find('.'); at < text.size(); at = text.find('.', at)) {
+    const std::size_t mark = OwnerMarkLength(std::string_view(text).substr(at));
+    const std::size_t end = at + mark;
+    if (mark != 0 && text.compare(end, kFileEnding.size(), kFileEnding) == 0) {
+      RemoveFileMark(text, at, mark + kFileEnding.size());
+    } else if (mark != 0 && text.compare(end, kFolderEnding.size(), kFolderEnding) == 0) {
+      at = RemoveFolder(text, at, end + kFolderEnding.size());
+    } else {
+      ++at;
+    }
+  }
+  return text;
+}
+
+bool IsTemporaryFolderIn(const std::string& folder, const std::string& place) {
+  const std::string name = NameOf(folder);
+  return fs::path(folder).parent_path() == fs::path(place) && name.starts_with('.') &&
+         name.ends_with(kFolderEnding);
 }
 
 void RemoveAbandonedFiles(const std::string& path) {
-  std::error_code ignored;
-  for (const std::string& file : FindAbandoned(path, NameOf(path), kFileEnding)) {
-    fs::remove(file, ignored);
-  }
+  RemoveNamed(path, IsAbandoned);
+}
+
+void RemoveOwnFiles(const std::string& path) {
+  RemoveNamed(path, IsOwned);
 }
 
 std::vector<std::string> FindAbandonedFolders(const std::string& path) {
-  return FindAbandoned(path, HiddenNameOf(path), kFolderEnding);
+  return FindNamed(path, HiddenNameOf(path), kFolderEnding, IsAbandoned);
 }
 
 }  // namespace lumo::platform

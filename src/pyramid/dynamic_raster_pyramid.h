@@ -43,16 +43,19 @@ class DynamicRasterPyramid final : public PyramidCallback<T> {
   RasterBandStats<T> BandStats(unsigned band) const;
   Array<RasterBandHistogram<T>> BandHistogram(unsigned band) const;
 
-  // What a build tells, on its thread. What it has computed goes into the pyramid's store too.
+  // What a build tells, on its thread. What it has computed goes into the pyramid's store too:
+  // false, with the fault told, when the store can't take it, or the raster has been written to
+  // meanwhile.
   void OnLevelsWritten() override;
-  void TakeHistogram(const RasterHistogram<T>& histogram,
+  bool TakeHistogram(const RasterHistogram<T>& histogram,
                      HistogramSign sign) requires(std::is_arithmetic_v<T>);
-  void TakeStats(const RasterStats<T>& stats) requires(std::is_arithmetic_v<T>);
-  /// Shows what the store of the pyramid holds now.
-  void Refresh();
+  bool TakeStats(const RasterStats<T>& stats) requires(std::is_arithmetic_v<T>);
+  /// Shows what the store of the pyramid holds now; false when there is nothing to show.
+  bool Refresh();
 
  private:
   bool IsRunning() const;
+  bool CanTakeResults() const;
   bool ResultsHold() const { return reader_->WriteCount(0) == writes_; }
   bool IsKeptByTheLibrary() const;
   AsyncPtr Start(const PyramidBuilderPtr& builder);
@@ -74,17 +77,6 @@ class DynamicRasterPyramid final : public PyramidCallback<T> {
 template <typename T>
 using DynamicRasterPyramidPtr = Pointer<DynamicRasterPyramid<T>>;
 
-extern template class VEXG_EXPORT DynamicRasterPyramid<std::uint8_t>;
-extern template class VEXG_EXPORT DynamicRasterPyramid<std::int8_t>;
-extern template class VEXG_EXPORT DynamicRasterPyramid<std::uint16_t>;
-extern template class VEXG_EXPORT DynamicRasterPyramid<std::int16_t>;
-extern template class VEXG_EXPORT DynamicRasterPyramid<std::uint32_t>;
-extern template class VEXG_EXPORT DynamicRasterPyramid<std::int32_t>;
-extern template class VEXG_EXPORT DynamicRasterPyramid<float>;
-extern template class VEXG_EXPORT DynamicRasterPyramid<double>;
-extern template class VEXG_EXPORT DynamicRasterPyramid<std::uint64_t>;
-extern template class VEXG_EXPORT DynamicRasterPyramid<std::int64_t>;
-extern template class VEXG_EXPORT DynamicRasterPyramid<Complex<float>>;
-extern template class VEXG_EXPORT DynamicRasterPyramid<Complex<double>>;
+VEXG_EXTERN(TWELVE, DynamicRasterPyramid);
 
 }  // namespace lumo

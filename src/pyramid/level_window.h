@@ -40,17 +40,6 @@ class LevelWindow {
   unsigned top_ = 0;
 };
 
-extern template class LevelWindow<std::uint8_t>;
-extern template class LevelWindow<std::int8_t>;
-extern template class LevelWindow<std::uint16_t>;
-extern template class LevelWindow<std::int16_t>;
-extern template class LevelWindow<std::uint32_t>;
-extern template class LevelWindow<std::int32_t>;
-extern template class LevelWindow<float>;
-extern template class LevelWindow<double>;
-extern template class LevelWindow<std::uint64_t>;
-extern template class LevelWindow<std::int64_t>;
-extern template class LevelWindow<Complex<float>>;
-extern template class LevelWindow<Complex<double>>;
+VEXG_EXTERN_HIDDEN(TWELVE, LevelWindow);
 
 }  // namespace lumo

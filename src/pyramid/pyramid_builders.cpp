@@ -1,6 +1,6 @@
 #include "pyramid/pyramid_builders.h"
 
-#include "pyramid/pyramid_builders_impl.h"
+#include "pyramid/pyramid_builders_body.h"
 
 namespace lumo {
 
@@ -28,30 +28,7 @@ unsigned ChooseHistogramLevel(unsigned samples, unsigned lines, unsigned levelMi
   return level < static_cast<int>(levelMin) ? 0 : static_cast<unsigned>(level);
 }
 
-template class AsyncPyramidBuilder<std::uint8_t>;
-template class AsyncPyramidBuilder<std::int8_t>;
-template class AsyncPyramidBuilder<std::uint16_t>;
-template class AsyncPyramidBuilder<std::int16_t>;
-template class AsyncPyramidBuilder<std::uint32_t>;
-template class AsyncPyramidBuilder<std::int32_t>;
-template class AsyncPyramidBuilder<float>;
-template class AsyncPyramidBuilder<double>;
-template class AsyncPyramidBuilder<std::uint64_t>;
-template class AsyncPyramidBuilder<std::int64_t>;
-template class AsyncPyramidBuilder<Complex<float>>;
-template class AsyncPyramidBuilder<Complex<double>>;
-
-template class AsyncOrvaPyramidBuilder<std::uint8_t>;
-template class AsyncOrvaPyramidBuilder<std::int8_t>;
-template class AsyncOrvaPyramidBuilder<std::uint16_t>;
-template class AsyncOrvaPyramidBuilder<std::int16_t>;
-template class AsyncOrvaPyramidBuilder<std::uint32_t>;
-template class AsyncOrvaPyramidBuilder<std::int32_t>;
-template class AsyncOrvaPyramidBuilder<float>;
-template class AsyncOrvaPyramidBuilder<double>;
-template class AsyncOrvaPyramidBuilder<std::uint64_t>;
-template class AsyncOrvaPyramidBuilder<std::int64_t>;
-template class AsyncOrvaPyramidBuilder<Complex<float>>;
-template class AsyncOrvaPyramidBuilder<Complex<double>>;
+VEXG_INSTANCES(TWELVE, AsyncPyramidBuilder);
+VEXG_INSTANCES(TWELVE, AsyncOrvaPyramidBuilder);
 
 }  // namespace lumo

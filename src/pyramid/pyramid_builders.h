@@ -79,6 +79,7 @@ class AsyncOrvaPyramidBuilder final : public PyramidBuilder {
  private:
   struct Rasters;
 
+  bool Build();
   bool Open(Rasters& rasters);
   bool MakeLevels(const Rasters& rasters);
   bool MakeHistogram(const Rasters& rasters);
@@ -95,30 +96,7 @@ class AsyncOrvaPyramidBuilder final : public PyramidBuilder {
 VEXG_EXPORT unsigned ChooseHistogramLevel(unsigned samples, unsigned lines, unsigned levelMin,
                                           unsigned levelMax);
 
-extern template class AsyncPyramidBuilder<std::uint8_t>;
-extern template class AsyncPyramidBuilder<std::int8_t>;
-extern template class AsyncPyramidBuilder<std::uint16_t>;
-extern template class AsyncPyramidBuilder<std::int16_t>;
-extern template class AsyncPyramidBuilder<std::uint32_t>;
-extern template class AsyncPyramidBuilder<std::int32_t>;
-extern template class AsyncPyramidBuilder<float>;
-extern template class AsyncPyramidBuilder<double>;
-extern template class AsyncPyramidBuilder<std::uint64_t>;
-extern template class AsyncPyramidBuilder<std::int64_t>;
-extern template class AsyncPyramidBuilder<Complex<float>>;
-extern template class AsyncPyramidBuilder<Complex<double>>;
-
-extern template class AsyncOrvaPyramidBuilder<std::uint8_t>;
-extern template class AsyncOrvaPyramidBuilder<std::int8_t>;
-extern template class AsyncOrvaPyramidBuilder<std::uint16_t>;
-extern template class AsyncOrvaPyramidBuilder<std::int16_t>;
-extern template class AsyncOrvaPyramidBuilder<std::uint32_t>;
-extern template class AsyncOrvaPyramidBuilder<std::int32_t>;
-extern template class AsyncOrvaPyramidBuilder<float>;
-extern template class AsyncOrvaPyramidBuilder<double>;
-extern template class AsyncOrvaPyramidBuilder<std::uint64_t>;
-extern template class AsyncOrvaPyramidBuilder<std::int64_t>;
-extern template class AsyncOrvaPyramidBuilder<Complex<float>>;
-extern template class AsyncOrvaPyramidBuilder<Complex<double>>;
+VEXG_EXTERN_HIDDEN(TWELVE, AsyncPyramidBuilder);
+VEXG_EXTERN_HIDDEN(TWELVE, AsyncOrvaPyramidBuilder);
 
 }  // namespace lumo

@@ -1,4 +1,4 @@
-#include "pyramid/pyramid_process_impl.h"
+#include "pyramid/pyramid_process_body.h"
 
 namespace lumo {
 
@@ -7,41 +7,8 @@ PyramidPath ChoosePyramidPath(const RasterDef& def) {
   return def.tileHeight >= 2 ? PyramidPath::kRow : PyramidPath::kScanline;
 }
 
-template class RasterPyramidProcess<std::uint8_t>;
-template class RasterPyramidProcess<std::int8_t>;
-template class RasterPyramidProcess<std::uint16_t>;
-template class RasterPyramidProcess<std::int16_t>;
-template class RasterPyramidProcess<std::uint32_t>;
-template class RasterPyramidProcess<std::int32_t>;
-template class RasterPyramidProcess<float>;
-template class RasterPyramidProcess<double>;
-template class RasterPyramidProcess<std::uint64_t>;
-template class RasterPyramidProcess<std::int64_t>;
-template class RasterPyramidProcess<Complex<float>>;
-template class RasterPyramidProcess<Complex<double>>;
-
-template class RasterPyramidDecimateRasterProcess<std::uint8_t>;
-template class RasterPyramidDecimateRasterProcess<std::int8_t>;
-template class RasterPyramidDecimateRasterProcess<std::uint16_t>;
-template class RasterPyramidDecimateRasterProcess<std::int16_t>;
-template class RasterPyramidDecimateRasterProcess<std::uint32_t>;
-template class RasterPyramidDecimateRasterProcess<std::int32_t>;
-template class RasterPyramidDecimateRasterProcess<float>;
-template class RasterPyramidDecimateRasterProcess<double>;
-template class RasterPyramidDecimateRasterProcess<std::uint64_t>;
-template class RasterPyramidDecimateRasterProcess<std::int64_t>;
-template class RasterPyramidDecimateRasterProcess<Complex<float>>;
-template class RasterPyramidDecimateRasterProcess<Complex<double>>;
-
-template class RasterPyramidDecimateRasterStatsProcess<std::uint8_t, RasterStats<std::uint8_t>>;
-template class RasterPyramidDecimateRasterStatsProcess<std::int8_t, RasterStats<std::int8_t>>;
-template class RasterPyramidDecimateRasterStatsProcess<std::uint16_t, RasterStats<std::uint16_t>>;
-template class RasterPyramidDecimateRasterStatsProcess<std::int16_t, RasterStats<std::int16_t>>;
-template class RasterPyramidDecimateRasterStatsProcess<std::uint32_t, RasterStats<std::uint32_t>>;
-template class RasterPyramidDecimateRasterStatsProcess<std::int32_t, RasterStats<std::int32_t>>;
-template class RasterPyramidDecimateRasterStatsProcess<float, RasterStats<float>>;
-template class RasterPyramidDecimateRasterStatsProcess<double, RasterStats<double>>;
-template class RasterPyramidDecimateRasterStatsProcess<std::uint64_t, RasterStats<std::uint64_t>>;
-template class RasterPyramidDecimateRasterStatsProcess<std::int64_t, RasterStats<std::int64_t>>;
+VEXG_INSTANCES(TWELVE, RasterPyramidProcess);
+VEXG_INSTANCES(TWELVE, RasterPyramidDecimateRasterProcess);
+VEXG_INSTANCES(TEN, RasterPyramidDecimateRasterStatsProcess, RasterStats);
 
 }  // namespace lumo

@@ -103,51 +103,8 @@ class RasterPyramidDecimateRasterStatsProcess final : public RasterPyramidProces
   ManagedTask<RasterStatsAccumulateTask<T, Stats>> accumulate_;
 };
 
-extern template class VEXG_EXPORT RasterPyramidProcess<std::uint8_t>;
-extern template class VEXG_EXPORT RasterPyramidProcess<std::int8_t>;
-extern template class VEXG_EXPORT RasterPyramidProcess<std::uint16_t>;
-extern template class VEXG_EXPORT RasterPyramidProcess<std::int16_t>;
-extern template class VEXG_EXPORT RasterPyramidProcess<std::uint32_t>;
-extern template class VEXG_EXPORT RasterPyramidProcess<std::int32_t>;
-extern template class VEXG_EXPORT RasterPyramidProcess<float>;
-extern template class VEXG_EXPORT RasterPyramidProcess<double>;
-extern template class VEXG_EXPORT RasterPyramidProcess<std::uint64_t>;
-extern template class VEXG_EXPORT RasterPyramidProcess<std::int64_t>;
-extern template class VEXG_EXPORT RasterPyramidProcess<Complex<float>>;
-extern template class VEXG_EXPORT RasterPyramidProcess<Complex<double>>;
-
-extern template class VEXG_EXPORT RasterPyramidDecimateRasterProcess<std::uint8_t>;
-extern template class VEXG_EXPORT RasterPyramidDecimateRasterProcess<std::int8_t>;
-extern template class VEXG_EXPORT RasterPyramidDecimateRasterProcess<std::uint16_t>;
-extern template class VEXG_EXPORT RasterPyramidDecimateRasterProcess<std::int16_t>;
-extern template class VEXG_EXPORT RasterPyramidDecimateRasterProcess<std::uint32_t>;
-extern template class VEXG_EXPORT RasterPyramidDecimateRasterProcess<std::int32_t>;
-extern template class VEXG_EXPORT RasterPyramidDecimateRasterProcess<float>;
-extern template class VEXG_EXPORT RasterPyramidDecimateRasterProcess<double>;
-extern template class VEXG_EXPORT RasterPyramidDecimateRasterProcess<std::uint64_t>;
-extern template class VEXG_EXPORT RasterPyramidDecimateRasterProcess<std::int64_t>;
-extern template class VEXG_EXPORT RasterPyramidDecimateRasterProcess<Complex<float>>;
-extern template class VEXG_EXPORT RasterPyramidDecimateRasterProcess<Complex<double>>;
-
-extern template class VEXG_EXPORT
-    RasterPyramidDecimateRasterStatsProcess<std::uint8_t, RasterStats<std::uint8_t>>;
-extern template class VEXG_EXPORT
-    RasterPyramidDecimateRasterStatsProcess<std::int8_t, RasterStats<std::int8_t>>;
-extern template class VEXG_EXPORT
-    RasterPyramidDecimateRasterStatsProcess<std::uint16_t, RasterStats<std::uint16_t>>;
-extern template class VEXG_EXPORT
-    RasterPyramidDecimateRasterStatsProcess<std::int16_t, RasterStats<std::int16_t>>;
-extern template class VEXG_EXPORT
-    RasterPyramidDecimateRasterStatsProcess<std::uint32_t, RasterStats<std::uint32_t>>;
-extern template class VEXG_EXPORT
-    RasterPyramidDecimateRasterStatsProcess<std::int32_t, RasterStats<std::int32_t>>;
-extern template class VEXG_EXPORT
-    RasterPyramidDecimateRasterStatsProcess<float, RasterStats<float>>;
-extern template class VEXG_EXPORT
-    RasterPyramidDecimateRasterStatsProcess<double, RasterStats<double>>;
-extern template class VEXG_EXPORT
-    RasterPyramidDecimateRasterStatsProcess<std::uint64_t, RasterStats<std::uint64_t>>;
-extern template class VEXG_EXPORT
-    RasterPyramidDecimateRasterStatsProcess<std::int64_t, RasterStats<std::int64_t>>;
+VEXG_EXTERN(TWELVE, RasterPyramidProcess);
+VEXG_EXTERN(TWELVE, RasterPyramidDecimateRasterProcess);
+VEXG_EXTERN(TEN, RasterPyramidDecimateRasterStatsProcess, RasterStats);
 
 }  // namespace lumo

@@ -135,56 +135,9 @@ class RasterPyramidMortenDecimateTask final : public LevelTask<T> {
   bool isBegun_ = false;
 };
 
-extern template class VEXG_EXPORT RasterPyramidScanlineDecimateTask<std::uint8_t>;
-extern template class VEXG_EXPORT RasterPyramidScanlineDecimateTask<std::int8_t>;
-extern template class VEXG_EXPORT RasterPyramidScanlineDecimateTask<std::uint16_t>;
-extern template class VEXG_EXPORT RasterPyramidScanlineDecimateTask<std::int16_t>;
-extern template class VEXG_EXPORT RasterPyramidScanlineDecimateTask<std::uint32_t>;
-extern template class VEXG_EXPORT RasterPyramidScanlineDecimateTask<std::int32_t>;
-extern template class VEXG_EXPORT RasterPyramidScanlineDecimateTask<float>;
-extern template class VEXG_EXPORT RasterPyramidScanlineDecimateTask<double>;
-extern template class VEXG_EXPORT RasterPyramidScanlineDecimateTask<std::uint64_t>;
-extern template class VEXG_EXPORT RasterPyramidScanlineDecimateTask<std::int64_t>;
-extern template class VEXG_EXPORT RasterPyramidScanlineDecimateTask<Complex<float>>;
-extern template class VEXG_EXPORT RasterPyramidScanlineDecimateTask<Complex<double>>;
-
-extern template class VEXG_EXPORT RasterPyramidRowDecimateTask<std::uint8_t>;
-extern template class VEXG_EXPORT RasterPyramidRowDecimateTask<std::int8_t>;
-extern template class VEXG_EXPORT RasterPyramidRowDecimateTask<std::uint16_t>;
-extern template class VEXG_EXPORT RasterPyramidRowDecimateTask<std::int16_t>;
-extern template class VEXG_EXPORT RasterPyramidRowDecimateTask<std::uint32_t>;
-extern template class VEXG_EXPORT RasterPyramidRowDecimateTask<std::int32_t>;
-extern template class VEXG_EXPORT RasterPyramidRowDecimateTask<float>;
-extern template class VEXG_EXPORT RasterPyramidRowDecimateTask<double>;
-extern template class VEXG_EXPORT RasterPyramidRowDecimateTask<std::uint64_t>;
-extern template class VEXG_EXPORT RasterPyramidRowDecimateTask<std::int64_t>;
-extern template class VEXG_EXPORT RasterPyramidRowDecimateTask<Complex<float>>;
-extern template class VEXG_EXPORT RasterPyramidRowDecimateTask<Complex<double>>;
-
-extern template class VEXG_EXPORT RasterMortenReadTask<std::uint8_t>;
-extern template class VEXG_EXPORT RasterMortenReadTask<std::int8_t>;
-extern template class VEXG_EXPORT RasterMortenReadTask<std::uint16_t>;
-extern template class VEXG_EXPORT RasterMortenReadTask<std::int16_t>;
-extern template class VEXG_EXPORT RasterMortenReadTask<std::uint32_t>;
-extern template class VEXG_EXPORT RasterMortenReadTask<std::int32_t>;
-extern template class VEXG_EXPORT RasterMortenReadTask<float>;
-extern template class VEXG_EXPORT RasterMortenReadTask<double>;
-extern template class VEXG_EXPORT RasterMortenReadTask<std::uint64_t>;
-extern template class VEXG_EXPORT RasterMortenReadTask<std::int64_t>;
-extern template class VEXG_EXPORT RasterMortenReadTask<Complex<float>>;
-extern template class VEXG_EXPORT RasterMortenReadTask<Complex<double>>;
-
-extern template class VEXG_EXPORT RasterPyramidMortenDecimateTask<std::uint8_t>;
-extern template class VEXG_EXPORT RasterPyramidMortenDecimateTask<std::int8_t>;
-extern template class VEXG_EXPORT RasterPyramidMortenDecimateTask<std::uint16_t>;
-extern template class VEXG_EXPORT RasterPyramidMortenDecimateTask<std::int16_t>;
-extern template class VEXG_EXPORT RasterPyramidMortenDecimateTask<std::uint32_t>;
-extern template class VEXG_EXPORT RasterPyramidMortenDecimateTask<std::int32_t>;
-extern template class VEXG_EXPORT RasterPyramidMortenDecimateTask<float>;
-extern template class VEXG_EXPORT RasterPyramidMortenDecimateTask<double>;
-extern template class VEXG_EXPORT RasterPyramidMortenDecimateTask<std::uint64_t>;
-extern template class VEXG_EXPORT RasterPyramidMortenDecimateTask<std::int64_t>;
-extern template class VEXG_EXPORT RasterPyramidMortenDecimateTask<Complex<float>>;
-extern template class VEXG_EXPORT RasterPyramidMortenDecimateTask<Complex<double>>;
+VEXG_EXTERN(TWELVE, RasterPyramidScanlineDecimateTask);
+VEXG_EXTERN(TWELVE, RasterPyramidRowDecimateTask);
+VEXG_EXTERN(TWELVE, RasterMortenReadTask);
+VEXG_EXTERN(TWELVE, RasterPyramidMortenDecimateTask);
 
 }  // namespace lumo

@@ -165,87 +165,17 @@ std::istream& operator>>(std::istream& in, RasterBandHistogram<T>& histogram) {
   return in;
 }
 
-template struct VEXG_EXPORT RasterBandStats<std::uint8_t>;
-template VEXG_EXPORT std::ostream& operator<<(std::ostream&, const RasterBandStats<std::uint8_t>&);
-template VEXG_EXPORT std::istream& operator>>(std::istream&, RasterBandStats<std::uint8_t>&);
-template VEXG_EXPORT std::ostream& operator<<(std::ostream&,
-                                              const RasterBandHistogram<std::uint8_t>&);
-template VEXG_EXPORT std::istream& operator>>(std::istream&, RasterBandHistogram<std::uint8_t>&);
-template VEXG_EXPORT bool operator==(const RasterBandHistogram<std::uint8_t>&,
-                                     const RasterBandHistogram<std::uint8_t>&);
-template struct VEXG_EXPORT RasterBandStats<std::int8_t>;
-template VEXG_EXPORT std::ostream& operator<<(std::ostream&, const RasterBandStats<std::int8_t>&);
-template VEXG_EXPORT std::istream& operator>>(std::istream&, RasterBandStats<std::int8_t>&);
-template VEXG_EXPORT std::ostream& operator<<(std::ostream&,
-                                              const RasterBandHistogram<std::int8_t>&);
-template VEXG_EXPORT std::istream& operator>>(std::istream&, RasterBandHistogram<std::int8_t>&);
-template VEXG_EXPORT bool operator==(const RasterBandHistogram<std::int8_t>&,
-                                     const RasterBandHistogram<std::int8_t>&);
-template struct VEXG_EXPORT RasterBandStats<std::uint16_t>;
-template VEXG_EXPORT std::ostream& operator<<(std::ostream&, const RasterBandStats<std::uint16_t>&);
-template VEXG_EXPORT std::istream& operator>>(std::istream&, RasterBandStats<std::uint16_t>&);
-template VEXG_EXPORT std::ostream& operator<<(std::ostream&,
-                                              const RasterBandHistogram<std::uint16_t>&);
-template VEXG_EXPORT std::istream& operator>>(std::istream&, RasterBandHistogram<std::uint16_t>&);
-template VEXG_EXPORT bool operator==(const RasterBandHistogram<std::uint16_t>&,
-                                     const RasterBandHistogram<std::uint16_t>&);
-template struct VEXG_EXPORT RasterBandStats<std::int16_t>;
-template VEXG_EXPORT std::ostream& operator<<(std::ostream&, const RasterBandStats<std::int16_t>&);
-template VEXG_EXPORT std::istream& operator>>(std::istream&, RasterBandStats<std::int16_t>&);
-template VEXG_EXPORT std::ostream& operator<<(std::ostream&,
-                                              const RasterBandHistogram<std::int16_t>&);
-template VEXG_EXPORT std::istream& operator>>(std::istream&, RasterBandHistogram<std::int16_t>&);
-template VEXG_EXPORT bool operator==(const RasterBandHistogram<std::int16_t>&,
-                                     const RasterBandHistogram<std::int16_t>&);
-template struct VEXG_EXPORT RasterBandStats<std::uint32_t>;
-template VEXG_EXPORT std::ostream& operator<<(std::ostream&, const RasterBandStats<std::uint32_t>&);
-template VEXG_EXPORT std::istream& operator>>(std::istream&, RasterBandStats<std::uint32_t>&);
-template VEXG_EXPORT std::ostream& operator<<(std::ostream&,
-                                              const RasterBandHistogram<std::uint32_t>&);
-template VEXG_EXPORT std::istream& operator>>(std::istream&, RasterBandHistogram<std::uint32_t>&);
-template VEXG_EXPORT bool operator==(const RasterBandHistogram<std::uint32_t>&,
-                                     const RasterBandHistogram<std::uint32_t>&);
-template struct VEXG_EXPORT RasterBandStats<std::int32_t>;
-template VEXG_EXPORT std::ostream& operator<<(std::ostream&, const RasterBandStats<std::int32_t>&);
-template VEXG_EXPORT std::istream& operator>>(std::istream&, RasterBandStats<std::int32_t>&);
-template VEXG_EXPORT std::ostream& operator<<(std::ostream&,
-                                              const RasterBandHistogram<std::int32_t>&);
-template VEXG_EXPORT std::istream& operator>>(std::istream&, RasterBandHistogram<std::int32_t>&);
-template VEXG_EXPORT bool operator==(const RasterBandHistogram<std::int32_t>&,
-                                     const RasterBandHistogram<std::int32_t>&);
-template struct VEXG_EXPORT RasterBandStats<float>;
-template VEXG_EXPORT std::ostream& operator<<(std::ostream&, const RasterBandStats<float>&);
-template VEXG_EXPORT std::istream& operator>>(std::istream&, RasterBandStats<float>&);
-template VEXG_EXPORT std::ostream& operator<<(std::ostream&, const RasterBandHistogram<float>&);
-template VEXG_EXPORT std::istream& operator>>(std::istream&, RasterBandHistogram<float>&);
-template VEXG_EXPORT bool operator==(const RasterBandHistogram<float>&,
-                                     const RasterBandHistogram<float>&);
-template struct VEXG_EXPORT RasterBandStats<double>;
-template VEXG_EXPORT std::ostream& operator<<(std::ostream&, const RasterBandStats<double>&);
-template VEXG_EXPORT std::istream& operator>>(std::istream&, RasterBandStats<double>&);
-template VEXG_EXPORT std::ostream& operator<<(std::ostream&, const RasterBandHistogram<double>&);
-template VEXG_EXPORT std::istream& operator>>(std::istream&, RasterBandHistogram<double>&);
-template VEXG_EXPORT bool operator==(const RasterBandHistogram<double>&,
-                                     const RasterBandHistogram<double>&);
-template struct VEXG_EXPORT RasterBandStats<std::uint64_t>;
-template VEXG_EXPORT std::ostream& operator<<(std::ostream&, const RasterBandStats<std::uint64_t>&);
-template VEXG_EXPORT std::istream& operator>>(std::istream&, RasterBandStats<std::uint64_t>&);
-template VEXG_EXPORT std::ostream& operator<<(std::ostream&,
-                                              const RasterBandHistogram<std::uint64_t>&);
-template VEXG_EXPORT std::istream& operator>>(std::istream&, RasterBandHistogram<std::uint64_t>&);
-template VEXG_EXPORT bool operator==(const RasterBandHistogram<std::uint64_t>&,
-                                     const RasterBandHistogram<std::uint64_t>&);
-template struct VEXG_EXPORT RasterBandStats<std::int64_t>;
-template VEXG_EXPORT std::ostream& operator<<(std::ostream&, const RasterBandStats<std::int64_t>&);
-template VEXG_EXPORT std::istream& operator>>(std::istream&, RasterBandStats<std::int64_t>&);
-template VEXG_EXPORT std::ostream& operator<<(std::ostream&,
-                                              const RasterBandHistogram<std::int64_t>&);
-template VEXG_EXPORT std::istream& operator>>(std::istream&, RasterBandHistogram<std::int64_t>&);
-template VEXG_EXPORT bool operator==(const RasterBandHistogram<std::int64_t>&,
-                                     const RasterBandHistogram<std::int64_t>&);
-template VEXG_EXPORT bool operator==(const RasterBandHistogram<Complex<float>>&,
-                                     const RasterBandHistogram<Complex<float>>&);
-template VEXG_EXPORT bool operator==(const RasterBandHistogram<Complex<double>>&,
-                                     const RasterBandHistogram<Complex<double>>&);
+#define STATS_AND_TEXT_FORMS(T)                                                                \
+  template struct VEXG_EXPORT RasterBandStats<T>;                                              \
+  template VEXG_EXPORT std::ostream& operator<<(std::ostream&, const RasterBandStats<T>&);     \
+  template VEXG_EXPORT std::istream& operator>>(std::istream&, RasterBandStats<T>&);           \
+  template VEXG_EXPORT std::ostream& operator<<(std::ostream&, const RasterBandHistogram<T>&); \
+  template VEXG_EXPORT std::istream& operator>>(std::istream&, RasterBandHistogram<T>&);
+VEXG_FOR(TEN, STATS_AND_TEXT_FORMS);
+
+#define COMPARISON(T)                                                 \
+  template VEXG_EXPORT bool operator==(const RasterBandHistogram<T>&, \
+                                       const RasterBandHistogram<T>&);
+VEXG_FOR(TWELVE, COMPARISON);
 
 }  // namespace lumo

@@ -4,9 +4,8 @@
 #include "foundation/fault.h"
 #include "raster/block_strides.h"
 #include "raster/raster_command.h"
-#include "raster/raster_tasks.h"
+#include "raster/tile_functions.h"
 #include "raster/valid_pixels.h"
-#include "tasks/process_builder.h"
 
 namespace lumo {
 namespace {
@@ -23,81 +22,21 @@ std::span<const EnumWord<InvalidPixels>> WordsOf(InvalidPixels) {
   return kWords;
 }
 
-/// The orders of the middle stage of a copy, and what it found.
+/// Puts the values of `fill` where the pixels of a band, which has one, are not valid.
 template <typename T>
-struct CopyPlan : Object {
-  explicit CopyPlan(unsigned bands) : valid(bands), fill(bands) {}
-
-  ValidPixels valid;
-  std::vector<std::optional<T>> fill;  ///< by band, for pixels that are not valid
-};
-
-/// Counts the valid pixels of the tile in slot 0, and fills the others. Setup arguments: the plan.
-template <typename T>
-class CheckPixelsTask final : public SequentialTask {
- public:
-  explicit CheckPixelsTask(ArgList& setup)
-      : SequentialTask("CheckPixelsTask"), plan_(dynamic_cast<CopyPlan<T>*>(setup.Get(0).Get())) {
-    if (plan_ == nullptr) SetErrorState(TaskErrorBadParams());
-  }
-
-  bool Execute(ArgList& args) override {
-    const TilePtr<T> tile(args.Get(0));
-    if (plan_ == nullptr || !tile || !tile->IsValid()) {
-      SetErrorState(TaskErrorBadArgs());
-      return false;
-    }
-    plan_->valid.Add(*tile);
-    Fill(*tile);
-    return true;
-  }
-
- private:
-  void Fill(Tile<T>& tile) const {
-    const BlockStrides strides(tile.Order(), tile.Width(), tile.Height(), tile.Bands());
-    for (std::size_t band = 0; band < plan_->fill.size(); ++band) {
-      if (!plan_->fill[band]) continue;
-      for (std::size_t line = 0; line < tile.Height(); ++line) {
-        std::size_t at = band * strides.band + line * strides.line;
-        for (unsigned x = 0; x < tile.Width(); ++x, at += strides.pixel) {
-          const bool isValid = (tile.StateArray().GetData()[at] & PixelValueState::NotValid) == 0;
-          if (!isValid) tile.PixelArray().GetData()[at] = *plan_->fill[band];
-        }
+void Fill(Tile<T>& tile, const std::vector<std::optional<T>>& fill) {
+  const BlockStrides strides(tile.Order(), tile.Width(), tile.Height(), tile.Bands());
+  for (std::size_t band = 0; band < fill.size(); ++band) {
+    if (!fill[band]) continue;
+    for (std::size_t line = 0; line < tile.Height(); ++line) {
+      std::size_t at = band * strides.band + line * strides.line;
+      for (unsigned x = 0; x < tile.Width(); ++x, at += strides.pixel) {
+        const bool isValid = (tile.StateArray().GetData()[at] & PixelValueState::NotValid) == 0;
+        if (!isValid) tile.PixelArray().GetData()[at] = *fill[band];
       }
     }
   }
-
-  CopyPlan<T>* plan_;  // the process holds it
-};
-
-/// Copies what one iterator reads to where another writes, on the same grid.
-template <typename T>
-class CopyProcess final : public ProcessBuilder<Process> {
- public:
-  CopyProcess(const RasterIteratorPtr<T>& source, const Pointer<CopyPlan<T>>& plan,
-              const RasterIteratorPtr<T>& target, const IPC& ipc)
-      : ProcessBuilder("CopyProcess", ipc) {
-    Process& process = GetPipeline();
-    const ArgID sourceId = process.TakeSetupArg();
-    const ArgID planId = process.TakeSetupArg();
-    const ArgID targetId = process.TakeSetupArg();
-    const ArgID tile = process.TakeTokenArg();
-    const bool placed =
-        process.AddTask(0, TaskDescriptor(&read_, ArgIDs({tile}), ArgIDs({sourceId}))) &&
-        process.AddTask(1, TaskDescriptor(&check_, ArgIDs({tile}), ArgIDs({planId}))) &&
-        process.AddTask(2, TaskDescriptor(&write_, ArgIDs({tile}), ArgIDs({targetId})));
-    SetArg(sourceId, source);
-    SetArg(planId, plan);
-    SetArg(targetId, target);
-    process.SetTotalTokens(std::uint64_t{source->Columns()} * source->Rows());
-    if (placed) SetBuilt();
-  }
-
- private:
-  ManagedTask<RasterReadTask<T>> read_;
-  ManagedTask<CheckPixelsTask<T>> check_;
-  ManagedTask<RasterWriteTask<T>> write_;
-};
+}
 
 const CommandDeclaration kCopy{
     "CopyRasterCommand",
@@ -142,17 +81,20 @@ class CopyRasterCommand final : public RasterCommand {
   template <typename T>
   bool Copied(const RasterPtr<T>& source, const RasterPtr<T>& target,
               const Array<unsigned>& bands) {
-    const Pointer<CopyPlan<T>> plan(new CopyPlan<T>(bands.GetCount()));
+    ValidPixels valid(bands.GetCount());
+    std::vector<std::optional<T>> fill(bands.GetCount());  // for pixels that are not valid
     const bool fills =
         HasInput("Invalid") && Read<InvalidPixels>("Invalid") != InvalidPixels::kTold;
     for (unsigned band = 0; fills && band < bands.GetCount(); ++band) {
-      if (target->HasNoDataValue(band)) plan->fill[band] = target->NoDataValue(band);
+      if (target->HasNoDataValue(band)) fill[band] = target->NoDataValue(band);
     }
     const RasterIteratorPtr<T> from(new RasterIteratorSmart<T>(source, bands));
-    const RasterIteratorPtr<T> to(new RasterIteratorFromTemplate<T>(target, *from));
-    CopyProcess<T> process(from, plan, to, GetIPC());
-    if (!process.RunProcess(process.kHere)) return false;
-    Write("ValidPixels", plan->valid.Get());
+    const auto check = [&](Tile<T>& tile) {
+      valid.Add(tile);
+      Fill(tile, fill);
+    };
+    if (!CopyTiles("CopyProcess", TilesBy(from), target, check, GetIPC())) return false;
+    Write("ValidPixels", valid.Get());
     return true;
   }
 };

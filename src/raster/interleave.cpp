@@ -6,7 +6,7 @@
 #include <cstring>
 #include <utility>
 
-#include "raster/interleave_impl.h"
+#include "raster/interleave_body.h"
 
 namespace lumo {
 namespace {

@@ -94,17 +94,6 @@ void NoDataMarker<T>::MarkPattern(std::uint64_t first, std::uint64_t count, cons
   }
 }
 
-template class VEXG_EXPORT NoDataMarker<std::uint8_t>;
-template class VEXG_EXPORT NoDataMarker<std::int8_t>;
-template class VEXG_EXPORT NoDataMarker<std::uint16_t>;
-template class VEXG_EXPORT NoDataMarker<std::int16_t>;
-template class VEXG_EXPORT NoDataMarker<std::uint32_t>;
-template class VEXG_EXPORT NoDataMarker<std::int32_t>;
-template class VEXG_EXPORT NoDataMarker<float>;
-template class VEXG_EXPORT NoDataMarker<double>;
-template class VEXG_EXPORT NoDataMarker<std::uint64_t>;
-template class VEXG_EXPORT NoDataMarker<std::int64_t>;
-template class VEXG_EXPORT NoDataMarker<Complex<float>>;
-template class VEXG_EXPORT NoDataMarker<Complex<double>>;
+VEXG_INSTANCES(TWELVE, VEXG_EXPORT NoDataMarker);
 
 }  // namespace lumo

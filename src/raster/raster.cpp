@@ -4,7 +4,7 @@
 #include <string>
 
 #include "foundation/type_code.h"
-#include "raster/raster_view_impl.h"
+#include "raster/raster_view_body.h"
 
 namespace lumo {
 
@@ -25,30 +25,7 @@ template <typename T>
 const unsigned Raster<T>::TypeCode =
     GloballyUniqueObjectTypeCode(String("Raster<" + DataTypeName(kDataTypeOf<T>).ToUTF8() + ">"));
 
-template class Raster<std::uint8_t>;
-template class Raster<std::int8_t>;
-template class Raster<std::uint16_t>;
-template class Raster<std::int16_t>;
-template class Raster<std::uint32_t>;
-template class Raster<std::int32_t>;
-template class Raster<float>;
-template class Raster<double>;
-template class Raster<std::uint64_t>;
-template class Raster<std::int64_t>;
-template class Raster<Complex<float>>;
-template class Raster<Complex<double>>;
-
-template class RasterView<std::uint8_t>;
-template class RasterView<std::int8_t>;
-template class RasterView<std::uint16_t>;
-template class RasterView<std::int16_t>;
-template class RasterView<std::uint32_t>;
-template class RasterView<std::int32_t>;
-template class RasterView<float>;
-template class RasterView<double>;
-template class RasterView<std::uint64_t>;
-template class RasterView<std::int64_t>;
-template class RasterView<Complex<float>>;
-template class RasterView<Complex<double>>;
+VEXG_INSTANCES(TWELVE, Raster);
+VEXG_INSTANCES(TWELVE, RasterView);
 
 }  // namespace lumo

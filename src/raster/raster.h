@@ -177,17 +177,6 @@ AsyncPtr Raster<T>::CountHistogram(const HistogramRequest<T>& request, const IPC
                                : HistogramAllBands(lower, upper, binCount, sign, ipc);
 }
 
-extern template class VEXG_EXPORT Raster<std::uint8_t>;
-extern template class VEXG_EXPORT Raster<std::int8_t>;
-extern template class VEXG_EXPORT Raster<std::uint16_t>;
-extern template class VEXG_EXPORT Raster<std::int16_t>;
-extern template class VEXG_EXPORT Raster<std::uint32_t>;
-extern template class VEXG_EXPORT Raster<std::int32_t>;
-extern template class VEXG_EXPORT Raster<float>;
-extern template class VEXG_EXPORT Raster<double>;
-extern template class VEXG_EXPORT Raster<std::uint64_t>;
-extern template class VEXG_EXPORT Raster<std::int64_t>;
-extern template class VEXG_EXPORT Raster<Complex<float>>;
-extern template class VEXG_EXPORT Raster<Complex<double>>;
+VEXG_EXTERN(TWELVE, Raster);
 
 }  // namespace lumo

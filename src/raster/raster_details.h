@@ -21,6 +21,8 @@
 //   CoordSys                 WKT of a system of the Grid, the Points, or of nothing
 //   Points/<n>               a ground control point: pixel, line, x, y, z; from the upper left
 //   corner
+//   FileState                of a pyramid file: the bytes and the time of change, in ns since 1970,
+//                            of the file of the raster that it was built from
 //
 // A format's reader enters them, views choose and move them, a format's writer keeps them.
 

@@ -4,7 +4,7 @@
 
 #include "foundation/type_code.h"
 #include "raster/raster_def.h"
-#include "raster/raster_iterator_impl.h"
+#include "raster/raster_iterator_body.h"
 
 namespace lumo {
 namespace {
@@ -172,17 +172,6 @@ template <typename T>
 const unsigned RasterIterator<T>::TypeCode = GloballyUniqueObjectTypeCode(
     String("RasterIterator<" + DataTypeName(kDataTypeOf<T>).ToUTF8() + ">"));
 
-template class RasterIterator<std::uint8_t>;
-template class RasterIterator<std::int8_t>;
-template class RasterIterator<std::uint16_t>;
-template class RasterIterator<std::int16_t>;
-template class RasterIterator<std::uint32_t>;
-template class RasterIterator<std::int32_t>;
-template class RasterIterator<float>;
-template class RasterIterator<double>;
-template class RasterIterator<std::uint64_t>;
-template class RasterIterator<std::int64_t>;
-template class RasterIterator<Complex<float>>;
-template class RasterIterator<Complex<double>>;
+VEXG_INSTANCES(TWELVE, RasterIterator);
 
 }  // namespace lumo

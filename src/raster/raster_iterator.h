@@ -260,17 +260,6 @@ class RasterIteratorFromTemplateSpatial final : public RasterIterator<T> {
   }
 };
 
-extern template class VEXG_EXPORT RasterIterator<std::uint8_t>;
-extern template class VEXG_EXPORT RasterIterator<std::int8_t>;
-extern template class VEXG_EXPORT RasterIterator<std::uint16_t>;
-extern template class VEXG_EXPORT RasterIterator<std::int16_t>;
-extern template class VEXG_EXPORT RasterIterator<std::uint32_t>;
-extern template class VEXG_EXPORT RasterIterator<std::int32_t>;
-extern template class VEXG_EXPORT RasterIterator<float>;
-extern template class VEXG_EXPORT RasterIterator<double>;
-extern template class VEXG_EXPORT RasterIterator<std::uint64_t>;
-extern template class VEXG_EXPORT RasterIterator<std::int64_t>;
-extern template class VEXG_EXPORT RasterIterator<Complex<float>>;
-extern template class VEXG_EXPORT RasterIterator<Complex<double>>;
+VEXG_EXTERN(TWELVE, RasterIterator);
 
 }  // namespace lumo

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <mutex>
 #include <vector>
 
 #include "raster/raster_iterator.h"
@@ -8,8 +9,8 @@
 namespace lumo {
 
 /// Tiles that are used again: a tile is free when nobody but the pool holds it any more. It keeps
-/// as many as were in use at once, which in a process are the tokens in flight. Threads: one user;
-/// the tiles may be let go on any thread.
+/// as many as were in use at once, which in a process are the tokens in flight. Threads: tiles may
+/// be taken, and let go, on any.
 template <typename T>
 class TilePool {
  public:
@@ -17,7 +18,8 @@ class TilePool {
   TilePtr<T> Take();
 
  private:
-  std::vector<TilePtr<T>> tiles_;
+  std::mutex mutex_;
+  std::vector<TilePtr<T>> tiles_;  // under mutex_
 };
 
 /// The first stage of a process over a raster: reads the tiles row by row, left to right, and gives
@@ -48,43 +50,8 @@ class RasterWriteTask final : public SequentialTask {
   RasterIteratorPtr<T> iterator_;
 };
 
-extern template class VEXG_EXPORT TilePool<std::uint8_t>;
-extern template class VEXG_EXPORT TilePool<std::int8_t>;
-extern template class VEXG_EXPORT TilePool<std::uint16_t>;
-extern template class VEXG_EXPORT TilePool<std::int16_t>;
-extern template class VEXG_EXPORT TilePool<std::uint32_t>;
-extern template class VEXG_EXPORT TilePool<std::int32_t>;
-extern template class VEXG_EXPORT TilePool<float>;
-extern template class VEXG_EXPORT TilePool<double>;
-extern template class VEXG_EXPORT TilePool<std::uint64_t>;
-extern template class VEXG_EXPORT TilePool<std::int64_t>;
-extern template class VEXG_EXPORT TilePool<Complex<float>>;
-extern template class VEXG_EXPORT TilePool<Complex<double>>;
-
-extern template class VEXG_EXPORT RasterReadTask<std::uint8_t>;
-extern template class VEXG_EXPORT RasterReadTask<std::int8_t>;
-extern template class VEXG_EXPORT RasterReadTask<std::uint16_t>;
-extern template class VEXG_EXPORT RasterReadTask<std::int16_t>;
-extern template class VEXG_EXPORT RasterReadTask<std::uint32_t>;
-extern template class VEXG_EXPORT RasterReadTask<std::int32_t>;
-extern template class VEXG_EXPORT RasterReadTask<float>;
-extern template class VEXG_EXPORT RasterReadTask<double>;
-extern template class VEXG_EXPORT RasterReadTask<std::uint64_t>;
-extern template class VEXG_EXPORT RasterReadTask<std::int64_t>;
-extern template class VEXG_EXPORT RasterReadTask<Complex<float>>;
-extern template class VEXG_EXPORT RasterReadTask<Complex<double>>;
-
-extern template class VEXG_EXPORT RasterWriteTask<std::uint8_t>;
-extern template class VEXG_EXPORT RasterWriteTask<std::int8_t>;
-extern template class VEXG_EXPORT RasterWriteTask<std::uint16_t>;
-extern template class VEXG_EXPORT RasterWriteTask<std::int16_t>;
-extern template class VEXG_EXPORT RasterWriteTask<std::uint32_t>;
-extern template class VEXG_EXPORT RasterWriteTask<std::int32_t>;
-extern template class VEXG_EXPORT RasterWriteTask<float>;
-extern template class VEXG_EXPORT RasterWriteTask<double>;
-extern template class VEXG_EXPORT RasterWriteTask<std::uint64_t>;
-extern template class VEXG_EXPORT RasterWriteTask<std::int64_t>;
-extern template class VEXG_EXPORT RasterWriteTask<Complex<float>>;
-extern template class VEXG_EXPORT RasterWriteTask<Complex<double>>;
+VEXG_EXTERN(TWELVE, TilePool);
+VEXG_EXTERN(TWELVE, RasterReadTask);
+VEXG_EXTERN(TWELVE, RasterWriteTask);
 
 }  // namespace lumo

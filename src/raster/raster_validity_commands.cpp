@@ -5,9 +5,10 @@
 #include "raster/raster_command.h"
 #include "raster/raster_def.h"
 #include "raster/raster_details.h"
-#include "raster/raster_tasks.h"
+#include "raster/tile_functions.h"
 #include "raster/valid_pixels.h"
 #include "raster/value_use.h"
+#include "tasks/scratch_pool.h"
 
 namespace lumo {
 namespace {
@@ -43,19 +44,17 @@ class QueryRasterValidityCommand final : public RasterCommand {
   template <typename T>
   bool Count(const RasterPtr<T>& raster, bool wantsValues) {
     if (!raster) return false;
-    RasterIteratorSmart<T> iterator(raster, AllBands(*raster));
-    if (!iterator.IsValid()) return false;
     ValidPixels counts(raster->Bands());
+    ScratchPool<std::vector<ValueUse<T>>> uses;  // of each thread
+    const auto look = [&](const Tile<T>& tile) {
+      counts.Add(tile);
+      if (wantsValues) NoteValues(tile, *uses.Borrow(tile.Bands()));
+    };
+    const RasterIteratorPtr<T> tiles(new RasterIteratorSmart<T>(raster, AllBands(*raster)));
+    if (!ForEachTile("QueryRasterValidity", TilesBy(tiles), look, GetIPC())) return false;
     std::vector<ValueUse<T>> use(raster->Bands());
-    Tile<T> tile;
-    const double rows = iterator.Rows();
-    for (unsigned row = 0; row < iterator.Rows(); ++row) {
-      for (unsigned column = 0; column < iterator.Columns(); ++column) {
-        if (GetIPC().abort->IsSet() || !iterator.Read(column, row, tile)) return false;
-        counts.Add(tile);
-        if (wantsValues) NoteValues(tile, use);
-      }
-      GetIPC().progress->Update((row + 1) / rows);
+    for (const auto& ofThread : uses.TakeAll()) {
+      for (std::size_t band = 0; band < use.size(); ++band) use[band].Join((*ofThread)[band]);
     }
     Write("ValidPixels", counts.Get());
     WriteFreeValues(use, wantsValues);

@@ -84,17 +84,6 @@ class RasterView : public Raster<T> {
   RasterPtr<T> parent_;
 };
 
-extern template class VEXG_EXPORT RasterView<std::uint8_t>;
-extern template class VEXG_EXPORT RasterView<std::int8_t>;
-extern template class VEXG_EXPORT RasterView<std::uint16_t>;
-extern template class VEXG_EXPORT RasterView<std::int16_t>;
-extern template class VEXG_EXPORT RasterView<std::uint32_t>;
-extern template class VEXG_EXPORT RasterView<std::int32_t>;
-extern template class VEXG_EXPORT RasterView<float>;
-extern template class VEXG_EXPORT RasterView<double>;
-extern template class VEXG_EXPORT RasterView<std::uint64_t>;
-extern template class VEXG_EXPORT RasterView<std::int64_t>;
-extern template class VEXG_EXPORT RasterView<Complex<float>>;
-extern template class VEXG_EXPORT RasterView<Complex<double>>;
+VEXG_EXTERN(TWELVE, RasterView);
 
 }  // namespace lumo

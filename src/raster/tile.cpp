@@ -2,7 +2,7 @@
 
 #include "foundation/type_code.h"
 #include "raster/interleave.h"
-#include "raster/tile_impl.h"
+#include "raster/tile_body.h"
 
 namespace lumo {
 namespace {
@@ -38,23 +38,25 @@ bool BasicTile::IsA(unsigned typeCode) const {
 
 bool BasicTile::Resize(unsigned width, unsigned height, unsigned bands, unsigned left,
                        unsigned right, unsigned top, unsigned bottom) {
-  return Size({width, height, bands, left, right, top, bottom, 0});
+  return Resize(TileDimensions{width, height, bands, left, right, top, bottom, 0});
 }
 
 bool BasicTile::Resize(unsigned width, unsigned height, unsigned bands, unsigned border) {
-  return Size({width, height, bands, border, border, border, border, 0});
+  return Resize(TileDimensions{width, height, bands, border, border, border, border, 0});
 }
 
 bool BasicTile::Resize(unsigned width, unsigned height, unsigned bands) {
-  return Size({width, height, bands, 0, 0, 0, 0, 0});
+  return Resize(TileDimensions{width, height, bands});
 }
 
 bool BasicTile::Resize(const TileDimensions& dimensions) {
-  return Size(dimensions);
+  if (!Size(dimensions, Interleave::BIP)) return false;
+  std::ranges::fill(state_, static_cast<unsigned char>(State::Valid));
+  return true;
 }
 
-bool BasicTile::ResizeInOrder(unsigned width, unsigned height, unsigned bands, Interleave order) {
-  return Size({width, height, bands}, order);
+bool BasicTile::ResizeForOverwrite(const TileDimensions& dimensions, Interleave order) {
+  return Size(dimensions, order);
 }
 
 bool BasicTile::Size(const TileDimensions& dimensions, Interleave order) {
@@ -66,10 +68,7 @@ bool BasicTile::Size(const TileDimensions& dimensions, Interleave order) {
                         FullWidth() <= kMost && FullHeight() <= kMost;
   const ArrayDims dims = BlockDims(order, static_cast<unsigned>(FullWidth()),
                                    static_cast<unsigned>(FullHeight()), dimensions.bands);
-  if (possible && ResizePixels(dims) && state_.Resize(dims)) {
-    std::ranges::fill(state_, static_cast<unsigned char>(State::Valid));
-    return true;
-  }
+  if (possible && ResizePixels(dims) && state_.Resize(dims)) return true;
   ResizePixels(ArrayDims());
   state_.Resize(ArrayDims());
   origin_ = {};
@@ -155,28 +154,8 @@ template <typename T>
 const unsigned Tile<T>::TypeCode =
     GloballyUniqueObjectTypeCode(String("Tile<" + DataTypeName(kDataTypeOf<T>).ToUTF8() + ">"));
 
-template class Tile<std::uint8_t>;
-template class Tile<std::int8_t>;
-template class Tile<std::uint16_t>;
-template class Tile<std::int16_t>;
-template class Tile<std::uint32_t>;
-template class Tile<std::int32_t>;
-template class Tile<float>;
-template class Tile<double>;
-template class Tile<std::uint64_t>;
-template class Tile<std::int64_t>;
-template class Tile<Complex<float>>;
-template class Tile<Complex<double>>;
-
-template class TileFromTemplate<std::uint8_t>;
-template class TileFromTemplate<std::int8_t>;
-template class TileFromTemplate<std::uint16_t>;
-template class TileFromTemplate<std::int16_t>;
-template class TileFromTemplate<std::uint32_t>;
-template class TileFromTemplate<std::int32_t>;
-template class TileFromTemplate<float>;
-template class TileFromTemplate<double>;
-
+VEXG_INSTANCES(TWELVE, Tile);
+VEXG_INSTANCES(EIGHT, TileFromTemplate);
 template class TileFromTemplateBorder<double>;
 
 }  // namespace lumo

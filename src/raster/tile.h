@@ -17,7 +17,7 @@ using TilePosition = std::pair<unsigned, unsigned>;
 /// from Width() and Height() on. Access by coordinates has no bounds check.
 ///
 /// An operation that reads a whole raster once may ask for tiles in another order of the axes, see
-/// ResizeInOrder; it then goes by the arrays, and the access by coordinates is not for it.
+/// ResizeForOverwrite; it then goes by the arrays, and the access by coordinates is not for it.
 ///
 /// Threads: a tile belongs to one thread at a time; parts of one may be worked on in parallel.
 /// Failure: a tile that could not be sized is empty, with ObjectErrorNotConstructed stored.
@@ -51,9 +51,12 @@ class VEXG_EXPORT BasicTile : public Object {
   virtual bool Resize(unsigned width, unsigned height, unsigned bands);
   virtual bool Resize(const TileDimensions& dimensions);
   virtual TileDimensions Dimensions() const { return dimensions_; }
-  /// Sizes a tile without borders whose arrays are in the shape of BlockDims of `order`.
-  bool ResizeInOrder(unsigned width, unsigned height, unsigned bands, Interleave order);
-  /// The order of the axes: BIP, unless ResizeInOrder sized the tile last.
+  /// Sizes a tile that is written whole next: its pixels and its states keep whatever the storage
+  /// holds.
+  /// @param order  of the axes: the arrays are in the shape of BlockDims; BIP where there are
+  /// borders.
+  bool ResizeForOverwrite(const TileDimensions& dimensions, Interleave order = Interleave::BIP);
+  /// The order of the axes: BIP, unless ResizeForOverwrite sized the tile last.
   Interleave Order() const { return order_; }
 
   // For each bit of the state: set in every band (true without bands), in some band, in one band;
@@ -105,7 +108,7 @@ class VEXG_EXPORT BasicTile : public Object {
   virtual bool ResizePixels(const ArrayDims& dims) = 0;
 
  private:
-  bool Size(const TileDimensions& dimensions, Interleave order = Interleave::BIP);
+  bool Size(const TileDimensions& dimensions, Interleave order);
 
   TilePosition origin_;
   TilePosition index_;
@@ -167,28 +170,8 @@ class TileFromTemplateBorder final : public Tile<T> {
                          unsigned bottom);
 };
 
-extern template class VEXG_EXPORT Tile<std::uint8_t>;
-extern template class VEXG_EXPORT Tile<std::int8_t>;
-extern template class VEXG_EXPORT Tile<std::uint16_t>;
-extern template class VEXG_EXPORT Tile<std::int16_t>;
-extern template class VEXG_EXPORT Tile<std::uint32_t>;
-extern template class VEXG_EXPORT Tile<std::int32_t>;
-extern template class VEXG_EXPORT Tile<float>;
-extern template class VEXG_EXPORT Tile<double>;
-extern template class VEXG_EXPORT Tile<std::uint64_t>;
-extern template class VEXG_EXPORT Tile<std::int64_t>;
-extern template class VEXG_EXPORT Tile<Complex<float>>;
-extern template class VEXG_EXPORT Tile<Complex<double>>;
-
-extern template class VEXG_EXPORT TileFromTemplate<std::uint8_t>;
-extern template class VEXG_EXPORT TileFromTemplate<std::int8_t>;
-extern template class VEXG_EXPORT TileFromTemplate<std::uint16_t>;
-extern template class VEXG_EXPORT TileFromTemplate<std::int16_t>;
-extern template class VEXG_EXPORT TileFromTemplate<std::uint32_t>;
-extern template class VEXG_EXPORT TileFromTemplate<std::int32_t>;
-extern template class VEXG_EXPORT TileFromTemplate<float>;
-extern template class VEXG_EXPORT TileFromTemplate<double>;
-
+VEXG_EXTERN(TWELVE, Tile);
+VEXG_EXTERN(EIGHT, TileFromTemplate);
 extern template class VEXG_EXPORT TileFromTemplateBorder<double>;
 
 }  // namespace lumo

@@ -3,6 +3,7 @@
 #include <algorithm>
 
 #include "raster/block_strides.h"
+#include "raster/pixel_states.h"
 
 namespace lumo {
 
@@ -12,21 +13,22 @@ void ValidPixels::Add(const BasicTile& tile) {
   const unsigned char* const states = tile.StateArray().GetData();
   const std::size_t count = tile.StateArray().GetCount();
   const std::size_t pixels = count / bands;
-  unsigned char any = 0;
-  for (std::size_t i = 0; i < count; ++i) any |= states[i];
-  const bool allValid = (any & PixelValueState::NotValid) == 0;
-  if (allValid) {
+  if (AllValid(states, count)) {
+    const std::lock_guard lock(mutex_);
     for (std::uint64_t& band : counts_) band += pixels;
     return;
   }
   const BlockStrides strides(tile.Order(), tile.Width(), tile.Height(), bands);
   for (std::size_t band = 0; band < bands; ++band) {
+    std::uint64_t valid = 0;
     for (std::size_t line = 0; line < tile.Height(); ++line) {
       const unsigned char* state = states + band * strides.band + line * strides.line;
       for (unsigned x = 0; x < tile.Width(); ++x, state += strides.pixel) {
-        counts_[band] += (*state & PixelValueState::NotValid) == 0 ? 1 : 0;
+        valid += (*state & PixelValueState::NotValid) == 0 ? 1 : 0;
       }
     }
+    const std::lock_guard lock(mutex_);
+    counts_[band] += valid;
   }
 }
 

@@ -1,6 +1,7 @@
 #pragma once
 
 #include <cstdint>
+#include <mutex>
 #include <vector>
 
 #include "raster/raster.h"
@@ -8,7 +9,7 @@
 
 namespace lumo {
 
-/// Counts the valid pixels of each band, tile by tile.
+/// Counts the valid pixels of each band, tile by tile. Threads: Add may be called on many.
 class VEXG_EXPORT ValidPixels {
  public:
   explicit ValidPixels(unsigned bands) : counts_(bands) {}
@@ -16,10 +17,12 @@ class VEXG_EXPORT ValidPixels {
   /// Adds a tile of all bands, without borders.
   void Add(const BasicTile& tile);
 
+  /// The counts, when all tiles are added.
   Array<std::uint64_t> Get() const;
 
  private:
-  std::vector<std::uint64_t> counts_;
+  std::mutex mutex_;
+  std::vector<std::uint64_t> counts_;  // under mutex_
 };
 
 /// The numbers of all bands of a raster.

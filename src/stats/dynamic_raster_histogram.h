@@ -95,15 +95,6 @@ class DynamicRasterHistogram<Complex<T>> : public ErrorState {
 template <typename T>
 using DynamicRasterHistogramPtr = Pointer<DynamicRasterHistogram<T>>;
 
-extern template class VEXG_EXPORT DynamicRasterHistogram<std::uint8_t>;
-extern template class VEXG_EXPORT DynamicRasterHistogram<std::int8_t>;
-extern template class VEXG_EXPORT DynamicRasterHistogram<std::uint16_t>;
-extern template class VEXG_EXPORT DynamicRasterHistogram<std::int16_t>;
-extern template class VEXG_EXPORT DynamicRasterHistogram<std::uint32_t>;
-extern template class VEXG_EXPORT DynamicRasterHistogram<std::int32_t>;
-extern template class VEXG_EXPORT DynamicRasterHistogram<float>;
-extern template class VEXG_EXPORT DynamicRasterHistogram<double>;
-extern template class VEXG_EXPORT DynamicRasterHistogram<std::uint64_t>;
-extern template class VEXG_EXPORT DynamicRasterHistogram<std::int64_t>;
+VEXG_EXTERN(TEN, DynamicRasterHistogram);
 
 }  // namespace lumo

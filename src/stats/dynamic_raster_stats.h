@@ -119,15 +119,6 @@ class DynamicRasterStats<Complex<T>> : public ErrorState {
 template <typename T>
 using DynamicRasterStatsPtr = Pointer<DynamicRasterStats<T>>;
 
-extern template class VEXG_EXPORT DynamicRasterStats<std::uint8_t>;
-extern template class VEXG_EXPORT DynamicRasterStats<std::int8_t>;
-extern template class VEXG_EXPORT DynamicRasterStats<std::uint16_t>;
-extern template class VEXG_EXPORT DynamicRasterStats<std::int16_t>;
-extern template class VEXG_EXPORT DynamicRasterStats<std::uint32_t>;
-extern template class VEXG_EXPORT DynamicRasterStats<std::int32_t>;
-extern template class VEXG_EXPORT DynamicRasterStats<float>;
-extern template class VEXG_EXPORT DynamicRasterStats<double>;
-extern template class VEXG_EXPORT DynamicRasterStats<std::uint64_t>;
-extern template class VEXG_EXPORT DynamicRasterStats<std::int64_t>;
+VEXG_EXTERN(TEN, DynamicRasterStats);
 
 }  // namespace lumo

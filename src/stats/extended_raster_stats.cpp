@@ -1,5 +1,5 @@
 #include "foundation/type_code.h"
-#include "stats/extended_raster_stats_impl.h"
+#include "stats/extended_raster_stats_body.h"
 
 namespace lumo {
 
@@ -7,15 +7,6 @@ template <typename T>
 const unsigned ExtendedRasterStats<T>::TypeCode = GloballyUniqueObjectTypeCode(
     String("ExtendedRasterStats<" + DataTypeName(kDataTypeOf<T>).ToUTF8() + ">"));
 
-template class ExtendedRasterStats<std::uint8_t>;
-template class ExtendedRasterStats<std::int8_t>;
-template class ExtendedRasterStats<std::uint16_t>;
-template class ExtendedRasterStats<std::int16_t>;
-template class ExtendedRasterStats<std::uint32_t>;
-template class ExtendedRasterStats<std::int32_t>;
-template class ExtendedRasterStats<float>;
-template class ExtendedRasterStats<double>;
-template class ExtendedRasterStats<std::uint64_t>;
-template class ExtendedRasterStats<std::int64_t>;
+VEXG_INSTANCES(TEN, ExtendedRasterStats);
 
 }  // namespace lumo

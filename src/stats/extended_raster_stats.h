@@ -43,15 +43,6 @@ class ExtendedRasterStats : public RasterStats<T> {
 template <typename T>
 using ExtendedRasterStatsPtr = Pointer<ExtendedRasterStats<T>>;
 
-extern template class VEXG_EXPORT ExtendedRasterStats<std::uint8_t>;
-extern template class VEXG_EXPORT ExtendedRasterStats<std::int8_t>;
-extern template class VEXG_EXPORT ExtendedRasterStats<std::uint16_t>;
-extern template class VEXG_EXPORT ExtendedRasterStats<std::int16_t>;
-extern template class VEXG_EXPORT ExtendedRasterStats<std::uint32_t>;
-extern template class VEXG_EXPORT ExtendedRasterStats<std::int32_t>;
-extern template class VEXG_EXPORT ExtendedRasterStats<float>;
-extern template class VEXG_EXPORT ExtendedRasterStats<double>;
-extern template class VEXG_EXPORT ExtendedRasterStats<std::uint64_t>;
-extern template class VEXG_EXPORT ExtendedRasterStats<std::int64_t>;
+VEXG_EXTERN(TEN, ExtendedRasterStats);
 
 }  // namespace lumo

@@ -1,5 +1,5 @@
 #include "platform/vector_clones.h"
-#include "stats/histogram_counter_impl.h"
+#include "stats/histogram_counter_body.h"
 
 namespace lumo {
 namespace {
@@ -69,15 +69,6 @@ void FindBins(const HistogramBins<std::int64_t>& bins, const std::int64_t* value
   FindBinsOf(bins, values, count, out);
 }
 
-template class HistogramCounter<std::uint8_t>;
-template class HistogramCounter<std::int8_t>;
-template class HistogramCounter<std::uint16_t>;
-template class HistogramCounter<std::int16_t>;
-template class HistogramCounter<std::uint32_t>;
-template class HistogramCounter<std::int32_t>;
-template class HistogramCounter<float>;
-template class HistogramCounter<double>;
-template class HistogramCounter<std::uint64_t>;
-template class HistogramCounter<std::int64_t>;
+VEXG_INSTANCES(TEN, HistogramCounter);
 
 }  // namespace lumo

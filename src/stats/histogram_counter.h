@@ -40,15 +40,6 @@ class HistogramCounter {
   std::uint64_t pixels_ = 0;           // counted in the tables
 };
 
-extern template class VEXG_EXPORT HistogramCounter<std::uint8_t>;
-extern template class VEXG_EXPORT HistogramCounter<std::int8_t>;
-extern template class VEXG_EXPORT HistogramCounter<std::uint16_t>;
-extern template class VEXG_EXPORT HistogramCounter<std::int16_t>;
-extern template class VEXG_EXPORT HistogramCounter<std::uint32_t>;
-extern template class VEXG_EXPORT HistogramCounter<std::int32_t>;
-extern template class VEXG_EXPORT HistogramCounter<float>;
-extern template class VEXG_EXPORT HistogramCounter<double>;
-extern template class VEXG_EXPORT HistogramCounter<std::uint64_t>;
-extern template class VEXG_EXPORT HistogramCounter<std::int64_t>;
+VEXG_EXTERN(TEN, HistogramCounter);
 
 }  // namespace lumo

@@ -4,7 +4,6 @@
 #include <cstring>
 
 #include "platform/vector_clones.h"
-#include "raster/raster_enums.h"
 
 namespace lumo {
 namespace {
@@ -174,33 +173,6 @@ template <std::size_t kPlanes>
 }
 
 }  // namespace
-
-VEXG_VECTOR_CLONES
-bool AllValid(const unsigned char* states, std::size_t count) {
-  // In pieces, so that an early state that isn't valid ends it.
-  constexpr std::size_t kPiece = 4096;
-  for (std::size_t i = 0; i < count; i += kPiece) {
-    const std::size_t end = std::min(i + kPiece, count);
-    unsigned char any = 0;
-    for (std::size_t j = i; j < end; ++j) any |= states[j];
-    if ((any & PixelValueState::NotValid) != 0) return false;
-  }
-  return true;
-}
-
-VEXG_VECTOR_CLONES
-std::size_t MaskValid(const unsigned char* states, std::size_t count, unsigned char* mask) {
-  if (states == nullptr) {
-    std::fill_n(mask, count, static_cast<unsigned char>(0xFF));
-    return count;
-  }
-  for (std::size_t i = 0; i < count; ++i) {
-    mask[i] = (states[i] & PixelValueState::NotValid) == 0 ? 0xFF : 0;
-  }
-  std::uint32_t valid = 0;
-  for (std::size_t i = 0; i < count; ++i) valid += mask[i] & 1;
-  return valid;
-}
 
 VEXG_VECTOR_CLONES
 std::size_t MaskFinite(const float* values, std::size_t count, unsigned char* mask) {

@@ -38,12 +38,6 @@ struct PlaneSums<T, false> {
   T max = std::numeric_limits<T>::lowest();
 };
 
-/// True when none of the states has a bit that makes a pixel count for nothing.
-bool AllValid(const unsigned char* states, std::size_t count);
-
-/// Turns states into bytes of ones where a value is valid, else zeros. `states` may be null: all
-/// valid. @return how many are valid.
-std::size_t MaskValid(const unsigned char* states, std::size_t count, unsigned char* mask);
 /// Takes those out of a mask whose value isn't finite. @return how many are left.
 std::size_t MaskFinite(const float* values, std::size_t count, unsigned char* mask);
 std::size_t MaskFinite(const double* values, std::size_t count, unsigned char* mask);

@@ -4,20 +4,13 @@
 #include <memory>
 
 #include "raster/interleave.h"
-#include "raster/tile.h"
+#include "raster/pixel_states.h"
+#include "raster/tile_strips.h"
 #include "stats/plane_kernels.h"
 
 // A part of a tile as planes of its bands, whatever the order of the tile's axes.
 
 namespace lumo {
-
-/// A rectangle of a tile, in its pixels.
-struct TilePart {
-  unsigned rowFrom;
-  unsigned rowTo;  ///< behind the last
-  unsigned columnFrom;
-  unsigned columnTo;
-};
 
 /// Planes of the same pixels, one for each band.
 template <typename T>

@@ -91,15 +91,6 @@ class RasterHistogram : public Object {
 template <typename T>
 using RasterHistogramPtr = Pointer<RasterHistogram<T>>;
 
-extern template class VEXG_EXPORT RasterHistogram<std::uint8_t>;
-extern template class VEXG_EXPORT RasterHistogram<std::int8_t>;
-extern template class VEXG_EXPORT RasterHistogram<std::uint16_t>;
-extern template class VEXG_EXPORT RasterHistogram<std::int16_t>;
-extern template class VEXG_EXPORT RasterHistogram<std::uint32_t>;
-extern template class VEXG_EXPORT RasterHistogram<std::int32_t>;
-extern template class VEXG_EXPORT RasterHistogram<float>;
-extern template class VEXG_EXPORT RasterHistogram<double>;
-extern template class VEXG_EXPORT RasterHistogram<std::uint64_t>;
-extern template class VEXG_EXPORT RasterHistogram<std::int64_t>;
+VEXG_EXTERN(TEN, RasterHistogram);
 
 }  // namespace lumo

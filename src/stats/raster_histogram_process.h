@@ -1,42 +1,20 @@
 #pragma once
 
-#include <memory>
-#include <mutex>
-#include <vector>
-
-#include "raster/raster_tasks.h"
+#include "raster/tile_process.h"
 #include "stats/histogram_counter.h"
 #include "stats/raster_stats.h"
-#include "tasks/process_builder.h"
+#include "tasks/scratch_pool.h"
 
-// How histograms are counted: a process that reads a raster and counts its tiles one after the
-// other, each in parallel. T is one of TenTypes.
+// How histograms are counted: a process that reads a raster and counts several of its tiles at
+// once. T is one of TenTypes.
 
 namespace lumo {
-
-/// The counters of a run: each thread that counts borrows one, so that there are as many as count
-/// at once, and nothing is shared while counting.
-template <typename T>
-class HistogramCounterPool {
- public:
-  using Counter = std::unique_ptr<HistogramCounter<T>>;
-
-  /// A counter for the bins of `working`.
-  Counter Take(const RasterHistogram<T>& working);
-  void Return(Counter counter);
-  /// Adds what all have counted. @return false when the bins differ.
-  bool JoinInto(RasterHistogram<T>& working);
-
- private:
-  std::mutex lock_;
-  std::vector<Counter> counters_;
-};
 
 /// Counts the tile in slot 0, which stays. Setup arguments: the RasterHistogram<T> whose bins are
 /// counted. When the task goes, it holds what was counted, also of a run that did not come to its
 /// end.
 template <typename T>
-class RasterHistogramAccumulateTask final : public ConcurrentTask {
+class RasterHistogramAccumulateTask final : public StatelessTask {
  public:
   explicit RasterHistogramAccumulateTask(ArgList& setup);
   ~RasterHistogramAccumulateTask() override;
@@ -44,19 +22,15 @@ class RasterHistogramAccumulateTask final : public ConcurrentTask {
 
  private:
   RasterHistogramPtr<T> working_;
-  HistogramCounterPool<T> counters_;
+  ScratchPool<HistogramCounter<T>> counters_;  // nothing is shared while counting
 };
 
 /// Counts the histograms of what an iterator reads, whose bands are those of `working`.
 template <typename T>
-class RasterHistogramProcess final : public ProcessBuilder<Process> {
+class RasterHistogramProcess final : public TileProcess<> {
  public:
   RasterHistogramProcess(const RasterIteratorPtr<T>& iterator, const RasterHistogramPtr<T>& working,
                          const IPC& ipc = {});
-
- private:
-  ManagedTask<RasterReadTask<T>> read_;
-  ManagedTask<RasterHistogramAccumulateTask<T>> accumulate_;
 };
 
 /// Takes the results of a RasterHistogramCallbackProcess that neither failed nor was aborted.
@@ -76,7 +50,7 @@ class HistogramCallback {
 /// were computed before.
 template <typename T>
 class RasterHistogramCallbackProcess final
-    : public ProcessBuilderCallback<Process, HistogramCallback<T>> {
+    : public TileProcess<ProcessBuilderCallback<Process, HistogramCallback<T>>> {
  public:
   /// @param receiver  outlives the run.
   RasterHistogramCallbackProcess(const RasterIteratorPtr<T>& iterator,
@@ -90,52 +64,11 @@ class RasterHistogramCallbackProcess final
  private:
   RasterStatsPtr<T> stats_;
   RasterHistogramPtr<T> working_;
-  ManagedTask<RasterReadTask<T>> read_;
-  ManagedTask<RasterHistogramAccumulateTask<T>> accumulate_;
 };
 
-extern template class VEXG_EXPORT RasterHistogramAccumulateTask<std::uint8_t>;
-extern template class VEXG_EXPORT RasterHistogramAccumulateTask<std::int8_t>;
-extern template class VEXG_EXPORT RasterHistogramAccumulateTask<std::uint16_t>;
-extern template class VEXG_EXPORT RasterHistogramAccumulateTask<std::int16_t>;
-extern template class VEXG_EXPORT RasterHistogramAccumulateTask<std::uint32_t>;
-extern template class VEXG_EXPORT RasterHistogramAccumulateTask<std::int32_t>;
-extern template class VEXG_EXPORT RasterHistogramAccumulateTask<float>;
-extern template class VEXG_EXPORT RasterHistogramAccumulateTask<double>;
-extern template class VEXG_EXPORT RasterHistogramAccumulateTask<std::uint64_t>;
-extern template class VEXG_EXPORT RasterHistogramAccumulateTask<std::int64_t>;
-
-extern template class VEXG_EXPORT RasterHistogramProcess<std::uint8_t>;
-extern template class VEXG_EXPORT RasterHistogramProcess<std::int8_t>;
-extern template class VEXG_EXPORT RasterHistogramProcess<std::uint16_t>;
-extern template class VEXG_EXPORT RasterHistogramProcess<std::int16_t>;
-extern template class VEXG_EXPORT RasterHistogramProcess<std::uint32_t>;
-extern template class VEXG_EXPORT RasterHistogramProcess<std::int32_t>;
-extern template class VEXG_EXPORT RasterHistogramProcess<float>;
-extern template class VEXG_EXPORT RasterHistogramProcess<double>;
-extern template class VEXG_EXPORT RasterHistogramProcess<std::uint64_t>;
-extern template class VEXG_EXPORT RasterHistogramProcess<std::int64_t>;
-
-extern template class VEXG_EXPORT HistogramCallback<std::uint8_t>;
-extern template class VEXG_EXPORT HistogramCallback<std::int8_t>;
-extern template class VEXG_EXPORT HistogramCallback<std::uint16_t>;
-extern template class VEXG_EXPORT HistogramCallback<std::int16_t>;
-extern template class VEXG_EXPORT HistogramCallback<std::uint32_t>;
-extern template class VEXG_EXPORT HistogramCallback<std::int32_t>;
-extern template class VEXG_EXPORT HistogramCallback<float>;
-extern template class VEXG_EXPORT HistogramCallback<double>;
-extern template class VEXG_EXPORT HistogramCallback<std::uint64_t>;
-extern template class VEXG_EXPORT HistogramCallback<std::int64_t>;
-
-extern template class VEXG_EXPORT RasterHistogramCallbackProcess<std::uint8_t>;
-extern template class VEXG_EXPORT RasterHistogramCallbackProcess<std::int8_t>;
-extern template class VEXG_EXPORT RasterHistogramCallbackProcess<std::uint16_t>;
-extern template class VEXG_EXPORT RasterHistogramCallbackProcess<std::int16_t>;
-extern template class VEXG_EXPORT RasterHistogramCallbackProcess<std::uint32_t>;
-extern template class VEXG_EXPORT RasterHistogramCallbackProcess<std::int32_t>;
-extern template class VEXG_EXPORT RasterHistogramCallbackProcess<float>;
-extern template class VEXG_EXPORT RasterHistogramCallbackProcess<double>;
-extern template class VEXG_EXPORT RasterHistogramCallbackProcess<std::uint64_t>;
-extern template class VEXG_EXPORT RasterHistogramCallbackProcess<std::int64_t>;
+VEXG_EXTERN(TEN, RasterHistogramAccumulateTask);
+VEXG_EXTERN(TEN, RasterHistogramProcess);
+VEXG_EXTERN(TEN, HistogramCallback);
+VEXG_EXTERN(TEN, RasterHistogramCallbackProcess);
 
 }  // namespace lumo

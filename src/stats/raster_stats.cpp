@@ -1,5 +1,5 @@
 #include "foundation/type_code.h"
-#include "stats/raster_stats_impl.h"
+#include "stats/raster_stats_body.h"
 
 namespace lumo {
 
@@ -7,15 +7,6 @@ template <typename T>
 const unsigned RasterStats<T>::TypeCode = GloballyUniqueObjectTypeCode(
     String("RasterStats<" + DataTypeName(kDataTypeOf<T>).ToUTF8() + ">"));
 
-template class RasterStats<std::uint8_t>;
-template class RasterStats<std::int8_t>;
-template class RasterStats<std::uint16_t>;
-template class RasterStats<std::int16_t>;
-template class RasterStats<std::uint32_t>;
-template class RasterStats<std::int32_t>;
-template class RasterStats<float>;
-template class RasterStats<double>;
-template class RasterStats<std::uint64_t>;
-template class RasterStats<std::int64_t>;
+VEXG_INSTANCES(TEN, RasterStats);
 
 }  // namespace lumo

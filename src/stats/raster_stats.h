@@ -82,15 +82,6 @@ class RasterStats : public Object {
 template <typename T>
 using RasterStatsPtr = Pointer<RasterStats<T>>;
 
-extern template class VEXG_EXPORT RasterStats<std::uint8_t>;
-extern template class VEXG_EXPORT RasterStats<std::int8_t>;
-extern template class VEXG_EXPORT RasterStats<std::uint16_t>;
-extern template class VEXG_EXPORT RasterStats<std::int16_t>;
-extern template class VEXG_EXPORT RasterStats<std::uint32_t>;
-extern template class VEXG_EXPORT RasterStats<std::int32_t>;
-extern template class VEXG_EXPORT RasterStats<float>;
-extern template class VEXG_EXPORT RasterStats<double>;
-extern template class VEXG_EXPORT RasterStats<std::uint64_t>;
-extern template class VEXG_EXPORT RasterStats<std::int64_t>;
+VEXG_EXTERN(TEN, RasterStats);
 
 }  // namespace lumo

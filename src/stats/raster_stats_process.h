@@ -1,18 +1,17 @@
 #pragma once
 
-#include <mutex>
-
-#include "raster/raster_tasks.h"
+#include "raster/tile_process.h"
 #include "stats/extended_raster_stats.h"
-#include "tasks/process_builder.h"
 
-// How statistics are computed: a process that reads a raster and takes its tiles in one after the
-// other, each in parallel. T is one of TenTypes, Stats is RasterStats<T> or ExtendedRasterStats<T>.
+// How statistics are computed: a process that reads a raster, takes in several of its tiles at
+// once, and joins what they gave in their order. T is one of TenTypes, Stats is RasterStats<T> or
+// ExtendedRasterStats<T>.
 
 namespace lumo {
 
-/// Takes in the tile in slot 0, which stays. Setup arguments: the object that takes it. When the
-/// task goes, with no error and no abort, the object is finished.
+/// The stage of another process that takes in the tile in slot 0 on the way, which stays. Setup
+/// arguments: the object that takes it. When the task goes, with no error and no abort, the object
+/// is finished.
 template <typename T, typename Stats>
 class RasterStatsAccumulateTask final : public ConcurrentTask {
  public:
@@ -22,87 +21,25 @@ class RasterStatsAccumulateTask final : public ConcurrentTask {
 
  private:
   Pointer<Stats> stats_;
-  std::mutex mergeLock_;  // held for the one merge of a tile
 };
 
 /// Computes the statistics of all pixels that an iterator reads. The results are in `stats` when
 /// it has ended well; after an abort or a failure they are of no use.
 template <typename T, typename Stats>
-class RasterStatsProcess final : public ProcessBuilder<Process> {
+class RasterStatsProcess final : public TileProcess<> {
  public:
   /// @param stats  is reset for the bands of the iterator.
   RasterStatsProcess(const RasterIteratorPtr<T>& iterator, const Pointer<Stats>& stats,
                      const IPC& ipc = {});
+  void Execute() override;
 
  private:
-  ManagedTask<RasterReadTask<T>> read_;
-  ManagedTask<RasterStatsAccumulateTask<T, Stats>> accumulate_;
+  Pointer<Stats> stats_;
 };
 
-extern template class VEXG_EXPORT
-    RasterStatsAccumulateTask<std::uint8_t, RasterStats<std::uint8_t>>;
-extern template class VEXG_EXPORT RasterStatsAccumulateTask<std::int8_t, RasterStats<std::int8_t>>;
-extern template class VEXG_EXPORT
-    RasterStatsAccumulateTask<std::uint16_t, RasterStats<std::uint16_t>>;
-extern template class VEXG_EXPORT
-    RasterStatsAccumulateTask<std::int16_t, RasterStats<std::int16_t>>;
-extern template class VEXG_EXPORT
-    RasterStatsAccumulateTask<std::uint32_t, RasterStats<std::uint32_t>>;
-extern template class VEXG_EXPORT
-    RasterStatsAccumulateTask<std::int32_t, RasterStats<std::int32_t>>;
-extern template class VEXG_EXPORT RasterStatsAccumulateTask<float, RasterStats<float>>;
-extern template class VEXG_EXPORT RasterStatsAccumulateTask<double, RasterStats<double>>;
-extern template class VEXG_EXPORT
-    RasterStatsAccumulateTask<std::uint64_t, RasterStats<std::uint64_t>>;
-extern template class VEXG_EXPORT
-    RasterStatsAccumulateTask<std::int64_t, RasterStats<std::int64_t>>;
-
-extern template class VEXG_EXPORT
-    RasterStatsAccumulateTask<std::uint8_t, ExtendedRasterStats<std::uint8_t>>;
-extern template class VEXG_EXPORT
-    RasterStatsAccumulateTask<std::int8_t, ExtendedRasterStats<std::int8_t>>;
-extern template class VEXG_EXPORT
-    RasterStatsAccumulateTask<std::uint16_t, ExtendedRasterStats<std::uint16_t>>;
-extern template class VEXG_EXPORT
-    RasterStatsAccumulateTask<std::int16_t, ExtendedRasterStats<std::int16_t>>;
-extern template class VEXG_EXPORT
-    RasterStatsAccumulateTask<std::uint32_t, ExtendedRasterStats<std::uint32_t>>;
-extern template class VEXG_EXPORT
-    RasterStatsAccumulateTask<std::int32_t, ExtendedRasterStats<std::int32_t>>;
-extern template class VEXG_EXPORT RasterStatsAccumulateTask<float, ExtendedRasterStats<float>>;
-extern template class VEXG_EXPORT RasterStatsAccumulateTask<double, ExtendedRasterStats<double>>;
-extern template class VEXG_EXPORT
-    RasterStatsAccumulateTask<std::uint64_t, ExtendedRasterStats<std::uint64_t>>;
-extern template class VEXG_EXPORT
-    RasterStatsAccumulateTask<std::int64_t, ExtendedRasterStats<std::int64_t>>;
-
-extern template class VEXG_EXPORT RasterStatsProcess<std::uint8_t, RasterStats<std::uint8_t>>;
-extern template class VEXG_EXPORT RasterStatsProcess<std::int8_t, RasterStats<std::int8_t>>;
-extern template class VEXG_EXPORT RasterStatsProcess<std::uint16_t, RasterStats<std::uint16_t>>;
-extern template class VEXG_EXPORT RasterStatsProcess<std::int16_t, RasterStats<std::int16_t>>;
-extern template class VEXG_EXPORT RasterStatsProcess<std::uint32_t, RasterStats<std::uint32_t>>;
-extern template class VEXG_EXPORT RasterStatsProcess<std::int32_t, RasterStats<std::int32_t>>;
-extern template class VEXG_EXPORT RasterStatsProcess<float, RasterStats<float>>;
-extern template class VEXG_EXPORT RasterStatsProcess<double, RasterStats<double>>;
-extern template class VEXG_EXPORT RasterStatsProcess<std::uint64_t, RasterStats<std::uint64_t>>;
-extern template class VEXG_EXPORT RasterStatsProcess<std::int64_t, RasterStats<std::int64_t>>;
-
-extern template class VEXG_EXPORT
-    RasterStatsProcess<std::uint8_t, ExtendedRasterStats<std::uint8_t>>;
-extern template class VEXG_EXPORT RasterStatsProcess<std::int8_t, ExtendedRasterStats<std::int8_t>>;
-extern template class VEXG_EXPORT
-    RasterStatsProcess<std::uint16_t, ExtendedRasterStats<std::uint16_t>>;
-extern template class VEXG_EXPORT
-    RasterStatsProcess<std::int16_t, ExtendedRasterStats<std::int16_t>>;
-extern template class VEXG_EXPORT
-    RasterStatsProcess<std::uint32_t, ExtendedRasterStats<std::uint32_t>>;
-extern template class VEXG_EXPORT
-    RasterStatsProcess<std::int32_t, ExtendedRasterStats<std::int32_t>>;
-extern template class VEXG_EXPORT RasterStatsProcess<float, ExtendedRasterStats<float>>;
-extern template class VEXG_EXPORT RasterStatsProcess<double, ExtendedRasterStats<double>>;
-extern template class VEXG_EXPORT
-    RasterStatsProcess<std::uint64_t, ExtendedRasterStats<std::uint64_t>>;
-extern template class VEXG_EXPORT
-    RasterStatsProcess<std::int64_t, ExtendedRasterStats<std::int64_t>>;
+VEXG_EXTERN(TEN, RasterStatsAccumulateTask, RasterStats);
+VEXG_EXTERN(TEN, RasterStatsAccumulateTask, ExtendedRasterStats);
+VEXG_EXTERN(TEN, RasterStatsProcess, RasterStats);
+VEXG_EXTERN(TEN, RasterStatsProcess, ExtendedRasterStats);
 
 }  // namespace lumo

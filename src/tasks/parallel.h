@@ -3,10 +3,12 @@
 #include <algorithm>
 #include <atomic>
 #include <cstdint>
+#include <type_traits>
 #include <utility>
 #include <vector>
 
 #include "foundation/errors.h"
+#include "foundation/fault.h"
 #include "foundation/run_controls.h"
 
 // Parallel loops over ranges. A body says how large its range is and what to do with a part of it;
@@ -106,7 +108,8 @@ class IParallelScan {
 
 /// How a loop tells that its data are of no use. A constructor or a body calls Fail(); bodies begin
 /// with a look at Failed() and do nothing when it is set, and a reduction gives its identity. After
-/// the runner has returned the caller finds ParallelError here, and must not use the result.
+/// the runner has returned the caller finds ParallelError here, and must not use the result; with
+/// Close() it also gets the fault that the first one told, on whichever thread.
 /// Threads: Fail and Failed may be called on any; the error state is for after the loop.
 class VEXG_EXPORT ParallelResult : public ErrorState {
  public:
@@ -116,11 +119,19 @@ class VEXG_EXPORT ParallelResult : public ErrorState {
 
   bool Failed() const { return failed_; }
   void Fail() {
-    if (!failed_.exchange(true)) SetErrorState(ParallelError());
+    if (failed_.exchange(true)) return;
+    fault_ = TakeFault();
+    SetErrorState(ParallelError());
+  }
+  /// Tells on this thread what the first failure told on its own. @return true when nothing failed.
+  bool Close() const {
+    if (fault_.GetLength() != 0) SetFault(fault_);
+    return !HasError();
   }
 
  private:
   std::atomic<bool> failed_{false};
+  String fault_;
 };
 
 /// Runs the parts of a loop. `grain` bounds how finely the range is cut; 0 leaves it to the engine.
@@ -235,25 +246,26 @@ void RunParallelReduce(IParallelReduce<R, I>& loop, R& out, const AbortFlag* abo
   detail::Isolated(run);
 }
 
-namespace detail {
-
-/// Calls `body(part)` for each part from 0, on any thread.
+/// Calls `body(i)` for the numbers below `count`, or `body(begin, end)` for parts of them, on any
+/// thread: RunParallelFor for a loop that is a function.
 template <typename F>
-void ForEachPart(unsigned parts, const F& body) {
+void ParallelFor(unsigned count, const AbortFlag* abort, const F& body) {
   struct Loop final : IParallelFor<unsigned> {
-    Loop(unsigned count, const F& f) : parts(count), call(f) {}
+    Loop(unsigned end, const F& f) : count(end), call(f) {}
     unsigned Begin() const override { return 0; }
-    unsigned End() const override { return parts; }
+    unsigned End() const override { return count; }
     void Body(unsigned begin, unsigned end) override {
-      for (unsigned part = begin; part < end; ++part) call(part);
+      if constexpr (std::is_invocable_v<const F&, unsigned, unsigned>) {
+        call(begin, end);
+      } else {
+        for (unsigned i = begin; i < end; ++i) call(i);
+      }
     }
-    unsigned parts;
+    unsigned count;
     const F& call;
-  } loop(parts, body);
-  RunParallelFor(loop);
+  } loop(count, body);
+  RunParallelFor(loop, 0, abort);
 }
-
-}  // namespace detail
 
 /// Scans in two passes over the same parts, PreScan and then FinalScan; `sum` is the total, the
 /// identity for an empty range. The result has the same bits for any number of threads.
@@ -270,7 +282,7 @@ void RunParallelScan(IParallelScan<R, I>& loop, R& sum) {
     R sum;
   };
   std::vector<Part> before(parts, Part{loop.Identity()});  // what stands in front of each part
-  detail::ForEachPart(parts - 1, [&](unsigned part) {
+  ParallelFor(parts - 1, nullptr, [&](unsigned part) {
     before[part + 1].sum = loop.PreScan(start(part), start(part + 1), loop.Identity());
   });
   for (unsigned part = 1; part < parts; ++part) {
@@ -278,7 +290,7 @@ void RunParallelScan(IParallelScan<R, I>& loop, R& sum) {
     loop.Join(total, before[part].sum);
     before[part].sum = std::move(total);
   }
-  detail::ForEachPart(parts, [&](unsigned part) {
+  ParallelFor(parts, nullptr, [&](unsigned part) {
     R end = loop.FinalScan(start(part), start(part + 1), before[part].sum);
     if (part == parts - 1) loop.Assign(sum, end);
   });

@@ -19,7 +19,7 @@ inline constexpr unsigned kDefaultTokens = 0xFFFFFFFE;
 /// @return false, with nothing run, when a stage is null or `maxTokens` is 0.
 /// An exception of a reader, stage or writer ends the run and comes out here.
 ///
-/// Exists for TaskToken; for other items through pipeline_impl.h.
+/// Exists for TaskToken; for other items through pipeline_body.h.
 template <typename T>
 bool RunPipeline(IPipelineReader<T>& reader, std::span<ISimplePipelineProcess<T>* const> stages,
                  IPipelineWriter<T>& writer, unsigned maxTokens);

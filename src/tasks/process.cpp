@@ -8,8 +8,10 @@
 
 #include "foundation/fault.h"
 #include "foundation/grow_array.h"
-#include "tasks/pipeline_impl.h"
+#include "platform/memory_shortage.h"
+#include "tasks/pipeline_body.h"
 #include "tasks/process_stages.h"
+#include "tasks/thread_limit.h"
 
 namespace lumo {
 
@@ -120,12 +122,15 @@ bool CustomProcess<Initializer, Stage, Terminator>::Run(ArgList& args) {
     Initializer initializer(*this, pool);
     Terminator terminator(*this, pool);
     BeginRun();
-    const bool ran = RunPipeline<TaskToken>(initializer, chain, terminator, GetTaskCount());
+    unsigned tokens = 0;
+    for (const auto& stage : stages) tokens += stage->IsParallel() ? ThreadLimit::GetCurrent() : 1;
+    const bool ran = RunPipeline<TaskToken>(initializer, chain, terminator, tokens);
     if (ran && !HasFailed()) return true;
     const String fault = GetFault();
     if (fault.GetLength() != 0) SetFault(fault);
     return false;
   } catch (const std::bad_alloc&) {
+    platform::NoteMemoryShortage();
     SetErrorState(ObjectErrorOutOfMemory());
     return false;
   }

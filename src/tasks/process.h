@@ -128,8 +128,8 @@ class CustomProcess : public BasicProcess {
  public:
   using BasicProcess::BasicProcess;
 
-  /// Makes the tasks, runs the pipeline with as many tokens in flight as there are stages, and
-  /// destroys the tasks. An abort is no failure: the caller looks at the flag.
+  /// Makes the tasks, runs the pipeline with as many tokens in flight as can be worked on at once,
+  /// and destroys the tasks. An abort is no failure: the caller looks at the flag.
   /// @param args  the arguments of the run. False, with no error stored, when they are too few.
   /// An exception of a task comes out here.
   bool Run(ArgList& args) override;
@@ -141,9 +141,10 @@ class ProcessTerminator;
 
 extern template class VEXG_EXPORT CustomProcess<ProcessInitializer, ProcessTask, ProcessTerminator>;
 
-/// A chain of tasks through which tokens flow. Each task works on one token at a time, in order;
-/// different tasks work on different tokens at once. Memory stays bounded by the tokens in flight,
-/// which are as many as there are tasks.
+/// A chain of tasks through which tokens flow. Each task works on one token at a time, in order,
+/// unless it is a StatelessTask, which works on one for each thread; different tasks work on
+/// different tokens at once. Memory stays bounded by the tokens in flight, which are as many as
+/// there are tasks, or threads for a StatelessTask.
 class VEXG_EXPORT Process final
     : public CustomProcess<ProcessInitializer, ProcessTask, ProcessTerminator> {
  public:

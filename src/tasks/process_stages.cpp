@@ -47,16 +47,21 @@ ProcessTask::~ProcessTask() {
 
 TaskToken* ProcessTask::Process(TaskToken* token) {
   if (token == nullptr) return nullptr;
-  if (process_.ShouldStop()) {
+  // Several tokens may have passed the stage in front at once, when one of them failed there.
+  if (process_.ShouldStop() || ended_) {
     token->valid = false;
   } else if (token->valid) {
-    if (IsUsable(*token)) {
-      Execute(*token);
-    } else {
+    if (!IsUsable(*token)) {
       token->valid = false;
       token->error = true;
+    } else if (IsParallel()) {
+      ArgList list(list_.GetCount());
+      Execute(*token, list);
+    } else {
+      Execute(*token, list_);
     }
   }
+  if (!token->valid && !IsParallel()) ended_ = true;
   return token;
 }
 
@@ -65,17 +70,17 @@ bool ProcessTask::IsUsable(const TaskToken& token) const {
          descriptor_.GetTokenArgs().IsValid();
 }
 
-void ProcessTask::Execute(TaskToken& token) {
+void ProcessTask::Execute(TaskToken& token, ArgList& list) {
   const Array<ArgID>& tokenArgs = descriptor_.GetTokenArgs();
-  for (unsigned i = 0; i < tokenArgs.GetCount(); ++i) list_.Set(i, token.args.Get(tokenArgs[i]));
-  if (task_->Execute(list_)) {
-    for (unsigned i = 0; i < tokenArgs.GetCount(); ++i) token.args.Set(tokenArgs[i], list_.Get(i));
+  for (unsigned i = 0; i < tokenArgs.GetCount(); ++i) list.Set(i, token.args.Get(tokenArgs[i]));
+  if (task_->Execute(list)) {
+    for (unsigned i = 0; i < tokenArgs.GetCount(); ++i) token.args.Set(tokenArgs[i], list.Get(i));
   } else {
     token.valid = false;
-    token.error = task_->HasError();
+    token.error = task_->IsStateless() || task_->HasError();
     if (token.error) process_.KeepFault(TakeFault());
   }
-  list_.Clear();
+  list.Clear();
 }
 
 bool ProcessTerminator::Write(TaskToken* token) {

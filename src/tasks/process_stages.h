@@ -1,5 +1,6 @@
 #pragma once
 
+#include <atomic>
 #include <memory>
 #include <mutex>
 #include <vector>
@@ -48,19 +49,21 @@ class ProcessTask final : public ISimplePipelineProcess<TaskToken> {
   ProcessTask(const ProcessTask&) = delete;
   ProcessTask& operator=(const ProcessTask&) = delete;
 
-  bool IsParallel() const override { return false; }
+  /// True for a task that keeps nothing between tokens.
+  bool IsParallel() const override { return task_ != nullptr && task_->IsStateless(); }
   bool IsOrdered() const override { return true; }
   /// Gives the token on, whatever happened, so that it reaches the terminator.
   TaskToken* Process(TaskToken* token) override;
 
  private:
   bool IsUsable(const TaskToken& token) const;
-  void Execute(TaskToken& token);
+  void Execute(TaskToken& token, ArgList& list);
 
   BasicProcess& process_;
   const TaskDescriptor& descriptor_;
   Task* task_ = nullptr;
-  ArgList list_;  // what the task sees of the token; used again for each
+  ArgList list_;  // what the task sees of the token; used again for each that comes alone
+  std::atomic<bool> ended_{false};  // in order: no token behind this one is worked on
 };
 
 /// Takes the tokens that have passed all stages.

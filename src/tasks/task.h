@@ -15,9 +15,9 @@ class BasicProcess;
 /// stores TaskErrorBadParams when they are too few or unusable; a task in error fails the first
 /// token that reaches it.
 ///
-/// Threads: Execute never overlaps with itself, so a task needs no lock for its own fields. It runs
-///          on any worker, and beside the other stages' tasks; what it shares with them is to be
-///          safe for that.
+/// Threads: Execute never overlaps with itself, so a task needs no lock for its own fields; only a
+///          StatelessTask has none that it changes. It runs on any worker, and beside the other
+///          stages' tasks; what it shares with them is to be safe for that.
 class VEXG_EXPORT Task : public ErrorState {
  public:
   virtual ~Task() = default;
@@ -38,6 +38,8 @@ class VEXG_EXPORT Task : public ErrorState {
   const String& GetName() const { return name_; }
   /// True when the body runs parallel loops inside. For readers: the pipeline treats both alike.
   bool IsConcurrent() const { return concurrent_; }
+  /// True when Execute keeps nothing between tokens, and may run for several of them at once.
+  bool IsStateless() const { return stateless_; }
 
   /// The process that runs this task, and owns it meanwhile; null outside a run.
   BasicProcess* GetProcess() const { return process_; }
@@ -49,24 +51,34 @@ class VEXG_EXPORT Task : public ErrorState {
   const AbortFlag* GetAbortFlag() const;
 
  protected:
-  Task(const char* name, bool concurrent) : name_(name), concurrent_(concurrent) {}
+  Task(const char* name, bool concurrent, bool stateless)
+      : name_(name), concurrent_(concurrent), stateless_(stateless) {}
 
  private:
   String name_;
   bool concurrent_;
+  bool stateless_;
   BasicProcess* process_ = nullptr;
 };
 
 /// A task whose body is plain code.
 class VEXG_EXPORT SequentialTask : public Task {
  protected:
-  explicit SequentialTask(const char* name) : Task(name, false) {}
+  explicit SequentialTask(const char* name) : Task(name, false, false) {}
 };
 
 /// A task whose body runs parallel loops over its tile.
 class VEXG_EXPORT ConcurrentTask : public Task {
  protected:
-  explicit ConcurrentTask(const char* name) : Task(name, true) {}
+  explicit ConcurrentTask(const char* name, bool stateless = false) : Task(name, true, stateless) {}
+};
+
+/// A task that keeps nothing between tokens, whose Execute therefore runs for as many of them at
+/// once as there are threads; the stages behind it get them in order again. It stores no error
+/// after its construction: false is a failure of the process.
+class VEXG_EXPORT StatelessTask : public ConcurrentTask {
+ protected:
+  explicit StatelessTask(const char* name) : ConcurrentTask(name, true) {}
 };
 
 /// Makes and destroys one kind of task.

@@ -92,13 +92,6 @@ class BandStackRaster final : public ComputedRaster<T> {
   PyramidDef pyramidDef_;
 };
 
-extern template class VEXG_EXPORT BandStackRaster<std::uint8_t>;
-extern template class VEXG_EXPORT BandStackRaster<std::int8_t>;
-extern template class VEXG_EXPORT BandStackRaster<std::uint16_t>;
-extern template class VEXG_EXPORT BandStackRaster<std::int16_t>;
-extern template class VEXG_EXPORT BandStackRaster<std::uint32_t>;
-extern template class VEXG_EXPORT BandStackRaster<std::int32_t>;
-extern template class VEXG_EXPORT BandStackRaster<float>;
-extern template class VEXG_EXPORT BandStackRaster<double>;
+VEXG_EXTERN(EIGHT, BandStackRaster);
 
 }  // namespace lumo

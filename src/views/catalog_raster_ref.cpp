@@ -32,6 +32,12 @@ bool IsUpToDate(const BasicRasterPtr& raster) {
 
 }  // namespace
 
+std::span<const EnumWord<PyramidCheck>> WordsOf(PyramidCheck) {
+  static constexpr EnumWord<PyramidCheck> kWords[] = {{"Told", PyramidCheck::kTold},
+                                                      {"Fitting", PyramidCheck::kFitting}};
+  return kWords;
+}
+
 std::span<const EnumWord<SourceCheck>> WordsOf(SourceCheck) {
   static constexpr EnumWord<SourceCheck> kWords[] = {{"Told", SourceCheck::kTold},
                                                      {"Compared", SourceCheck::kCompared}};

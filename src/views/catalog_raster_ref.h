@@ -17,6 +17,16 @@ enum class SourceCheck {
 /// "Told", "Compared".
 VEXG_EXPORT std::span<const EnumWord<SourceCheck>> WordsOf(SourceCheck);
 
+/// The effect of a pyramid file that can't be used with its raster.
+enum class PyramidCheck {
+  kTold,     ///< it is one that can't be read, or is of a raster of another size or pixel type:
+             ///< the raster is not opened
+  kFitting,  ///< it is any that was not built from the raster as it is: it is left out
+};
+
+/// "Told", "Fitting".
+VEXG_EXPORT std::span<const EnumWord<PyramidCheck>> WordsOf(PyramidCheck);
+
 /// Holds an open raster while code works with it, and its place in the catalog: making one adds 1
 /// to the raster's count there.
 class VEXG_EXPORT CatalogRasterRef {

@@ -72,17 +72,6 @@ class ComputedRaster : public RasterView<T> {
   DynamicRasterHistogramPtr<T> histogram_;
 };
 
-extern template class VEXG_EXPORT ComputedRaster<std::uint8_t>;
-extern template class VEXG_EXPORT ComputedRaster<std::int8_t>;
-extern template class VEXG_EXPORT ComputedRaster<std::uint16_t>;
-extern template class VEXG_EXPORT ComputedRaster<std::int16_t>;
-extern template class VEXG_EXPORT ComputedRaster<std::uint32_t>;
-extern template class VEXG_EXPORT ComputedRaster<std::int32_t>;
-extern template class VEXG_EXPORT ComputedRaster<float>;
-extern template class VEXG_EXPORT ComputedRaster<double>;
-extern template class VEXG_EXPORT ComputedRaster<std::uint64_t>;
-extern template class VEXG_EXPORT ComputedRaster<std::int64_t>;
-extern template class VEXG_EXPORT ComputedRaster<Complex<float>>;
-extern template class VEXG_EXPORT ComputedRaster<Complex<double>>;
+VEXG_EXTERN(TWELVE, ComputedRaster);
 
 }  // namespace lumo

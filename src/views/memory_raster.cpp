@@ -1,6 +1,6 @@
 #include <cstdio>
 
-#include "views/memory_raster_impl.h"
+#include "views/memory_raster_body.h"
 
 namespace lumo {
 
@@ -48,22 +48,7 @@ GeoRefPtr MakeStdGeoRef(double pixelSizeX, double pixelSizeY, double tieX, doubl
 
 }  // namespace detail
 
-template class MemoryRaster<std::uint8_t>;
-template class MemoryRaster<std::int8_t>;
-template class MemoryRaster<std::uint16_t>;
-template class MemoryRaster<std::int16_t>;
-template class MemoryRaster<std::uint32_t>;
-template class MemoryRaster<std::int32_t>;
-template class MemoryRaster<float>;
-template class MemoryRaster<double>;
-
-template class AutoMemoryRaster<std::uint8_t>;
-template class AutoMemoryRaster<std::int8_t>;
-template class AutoMemoryRaster<std::uint16_t>;
-template class AutoMemoryRaster<std::int16_t>;
-template class AutoMemoryRaster<std::uint32_t>;
-template class AutoMemoryRaster<std::int32_t>;
-template class AutoMemoryRaster<float>;
-template class AutoMemoryRaster<double>;
+VEXG_INSTANCES(EIGHT, MemoryRaster);
+VEXG_INSTANCES(EIGHT, AutoMemoryRaster);
 
 }  // namespace lumo

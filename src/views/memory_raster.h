@@ -86,22 +86,7 @@ class AutoMemoryRaster final : public MemoryRaster<T> {
   Block block_;
 };
 
-extern template class VEXG_EXPORT MemoryRaster<std::uint8_t>;
-extern template class VEXG_EXPORT MemoryRaster<std::int8_t>;
-extern template class VEXG_EXPORT MemoryRaster<std::uint16_t>;
-extern template class VEXG_EXPORT MemoryRaster<std::int16_t>;
-extern template class VEXG_EXPORT MemoryRaster<std::uint32_t>;
-extern template class VEXG_EXPORT MemoryRaster<std::int32_t>;
-extern template class VEXG_EXPORT MemoryRaster<float>;
-extern template class VEXG_EXPORT MemoryRaster<double>;
-
-extern template class VEXG_EXPORT AutoMemoryRaster<std::uint8_t>;
-extern template class VEXG_EXPORT AutoMemoryRaster<std::int8_t>;
-extern template class VEXG_EXPORT AutoMemoryRaster<std::uint16_t>;
-extern template class VEXG_EXPORT AutoMemoryRaster<std::int16_t>;
-extern template class VEXG_EXPORT AutoMemoryRaster<std::uint32_t>;
-extern template class VEXG_EXPORT AutoMemoryRaster<std::int32_t>;
-extern template class VEXG_EXPORT AutoMemoryRaster<float>;
-extern template class VEXG_EXPORT AutoMemoryRaster<double>;
+VEXG_EXTERN(EIGHT, MemoryRaster);
+VEXG_EXTERN(EIGHT, AutoMemoryRaster);
 
 }  // namespace lumo

@@ -7,6 +7,8 @@
 #include "data/raster_reader.h"
 #include "foundation/abortable_call.h"
 #include "foundation/fault.h"
+#include "foundation/warnings.h"
+#include "views/file_state.h"
 #include "views/publish_raster.h"
 #include "views/reader_raster.h"
 
@@ -27,6 +29,8 @@ std::vector<OutputDeclaration> OpenOutputs() {
   outputs.push_back({"Note", ValueKind::kText,
                      "what of the inputs had no effect, or which levels are shown where Levels is "
                      "Best and there are two sets of them; only then"});
+  outputs.push_back({"Warning", ValueKind::kText,
+                     "what was found beside the source and left out, and why; only then"});
   return outputs;
 }
 
@@ -61,6 +65,11 @@ const CommandDeclaration kOpen{
       "of a source that has levels of its own beside a pyramid file. Told: those of the pyramid "
       "file; Best: its own where they are newer, or begin with a finer one",
       "", &WordsIn<LevelChoice>},
+     {"PyramidCheck", Presence::kOptional, ValueKind::kWord,
+      "Told: a pyramid file that can't be read, or is of a raster of another size or pixel type, "
+      "makes the command fail; Fitting: any that was not built from the source as it is is left "
+      "out, with a warning",
+      "", &WordsIn<PyramidCheck>},
      {"CheckSource", Presence::kOptional, ValueKind::kWord,
       "Told: a source that is open is shared, whatever has become of its file; Compared: one whose "
       "file is another one now, or has changed its size or time, gives a raster of its own, whose "
@@ -72,6 +81,7 @@ const CommandDeclaration kOpen{
 struct Opened {
   DataConnectionPtr source;
   DataConnectionPtr pyramid;
+  std::vector<std::string> warnings;
 };
 
 class OpenRasterCommand final : public PublishCommand {
@@ -87,6 +97,7 @@ class OpenRasterCommand final : public PublishCommand {
       return Fail("aborted while the source was being opened");
     }
     if (!opened.source) return Fail();
+    WriteWarnings(opened.warnings);
     if (opened.pyramid && Read<LevelChoice>("Levels") == LevelChoice::kBest &&
         ChoosesOwn(opened.source, opened.pyramid)) {
       opened.pyramid = DataConnectionPtr();
@@ -104,14 +115,48 @@ class OpenRasterCommand final : public PublishCommand {
     const auto sourceStrings = Read<Array<String>>("ConnStr");
     const auto pyramidStrings = Read<Array<String>>("PyramidConnStr");
     const auto isNew = Read<bool>("PyramidNew");
+    const auto check = Read<PyramidCheck>("PyramidCheck");
     return [=] {
       Opened opened;
+      TakeWarnings();
       opened.source = GetGlobalDataManager().Connect(sourceStrings, geoRef, MetadataPtr());
-      if (!opened.source || pyramidStrings.GetCount() == 0) return opened;
-      opened.pyramid =
-          ConnectPyramid(pyramidStrings, isNew, RasterDataConnectionPtr(opened.source));
-      return opened.pyramid ? opened : Opened();
+      const RasterDataConnectionPtr source(opened.source);
+      if (opened.source && pyramidStrings.GetCount() != 0) {
+        opened.pyramid = ConnectPyramid(pyramidStrings, isNew, source);
+        if (check == PyramidCheck::kFitting && !isNew) {
+          KeepFitting(source, pyramidStrings, opened.pyramid);
+        } else if (!opened.pyramid) {
+          return Opened();
+        }
+      }
+      opened.warnings = TakeWarnings();
+      return opened;
     };
+  }
+
+  /// Lets go of a pyramid that is not that of the source, and says so.
+  static void KeepFitting(const RasterDataConnectionPtr& source, const Array<String>& strings,
+                          DataConnectionPtr& connection) {
+    Array<String> names;
+    SplitConnStr(strings, names);
+    const std::string name = names.GetCount() != 0 ? names[0].ToUTF8() : "the pyramid";
+    const RasterDataConnectionPtr pyramid(connection);
+    if (!source || !pyramid) {
+      AddWarning(TakeFaultOr((name + ": can't be opened").c_str()).ToUTF8() + "; it is not used");
+      return;
+    }
+    const std::string mismatch = FindMismatch(*source, *pyramid);
+    if (mismatch.empty()) return;
+    AddWarning(name + " " + mismatch + " and is not used; vexg pyramid build makes it anew");
+    connection = DataConnectionPtr();
+  }
+
+  void WriteWarnings(const std::vector<std::string>& warnings) {
+    std::string text;
+    for (const std::string& warning : warnings) {
+      text.append(text.empty() ? "" : "; ").append(warning);
+    }
+    if (!text.empty()) Write("Warning", String(text));
   }
 
   /// True when the levels of the source itself are to be shown; notes which are where there are two

@@ -1,4 +1,4 @@
-#include "views/projected_raster_impl.h"
+#include "views/projected_raster_body.h"
 
 namespace lumo {
 
@@ -9,13 +9,6 @@ std::span<const EnumWord<ProjectedGrid>> WordsOf(ProjectedGrid) {
   return kWords;
 }
 
-template class ProjectedRaster<std::uint8_t>;
-template class ProjectedRaster<std::int8_t>;
-template class ProjectedRaster<std::uint16_t>;
-template class ProjectedRaster<std::int16_t>;
-template class ProjectedRaster<std::uint32_t>;
-template class ProjectedRaster<std::int32_t>;
-template class ProjectedRaster<float>;
-template class ProjectedRaster<double>;
+VEXG_INSTANCES(EIGHT, ProjectedRaster);
 
 }  // namespace lumo

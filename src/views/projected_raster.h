@@ -85,13 +85,6 @@ class ProjectedRaster final : public ComputedRaster<T> {
   Reprojection<T> reprojection_;
 };
 
-extern template class VEXG_EXPORT ProjectedRaster<std::uint8_t>;
-extern template class VEXG_EXPORT ProjectedRaster<std::int8_t>;
-extern template class VEXG_EXPORT ProjectedRaster<std::uint16_t>;
-extern template class VEXG_EXPORT ProjectedRaster<std::int16_t>;
-extern template class VEXG_EXPORT ProjectedRaster<std::uint32_t>;
-extern template class VEXG_EXPORT ProjectedRaster<std::int32_t>;
-extern template class VEXG_EXPORT ProjectedRaster<float>;
-extern template class VEXG_EXPORT ProjectedRaster<double>;
+VEXG_EXTERN(EIGHT, ProjectedRaster);
 
 }  // namespace lumo

@@ -75,17 +75,6 @@ class PyramidRasterImpl final : public ComputedRaster<T> {
   std::mutex writeLock_;
 };
 
-extern template class VEXG_EXPORT PyramidRasterImpl<std::uint8_t>;
-extern template class VEXG_EXPORT PyramidRasterImpl<std::int8_t>;
-extern template class VEXG_EXPORT PyramidRasterImpl<std::uint16_t>;
-extern template class VEXG_EXPORT PyramidRasterImpl<std::int16_t>;
-extern template class VEXG_EXPORT PyramidRasterImpl<std::uint32_t>;
-extern template class VEXG_EXPORT PyramidRasterImpl<std::int32_t>;
-extern template class VEXG_EXPORT PyramidRasterImpl<float>;
-extern template class VEXG_EXPORT PyramidRasterImpl<double>;
-extern template class VEXG_EXPORT PyramidRasterImpl<std::uint64_t>;
-extern template class VEXG_EXPORT PyramidRasterImpl<std::int64_t>;
-extern template class VEXG_EXPORT PyramidRasterImpl<Complex<float>>;
-extern template class VEXG_EXPORT PyramidRasterImpl<Complex<double>>;
+VEXG_EXTERN(TWELVE, PyramidRasterImpl);
 
 }  // namespace lumo

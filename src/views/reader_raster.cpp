@@ -1,18 +1,7 @@
-#include "views/reader_raster_impl.h"
+#include "views/reader_raster_body.h"
 
 namespace lumo {
 
-template class ReaderRaster<std::uint8_t>;
-template class ReaderRaster<std::int8_t>;
-template class ReaderRaster<std::uint16_t>;
-template class ReaderRaster<std::int16_t>;
-template class ReaderRaster<std::uint32_t>;
-template class ReaderRaster<std::int32_t>;
-template class ReaderRaster<float>;
-template class ReaderRaster<double>;
-template class ReaderRaster<std::uint64_t>;
-template class ReaderRaster<std::int64_t>;
-template class ReaderRaster<Complex<float>>;
-template class ReaderRaster<Complex<double>>;
+VEXG_INSTANCES(TWELVE, ReaderRaster);
 
 }  // namespace lumo

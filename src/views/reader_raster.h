@@ -122,17 +122,6 @@ class ReaderRaster final : public ComputedRaster<T>, public SourceRaster {
   DynamicRasterPyramidPtr<T> pyramid_;  // empty without a reader of a pyramid
 };
 
-extern template class VEXG_EXPORT ReaderRaster<std::uint8_t>;
-extern template class VEXG_EXPORT ReaderRaster<std::int8_t>;
-extern template class VEXG_EXPORT ReaderRaster<std::uint16_t>;
-extern template class VEXG_EXPORT ReaderRaster<std::int16_t>;
-extern template class VEXG_EXPORT ReaderRaster<std::uint32_t>;
-extern template class VEXG_EXPORT ReaderRaster<std::int32_t>;
-extern template class VEXG_EXPORT ReaderRaster<float>;
-extern template class VEXG_EXPORT ReaderRaster<double>;
-extern template class VEXG_EXPORT ReaderRaster<std::uint64_t>;
-extern template class VEXG_EXPORT ReaderRaster<std::int64_t>;
-extern template class VEXG_EXPORT ReaderRaster<Complex<float>>;
-extern template class VEXG_EXPORT ReaderRaster<Complex<double>>;
+VEXG_EXTERN(TWELVE, ReaderRaster);
 
 }  // namespace lumo

@@ -1,4 +1,4 @@
-#include "views/reprojection_impl.h"
+#include "views/reprojection_body.h"
 
 namespace lumo {
 
@@ -9,13 +9,6 @@ std::span<const EnumWord<WarpSampling>> WordsOf(WarpSampling) {
   return kWords;
 }
 
-template class Reprojection<std::uint8_t>;
-template class Reprojection<std::int8_t>;
-template class Reprojection<std::uint16_t>;
-template class Reprojection<std::int16_t>;
-template class Reprojection<std::uint32_t>;
-template class Reprojection<std::int32_t>;
-template class Reprojection<float>;
-template class Reprojection<double>;
+VEXG_INSTANCES(EIGHT, Reprojection);
 
 }  // namespace lumo

@@ -126,13 +126,6 @@ class Reprojection {
   mutable std::vector<std::unique_ptr<Window>> windows_;  // not in use; their memory is used again
 };
 
-extern template class VEXG_EXPORT Reprojection<std::uint8_t>;
-extern template class VEXG_EXPORT Reprojection<std::int8_t>;
-extern template class VEXG_EXPORT Reprojection<std::uint16_t>;
-extern template class VEXG_EXPORT Reprojection<std::int16_t>;
-extern template class VEXG_EXPORT Reprojection<std::uint32_t>;
-extern template class VEXG_EXPORT Reprojection<std::int32_t>;
-extern template class VEXG_EXPORT Reprojection<float>;
-extern template class VEXG_EXPORT Reprojection<double>;
+VEXG_EXTERN(EIGHT, Reprojection);
 
 }  // namespace lumo

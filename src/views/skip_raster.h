@@ -59,13 +59,6 @@ class SkipRaster final : public ComputedRaster<T> {
   PyramidDef pyramidDef_;
 };
 
-extern template class VEXG_EXPORT SkipRaster<std::uint8_t>;
-extern template class VEXG_EXPORT SkipRaster<std::int8_t>;
-extern template class VEXG_EXPORT SkipRaster<std::uint16_t>;
-extern template class VEXG_EXPORT SkipRaster<std::int16_t>;
-extern template class VEXG_EXPORT SkipRaster<std::uint32_t>;
-extern template class VEXG_EXPORT SkipRaster<std::int32_t>;
-extern template class VEXG_EXPORT SkipRaster<float>;
-extern template class VEXG_EXPORT SkipRaster<double>;
+VEXG_EXTERN(EIGHT, SkipRaster);
 
 }  // namespace lumo

@@ -48,13 +48,6 @@ class SpatialSubsetRaster final : public ComputedRaster<T> {
   RasterDef def_;
 };
 
-extern template class VEXG_EXPORT SpatialSubsetRaster<std::uint8_t>;
-extern template class VEXG_EXPORT SpatialSubsetRaster<std::int8_t>;
-extern template class VEXG_EXPORT SpatialSubsetRaster<std::uint16_t>;
-extern template class VEXG_EXPORT SpatialSubsetRaster<std::int16_t>;
-extern template class VEXG_EXPORT SpatialSubsetRaster<std::uint32_t>;
-extern template class VEXG_EXPORT SpatialSubsetRaster<std::int32_t>;
-extern template class VEXG_EXPORT SpatialSubsetRaster<float>;
-extern template class VEXG_EXPORT SpatialSubsetRaster<double>;
+VEXG_EXTERN(EIGHT, SpatialSubsetRaster);
 
 }  // namespace lumo

@@ -69,13 +69,6 @@ class SpectralSubsetRaster final : public RasterView<T> {
   RasterDef def_;
 };
 
-extern template class VEXG_EXPORT SpectralSubsetRaster<std::uint8_t>;
-extern template class VEXG_EXPORT SpectralSubsetRaster<std::int8_t>;
-extern template class VEXG_EXPORT SpectralSubsetRaster<std::uint16_t>;
-extern template class VEXG_EXPORT SpectralSubsetRaster<std::int16_t>;
-extern template class VEXG_EXPORT SpectralSubsetRaster<std::uint32_t>;
-extern template class VEXG_EXPORT SpectralSubsetRaster<std::int32_t>;
-extern template class VEXG_EXPORT SpectralSubsetRaster<float>;
-extern template class VEXG_EXPORT SpectralSubsetRaster<double>;
+VEXG_EXTERN(EIGHT, SpectralSubsetRaster);
 
 }  // namespace lumo

@@ -2,7 +2,7 @@
 
 #include "data/access_policy.h"
 #include "foundation/fault.h"
-#include "views/temp_raster_impl.h"
+#include "views/temp_raster_body.h"
 
 namespace lumo {
 namespace {
@@ -53,13 +53,6 @@ String TempFileName(const String& directory, const String& prefix, const String&
   return {};
 }
 
-template class TempRaster<std::uint8_t>;
-template class TempRaster<std::int8_t>;
-template class TempRaster<std::uint16_t>;
-template class TempRaster<std::int16_t>;
-template class TempRaster<std::uint32_t>;
-template class TempRaster<std::int32_t>;
-template class TempRaster<float>;
-template class TempRaster<double>;
+VEXG_INSTANCES(EIGHT, TempRaster);
 
 }  // namespace lumo

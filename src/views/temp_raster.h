@@ -53,13 +53,6 @@ class TempRaster final : public ComputedRaster<T> {
   bool keepFile_ = false;
 };
 
-extern template class VEXG_EXPORT TempRaster<std::uint8_t>;
-extern template class VEXG_EXPORT TempRaster<std::int8_t>;
-extern template class VEXG_EXPORT TempRaster<std::uint16_t>;
-extern template class VEXG_EXPORT TempRaster<std::int16_t>;
-extern template class VEXG_EXPORT TempRaster<std::uint32_t>;
-extern template class VEXG_EXPORT TempRaster<std::int32_t>;
-extern template class VEXG_EXPORT TempRaster<float>;
-extern template class VEXG_EXPORT TempRaster<double>;
+VEXG_EXTERN(EIGHT, TempRaster);
 
 }  // namespace lumo

@@ -3,6 +3,7 @@
 //   VEXG_ALLOCATIONS_ABOVE   bytes; smaller allocations are not counted
 //   VEXG_ALLOCATION_FAILS    the allocation that fails, counted from 1; none when absent
 //   VEXG_ALLOCATION_COUNT    a file that gets their number when the program ends
+//   VEXG_ALLOCATION_TRACE    a file that gets the addresses of the calls that led to the failure
 //
 // Operators new of the C++ library allocate by malloc and so fail alike.
 
@@ -11,7 +12,9 @@
 #include <cstddef>
 #include <cstdio>
 #include <cstdlib>
+#include <execinfo.h>
 #include <fcntl.h>
+#include <iterator>
 #include <unistd.h>
 
 extern "C" {
@@ -30,12 +33,24 @@ unsigned long NumberFrom(const char* variable, unsigned long otherwise) {
   return text != nullptr ? std::strtoul(text, nullptr, 10) : otherwise;
 }
 
+/// Writes who asked for the allocation that fails.
+void Trace() {
+  const char* const file = std::getenv("VEXG_ALLOCATION_TRACE");
+  if (file == nullptr) return;
+  const int descriptor = open(file, O_WRONLY | O_CREAT | O_TRUNC, 0600);
+  if (descriptor < 0) return;
+  void* calls[48];
+  backtrace_symbols_fd(calls, backtrace(calls, std::size(calls)), descriptor);
+  close(descriptor);
+}
+
 /// Whether this allocation is the one that fails.
 bool Fails(std::size_t bytes) {
   static const unsigned long above = NumberFrom("VEXG_ALLOCATIONS_ABOVE", 0);
   static const unsigned long nth = NumberFrom("VEXG_ALLOCATION_FAILS", 0);
   if (bytes < above) return false;
   if (++gCount != nth) return false;
+  Trace();
   errno = ENOMEM;
   return true;
 }

@@ -418,6 +418,7 @@ class Supervisor {
 pid_t Start(const Options& options, int socket) {
   const pid_t child = fork();
   if (child != 0) return child;
+  prctl(PR_SET_PDEATHSIG, SIGKILL);  // nobody would answer its calls any more
   const int listener = WatchThisProcess();
   SendDescriptor(socket, listener);
   if (listener >= 0) execv(options.program[0], options.program.data());

@@ -3,6 +3,7 @@
 import json
 import os
 import random
+import shutil
 import signal
 import subprocess
 import unittest
@@ -67,8 +68,9 @@ class Pyramids(PipeTest, FolderTest):
     def test_statistics_come_with_it(self):
         before = self.fine("stats", self.file, "--json")
         self.fine("pyramid", "build", self.file)
-        self.file.write_bytes(bytes(len(self.pixels)))  # what is told now is out of the pyramid
-        os.utime(self.pyramid)
+        time = self.file.stat().st_mtime_ns
+        self.file.write_bytes(bytes(len(self.pixels)))
+        os.utime(self.file, ns=(time, time))  # unnoticed: what is told now is out of the pyramid
         after = json.loads(self.fine("stats", self.file, "--json"))
         for want, got in zip(json.loads(before)["bands"], after["bands"]):
             for name in ("count", "min", "max", "sum", "sum2"):
@@ -84,15 +86,65 @@ class Pyramids(PipeTest, FolderTest):
         self.fine("quicklook", self.file, self.folder / "out.png", "--size", 75, "--stretch", "none")
         self.assertEqual(read_png(self.folder / "out.png"), (75, 50, 3, every(self.pixels, 2)))
 
-    def test_one_that_is_older_than_the_raster_is_not_used(self):
+    def looks(self, file=None):
+        """Whether the pyramid beside a raster is used, and what is said."""
+        code, out, err = run("info", "--json", str(file or self.file))
+        self.assertEqual(code, 0, err)
+        return json.loads(out)["hasPyramid"], err
+
+    def test_one_that_was_not_built_from_the_raster_as_it_is_is_left_out(self):
+        other = self.folder / "other"
+        write_orva(other, SAMPLES, LINES, BANDS, bytes(len(self.pixels)))
+        os.utime(other, (1e9, 1e9))
+        changes = {
+            "an older file of the same size": lambda: shutil.copy2(other, self.file),
+            "an older file under the name": lambda: (shutil.copy(other, self.folder / "new"),
+                                                     os.utime(self.folder / "new", (9e8, 9e8)),
+                                                     os.replace(self.folder / "new", self.file)),
+            "a nanosecond": lambda: os.utime(self.file, ns=(self.file.stat().st_mtime_ns - 1,) * 2),
+            "a byte": lambda: self.file.write_bytes(self.pixels + b"x"),
+        }
+        for name, change in changes.items():
+            with self.subTest(name):
+                self.fine("pyramid", "build", self.file)
+                self.assertEqual(self.looks(), (True, ""))
+                change()
+                used, err = self.looks()
+                self.assertFalse(used)
+                self.assertEqual(err, f"vexg: warning: {self.pyramid} was built from another state of the raster "
+                                      "and is not used; vexg pyramid build makes it anew\n")
+                # Who names it gets it, or is refused.
+                job = f'<Job><Command Name="a" ID="OpenRasterCommand"><Input ConnStr="{self.file}" ' \
+                      f'PyramidConnStr="Pyramid|{self.pyramid}"/></Command></Job>'
+                self.assertIn('Result="Success"', self.fine("run", "-q", "-", stdin=job))
+
+    def test_one_that_moves_with_its_raster_stays_its_pyramid(self):
         self.fine("pyramid", "build", self.file)
-        os.utime(self.pyramid, (1, 1))
-        code, out, err = run("info", "--json", str(self.file))
-        self.assertEqual(code, 0)
-        self.assertFalse(json.loads(out)["hasPyramid"])
-        self.assertEqual(err.count("is older than the raster"), 1)
+        away = self.folder / "away"
+        away.mkdir()
+        for name in self.files():
+            if name != "away":
+                shutil.copy2(self.folder / name, away / name)
+        self.assertEqual(self.looks(away / "scene"), (True, ""))
+        self.fine("stats", self.file, "--save")  # the header changes, not the pixels
+        self.assertEqual(self.looks(), (True, ""))
+
+    def test_one_that_can_not_be_read_is_left_out_unless_it_is_named(self):
         self.fine("pyramid", "build", self.file)
-        self.assertTrue(json.loads(self.fine("info", "--json", self.file))["hasPyramid"])
+        whole = self.pyramid.read_bytes()
+        for content, why in ((b"VEXGPYRAMID01\n".ljust(9000, b"\0"), "the header is damaged"),
+                             (whole[:5000], "the file is cut off"), (b"Dear all", "isn't a whole pyramid")):
+            self.pyramid.write_bytes(content)
+            used, err = self.looks()
+            self.assertFalse(used)
+            self.assertEqual(err, f"vexg: warning: {self.pyramid}: {why}; it is not used\n")
+            self.fails(1, why, "pyramid", "info", self.file, "--output", self.pyramid)
+        os.remove(self.pyramid)
+        self.fine("pyramid", "build", self.file)
+        write_orva(self.file, SAMPLES, LINES, BANDS - 1, self.pixels)
+        used, err = self.looks()
+        self.assertFalse(used)
+        self.assertIn("scene.pyr is of a raster of another size and is not used", err)
 
     def test_what_can_not_be_is_refused(self):
         for words, options in (("--levels", ["--levels", "3-1"]), ("--levels", ["--levels", "1-32"]),
@@ -104,7 +156,6 @@ class Pyramids(PipeTest, FolderTest):
         self.assertEqual(letter.read_text(), "Dear all")
         self.fails(1, "No such file", "pyramid", "delete", self.file, "--output", self.folder / "none")
         self.pyramid.write_bytes(b"VEXGPYRAMID01\n".ljust(9000, b"\0"))
-        self.fails(1, "scene.pyr: the header is damaged", "info", self.file)
         self.fine("pyramid", "build", self.file)  # makes it good again
         self.assertEqual(self.level(1)[2], every(self.pixels, 1))
 

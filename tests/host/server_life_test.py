@@ -293,13 +293,14 @@ class Clients(Server):
         client.wait()
         client.stdout.close()
         client.stderr.close()
-        for left in pathlib.Path("/dev/shm").glob(f"vexg-submit-{client.pid}"):
-            left.unlink()  # of a client that could not
+        left = f"vexg-submit.*-{client.pid}-*"  # of a client that could not remove it
+        self.assertEqual(len(list(pathlib.Path("/dev/shm").glob(left))), 1)
 
         client = start("submit", "--server", "test", "--progress=json", "-")
         client.stdin.write(f"<Job>{WAIT}</Job>")
         client.stdin.close()
         self.until(self.jobs)
+        self.assertEqual(list(pathlib.Path("/dev/shm").glob(left)), [])
         number = self.jobs()[0]["job"]
         self.assertEqual(run("abort", "test", str(number)), (0, "", ""))
         out, err = client.stdout.read(), client.stderr.read()

@@ -9,7 +9,7 @@ import shutil
 import subprocess
 import unittest
 
-from support import DATA, FolderTest, needs_data, needs_gdal, read_npy, read_png, run, table, write_orva
+from support import DATA, FolderTest, needs_data, needs_gdal, read_npy, read_png, run, start, table, write_orva
 
 
 class RasterTest(FolderTest):
@@ -294,6 +294,47 @@ class Calibrate(RasterTest):
         self.fine(*arguments, "--overwrite")
         self.assertEqual(out.read_bytes(), by_job)
 
+
+
+class Together(RasterTest):
+    """Programs that store different things of one raster at once, and that make one pyramid."""
+
+    SAVES = [["stats"], ["hist", "--bands", "0"], ["hist", "--bands", "1"], ["hist", "--bands", "2"]]
+
+    def test_saves_keep_each_other(self):
+        pixels = bytes(range(250)) * 12
+        file = write_orva(self.folder / "scene", 100, 10, 3, pixels)
+        rasters = [file]
+        if shutil.which("gdal_translate"):
+            self.fine("copy", file, self.folder / "scene.tif")
+            rasters.append(self.folder / "scene.tif")
+        for raster in rasters:
+            with self.subTest(raster.name):
+                runs = [start(*save, "--save", "-q", str(raster)) for save in self.SAVES]
+                for process in runs:
+                    _, err = process.communicate(timeout=60)
+                    self.assertEqual((process.returncode, err), (0, ""))
+                self.check(raster)
+
+    def check(self, raster):
+        beside = [raster.with_name(raster.name + end) for end in (".hdr", ".aux.xml")]
+        text = "".join(path.read_text() for path in beside if path.exists())
+        histograms = text.count("<HistItem>") or text.count(" Dynamic ")
+        statistics = text.count("STATISTICS_MEAN") or text[text.index("\nstatistics"):].split("}")[0].count(",") + 1
+        self.assertEqual((histograms, statistics), (3, 3))
+
+    def test_of_two_builders_one_wins_whole(self):
+        file = write_orva(self.folder / "scene", 300, 200, 3, bytes(180000))
+        for _ in range(3):
+            runs = [start("pyramid", "build", "-q", "--levels", levels, str(file)) for levels in ("1", "1-2", "1-3")]
+            ends = [(process.communicate(timeout=60)[1], process.returncode) for process in runs]
+            winners = [i for i, (_, code) in enumerate(ends) if code == 0]
+            self.assertTrue(winners)
+            for err, code in ends:
+                self.assertEqual("another program has built it meanwhile" in err, code == 1)
+            last = json.loads(self.fine("info", "--json", file))["pyramidLevels"][1]
+            self.assertIn(last - 1, winners)
+            self.assertEqual(sorted(path.name for path in self.folder.iterdir()), ["scene", "scene.hdr", "scene.pyr"])
 
 
 class Waiting(FolderTest):

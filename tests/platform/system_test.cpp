@@ -12,6 +12,7 @@
 #include "platform/module.h"
 #include "platform/process_watch.h"
 #include "platform/shared_memory.h"
+#include "platform/temporary_file.h"
 
 namespace lumo::platform {
 namespace {
@@ -107,6 +108,26 @@ TEST(ProcessWatch, TellsTheEndOfAnotherProcess) {
   waitpid(child, nullptr, 0);
   const ProcessWatch late(child, [&] { ++told; });  // of one that has ended already
   EXPECT_TRUE(until(2));
+}
+
+TEST(TemporaryFile, IsNeverNamedToAUser) {
+  const std::string folder = TemporaryFolderBeside("/data/scene.tif");
+  const std::string inside = TemporaryPathBeside(folder + "/scene.tif");
+  const struct {
+    std::string text, want;
+  } cases[] = {
+      {TemporaryPathBeside("/data/scene.tif") + ": full", "/data/scene.tif: full"},
+      {TemporaryPathBeside("scene.tif") + ".tif: full", "scene.tif: full"},
+      {TemporaryPathBeside("scene.tif") + ".msk: full", "scene.tif.msk: full"},
+      {folder + "/scene.tif: full", "/data/scene.tif: full"},
+      {TemporaryFolderBeside("scene.tif") + "/scene.tif: full", "scene.tif: full"},
+      {"can't move " + inside + ".tif to " + folder + "/scene.tif",
+       "can't move /data/scene.tif to /data/scene.tif"},
+      {"v1.2-3-4-5-6.tiff: is no file", "v1.2-3-4-5-6.tiff: is no file"},
+      {"/data/a.b-c.tmp: full", "/data/a.b-c.tmp: full"},
+      {"", ""},
+  };
+  for (const auto& c : cases) EXPECT_EQ(WithoutTemporaryNames(c.text), c.want) << c.text;
 }
 
 TEST(Module, SaysWhyItCannotBeLoaded) {

@@ -2,7 +2,9 @@
 #include <fstream>
 #include <unistd.h>
 
+#include "foundation/warnings.h"
 #include "gdal_peer.h"
+#include "raster/raster_details.h"
 #include "support/file_size_limit.h"
 #include "support/sample_data.h"
 #include "support/temporary_directory.h"
@@ -237,6 +239,7 @@ TEST(GdalFaults, ANewFileTakesThePlaceOfTheOlderOneWithAllThatBelongsToIt) {
   PutContents(path, "older");
   PutContents(path + ".aux.xml", "<PAMDataset/>");
   PutContents(path + ".ovr", "older");
+  PutContents(path + ".hdr", "ORVA\nend = ORVA\n");  // would tell of the new file
   PutContents(directory.Path() / "a.txt", "somebody else's");
   const RasterDef def = BytesDef("TIFF");
   auto made = CreateSource({path}, def);
@@ -246,6 +249,92 @@ TEST(GdalFaults, ANewFileTakesThePlaceOfTheOlderOneWithAllThatBelongsToIt) {
   ASSERT_EQ(Release(made), "");
   EXPECT_EQ(NamesIn(directory.Path()), (std::vector<std::string>{"a.tif", "a.txt"}));
   EXPECT_TRUE(ReadsWhole(OpenSource({path})));
+}
+
+/// Wherever the disk is full while a TIFF file's directories, its pixels or the file beside it are
+/// written, the run comes to its end, with the whole file or with the older one.
+TEST(GdalFaults, ATiffFileIsGivenUpAfterItsFirstFailedWrite) {
+  test::TemporaryDirectory directory;
+  const std::string path = (directory.Path() / "a.tif").string();
+  PutContents(path, "older");
+  RasterDef def = BytesDef("TIFF");
+  def.samples = def.lines = 20;
+  for (unsigned band = 0; band < 60; ++band) {
+    def.metadata.Set(BandDetailPath(band, "Description"), String(std::string(30, 'x')));
+  }
+  def.bands = 60;
+  Block<std::uint8_t> block{{0, 0, 19, 19}, {}, std::vector<std::uint8_t>(60 * 400, 7), {}};
+  block.state.resize(block.pixels.size());
+  for (unsigned band = 0; band < 60; ++band) block.bands.push_back(band);
+  unsigned failed = 0;
+  for (rlim_t bytes = 0;; bytes += 700) {
+    SCOPED_TRACE(bytes);
+    std::string fault;
+    bool isMade = false;
+    {
+      const test::FileSizeLimit limit(bytes);
+      TakeFault();
+      auto made = CreateSource({path}, def);
+      isMade = made && block.Write(*ReaderOf<std::uint8_t>(made));
+      fault = TakeFault().ToUTF8();
+      const std::string late = made ? Release(made) : "";
+      isMade = isMade && late.empty();
+      if (fault.empty()) fault = late;
+    }
+    if (isMade) break;
+    ++failed;
+    EXPECT_EQ(fault, path + ": File too large");
+    ASSERT_EQ(Contents(path), "older");
+    ASSERT_EQ(NamesIn(directory.Path()), std::vector<std::string>{"a.tif"});
+    ASSERT_LT(bytes, 1U << 20);
+  }
+  EXPECT_GT(failed, 10U);
+  EXPECT_TRUE(ReadsWhole(OpenSource({path})));
+}
+
+/// Two that make a file at one place at once: the first to be whole stays, the other says so.
+TEST(GdalFaults, OfTwoMakersOneWinsAndTheOtherSaysSo) {
+  for (const char* const format : {"TIFF", "Erdas", "PNG"}) {
+    for (const bool hasOlder : {false, true}) {
+      SCOPED_TRACE(std::string(format) + (hasOlder ? " over an older one" : ""));
+      test::TemporaryDirectory directory;
+      const std::string path = (directory.Path() / "a").string();
+      if (hasOlder) PutContents(path, "older");
+      RasterDef large = BytesDef(format), small = large;
+      small.lines = 7;
+      auto first = CreateSource({path}, large), second = CreateSource({path}, small);
+      ASSERT_TRUE(first && second) << TakeFault().ToUTF8();
+      EXPECT_EQ(Release(second), "");
+      EXPECT_EQ(Release(first), path + ": was made by another program meanwhile");
+      EXPECT_EQ(NamesIn(directory.Path()), std::vector<std::string>{"a"});
+      EXPECT_EQ(OpenSource({format, path})->RasterDef().lines, 7U);
+    }
+  }
+}
+
+/// A file beside a raster that is damaged is left out with a warning; the raster can be read.
+TEST(GdalFaults, ADamagedFileBesideARasterIsAWarning) {
+  const struct {
+    const char* suffix;
+    const char* what;
+  } cases[] = {{".aux.xml", "isn't whole"},
+               {".ovr", "holds no levels that can be read"},
+               {".msk", "holds no mask that can be read"}};
+  for (const auto& c : cases) {
+    SCOPED_TRACE(c.suffix);
+    test::TemporaryDirectory directory;
+    const std::string path = (directory.Path() / "a.tif").string();
+    fs::copy_file(test::SampleData("landsat7_u16_tiled.tif"), path);
+    TakeWarnings();
+    ASSERT_TRUE(OpenSource({path}));
+    EXPECT_TRUE(TakeWarnings().empty());
+    const std::string damaged = "<PAMDataset><Metadata>cut off";
+    PutContents(path + c.suffix, damaged);
+    const auto source = OpenSource({path});
+    ASSERT_TRUE(ReadsWhole(source));
+    EXPECT_EQ(TakeWarnings(),
+              (std::vector<std::string>{path + c.suffix + ": " + c.what + "; it is left out"}));
+  }
 }
 
 TEST(GdalFaults, ATargetThatCannotBeIsRefusedAtOnce) {

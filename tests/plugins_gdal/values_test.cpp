@@ -3,6 +3,8 @@
 #include <limits>
 
 #include "gdal_peer.h"
+#include "support/file_bytes.h"
+#include "support/file_size_limit.h"
 #include "support/sample_data.h"
 #include "support/temporary_directory.h"
 #include "views/catalog_raster_ref.h"
@@ -221,6 +223,60 @@ TEST(GdalValues, HistogramsComeBack) {
                                     SomeHistogram<std::uint8_t>(10, 2, 5), 19, 9.5);
   ExpectHistogramKept<std::uint8_t>(Copy("e.img", "HFA", GDT_Byte),
                                     SomeHistogram<std::uint8_t>(0, 1, 256), 255, -0.5);
+}
+
+/// Several that have a raster open store different things: all of them stay, and so does what was
+/// in the side file before.
+TEST(GdalValues, ConnectionsDoNotUndoOneAnother) {
+  const Copy copy("landsat7_olinda.tif");
+  {
+    const Peer peer(copy.Path());
+    GDALSetMetadataItem(peer.Band(0), "NOTE", "kept", nullptr);
+  }
+  std::vector<RasterDataConnectionPtr> sources;
+  std::vector<RasterReaderPtr<std::uint8_t>> readers;
+  for (int i = 0; i < 4; ++i) {
+    sources.push_back(OpenSource({copy.Path()}));
+    readers.push_back(ReaderOf<std::uint8_t>(sources.back()));
+    ASSERT_TRUE(readers.back());
+  }
+  for (const unsigned band : {0U, 1U}) {
+    Array<RasterBandStats<std::uint8_t>> stats{ArrayDims(1)};
+    stats[0] = StatsAtTheLimits<std::uint8_t>(band);
+    ASSERT_TRUE(readers[band]->WriteStats(stats)) << TakeFault().ToUTF8();
+    Array<RasterBandHistogram<std::uint8_t>> histograms{ArrayDims(1)};
+    histograms[0] = SomeHistogram<std::uint8_t>(0, 1, 256);
+    histograms[0].band = band;
+    ASSERT_TRUE(readers[2 + band]->WriteHistogram(histograms)) << TakeFault().ToUTF8();
+  }
+  for (auto& source : sources) Release(source);  // which stores nothing of what it knew
+  const auto source = OpenSource({copy.Path()});
+  const auto reader = ReaderOf<std::uint8_t>(source);
+  for (const unsigned band : {0U, 1U}) {
+    EXPECT_EQ(reader->ReadStats(band).mean, 1.0 / 3.0 + band);
+    EXPECT_EQ(reader->Histogram(band).GetCount(), 1U);
+  }
+  EXPECT_STREQ(GDALGetMetadataItem(Peer(copy.Path()).Band(0), "NOTE", nullptr), "kept");
+}
+
+/// A save that fails leaves the side file, and is not made up for later, when the raster is closed.
+TEST(GdalValues, AFailedSaveStaysOne) {
+  const Copy copy("landsat7_olinda.tif");
+  auto source = OpenSource({copy.Path()});
+  const auto reader = ReaderOf<std::uint8_t>(source);
+  Array<RasterBandStats<std::uint8_t>> stats{ArrayDims(1)};
+  stats[0] = StatsAtTheLimits<std::uint8_t>(0);
+  ASSERT_TRUE(reader->WriteStats(stats));
+  const std::string before = test::FileBytes(copy.Path() + ".aux.xml");
+  stats[0].mean = 7;
+  {
+    const test::FileSizeLimit limit(100);
+    EXPECT_FALSE(reader->WriteStats(stats));
+    EXPECT_EQ(TakeFault().ToUTF8(), copy.Path() + ".aux.xml: File too large");
+  }
+  EXPECT_EQ(reader->ReadStats(0).mean, 1.0 / 3.0);
+  Release(source);
+  EXPECT_EQ(test::FileBytes(copy.Path() + ".aux.xml"), before);
 }
 
 TEST(GdalValues, OnlyHistogramsOfBothSignsAreStored) {
@@ -455,6 +511,39 @@ TEST(GdalValues, LevelsAreBuiltBesideTheFileAndTakenAway) {
   Release(source);
   EXPECT_FALSE(fs::exists(copy.Path() + ".ovr"));
   EXPECT_EQ(copy.Bytes(), before);
+}
+
+/// Wherever a build of levels breaks off, what stood there stays as it was.
+TEST(GdalValues, LevelsThatCanNotBeBuiltLeaveTheOlderOnes) {
+  for (const bool hasOlder : {false, true}) {
+    const Copy copy("landsat7_u16_tiled.tif");
+    const std::string levels = copy.Path() + ".ovr";
+    auto source = OpenSource({copy.Path()});
+    const auto reader = ReaderOf<std::uint16_t>(source);
+    if (hasOlder) {
+      ASSERT_TRUE(reader->PyramidBuild(3, 3, 0, TileDimensions{}));
+    }
+    const std::string older = hasOlder ? test::FileBytes(levels) : "";
+    unsigned failed = 0;
+    for (rlim_t bytes = 0; bytes < (1 << 20); bytes += 15000) {
+      SCOPED_TRACE(testing::Message() << hasOlder << ' ' << bytes);
+      bool isBuilt = false;
+      {
+        const test::FileSizeLimit limit(bytes);
+        isBuilt = reader->PyramidBuild(1, 2, 0, TileDimensions{});
+      }
+      if (isBuilt) break;
+      ++failed;
+      EXPECT_EQ(TakeFault().ToUTF8(), levels + ": File too large");
+      ASSERT_EQ(fs::exists(levels) ? test::FileBytes(levels) : "", older);
+      ASSERT_EQ(std::distance(fs::directory_iterator(fs::path(levels).parent_path()), {}),
+                hasOlder ? 2 : 1);
+      EXPECT_EQ(reader->PyramidExists(), hasOlder);
+    }
+    EXPECT_GT(failed, 2U);
+    ASSERT_TRUE(reader->PyramidExists());
+    EXPECT_EQ(reader->PyramidLevelMax(), hasOlder ? 3 : 2);
+  }
 }
 
 TEST(GdalValues, LevelsThatTheDriverBuiltShowInWhatIsOpen) {

@@ -181,6 +181,32 @@ TEST(OrvaCreation, NoRoomForTheHeaderLeavesNoRasterAndTheOlderOne) {
   }
 }
 
+/// Two that are made at one place at once: the first to be whole stays, the other says so.
+TEST(OrvaCreation, OfTwoMakersOneWinsAndTheOtherSaysSo) {
+  for (const bool hasOlder : {false, true}) {
+    for (const bool firstWins : {true, false}) {
+      SCOPED_TRACE(testing::Message() << "older " << hasOlder << ", first " << firstWins);
+      const TemporaryDirectory directory;
+      const auto path = std::filesystem::canonical(directory.Path()) / "scene";
+      if (hasOlder) Scene().Write<float>(path);
+      Scene small, large;
+      large.lines = 9;
+      auto first = CreateSource({path.string()}, small.Def(kDataTypeOf<double>));
+      auto second = CreateSource({path.string()}, large.Def(kDataTypeOf<double>));
+      ASSERT_TRUE(first && second) << TakeFault().ToUTF8();
+      ASSERT_TRUE(WriteRamp(small, *ReaderOf<double>(first)));
+      ASSERT_TRUE(WriteRamp(large, *ReaderOf<double>(second)));
+      EXPECT_EQ(Release(firstWins ? first : second), "");
+      EXPECT_EQ(Release(firstWins ? second : first),
+                path.string() + ": was replaced by another program meanwhile");
+      EXPECT_EQ(Names(directory.Path()), (NameList{"scene", "scene.hdr"}));
+      const Scene& whole = firstWins ? small : large;
+      EXPECT_TRUE(ReadFile(path) == whole.Pixels<double>(RampValue<double>));
+      EXPECT_EQ(OpenSource({"ORVA", path.string()})->RasterDef().lines, whole.lines);
+    }
+  }
+}
+
 TEST(OrvaCreation, AFileThatCanNotBeWrittenIsReadOnly) {
   if (geteuid() == 0) GTEST_SKIP() << "root may write everything";
   const TemporaryDirectory directory;
@@ -190,7 +216,14 @@ TEST(OrvaCreation, AFileThatCanNotBeWrittenIsReadOnly) {
   auto source = OpenSource({"ORVA", path.string()});
   ASSERT_TRUE(source);
   const auto reader = ReaderOf<float>(source);
-  EXPECT_FALSE(source->CanWrite() || reader->CanWritePixels(0) || reader->CanWriteStats());
+  EXPECT_FALSE(source->CanWrite() || reader->CanWritePixels(0));
+  // The format has room for statistics: that they can't be stored is a failure, not a matter of
+  // course.
+  RasterBandStats<float> stats;
+  stats.mask = StatsMask::Basic;
+  EXPECT_TRUE(reader->CanWriteStats() && reader->CanWriteHistogram());
+  EXPECT_FALSE(reader->WriteStats(MakeArray<RasterBandStats<float>>({stats})));
+  EXPECT_NE(TakeFault().ToUTF8().find("scene: Permission denied"), std::string::npos);
   EXPECT_FALSE((Block<float>{{0, 0, 0, 0}, {0}, {1.5F}, {0}}.Write(*reader)));
 }
 

@@ -140,9 +140,32 @@ TEST(OrvaValues, ConnectionsDoNotUndoOneAnother) {
   ASSERT_TRUE(first && second);
   ASSERT_TRUE(first->WriteStats(SomeStats<float>()));
   ASSERT_TRUE(second->WritePalette(0, SomePalette()));
-  auto source = OpenSource({"ORVA", path});
-  EXPECT_TRUE(ReaderOf<float>(source)->StatsExist(0));
-  EXPECT_TRUE(ReaderOf<float>(source)->HasPalette(0));
+  // Each knows only of its own: the statistics and histograms of other bands stay.
+  Array<RasterBandStats<float>> none{ArrayDims(4)};
+  for (unsigned band = 0; band < 4; ++band) none[band].band = band;
+  none[1].mask = StatsMask::Basic;
+  Array<RasterBandHistogram<float>> ofOne = SomeHistograms<float>(), ofTwo = ofOne;
+  for (RasterBandHistogram<float>& histogram : ofTwo) histogram.band = 2;
+  ASSERT_TRUE(first->WriteHistogram(ofOne) && second->WriteHistogram(ofTwo));
+  auto third = OpenSource({"ORVA", path});
+  const auto source = ReaderOf<float>(third);
+  EXPECT_TRUE(source->StatsExist(0) && source->StatsExist(2) && source->HasPalette(0));
+  EXPECT_EQ(source->Histogram(1).GetCount(), 2U);
+  EXPECT_EQ(source->Histogram(2).GetCount(), 2U);
+  auto fourth = OpenSource({"ORVA", path});
+  ASSERT_TRUE(first->WriteStats(SomeStats<float>()));
+  ASSERT_TRUE(ReaderOf<float>(fourth)->WriteStats(none)) << "which knows of bands 0 and 2";
+  auto fifth = OpenSource({"ORVA", path});
+  EXPECT_TRUE(ReaderOf<float>(fifth)->StatsExist(1));
+  EXPECT_FALSE(ReaderOf<float>(fifth)->StatsExist(0));
+  // What one knows of goes, and only that.
+  Array<RasterBandHistogram<float>> ofThree = ofOne;
+  for (RasterBandHistogram<float>& histogram : ofThree) histogram.band = 3;
+  ASSERT_TRUE(first->WriteHistogram(ofThree));
+  ASSERT_TRUE(ReaderOf<float>(fifth)->WriteHistogram({}));
+  auto last = OpenSource({"ORVA", path});
+  EXPECT_EQ(ReaderOf<float>(last)->Histogram(1).GetCount(), 0U);
+  EXPECT_EQ(ReaderOf<float>(last)->Histogram(3).GetCount(), 2U);
 }
 
 TEST(OrvaValues, ComplexPixelsHaveNoStatistics) {

@@ -1,6 +1,7 @@
 #include <fstream>
 
 #include "support/pyramid_scene.h"
+#include "views/file_state.h"
 
 namespace lumo::test {
 namespace {
@@ -179,6 +180,22 @@ TEST(PyramidFile, KeepsNoDataAndGeoReference) {
   ASSERT_TRUE(reader->ReadPixels(2, 1, 1, 1, bands, 2, pixels, states));
   EXPECT_EQ(states[0] & 1, 0);
   EXPECT_EQ(states[1] & 1, 1);
+}
+
+/// A file from before files kept the state of their raster's, or of a raster that is no file.
+TEST(PyramidFile, WithoutTheStateOfItsRasterItMustNotBeOlder) {
+  PyramidScene scene;
+  MakeFile(scene, 2, "COMPRESSION=LZ4");  // of a raster that is no file
+  const std::string raster = scene.Path() + ".raster";
+  fs::copy_file(scene.Path(), raster);  // any file of the size will do
+  const auto now = fs::last_write_time(raster);
+  for (const int seconds : {-1, 0, 1}) {
+    fs::last_write_time(scene.Path(), now + std::chrono::seconds(seconds));
+    const auto source = OpenSource({"Pyramid", raster}),
+               pyramid = OpenSource({"Pyramid", scene.Path()});
+    ASSERT_TRUE(source && pyramid);
+    EXPECT_EQ(FindMismatch(*source, *pyramid), seconds < 0 ? "is older than the raster" : "");
+  }
 }
 
 TEST(PyramidFile, TakesWholeTilesOnly) {

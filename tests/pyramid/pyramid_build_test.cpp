@@ -3,6 +3,8 @@
 #include <numeric>
 
 #include "pyramid/pyramid_process.h"
+#include "support/file_bytes.h"
+#include "support/file_size_limit.h"
 #include "support/pyramid_scene.h"
 
 namespace lumo::test {
@@ -323,6 +325,81 @@ TEST(PyramidBuild, OneThatDoesNotComeToItsEndLeavesTheOldLevels) {
       ASSERT_TRUE(again && !again->HasError());
       ExpectLevelOfRamp(*raster, 4);
     }
+  }
+}
+
+/// Wherever the disk is full, in the levels, the index or the statistics, a build either makes a
+/// whole file or leaves the older one.
+TEST(PyramidBuild, AFullDiskLeavesTheOldLevels) {
+  for (const bool hasOld : {false, true}) {
+    PyramidScene scene;
+    scene.Fake().samples = 300;
+    scene.Fake().lines = 100;
+    scene.Fake().bands = 2;
+    RasterPtr<std::int32_t> raster = scene.Open<std::int32_t>();
+    if (hasOld) {
+      ASSERT_TRUE(PyramidScene::Build(*raster, 1, 1, 16));
+    }
+    const std::string older = hasOld ? FileBytes(scene.Path()) : "";
+    bool isBuilt = false;
+    unsigned failed = 0;
+    for (rlim_t bytes = 6000; !isBuilt; bytes += 3000) {
+      SCOPED_TRACE(testing::Message() << "old " << hasOld << ", room for " << bytes);
+      {
+        const FileSizeLimit limit(bytes);
+        const AsyncPtr build = PyramidScene::Build(*raster, 1, 3, 16);
+        ASSERT_TRUE(build);
+        isBuilt = !build->HasError();
+      }
+      EXPECT_FALSE(raster->PyramidAsync());
+      const std::string fault = TakeFault().ToUTF8();
+      ASSERT_EQ(scene.CountFiles(), hasOld || isBuilt ? 1U : 0U);
+      if (isBuilt) break;
+      ++failed;
+      EXPECT_EQ(fault, scene.Path() + ": File too large");
+      ASSERT_EQ(std::filesystem::exists(scene.Path()) ? FileBytes(scene.Path()) : "", older);
+      EXPECT_EQ(raster->PyramidExists(), hasOld);
+      ASSERT_LT(bytes, 1U << 20);
+    }
+    EXPECT_GT(failed, 3U);
+    ExpectLevelOfRamp(*raster, 3);
+    raster = scene.Open<std::int32_t>();
+    EXPECT_TRUE(raster->StatsExist(1, StatsMask::Basic));
+    EXPECT_EQ(raster->BandHistogram(1).GetCount(), 1U);
+  }
+}
+
+/// Another program puts a pyramid to the place while one is built: that one stays.
+TEST(PyramidBuild, OfTwoBuildersOneWinsAndTheOtherSaysSo) {
+  for (const bool hasOld : {false, true}) {
+    PyramidScene scene;
+    scene.Fake().samples = 400;
+    scene.Fake().lines = 300;
+    const RasterPtr<std::int16_t> raster = scene.Open<std::int16_t>();
+    if (hasOld) {
+      ASSERT_TRUE(PyramidScene::Build(*raster, 1, 1, 16));
+    }
+    class Intruder final : public AsyncCallback {
+     public:
+      void OnProgress(double progress) override {
+        if (progress < 0.5 || isDone) return;
+        std::ofstream(path + ".other") << "another program's";
+        std::filesystem::rename(path + ".other", path);
+        isDone = true;
+      }
+      std::string path;
+      bool isDone = false;
+    };
+    auto* const intruder = new Intruder;
+    const AsyncCallbackPtr callback(intruder);
+    intruder->path = scene.Path();
+    const AsyncPtr build = PyramidScene::Build(*raster, 0, 4, 16, callback);
+    ASSERT_TRUE(build && intruder->isDone);
+    EXPECT_TRUE(build->HasError());
+    EXPECT_FALSE(raster->PyramidAsync());
+    EXPECT_EQ(TakeFault().ToUTF8(), scene.Path() + ": another program has built it meanwhile");
+    EXPECT_EQ(FileBytes(scene.Path()), "another program's");
+    EXPECT_EQ(scene.CountFiles(), 1U);
   }
 }
 

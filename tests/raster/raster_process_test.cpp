@@ -1,4 +1,5 @@
 #include <chrono>
+#include <future>
 
 #include "../../examples/scale_process.h"
 #include "support/test_rasters.h"
@@ -14,18 +15,15 @@ using Out = float;
 struct Scaling {
   Pointer<RampRaster<In>> ramp = MakeRamp<In>(40, 30, 2);
   Pointer<MemoryTestRaster<Out>> target{new MemoryTestRaster<Out>(40, 30, 2)};
-  Pointer<Array<double>> gains{new Array<double>(MakeArray<double>({2, 3}))};
-  Pointer<Array<double>> offsets{new Array<double>(MakeArray<double>({0.5, -1}))};
+  std::vector<double> gains{2, 3};
+  std::vector<double> offsets{0.5, -1};
   RasterIteratorPtr<In> from{new RasterIterator<In>(ramp, {7, 5})};
-  RasterIteratorPtr<Out> to{new RasterIterator<Out>(target, {7, 5})};
+  RasterPtr<Out> to{target};
   IPC ipc;
 
-  bool Run() {
-    example::ScaleProcess<In, Out> process(from, gains, offsets, to, ipc);
-    return process.RunProcess(0);
-  }
+  bool Run() { return example::Scale(TilesBy(from), gains, offsets, to, ipc); }
   Out Want(unsigned sample, unsigned line, unsigned band) const {
-    return static_cast<Out>((*gains)[band] * RampValue<In>(sample, line, band) + (*offsets)[band]);
+    return static_cast<Out>(gains[band] * RampValue<In>(sample, line, band) + offsets[band]);
   }
   /// Tiles, in the order of reading, that were written whole; the rest must not be touched.
   unsigned WrittenTiles() const {
@@ -64,7 +62,6 @@ TEST(RasterProcess, ComputesEveryPixelForAnyNumberOfThreads) {
 TEST(RasterProcess, OfOneTileIsDoneByOneToken) {
   Scaling scaling;
   scaling.from = RasterIteratorPtr<In>(new RasterIterator<In>(scaling.ramp, {40, 30}));
-  scaling.to = RasterIteratorPtr<Out>(new RasterIterator<Out>(scaling.target, {40, 30}));
   EXPECT_TRUE(scaling.Run());
   EXPECT_EQ(scaling.ramp->reads, 1U);
   EXPECT_EQ(scaling.WrittenTiles(), 36U);
@@ -79,13 +76,13 @@ TEST(RasterProcess, EndsAtATileThatCannotBeRead) {
 
 TEST(RasterProcess, EndsAtATileThatCannotBeWritten) {
   Scaling scaling;
-  scaling.to = RasterIteratorPtr<Out>(new RasterIterator<Out>(MakeRamp<Out>(40, 30, 2), {7, 5}));
+  scaling.to = MakeRamp<Out>(40, 30, 2);
   EXPECT_FALSE(scaling.Run());
 }
 
 TEST(RasterProcess, RefusesParametersThatItCannotUse) {
   Scaling few;
-  few.gains->Resize(ArrayDims(1));
+  few.gains.resize(1);
   EXPECT_FALSE(few.Run());
   EXPECT_EQ(few.WrittenTiles(), 0U);
 
@@ -106,13 +103,11 @@ TEST(RasterProcess, StopsAtAnAbortHalfWayWithWholeTilesOnly) {
 TEST(RasterProcess, OverASlowRasterEndsSoonAfterAnAbort) {
   Scaling scaling;
   scaling.ramp->delay = std::chrono::milliseconds(20);
-  const Pointer<example::ScaleProcess<In, Out>> process(new example::ScaleProcess<In, Out>(
-      scaling.from, scaling.gains, scaling.offsets, scaling.to, scaling.ipc));
-  ASSERT_TRUE(process->RunProcess(1));
+  auto run = std::async(std::launch::async, [&] { return scaling.Run(); });
   while (scaling.ramp->reads < 3) std::this_thread::yield();
   const auto start = std::chrono::steady_clock::now();
-  process->Abort();
-  process->WaitFinished();
+  scaling.ipc.abort->Set(true);
+  EXPECT_TRUE(run.get());
   const std::chrono::duration<double, std::milli> took = std::chrono::steady_clock::now() - start;
   RecordProperty("milliseconds", std::to_string(took.count()));
   EXPECT_LT(took.count(), 2000) << "the rule is 200 ms on an idle machine";

@@ -39,6 +39,16 @@ TEST(PixelTypes, HaveCodesAndNames) {
   EXPECT_EQ(ParseDataType("byte"), 0U);
 }
 
+// The lists of the preprocessor have the types of the sets, in their order.
+#define LISTED(T) , T
+#define LISTED_WITHIN(T, unused) , T
+template <typename First, typename... Ts>
+using Behind = TypeList<Ts...>;
+static_assert(std::is_same_v<Behind<void VEXG_EIGHT(LISTED)>, EightTypes>);
+static_assert(std::is_same_v<Behind<void VEXG_EIGHT_WITHIN(LISTED_WITHIN, 0)>, EightTypes>);
+static_assert(std::is_same_v<Behind<void VEXG_TEN(LISTED)>, TenTypes>);
+static_assert(std::is_same_v<Behind<void VEXG_TWELVE(LISTED)>, TwelveTypes>);
+
 TEST(PixelTypes, DispatchReachesItsSetOnly) {
   const auto reaches = [](auto set, unsigned code) {
     unsigned reached = 1000;

@@ -373,5 +373,22 @@ TEST(ThreadsHint, MayAskForMoreThanThereAreCores) {
   EXPECT_EQ(std::system(command.c_str()), 0);
 }
 
+TEST(ParallelFor, CallsAFunctionOnceForEachNumber) {
+  for (const unsigned count : {0U, 1U, 7U, 10'000U}) {
+    std::vector<std::atomic<int>> calls(count);
+    ParallelFor(count, nullptr, [&](unsigned i) { ++calls[i]; });
+    ParallelFor(count, nullptr, [&](unsigned begin, unsigned end) {
+      for (unsigned i = begin; i < end; ++i) ++calls[i];
+    });
+    for (const auto& n : calls) ASSERT_EQ(n, 2);
+  }
+  StandardAbortFlag abort;
+  std::atomic<unsigned> called{0};
+  ParallelFor(1'000'000, &abort, [&](unsigned) {
+    if (++called == 10) abort.Set(true);
+  });
+  EXPECT_LT(called, 1'000'000U);
+}
+
 }  // namespace
 }  // namespace lumo

@@ -5,7 +5,7 @@
 
 #include <fmt/format.h>
 
-#include "platform/process.h"
+#include "platform/owned_name.h"
 #include "raster/pixel_types.h"
 #include "verb.h"
 
@@ -109,8 +109,7 @@ BlockReader::BlockReader(JobSession& session, const String& raster, const Raster
     : session_(session),
       raster_(raster),
       shown_(shown),
-      memory_("vexg-block-" + std::to_string(platform::ProcessNumber()),
-              DataTypeBytes(info.dataType)) {}
+      memory_(platform::OwnedName("vexg-block"), DataTypeBytes(info.dataType)) {}
 
 void BlockReader::Read(const BlockRequest& block) {
   session_.CheckInterrupt();

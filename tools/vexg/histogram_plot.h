@@ -23,9 +23,6 @@ class HistogramPlot {
   /// @param histograms  one at least, each of one bin at least.
   explicit HistogramPlot(const std::vector<PlottedHistogram>& histograms);
 
-  /// Bytes that the picture takes at most.
-  std::uint64_t GetBytes() const { return pixels_.size(); }
-
   /// Writes the picture, in the format that the output's name tells.
   void Write(const OutputFile& output) const;
 

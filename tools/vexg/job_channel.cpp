@@ -1,7 +1,7 @@
 #include "job_channel.h"
 
 #include "commands/shared_memory_channel.h"
-#include "platform/process.h"
+#include "platform/owned_name.h"
 
 namespace lumo::host {
 namespace {
@@ -10,7 +10,7 @@ constexpr unsigned kSize = 8;
 
 }  // namespace
 
-JobChannel::JobChannel() : name_("vexg-submit-" + std::to_string(platform::ProcessNumber())) {
+JobChannel::JobChannel() : name_(platform::OwnedName("vexg-submit")) {
   block_ = platform::SharedMemoryBlock::Create(name_, kSize);
   if (block_ == nullptr) return;
   XMLElement job("Job");

@@ -4,83 +4,87 @@
 #include <cstdio>
 #include <cstdlib>
 #include <jpeglib.h>
-#include <vector>
 
 #include "verb.h"
 
 namespace lumo::host {
 
-/// The state that libjpeg works on. It writes into memory, so that only its own errors jump back
-/// into Guard; nothing that has a destructor may stand between.
-struct JpegWriter::Impl {
-  explicit Impl(const OutputFile& output) : file(output), shown(output.GetShownName()) {
-    jpeg.err = jpeg_std_error(&errors);
-    errors.error_exit = &OnError;
-    errors.output_message = &OnMessage;
-    jpeg.client_data = this;
+namespace {
+
+/// libjpeg writes into memory, so that only its own errors jump back into Guard; nothing that has a
+/// destructor may stand between.
+class JpegWriter final : public PictureWriter {
+ public:
+  JpegWriter(const OutputFile& output, unsigned width, unsigned height, unsigned channels)
+      : file_(output), shown_(output.GetShownName()) {
+    jpeg_.err = jpeg_std_error(&errors_);
+    errors_.error_exit = &OnError;
+    errors_.output_message = &OnMessage;
+    jpeg_.client_data = this;
+    Guard([&] {
+      constexpr int kQuality = 90;
+      jpeg_create_compress(&jpeg_);
+      jpeg_mem_dest(&jpeg_, &bytes_, &count_);
+      jpeg_.image_width = width;
+      jpeg_.image_height = height;
+      jpeg_.input_components = static_cast<int>(channels);
+      jpeg_.in_color_space = channels == 1 ? JCS_GRAYSCALE : JCS_RGB;
+      jpeg_set_defaults(&jpeg_);
+      jpeg_set_quality(&jpeg_, kQuality, TRUE);
+      jpeg_start_compress(&jpeg_, TRUE);
+    });
   }
-  ~Impl() {
-    jpeg_destroy_compress(&jpeg);
-    std::free(bytes);
+  ~JpegWriter() override {
+    jpeg_destroy_compress(&jpeg_);
+    std::free(bytes_);
   }
 
+  void WriteLine(const unsigned char* line) override {
+    Guard([&] {
+      JSAMPROW row = const_cast<JSAMPROW>(line);  // libjpeg only reads it
+      jpeg_write_scanlines(&jpeg_, &row, 1);
+    });
+  }
+
+  void Close() override {
+    Guard([&] { jpeg_finish_compress(&jpeg_); });
+    file_.Write(bytes_, count_);
+    file_.Close();
+  }
+
+ private:
   /// Runs calls of libjpeg; throws what went wrong in them.
   template <typename Calls>
   void Guard(const Calls& calls) {
-    if (setjmp(back) == 0) {
+    if (setjmp(back_) == 0) {
       calls();
       return;
     }
-    throw HostError(kExitFailed, shown + ": " + fault);
+    throw HostError(kExitFailed, shown_ + ": " + fault_);
   }
 
   static void OnError(j_common_ptr common) {
-    Impl& impl = *static_cast<Impl*>(common->client_data);
-    common->err->format_message(common, impl.fault);
-    std::longjmp(impl.back, 1);
+    JpegWriter& writer = *static_cast<JpegWriter*>(common->client_data);
+    common->err->format_message(common, writer.fault_);
+    std::longjmp(writer.back_, 1);
   }
   static void OnMessage(j_common_ptr) {}
 
-  FileWriter file;
-  const std::string shown;
-  jpeg_compress_struct jpeg{};
-  jpeg_error_mgr errors{};
-  std::jmp_buf back{};
-  char fault[JMSG_LENGTH_MAX] = "";
-  unsigned char* bytes = nullptr;  // libjpeg's; to be freed
-  unsigned long count = 0;
+  FileWriter file_;
+  const std::string shown_;
+  jpeg_compress_struct jpeg_{};
+  jpeg_error_mgr errors_{};
+  std::jmp_buf back_{};
+  char fault_[JMSG_LENGTH_MAX] = "";
+  unsigned char* bytes_ = nullptr;  // libjpeg's; to be freed
+  unsigned long count_ = 0;
 };
 
-JpegWriter::JpegWriter(const OutputFile& output, unsigned width, unsigned height, unsigned channels)
-    : impl_(std::make_unique<Impl>(output)) {
-  Impl& impl = *impl_;
-  impl.Guard([&] {
-    constexpr int kQuality = 90;
-    jpeg_create_compress(&impl.jpeg);
-    jpeg_mem_dest(&impl.jpeg, &impl.bytes, &impl.count);
-    impl.jpeg.image_width = width;
-    impl.jpeg.image_height = height;
-    impl.jpeg.input_components = static_cast<int>(channels);
-    impl.jpeg.in_color_space = channels == 1 ? JCS_GRAYSCALE : JCS_RGB;
-    jpeg_set_defaults(&impl.jpeg);
-    jpeg_set_quality(&impl.jpeg, kQuality, TRUE);
-    jpeg_start_compress(&impl.jpeg, TRUE);
-  });
-}
+}  // namespace
 
-JpegWriter::~JpegWriter() = default;
-
-void JpegWriter::WriteLine(const unsigned char* line) {
-  impl_->Guard([&] {
-    JSAMPROW row = const_cast<JSAMPROW>(line);  // libjpeg only reads it
-    jpeg_write_scanlines(&impl_->jpeg, &row, 1);
-  });
-}
-
-void JpegWriter::Close() {
-  impl_->Guard([&] { jpeg_finish_compress(&impl_->jpeg); });
-  impl_->file.Write(impl_->bytes, impl_->count);
-  impl_->file.Close();
+std::unique_ptr<PictureWriter> MakeJpegWriter(const OutputFile& output, unsigned width,
+                                              unsigned height, unsigned channels) {
+  return std::make_unique<JpegWriter>(output, width, height, channels);
 }
 
 }  // namespace lumo::host

@@ -2,26 +2,13 @@
 
 #include <memory>
 
-#include "output_file.h"
+#include "picture_writer.h"
 
 namespace lumo::host {
 
-/// Writes a picture into a JPEG file, line by line, at quality 90.
-class JpegWriter {
- public:
-  /// @param channels  1 grey, 3 colours. Throws HostError for a picture that JPEG can't hold.
-  JpegWriter(const OutputFile& output, unsigned width, unsigned height, unsigned channels);
-  ~JpegWriter();
-  JpegWriter(const JpegWriter&) = delete;
-  JpegWriter& operator=(const JpegWriter&) = delete;
-
-  void WriteLine(const unsigned char* line);
-  /// Ends the file, after the last line.
-  void Close();
-
- private:
-  struct Impl;
-  std::unique_ptr<Impl> impl_;
-};
+/// Makes a writer of a JPEG file of quality 90.
+/// @param channels  1 grey, 3 colours. Throws HostError for a picture that JPEG can't hold.
+std::unique_ptr<PictureWriter> MakeJpegWriter(const OutputFile& output, unsigned width,
+                                              unsigned height, unsigned channels);
 
 }  // namespace lumo::host

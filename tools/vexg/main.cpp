@@ -1,5 +1,4 @@
 #include <algorithm>
-#include <exception>
 #include <iostream>
 #include <map>
 
@@ -7,10 +6,13 @@
 
 #include "data/access_policy.h"
 #include "foundation/environment.h"
+#include "foundation/fault.h"
 #include "foundation/library.h"
 #include "foundation/near_name.h"
+#include "foundation/thrown.h"
 #include "option_values.h"
 #include "platform/debug_output.h"
+#include "platform/memory_shortage.h"
 #include "platform/module.h"
 #include "platform/process.h"
 #include "verb.h"
@@ -98,16 +100,26 @@ bool ChecksAreStrict() {
 }  // namespace lumo::host
 
 int main(int argc, char** argv) {
-  lumo::platform::SurviveClosedPipes();
+  namespace platform = lumo::platform;
+  platform::SurviveFailedWrites();
+  platform::EndInOrderWhenMemoryIsShort("vexg", lumo::host::kExitFailed);
+  int code = lumo::host::kExitFailed;
+  std::string why;
   try {
     return lumo::host::Run(argc, argv);
   } catch (const lumo::host::HostError& error) {
-    // Nothing in the making is left by now. Who has closed the pipe knows why there is no more.
-    if (lumo::platform::OutputIsClosed()) lumo::platform::EndOfClosedPipe();
-    lumo::host::Say(error.what());
-    return error.code;
-  } catch (const std::exception& error) {
-    lumo::host::Say(error.what());
-    return lumo::host::kExitFailed;
+    code = error.code;
+    why = error.what();
+  } catch (...) {
+    why = lumo::DescribeException();
   }
+  // Nothing in the making is left by now. Who has closed the pipe knows why there is no more.
+  if (platform::OutputIsClosed()) platform::EndOfClosedPipe();
+  // Where memory was short, all other reasons follow from that.
+  if (platform::CountMemoryShortages() != 0) {
+    code = lumo::host::kExitFailed;
+    why = platform::kOutOfMemory;
+  }
+  lumo::host::Say(why);
+  return code;
 }

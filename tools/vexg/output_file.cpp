@@ -3,11 +3,12 @@
 #include <algorithm>
 #include <cerrno>
 #include <iterator>
+#include <map>
 #include <system_error>
 
 #include <fmt/format.h>
 
-#include "output_moves.h"
+#include "platform/file_identity.h"
 #include "platform/file_moves.h"
 #include "platform/temporary_file.h"
 #include "verb.h"
@@ -25,10 +26,11 @@ std::string LastFault() {
   return code != 0 ? std::generic_category().message(code) : "the system does not say why";
 }
 
-/// The absolute path, with the links of all but its last part resolved.
+/// The absolute path, with the links of all but its last part resolved. Only the system knows where
+/// ".." behind a link leads.
 fs::path InResolvedFolder(const fs::path& path) {
   std::error_code fault;
-  const fs::path absolute = fs::absolute(path).lexically_normal();
+  const fs::path absolute = fs::absolute(path);
   return fs::weakly_canonical(absolute.parent_path(), fault) / absolute.filename();
 }
 
@@ -37,58 +39,57 @@ bool IsThere(const fs::path& path) {
   return fs::exists(fs::symlink_status(path, fault));
 }
 
-/// The names of files that may go with one of this name.
-std::vector<std::string> SideNames(const fs::path& target) {
-  std::vector<std::string> names;
-  for (const std::string ending : kSideEndings) {
-    // "scene.hdr" may be of "scene.img" as well.
-    if (target.has_extension() || ending != ".hdr")
-      names.push_back(target.filename().string() + ending);
-  }
-  return names;
+/// The paths of an input and of the files that may go with it, whether there are such or not.
+std::vector<fs::path> FilesOfInput(const fs::path& input) {
+  std::vector<fs::path> files{input};
+  const auto add = [&](const fs::path& base, std::initializer_list<const char*> endings) {
+    for (const char* const ending : endings) files.push_back(fs::path(base).concat(ending));
+  };
+  add(input, {".hdr", ".aux.xml", ".ovr", ".msk", ".msk.ovr", ".pyr"});
+  fs::path plain = input;
+  plain.replace_extension();
+  add(plain, {".hdr", ".aux", ".rrd", ".ige", ".prj", ".rpb", ".RPB", ".imd", ".IMD", ".tfw"});
+  return files;
+}
+
+/// True when two paths name one file, or would if it were there.
+bool IsSame(const fs::path& a, const fs::path& b) {
+  return a == b ||
+         platform::IdentifyFile(a.string()).IsSameFile(platform::IdentifyFile(b.string()));
 }
 
 }  // namespace
 
-OutputFile::OutputFile(const std::string& file, bool overwrite,
-                       const std::vector<std::string>& inputs)
-    : shown_(file), target_(fs::absolute(file)), overwrite_(overwrite) {
+OutputFile::OutputFile(const std::string& file, const OutputRules& rules)
+    : shown_(file), target_(fs::absolute(file)), rules_(rules) {
   std::error_code fault;
   if (!target_.has_filename()) Refuse("is no name of a file");
   if (!fs::is_directory(target_.parent_path(), fault)) {
+    if (fault && fault != std::errc::no_such_file_or_directory) Refuse(fault.message());
     Refuse("there is no folder " + target_.parent_path().string());
   }
-  for (const std::string& input : inputs) RefuseInput(input);
   const fs::file_status status = fs::status(target_, fault);
   if (fs::is_directory(status)) Refuse("is a folder");
   if (fs::exists(status) && !fs::is_regular_file(status)) Refuse("is no file that can be replaced");
   for (const std::string& left : platform::FindAbandonedFolders(target_.string())) {
     OutputMoves::Recover(left, target_.parent_path().string());
   }
-  for (const std::string& name : NamesInPlace({})) CheckPlace(name);
 }
 
 void OutputFile::RefuseInput(const std::string& input) {
-  std::error_code fault;
   // "FILE|NAME=VALUE" is a raster in a file.
   const fs::path source = InResolvedFolder(input.substr(0, input.find('|')));
   const fs::path target = InResolvedFolder(target_);
-  const auto isSame = [&](const fs::path& a, const fs::path& b) {
-    return a == b || fs::equivalent(a, b, fault);
-  };
-  // Neither the input nor what goes with it may be replaced, whatever names lead there.
-  bool collides = isSame(target, source);
-  for (const std::string& name : SideNames(source)) {
-    collides = collides || isSame(target, source.parent_path() / name);
-    for (const std::string& own : SideNames(target)) {
-      collides = collides ||
-                 fs::equivalent(target.parent_path() / own, source.parent_path() / name, fault);
+  std::vector<fs::path> own{target};
+  for (const std::string& name : SideNames()) own.push_back(target.parent_path() / name);
+  for (const fs::path& file : FilesOfInput(source)) {
+    for (const fs::path& made : own) {
+      // Two files that go with others, and are not there, are none of each other's.
+      const bool isSide = made != target && file != source && !IsThere(file);
+      if (isSide || !IsSame(made, file)) continue;
+      Refuse("is a file of the input, or another output; nothing was run");
     }
   }
-  for (const std::string& own : SideNames(target)) {
-    collides = collides || isSame(target.parent_path() / own, source);
-  }
-  if (collides) Refuse("is a file of the input, or another output; nothing was run");
   inputs_.push_back(source.string());
 }
 
@@ -102,7 +103,19 @@ void OutputFile::Refuse(const std::string& why) const {
 }
 
 void OutputFile::FailMove(const std::string& why) const {
-  throw HostError(kExitFailed, shown_ + ": can't be written: " + InUsersWords(why));
+  if (errno == EEXIST) {
+    throw HostError(kExitUsage, InUsersWords(why.substr(0, why.rfind(": "))) +
+                                    ": has been made by somebody else meanwhile; give --overwrite "
+                                    "to replace it");
+  }
+  const std::string prefix = GetName() + ": ";
+  throw HostError(kExitFailed,
+                  shown_ + ": can't be written: " +
+                      InUsersWords(why.starts_with(prefix) ? why.substr(prefix.size()) : why));
+}
+
+void OutputFile::CheckPlaces() const {
+  for (const std::string& name : NamesInPlace({})) CheckPlace(name);
 }
 
 void OutputFile::Begin(std::uint64_t bytes) {
@@ -119,10 +132,12 @@ void OutputFile::Begin(std::uint64_t bytes) {
 }
 
 std::string OutputFile::InUsersWords(std::string message) const {
-  const std::string work = GetWorkName();
-  for (std::size_t at = 0; (at = message.find(work, at)) != std::string::npos;) {
-    message.replace(at, work.size(), shown_);
-    at += shown_.size();
+  for (const std::string& name : {GetWorkName(), GetName()}) {
+    if (name == shown_) continue;
+    for (std::size_t at = 0; (at = message.find(name, at)) != std::string::npos;) {
+      message.replace(at, name.size(), shown_);
+      at += shown_.size();
+    }
   }
   return message;
 }
@@ -142,11 +157,22 @@ void OutputFile::CheckPlace(const std::string& name) const {
              "another name");
     }
   }
-  if (overwrite_) return;
+  if (rules_.overwrite) return;
   Refuse(isMain ? "is there already; give --overwrite to replace it"
                 : place.string() +
                       ", which goes with it, is there already; give --overwrite to "
                       "replace it");
+}
+
+/// The names of files that may go with the output.
+std::vector<std::string> OutputFile::SideNames() const {
+  std::vector<std::string> names;
+  for (const std::string ending : kSideEndings) {
+    // "scene.hdr" may be of "scene.img" as well.
+    const bool isOwn = target_.has_extension() || ending != ".hdr";
+    if (rules_.hasSides && isOwn) names.push_back(target_.filename().string() + ending);
+  }
+  return names;
 }
 
 /// The names of the files that were made, the main one among them.
@@ -164,7 +190,7 @@ std::vector<std::string> OutputFile::NamesMade() const {
 /// The names, in the output's place and beside it, that are taken: those of `made`, the output's
 /// own and those of files that describe it.
 std::vector<std::string> OutputFile::NamesInPlace(const std::vector<std::string>& made) const {
-  std::vector<std::string> names = SideNames(target_);
+  std::vector<std::string> names = SideNames();
   names.push_back(target_.filename().string());
   names.insert(names.end(), made.begin(), made.end());
   std::sort(names.begin(), names.end());
@@ -174,70 +200,125 @@ std::vector<std::string> OutputFile::NamesInPlace(const std::vector<std::string>
   return names;
 }
 
-void OutputFile::SyncMade(const std::vector<std::string>& made) const {
-  std::string why;
-  for (const std::string& name : made) {
-    if (!platform::SyncPath((folder_ / name).string(), &why)) FailMove(why);
-  }
-}
-
-void OutputFile::MoveAll(const std::vector<std::string>& made,
-                         const std::vector<std::string>& old) {
-  std::string why;
-  const std::string main = target_.filename().string();
-  if (made.size() == 1 && (old.empty() || (old.size() == 1 && old.front() == main))) {
-    const bool isMoved = overwrite_ ? platform::RenameFile(GetWorkName(), GetName(), &why)
-                                    : platform::RenameToNew(GetWorkName(), GetName(), &why);
-    if (isMoved) return;
-    if (errno == EEXIST) Refuse("has been made by somebody else meanwhile; give --overwrite");
-    FailMove(why);
-  }
-  OutputMoves moves(folder_.string(), target_.parent_path().string());
-  if (moves.Run(main, made, old, &why)) return;
-  if (!moves.IsPutBack()) {
-    why += "; the older file is in " + folder_.string();
-    folder_.clear();
-  }
-  if (errno == EEXIST) Refuse(why + "; somebody else has made it meanwhile");
-  FailMove(why);
-}
-
-void OutputFile::Commit() {
-  const std::vector<std::string> made = NamesMade();
-  if (std::find(made.begin(), made.end(), target_.filename().string()) == made.end()) {
+MovedFiles OutputFile::Collect() const {
+  MovedFiles files{folder_.string(),
+                   target_.parent_path().string(),
+                   target_.filename().string(),
+                   NamesMade(),
+                   {}};
+  if (std::find(files.made.begin(), files.made.end(), files.main) == files.made.end()) {
     throw HostError(kExitFailed, shown_ + ": was not written whole");
   }
-  const std::vector<std::string> old = NamesInPlace(made);
-  for (const std::string& name : old) CheckPlace(name);
-  if (isDurable_) SyncMade(made);
-  MoveAll(made, old);
+  files.old = NamesInPlace(files.made);
+  for (const std::string& name : files.old) CheckPlace(name);
+  return files;
+}
+
+bool OutputFile::MoveAtOnce(const MovedFiles& files) const {
+  const bool isFree = files.old.empty();
+  if (files.made.size() != 1 || !(isFree || files.old == files.made)) return false;
   std::string why;
-  if (isDurable_ && !platform::SyncPath(target_.parent_path().string(), &why)) FailMove(why);
+  const bool isMoved = rules_.overwrite ? platform::RenameFile(GetWorkName(), GetName(), &why)
+                                        : platform::RenameToNew(GetWorkName(), GetName(), &why);
+  if (!isMoved) FailMove(why);
+  return true;
+}
+
+Outputs::Outputs(Interruption& interruption, const OutputRules& rules,
+                 std::vector<std::string> inputs)
+    : interruption_(interruption), rules_(rules), inputs_(std::move(inputs)) {}
+
+void Outputs::Add(const std::string& file) {
+  files_.push_back(std::make_unique<OutputFile>(file, rules_));
+  OutputFile& added = *files_.back();
+  for (const std::string& input : inputs_) added.RefuseInput(input);
+  for (const auto& other : files_) {
+    if (other.get() != &added) added.RefuseInput(other->GetName());
+  }
+  added.CheckPlaces();
+  interruption_.Watch(added.GetName(), added.GetShownName());
+}
+
+void Outputs::RefuseInput(const std::string& input) {
+  for (const auto& file : files_) file->RefuseInput(input);
+}
+
+void Outputs::Begin(const std::vector<std::uint64_t>& bytes) {
+  std::map<std::uint64_t, std::uint64_t> taken;  // of each disk, by the outputs so far
+  for (std::size_t i = 0; i < files_.size(); ++i) {
+    const fs::path folder = fs::path(files_[i]->GetName()).parent_path();
+    std::uint64_t& sum = taken[platform::IdentifyFile(folder.string()).device];
+    sum += bytes[i];
+    files_[i]->Begin(sum);
+    interruption_.AddRemains(files_[i]->GetFolder());
+  }
+}
+
+std::string Outputs::InUsersWords(std::string message) const {
+  for (const auto& file : files_) message = file->InUsersWords(message);
+  return message;
+}
+
+void Outputs::Commit(const std::function<void()>& onTheWay) {
+  std::vector<MovedFiles> moved;
+  for (const auto& file : files_) {
+    moved.push_back(file->Collect());
+    std::string why;
+    for (const std::string& name : moved.back().made) {
+      if (!rules_.isDurable || platform::SyncPath(file->GetFolder() + "/" + name, &why)) continue;
+      file->FailMove(why);
+    }
+  }
+  const Interruption::Hold hold(interruption_);
+  onTheWay();
+  MoveAll(moved);
+  interruption_.SetDone();
+}
+
+void Outputs::MoveAll(const std::vector<MovedFiles>& moved) {
+  if (moved.empty() || (moved.size() == 1 && files_[0]->MoveAtOnce(moved[0]))) return;
+  OutputMoves moves(moved, rules_.isDurable);
+  std::string why;
+  if (moves.Run(&why)) return;
+  const int code = errno;
+  const OutputFile* failed = files_.front().get();
+  for (const auto& file : files_) {
+    if (why.starts_with(file->GetFolder()) || why.starts_with(file->GetName())) failed = file.get();
+  }
+  for (const std::string& folder : moves.GetStuckFolders()) {
+    why += "; the older file is in " + folder;
+    interruption_.DropRemains(folder);
+    for (const auto& file : files_) {
+      if (file->GetFolder() == folder) file->KeepFolder();
+    }
+  }
+  errno = code;
+  failed->FailMove(why);
 }
 
 FileWriter::FileWriter(const OutputFile& output) : shown_(output.GetShownName()) {
   errno = 0;
-  stream_.open(output.GetWorkName(), std::ios::binary | std::ios::trunc);
-  Check();
+  file_ = platform::RandomAccessFile::CreateOrEmpty(output.GetWorkName());
+  Check(file_ != nullptr);
 }
 
-void FileWriter::Check() const {
-  if (!stream_) throw HostError(kExitFailed, shown_ + ": can't be written: " + LastFault());
+void FileWriter::Check(bool isDone) const {
+  if (!isDone) throw HostError(kExitFailed, shown_ + ": can't be written: " + LastFault());
 }
 
 void FileWriter::Write(const void* data, std::size_t bytes) {
-  stream_.write(static_cast<const char*>(data), static_cast<std::streamsize>(bytes));
-  Check();
+  WriteAt(end_, data, bytes);
 }
 
 void FileWriter::WriteAt(std::uint64_t offset, const void* data, std::size_t bytes) {
-  stream_.seekp(static_cast<std::streamoff>(offset));
-  Write(data, bytes);
+  errno = 0;
+  Check(file_->Write(offset, data, bytes));
+  end_ = offset + bytes;
 }
 
 void FileWriter::Close() {
-  stream_.close();
-  Check();
+  errno = 0;
+  Check(file_->Close());
 }
 
 }  // namespace lumo::host

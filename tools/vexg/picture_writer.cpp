@@ -10,30 +10,20 @@
 namespace lumo::host {
 namespace {
 
-class PngPicture final : public PictureWriter {
+/// A JPEG of a picture that may have alpha.
+class OpaquePicture final : public PictureWriter {
  public:
-  PngPicture(const OutputFile& output, unsigned width, unsigned height, unsigned channels)
-      : writer_(output, width, height, channels, 8) {}
-  void WriteLine(const unsigned char* line) override { writer_.WriteLine(line); }
-  void Close() override { writer_.Close(); }
-
- private:
-  PngWriter writer_;
-};
-
-class JpegPicture final : public PictureWriter {
- public:
-  JpegPicture(const OutputFile& output, unsigned width, unsigned height, unsigned channels)
+  OpaquePicture(const OutputFile& output, unsigned width, unsigned height, unsigned channels)
       : shown_(output.GetShownName()),
         width_(width),
         colors_(channels < 3 ? 1 : 3),
         hasAlpha_(channels % 2 == 0),
-        writer_(output, width, height, colors_),
+        writer_(MakeJpegWriter(output, width, height, colors_)),
         opaque_(std::size_t{width} * colors_) {}
 
   void WriteLine(const unsigned char* line) override {
     if (!hasAlpha_) {
-      writer_.WriteLine(line);
+      writer_->WriteLine(line);
       return;
     }
     for (std::size_t x = 0; x < width_; ++x, line += colors_ + 1) {
@@ -43,11 +33,11 @@ class JpegPicture final : public PictureWriter {
         opaque_[x * colors_ + i] = isOpaque ? line[i] : kWhite;
       }
     }
-    writer_.WriteLine(opaque_.data());
+    writer_->WriteLine(opaque_.data());
   }
 
   void Close() override {
-    writer_.Close();
+    writer_->Close();
     if (!hasAlpha_) return;
     Say(shown_ + ": note: a JPEG has no transparent pixels: those that are not valid are white");
   }
@@ -57,7 +47,7 @@ class JpegPicture final : public PictureWriter {
   const unsigned width_;
   const unsigned colors_;
   const bool hasAlpha_;
-  JpegWriter writer_;
+  const std::unique_ptr<PictureWriter> writer_;
   std::vector<unsigned char> opaque_;
 };
 
@@ -84,9 +74,10 @@ std::unique_ptr<PictureWriter> MakePictureWriter(const OutputFile& output, unsig
                                                  unsigned height, unsigned channels) {
   CheckPictureName(output.GetShownName());
   if (FormatOf(output.GetShownName()) == Format::kPng) {
-    return std::make_unique<PngPicture>(output, width, height, channels);
+    constexpr unsigned kBits = 8;
+    return MakePngWriter(output, width, height, channels, kBits);
   }
-  return std::make_unique<JpegPicture>(output, width, height, channels);
+  return std::make_unique<OpaquePicture>(output, width, height, channels);
 }
 
 }  // namespace lumo::host

@@ -7,7 +7,7 @@
 
 namespace lumo::host {
 
-/// Writes a picture of 8 bits into a file, line by line.
+/// Writes a picture into a file, line by line.
 class PictureWriter {
  public:
   virtual ~PictureWriter() = default;

@@ -8,28 +8,59 @@
 #include "verb.h"
 
 namespace lumo::host {
+namespace {
 
-/// What libpng works on. Its errors jump back into Guard; nothing that has a destructor may stand
-/// between.
-struct PngWriter::Impl {
-  explicit Impl(const OutputFile& output) : file(output), shown(output.GetShownName()) {}
-  ~Impl() { png_destroy_write_struct(&png, &info); }
+int ColorType(unsigned channels) {
+  constexpr int kTypes[] = {PNG_COLOR_TYPE_GRAY, PNG_COLOR_TYPE_GRAY_ALPHA, PNG_COLOR_TYPE_RGB,
+                            PNG_COLOR_TYPE_RGB_ALPHA};
+  return kTypes[channels - 1];
+}
 
+/// Errors of libpng jump back into Guard; nothing that has a destructor may stand between.
+class PngWriter final : public PictureWriter {
+ public:
+  PngWriter(const OutputFile& output, unsigned width, unsigned height, unsigned channels,
+            unsigned bits)
+      : file_(output), shown_(output.GetShownName()) {
+    png_ = png_create_write_struct(PNG_LIBPNG_VER_STRING, this, &OnError, &OnWarning);
+    if (png_ != nullptr) info_ = png_create_info_struct(png_);
+    if (info_ == nullptr) throw std::bad_alloc();
+    Guard([&] {
+      png_set_write_fn(png_, this, &OnWrite, &OnFlush);
+      png_set_user_limits(png_, PNG_UINT_31_MAX, PNG_UINT_31_MAX);
+      png_set_IHDR(png_, info_, width, height, static_cast<int>(bits), ColorType(channels),
+                   PNG_INTERLACE_NONE, PNG_COMPRESSION_TYPE_DEFAULT, PNG_FILTER_TYPE_DEFAULT);
+      png_write_info(png_, info_);
+      if (bits == 16 && std::endian::native == std::endian::little) png_set_swap(png_);
+    });
+  }
+  ~PngWriter() override { png_destroy_write_struct(&png_, &info_); }
+
+  void WriteLine(const unsigned char* line) override {
+    Guard([&] { png_write_row(png_, line); });
+  }
+
+  void Close() override {
+    Guard([&] { png_write_end(png_, nullptr); });
+    file_.Close();
+  }
+
+ private:
   /// Runs calls of libpng; throws what went wrong in them.
   template <typename Calls>
   void Guard(const Calls& calls) {
-    if (setjmp(png_jmpbuf(png)) == 0) {
+    if (setjmp(png_jmpbuf(png_)) == 0) {
       calls();
       return;
     }
-    if (thrown) std::rethrow_exception(thrown);
-    throw HostError(kExitFailed, shown + ": " + fault);
+    if (thrown_) std::rethrow_exception(thrown_);
+    throw HostError(kExitFailed, shown_ + ": " + fault_);
   }
 
-  static Impl& Of(void* pointer) { return *static_cast<Impl*>(pointer); }
+  static PngWriter& Of(void* pointer) { return *static_cast<PngWriter*>(pointer); }
 
   static void OnError(png_structp png, png_const_charp message) {
-    Of(png_get_error_ptr(png)).fault = message;
+    Of(png_get_error_ptr(png)).fault_ = message;
     png_longjmp(png, 1);
   }
   static void OnWarning(png_structp, png_const_charp) {}
@@ -41,59 +72,27 @@ struct PngWriter::Impl {
 
   bool TryWrite(const unsigned char* data, std::size_t bytes) {
     try {
-      file.Write(data, bytes);
+      file_.Write(data, bytes);
       return true;
     } catch (...) {
-      thrown = std::current_exception();
+      thrown_ = std::current_exception();
       return false;
     }
   }
 
-  FileWriter file;
-  const std::string shown;
-  png_structp png = nullptr;
-  png_infop info = nullptr;
-  const char* fault = "";
-  std::exception_ptr thrown;
+  FileWriter file_;
+  const std::string shown_;
+  png_structp png_ = nullptr;
+  png_infop info_ = nullptr;
+  const char* fault_ = "";
+  std::exception_ptr thrown_;
 };
-
-namespace {
-
-int ColorType(unsigned channels) {
-  constexpr int kTypes[] = {PNG_COLOR_TYPE_GRAY, PNG_COLOR_TYPE_GRAY_ALPHA, PNG_COLOR_TYPE_RGB,
-                            PNG_COLOR_TYPE_RGB_ALPHA};
-  return kTypes[channels - 1];
-}
 
 }  // namespace
 
-PngWriter::PngWriter(const OutputFile& output, unsigned width, unsigned height, unsigned channels,
-                     unsigned bits)
-    : impl_(std::make_unique<Impl>(output)) {
-  Impl& impl = *impl_;
-  impl.png =
-      png_create_write_struct(PNG_LIBPNG_VER_STRING, &impl, &Impl::OnError, &Impl::OnWarning);
-  if (impl.png != nullptr) impl.info = png_create_info_struct(impl.png);
-  if (impl.info == nullptr) throw std::bad_alloc();
-  impl.Guard([&] {
-    png_set_write_fn(impl.png, &impl, &Impl::OnWrite, &Impl::OnFlush);
-    png_set_user_limits(impl.png, PNG_UINT_31_MAX, PNG_UINT_31_MAX);
-    png_set_IHDR(impl.png, impl.info, width, height, static_cast<int>(bits), ColorType(channels),
-                 PNG_INTERLACE_NONE, PNG_COMPRESSION_TYPE_DEFAULT, PNG_FILTER_TYPE_DEFAULT);
-    png_write_info(impl.png, impl.info);
-    if (bits == 16 && std::endian::native == std::endian::little) png_set_swap(impl.png);
-  });
-}
-
-PngWriter::~PngWriter() = default;
-
-void PngWriter::WriteLine(const unsigned char* line) {
-  impl_->Guard([&] { png_write_row(impl_->png, line); });
-}
-
-void PngWriter::Close() {
-  impl_->Guard([&] { png_write_end(impl_->png, nullptr); });
-  impl_->file.Close();
+std::unique_ptr<PictureWriter> MakePngWriter(const OutputFile& output, unsigned width,
+                                             unsigned height, unsigned channels, unsigned bits) {
+  return std::make_unique<PngWriter>(output, width, height, channels, bits);
 }
 
 }  // namespace lumo::host

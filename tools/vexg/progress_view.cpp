@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <chrono>
 #include <exception>
+#include <set>
 
 #include <nlohmann/json.hpp>
 
@@ -35,6 +36,17 @@ std::string Bar(double progress) {
          std::string(3 - std::min<std::size_t>(percent.size(), 3), ' ') + percent + " %";
 }
 
+/// The views that are on show.
+struct Shown {
+  std::mutex mutex;
+  std::set<ProgressView*> views;
+
+  static Shown& Get() {
+    static auto* const shown = new Shown;  // for threads that outlast static objects
+    return *shown;
+  }
+};
+
 }  // namespace
 
 ProgressStyle ChooseProgressStyle(const std::string& word, bool quiet) {
@@ -46,11 +58,24 @@ ProgressStyle ChooseProgressStyle(const std::string& word, bool quiet) {
 
 ProgressView::ProgressView(const ProgressReportPtr& report, ProgressStyle style)
     : report_(report), style_(style), exceptions_(std::uncaught_exceptions()) {
-  if (style_ != ProgressStyle::kNone) thread_ = std::thread([this] { Watch(); });
+  if (style_ == ProgressStyle::kNone) return;
+  Shown& shown = Shown::Get();
+  const std::lock_guard lock(shown.mutex);
+  shown.views.insert(this);
+  thread_ = std::thread([this] { Watch(); });
 }
 
 ProgressView::~ProgressView() {
   if (!thread_.joinable()) return;
+  Shown& shown = Shown::Get();
+  {
+    const std::lock_guard lock(shown.mutex);
+    shown.views.erase(this);
+  }
+  End();
+}
+
+void ProgressView::End() {
   {
     const std::lock_guard lock(mutex_);
     ended_ = true;
@@ -58,6 +83,15 @@ ProgressView::~ProgressView() {
   wake_.notify_one();
   thread_.join();
   ShowEnd();
+}
+
+void ProgressView::EndAllShown() {
+  Shown& shown = Shown::Get();
+  shown.mutex.lock();  // for good: nothing is shown any more
+  for (ProgressView* const view : shown.views) {
+    view->outcome_ = Outcome::kAborted;
+    view->End();
+  }
 }
 
 void ProgressView::Watch() {

@@ -28,10 +28,14 @@ class ProgressView {
   ProgressView(const ProgressView&) = delete;
   ProgressView& operator=(const ProgressView&) = delete;
 
+  /// Ends what is on show now, as aborted; for a program that ends in the middle of it.
+  static void EndAllShown();
+
   /// Tells how the run ended, of one that no exception leaves.
   void SetOutcome(Outcome outcome) { outcome_ = outcome; }
 
  private:
+  void End();
   void Watch();
   void Show();
   void ShowEnd();

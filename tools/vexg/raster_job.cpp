@@ -1,10 +1,13 @@
 #include "raster_job.h"
 
 #include <algorithm>
+#include <exception>
+#include <utility>
 
 #include <CLI/CLI.hpp>
 
 #include "commands/job_parser.h"
+#include "foundation/abandonment.h"
 #include "option_values.h"
 #include "verb.h"
 
@@ -20,6 +23,12 @@ String RunHere(const String& document, const IPC& ipc) {
 }
 
 }  // namespace
+
+void AddDurableTo(CLI::App& app, bool& isDurable) {
+  app.add_flag("--durable", isDurable,
+               "End only when what was written outlasts a power cut, which nothing else promises; "
+               "a server always does");
+}
 
 void RasterJobOptions::AddTo(CLI::App& app) {
   app.add_option("--server", server.name, "Have the server of this name do the work")
@@ -73,20 +82,18 @@ String JobDraft::Write(const JobChannel* channel) const {
   return XMLSimpleWriter().Write(document);
 }
 
-JobSession::JobSession(const RasterJobOptions& options) {
-  if (!options.server.name.empty()) {
-    channel_ = std::make_unique<JobChannel>();
-    link_ = std::make_unique<ServerLink>(options.server);
-  }
-  interrupts_ = std::make_unique<platform::InterruptWatch>([this] {
-    ipc_.abort->Set(true);
-    if (channel_) channel_->Abort();
-  });
-  if (link_) link_->Connect();
-}
+JobSession::JobSession(const RasterJobOptions& options)
+    : channel_(options.server.name.empty() ? nullptr : std::make_unique<JobChannel>()),
+      link_(channel_ ? std::make_unique<ServerLink>(options.server) : nullptr),
+      exceptions_(std::uncaught_exceptions()),
+      interruption_([this] {
+        ipc_.abort->Set(true);
+        if (channel_) channel_->Abort();
+      }) {}
 
 JobSession::~JobSession() {
   try {
+    const AbandonScope abandonment(std::uncaught_exceptions() > exceptions_);
     CloseAll();
   } catch (const std::exception&) {
     // The server has gone, and with it what was open.
@@ -97,18 +104,28 @@ ProgressReportPtr JobSession::GetProgress() const {
   return channel_ ? channel_->GetProgress() : ipc_.progress;
 }
 
-void JobSession::CheckInterrupt() const {
-  if (ipc_.abort->IsSet()) throw HostError(kExitFailed, "interrupted; nothing was written");
-  if (channel_ && channel_->IsAborted()) {
-    throw HostError(kExitFailed, "the job was aborted; nothing was written");
-  }
+bool JobSession::IsInterrupted() const {
+  return ipc_.abort->IsSet() || (channel_ && channel_->IsAborted());
 }
 
-JobResults JobSession::Run(const JobDraft& draft) {
-  JobResults results;
-  JobResultParser(results).Parse(Execute(draft, true));
-  NoteOpenRasters(draft, results);
+void JobSession::CheckInterrupt() const {
+  if (!IsInterrupted() || interruption_.IsDone()) return;
+  throw HostError(kExitFailed, interruption_.Describe(ipc_.abort->IsSet() ? "interrupted"
+                                                                          : "the job was aborted"));
+}
+
+JobResults JobSession::Run(const JobDraft& draft, Interrupts interrupts) {
   CheckInterrupt();
+  JobResults results;
+  if (interrupts == Interrupts::kWait) {
+    const Interruption::Hold hold(interruption_);
+    JobResultParser(results).Parse(Execute(draft, false));
+  } else {
+    JobResultParser(results).Parse(Execute(draft, true));
+  }
+  NoteOpenRasters(draft, results);
+  const bool isDone = interrupts != Interrupts::kEnd && FindFailed(draft, results) == nullptr;
+  if (!isDone) CheckInterrupt();
   CheckResults(draft, results);
   SayNotes(draft, results);
   return results;
@@ -119,11 +136,14 @@ void JobSession::SayNotes(const JobDraft& draft, const JobResults& results) {
   for (const JobDraft::StepInfo& step : draft.GetSteps()) {
     const std::string note = results.Find(step.name).returns.Find("Note").ToUTF8();
     if (step.opens.GetLength() != 0 && !note.empty() && said_.insert(note).second) Say(note);
+    const std::string warning = results.Find(step.name).returns.Find("Warning").ToUTF8();
+    if (!warning.empty() && said_.insert(warning).second) Say("warning: " + warning);
   }
 }
 
 /// @param watched  with the progress and the abort flag of the session.
 String JobSession::Execute(const JobDraft& draft, bool watched) {
+  if (link_ && !std::exchange(isConnected_, true)) link_->Connect();
   if (link_) return link_->Run(draft.Write(watched ? channel_.get() : nullptr));
   return RunHere(draft.Write(), watched ? ipc_ : IPC());
 }
@@ -146,25 +166,23 @@ void JobSession::NoteOpenRasters(const JobDraft& draft, const JobResults& result
   }
 }
 
-/// Says which inputs had no effect.
-void JobSession::SayNotes(const JobDraft& draft, const JobResults& results) const {
+/// The first step that did not succeed; null for none.
+const JobDraft::StepInfo* JobSession::FindFailed(const JobDraft& draft, const JobResults& results) {
   for (const JobDraft::StepInfo& step : draft.GetSteps()) {
-    const String note = results.Find(step.name).returns.Find("Note");
-    if (note.GetLength() != 0) Say("note: " + note.ToUTF8());
+    if (results.Find(step.name).result != "Success") return &step;
   }
+  return nullptr;
 }
 
-void JobSession::CheckResults(const JobDraft& draft, const JobResults& results) const {
-  for (const JobDraft::StepInfo& step : draft.GetSteps()) {
-    const std::string id = step.id.ToUTF8();
-    if (!results.HasKey(step.name)) {
-      throw HostError(kExitFailed, "the server does not know the command " + id);
-    }
-    const JobResult& result = results.Find(step.name);
-    if (result.result == "Success") continue;
-    const std::string reason = result.reason.ToUTF8();
-    throw HostError(kExitFailed, reason.empty() ? id + " failed without a reason" : reason);
+void JobSession::CheckResults(const JobDraft& draft, const JobResults& results) {
+  const JobDraft::StepInfo* const failed = FindFailed(draft, results);
+  if (failed == nullptr) return;
+  const std::string id = failed->id.ToUTF8();
+  if (!results.HasKey(failed->name)) {
+    throw HostError(kExitFailed, "the server does not know the command " + id);
   }
+  const std::string reason = results.Find(failed->name).reason.ToUTF8();
+  throw HostError(kExitFailed, reason.empty() ? id + " failed without a reason" : reason);
 }
 
 void JobSession::CloseAll() {

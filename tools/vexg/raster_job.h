@@ -7,12 +7,15 @@
 
 #include "commands/job_result.h"
 #include "commands/job_writer.h"
+#include "interruption.h"
 #include "job_channel.h"
-#include "platform/interrupt.h"
 #include "progress_view.h"
 #include "server_link.h"
 
 namespace lumo::host {
+
+/// Adds the option by which what a verb writes outlasts a power cut.
+void AddDurableTo(CLI::App& app, bool& isDurable);
 
 /// The options of a verb that does its work by jobs of its own.
 struct RasterJobOptions {
@@ -62,40 +65,54 @@ class JobDraft {
 
 using JobResults = Map<String, JobResult>;
 
+/// How a job goes with an interrupt.
+enum class Interrupts {
+  kEnd,            ///< it is ended, and its results do not count
+  kEndUnlessDone,  ///< it is ended, which its commands tell; where they say success, it was too
+                   ///< late
+  kWait,           ///< it is short, changes something, and runs to its end
+};
+
 /// Runs the jobs of a verb, in this process or by a server. What they opened and did not close is
-/// closed at the end, whatever happens. The first Ctrl-C aborts what runs.
+/// closed at the end, whatever happens; new files are given up then where an exception has ended
+/// the session. The first Ctrl-C ends what runs: see Interruption.
 class JobSession {
  public:
-  /// Throws HostError when the server doesn't answer.
+  /// The server is called with the first job.
   explicit JobSession(const RasterJobOptions& options);
   ~JobSession();
   JobSession(const JobSession&) = delete;
   JobSession& operator=(const JobSession&) = delete;
 
   /// Runs a job and gives the results of its commands by name. Throws HostError with the reason of
-  /// the first command that failed, or when the user interrupted it.
-  JobResults Run(const JobDraft& draft);
+  /// the first command that failed, when the user interrupted it, or when no server answers.
+  JobResults Run(const JobDraft& draft, Interrupts interrupts = Interrupts::kEnd);
 
   /// Progress of the job that runs, over all its commands.
   ProgressReportPtr GetProgress() const;
 
   /// Throws HostError once the user has interrupted.
   void CheckInterrupt() const;
+  bool IsInterrupted() const;
+
+  Interruption& GetInterruption() { return interruption_; }
 
  private:
   String Execute(const JobDraft& draft, bool watched);
   void NoteOpenRasters(const JobDraft& draft, const JobResults& results);
-  void SayNotes(const JobDraft& draft, const JobResults& results) const;
-  void CheckResults(const JobDraft& draft, const JobResults& results) const;
+  static const JobDraft::StepInfo* FindFailed(const JobDraft& draft, const JobResults& results);
+  static void CheckResults(const JobDraft& draft, const JobResults& results);
   void SayNotes(const JobDraft& draft, const JobResults& results);
   void CloseAll();
 
   IPC ipc_;  // of jobs in this process; its flag is that of all
   std::unique_ptr<JobChannel> channel_;
   std::unique_ptr<ServerLink> link_;  // null: in this process
-  std::unique_ptr<platform::InterruptWatch> interrupts_;
+  bool isConnected_ = false;
+  const int exceptions_;
   std::vector<String> open_;  // URIs
   std::set<std::string> said_;
+  Interruption interruption_;  // the last, since it uses the others
 };
 
 /// Has a server run a job of one verb. Throws HostError as a JobSession does.

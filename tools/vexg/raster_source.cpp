@@ -92,6 +92,11 @@ void AddOpen(JobDraft& draft, const std::string& name, const SourceOptions& sour
   open.AddInput("CheckSource", SourceCheck::kCompared);
 }
 
+std::vector<std::string> FilesOfSavedValues(const SourceOptions& source) {
+  const std::string file = FileOf(source);
+  return {file, file + ".hdr", file + ".aux.xml", file + ".pyr"};
+}
+
 std::string PyramidPathOf(const std::string& file) {
   return AbsoluteName(file) + ".pyr";
 }
@@ -103,15 +108,7 @@ std::string FindPyramid(const std::string& file) {
   if (file.find("://") != std::string::npos) return {};
   const std::string pyramid = PyramidPathOf(file);
   std::error_code fault;
-  if (!std::filesystem::is_regular_file(pyramid, fault)) return {};
-  const auto rasterTime = std::filesystem::last_write_time(AbsoluteName(file), fault);
-  if (fault || std::filesystem::last_write_time(pyramid, fault) >= rasterTime) return pyramid;
-  static bool isSaid = false;
-  if (!isSaid) {
-    Say(file + ".pyr is older than the raster and not used; vexg pyramid build makes it anew");
-  }
-  isSaid = true;
-  return {};
+  return std::filesystem::is_regular_file(pyramid, fault) ? pyramid : std::string();
 }
 
 }  // namespace
@@ -126,6 +123,7 @@ void AddOpenWithPyramid(JobDraft& draft, const std::string& name, const SourceOp
   const std::string pyramid = isPlain ? FindPyramid(source.file) : std::string();
   if (pyramid.empty()) return;
   open.AddInput("PyramidConnStr", ConnStrings({"Pyramid", String(pyramid)}));
+  open.AddInput("PyramidCheck", PyramidCheck::kFitting);
   open.AddInput("Levels", String(levels));
 }
 

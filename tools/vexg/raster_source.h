@@ -59,8 +59,12 @@ void AddOpen(JobDraft& draft, const std::string& name, const SourceOptions& sour
 /// Where the pyramid file of a raster lies unless the user says otherwise: beside it.
 std::string PyramidPathOf(const std::string& file);
 
-/// AddOpen, with the pyramid file beside the raster where there is one. One that is older than the
-/// raster tells of other pixels: it is left out, and the user hears of it.
+/// The files in which statistics and histograms that are saved with a raster may be: its own, its
+/// header, its side file, its pyramid.
+std::vector<std::string> FilesOfSavedValues(const SourceOptions& source);
+
+/// AddOpen, with the pyramid file beside the raster where there is one. One that was not built from
+/// the raster as it is tells of other pixels: it is left out, and the user hears of it.
 /// @param levels  which are shown of a raster that has levels of its own as well: Best or Told, see
 ///                OpenRasterCommand.
 void AddOpenWithPyramid(JobDraft& draft, const std::string& name, const SourceOptions& source,

@@ -12,8 +12,6 @@
 namespace lumo::host {
 namespace {
 
-constexpr const char* kCloseStep = "close.target";
-
 /// The format that the ending of a name stands for; empty for none.
 std::string FormatOfName(const std::string& name) {
   static const std::pair<const char*, const char*> kEndings[] = {
@@ -29,9 +27,9 @@ std::string FormatOfName(const std::string& name) {
   return {};
 }
 
-/// Formats whose files are smaller than their pixels by nobody knows how much.
-bool Compresses(const std::string& format) {
-  static const char* const kFormats[] = {"JPEG", "PNG", "GIF", "JPEG2000", "MrSID"};
+/// Formats whose files hold every pixel as it is. Not TIFF: blocks of zeros take no room there.
+bool HoldsAllPixels(const std::string& format) {
+  static const char* const kFormats[] = {"ORVA", "BMP", "NITF"};
   return std::find(std::begin(kFormats), std::end(kFormats), format) != std::end(kFormats);
 }
 
@@ -42,7 +40,6 @@ void TargetOptions::AddTo(CLI::App& app, const std::string& meaning) {
   app.add_option("--format", format,
                  "Key of its format, see vexg formats; by default from its name's ending")
       ->type_name("KEY");
-  app.add_flag("--overwrite", overwrite, "Replace files that are there");
   app.add_flag("--strict", strict,
                "Fail, and make nothing, where the format does not keep all that is put in");
 }
@@ -58,9 +55,9 @@ std::string ChooseFormat(const TargetOptions& target) {
   return FormatKey("--format", target.format);
 }
 
-std::uint64_t BytesInFile(const std::string& format, unsigned dataType, std::uint64_t samples,
-                          std::uint64_t lines, unsigned bands) {
-  return Compresses(format) ? 0 : samples * lines * bands * DataTypeBytes(dataType);
+std::uint64_t BytesInFile(const std::string& format, const RasterInfo& raster) {
+  const std::uint64_t pixels = std::uint64_t{raster.samples} * raster.lines;
+  return HoldsAllPixels(format) ? pixels * raster.bands * DataTypeBytes(raster.dataType) : 0;
 }
 
 JobWriterCommand& AddCreate(JobDraft& draft, const TargetPlace& place, const String& like,
@@ -79,11 +76,11 @@ JobWriterCommand& AddCreate(JobDraft& draft, const TargetPlace& place, const Str
 }
 
 void AddCloseTarget(JobDraft& draft) {
-  draft.Close(kCloseStep, "$target");
+  draft.Close(kCloseTargetStep, "$target");
 }
 
-void CheckClosed(const JobResults& results) {
-  const String fault = results.Find(kCloseStep).returns.Find("Fault");
+void CheckClosed(const JobResults& results, const char* step) {
+  const String fault = results.Find(String(step)).returns.Find("Fault");
   if (fault.GetLength() != 0) throw HostError(kExitFailed, fault.ToUTF8());
 }
 

@@ -11,8 +11,7 @@ namespace lumo::host {
 /// A raster file to make, as the command line names it.
 struct TargetOptions {
   std::string output;
-  std::string format;  ///< key; empty: as the name's ending tells
-  bool overwrite = false;
+  std::string format;   ///< key; empty: as the name's ending tells
   bool strict = false;  ///< what the format does not keep is a failure
 
   /// @param meaning  what the file is, for the help.
@@ -22,10 +21,9 @@ struct TargetOptions {
 /// The key of the format to make. Throws HostError for none that is known.
 std::string ChooseFormat(const TargetOptions& target);
 
-/// Bytes that `samples` by `lines` pixels of `bands` bands take in a file of this format; 0 for a
-/// format that makes them smaller by nobody knows how much.
-std::uint64_t BytesInFile(const std::string& format, unsigned dataType, std::uint64_t samples,
-                          std::uint64_t lines, unsigned bands);
+/// Bytes that a raster of this size, bands and pixel type takes at least in a file of this format;
+/// 0 for a format that makes them smaller by nobody knows how much.
+std::uint64_t BytesInFile(const std::string& format, const RasterInfo& raster);
 
 /// A format that a raster is made in, and where.
 struct TargetPlace {
@@ -44,8 +42,11 @@ JobWriterCommand& AddCreate(JobDraft& draft, const TargetPlace& place, const Str
 /// Adds the command that ends the making of "$target".
 void AddCloseTarget(JobDraft& draft);
 
-/// Throws HostError when what AddCloseTarget added told a fault.
-void CheckClosed(const JobResults& results);
+constexpr const char* kCloseTargetStep = "close.target";
+
+/// Throws HostError when the closing of a raster told a fault.
+/// @param step  that closed it; what AddCloseTarget added by default.
+void CheckClosed(const JobResults& results, const char* step = kCloseTargetStep);
 
 /// Throws HostError when a raster that was made isn't of the size, bands and pixel type that were
 /// wanted.

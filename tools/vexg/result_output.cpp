@@ -1,14 +1,13 @@
 #include "result_output.h"
 
 #include <algorithm>
-#include <cstdio>
 #include <iostream>
 
 #include <CLI/CLI.hpp>
 
 #include "commands/command.h"
 #include "option_values.h"
-#include "platform/process.h"
+#include "raster_job.h"
 #include "value_json.h"
 #include "verb.h"
 
@@ -112,32 +111,23 @@ std::string ToJson(const Document& job, const Document& result) {
 
 }  // namespace
 
-Output::Output(const std::string& file) : file_(file == "-" ? "" : file) {
-  if (file_.empty()) return;
-  unfinished_ = file_ + "." + std::to_string(platform::ProcessNumber()) + ".part";
-  stream_.open(unfinished_, std::ios::binary | std::ios::trunc);
-  if (!stream_) {
-    unfinished_.clear();
-    throw HostError(kExitUsage, file_ + ": can't be written; nothing was run");
-  }
-}
-
-Output::~Output() {
-  if (!unfinished_.empty()) std::remove(unfinished_.c_str());
+Output::Output(const std::string& file, const std::string& input) {
+  if (file.empty() || file == "-") return;
+  file_ = std::make_unique<OutputFile>(file, OutputRules{.overwrite = true, .hasSides = false});
+  if (!input.empty() && input != "-") file_->RefuseInput(input);
+  file_->Begin(0);
 }
 
 void Output::Write(const std::string& text) {
-  if (file_.empty()) {
+  if (file_ == nullptr) {
     std::cout << text << std::flush;
     if (!std::cout) throw HostError(kExitFailed, "standard output can't be written");
     return;
   }
-  stream_ << text;
-  stream_.close();
-  if (!stream_ || std::rename(unfinished_.c_str(), file_.c_str()) != 0) {
-    throw HostError(kExitFailed, file_ + ": can't be written");
-  }
-  unfinished_.clear();
+  FileWriter writer(*file_);
+  writer.Write(text.data(), text.size());
+  writer.Close();
+  file_->MoveAtOnce(file_->Collect());
 }
 
 void JobOptions::AddTo(CLI::App& app) {
@@ -151,6 +141,7 @@ void JobOptions::AddTo(CLI::App& app) {
       ->transform(OneOf({"auto", "bar", "json", "none"}))
       ->capture_default_str();
   app.add_flag("-q,--quiet", quiet, "Show no progress");
+  AddDurableTo(app, isDurable);
 }
 
 Document ReadJob(const JobOptions& options, String& text) {

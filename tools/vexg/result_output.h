@@ -1,10 +1,10 @@
 #pragma once
 
-#include <fstream>
-#include <optional>
+#include <memory>
 #include <string>
 
 #include "document.h"
+#include "output_file.h"
 #include "progress_view.h"
 
 namespace CLI {
@@ -16,23 +16,18 @@ namespace lumo::host {
 /// Where a text goes: standard output, or a file that is whole once it is there.
 class Output {
  public:
-  /// @param file  "-" or "" for standard output. Throws HostError when the file can't be made, so
-  ///              that nothing is run in vain.
-  explicit Output(const std::string& file);
-  /// Removes what was not finished.
-  ~Output();
-  Output(const Output&) = delete;
-  Output& operator=(const Output&) = delete;
+  /// @param file   "-" or "" for standard output. Throws HostError when the file can't be made, so
+  ///               that nothing is run in vain.
+  /// @param input  a file that it may not be; "-" or "" for none.
+  explicit Output(const std::string& file, const std::string& input = "");
 
   /// Writes all of it. Throws HostError.
   void Write(const std::string& text);
 
-  bool IsStandardOutput() const { return file_.empty(); }
+  bool IsStandardOutput() const { return file_ == nullptr; }
 
  private:
-  std::string file_;
-  std::string unfinished_;
-  std::ofstream stream_;
+  std::unique_ptr<OutputFile> file_;  // null for standard output
 };
 
 /// The options of a verb that runs a job, and what it does before and after.
@@ -42,6 +37,7 @@ struct JobOptions {
   std::string progress = "auto";
   bool json = false;
   bool quiet = false;
+  bool isDurable = false;
 
   void AddTo(CLI::App& app);
 };

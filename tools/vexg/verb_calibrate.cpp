@@ -1,28 +1,21 @@
-#include <charconv>
 #include <cmath>
-#include <iostream>
 #include <limits>
-#include <memory>
 #include <optional>
 #include <set>
 
 #include <CLI/CLI.hpp>
 #include <fmt/format.h>
 
-#include "keeping.h"
 #include "metadata_source.h"
 #include "option_values.h"
 #include "raster/pixel_types.h"
-#include "verb.h"
+#include "raster_verb.h"
 
 namespace lumo::host {
 namespace {
 
 struct Options {
   std::string quantity;
-  SourceOptions source;
-  TargetOptions target;
-  RasterJobOptions job;
   std::vector<double> gain, offset, irradiance, k1, k2;
   std::optional<double> sunElevation, distance;
   std::string metadata;         ///< FILE or FORMAT:FILE; empty: all constants are on the line
@@ -31,7 +24,6 @@ struct Options {
   std::string type = "Single";
 };
 
-constexpr const char* kCalibrateStep = "calibrate";
 constexpr const char* kMetadataStep = "metadata";
 constexpr const char* kConstantsStep = "constants";
 
@@ -203,75 +195,6 @@ bool IsReal(unsigned type) {
   return type == kDataTypeOf<float> || type == kDataTypeOf<double>;
 }
 
-/// The whole of the work as one document.
-/// @param file    to make.
-/// @param noData  of bands, in the place of pixels that are not valid.
-JobDraft MakeDraft(const Options& options, const TargetPlace& place, const RasterInfo& info,
-                   const FillValues& noData) {
-  JobDraft draft;
-  AddOpen(draft, "source", options.source);
-  AddQuery(draft, "source", "$source");
-  AddDetailsQuery(draft, "source", "$source");
-  const unsigned type = TypeCode(options);
-  JobWriterCommand& create = AddCreate(draft, place, "$source", "Names", noData);
-  create.AddInput("DataType", DataTypeName(type));
-  JobWriterCommand& calibrate = draft.Step(kCalibrateStep, CommandOf(options.quantity));
-  calibrate.AddInput("SourceURI", String("$source"));
-  calibrate.AddInput("CalibratedURI", String("$target"));
-  for (const BandConstant& constant : BandConstants(options.quantity)) {
-    calibrate.AddInput(constant.input, ForBands(options, constant, info.bands));
-  }
-  for (const SceneConstant& constant : SceneConstants(options.quantity)) {
-    calibrate.AddInput(constant.input, *(options.*constant.value));
-  }
-  calibrate.AddInput("ScaleFactor", options.scale);
-  AddCloseTarget(draft);
-  if (!IsReal(type)) AddValidityQuery(draft, "source", "$source");
-  draft.Close("close.source", "$source");
-  return draft;
-}
-
-/// The no-data value of a result: of a floating-point type NaN, which no result can be; of others
-/// that of the source, unless another one is chosen.
-FillValues NoDataOf(const Options& options, unsigned bands, const FillValues& chosen) {
-  if (IsReal(TypeCode(options))) return FillValues(bands, std::numeric_limits<double>::quiet_NaN());
-  return chosen;
-}
-
-/// The contents that the result shall have. No results that are pixels with data are NaN: of
-/// floating-point types nothing need be counted.
-RasterContents Wanted(const Options& options, const JobResults& results) {
-  RasterContents put = ReadContents(results, "source");
-  put.info.dataType = TypeCode(options);
-  std::erase_if(put.details, [](const std::string& detail) {
-    return detail.find("/Description=") == detail.npos;
-  });
-  if (!IsReal(put.info.dataType)) put.valid = ReadValidPixels(results, "source.validity");
-  return put;
-}
-
-/// Makes the result in the output's folder. Throws what went wrong.
-void MakeResult(JobSession& session, const Options& options, const TargetPlace& place,
-                const OutputFile& output, const RasterInfo& info) {
-  Losses losses(output.GetShownName(), place.format, options.target.strict);
-  MadeRaster raster = MakeKept(session, place, losses, true, [&](const FillValues& noData) {
-    const JobDraft draft = MakeDraft(options, place, info, NoDataOf(options, info.bands, noData));
-    JobResults results;
-    {
-      const ProgressView view(ProgressOfStep(session, draft, kCalibrateStep),
-                              options.job.GetProgressStyle());
-      results = session.Run(draft);
-    }
-    CheckClosed(results);
-    return Wanted(options, results);
-  });
-  raster.put.info.hasNoData = raster.made.info.hasNoData;  // the source's are of another quantity
-  raster.isFilled = true;
-  CompareKept(raster, losses);
-  session.CheckInterrupt();
-  losses.Settle();
-}
-
 /// Refuses a scale that the result's type would cut.
 void CheckScale(const Options& options) {
   if (IsReal(TypeCode(options)) || options.quantity == "reflectance" ||
@@ -282,55 +205,6 @@ void CheckScale(const Options& options) {
                                           options.scale, std::trunc(options.scale), options.type));
 }
 
-int Calibrate(Options& options) {
-  RefuseUseless(options);
-  TypeCode(options);
-  const bool hasMetadata = !options.metadata.empty();
-  std::vector<std::string> inputs{options.source.file};
-  JobDraft opening;
-  AddOpen(opening, "source", options.source);
-  AddQuery(opening, "source", "$source");
-  if (hasMetadata) {
-    const MetadataSource metadata = ParseMetadataSource(options.metadata);
-    inputs.push_back(metadata.file);
-    AddConstants(opening, metadata);
-  } else {
-    RefuseMissing(options);
-    RefuseImpossible(options);
-    QuestionOdd(options);
-  }
-  const std::string format = ChooseFormat(options.target);
-  OutputFile output(options.target.output, options.target.overwrite, inputs);
-  JobSession session(options.job);
-  const JobResults opened = session.Run(opening);
-  if (hasMetadata) {
-    const std::string taken = TakeConstants(options, opened);
-    RefuseMissing(options);
-    RefuseImpossible(options);
-    QuestionOdd(options);
-    Say(taken);
-  }
-  output.RefuseInput(PathOf(opened.Find("source").returns.Find("URI")));
-  const RasterInfo info = ReadInfo(opened, "source");
-  CheckScale(options);
-  if (options.job.printJob) {
-    std::cout << MakeDraft(options, {output.GetName(), format}, info,
-                           NoDataOf(options, info.bands, {}))
-                     .Write()
-                     .ToUTF8()
-              << '\n';
-    return kExitSuccess;
-  }
-  output.Begin(BytesInFile(format, TypeCode(options), info.samples, info.lines, info.bands));
-  try {
-    MakeResult(session, options, {output.GetWorkName(), format}, output, info);
-  } catch (const HostError& error) {
-    throw HostError(error.code, output.InUsersWords(error.what()));
-  }
-  output.Commit();
-  return kExitSuccess;
-}
-
 void AddConstant(CLI::App& app, const char* name, std::vector<double>& values,
                  const char* meaning) {
   app.add_option(name, values, meaning)
@@ -339,49 +213,146 @@ void AddConstant(CLI::App& app, const char* name, std::vector<double>& values,
       ->allow_extra_args(false);
 }
 
+class CalibrateVerb final : public RasterVerb {
+ public:
+  explicit CalibrateVerb(CLI::App& app) {
+    app.add_option("quantity", options_.quantity, "radiance, reflectance or temperature")
+        ->transform(OneOf({"radiance", "reflectance", "temperature"}))
+        ->required();
+    AddFilesTo(app, "The calibrated raster");
+    app.footer(
+        "Constants are one value for each band, or one for all. Radiance is DN * gain + offset, "
+        "0 where that is below 0; reflectance is that at the top of the atmosphere; temperature "
+        "is that of a black body, in the unit of K2. The result is --scale times as large. "
+        "Pixels that are not valid stay so; in a result of Single or Double they are NaN.\n"
+        "Example: vexg calibrate reflectance scene.tif reflectance.tif --gain 0.76,0.8,0.62 "
+        "--offset -1.5,-2.8,-1.2 --irradiance 1970,1843,1555 --sun-elevation 49.6 --distance "
+        "1.012\n");
+    app.add_option("--from-metadata", options_.metadata,
+                   "Takes what isn't given here from the metadata of this file, and says what it "
+                   "took")
+        ->type_name("FILE|FORMAT:FILE");
+    AddConstant(app, "--gain", options_.gain, "Factor on the digital numbers");
+    AddConstant(app, "--offset", options_.offset, "Added to them then");
+    AddConstant(app, "--irradiance", options_.irradiance,
+                "Solar irradiance outside the atmosphere, in the unit of radiance (reflectance)");
+    app.add_option("--sun-elevation", options_.sunElevation,
+                   "Of the sun above the horizon, in degrees (reflectance)")
+        ->type_name("DEG")
+        ->transform(NumberWithUnit({"degrees", "degree", "deg", "\u00b0"}));
+    app.add_option("--distance", options_.distance,
+                   "From the earth to the sun, in astronomical units (reflectance)")
+        ->type_name("AU")
+        ->transform(NumberWithUnit({"astronomical units", "au", "ua"}));
+    AddConstant(app, "--k1", options_.k1, "First thermal constant (temperature)");
+    AddConstant(app, "--k2", options_.k2, "Second thermal constant, in kelvins (temperature)");
+    app.add_option("--scale", options_.scale, "Factor on the result")->capture_default_str();
+    app.add_option("--type", options_.type, "Pixel type of the result")
+        ->transform(PixelTypeName())
+        ->capture_default_str();
+  }
+
+ private:
+  bool HasMetadata() const { return !options_.metadata.empty(); }
+
+  void CheckOptions() override {
+    RefuseUseless(options_);
+    TypeCode(options_);
+    if (HasMetadata()) {
+      metadata_ = ParseMetadataSource(options_.metadata);
+    } else {
+      CheckConstants();
+    }
+    RasterVerb::CheckOptions();
+  }
+
+  void CheckConstants() const {
+    RefuseMissing(options_);
+    RefuseImpossible(options_);
+    QuestionOdd(options_);
+  }
+
+  std::vector<std::string> GetFurtherInputs() const override {
+    return HasMetadata() ? std::vector{metadata_.file} : std::vector<std::string>();
+  }
+
+  void AddQuestions(JobDraft& draft) const override {
+    if (HasMetadata()) AddConstants(draft, metadata_);
+  }
+
+  RasterInfo PlanRaster(JobSession& /*session*/, const JobResults& opened,
+                        const RasterInfo& source) override {
+    if (HasMetadata()) {
+      const std::string taken = TakeConstants(options_, opened);
+      CheckConstants();
+      Say(taken);
+    }
+    CheckScale(options_);
+    RasterInfo planned = source;
+    planned.dataType = TypeCode(options_);
+    bands_ = planned.bands;
+    return planned;
+  }
+
+  const char* GetKeptDetails() const override { return "Names"; }
+
+  void AddToCreate(JobDraft& /*draft*/, JobWriterCommand& create) const override {
+    create.AddInput("DataType", DataTypeName(TypeCode(options_)));
+  }
+
+  void AddMaking(JobDraft& draft, const String& shown,
+                 const FillValues& /*noData*/) const override {
+    JobWriterCommand& calibrate = draft.Step(kMakeStep, CommandOf(options_.quantity));
+    calibrate.AddInput("SourceURI", shown);
+    calibrate.AddInput("CalibratedURI", String("$target"));
+    for (const BandConstant& constant : BandConstants(options_.quantity)) {
+      calibrate.AddInput(constant.input, ForBands(options_, constant, bands_));
+    }
+    for (const SceneConstant& constant : SceneConstants(options_.quantity)) {
+      calibrate.AddInput(constant.input, *(options_.*constant.value));
+    }
+    calibrate.AddInput("ScaleFactor", options_.scale);
+  }
+
+  /// Of a floating-point type NaN, which no result can be; of others that of the source, unless
+  /// another one is chosen.
+  FillValues GetNoData(const FillValues& chosen) const override {
+    if (!IsReal(TypeCode(options_))) return chosen;
+    return FillValues(bands_, std::numeric_limits<double>::quiet_NaN());
+  }
+
+  void AddLastQuestions(JobDraft& draft, const String& shown) const override {
+    if (!IsReal(TypeCode(options_))) AddValidityQuery(draft, kShown, shown);
+  }
+
+  /// No results that are pixels with data are NaN: of floating-point types nothing need be counted.
+  RasterContents ReadWanted(const JobResults& results) const override {
+    RasterContents wanted = ReadContents(results, kShown);
+    wanted.info.dataType = TypeCode(options_);
+    std::erase_if(wanted.details, [](const std::string& detail) {
+      return detail.find("/Description=") == detail.npos;
+    });
+    if (!IsReal(wanted.info.dataType)) {
+      wanted.valid = ReadValidPixels(results, std::string(kShown) + ".validity");
+    }
+    return wanted;
+  }
+
+  void Compare(MadeRaster& raster, Losses& losses) const override {
+    // The source's are of another quantity.
+    raster.put.info.hasNoData = raster.made.info.hasNoData;
+    raster.isFilled = true;
+    CompareKept(raster, losses);
+  }
+
+  Options options_;
+  MetadataSource metadata_;
+  unsigned bands_ = 0;
+};
+
 const VerbRegistration registration(
     "calibrate", "Turns digital numbers into radiance, reflectance or temperature",
-    [](CLI::App& app) {
-      const auto options = std::make_shared<Options>();
-      app.footer(
-          "Constants are one value for each band, or one for all. Radiance is DN * gain + offset, "
-          "0 where that is below 0; reflectance is that at the top of the atmosphere; temperature "
-          "is that of a black body, in the unit of K2. The result is --scale times as large. "
-          "Pixels that are not valid stay so; in a result of Single or Double they are NaN.\n"
-          "Example: vexg calibrate reflectance scene.tif reflectance.tif --gain 0.76,0.8,0.62 "
-          "--offset -1.5,-2.8,-1.2 --irradiance 1970,1843,1555 --sun-elevation 49.6 --distance "
-          "1.012\n");
-      app.add_option("quantity", options->quantity, "radiance, reflectance or temperature")
-          ->transform(OneOf({"radiance", "reflectance", "temperature"}))
-          ->required();
-      options->source.AddTo(app);
-      options->target.AddTo(app, "The calibrated raster");
-      app.add_option("--from-metadata", options->metadata,
-                     "Takes what isn't given here from the metadata of this file, and says what it "
-                     "took")
-          ->type_name("FILE|FORMAT:FILE");
-      AddConstant(app, "--gain", options->gain, "Factor on the digital numbers");
-      AddConstant(app, "--offset", options->offset, "Added to them then");
-      AddConstant(app, "--irradiance", options->irradiance,
-                  "Solar irradiance outside the atmosphere, in the unit of radiance (reflectance)");
-      app.add_option("--sun-elevation", options->sunElevation,
-                     "Of the sun above the horizon, in degrees (reflectance)")
-          ->type_name("DEG")
-          ->transform(NumberWithUnit({"degrees", "degree", "deg", "\u00b0"}));
-      app.add_option("--distance", options->distance,
-                     "From the earth to the sun, in astronomical units (reflectance)")
-          ->type_name("AU")
-          ->transform(NumberWithUnit({"astronomical units", "au", "ua"}));
-      AddConstant(app, "--k1", options->k1, "First thermal constant (temperature)");
-      AddConstant(app, "--k2", options->k2, "Second thermal constant, in kelvins (temperature)");
-      app.add_option("--scale", options->scale, "Factor on the result")->capture_default_str();
-      app.add_option("--type", options->type, "Pixel type of the result")
-          ->transform(PixelTypeName())
-          ->capture_default_str();
-      options->job.AddTo(app);
-      options->job.AddProgressTo(app);
-      return VerbRegistration::Work([options] { return Calibrate(*options); });
-    });
+    &SetUp<CalibrateVerb>);
 
 }  // namespace
 }  // namespace lumo::host

@@ -8,6 +8,7 @@
 #include <CLI/CLI.hpp>
 #include <fmt/format.h>
 
+#include "file_verb.h"
 #include "foundation/near_name.h"
 #include "histogram_plot.h"
 #include "json_number.h"
@@ -16,23 +17,17 @@
 #include "raster_target.h"
 #include "stats/raster_histogram.h"
 #include "stats/turn.h"
-#include "verb.h"
 
 namespace lumo::host {
 namespace {
 
 struct Options {
-  SourceOptions source;
-  RasterJobOptions job;
+  std::string file;  ///< what the user calls the raster
   std::string bands;
   std::optional<double> lower;
   std::optional<double> upper;
   std::optional<unsigned> bins;
   std::optional<double> binSize;
-  std::string output;
-  bool overwrite = false;
-  bool save = false;
-  bool json = false;
 };
 
 constexpr unsigned kUsualBins = 256;
@@ -82,38 +77,129 @@ Array<T> ArrayOfOne(T value) {
   return array;
 }
 
-template <typename T>
-class HistogramJob {
+/// The histograms of one raster, whatever its pixel type.
+class Histograms {
  public:
-  HistogramJob(const Options& options, JobSession& session, const String& raster,
-               const Array<unsigned>& bands)
-      : options_(options), session_(session), raster_(raster), bands_(bands) {}
+  virtual ~Histograms() = default;
+  /// Adds the commands that count. @param raster  a variable or URI.
+  virtual void AddSteps(JobDraft& draft, const String& raster) const = 0;
+  /// Takes what they gave. Throws HostError where a band is missing.
+  virtual void TakeCounts(const JobResults& results) = 0;
+  virtual Json AsJson() const = 0;
+  virtual std::string AsText() const = 0;
+  virtual HistogramPlot Draw() const = 0;
+};
 
-  int Run(OutputFile* output) {
-    std::vector<BandBins<T>> bands = ChooseBins();
-    const JobDraft draft = MakeDraft(bands);
-    if (options_.job.printJob) {
-      std::cout << PrintedDraft(bands).Write().ToUTF8() << '\n';
-      return kExitSuccess;
+template <typename T>
+class TypedHistograms final : public Histograms {
+ public:
+  /// Chooses the bins; looks for the smallest and largest values where they decide.
+  TypedHistograms(const Options& options, JobSession& session, ProgressStyle style,
+                  const String& raster, const Array<unsigned>& bands)
+      : options_(options), style_(style), bands_(bands) {
+    all_ = ChooseBins(session, raster);
+  }
+
+  /// Bands of the same bins are counted in one pass.
+  void AddSteps(JobDraft& draft, const String& raster) const override {
+    const std::vector<BandBins<T>>& bands = all_;
+    std::vector<bool> isDone(bands.size());
+    for (std::size_t i = 0; i < bands.size(); ++i) {
+      if (isDone[i]) continue;
+      std::vector<unsigned> same;
+      for (std::size_t j = i; j < bands.size(); ++j) {
+        if (isDone[j] || !bands[j].HasBinsOf(bands[i])) continue;
+        isDone[j] = true;
+        same.push_back(bands[j].band);
+      }
+      Array<unsigned> list{ArrayDims(static_cast<unsigned>(same.size()))};
+      std::copy(same.begin(), same.end(), list.begin());
+      JobWriterCommand& count =
+          draft.Step("count" + std::to_string(i), "CalculateRasterHistogramCommand");
+      count.AddInput("URI", raster);
+      count.AddInput("LowerBound", bands[i].lower);
+      count.AddInput("UpperBound", bands[i].upper);
+      if (bands[i].askedCount != 0) {
+        count.AddInput("BinCount", bands[i].askedCount);
+      } else {
+        count.AddInput("BinSize", bands[i].size);
+      }
+      count.AddInput("Bands", list);
+      count.AddInput("Bins", Form::kExact);
+      count.AddInput("Wait", Waiting::kAlways);
     }
-    JobResults results;
-    {
-      const ProgressView view(session_.GetProgress(), options_.job.GetProgressStyle());
-      results = session_.Run(draft);
+    for (const BandBins<T>& bins : bands) {
+      Array<unsigned> band{ArrayDims(1)};
+      band[0] = bins.band;
+      JobWriterCommand& get = draft.Step(NameOf(bins), "GetRasterHistogramCommand");
+      get.AddInput("URI", raster);
+      get.AddInput("Bands", band);
+      get.AddInput("Wait", Waiting::kAlways);
     }
-    TakeCounts(results, bands);
-    if (output != nullptr) Draw(bands, *output);
-    if (options_.json || output == nullptr) {
-      std::cout << (options_.json ? AsJson(bands).dump(2) + "\n" : AsText(bands));
+  }
+
+  /// A raster may have more histograms than those asked for. One that was stored may have the same
+  /// bounds and sizes, and bins of the told form; the one that was counted comes last.
+  void TakeCounts(const JobResults& results) override {
+    for (BandBins<T>& bins : all_) {
+      const auto found = ParseValue<Array<RasterBandHistogram<T>>>(
+          results.Find(String(NameOf(bins))).returns.Find("Histograms"));
+      const RasterBandHistogram<T>* chosen = nullptr;
+      for (const RasterBandHistogram<T>& histogram : found) {
+        const bool isAskedFor = histogram.band == bins.band &&
+                                histogram.sign == HistogramSign::kBoth &&
+                                histogram.min == bins.lower && histogram.max == bins.upper &&
+                                histogram.binSize == bins.size;
+        const bool isBetter = chosen == nullptr || histogram.source == StatsSource::kDynamic;
+        if (isAskedFor && isBetter) chosen = &histogram;
+      }
+      if (chosen == nullptr) {
+        throw HostError(kExitFailed, fmt::format("{}: there is no histogram of band {}",
+                                                 options_.file, bins.band));
+      }
+      bins.counts.assign(chosen->counts.begin(), chosen->counts.end());
     }
-    if (options_.save && !ParseValue<bool>(results.Find("save").returns.Find("Return"))) {
-      throw HostError(kExitFailed, options_.source.file + ": the histograms could not be saved");
+  }
+
+  Json AsJson() const override {
+    Json list = Json::array();
+    for (const BandBins<T>& bins : all_) {
+      list.push_back({{"band", bins.band},
+                      {"min", NumberAsJson(bins.lower)},
+                      {"max", NumberAsJson(bins.upper)},
+                      {"binSize", bins.size},
+                      {"counts", bins.counts}});
     }
-    return kExitSuccess;
+    return {{"file", options_.file}, {"bands", list}};
+  }
+
+  std::string AsText() const override {
+    std::string text = Printable(options_.file) + "\n";
+    for (const BandBins<T>& bins : all_) {
+      const std::uint64_t counted =
+          std::accumulate(bins.counts.begin(), bins.counts.end(), std::uint64_t{0});
+      text += fmt::format("\nband {}: {} bins of {} from {} to {}, {} values\n", bins.band,
+                          bins.counts.size(), bins.size, bins.lower, bins.upper, counted);
+      for (std::size_t i = 0; i < bins.counts.size(); ++i) {
+        if (bins.counts[i] == 0) continue;
+        const double from = static_cast<double>(bins.lower) + static_cast<double>(i) * bins.size;
+        text += fmt::format("{:>16.10g} {:>14}\n", from, bins.counts[i]);
+      }
+    }
+    return text;
+  }
+
+  HistogramPlot Draw() const override {
+    std::vector<PlottedHistogram> shown;
+    for (const BandBins<T>& bins : all_) {
+      shown.push_back({"band " + std::to_string(bins.band), static_cast<double>(bins.lower),
+                       bins.size, bins.counts});
+    }
+    return HistogramPlot(shown);
   }
 
  private:
-  std::vector<BandBins<T>> ChooseBins() {
+  std::vector<BandBins<T>> ChooseBins(JobSession& session, const String& raster) {
     const bool isBeyond =
         options_.lower.value_or(0) > static_cast<double>(std::numeric_limits<T>::max()) ||
         options_.upper.value_or(0) < static_cast<double>(std::numeric_limits<T>::lowest());
@@ -122,7 +208,9 @@ class HistogramJob {
     }
     Array<T> lowest{bands_.GetDims()}, highest{bands_.GetDims()};
     constexpr bool kIsByte = sizeof(T) == 1;
-    if (!kIsByte && !(options_.lower && options_.upper)) ReadExtremes(lowest, highest);
+    if (!kIsByte && !(options_.lower && options_.upper)) {
+      ReadExtremes(session, raster, lowest, highest);
+    }
     std::vector<BandBins<T>> all;
     for (unsigned i = 0; i < bands_.GetCount(); ++i) {
       BandBins<T> bins;
@@ -174,211 +262,149 @@ class HistogramJob {
   }
 
   /// Smallest and largest values of the bands.
-  void ReadExtremes(Array<T>& lowest, Array<T>& highest) {
+  void ReadExtremes(JobSession& session, const String& raster, Array<T>& lowest,
+                    Array<T>& highest) {
     JobDraft draft;
-    AddBandView(draft, "bands", raster_, bands_);
+    AddBandView(draft, "bands", raster, bands_);
     JobWriterCommand& stats = draft.Step(kStatsStep, "GetBasicRasterStatsCommand");
     stats.AddVariableInput("URI", "$bands");
     stats.AddInput("Wait", Waiting::kAlways);
     draft.Close("close.bands", "$bands");
-    const ProgressView view(ProgressOfStep(session_, draft, kStatsStep),
-                            options_.job.GetProgressStyle());
-    const JobResults results = session_.Run(draft);
+    const ProgressView view(ProgressOfStep(session, draft, kStatsStep), style_);
+    const JobResults results = session.Run(draft);
     const Map<String, String>& returns = results.Find(kStatsStep).returns;
     lowest = ParseValue<Array<T>>(returns.Find("Min"));
     highest = ParseValue<Array<T>>(returns.Find("Max"));
     if (lowest.GetCount() == bands_.GetCount() && highest.GetCount() == bands_.GetCount()) return;
-    throw HostError(kExitFailed, options_.source.file + ": there are no statistics of all bands");
+    throw HostError(kExitFailed, options_.file + ": there are no statistics of all bands");
   }
 
   static std::string NameOf(const BandBins<T>& bins) { return "bins" + std::to_string(bins.band); }
 
-  /// Bands of the same bins are counted in one pass.
-  /// @param raster  a variable or URI.
-  void AddSteps(JobDraft& draft, const std::vector<BandBins<T>>& bands,
-                const String& raster) const {
-    std::vector<bool> isDone(bands.size());
-    for (std::size_t i = 0; i < bands.size(); ++i) {
-      if (isDone[i]) continue;
-      std::vector<unsigned> same;
-      for (std::size_t j = i; j < bands.size(); ++j) {
-        if (isDone[j] || !bands[j].HasBinsOf(bands[i])) continue;
-        isDone[j] = true;
-        same.push_back(bands[j].band);
-      }
-      Array<unsigned> list{ArrayDims(static_cast<unsigned>(same.size()))};
-      std::copy(same.begin(), same.end(), list.begin());
-      JobWriterCommand& count =
-          draft.Step("count" + std::to_string(i), "CalculateRasterHistogramCommand");
-      count.AddInput("URI", raster);
-      count.AddInput("LowerBound", bands[i].lower);
-      count.AddInput("UpperBound", bands[i].upper);
-      if (bands[i].askedCount != 0) {
-        count.AddInput("BinCount", bands[i].askedCount);
-      } else {
-        count.AddInput("BinSize", bands[i].size);
-      }
-      count.AddInput("Bands", list);
-      count.AddInput("Bins", Form::kExact);
-      count.AddInput("Wait", Waiting::kAlways);
+  const Options& options_;
+  const ProgressStyle style_;
+  const Array<unsigned> bands_;
+  std::vector<BandBins<T>> all_;
+};
+
+class HistVerb final : public FileVerb {
+ public:
+  explicit HistVerb(CLI::App& app) : FileVerb(app) {
+    app.footer(
+        "Without bounds, the bins reach from the smallest to the largest value of each band, or "
+        "over all values of an 8-bit type; there are 256, or fewer where whole numbers fill fewer "
+        "bins of one whole size. Every value within the bounds is in one bin; the last bin holds "
+        "the upper bound too. Values outside the bounds do not count; bounds that the pixels can't "
+        "reach are limited to what they can. With --json: \"file\" and \"bands\", a list of "
+        "objects "
+        "with \"band\", \"min\", \"max\", \"binSize\" and \"counts\". -o draws them.\n"
+        "Example: vexg hist scene.tif --bands 0,1,2 -o scene-histogram.png\n");
+    app.add_option("--bands", options_.bands, "Bands, from 0; all by default")->type_name("B,B…");
+    app.add_option("--lower", options_.lower, "Smallest value that counts")->type_name("VALUE");
+    app.add_option("--upper", options_.upper, "Largest value that counts")->type_name("VALUE");
+    app.add_option("--bins", options_.bins, "How many bins; no more than there are whole numbers")
+        ->check(CLI::Range(1U, kMostBins));
+    app.add_option("--bin-size", options_.binSize, "Width of a bin")->type_name("SIZE");
+    app.add_option("-o,--output", output_, "A picture of the histograms, a PNG or JPEG")
+        ->type_name("OUT.png|jpg");
+    AddOverwriteTo(app, "a picture that is there");
+    app.add_flag("--save", saves_, "Store the histograms with the raster");
+    app.add_flag("--json", isJson_, "As JSON");
+  }
+
+ private:
+  void CheckOptions() override {
+    options_.file = GetSource().file;
+    if (options_.bins && options_.binSize) {
+      throw HostError(kExitUsage, "--bins and --bin-size exclude each other");
     }
-    for (const BandBins<T>& bins : bands) {
-      Array<unsigned> band{ArrayDims(1)};
-      band[0] = bins.band;
-      JobWriterCommand& get = draft.Step(NameOf(bins), "GetRasterHistogramCommand");
-      get.AddInput("URI", raster);
-      get.AddInput("Bands", band);
-      get.AddInput("Wait", Waiting::kAlways);
+    if (options_.binSize && !(*options_.binSize > 0 && std::isfinite(*options_.binSize))) {
+      throw HostError(kExitUsage, "--bin-size: the size of a bin is above 0");
     }
-    if (!options_.save) return;
+    if (!output_.empty()) CheckPictureName(output_);
+  }
+
+  std::vector<std::string> GetOutputs() const override {
+    return output_.empty() ? std::vector<std::string>() : std::vector{output_};
+  }
+
+  std::vector<std::string> GetChangedFiles() const override {
+    return saves_ ? FilesOfSavedValues(GetSource()) : std::vector<std::string>();
+  }
+
+  void AddOpening(JobDraft& draft) const override {
+    AddOpenWithPyramid(draft, "raster", GetSource());
+    AddQuery(draft, "raster", "$raster");
+  }
+
+  void Plan(JobSession& session, const JobResults& opened) override {
+    raster_ = opened.Find("raster").returns.Find("URI");
+    const RasterInfo info = ReadInfo(opened, "raster");
+    const Array<unsigned> bands = ParseBands(options_.bands, info);
+    const bool isReal = DispatchType(TenTypes{}, info.dataType, [&]<typename T>() {
+      histograms_ = std::make_unique<TypedHistograms<T>>(options_, session, GetProgressStyle(),
+                                                         raster_, bands);
+      return true;
+    });
+    if (isReal) return;
+    throw HostError(kExitFailed, GetSource().file + ": complex pixels have no histogram");
+  }
+
+  static void AddSave(JobDraft& draft, const String& raster) {
     JobWriterCommand& save = draft.Step("save", "SaveRasterHistogramCommand");
     save.AddInput("URI", raster);
     save.AddInput("Wait", Waiting::kAlways);
   }
 
-  JobDraft MakeDraft(const std::vector<BandBins<T>>& bands) const {
+  JobDraft GetJob(const Outputs& /*outputs*/) const override {
     JobDraft draft;
-    AddSteps(draft, bands, raster_);
-    return draft;
-  }
-
-  /// The counting as one document that opens and closes the raster.
-  JobDraft PrintedDraft(const std::vector<BandBins<T>>& bands) const {
-    JobDraft draft;
-    AddOpenWithPyramid(draft, "raster", options_.source);
-    AddSteps(draft, bands, "$raster");
+    AddOpenWithPyramid(draft, "raster", GetSource());
+    histograms_->AddSteps(draft, "$raster");
+    if (saves_) AddSave(draft, "$raster");
     draft.Close("close", "$raster");
     return draft;
   }
 
-  /// A raster may have more histograms than those asked for. One that was stored may have the same
-  /// bounds and sizes, and bins of the told form; the one that was counted comes last.
-  void TakeCounts(const JobResults& results, std::vector<BandBins<T>>& bands) const {
-    for (BandBins<T>& bins : bands) {
-      const auto found = ParseValue<Array<RasterBandHistogram<T>>>(
-          results.Find(String(NameOf(bins))).returns.Find("Histograms"));
-      const RasterBandHistogram<T>* chosen = nullptr;
-      for (const RasterBandHistogram<T>& histogram : found) {
-        const bool isAskedFor = histogram.band == bins.band &&
-                                histogram.sign == HistogramSign::kBoth &&
-                                histogram.min == bins.lower && histogram.max == bins.upper &&
-                                histogram.binSize == bins.size;
-        const bool isBetter = chosen == nullptr || histogram.source == StatsSource::kDynamic;
-        if (isAskedFor && isBetter) chosen = &histogram;
-      }
-      if (chosen == nullptr) {
-        throw HostError(kExitFailed, fmt::format("{}: there is no histogram of band {}",
-                                                 options_.source.file, bins.band));
-      }
-      bins.counts.assign(chosen->counts.begin(), chosen->counts.end());
+  void Make(JobSession& session, const Outputs& outputs) override {
+    JobDraft draft;
+    histograms_->AddSteps(draft, raster_);
+    {
+      const ProgressView view(session.GetProgress(), GetProgressStyle());
+      histograms_->TakeCounts(session.Run(draft));
+    }
+    if (!output_.empty()) histograms_->Draw().Write(outputs.Get(0));
+  }
+
+  void Save(JobSession& session) override {
+    if (!saves_) return;
+    JobDraft draft;
+    AddSave(draft, raster_);
+    draft.Close("close.raster", raster_);
+    const JobResults results = session.Run(draft, Interrupts::kWait);
+    CheckClosed(results, "close.raster");
+    if (ParseValue<bool>(results.Find("save").returns.Find("Return"))) return;
+    throw HostError(kExitFailed, GetSource().file + ": the histograms could not be saved");
+  }
+
+  void Tell() override {
+    if (isJson_) {
+      std::cout << histograms_->AsJson().dump(2) << '\n';
+    } else if (output_.empty()) {
+      std::cout << histograms_->AsText();
     }
   }
 
-  Json AsJson(const std::vector<BandBins<T>>& bands) const {
-    Json list = Json::array();
-    for (const BandBins<T>& bins : bands) {
-      list.push_back({{"band", bins.band},
-                      {"min", NumberAsJson(bins.lower)},
-                      {"max", NumberAsJson(bins.upper)},
-                      {"binSize", bins.size},
-                      {"counts", bins.counts}});
-    }
-    return {{"file", options_.source.file}, {"bands", list}};
-  }
+  Options options_;
+  std::string output_;
+  bool saves_ = false;
+  bool isJson_ = false;
 
-  std::string AsText(const std::vector<BandBins<T>>& bands) const {
-    std::string text = Printable(options_.source.file) + "\n";
-    for (const BandBins<T>& bins : bands) {
-      const std::uint64_t counted =
-          std::accumulate(bins.counts.begin(), bins.counts.end(), std::uint64_t{0});
-      text += fmt::format("\nband {}: {} bins of {} from {} to {}, {} values\n", bins.band,
-                          bins.counts.size(), bins.size, bins.lower, bins.upper, counted);
-      for (std::size_t i = 0; i < bins.counts.size(); ++i) {
-        if (bins.counts[i] == 0) continue;
-        const double from = static_cast<double>(bins.lower) + static_cast<double>(i) * bins.size;
-        text += fmt::format("{:>16.10g} {:>14}\n", from, bins.counts[i]);
-      }
-    }
-    return text;
-  }
-
-  void Draw(const std::vector<BandBins<T>>& bands, OutputFile& output) const {
-    std::vector<PlottedHistogram> shown;
-    for (const BandBins<T>& bins : bands) {
-      shown.push_back({"band " + std::to_string(bins.band), static_cast<double>(bins.lower),
-                       bins.size, bins.counts});
-    }
-    const HistogramPlot plot(shown);
-    output.Begin(plot.GetBytes());
-    plot.Write(output);
-    output.Commit();
-  }
-
-  const Options& options_;
-  JobSession& session_;
-  const String raster_;
-  const Array<unsigned> bands_;
+  String raster_;  // URI
+  std::unique_ptr<Histograms> histograms_;
 };
 
-int Hist(const Options& options) {
-  if (options.bins && options.binSize) {
-    throw HostError(kExitUsage, "--bins and --bin-size exclude each other");
-  }
-  if (options.binSize && !(*options.binSize > 0 && std::isfinite(*options.binSize))) {
-    throw HostError(kExitUsage, "--bin-size: the size of a bin is above 0");
-  }
-  std::optional<OutputFile> output;
-  if (!options.output.empty()) {
-    CheckPictureName(options.output);
-    output.emplace(options.output, options.overwrite, std::vector{options.source.file});
-  }
-  JobSession session(options.job);
-  JobDraft opening;
-  AddOpenWithPyramid(opening, "raster", options.source);
-  AddQuery(opening, "raster", "$raster");
-  const JobResults opened = session.Run(opening);
-  const String raster = opened.Find("raster").returns.Find("URI");
-  if (output) output->RefuseInput(PathOf(raster));
-  const RasterInfo info = ReadInfo(opened, "raster");
-  const Array<unsigned> bands = ParseBands(options.bands, info);
-  int code = kExitFailed;
-  const bool isReal = DispatchType(TenTypes{}, info.dataType, [&]<typename T>() {
-    code = HistogramJob<T>(options, session, raster, bands).Run(output ? &*output : nullptr);
-    return true;
-  });
-  if (isReal) return code;
-  throw HostError(kExitFailed, options.source.file + ": complex pixels have no histogram");
-}
-
-const VerbRegistration registration(
-    "hist", "Counts the values of a raster's bands into bins", [](CLI::App& app) {
-      const auto options = std::make_shared<Options>();
-      app.footer(
-          "Without bounds, the bins reach from the smallest to the largest value of each band, or "
-          "over all values of an 8-bit type; there are 256, or fewer where whole numbers fill "
-          "fewer bins of one whole size. Every value within the bounds is in one bin; the last bin "
-          "holds the upper bound too. Values outside the bounds do not count; bounds that the "
-          "pixels "
-          "can't reach are limited to what they can. With --json: "
-          "\"file\" and \"bands\", a list of objects with \"band\", \"min\", \"max\", \"binSize\" "
-          "and \"counts\". -o draws them.\n"
-          "Example: vexg hist scene.tif --bands 0,1,2 -o scene-histogram.png\n");
-      options->source.AddTo(app);
-      app.add_option("--bands", options->bands, "Bands, from 0; all by default")->type_name("B,B…");
-      app.add_option("--lower", options->lower, "Smallest value that counts")->type_name("VALUE");
-      app.add_option("--upper", options->upper, "Largest value that counts")->type_name("VALUE");
-      app.add_option("--bins", options->bins, "How many bins; no more than there are whole numbers")
-          ->check(CLI::Range(1U, kMostBins));
-      app.add_option("--bin-size", options->binSize, "Width of a bin")->type_name("SIZE");
-      app.add_option("-o,--output", options->output, "A picture of the histograms, a PNG or JPEG")
-          ->type_name("OUT.png|jpg");
-      app.add_flag("--overwrite", options->overwrite, "Replace a picture that is there");
-      app.add_flag("--save", options->save, "Store the histograms with the raster");
-      app.add_flag("--json", options->json, "As JSON");
-      options->job.AddTo(app);
-      options->job.AddProgressTo(app);
-      return VerbRegistration::Work([options] { return Hist(*options); });
-    });
+const VerbRegistration registration("hist", "Counts the values of a raster's bands into bins",
+                                    &SetUp<HistVerb>);
 
 }  // namespace
 }  // namespace lumo::host

@@ -2,16 +2,15 @@
 #include <bit>
 #include <charconv>
 #include <iostream>
-#include <memory>
 
 #include <CLI/CLI.hpp>
 #include <fmt/format.h>
 
 #include "data/format_table.h"
+#include "file_verb.h"
 #include "json_number.h"
 #include "option_values.h"
 #include "raster_target.h"
-#include "verb.h"
 #include "views/catalog_raster_ref.h"
 
 namespace lumo::host {
@@ -19,8 +18,6 @@ namespace {
 
 struct Options {
   std::string action;
-  SourceOptions source;
-  RasterJobOptions job;
   std::string output;
   std::string levels;
   std::string type;
@@ -30,9 +27,6 @@ struct Options {
   bool json = false;
 
   bool IsDriver() const { return type == "DRIVER"; }
-  std::string PyramidPath() const {
-    return output.empty() ? PyramidPathOf(FileOf(source)) : AbsoluteName(output);
-  }
 };
 
 struct Levels {
@@ -62,72 +56,6 @@ Levels ChooseLevels(const std::string& text, const RasterInfo& info) {
   if (isGood && at == end && levels.first <= levels.last && levels.last <= kMost) return levels;
   throw HostError(kExitUsage,
                   "--levels: \"" + text + "\" is not a range such as 1-6, of levels 0 to 31");
-}
-
-Array<String> PyramidStrings(const Options& options) {
-  if (options.IsDriver()) return ConnStringsOf(options.source);
-  const String path(options.PyramidPath());
-  if (options.compression.empty()) return ConnStrings({"Pyramid", path});
-  return ConnStrings({"Pyramid", path, String("COMPRESSION=" + options.compression)});
-}
-
-/// Opens the raster with the pyramid that is to be built, whatever lies there now.
-JobDraft OpenToBuild(const Options& options) {
-  JobDraft draft;
-  JobWriterCommand& open = draft.Open("raster", "OpenRasterCommand");
-  open.AddInput("CheckSource", SourceCheck::kCompared);
-  open.AddInput("ConnStr", ConnStringsOf(options.source));
-  open.AddInput("PyramidConnStr", PyramidStrings(options));
-  if (!options.IsDriver()) open.AddInput("PyramidNew", true);
-  return draft;
-}
-
-void AddBuild(JobDraft& draft, const Options& options, const String& raster, const Levels& levels) {
-  JobWriterCommand& build = draft.Step("build", "BuildRasterPyramidCommand");
-  build.AddInput("URI", raster);
-  build.AddInput("PyramidType", String(options.IsDriver() ? "DRIVER" : "ORVA"));
-  build.AddInput("PyramidResamplingMethod", String(options.method));
-  build.AddInput("PyramidLevelMin", levels.first);
-  build.AddInput("PyramidLevelMax", levels.last);
-  build.AddInput("PyramidCanBuild", true);
-  build.AddInput("TileDimensions", TileDimensions{options.side, options.side});
-  build.AddInput("Bins", Form::kExact);
-}
-
-int Build(const Options& options) {
-  if (!options.IsDriver() && options.method != "Nearest") {
-    throw HostError(kExitUsage, "--method: a pyramid file takes every 2^level-th pixel: Nearest");
-  }
-  JobSession session(options.job);
-  JobDraft opening = OpenToBuild(options);
-  AddQuery(opening, "raster", "$raster");
-  const JobResults opened = session.Run(opening);
-  const Levels levels = ChooseLevels(options.levels, ReadInfo(opened, "raster"));
-  if (options.job.printJob) {
-    JobDraft whole = OpenToBuild(options);
-    AddBuild(whole, options, "$raster", levels);
-    whole.Close("close", "$raster");
-    std::cout << whole.Write().ToUTF8() << '\n';
-    return kExitSuccess;
-  }
-  JobDraft building;
-  AddBuild(building, options, opened.Find("raster").returns.Find("URI"), levels);
-  const ProgressView view(ProgressOfStep(session, building, "build"),
-                          options.job.GetProgressStyle());
-  session.Run(building);
-  return kExitSuccess;
-}
-
-/// Opens the raster with the pyramid that the options name, or that lies beside it.
-void AddOpenToLook(JobDraft& draft, const Options& options) {
-  if (options.output.empty() && !options.IsDriver()) {
-    AddOpenWithPyramid(draft, "raster", options.source, "Told");
-    return;
-  }
-  JobWriterCommand& open = draft.Open("raster", "OpenRasterCommand");
-  open.AddInput("CheckSource", SourceCheck::kCompared);
-  open.AddInput("ConnStr", ConnStringsOf(options.source));
-  if (!options.IsDriver()) open.AddInput("PyramidConnStr", PyramidStrings(options));
 }
 
 /// Asks for the size of each level.
@@ -173,98 +101,201 @@ std::string AsText(const Json& all) {
   return text;
 }
 
-int Info(const Options& options) {
-  JobSession session(options.job);
-  JobDraft opening;
-  AddOpenToLook(opening, options);
-  AddQuery(opening, "raster", "$raster");
-  if (options.job.printJob) {
-    opening.Close("close", "$raster");
-    std::cout << opening.Write().ToUTF8() << '\n';
+class PyramidVerb final : public FileVerb {
+ public:
+  explicit PyramidVerb(CLI::App& app) {
+    app.footer(
+        "Level L has every 2^L-th pixel of every 2^L-th line. ORVA is a file of its own, "
+        "FILE.pyr unless --output says otherwise; quicklook, read --level, info, stats and hist "
+        "find it there, with the statistics of the raster in it. DRIVER leaves it to the driver "
+        "of the format, which may put levels into the file itself, or beside it.\n"
+        "Example: vexg pyramid build scene.tif --levels 1-5\n");
+    app.add_option("action", options_.action, "build, info or delete")
+        ->type_name("ACTION")
+        ->transform(OneOf({"build", "info", "delete"}))
+        ->required();
+    GetSource().AddTo(app);
+    app.add_option("--levels", options_.levels,
+                   "First and last level; by default from 1 to that smaller than 512 pixels")
+        ->type_name("A-B");
+    app.add_option("--type", options_.type, "Who keeps the pyramid; ORVA by default")
+        ->transform(OneOf({"ORVA", "DRIVER"}));
+    app.add_option("--output", options_.output, "The pyramid file; FILE.pyr by default")
+        ->type_name("PATH");
+    app.add_option("--method", options_.method, "How a driver reduces pixels")
+        ->transform(OneOf({"Nearest", "Linear", "Cubic", "Majority"}))
+        ->capture_default_str();
+    app.add_option("--tile", options_.side, "Side of the squares that levels are stored in")
+        ->check(CLI::Range(1U, 2048U))
+        ->capture_default_str();
+    app.add_option("--compression", options_.compression, "Of a pyramid file; LZ4 by default")
+        ->transform(OneOf({"LZ4", "NONE"}));
+    app.add_flag("--json", options_.json, "info as JSON");
+  }
+
+  int Run() override {
+    if (options_.action == "build") return FileVerb::Run();
+    return options_.action == "info" ? Info() : Delete();
+  }
+
+ private:
+  std::string PyramidPath() const {
+    return options_.output.empty() ? PyramidPathOf(FileOf(GetSource()))
+                                   : AbsoluteName(options_.output);
+  }
+
+  Array<String> PyramidStrings() const {
+    if (options_.IsDriver()) return ConnStringsOf(GetSource());
+    const String path(PyramidPath());
+    if (options_.compression.empty()) return ConnStrings({"Pyramid", path});
+    return ConnStrings({"Pyramid", path, String("COMPRESSION=" + options_.compression)});
+  }
+
+  // Building.
+
+  void CheckOptions() override {
+    if (options_.IsDriver() || options_.method == "Nearest") return;
+    throw HostError(kExitUsage, "--method: a pyramid file takes every 2^level-th pixel: Nearest");
+  }
+
+  std::vector<std::string> GetChangedFiles() const override {
+    if (!options_.IsDriver()) return {PyramidPath()};
+    const std::string file = FileOf(GetSource());
+    return {file, file + ".ovr", file + ".aux.xml"};
+  }
+
+  /// Opens the raster with the pyramid that is to be built, whatever lies there now.
+  void AddOpenToBuild(JobDraft& draft) const {
+    JobWriterCommand& open = draft.Open("raster", "OpenRasterCommand");
+    open.AddInput("CheckSource", SourceCheck::kCompared);
+    open.AddInput("ConnStr", ConnStringsOf(GetSource()));
+    open.AddInput("PyramidConnStr", PyramidStrings());
+    if (!options_.IsDriver()) open.AddInput("PyramidNew", true);
+  }
+
+  void AddOpening(JobDraft& draft) const override {
+    AddOpenToBuild(draft);
+    AddQuery(draft, "raster", "$raster");
+  }
+
+  void Plan(JobSession& session, const JobResults& opened) override {
+    raster_ = opened.Find("raster").returns.Find("URI");
+    levels_ = ChooseLevels(options_.levels, ReadInfo(opened, "raster"));
+    if (!options_.IsDriver()) session.GetInterruption().AddTemporariesOf(PyramidPath());
+  }
+
+  /// @param raster  a variable or URI.
+  void AddBuild(JobDraft& draft, const String& raster) const {
+    JobWriterCommand& build = draft.Step(kBuildStep, "BuildRasterPyramidCommand");
+    build.AddInput("URI", raster);
+    build.AddInput("PyramidType", String(options_.IsDriver() ? "DRIVER" : "ORVA"));
+    build.AddInput("PyramidResamplingMethod", String(options_.method));
+    build.AddInput("PyramidLevelMin", levels_.first);
+    build.AddInput("PyramidLevelMax", levels_.last);
+    build.AddInput("PyramidCanBuild", true);
+    build.AddInput("TileDimensions", TileDimensions{options_.side, options_.side});
+    build.AddInput("Bins", Form::kExact);
+  }
+
+  JobDraft GetJob(const Outputs& /*outputs*/) const override {
+    JobDraft draft;
+    AddOpenToBuild(draft);
+    AddBuild(draft, "$raster");
+    draft.Close("close", "$raster");
+    return draft;
+  }
+
+  /// The library makes the pyramid under a name of its own, and puts it in its place.
+  void Make(JobSession& session, const Outputs& /*outputs*/) override {
+    JobDraft draft;
+    AddBuild(draft, raster_);
+    const ProgressView view(ProgressOfStep(session, draft, kBuildStep), GetProgressStyle());
+    session.Run(draft, Interrupts::kEndUnlessDone);
+    session.GetInterruption().SetDone();
+  }
+
+  // Looking.
+
+  /// Opens the raster with the pyramid that the options name, or that lies beside it.
+  void AddOpenToLook(JobDraft& draft) const {
+    if (options_.output.empty() && !options_.IsDriver()) {
+      AddOpenWithPyramid(draft, "raster", GetSource(), "Told");
+      return;
+    }
+    JobWriterCommand& open = draft.Open("raster", "OpenRasterCommand");
+    open.AddInput("CheckSource", SourceCheck::kCompared);
+    open.AddInput("ConnStr", ConnStringsOf(GetSource()));
+    if (!options_.IsDriver()) open.AddInput("PyramidConnStr", PyramidStrings());
+  }
+
+  int Info() const {
+    JobSession session(GetJobOptions());
+    JobDraft opening;
+    AddOpenToLook(opening);
+    AddQuery(opening, "raster", "$raster");
+    if (GetJobOptions().printJob) {
+      opening.Close("close", "$raster");
+      std::cout << opening.Write().ToUTF8() << '\n';
+      return kExitSuccess;
+    }
+    const JobResults opened = session.Run(opening);
+    const RasterInfo info = ReadInfo(opened, "raster");
+    if (!info.hasPyramid) {
+      throw HostError(kExitFailed, GetSource().file + ": there is no pyramid");
+    }
+    const String raster = opened.Find("raster").returns.Find("URI");
+    const Map<String, String>& query = opened.Find("raster.query").returns;
+    Json all{{"file", GetSource().file},
+             {"type", info.pyramidType.ToUTF8()},
+             {"method", query.Find("PyramidResamplingMethod").ToUTF8()}};
+    if (info.pyramidType == "ORVA") all["pyramid"] = PyramidPath();
+    const JobDraft asking = LevelsDraft(raster, info);
+    all["levels"] =
+        LevelsAsJson(asking.GetSteps().empty() ? JobResults() : session.Run(asking), info);
+    std::cout << (options_.json ? all.dump(2) + "\n" : AsText(all));
     return kExitSuccess;
   }
-  const JobResults opened = session.Run(opening);
-  const RasterInfo info = ReadInfo(opened, "raster");
-  if (!info.hasPyramid) {
-    throw HostError(kExitFailed, options.source.file + ": there is no pyramid");
-  }
-  const String raster = opened.Find("raster").returns.Find("URI");
-  const Map<String, String>& query = opened.Find("raster.query").returns;
-  Json all{{"file", options.source.file},
-           {"type", info.pyramidType.ToUTF8()},
-           {"method", query.Find("PyramidResamplingMethod").ToUTF8()}};
-  if (info.pyramidType == "ORVA") all["pyramid"] = options.PyramidPath();
-  const JobDraft asking = LevelsDraft(raster, info);
-  all["levels"] =
-      LevelsAsJson(asking.GetSteps().empty() ? JobResults() : session.Run(asking), info);
-  std::cout << (options.json ? all.dump(2) + "\n" : AsText(all));
-  return kExitSuccess;
-}
 
-/// Opens what is to be deleted: a pyramid file for itself, since its raster need not be there.
-int Delete(const Options& options) {
-  const bool isFile = options.type == "ORVA" || !options.output.empty() ||
-                      std::filesystem::exists(options.PyramidPath());
-  JobDraft draft;
-  JobWriterCommand& open = draft.Open("raster", "OpenRasterCommand");
-  open.AddInput("CheckSource", SourceCheck::kCompared);
-  if (isFile && !options.IsDriver()) {
-    open.AddInput("ConnStr", ConnStrings({"Pyramid", String(options.PyramidPath())}));
-  } else {
-    open.AddInput("ConnStr", ConnStringsOf(options.source));
-    open.AddInput("PyramidConnStr", ConnStringsOf(options.source));
-  }
-  draft.Step("delete", "DeleteRasterPyramidCommand").AddInput("URI", String("$raster"));
-  draft.Close("close", "$raster");
-  if (options.job.printJob) {
-    std::cout << draft.Write().ToUTF8() << '\n';
-    return kExitSuccess;
-  }
-  JobSession session(options.job);
-  const JobResults results = session.Run(draft);
-  if (ParseValue<bool>(results.Find("delete").returns.Find("Return"))) return kExitSuccess;
-  throw HostError(kExitFailed, options.source.file + ": there is no pyramid to delete");
-}
+  // Deleting.
 
-int Run(const Options& options) {
-  if (options.action == "build") return Build(options);
-  return options.action == "info" ? Info(options) : Delete(options);
-}
+  /// Opens what is to be deleted: a pyramid file for itself, since its raster need not be there.
+  int Delete() const {
+    const bool isFile = options_.type == "ORVA" || !options_.output.empty() ||
+                        std::filesystem::exists(PyramidPath());
+    JobDraft draft;
+    JobWriterCommand& open = draft.Open("raster", "OpenRasterCommand");
+    open.AddInput("CheckSource", SourceCheck::kCompared);
+    if (isFile && !options_.IsDriver()) {
+      open.AddInput("ConnStr", ConnStrings({"Pyramid", String(PyramidPath())}));
+    } else {
+      open.AddInput("ConnStr", ConnStringsOf(GetSource()));
+      open.AddInput("PyramidConnStr", ConnStringsOf(GetSource()));
+    }
+    draft.Step("delete", "DeleteRasterPyramidCommand").AddInput("URI", String("$raster"));
+    draft.Close("close", "$raster");
+    if (GetJobOptions().printJob) {
+      std::cout << draft.Write().ToUTF8() << '\n';
+      return kExitSuccess;
+    }
+    JobSession session(GetJobOptions());
+    for (const std::string& file : GetChangedFiles()) {
+      session.GetInterruption().Watch(file, file);
+    }
+    const JobResults results = session.Run(draft, Interrupts::kEndUnlessDone);
+    if (ParseValue<bool>(results.Find("delete").returns.Find("Return"))) return kExitSuccess;
+    throw HostError(kExitFailed, GetSource().file + ": there is no pyramid to delete");
+  }
 
-const VerbRegistration registration(
-    "pyramid", "Builds, tells of or deletes the reduced copies of a raster", [](CLI::App& app) {
-      const auto options = std::make_shared<Options>();
-      app.footer(
-          "Level L has every 2^L-th pixel of every 2^L-th line. ORVA is a file of its own, "
-          "FILE.pyr unless --output says otherwise; quicklook, read --level, info, stats and hist "
-          "find it there, with the statistics of the raster in it. DRIVER leaves it to the driver "
-          "of the format, which may put levels into the file itself, or beside it.\n"
-          "Example: vexg pyramid build scene.tif --levels 1-5\n");
-      app.add_option("action", options->action, "build, info or delete")
-          ->type_name("ACTION")
-          ->transform(OneOf({"build", "info", "delete"}))
-          ->required();
-      options->source.AddTo(app);
-      app.add_option("--levels", options->levels,
-                     "First and last level; by default from 1 to that smaller than 512 pixels")
-          ->type_name("A-B");
-      app.add_option("--type", options->type, "Who keeps the pyramid; ORVA by default")
-          ->transform(OneOf({"ORVA", "DRIVER"}));
-      app.add_option("--output", options->output, "The pyramid file; FILE.pyr by default")
-          ->type_name("PATH");
-      app.add_option("--method", options->method, "How a driver reduces pixels")
-          ->transform(OneOf({"Nearest", "Linear", "Cubic", "Majority"}))
-          ->capture_default_str();
-      app.add_option("--tile", options->side, "Side of the squares that levels are stored in")
-          ->check(CLI::Range(1U, 2048U))
-          ->capture_default_str();
-      app.add_option("--compression", options->compression, "Of a pyramid file; LZ4 by default")
-          ->transform(OneOf({"LZ4", "NONE"}));
-      app.add_flag("--json", options->json, "info as JSON");
-      options->job.AddTo(app);
-      options->job.AddProgressTo(app);
-      return VerbRegistration::Work([options] { return Run(*options); });
-    });
+  static constexpr const char* kBuildStep = "build";
+
+  Options options_;
+  String raster_;  // URI
+  Levels levels_;
+};
+
+const VerbRegistration registration("pyramid",
+                                    "Builds, tells of or deletes the reduced copies of a raster",
+                                    &SetUp<PyramidVerb>);
 
 }  // namespace
 }  // namespace lumo::host

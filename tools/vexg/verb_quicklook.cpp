@@ -1,30 +1,17 @@
 #include <algorithm>
 #include <charconv>
 #include <cstdlib>
-#include <iostream>
-#include <memory>
 
 #include <CLI/CLI.hpp>
 
 #include "block_reader.h"
-#include "output_file.h"
+#include "file_verb.h"
 #include "palette_reading.h"
 #include "picture_writer.h"
 #include "quicklook_picture.h"
-#include "verb.h"
 
 namespace lumo::host {
 namespace {
-
-struct Options {
-  SourceOptions source;
-  RasterJobOptions job;
-  std::string output;
-  std::string bands;
-  std::string stretch;
-  unsigned size = 1024;
-  bool overwrite = false;
-};
 
 /// "none", or two percentiles.
 QuicklookPicture::Stretch ParseStretch(const std::string& text) {
@@ -55,13 +42,6 @@ Array<unsigned> ChooseBands(const std::string& text, const RasterInfo& info) {
   throw HostError(kExitUsage, "--bands: a picture shows one band or three");
 }
 
-JobDraft OpenDraft(const Options& options) {
-  JobDraft draft;
-  AddOpenWithPyramid(draft, "raster", options.source);
-  AddQuery(draft, "raster", "$raster");
-  return draft;
-}
-
 /// The smallest level of the pyramid that is as large as the picture; 0 for the raster itself.
 unsigned ChooseLevel(const RasterInfo& info, unsigned size) {
   if (!info.hasPyramid) return 0;
@@ -72,107 +52,111 @@ unsigned ChooseLevel(const RasterInfo& info, unsigned size) {
   return isThere ? level : 0;
 }
 
-/// Shows a level as a raster of its own.
-JobDraft LevelDraft(const String& raster, unsigned level) {
-  JobDraft draft;
-  AddLevel(draft, "level", raster, level);
-  AddQuery(draft, "level", "$level");
-  return draft;
-}
+class QuicklookVerb final : public FileVerb {
+ public:
+  explicit QuicklookVerb(CLI::App& app) : FileVerb(app) {
+    app.footer(
+        "A band with a palette shows its colours, unless --stretch is given. Pixels without data "
+        "are transparent; in a JPEG white.\n"
+        "Example: vexg quicklook scene.tif scene.png --bands 3,2,1 --stretch 1,99\n");
+    app.add_option("output", output_, "The picture, a PNG or JPEG as its name tells")
+        ->type_name("OUT.png|jpg")
+        ->required();
+    app.add_option("--bands", bandsText_,
+                   "One band, or red,green,blue; by default 2,1,0 of four bands or more, 0,1,2 of "
+                   "three, else 0")
+        ->type_name("B[,B,B]");
+    app.add_option("--stretch", stretchText_,
+                   "Percentiles of each band that become black and white, 2,98 by default; or "
+                   "none, to cut values to 0 and 255")
+        ->type_name("LO,HI");
+    app.add_option("--size", size_, "Pixels of the longer side at most")
+        ->check(CLI::Range(1U, 16384U))
+        ->capture_default_str();
+    AddOverwriteTo(app, "a file that is there");
+  }
 
-/// What the picture is made from.
-struct Shown {
-  unsigned level = 0;
-  String raster;  ///< URI
-  RasterInfo info;
+ private:
+  void CheckOptions() override {
+    stretch_ = ParseStretch(stretchText_);
+    CheckPictureName(output_);
+  }
+
+  std::vector<std::string> GetOutputs() const override { return {output_}; }
+
+  void AddOpening(JobDraft& draft) const override {
+    AddOpenWithPyramid(draft, "raster", GetSource());
+    AddQuery(draft, "raster", "$raster");
+  }
+
+  void Plan(JobSession& session, const JobResults& opened) override {
+    raster_ = opened.Find("raster").returns.Find("URI");
+    info_ = ReadInfo(opened, "raster");
+    bands_ = ChooseBands(bandsText_, info_);
+    hasPalette_ = bands_.GetCount() == 1 && info_.hasPalette[bands_[0]] && stretchText_.empty();
+    shown_ = raster_;
+    level_ = ChooseLevel(info_, size_);
+    if (level_ != 0) ShowLevel(session);
+    picture_ = std::make_unique<QuicklookPicture>(info_, size_, bands_);
+  }
+
+  /// Shows a level as a raster of its own.
+  void ShowLevel(JobSession& session) {
+    JobDraft draft;
+    AddLevel(draft, "level", raster_, level_);
+    AddQuery(draft, "level", "$level");
+    const JobResults results = session.Run(draft);
+    shown_ = results.Find("level").returns.Find("PyramidURI");
+    info_ = ReadInfo(results, "level");
+  }
+
+  /// Each block has memory of its own there.
+  JobDraft GetJob(const Outputs& /*outputs*/) const override {
+    JobDraft draft;
+    AddOpening(draft);
+    if (level_ != 0) AddLevel(draft, "level", "$raster", level_);
+    AddBlockSteps(draft, level_ != 0 ? "$level" : "$raster", info_, bands_, Interleave::BIP,
+                  picture_->GetBlocks());
+    if (level_ != 0) draft.Close("close.level", "$level");
+    draft.Close("close", "$raster");
+    return draft;
+  }
+
+  void Make(JobSession& session, const Outputs& outputs) override {
+    BlockReader reader(session, shown_, info_, GetSource().file);
+    reader.ReadAll(picture_->GetBlocks(), bands_, Interleave::BIP, GetProgressStyle(),
+                   [&](const SubRect& block) {
+                     picture_->Take(block, reader.GetPixels(), reader.GetStates());
+                   });
+    const QuicklookPicture::Bytes bytes =
+        hasPalette_ ? picture_->Draw(ReadPalette(session, raster_, bands_[0]))
+                    : picture_->Draw(stretch_);
+    const auto writer = MakePictureWriter(outputs.Get(0), picture_->GetWidth(),
+                                          picture_->GetHeight(), bytes.channels);
+    const std::size_t lineBytes = std::size_t{picture_->GetWidth()} * bytes.channels;
+    for (std::size_t y = 0; y < picture_->GetHeight(); ++y) {
+      session.CheckInterrupt();
+      writer->WriteLine(&bytes.pixels[y * lineBytes]);
+    }
+    writer->Close();
+  }
+
+  std::string output_, bandsText_, stretchText_;
+  unsigned size_ = 1024;
+
+  QuicklookPicture::Stretch stretch_;
+  String raster_;       // URI
+  unsigned level_ = 0;  // of the pyramid that the picture is made from
+  String shown_;        // URI of the level, or of the raster
+  RasterInfo info_;     // of that
+  Array<unsigned> bands_;
+  bool hasPalette_ = false;  // the picture is in the colours of the band
+  std::unique_ptr<QuicklookPicture> picture_;
 };
 
-/// The whole of the work as one document; each block has memory of its own there.
-void PrintJob(const Options& options, const Shown& shown, const Array<unsigned>& bands,
-              const std::vector<SubRect>& blocks) {
-  JobDraft draft = OpenDraft(options);
-  if (shown.level != 0) AddLevel(draft, "level", "$raster", shown.level);
-  AddBlockSteps(draft, shown.level != 0 ? "$level" : "$raster", shown.info, bands, Interleave::BIP,
-                blocks);
-  if (shown.level != 0) draft.Close("close.level", "$level");
-  draft.Close("close", "$raster");
-  std::cout << draft.Write().ToUTF8() << '\n';
-}
-
-void WritePicture(const OutputFile& output, const QuicklookPicture& picture,
-                  const QuicklookPicture::Bytes& bytes) {
-  const auto writer =
-      MakePictureWriter(output, picture.GetWidth(), picture.GetHeight(), bytes.channels);
-  const std::size_t lineBytes = std::size_t{picture.GetWidth()} * bytes.channels;
-  for (std::size_t y = 0; y < picture.GetHeight(); ++y)
-    writer->WriteLine(&bytes.pixels[y * lineBytes]);
-  writer->Close();
-}
-
-int Quicklook(const Options& options) {
-  const QuicklookPicture::Stretch stretch = ParseStretch(options.stretch);
-  CheckPictureName(options.output);
-  OutputFile output(options.output, options.overwrite, {options.source.file});
-  JobSession session(options.job);
-  const JobResults opened = session.Run(OpenDraft(options));
-  const String raster = opened.Find("raster").returns.Find("URI");
-  output.RefuseInput(PathOf(raster));
-  const RasterInfo info = ReadInfo(opened, "raster");
-  const Array<unsigned> bands = ChooseBands(options.bands, info);
-  Shown shown{ChooseLevel(info, options.size), raster, info};
-  if (shown.level != 0) {
-    const JobResults level = session.Run(LevelDraft(raster, shown.level));
-    shown.raster = level.Find("level").returns.Find("PyramidURI");
-    shown.info = ReadInfo(level, "level");
-  }
-  QuicklookPicture picture(shown.info, options.size, bands);
-  const std::vector<SubRect> blocks = picture.GetBlocks();
-  if (options.job.printJob) {
-    PrintJob(options, shown, bands, blocks);
-    return kExitSuccess;
-  }
-  constexpr std::uint64_t kMostChannels = 4;
-  output.Begin(kMostChannels * picture.GetWidth() * picture.GetHeight());
-  BlockReader reader(session, shown.raster, shown.info, options.source.file);
-  reader.ReadAll(
-      blocks, bands, Interleave::BIP, options.job.GetProgressStyle(),
-      [&](const SubRect& block) { picture.Take(block, reader.GetPixels(), reader.GetStates()); });
-  const bool inColors =
-      bands.GetCount() == 1 && info.hasPalette[bands[0]] && options.stretch.empty();
-  WritePicture(
-      output, picture,
-      inColors ? picture.Draw(ReadPalette(session, raster, bands[0])) : picture.Draw(stretch));
-  output.Commit();
-  return kExitSuccess;
-}
-
-const VerbRegistration registration(
-    "quicklook", "Makes a picture of a raster at the size of a screen", [](CLI::App& app) {
-      const auto options = std::make_shared<Options>();
-      app.footer(
-          "A band with a palette shows its colours, unless --stretch is given. Pixels without data "
-          "are transparent; in a JPEG white.\n"
-          "Example: vexg quicklook scene.tif scene.png --bands 3,2,1 --stretch 1,99\n");
-      options->source.AddTo(app);
-      app.add_option("output", options->output, "The picture, a PNG or JPEG as its name tells")
-          ->type_name("OUT.png|jpg")
-          ->required();
-      app.add_option("--bands", options->bands,
-                     "One band, or red,green,blue; by default 2,1,0 of four bands or more, 0,1,2 "
-                     "of three, else 0")
-          ->type_name("B[,B,B]");
-      app.add_option("--stretch", options->stretch,
-                     "Percentiles of each band that become black and white, 2,98 by default; or "
-                     "none, to cut values to 0 and 255")
-          ->type_name("LO,HI");
-      app.add_option("--size", options->size, "Pixels of the longer side at most")
-          ->check(CLI::Range(1U, 16384U))
-          ->capture_default_str();
-      app.add_flag("--overwrite", options->overwrite, "Replace a file that is there");
-      options->job.AddTo(app);
-      options->job.AddProgressTo(app);
-      return VerbRegistration::Work([options] { return Quicklook(*options); });
-    });
+const VerbRegistration registration("quicklook",
+                                    "Makes a picture of a raster at the size of a screen",
+                                    &SetUp<QuicklookVerb>);
 
 }  // namespace
 }  // namespace lumo::host

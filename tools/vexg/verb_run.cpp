@@ -6,6 +6,7 @@
 #include "commands/job_parser.h"
 #include "commands/job_result.h"
 #include "foundation/abandonment.h"
+#include "platform/durability.h"
 #include "platform/interrupt.h"
 #include "progress_view.h"
 #include "result_output.h"
@@ -17,7 +18,8 @@ namespace {
 int RunJobFile(const JobOptions& options) {
   String text;
   const Document document = ReadJob(options, text);
-  Output output(options.output);
+  Output output(options.output, options.file);
+  platform::SetDurable(options.isDurable);
   Job job;
   JobParser(job).Parse(text);
   job.tellsReasons = true;

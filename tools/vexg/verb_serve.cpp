@@ -13,6 +13,7 @@
 #include "foundation/fault.h"
 #include "foundation/thread_roll.h"
 #include "option_values.h"
+#include "platform/durability.h"
 #include "platform/file_fence.h"
 #include "platform/interrupt.h"
 #include "platform/message_pipe.h"
@@ -103,6 +104,7 @@ int Serve(const ServeOptions& options) {
   const std::string& name = options.name;
   LimitAccess(options);
   platform::RaiseDescriptorLimit();
+  platform::SetDurable(true);
   auto& dispatch = dynamic_cast<PipeServerDispatch&>(GetServerDispatch(String(name)));
   dispatch.SetReleaseOnQuit(!options.shared);
   bool allGone = false;

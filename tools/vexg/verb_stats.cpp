@@ -1,49 +1,18 @@
 #include <iostream>
-#include <memory>
 
 #include <CLI/CLI.hpp>
 #include <fmt/format.h>
 
+#include "file_verb.h"
 #include "foundation/near_name.h"
 #include "json_number.h"
 #include "raster_target.h"
 #include "stats/turn.h"
-#include "verb.h"
 
 namespace lumo::host {
 namespace {
 
-struct Options {
-  SourceOptions source;
-  RasterJobOptions job;
-  std::string bands;
-  bool extended = false;
-  bool save = false;
-  bool json = false;
-};
-
 constexpr const char* kStatsStep = "stats";
-
-/// The whole of the work as one document.
-JobDraft MakeDraft(const Options& options, const Array<unsigned>& bands) {
-  JobDraft draft;
-  AddOpenWithPyramid(draft, "raster", options.source);
-  if (!options.bands.empty()) AddBandView(draft, "bands", "$raster", bands);
-  const String shown = options.bands.empty() ? "$raster" : "$bands";
-  JobWriterCommand& stats =
-      draft.Step(kStatsStep,
-                 options.extended ? "GetExtendedRasterStatsCommand" : "GetBasicRasterStatsCommand");
-  stats.AddVariableInput("URI", shown);
-  stats.AddInput("Wait", Waiting::kAlways);
-  if (options.save) {
-    JobWriterCommand& save = draft.Step("save", "SaveRasterStatsCommand");
-    save.AddVariableInput("URI", "$raster");
-    save.AddInput("Wait", Waiting::kAlways);
-  }
-  if (!options.bands.empty()) draft.Close("close.bands", "$bands");
-  draft.Close("close.raster", "$raster");
-  return draft;
-}
 
 /// A value in both forms of output.
 struct Cell {
@@ -109,7 +78,8 @@ void MarkUnknown(BandTable& table) {
   }
 }
 
-BandTable ReadTable(const Map<String, String>& returns, const Options& options,
+/// @param file  what the user calls the raster.
+BandTable ReadTable(const Map<String, String>& returns, const std::string& file, bool isExtended,
                     const Array<unsigned>& bands, unsigned dataType) {
   BandTable table;
   table.bands.assign(bands.begin(), bands.end());
@@ -129,13 +99,13 @@ BandTable ReadTable(const Map<String, String>& returns, const Options& options,
                    {"rms", ReadColumn<double>(returns, "RMS")}};
   for (const auto& [name, column] : table.columns) {
     if (column.size() == table.bands.size()) continue;
-    throw HostError(kExitFailed, options.source.file + ": there are no statistics of all bands");
+    throw HostError(kExitFailed, file + ": there are no statistics of all bands");
   }
-  if (options.extended) {
+  if (isExtended) {
     table.sumXY = ReadRows(returns, "SumXY", table.bands.size());
     table.cov = ReadRows(returns, "Cov", table.bands.size());
     if (table.sumXY.size() != table.bands.size() || table.cov.size() != table.bands.size()) {
-      throw HostError(kExitFailed, options.source.file + ": there are no statistics between bands");
+      throw HostError(kExitFailed, file + ": there are no statistics between bands");
     }
   }
   MarkUnknown(table);
@@ -191,63 +161,112 @@ std::string AsText(const std::string& file, const BandTable& table) {
   return text;
 }
 
-int Stats(const Options& options) {
-  if (options.save && !options.bands.empty()) {
-    throw HostError(kExitUsage,
-                    "--save: the statistics of all bands are saved together; leave "
-                    "--bands out");
+class StatsVerb final : public FileVerb {
+ public:
+  explicit StatsVerb(CLI::App& app) : FileVerb(app) {
+    app.footer(
+        "Pixels without data, masked ones, NaN and infinities do not count. The deviation is that "
+        "of a sample, divided by n - 1. With --json: \"file\" and \"bands\", a list of objects "
+        "with \"band\" (from 0), \"count\", \"min\", \"max\", \"mean\", \"std\", \"sum\", "
+        "\"sum2\", \"rms\", and with --extended \"sumXY\" and \"cov\", one value for each band. "
+        "Of a band without a valid pixel all but the count is null, and a dash in the table; a "
+        "count that isn't known is null, and NaN and infinities are.\n"
+        "Example: vexg stats scene.tif --bands 3,2,1 --extended\n");
+    app.add_option("--bands", bandsText_, "Bands, from 0; all by default")->type_name("B,B…");
+    app.add_flag("--extended", isExtended_, "With covariances and sums of products");
+    app.add_flag("--save", saves_,
+                 "Store them with the raster, so that they are known from now on");
+    app.add_flag("--json", isJson_, "As JSON");
   }
-  JobSession session(options.job);
-  JobDraft opening;
-  AddOpenWithPyramid(opening, "raster", options.source);
-  AddQuery(opening, "raster", "$raster");
-  opening.Close("close.raster", "$raster");
-  const RasterInfo info = ReadInfo(session.Run(opening), "raster");
-  const Array<unsigned> bands = ParseBands(options.bands, info);
-  const JobDraft draft = MakeDraft(options, bands);
-  if (options.job.printJob) {
-    std::cout << draft.Write().ToUTF8() << '\n';
-    return kExitSuccess;
-  }
-  JobResults results;
-  {
-    const ProgressView view(ProgressOfStep(session, draft, kStatsStep),
-                            options.job.GetProgressStyle());
-    results = session.Run(draft);
-  }
-  const BandTable table =
-      ReadTable(results.Find(kStatsStep).returns, options, bands, info.dataType);
-  std::cout << (options.json ? AsJson(options.source.file, table).dump(2) + "\n"
-                             : AsText(options.source.file, table));
-  if (options.save && !ParseValue<bool>(results.Find("save").returns.Find("Return"))) {
-    throw HostError(kExitFailed, options.source.file + ": the statistics could not be saved");
-  }
-  return kExitSuccess;
-}
 
-const VerbRegistration registration(
-    "stats", "Tells the statistics of a raster's bands", [](CLI::App& app) {
-      const auto options = std::make_shared<Options>();
-      app.footer(
-          "Pixels without data, masked ones, NaN and infinities do not count. The deviation is "
-          "that "
-          "of a sample, divided by n - 1. With --json: \"file\" and \"bands\", a list of objects "
-          "with \"band\" (from 0), \"count\", \"min\", \"max\", \"mean\", \"std\", \"sum\", "
-          "\"sum2\", \"rms\", and with --extended \"sumXY\" and \"cov\", one value for each band. "
-          "Of a "
-          "band without a valid pixel all but the count is null, and a dash in the table; a count "
-          "that isn't known is null, and NaN and infinities are.\n"
-          "Example: vexg stats scene.tif --bands 3,2,1 --extended\n");
-      options->source.AddTo(app);
-      app.add_option("--bands", options->bands, "Bands, from 0; all by default")->type_name("B,B…");
-      app.add_flag("--extended", options->extended, "With covariances and sums of products");
-      app.add_flag("--save", options->save,
-                   "Store them with the raster, so that they are known from now on");
-      app.add_flag("--json", options->json, "As JSON");
-      options->job.AddTo(app);
-      options->job.AddProgressTo(app);
-      return VerbRegistration::Work([options] { return Stats(*options); });
-    });
+ private:
+  void CheckOptions() override {
+    if (!saves_ || bandsText_.empty()) return;
+    throw HostError(kExitUsage,
+                    "--save: the statistics of all bands are saved together; leave --bands out");
+  }
+
+  std::vector<std::string> GetChangedFiles() const override {
+    return saves_ ? FilesOfSavedValues(GetSource()) : std::vector<std::string>();
+  }
+
+  void AddOpening(JobDraft& draft) const override {
+    AddOpenWithPyramid(draft, "raster", GetSource());
+    AddQuery(draft, "raster", "$raster");
+  }
+
+  void Plan(JobSession& /*session*/, const JobResults& opened) override {
+    raster_ = opened.Find("raster").returns.Find("URI");
+    info_ = ReadInfo(opened, "raster");
+    bands_ = ParseBands(bandsText_, info_);
+  }
+
+  /// @param raster  a variable or URI.
+  void AddStats(JobDraft& draft, const String& raster) const {
+    if (!bandsText_.empty()) AddBandView(draft, "bands", raster, bands_);
+    JobWriterCommand& stats = draft.Step(
+        kStatsStep, isExtended_ ? "GetExtendedRasterStatsCommand" : "GetBasicRasterStatsCommand");
+    stats.AddInput("URI", bandsText_.empty() ? raster : "$bands");
+    stats.AddInput("Wait", Waiting::kAlways);
+    if (!bandsText_.empty()) draft.Close("close.bands", "$bands");
+  }
+
+  static void AddSave(JobDraft& draft, const String& raster) {
+    JobWriterCommand& save = draft.Step("save", "SaveRasterStatsCommand");
+    save.AddInput("URI", raster);
+    save.AddInput("Wait", Waiting::kAlways);
+  }
+
+  JobDraft GetJob(const Outputs& /*outputs*/) const override {
+    JobDraft draft;
+    AddOpenWithPyramid(draft, "raster", GetSource());
+    AddStats(draft, "$raster");
+    if (saves_) AddSave(draft, "$raster");
+    draft.Close("close.raster", "$raster");
+    return draft;
+  }
+
+  void Make(JobSession& session, const Outputs& /*outputs*/) override {
+    JobDraft draft;
+    AddStats(draft, raster_);
+    JobResults results;
+    {
+      const ProgressView view(ProgressOfStep(session, draft, kStatsStep), GetProgressStyle());
+      results = session.Run(draft);
+    }
+    table_ = ReadTable(results.Find(kStatsStep).returns, GetSource().file, isExtended_, bands_,
+                       info_.dataType);
+  }
+
+  void Save(JobSession& session) override {
+    if (!saves_) return;
+    JobDraft draft;
+    AddSave(draft, raster_);
+    draft.Close("close.raster", raster_);
+    const JobResults results = session.Run(draft, Interrupts::kWait);
+    CheckClosed(results, "close.raster");
+    if (ParseValue<bool>(results.Find("save").returns.Find("Return"))) return;
+    throw HostError(kExitFailed, GetSource().file + ": the statistics could not be saved");
+  }
+
+  void Tell() override {
+    std::cout << (isJson_ ? AsJson(GetSource().file, table_).dump(2) + "\n"
+                          : AsText(GetSource().file, table_));
+  }
+
+  std::string bandsText_;
+  bool isExtended_ = false;
+  bool saves_ = false;
+  bool isJson_ = false;
+
+  String raster_;  // URI
+  RasterInfo info_;
+  Array<unsigned> bands_;
+  BandTable table_;
+};
+
+const VerbRegistration registration("stats", "Tells the statistics of a raster's bands",
+                                    &SetUp<StatsVerb>);
 
 }  // namespace
 }  // namespace lumo::host

@@ -3,6 +3,7 @@
 #include <CLI/CLI.hpp>
 
 #include "job_channel.h"
+#include "platform/durability.h"
 #include "platform/interrupt.h"
 #include "progress_view.h"
 #include "result_output.h"
@@ -24,7 +25,8 @@ JobChannel ChannelOf(Document& document) {
 int SubmitJobFile(const JobOptions& options, const ServerOptions& server) {
   String text;
   Document document = ReadJob(options, text);
-  Output output(options.output);
+  Output output(options.output, options.file);
+  platform::SetDurable(options.isDurable);
   JobChannel channel = ChannelOf(document);
   document.GetRoot().AddChild("Reasons");
   if (AsksForStrictChecks(document)) document.GetRoot().attributes["Checks"] = "Strict";

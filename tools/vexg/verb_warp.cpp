@@ -2,82 +2,24 @@
 #include <cmath>
 #include <cstdlib>
 #include <filesystem>
-#include <iostream>
 #include <map>
-#include <memory>
 #include <optional>
 
 #include <CLI/CLI.hpp>
 #include <fmt/format.h>
 
 #include "georef/covering_grid.h"
-#include "keeping.h"
 #include "option_values.h"
 #include "raster/pixel_value.h"
-#include "verb.h"
+#include "raster_verb.h"
 
 namespace lumo::host {
 namespace {
-
-struct Options {
-  SourceOptions source;
-  TargetOptions target;
-  RasterJobOptions job;
-  std::string to;
-  std::string pixelSize;  ///< with or without a unit
-  std::string method = "polynomial";
-  std::string resampling = "nearest";
-  std::string bands;
-  std::optional<double> noData;
-};
-
-/// What is made.
-struct Plan {
-  std::string format;
-  Array<unsigned> bands;
-  GeoRefPtr grid;
-};
-
-constexpr const char* kWarpStep = "warp";
 
 /// A word of the command line as the commands have it.
 std::string Capital(std::string word) {
   if (!word.empty() && word[0] >= 'a' && word[0] <= 'z') word[0] += 'A' - 'a';
   return word;
-}
-
-/// The warping as a whole: opens the source, stands views on it, makes the file and closes all.
-/// @param noData  of bands, in the place of pixels that are not valid.
-JobDraft MakeDraft(const Options& options, const Plan& plan, const std::string& target,
-                   const FillValues& noData) {
-  JobDraft draft;
-  AddOpen(draft, "source", options.source);
-  std::vector<String> opened{"$source"};
-  if (!options.bands.empty()) {
-    AddBandView(draft, "bands", opened.back(), plan.bands);
-    opened.emplace_back("$bands");
-  }
-  JobWriterCommand& view = draft.Open("warped", "CreateProjectedRasterCommand");
-  view.AddVariableInput("SrcURI", opened.back());
-  view.AddInput("GeoRef", plan.grid);
-  view.AddInput("ReprojectionMethod", String(Capital(options.method)));
-  view.AddInput("ResamplingMethod", String(Capital(options.resampling)));
-  view.AddInput("Grid", String("Exact"));
-  view.AddInput("Sampling", String("Centred"));
-  if (options.noData) view.AddInput("NoData", *options.noData);
-  opened.emplace_back("$warped");
-  AddQuery(draft, "shown", opened.back());
-  AddDetailsQuery(draft, "shown", opened.back());
-  AddCreate(draft, {target, plan.format}, opened.back(), "Bands", noData);
-  JobWriterCommand& copy = draft.Step(kWarpStep, "CopyRasterCommand");
-  copy.AddVariableInput("SrcURI", opened.back());
-  copy.AddVariableInput("DstURI", "$target");
-  copy.AddInput("Invalid", String(noData.empty() && !options.noData ? "Told" : "NoData"));
-  AddCloseTarget(draft);
-  for (auto raster = opened.rbegin(); raster != opened.rend(); ++raster) {
-    draft.Close("close." + raster->ToUTF8().substr(1), *raster);
-  }
-  return draft;
 }
 
 bool IsFile(const std::string& name) {
@@ -168,132 +110,122 @@ void QuestionZone(const std::string& named, const CoordSys& system, const GeoRef
                   off, zone, named, nearest % 60 + 1));
 }
 
-/// The grid that was asked for. Throws HostError for one that can't be.
-GeoRefPtr FindGrid(JobSession& session, const Options& options, const RasterInfo& info) {
-  if (info.geoRef.IsNull()) {
-    throw HostError(kExitFailed, options.source.file + ": the raster has no geo-reference");
+class WarpVerb final : public RasterVerb {
+ public:
+  explicit WarpVerb(CLI::App& app) : RasterVerb(app, "The warped raster") {
+    app.footer(
+        "The polynomial method is within an eighth of a pixel; rigorous transforms every pixel. "
+        "Linear and cubic leave out pixels that aren't valid; cubic has the parameter -1. Pixels "
+        "outside the source are not valid: they have the no-data value, or 0 under a mask.\n"
+        "Example: vexg warp scene.tif geographic.tif --to EPSG:4326 --resampling linear\n");
+    app.add_option("--to", to_,
+                   "Coordinate system (EPSG:n, WKT, PROJ text), or a raster file whose grid is "
+                   "taken over")
+        ->type_name("CS|FILE")
+        ->transform(CoordSysName())
+        ->required();
+    app.add_option("--pixel-size", pixelSize_,
+                   "Side of a pixel in units of the system, or with its unit; by default about as "
+                   "many pixels as the source has")
+        ->type_name("SIZE")
+        ->check(CheckPixelSize);
+    app.add_option("--method", method_, "How positions are found")
+        ->transform(OneOf({"polynomial", "rigorous"}))
+        ->capture_default_str();
+    app.add_option("--resampling", resampling_, "How pixels are made")
+        ->transform(OneOf({"nearest", "linear", "cubic"}))
+        ->capture_default_str();
+    app.add_option("--bands", bandsText_, "Bands in the order wanted, from 0; all by default")
+        ->type_name("B,B…");
+    app.add_option("--no-data", noData_, "No-data value of the result; by default the source's")
+        ->type_name("VALUE");
   }
-  if (IsFile(options.to)) {
-    if (!options.pixelSize.empty()) {
-      throw HostError(kExitUsage, "--pixel-size: the grid of " + options.to + " has its own");
+
+ private:
+  std::vector<std::string> GetFurtherInputs() const override {
+    return IsFile(to_) ? std::vector{to_} : std::vector<std::string>();
+  }
+
+  RasterInfo PlanRaster(JobSession& session, const JobResults& /*opened*/,
+                        const RasterInfo& source) override {
+    CheckNoData(source);
+    bands_ = ParseBands(bandsText_, source);
+    grid_ = FindGrid(session, source);
+    RasterInfo planned = source;
+    planned.samples = grid_->Samples();
+    planned.lines = grid_->Lines();
+    planned.bands = bands_.GetCount();
+    return planned;
+  }
+
+  /// Refuses a no-data value that no pixel can have.
+  void CheckNoData(const RasterInfo& source) const {
+    if (!noData_ || FitsPixel(source.dataType, *noData_)) return;
+    throw HostError(kExitUsage, fmt::format("--no-data: a pixel of type {} can't be {}",
+                                            DataTypeName(source.dataType).ToUTF8(), *noData_));
+  }
+
+  /// The grid that was asked for. Throws HostError for one that can't be.
+  GeoRefPtr FindGrid(JobSession& session, const RasterInfo& info) const {
+    if (info.geoRef.IsNull()) {
+      throw HostError(kExitFailed, GetSource().file + ": the raster has no geo-reference");
     }
-    return GridOfFile(session, options.to);
+    if (IsFile(to_)) {
+      if (!pixelSize_.empty()) {
+        throw HostError(kExitUsage, "--pixel-size: the grid of " + to_ + " has its own");
+      }
+      return GridOfFile(session, to_);
+    }
+    CoordSys system;
+    if (!system.SetFromString(String(to_))) {
+      throw HostError(kExitUsage, "--to: neither a file nor a coordinate system: " + to_);
+    }
+    if (info.geoRef->CoordinateSystem().IsEmpty()) {
+      throw HostError(kExitFailed, GetSource().file + ": the raster has no coordinate system");
+    }
+    QuestionZone(to_, system, *info.geoRef);
+    const GeoRefPtr grid = CoveringGrid(*info.geoRef, system, ReadPixelSize(pixelSize_, system));
+    if (grid.IsNull()) {
+      throw HostError(kExitFailed, GetSource().file +
+                                       ": the raster can't be carried to that system with pixels "
+                                       "of that size");
+    }
+    return grid;
   }
-  CoordSys system;
-  if (!system.SetFromString(String(options.to))) {
-    throw HostError(kExitUsage, "--to: neither a file nor a coordinate system: " + options.to);
-  }
-  if (info.geoRef->CoordinateSystem().IsEmpty()) {
-    throw HostError(kExitFailed, options.source.file + ": the raster has no coordinate system");
-  }
-  QuestionZone(options.to, system, *info.geoRef);
-  const GeoRefPtr grid =
-      CoveringGrid(*info.geoRef, system, ReadPixelSize(options.pixelSize, system));
-  if (grid.IsNull()) {
-    throw HostError(kExitFailed, options.source.file +
-                                     ": the raster can't be carried to that system with pixels "
-                                     "of that size");
-  }
-  return grid;
-}
 
-/// Makes the file in the output's folder. Throws what went wrong.
-void MakeFile(JobSession& session, const Options& options, const Plan& plan,
-              const OutputFile& output) {
-  Losses losses(output.GetShownName(), plan.format, options.target.strict);
-  const MadeRaster raster =
-      MakeKept(session, {output.GetWorkName(), plan.format}, losses, !options.noData,
-               [&](const FillValues& noData) {
-                 const JobDraft draft = MakeDraft(options, plan, output.GetWorkName(), noData);
-                 JobResults results;
-                 {
-                   const ProgressView view(ProgressOfStep(session, draft, kWarpStep),
-                                           options.job.GetProgressStyle());
-                   results = session.Run(draft);
-                 }
-                 CheckClosed(results);
-                 RasterContents put = ReadContents(results, "shown");
-                 put.valid = ReadValidPixels(results, kWarpStep);
-                 return put;
-               });
-  CompareKept(raster, losses);
-  session.CheckInterrupt();
-  losses.Settle();
-}
-
-/// Refuses a no-data value that no pixel can have.
-void CheckNoData(const Options& options, const RasterInfo& info) {
-  if (!options.noData || FitsPixel(info.dataType, *options.noData)) return;
-  throw HostError(kExitUsage, fmt::format("--no-data: a pixel of type {} can't be {}",
-                                          DataTypeName(info.dataType).ToUTF8(), *options.noData));
-}
-
-int Warp(const Options& options) {
-  Plan plan;
-  plan.format = ChooseFormat(options.target);
-  OutputFile output(options.target.output, options.target.overwrite, {options.source.file});
-  JobSession session(options.job);
-  JobDraft opening;
-  AddOpen(opening, "source", options.source);
-  AddQuery(opening, "source", "$source");
-  const JobResults opened = session.Run(opening);
-  output.RefuseInput(PathOf(opened.Find("source").returns.Find("URI")));
-  const RasterInfo info = ReadInfo(opened, "source");
-  CheckNoData(options, info);
-  plan.bands = ParseBands(options.bands, info);
-  plan.grid = FindGrid(session, options, info);
-  if (options.job.printJob) {
-    std::cout << MakeDraft(options, plan, output.GetName(), {}).Write().ToUTF8() << '\n';
-    return kExitSuccess;
+  void AddViews(RasterChain& chain) const override {
+    if (!bandsText_.empty()) {
+      AddBandView(chain.GetDraft(), "bands", chain.GetTop(), bands_);
+      chain.Take("bands");
+    }
+    JobWriterCommand& view = chain.AddView("warped", "CreateProjectedRasterCommand");
+    view.AddInput("GeoRef", grid_);
+    view.AddInput("ReprojectionMethod", String(Capital(method_)));
+    view.AddInput("ResamplingMethod", String(Capital(resampling_)));
+    view.AddInput("Grid", String("Exact"));
+    view.AddInput("Sampling", String("Centred"));
+    if (noData_) view.AddInput("NoData", *noData_);
   }
-  output.Begin(BytesInFile(plan.format, info.dataType, plan.grid->Samples(), plan.grid->Lines(),
-                           plan.bands.GetCount()));
-  try {
-    MakeFile(session, options, plan, output);
-  } catch (const HostError& error) {
-    throw HostError(error.code, output.InUsersWords(error.what()));
-  }
-  output.Commit();
-  return kExitSuccess;
-}
 
-const VerbRegistration registration(
-    "warp", "Carries a raster to another coordinate system or grid", [](CLI::App& app) {
-      const auto options = std::make_shared<Options>();
-      app.footer(
-          "The polynomial method is within an eighth of a pixel; rigorous transforms every pixel. "
-          "Linear and cubic leave out pixels that aren't valid; cubic has the parameter -1. Pixels "
-          "outside the source are not valid: they have the no-data value, or 0 under a mask.\n"
-          "Example: vexg warp scene.tif geographic.tif --to EPSG:4326 --resampling linear\n");
-      options->source.AddTo(app);
-      options->target.AddTo(app, "The warped raster");
-      app.add_option("--to", options->to,
-                     "Coordinate system (EPSG:n, WKT, PROJ text), or a raster file whose grid is "
-                     "taken over")
-          ->type_name("CS|FILE")
-          ->transform(CoordSysName())
-          ->required();
-      app.add_option("--pixel-size", options->pixelSize,
-                     "Side of a pixel in units of the system, or with its unit; by default about "
-                     "as many pixels as "
-                     "the source has")
-          ->type_name("SIZE")
-          ->check(CheckPixelSize);
-      app.add_option("--method", options->method, "How positions are found")
-          ->transform(OneOf({"polynomial", "rigorous"}))
-          ->capture_default_str();
-      app.add_option("--resampling", options->resampling, "How pixels are made")
-          ->transform(OneOf({"nearest", "linear", "cubic"}))
-          ->capture_default_str();
-      app.add_option("--bands", options->bands, "Bands in the order wanted, from 0; all by default")
-          ->type_name("B,B…");
-      app.add_option("--no-data", options->noData,
-                     "No-data value of the result; by default the source's")
-          ->type_name("VALUE");
-      options->job.AddTo(app);
-      options->job.AddProgressTo(app);
-      return VerbRegistration::Work([options] { return Warp(*options); });
-    });
+  const char* GetKeptDetails() const override { return "Bands"; }
+  bool MayChooseNoData() const override { return !noData_; }
+  bool FillsNoData(const FillValues& noData) const override {
+    return noData_.has_value() || RasterVerb::FillsNoData(noData);
+  }
+
+  std::string to_;
+  std::string pixelSize_;  // with or without a unit
+  std::string method_ = "polynomial";
+  std::string resampling_ = "nearest";
+  std::string bandsText_;
+  std::optional<double> noData_;
+
+  Array<unsigned> bands_;
+  GeoRefPtr grid_;
+};
+
+const VerbRegistration registration("warp", "Carries a raster to another coordinate system or grid",
+                                    &SetUp<WarpVerb>);
 
 }  // namespace
 }  // namespace lumo::host

@@ -15,6 +15,7 @@
 #include <vector>
 
 #include "foundation/file_faults.h"
+#include "foundation/staged_files.h"
 #include "platform/file_moves.h"
 #include "platform/random_access_file.h"
 #include "platform/temporary_file.h"
@@ -32,6 +33,10 @@ bool NoteFault(const std::string& path) {
 
 /// One open file of GDAL's. Small reads and writes go through one window of the file, which holds
 /// either what was read ahead or what is not yet written.
+///
+/// A file to which a write has failed is given up: from then on every read and write of it fails,
+/// so that a library that looks for its way in what it has half written comes to an end, and its
+/// last failure is told once more when it is closed.
 class File final : public VSIVirtualHandle {
  public:
   /// @param shown  the path that faults are noted under.
@@ -76,7 +81,8 @@ class File final : public VSIVirtualHandle {
     if (!WriteWindow()) return -1;
     window_.clear();
     errno = 0;
-    return file_->SetSize(size) || NoteFault(shown_) ? 0 : -1;
+    writtenEnd_ = std::min<std::uint64_t>(writtenEnd_, size);
+    return file_->SetSize(size) || FailToWrite() ? 0 : -1;
   }
 
   bool HasPRead() const override { return true; }
@@ -84,21 +90,22 @@ class File final : public VSIVirtualHandle {
   std::size_t PRead(void* to, std::size_t size, vsi_l_offset offset) const override {
     std::size_t got = 0;
     errno = 0;
-    if (!file_->ReadUpTo(offset, to, size, got)) NoteFault(shown_);
+    if (failure_ == 0 && !file_->ReadUpTo(offset, to, size, got)) NoteFault(shown_);
     return got;
   }
 
   int Close() override {
     if (file_ == nullptr) return 0;
-    const bool isWritten = WriteWindow();
+    const bool isWhole = WriteWindow() && HasAllThatWasWritten();
     const std::string made = file_->Path();
     errno = 0;
-    const bool isClosed = file_->Close() || NoteFault(shown_);
+    if (!file_->Close()) FailToWrite();
     file_.reset();
-    const bool isWhole = isWritten && isClosed && !hasFailed_;
-    if (target_.empty()) return isWhole ? 0 : -1;
+    if (failure_ != 0) FileFaults::Note(shown_, failure_);  // its listener may be another one
+    if (target_.empty()) return isWhole && failure_ == 0 ? 0 : -1;
     errno = 0;
-    if (isWhole && (platform::RenameFile(made, target_) || NoteFault(shown_))) return 0;
+    const bool canTakePlace = isWhole && failure_ == 0;
+    if (canTakePlace && (platform::RenameFile(made, target_) || NoteFault(shown_))) return 0;
     VSIUnlink(made.c_str());
     return -1;
   }
@@ -107,8 +114,17 @@ class File final : public VSIVirtualHandle {
   static constexpr std::size_t kWindowBytes = 16 << 10;
 
   bool SizeOf(std::uint64_t& bytes) {
+    if (!WriteWindow()) return false;
     errno = 0;
-    return WriteWindow() && (file_->GetSize(bytes) || NoteFault(shown_));
+    return file_->GetSize(bytes) || NoteFault(shown_);
+  }
+
+  /// False for a file that is shorter than what was written to it without a failure.
+  bool HasAllThatWasWritten() {
+    std::uint64_t bytes = 0;
+    if (failure_ != 0 || writtenEnd_ == 0) return failure_ == 0;
+    errno = 0;
+    return file_->GetSize(bytes) && bytes >= writtenEnd_ ? true : FailToWrite();
   }
 
   /// Takes what the window holds of the next bytes.
@@ -123,7 +139,7 @@ class File final : public VSIVirtualHandle {
 
   /// @return the bytes that there are, up to `bytes`; fewer also when the read failed.
   std::size_t ReadBytes(char* to, std::size_t bytes) {
-    if (!WriteWindow()) return 0;
+    if (failure_ != 0 || !WriteWindow()) return 0;
     std::size_t got = TakeFromWindow(to, bytes);
     if (got == bytes) return got;
     const std::size_t rest = bytes - got;
@@ -143,6 +159,7 @@ class File final : public VSIVirtualHandle {
   }
 
   bool WriteBytes(const char* from, std::size_t bytes) {
+    if (failure_ != 0) return false;
     if (!isUnwritten_ || place_ != windowPlace_ + window_.size() ||
         window_.size() + bytes > kWindowBytes) {
       if (!WriteWindow()) return false;
@@ -152,6 +169,7 @@ class File final : public VSIVirtualHandle {
     if (bytes > kWindowBytes) {
       errno = 0;
       if (!file_->Write(place_, from, bytes)) return FailToWrite();
+      writtenEnd_ = std::max<std::uint64_t>(writtenEnd_, place_ + bytes);
     } else {
       window_.insert(window_.end(), from, from + bytes);
       isUnwritten_ = true;
@@ -161,16 +179,18 @@ class File final : public VSIVirtualHandle {
   }
 
   bool WriteWindow() {
-    if (!isUnwritten_) return true;
+    if (!isUnwritten_) return failure_ == 0;
     isUnwritten_ = false;
     errno = 0;
     const bool isWritten = file_->Write(windowPlace_, window_.data(), window_.size());
+    writtenEnd_ = std::max<std::uint64_t>(writtenEnd_, windowPlace_ + window_.size());
     window_.clear();
     return isWritten || FailToWrite();
   }
 
   bool FailToWrite() {
-    hasFailed_ = true;
+    if (errno == 0) errno = EIO;
+    failure_ = errno;
     return NoteFault(shown_);
   }
 
@@ -180,8 +200,9 @@ class File final : public VSIVirtualHandle {
   std::uint64_t place_ = 0;
   std::vector<char> window_;
   std::uint64_t windowPlace_ = 0;
+  std::uint64_t writtenEnd_ = 0;  // of what was written; 0 for nothing
   bool isUnwritten_ = false;
-  bool hasFailed_ = false;
+  int failure_ = 0;  // the system's number of the first write that failed
   bool isAtEnd_ = false;
 };
 
@@ -219,7 +240,7 @@ class FileSystem final : public VSIFilesystemHandler {
     const bool isNew = mode.starts_with('w');
     const bool isForWriting = isNew || mode.find('+') != mode.npos;
     errno = 0;
-    VSIVirtualHandle* const file = isNew ? OpenNew(path) : OpenOld(path, isForWriting);
+    VSIVirtualHandle* const file = Open(path, isNew, isForWriting);
     if (file != nullptr) return file;
     if (errno == EISDIR) return plain_.Open(path, access, setError, options);  // devices, pipes
     const int code = errno != 0 ? errno : EIO;
@@ -233,13 +254,13 @@ class FileSystem final : public VSIFilesystemHandler {
 
   int Stat(const char* path, VSIStatBufL* status, int flags) override {
     errno = 0;
-    const int result = plain_.Stat(path, status, flags);
-    const int code = errno;
-    if (result != 0 && code != 0 && !IsAnswer(code, false)) FileFaults::Note(path, code);
-    errno = code;
-    return result;
+    return Noted(path, plain_.Stat(PlaceOf(path).c_str(), status, flags));
   }
-  int Unlink(const char* path) override { return Noted(path, plain_.Unlink(path)); }
+  int Unlink(const char* path) override {
+    StagedFiles* const staged = StagedFiles::OfThread();
+    if (staged == nullptr || !staged->Covers(path)) return Noted(path, plain_.Unlink(path));
+    return staged->Remove(path) ? 0 : -1;
+  }
   int Rename(const char* from, const char* to) override {
     return Noted(from, plain_.Rename(from, to));
   }
@@ -258,22 +279,39 @@ class FileSystem final : public VSIFilesystemHandler {
   }
 
  private:
-  static VSIVirtualHandle* OpenOld(const char* path, bool isForWriting) {
+  /// Where a file that GDAL names lies for now.
+  static std::string PlaceOf(const char* path) {
+    const StagedFiles* const staged = StagedFiles::OfThread();
+    return staged != nullptr ? staged->PlaceOf(path) : path;
+  }
+
+  static VSIVirtualHandle* Open(const char* path, bool isNew, bool isForWriting) {
+    StagedFiles* const staged = StagedFiles::OfThread();
+    if (staged != nullptr && isForWriting && staged->Covers(path)) {
+      const std::string place = staged->Stage(path, isNew);
+      return place.empty() ? nullptr : OpenAt(place, path, isNew, true);
+    }
+    if (isNew && std::string_view(path).ends_with(".aux.xml")) return OpenBeside(path);
+    return OpenAt(PlaceOf(path), path, isNew, isForWriting);
+  }
+
+  static VSIVirtualHandle* OpenAt(const std::string& place, const char* path, bool isNew,
+                                  bool isForWriting) {
     using Access = RandomAccessFile::Access;
     // The guard in front of this one has judged the file.
-    auto file = RandomAccessFile::Open(path, isForWriting ? Access::kUpdate : Access::kRead,
-                                       nullptr, RandomAccessFile::Gate::kPassed);
+    auto file = isNew
+                    ? RandomAccessFile::CreateOrEmpty(place)
+                    : RandomAccessFile::Open(place, isForWriting ? Access::kUpdate : Access::kRead,
+                                             nullptr, RandomAccessFile::Gate::kPassed);
     return file != nullptr ? new File(std::move(file), path, "") : nullptr;
   }
 
-  static VSIVirtualHandle* OpenNew(const char* path) {
-    if (!std::string_view(path).ends_with(".aux.xml")) {
-      auto file = RandomAccessFile::CreateOrEmpty(path);
-      return file != nullptr ? new File(std::move(file), path, "") : nullptr;
-    }
+  /// Makes a file that takes the place of an older one when it is closed.
+  static VSIVirtualHandle* OpenBeside(const char* path) {
     std::error_code fault;
     const std::filesystem::path resolved = std::filesystem::weakly_canonical(path, fault);
     const std::string target = fault ? path : resolved.string();
+    platform::RemoveAbandonedFiles(target);
     auto file = RandomAccessFile::Create(platform::TemporaryPathBeside(target));
     if (file == nullptr) return nullptr;
     const auto status = std::filesystem::status(target, fault);

@@ -35,6 +35,7 @@ void StartGdal() {
   std::call_once(started, [] {
     const std::string data = GetGlobalEnvironmentImpl().Find(Environment::kGdalDirectory).ToUTF8();
     if (!data.empty()) CPLSetConfigOption("GDAL_DATA", data.c_str());
+    const Messages messages;  // so that a failure that is fatal to GDAL ends no process
     Silence();
     InstallFileSystem();
     GDALAllRegister();

@@ -4,10 +4,13 @@
 #include <cctype>
 #include <cpl_error.h>
 #include <initializer_list>
+#include <new>
+#include <stdexcept>
 #include <string_view>
 
 #include "common/hdf5_files.h"
 #include "foundation/fault.h"
+#include "platform/memory_shortage.h"
 
 namespace lumo::gdal {
 namespace {
@@ -32,6 +35,12 @@ bool TellsOfDamage(const char* text) {
          !HoldsOneOf(text, {"extraneous bytes"});
 }
 
+/// True for a failed allocation: of GDAL's own, or in the words of the libraries that it uses.
+bool IsOfMemory(CPLErrorNum number, const char* text) {
+  return number == CPLE_OutOfMemory ||
+         HoldsOneOf(text, {"out of memory", "bad_alloc", "cannot allocate", "insufficient memory"});
+}
+
 /// True for a warning that stands for a failure.
 bool IsOfFailure(const char* text, Messages::Damage damage) {
   return HoldsOneOf(text, {"unable to save auxiliary information"}) ||
@@ -41,8 +50,17 @@ bool IsOfFailure(const char* text, Messages::Damage damage) {
 }  // namespace
 
 struct Messages::Handler {
-  static void CPL_STDCALL Take(CPLErr severity, CPLErrorNum, const char* text) {
+  /// What is fatal to GDAL, as a small allocation that fails, would end the process when this
+  /// returns. It leaves as an exception instead, as that of a container of GDAL's own would.
+  static void CPL_STDCALL Take(CPLErr severity, CPLErrorNum number, const char* text) {
     auto* const messages = static_cast<Messages*>(CPLGetErrorHandlerUserData());
+    if (IsOfMemory(number, text)) {
+      platform::NoteMemoryShortage();
+      if (severity == CE_Fatal) throw std::bad_alloc();
+      severity = CE_Failure;
+      text = platform::kOutOfMemory;
+    }
+    if (severity == CE_Fatal) throw std::runtime_error(text);
     if (severity != CE_Warning && severity != CE_Failure && severity != CE_Fatal) return;
     const bool isWarning = severity == CE_Warning && !IsOfFailure(text, messages->damage_);
     std::string& line = isWarning ? messages->warning_ : messages->error_;
@@ -65,6 +83,7 @@ Messages::~Messages() {
 }
 
 std::string Messages::Text() const {
+  if (memory_.WasShort()) return platform::kOutOfMemory;
   if (const FileFault* const fault = faults_.First()) return fault->path + ": " + fault->Text();
   return error_.empty() ? warning_ : error_;
 }
@@ -102,11 +121,17 @@ std::string WithoutName(std::string text, const std::string& name) {
 
 bool Messages::Fail(const std::string& name, const char* otherwise) const {
   const std::string text = Text();  // into some of which GDAL itself puts the name
+  const FileFault* const fault = faults_.First();
+  if (fault != nullptr && fault->path.starts_with(name + ".")) {  // a file beside it
+    SetFault(text);
+    return false;
+  }
   return FailWith(name, text.empty() ? otherwise : WithoutName(text, name));
 }
 
 void Messages::Clear() {
   faults_.Clear();
+  memory_ = platform::MemoryWatch();
   error_.clear();
   warning_.clear();
 }

@@ -3,6 +3,7 @@
 #include <string>
 
 #include "foundation/file_faults.h"
+#include "platform/memory_shortage.h"
 
 namespace lumo::gdal {
 
@@ -19,13 +20,15 @@ class Messages {
   Messages(const Messages&) = delete;
   Messages& operator=(const Messages&) = delete;
 
-  /// True when GDAL told an error, or a file operation failed that it did not tell of or, as when a
-  /// file beside the raster could not be saved, only warned of.
-  bool HasError() const { return !error_.empty() || faults_.First() != nullptr; }
+  /// True when GDAL told an error, memory was short, or a file operation failed that it did not
+  /// tell of or, as when a file beside the raster could not be saved, only warned of.
+  bool HasError() const {
+    return !error_.empty() || faults_.First() != nullptr || memory_.WasShort();
+  }
   bool HasWarning() const { return !warning_.empty(); }
 
-  /// The file operation that failed first, else the last error, else the last warning, in one line;
-  /// empty when there was none.
+  /// "out of memory" where it was, else the file operation that failed first, else the last error,
+  /// else the last warning, in one line; empty when there was none.
   std::string Text() const;
 
   /// The file operations that failed.
@@ -43,6 +46,7 @@ class Messages {
   struct Handler;
 
   FileFaults faults_;
+  platform::MemoryWatch memory_;
   const Damage damage_;
   std::string error_;
   std::string warning_;

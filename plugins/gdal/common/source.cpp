@@ -11,6 +11,7 @@
 #include "common/messages.h"
 #include "data/access_policy.h"
 #include "data/file_uri.h"
+#include "foundation/warnings.h"
 
 namespace lumo::gdal {
 namespace {
@@ -98,6 +99,7 @@ DatasetPtr OpenName(const std::string& name, const Source& source, const Format&
   DatasetPtr dataset(GDALOpenEx(name.c_str(), openFlags | GDAL_OF_VERBOSE_ERROR, drivers.data(),
                                 options.data(), nullptr));
   if (dataset == nullptr) messages.Fail(source.name, "GDAL can't open it");
+  if (dataset != nullptr && !IsWithoutFault(messages, source)) return nullptr;
   if (!WasRefusedNothing()) return nullptr;
   if (dataset != nullptr && !MayReachAllFiles(dataset.get())) return nullptr;
   return dataset;
@@ -137,6 +139,19 @@ bool ParseTarget(Source& source) {
   if (fault) return FailWith(source.name, fault.message());
   if (!source.name.starts_with("/vsi")) source.name = resolved.string();
   source.uri = FileURI(source.name);
+  return true;
+}
+
+bool IsWithoutFault(const Messages& messages, const Source& source) {
+  const FileFault* const first = messages.Files().First();
+  if (first == nullptr) return true;
+  const std::string file = FileOf(source);
+  std::error_code ignored;
+  if (messages.Files().FirstOf(file) != nullptr || !fs::is_regular_file(file, ignored) ||
+      fs::path(first->path).parent_path() != fs::path(file).parent_path()) {
+    return messages.Fail(source.name);
+  }
+  AddWarning(first->path + ": " + first->Text() + "; it is left out");
   return true;
 }
 

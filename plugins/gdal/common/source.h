@@ -40,6 +40,13 @@ bool ParseTarget(Source& source);
 /// has to be a file or a directory: names that GDAL alone understands may reach over the network.
 bool IsOfFormat(const Source& source, const Format& format, unsigned openFlags);
 
+class Messages;
+
+/// Judges the file operations that failed while GDAL looked at a source: those on files that lie
+/// beside it, and that GDAL goes on without, become warnings. False, with the fault told, when the
+/// source itself is meant.
+bool IsWithoutFault(const Messages& messages, const Source& source);
+
 /// Opens a source: the one place at which this library opens what somebody else names. Null, with
 /// the fault told.
 /// @param openFlags  GDAL_OF_RASTER or GDAL_OF_VECTOR, with GDAL_OF_UPDATE or not.

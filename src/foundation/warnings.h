@@ -1,0 +1,21 @@
+#pragma once
+
+#include <string>
+#include <vector>
+
+#include "platform/export.h"
+
+namespace lumo {
+
+// What went wrong beside an operation that succeeded, in words: a file that was found by itself and
+// could not be read, say. Who notices it tells it here, and who reports to a person takes it. The
+// texts belong to the thread, as fault texts do; a call into a source carries them back.
+
+/// Keeps `text`, one line that says what and where and that the work went on. The same text counts
+/// once, and beyond a handful nothing more is kept.
+VEXG_EXPORT void AddWarning(const std::string& text);
+
+/// Takes the texts off the thread, the first one first.
+VEXG_EXPORT std::vector<std::string> TakeWarnings();
+
+}  // namespace lumo

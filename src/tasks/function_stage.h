@@ -1,0 +1,38 @@
+#pragma once
+
+#include <functional>
+
+#include "tasks/task.h"
+
+namespace lumo {
+
+/// How tokens go through a stage that is a function.
+enum class StageOrder {
+  kOneByOne,       ///< one at a time, in order: the function may keep something between tokens
+  kSeveralAtOnce,  ///< as many as there are threads: it keeps nothing, or guards it itself
+};
+
+/// A stage of a process that is a function: the factory of a task that calls it for each token.
+class VEXG_EXPORT FunctionStage final : public TaskFactory {
+ public:
+  /// Works on the slots of a token that the stage is bound to. `abort`, null outside a run, is for
+  /// the loops inside. False fails the process, with what SetFault told; after an abort it means
+  /// nothing.
+  using Function = std::function<bool(ArgList& slots, const AbortFlag* abort)>;
+
+  FunctionStage(const char* name, StageOrder order, Function function)
+      : name_(name), order_(order), function_(std::move(function)) {}
+
+  bool IsReady() override { return function_ != nullptr; }
+  Task* Create(ArgList& setupArgs) override;
+  bool Destroy(Task* task) override;
+
+ private:
+  class FunctionTask;
+
+  const char* name_;
+  StageOrder order_;
+  Function function_;
+};
+
+}  // namespace lumo
