@@ -2,7 +2,9 @@
 
 #include <algorithm>
 #include <bit>
+#include <cctype>
 #include <cstring>
+#include <filesystem>
 
 #include "foundation/fault.h"
 
@@ -56,6 +58,13 @@ bool PutInChunks(const List& list, Put&& put) {
 }
 
 }  // namespace
+
+bool IsFxvName(const std::string& path) {
+  std::string ending = std::filesystem::path(path).extension().string();
+  std::transform(ending.begin(), ending.end(), ending.begin(),
+                 [](unsigned char c) { return static_cast<char>(std::tolower(c)); });
+  return ending == ".fxv";
+}
 
 FxvPolygonWriter<std::int32_t, std::uint32_t>::FxvPolygonWriter(const URI& uri, unsigned bufferSize)
     : buffer_(std::max(bufferSize, kFxvHeaderSize)), place_(kFxvHeaderSize) {

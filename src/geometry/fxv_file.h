@@ -17,6 +17,9 @@ inline constexpr unsigned kFxvHeaderSize = 1024;
 /// Bytes that the reader and the writer hold of a file, unless told otherwise.
 inline constexpr unsigned kFxvBufferSize = 1 << 18;
 
+/// True for a path that ends as those of FXV files do, in any case.
+VEXG_EXPORT bool IsFxvName(const std::string& path);
+
 /// Writes an FXV file. The header is zero until the file is complete, so that nobody takes one for
 /// whole that a run left which failed or was killed.
 ///

@@ -4,6 +4,7 @@
 #include <cstring>
 
 #include "platform/vector_clones.h"
+#include "raster/pixel_types.h"
 
 namespace lumo {
 namespace {
@@ -106,16 +107,8 @@ void MarkEdgesInLine(const T* line, std::size_t width, ColumnBits& bits) {
 
 #define VEXG_LABEL_EDGES(T)                                                          \
   template void MarkDifferences<T>(const T*, const T*, std::size_t, std::uint64_t*); \
-  template void MarkEdgesInLine<T>(const T*, std::size_t, ColumnBits&)
-
-VEXG_LABEL_EDGES(std::uint8_t);
-VEXG_LABEL_EDGES(std::int8_t);
-VEXG_LABEL_EDGES(std::uint16_t);
-VEXG_LABEL_EDGES(std::int16_t);
-VEXG_LABEL_EDGES(std::uint32_t);
-VEXG_LABEL_EDGES(std::int32_t);
-VEXG_LABEL_EDGES(float);
-VEXG_LABEL_EDGES(double);
+  template void MarkEdgesInLine<T>(const T*, std::size_t, ColumnBits&);
+VEXG_FOR_ALL(EIGHT, VEXG_LABEL_EDGES);
 #undef VEXG_LABEL_EDGES
 
 }  // namespace lumo

@@ -64,13 +64,6 @@ bool LabelVectorizer<T>::Take(std::uint32_t column, TracedPolygon& polygon) {
   return sink_.Take(static_cast<double>(above_[column]), polygon);
 }
 
-template class LabelVectorizer<std::uint8_t>;
-template class LabelVectorizer<std::int8_t>;
-template class LabelVectorizer<std::uint16_t>;
-template class LabelVectorizer<std::int16_t>;
-template class LabelVectorizer<std::uint32_t>;
-template class LabelVectorizer<std::int32_t>;
-template class LabelVectorizer<float>;
-template class LabelVectorizer<double>;
+VEXG_INSTANCES(EIGHT, LabelVectorizer);
 
 }  // namespace lumo

@@ -5,6 +5,7 @@
 
 #include "geometry/boundary_tracer.h"
 #include "platform/export.h"
+#include "raster/pixel_types.h"
 #include "raster/raster_enums.h"
 
 namespace lumo {
@@ -61,13 +62,6 @@ class VEXG_EXPORT LabelVectorizer final : TracedPolygonSink {
   std::uint32_t lines_ = 0;
 };
 
-extern template class VEXG_EXPORT LabelVectorizer<std::uint8_t>;
-extern template class VEXG_EXPORT LabelVectorizer<std::int8_t>;
-extern template class VEXG_EXPORT LabelVectorizer<std::uint16_t>;
-extern template class VEXG_EXPORT LabelVectorizer<std::int16_t>;
-extern template class VEXG_EXPORT LabelVectorizer<std::uint32_t>;
-extern template class VEXG_EXPORT LabelVectorizer<std::int32_t>;
-extern template class VEXG_EXPORT LabelVectorizer<float>;
-extern template class VEXG_EXPORT LabelVectorizer<double>;
+VEXG_EXTERN(EIGHT, LabelVectorizer);
 
 }  // namespace lumo

@@ -88,13 +88,9 @@ bool PolygonBatch::WriteTo(Object& writer, LabelCounts& counts) const {
   return whole != nullptr && WriteAll<std::int32_t>(*whole, counts);
 }
 
-template VEXG_EXPORT bool PolygonBatch::WriteTo<std::uint8_t>(Object&, LabelCounts&) const;
-template VEXG_EXPORT bool PolygonBatch::WriteTo<std::int8_t>(Object&, LabelCounts&) const;
-template VEXG_EXPORT bool PolygonBatch::WriteTo<std::uint16_t>(Object&, LabelCounts&) const;
-template VEXG_EXPORT bool PolygonBatch::WriteTo<std::int16_t>(Object&, LabelCounts&) const;
-template VEXG_EXPORT bool PolygonBatch::WriteTo<std::uint32_t>(Object&, LabelCounts&) const;
-template VEXG_EXPORT bool PolygonBatch::WriteTo<std::int32_t>(Object&, LabelCounts&) const;
-template VEXG_EXPORT bool PolygonBatch::WriteTo<float>(Object&, LabelCounts&) const;
-template VEXG_EXPORT bool PolygonBatch::WriteTo<double>(Object&, LabelCounts&) const;
+#define VEXG_WRITE_TO(T) \
+  template VEXG_EXPORT bool PolygonBatch::WriteTo<T>(Object&, LabelCounts&) const;
+VEXG_FOR_ALL(EIGHT, VEXG_WRITE_TO);
+#undef VEXG_WRITE_TO
 
 }  // namespace lumo

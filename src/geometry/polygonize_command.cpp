@@ -1,7 +1,4 @@
-#include <algorithm>
-#include <cctype>
 #include <filesystem>
-#include <optional>
 
 #include "foundation/fault.h"
 #include "geometry/fxv_file.h"
@@ -36,13 +33,6 @@ const CommandDeclaration kPolygonize{
 
 using FxvWriter = FxvPolygonWriter<std::int32_t, std::uint32_t>;
 
-bool HasEnding(const std::string& path, const char* ending) {
-  std::string own = std::filesystem::path(path).extension().string();
-  std::transform(own.begin(), own.end(), own.begin(),
-                 [](unsigned char c) { return static_cast<char>(std::tolower(c)); });
-  return own == ending;
-}
-
 class PolygonizeCommand final : public RasterCommand {
   CommandResult Execute() override {
     if (!CheckInputs()) return Fail();
@@ -72,7 +62,7 @@ class PolygonizeCommand final : public RasterCommand {
 
   template <typename T>
   bool Polygonize(const RasterPtr<T>& raster) {
-    return HasEnding(path_, ".fxv") ? ToFxv<T>(raster) : ToRecords<T>(raster);
+    return IsFxvName(path_) ? ToFxv<T>(raster) : ToRecords<T>(raster);
   }
 
   /// Runs the process into a writer. False, with the fault told, when not all polygons are written.

@@ -184,18 +184,7 @@ LabelCounts RasterToVectorProcess<T>::Counts() const {
   return stages_->plan->counts;
 }
 
-#define VEXG_RASTER_TO_VECTOR(T)        \
-  template class RasterToVectorTask<T>; \
-  template class RasterToVectorProcess<T>
-
-VEXG_RASTER_TO_VECTOR(std::uint8_t);
-VEXG_RASTER_TO_VECTOR(std::int8_t);
-VEXG_RASTER_TO_VECTOR(std::uint16_t);
-VEXG_RASTER_TO_VECTOR(std::int16_t);
-VEXG_RASTER_TO_VECTOR(std::uint32_t);
-VEXG_RASTER_TO_VECTOR(std::int32_t);
-VEXG_RASTER_TO_VECTOR(float);
-VEXG_RASTER_TO_VECTOR(double);
-#undef VEXG_RASTER_TO_VECTOR
+VEXG_INSTANCES(EIGHT, RasterToVectorTask);
+VEXG_INSTANCES(EIGHT, RasterToVectorProcess);
 
 }  // namespace lumo

@@ -47,22 +47,8 @@ class VEXG_EXPORT RasterToVectorProcess final : public ProcessBuilder<Process> {
   std::unique_ptr<Stages> stages_;
 };
 
-extern template class VEXG_EXPORT RasterToVectorTask<std::uint8_t>;
-extern template class VEXG_EXPORT RasterToVectorTask<std::int8_t>;
-extern template class VEXG_EXPORT RasterToVectorTask<std::uint16_t>;
-extern template class VEXG_EXPORT RasterToVectorTask<std::int16_t>;
-extern template class VEXG_EXPORT RasterToVectorTask<std::uint32_t>;
-extern template class VEXG_EXPORT RasterToVectorTask<std::int32_t>;
-extern template class VEXG_EXPORT RasterToVectorTask<float>;
-extern template class VEXG_EXPORT RasterToVectorTask<double>;
+VEXG_EXTERN(EIGHT, RasterToVectorTask);
 
-extern template class VEXG_EXPORT RasterToVectorProcess<std::uint8_t>;
-extern template class VEXG_EXPORT RasterToVectorProcess<std::int8_t>;
-extern template class VEXG_EXPORT RasterToVectorProcess<std::uint16_t>;
-extern template class VEXG_EXPORT RasterToVectorProcess<std::int16_t>;
-extern template class VEXG_EXPORT RasterToVectorProcess<std::uint32_t>;
-extern template class VEXG_EXPORT RasterToVectorProcess<std::int32_t>;
-extern template class VEXG_EXPORT RasterToVectorProcess<float>;
-extern template class VEXG_EXPORT RasterToVectorProcess<double>;
+VEXG_EXTERN(EIGHT, RasterToVectorProcess);
 
 }  // namespace lumo

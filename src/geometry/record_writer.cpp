@@ -97,13 +97,6 @@ bool RecordPolygonWriter<T>::Carry(const std::vector<std::uint32_t>& pixels) {
   return false;
 }
 
-template class RecordPolygonWriter<std::uint8_t>;
-template class RecordPolygonWriter<std::int8_t>;
-template class RecordPolygonWriter<std::uint16_t>;
-template class RecordPolygonWriter<std::int16_t>;
-template class RecordPolygonWriter<std::uint32_t>;
-template class RecordPolygonWriter<std::int32_t>;
-template class RecordPolygonWriter<float>;
-template class RecordPolygonWriter<double>;
+VEXG_INSTANCES(EIGHT, RecordPolygonWriter);
 
 }  // namespace lumo

@@ -4,6 +4,7 @@
 #include "geometry/polygon_stream.h"
 #include "geometry/ring_touches.h"
 #include "georef/georef.h"
+#include "raster/pixel_types.h"
 
 namespace lumo {
 
@@ -50,5 +51,7 @@ class VEXG_EXPORT RecordPolygonWriter final : public PolygonWriter<T, std::uint3
   std::uint64_t written_ = 0;
   std::uint64_t leftOut_ = 0;
 };
+
+VEXG_EXTERN(EIGHT, RecordPolygonWriter);
 
 }  // namespace lumo

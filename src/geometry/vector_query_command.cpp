@@ -1,6 +1,9 @@
+#include <filesystem>
+
 #include "commands/command.h"
 #include "data/vector_records.h"
 #include "foundation/fault.h"
+#include "geometry/fxv_file.h"
 
 namespace lumo {
 namespace {
@@ -16,7 +19,7 @@ const CommandDeclaration kQueryVectors{
      {"Geometry", ValueKind::kText, "Point, Line or Polygon; Unknown for shapes of several kinds"},
      {"Records", ValueKind::kInteger, "how many there are"},
      {"Bounds", ValueKind::kNumberArray,
-      "min x, min y, max x, max y of all records; absent without a record"},
+      "min x, min y, max x, max y of all records; absent where they are not known"},
      {"CoordSys", ValueKind::kText, "the coordinate system; empty when there is none"},
      {"Fields", ValueKind::kTextList, "names of the columns"},
      {"FieldTypes", ValueKind::kTextList, "for each column Integer, Real or Text"}}};
@@ -41,12 +44,18 @@ const char* WordOf(VectorFieldType type) {
                                            : "Text";
 }
 
+/// True for bounds that nobody has computed.
+bool IsZero(const MapRect& bounds) {
+  return bounds.minX == 0 && bounds.minY == 0 && bounds.maxX == 0 && bounds.maxY == 0;
+}
+
 class QueryVectorsCommand final : public Command {
   CommandResult Execute() override {
     if (!CheckInputs()) return Fail();
+    const std::string path = Read<String>("Vectors").ToUTF8();
+    if (IsFxvName(path)) return TellFxv(path);
     VectorRecordFactory* const factory = GetVectorRecordFactory();
     if (factory == nullptr) return Fail();
-    const std::string path = Read<String>("Vectors").ToUTF8();
     const VectorRecordSourcePtr source = factory->Open(path);
     if (!source) return Fail(TakeFaultOr("the file can't be opened"));
     const unsigned number = HasInput("Layer") ? Read<unsigned>("Layer") : 0;
@@ -63,11 +72,24 @@ class QueryVectorsCommand final : public Command {
     return Succeed();
   }
 
+  CommandResult TellFxv(const std::string& path) {
+    const FxvPolygonReader<std::int32_t, std::uint32_t> reader{URI(String(path))};
+    if (!reader.IsValid()) return Fail();
+    VectorLayer layer;
+    layer.name = std::filesystem::path(path).stem().string();
+    layer.geometry = VectorGeometry::kPolygon;
+    layer.fields = {{"label", VectorFieldType::kInteger}};
+    layer.records = reader.Count();
+    Write("Layers", 1);
+    Tell(layer);
+    return Succeed();
+  }
+
   void Tell(const VectorLayer& layer) {
     Write("Name", String(layer.name));
     Write("Geometry", String(WordOf(layer.geometry)));
     Write("Records", layer.records);
-    if (layer.records > 0) {
+    if (layer.records > 0 && layer.bounds.minX <= layer.bounds.maxX && !IsZero(layer.bounds)) {
       Array<double> bounds{ArrayDims(4)};
       bounds[0] = layer.bounds.minX;
       bounds[1] = layer.bounds.minY;
