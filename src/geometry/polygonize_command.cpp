@@ -28,7 +28,7 @@ const CommandDeclaration kPolygonize{
       "pixels"}},
     {{"Polygons", ValueKind::kInteger, "how many were written"},
      {"LeftOut", ValueKind::kInteger, "how many were too small"},
-     {"Note", ValueKind::kText,
+     {"Warning", ValueKind::kText,
       "what the user should know of the result; absent when there is nothing"}}};
 
 using FxvWriter = FxvPolygonWriter<std::int32_t, std::uint32_t>;
@@ -53,7 +53,7 @@ class PolygonizeCommand final : public RasterCommand {
     Write("Polygons", written_);
     Write("LeftOut", leftOut_);
     if (changed_ != 0) {
-      Write("Note", String(std::to_string(changed_) +
+      Write("Warning", String(std::to_string(changed_) +
                            " polygons have a value that the file can't hold; they stand there "
                            "under another"));
     }
