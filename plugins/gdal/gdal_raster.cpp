@@ -453,6 +453,7 @@ bool OpenRaster::ChangeStored(const std::function<bool()>& change) {
   // What could not be read would be lost when the file beside the raster is written anew.
   if (messages.Files().First() != nullptr) return messages.Fail(Name());
   if (!IsSideFileWhole(Name() + ".aux.xml")) {
+    if (messages.Files().First() != nullptr) return messages.Fail(Name());
     return FailWith(Name() + ".aux.xml", "isn't whole, and stays as it is");
   }
   TakeFault();

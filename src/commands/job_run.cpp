@@ -7,6 +7,7 @@
 #include "commands/catalog_session.h"
 #include "commands/variable_text.h"
 #include "foundation/near_name.h"
+#include "foundation/thrown.h"
 #include "platform/memory_shortage.h"
 
 namespace lumo {
@@ -34,7 +35,16 @@ void GiveUp(CommandDescriptor& descriptor) {
   try {
     descriptor.command->FailUnstarted(platform::kOutOfMemory);
   } catch (...) {
-    // It retires without a result.
+    NoteException();  // it retires without a result
+  }
+}
+
+/// Lets go of what a command was given to report by; never throws.
+void DropReports(CommandDescriptor& descriptor) noexcept {
+  try {
+    descriptor.ipc = IPC();
+  } catch (...) {
+    NoteException();  // it goes with the job then
   }
 }
 
@@ -288,13 +298,13 @@ CommandDescriptor* JobExecutor::Process(CommandDescriptor* descriptor) {
 
 bool JobFinisher::Write(CommandDescriptor* descriptor) {
   if (descriptor == nullptr) return false;
-  descriptor->ipc = IPC();
+  DropReports(*descriptor);
   variables_.Retire(*descriptor);
   return true;
 }
 
 CommandDescriptor* JobFinisher::WriteAndTake(CommandDescriptor& descriptor) {
-  descriptor.ipc = IPC();
+  DropReports(descriptor);
   return variables_.RetireAndTake(descriptor);
 }
 

@@ -1,11 +1,16 @@
 #include "commands/job_schedule.h"
 
 #include <algorithm>
+#include <functional>
 #include <map>
+#include <utility>
 
 namespace lumo {
 
 JobSchedule::JobSchedule(Job& job) : steps_(job.commands.GetCount()) {
+  std::vector<unsigned> room;
+  room.reserve(steps_.size());  // a command retires where memory is short too
+  ready_ = decltype(ready_)(std::greater<>(), std::move(room));
   std::map<const Command*, unsigned> positions;
   for (unsigned i = 0; i < steps_.size(); ++i) {
     steps_[i].descriptor = job.commands[i].Get();

@@ -18,7 +18,13 @@ class DcSrvCmdExit final : public DcSrvCmd {
 
 /// Holds the data manager of the thread.
 struct LocalManagerScope {
-  LocalManagerScope() { GetLocalDataManager(); }
+  LocalManagerScope() noexcept {
+    try {
+      GetLocalDataManager();
+    } catch (...) {
+      NoteException();
+    }
+  }
   ~LocalManagerScope() { FreeLocalDataManager(); }
 };
 
@@ -57,6 +63,7 @@ void DcSrv::Execute(DcSrvCmd& cmd) {
 void DcSrv::Serve(MTQueue<DcSrvCmd*>& queue) {
   DcSrvCmd* last = nullptr;
   {
+    // Made by the first command that needs one where memory is short now.
     const LocalManagerScope manager;
     DcSrvContext context;
     while (!context.exit) {
@@ -73,12 +80,16 @@ void DcSrv::Run(DcSrvCmd& cmd, DcSrvContext& context) {
   TakeWarnings();
   const AbandonScope abandonment(cmd.abandons_);
   try {
-    cmd.Execute(context);
+    try {
+      cmd.Execute(context);
+    } catch (...) {
+      SetFault(std::string(cmd.name_) + ": " + DescribeException());
+    }
+    cmd.fault_ = TakeFault();
+    cmd.warnings_ = TakeWarnings();
   } catch (...) {
-    SetFault(std::string(cmd.name_) + ": " + DescribeException());
+    NoteException();  // there is no memory for words either; the caller is answered all the same
   }
-  cmd.fault_ = TakeFault();
-  cmd.warnings_ = TakeWarnings();
 }
 
 void DcSrv::Reply(DcSrvCmd& cmd) {

@@ -1,3 +1,5 @@
+#include <cerrno>
+#include <cstring>
 #include <filesystem>
 #include <vector>
 
@@ -32,10 +34,18 @@ std::string Describe(const FileFault& fault) {
   return fault.path + ": " + fault.Text();
 }
 
+/// Takes the fault of a row that has no factory; gives it where the plug-in is there and the system
+/// would not load it, and nothing where there is no such plug-in.
+String WhyNotLoaded(const FormatRecord& record) {
+  const String why = TakeFault();
+  const bool isAbsent = why.ToUTF8().find(std::strerror(ENOENT)) != std::string::npos;
+  return record.library == nullptr && !isAbsent ? why : String();
+}
+
 /// The factories that recognise the source, in the order of the table.
-/// @param unread  [out] why a file could not be read that had to be, to recognise the source. Where
-///                that is the source's own file, the formats that follow are not asked: what they
-///                make of it is nothing to go by.
+/// @param unread  [out] why a file could not be read that had to be, to recognise the source: its
+///                own, one beside it or a plug-in. Where that is the source's own file, the formats
+///                that follow are not asked: what they make of it is nothing to go by.
 std::vector<DataConnectionFactory*> FindWilling(const Array<String>& connStrings, String& unread) {
   std::vector<DataConnectionFactory*> willing;
   std::error_code fault;
@@ -47,14 +57,17 @@ std::vector<DataConnectionFactory*> FindWilling(const Array<String>& connStrings
     if (!MayUseFormat(gCdfFormatRecords[row])) continue;
     LoadFormat(row);
     DataConnectionFactory* const factory = GetFactory(gCdfFormatRecords[row]);
-    if (factory == nullptr) continue;
+    if (factory == nullptr) {
+      if (unread.GetLength() == 0) unread = WhyNotLoaded(gCdfFormatRecords[row]);
+      continue;
+    }
     if (Guarded([&] { return factory->CanConnect(connStrings); })) willing.push_back(factory);
     if (const FileFault* const found = faults.FirstOf(own)) {
       unread = Describe(*found);
       return {};
     }
   }
-  if (faults.First() != nullptr) unread = Describe(*faults.First());
+  if (unread.GetLength() == 0 && faults.First() != nullptr) unread = Describe(*faults.First());
   return willing;
 }
 

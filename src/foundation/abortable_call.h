@@ -41,13 +41,13 @@ bool RunAbortable(const AbortFlag& abort, std::function<Result()> call, Result& 
     try {
       TakeFault();
       made = call();
-      fault = TakeFault();
     } catch (...) {
-      fault = DescribeException();  // and no result
+      NoteException();  // the caller sees that there is no result
     }
+    fault = TakeFault();
     const std::lock_guard lock(shared->mutex);
     shared->result = std::move(made);
-    shared->fault = fault;
+    shared->fault = std::move(fault);
     shared->done = true;
     shared->ended.notify_all();
   };

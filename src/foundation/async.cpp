@@ -3,7 +3,6 @@
 #include <functional>
 #include <utility>
 
-#include "foundation/fault.h"
 #include "foundation/thread_roll.h"
 #include "foundation/thrown.h"
 
@@ -11,11 +10,11 @@ namespace lumo {
 namespace {
 
 void RunAsync(const AsyncPtr& work) {
-  work->Start();
   try {
+    work->Start();
     work->Execute();
   } catch (...) {
-    DescribeException();  // which notes a shortage of memory
+    NoteException();
     work->SetErrorState(AsyncErrorExecuteFailed());
   }
   work->Finish();

@@ -16,7 +16,7 @@ void RunGuarded(std::function<void()>& body) {
     body();
   } catch (...) {
     // Whoever waits for the thread's work sees that it isn't done; there is nobody else to tell.
-    DescribeException();  // which notes a shortage of memory
+    NoteException();
   }
   body = nullptr;  // lets go of what it holds before the thread leaves
 }
@@ -66,7 +66,7 @@ bool StartThread(const SimpleThreadPtr& thread) {
     try {
       thread->Run();
     } catch (...) {
-      DescribeException();  // it ends as one whose Run has returned
+      NoteException();  // it ends as one whose Run has returned
     }
     thread->End();
   });

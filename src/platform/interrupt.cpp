@@ -1,10 +1,12 @@
 #include "platform/interrupt.h"
 
 #include <atomic>
+#include <cerrno>
 #include <poll.h>
 #include <signal.h>
 #include <sys/eventfd.h>
 #include <sys/signalfd.h>
+#include <system_error>
 #include <thread>
 #include <unistd.h>
 
@@ -73,9 +75,12 @@ InterruptWatch::InterruptWatch(std::function<void()> onInterrupt, bool watchOutp
   impl_->onInterrupt = std::move(onInterrupt);
   impl_->watchOutput = watchOutput;
   const sigset_t signals = InterruptSignals();
-  pthread_sigmask(SIG_BLOCK, &signals, &impl_->before);
-  impl_->signals = FileDescriptor(signalfd(-1, &signals, SFD_CLOEXEC));
   impl_->end = FileDescriptor(eventfd(0, EFD_CLOEXEC));
+  impl_->signals = FileDescriptor(signalfd(-1, &signals, SFD_CLOEXEC));
+  if (!impl_->end.IsOpen() || !impl_->signals.IsOpen()) {
+    throw std::system_error(errno, std::generic_category());
+  }
+  pthread_sigmask(SIG_BLOCK, &signals, &impl_->before);
   impl_->thread = std::thread([impl = impl_.get()] { impl->Run(); });
 }
 

@@ -15,6 +15,7 @@ namespace lumo::platform {
 /// Threads: the function runs on a thread of its own.
 class VEXG_EXPORT InterruptWatch {
  public:
+  /// Throws std::system_error where the system has no descriptors or no thread for it.
   /// @param watchOutput  call the function too when the pipe at standard output is closed.
   explicit InterruptWatch(std::function<void()> onInterrupt, bool watchOutput = false);
   /// After this the function is not running and will not be called.

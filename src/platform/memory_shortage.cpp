@@ -5,6 +5,7 @@
 #include <cstdlib>
 #include <cstring>
 #include <exception>
+#include <execinfo.h>
 #include <new>
 #include <signal.h>
 #include <system_error>
@@ -62,6 +63,8 @@ void EndInOrderWhenMemoryIsShort(const char* program, int code) {
   gProgram = program;
   gCode = code;
   std::set_terminate(OnTerminate);
+  void* none[1];
+  backtrace(none, 1);  // so that the C library has by now what unwinding takes
   struct sigaction action {};
   action.sa_handler = OnCrash;
   action.sa_flags = SA_NODEFER;

@@ -1,12 +1,26 @@
 #include "platform/module.h"
 
+#include <algorithm>
 #include <cerrno>
 #include <cstring>
 #include <dlfcn.h>
+#include <iterator>
 
 #include "platform/memory_shortage.h"
 
 namespace lumo::platform {
+
+namespace {
+
+/// True for what the loader says where it is short of memory, which it has several words for.
+bool IsOfMemory(const std::string& why) {
+  const char* const words[] = {std::strerror(ENOMEM), "out of memory", "cannot allocate",
+                               "cannot create",       "failed to map", "cannot map"};
+  return std::any_of(std::begin(words), std::end(words),
+                     [&](const char* word) { return why.find(word) != why.npos; });
+}
+
+}  // namespace
 
 Module Module::Load(const std::string& path, std::string* fault) {
   Module module;
@@ -14,7 +28,7 @@ Module Module::Load(const std::string& path, std::string* fault) {
   if (module.handle_ != nullptr) return module;
   const char* const told = dlerror();
   std::string why = told != nullptr ? told : path;
-  if (why.find(std::strerror(ENOMEM)) != why.npos) why = path + ": " + SystemErrorText(ENOMEM);
+  if (IsOfMemory(why)) why = path + ": " + SystemErrorText(ENOMEM);
   if (fault != nullptr) *fault = why;
   return module;
 }

@@ -40,10 +40,11 @@ auto RetryInterrupted(Call&& call) {
   return result;
 }
 
-/// Only files whose bytes stand at places.
-bool IsRegular(int descriptor) {
+/// Only files whose bytes stand at places are opened. 0, or the system's number: EISDIR for others.
+int FindUnfit(int descriptor) {
   struct stat status {};
-  return fstat(descriptor, &status) == 0 && S_ISREG(status.st_mode);
+  if (fstat(descriptor, &status) != 0) return errno;
+  return S_ISREG(status.st_mode) ? 0 : EISDIR;
 }
 
 iovec Vector(const FilePiece& piece) {
@@ -102,10 +103,12 @@ FileDescriptor OpenRegular(const std::string& path, int mode, std::string* fault
       [&] { return open(path.c_str(), mode | O_CLOEXEC | O_NONBLOCK, kReadableByAll); }));
   if (!file.IsOpen()) {
     FailBySystem(fault, path, errno);
-  } else if (!IsRegular(file.Get())) {
+  } else if (const int unfit = FindUnfit(file.Get()); unfit != 0) {
     file.Close();
-    Fail(fault, path, "not a file");
-    errno = EISDIR;
+    if ((mode & O_EXCL) != 0) std::remove(path.c_str());  // made just now
+    FailBySystem(fault, path, unfit);
+    if (unfit == EISDIR) Fail(fault, path, "not a file");
+    errno = unfit;
   }
   return file;
 }

@@ -68,6 +68,7 @@ bool Reserve(int file, std::size_t size) {
   int code = EINTR;
   while (code == EINTR) code = posix_fallocate(file, 0, static_cast<off_t>(size));
   if (code == ENOMEM || code == ENOSPC) NoteMemoryShortage();  // its file system is memory
+  errno = code;
   return code == 0;
 }
 
@@ -119,7 +120,9 @@ std::unique_ptr<SharedMemoryBlock> SharedMemoryBlock::Create(const std::string& 
   if (!file.IsOpen()) return nullptr;
   unsigned char* const data = Reserve(file.Get(), size) ? Map(file.Get(), size) : nullptr;
   if (data == nullptr) {
+    const int code = errno;
     shm_unlink(path.c_str());
+    errno = code;
     return nullptr;
   }
   std::unique_ptr<SharedMemoryBlock> block(new SharedMemoryBlock(data, size, path));

@@ -155,14 +155,19 @@ const CommandDeclaration kDelete{"DeleteRasterPyramidCommand",
                                  kGroup,
                                  "Removes the pyramid of a raster.",
                                  {kUri},
-                                 {{"Return", ValueKind::kBoolean, "it is gone"}}};
+                                 {{"Return", ValueKind::kBoolean, "it is gone"},
+                                  {"Fault", ValueKind::kText, "why it is not; only then"}}};
 
 class DeleteRasterPyramidCommand final : public RasterCommand {
   CommandResult Execute() override {
     if (!CheckInputs()) return Fail();
     const BasicRasterPtr raster = FindRaster();
     if (!raster) return Fail();
-    Write("Return", raster->PyramidDelete());
+    TakeFault();
+    const bool isGone = raster->PyramidDelete();
+    const String fault = TakeFault();
+    Write("Return", isGone);
+    if (!isGone && fault.GetLength() != 0) Write("Fault", fault);
     return Succeed();
   }
 };

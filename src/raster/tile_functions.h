@@ -30,7 +30,7 @@ namespace lumo {
 /// cache from the reading to the writing.
 inline constexpr unsigned kComputedTile = 0x20000;
 
-/// The tiles of one raster, or of several of one size on one grid.
+/// Gives the tiles of one raster, or of several of one size on one grid.
 template <typename... Ts>
 struct TileInputs {
   std::tuple<RasterIteratorPtr<Ts>...> iterators;
@@ -44,7 +44,7 @@ struct TileInputs {
   }
 };
 
-/// The tiles of an iterator of one's own.
+/// Gives the tiles of an iterator of one's own.
 template <typename T>
 TileInputs<T> TilesBy(const RasterIteratorPtr<T>& iterator) {
   return {{iterator}};
@@ -118,7 +118,7 @@ struct ResultOf<std::optional<R>> {
   using Type = R;
 };
 
-/// What a part of a reduction gives, without the optional.
+/// Finds the type that a part of a reduction gives, without the optional.
 template <typename Part, typename... Ts>
 auto FindResult() {
   if constexpr (std::is_invocable_v<const Part&, const Tile<Ts>&..., const TilePart&>) {

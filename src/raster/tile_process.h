@@ -9,7 +9,7 @@
 
 namespace lumo {
 
-/// A place in the tokens of a process for a tile, which the stages hand on.
+/// Names a place in the tokens of a process for a tile, which the stages hand on.
 template <typename T>
 struct TileSlot {
   ArgID id = 0;
@@ -19,7 +19,7 @@ struct TileSlot {
   bool Put(ArgList& token, const TilePtr<T>& tile) const { return token.Set(id, tile); }
 };
 
-/// A place in the tokens of a process for a value of any type.
+/// Names a place in the tokens of a process for a value of any type.
 template <typename T>
 struct ValueSlot {
   ArgID id = 0;
@@ -40,7 +40,7 @@ struct ValueSlot {
   };
 };
 
-/// A process over tiles whose stages are functions: those who need more than the functions of
+/// Runs stages over tiles that are functions: those who need more than the functions of
 /// tile_functions.h derive from it, or put one together. All slots are taken before the first
 /// function is placed, which sees all of them, and Close() comes last.
 ///

@@ -20,8 +20,8 @@ struct TilePart {
   unsigned columnTo;
 };
 
-/// The pixels of a part in one line of a pixel-interleaved tile, with all their bands: `count`
-/// values that lie together, and their states.
+/// Points to the pixels of a part in one line of a pixel-interleaved tile, with all their bands:
+/// `count` values that lie together, and their states.
 template <typename T, typename State>
 struct TileRow {
   T* values;
@@ -94,13 +94,13 @@ bool Succeeds(const F& work, Args&&... args) {
   }
 }
 
-/// What strips gave; no value for no strips.
+/// Holds what strips gave; no value for no strips.
 template <typename R>
 struct StripResult {
   mutable std::optional<R> value;  // a join may move it out of its right side
 };
 
-/// The strips of a tile joined to one result.
+/// Joins the strips of a tile to one result.
 template <typename R, typename Part, typename Merge>
 class StripReduction final : public ArrayParallelReduce<StripResult<R>> {
  public:

@@ -190,7 +190,8 @@ const CommandDeclaration kSave{
     "Statistics",
     "Stores the histograms of a raster through its data source.",
     {kUri, WaitInput()},
-    {{"Return", ValueKind::kBoolean, "they are stored, or the source has no place for them"}}};
+    {{"Return", ValueKind::kBoolean, "they are stored, or the source has no place for them"},
+     {"Fault", ValueKind::kText, "why they could not be stored; only then"}}};
 
 class SaveRasterHistogramCommand final : public RasterCommand {
   CommandResult Execute() override {
@@ -198,7 +199,11 @@ class SaveRasterHistogramCommand final : public RasterCommand {
     const BasicRasterPtr raster = FindRaster();
     if (!raster) return Fail();
     const Turn turn(raster, Read<Waiting>("Wait"), GetIPC());
-    Write("Return", raster->WriteHistogram());
+    TakeFault();
+    const bool isStored = raster->WriteHistogram();
+    const String fault = TakeFault();
+    Write("Return", isStored);
+    if (!isStored && fault.GetLength() != 0) Write("Fault", fault);
     return Succeed();
   }
 };

@@ -16,8 +16,8 @@ std::size_t LeastStripPixels(const ExtendedRasterStats<T>& /*stats*/) {
   return 2048;
 }
 
-/// The statistics of a part of a tile: empty where it has another number of bands, or there is no
-/// memory for them.
+/// Gives the statistics of a part of a tile: empty where it has another number of bands, or there
+/// is no memory for them.
 template <typename T, typename Stats>
 struct ParallelRasterStatsAccumulate {
   unsigned bands;

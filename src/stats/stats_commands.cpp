@@ -223,7 +223,8 @@ const CommandDeclaration kSave{
     "Statistics",
     "Stores the statistics of a raster through its data source.",
     {kUri, WaitInput()},
-    {{"Return", ValueKind::kBoolean, "they are stored, or the source has no place for them"}}};
+    {{"Return", ValueKind::kBoolean, "they are stored, or the source has no place for them"},
+     {"Fault", ValueKind::kText, "why they could not be stored; only then"}}};
 
 class SaveRasterStatsCommand final : public RasterCommand {
   CommandResult Execute() override {
@@ -231,7 +232,11 @@ class SaveRasterStatsCommand final : public RasterCommand {
     const BasicRasterPtr raster = FindRaster();
     if (!raster) return Fail();
     const Turn turn(raster, Read<Waiting>("Wait"), GetIPC());
-    Write("Return", raster->WriteStats());
+    TakeFault();
+    const bool isStored = raster->WriteStats();
+    const String fault = TakeFault();
+    Write("Return", isStored);
+    if (!isStored && fault.GetLength() != 0) Write("Fault", fault);
     return Succeed();
   }
 };

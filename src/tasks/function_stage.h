@@ -6,13 +6,13 @@
 
 namespace lumo {
 
-/// How tokens go through a stage that is a function.
+/// Tells how tokens go through a stage that is a function.
 enum class StageOrder {
   kOneByOne,       ///< one at a time, in order: the function may keep something between tokens
   kSeveralAtOnce,  ///< as many as there are threads: it keeps nothing, or guards it itself
 };
 
-/// A stage of a process that is a function: the factory of a task that calls it for each token.
+/// Makes a stage of a process out of a function: a task that calls it for each token.
 class VEXG_EXPORT FunctionStage final : public TaskFactory {
  public:
   /// Works on the slots of a token that the stage is bound to. `abort`, null outside a run, is for

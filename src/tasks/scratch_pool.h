@@ -6,12 +6,12 @@
 
 namespace lumo {
 
-/// Objects that the threads of a loop borrow, one each: buffers that are used again, or what each
-/// thread has counted. There are as many as were out at once. Threads: any may borrow.
+/// Lends objects to the threads of a loop, one to each: buffers that are used again, or the counts
+/// of each thread. There are as many as were out at once. Threads: any may borrow.
 template <typename T>
 class ScratchPool {
  public:
-  /// An object of the pool, which goes back with it.
+  /// Holds an object of the pool, which goes back with it.
   class Loan {
    public:
     Loan(ScratchPool& pool, std::unique_ptr<T> object) : pool_(pool), object_(std::move(object)) {}

@@ -262,6 +262,7 @@ class Interrupts(PipeTest, OutputTest):
 
     def cases(self):
         scene = write_orva(self.inputs / "scene", 2500, 2000, 3, random.Random(3).randbytes(15000000))
+        self.header = (self.inputs / "scene.hdr").read_bytes()
         yield from ((self.line(verb, scene, options, [self.output / name for name in names]), names)
                     for verb, options, names in (
                         ("copy", [], ["o.dat"]), ("copy", [], ["o.png"]), ("copy", [], ["o.jp2"]),
@@ -276,7 +277,7 @@ class Interrupts(PipeTest, OutputTest):
         for path in self.output.iterdir():
             path.unlink()
         header = self.inputs / "scene.hdr"
-        before = header.read_bytes()
+        header.write_bytes(self.header)
         process = start(*line)
         try:
             process.wait(delay)
@@ -286,8 +287,7 @@ class Interrupts(PipeTest, OutputTest):
         process.send_signal(signal.SIGINT)
         _, err = process.communicate(timeout=60)
         took = time.monotonic() - asked
-        written = self.made() + (["scene.hdr"] if header.read_bytes() != before else [])
-        header.write_bytes(before)
+        written = self.made() + (["scene.hdr"] if header.read_bytes() != self.header else [])
         last = err.splitlines()[-1] if err else ""
         self.assertLess(took, self.MOST_SECONDS, last)
         if process.returncode == 0:
@@ -310,7 +310,7 @@ class Interrupts(PipeTest, OutputTest):
             code, _, err = run(*line)
             whole = time.monotonic() - began
             self.assertEqual(code, 0, err)
-            for _ in range(4):
+            for _ in range(3):
                 delay = moments.random() * whole
                 with self.subTest(line=line[:3], delay=delay, seed=seed):
                     self.check_end(line, names, delay)
@@ -325,10 +325,8 @@ class Interrupts(PipeTest, OutputTest):
         for where in ([], ["--server", "test"]):
             with self.subTest(where=where):
                 process = start("copy", str(scene), str(self.output / "o.jp2"), *where, "--progress", "json")
-                while '"progress"' in (text := process.stderr.readline()):
-                    if json.loads(text)["progress"] > 0.9:
-                        break
-                time.sleep(0.3)
+                process.stderr.readline()  # it has begun
+                time.sleep(1.5)  # most of its time goes into the packing
                 asked = time.monotonic()
                 process.send_signal(signal.SIGINT)
                 _, err = process.communicate(timeout=60)

@@ -200,7 +200,7 @@ TEST(MapTiles, RefusesRastersThatDoNotFit) {
 }
 
 TEST(ForEachTile, WorksOnSeveralTilesAtOnce) {
-  if (std::thread::hardware_concurrency() < 2) GTEST_SKIP();
+  if (ThreadLimit::GetCurrent() < 2) GTEST_SKIP() << "there is one thread";
   const auto ramp = MakeRamp<float>(40, 4, 1);
   std::atomic<int> inside{0}, most{0};
   const auto body = [&](const Tile<float>&) {

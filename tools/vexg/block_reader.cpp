@@ -1,10 +1,12 @@
 #include "block_reader.h"
 
 #include <algorithm>
+#include <cerrno>
 #include <limits>
 
 #include <fmt/format.h>
 
+#include "platform/memory_shortage.h"
 #include "platform/owned_name.h"
 #include "raster/pixel_types.h"
 #include "verb.h"
@@ -86,8 +88,9 @@ void BlockMemory::Make(std::uint64_t count) {
   pixels_ = platform::SharedMemoryBlock::Create(name_ + "-pixels", pixelBytes);
   states_ = platform::SharedMemoryBlock::Create(name_ + "-states", stateBytes);
   if (!pixels_ || !states_) {
-    throw HostError(kExitFailed, fmt::format("the system has no {} bytes of named memory",
-                                             std::uint64_t{pixelBytes} + stateBytes));
+    throw HostError(kExitFailed, fmt::format("the system gives no {} bytes of named memory: {}",
+                                             std::uint64_t{pixelBytes} + stateBytes,
+                                             platform::SystemErrorText(errno)));
   }
 }
 

@@ -68,6 +68,7 @@ int FileVerb::Run() {
     Save(session);
   });
   Tell();
+  session.GetInterruption().SetDone();
   if (session.IsInterrupted()) Say(session.GetInterruption().Describe());
   return kExitSuccess;
 }

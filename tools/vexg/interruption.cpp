@@ -13,6 +13,11 @@
 #include "verb.h"
 
 namespace lumo::host {
+namespace {
+
+constexpr std::chrono::milliseconds kPatience{60};  // for what ends by itself
+
+}  // namespace
 
 Interruption::Interruption(std::function<void()> abort)
     : abort_(std::move(abort)), watch_([this] { OnInterrupt(); }) {}
@@ -79,8 +84,7 @@ void Interruption::OnInterrupt() {
   abort_();
   {
     std::unique_lock lock(mutex_);
-    const auto patience = std::chrono::milliseconds(kPatience);
-    if (wake_.wait_for(lock, patience, [this] { return isOver_; })) return;
+    if (wake_.wait_for(lock, kPatience, [this] { return isOver_; })) return;
   }
   const std::lock_guard held(held_);
   {
@@ -104,6 +108,7 @@ void Interruption::EndNow() {
   for (const std::string& path : temporaries_) platform::RemoveOwnFiles(path);
   platform::RemoveOwnSharedMemory();
   Say(line);
+  if (isDone_) platform::EndProcess(kExitSuccess);
   platform::DropProcess(kExitFailed);
 }
 

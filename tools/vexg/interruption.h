@@ -16,15 +16,12 @@ namespace lumo::host {
 ///
 /// The request raises the abort flags of what runs. Work that looks at them ends by itself, the
 /// usual way. Where a library is busy with something that looks at no flag, as the packing of a
-/// picture, the process ends around it after kPatience, and everything that it has begun is removed
+/// picture, the process ends around it after 60 ms, and everything that it has begun is removed
 /// before. What the user is told then depends on which of the watched files have changed.
 ///
 /// Threads: any thread may call.
 class Interruption {
  public:
-  /// Milliseconds for what ends by itself.
-  static constexpr int kPatience = 120;
-
   /// @param abort  raises the flags; called on a thread of its own.
   explicit Interruption(std::function<void()> abort);
   /// From here on the process does not end by an interrupt of this one.

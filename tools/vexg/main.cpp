@@ -12,6 +12,7 @@
 #include "foundation/thrown.h"
 #include "option_values.h"
 #include "platform/debug_output.h"
+#include "platform/interrupt.h"
 #include "platform/memory_shortage.h"
 #include "platform/module.h"
 #include "platform/process.h"
@@ -99,10 +100,11 @@ bool ChecksAreStrict() {
 
 }  // namespace lumo::host
 
-int main(int argc, char** argv) {
-  namespace platform = lumo::platform;
-  platform::SurviveFailedWrites();
-  platform::EndInOrderWhenMemoryIsShort("vexg", lumo::host::kExitFailed);
+namespace {
+
+namespace platform = lumo::platform;
+
+int RunAndSay(int argc, char** argv) {
   int code = lumo::host::kExitFailed;
   std::string why;
   try {
@@ -121,5 +123,16 @@ int main(int argc, char** argv) {
     why = platform::kOutOfMemory;
   }
   lumo::host::Say(why);
+  return code;
+}
+
+}  // namespace
+
+int main(int argc, char** argv) {
+  platform::SurviveFailedWrites();
+  platform::EndInOrderWhenMemoryIsShort("vexg", lumo::host::kExitFailed);
+  const int code = RunAndSay(argc, argv);
+  // Work in the background that was aborted may still be about to end.
+  if (platform::WasInterrupted()) platform::EndProcess(code);
   return code;
 }

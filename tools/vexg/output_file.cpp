@@ -111,10 +111,11 @@ void OutputFile::FailMove(const std::string& why) const {
                                     ": has been made by somebody else meanwhile; give --overwrite "
                                     "to replace it");
   }
-  const std::string prefix = GetName() + ": ";
+  // The system's paths, also of files in the making, tell the user less than his own name.
+  const std::string place = target_.parent_path().string();
+  const std::size_t end = why.starts_with(place) ? why.find(": ", place.size()) : why.npos;
   throw HostError(kExitFailed,
-                  shown_ + ": can't be written: " +
-                      InUsersWords(why.starts_with(prefix) ? why.substr(prefix.size()) : why));
+                  shown_ + ": can't be written: " + (end == why.npos ? why : why.substr(end + 2)));
 }
 
 void OutputFile::CheckPlaces() const {
@@ -278,7 +279,7 @@ void Outputs::Commit(const std::function<void()>& onTheWay) {
   const Interruption::Hold hold(interruption_);
   onTheWay();
   MoveAll(moved);
-  interruption_.SetDone();
+  if (!moved.empty()) interruption_.SetDone();
 }
 
 void Outputs::MoveAll(const std::vector<MovedFiles>& moved) {

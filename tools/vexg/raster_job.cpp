@@ -195,6 +195,13 @@ void JobSession::CloseAll() {
   Execute(draft, false);
 }
 
+void CheckReturn(const JobResults& results, const char* step, const std::string& otherwise) {
+  const Map<String, String>& returns = results.Find(step).returns;
+  if (ParseValue<bool>(returns.Find("Return"))) return;
+  const std::string fault = returns.Find("Fault").ToUTF8();
+  throw HostError(kExitFailed, fault.empty() ? otherwise : fault);
+}
+
 JobResults RunOnServer(const ServerOptions& server, const JobDraft& draft) {
   RasterJobOptions options;
   options.server = server;

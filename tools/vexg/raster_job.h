@@ -115,6 +115,9 @@ class JobSession {
   Interruption interruption_;  // the last, since it uses the others
 };
 
+/// Throws HostError when a command's output "Return" is false: with its "Fault", else `otherwise`.
+void CheckReturn(const JobResults& results, const char* step, const std::string& otherwise);
+
 /// Has a server run a job of one verb. Throws HostError as a JobSession does.
 JobResults RunOnServer(const ServerOptions& server, const JobDraft& draft);
 

@@ -15,6 +15,7 @@
 #include "picture_writer.h"
 #include "raster/band_values.h"
 #include "raster_target.h"
+#include "saved_values.h"
 #include "stats/raster_histogram.h"
 #include "stats/turn.h"
 
@@ -33,6 +34,7 @@ struct Options {
 constexpr unsigned kUsualBins = 256;
 constexpr unsigned kMostBins = 1U << 24;
 constexpr const char* kStatsStep = "stats";
+constexpr const char* kSaveCommand = "SaveRasterHistogramCommand";
 
 /// The bins of a band, and what they counted.
 template <typename T>
@@ -350,17 +352,11 @@ class HistVerb final : public FileVerb {
     throw HostError(kExitFailed, GetSource().file + ": complex pixels have no histogram");
   }
 
-  static void AddSave(JobDraft& draft, const String& raster) {
-    JobWriterCommand& save = draft.Step("save", "SaveRasterHistogramCommand");
-    save.AddInput("URI", raster);
-    save.AddInput("Wait", Waiting::kAlways);
-  }
-
   JobDraft GetJob(const Outputs& /*outputs*/) const override {
     JobDraft draft;
     AddOpenWithPyramid(draft, "raster", GetSource());
     histograms_->AddSteps(draft, "$raster");
-    if (saves_) AddSave(draft, "$raster");
+    if (saves_) AddSave(draft, kSaveCommand, "$raster");
     draft.Close("close", "$raster");
     return draft;
   }
@@ -376,14 +372,7 @@ class HistVerb final : public FileVerb {
   }
 
   void Save(JobSession& session) override {
-    if (!saves_) return;
-    JobDraft draft;
-    AddSave(draft, raster_);
-    draft.Close("close.raster", raster_);
-    const JobResults results = session.Run(draft, Interrupts::kWait);
-    CheckClosed(results, "close.raster");
-    if (ParseValue<bool>(results.Find("save").returns.Find("Return"))) return;
-    throw HostError(kExitFailed, GetSource().file + ": the histograms could not be saved");
+    if (saves_) SaveValues(session, GetSource(), kSaveCommand, raster_, "histograms");
   }
 
   void Tell() override {

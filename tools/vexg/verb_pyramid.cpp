@@ -282,8 +282,8 @@ class PyramidVerb final : public FileVerb {
       session.GetInterruption().Watch(file, file);
     }
     const JobResults results = session.Run(draft, Interrupts::kEndUnlessDone);
-    if (ParseValue<bool>(results.Find("delete").returns.Find("Return"))) return kExitSuccess;
-    throw HostError(kExitFailed, GetSource().file + ": there is no pyramid to delete");
+    CheckReturn(results, "delete", GetSource().file + ": there is no pyramid to delete");
+    return kExitSuccess;
   }
 
   static constexpr const char* kBuildStep = "build";

@@ -7,12 +7,14 @@
 #include "foundation/near_name.h"
 #include "json_number.h"
 #include "raster_target.h"
+#include "saved_values.h"
 #include "stats/turn.h"
 
 namespace lumo::host {
 namespace {
 
 constexpr const char* kStatsStep = "stats";
+constexpr const char* kSaveCommand = "SaveRasterStatsCommand";
 
 /// A value in both forms of output.
 struct Cell {
@@ -211,17 +213,11 @@ class StatsVerb final : public FileVerb {
     if (!bandsText_.empty()) draft.Close("close.bands", "$bands");
   }
 
-  static void AddSave(JobDraft& draft, const String& raster) {
-    JobWriterCommand& save = draft.Step("save", "SaveRasterStatsCommand");
-    save.AddInput("URI", raster);
-    save.AddInput("Wait", Waiting::kAlways);
-  }
-
   JobDraft GetJob(const Outputs& /*outputs*/) const override {
     JobDraft draft;
     AddOpenWithPyramid(draft, "raster", GetSource());
     AddStats(draft, "$raster");
-    if (saves_) AddSave(draft, "$raster");
+    if (saves_) AddSave(draft, kSaveCommand, "$raster");
     draft.Close("close.raster", "$raster");
     return draft;
   }
@@ -239,14 +235,7 @@ class StatsVerb final : public FileVerb {
   }
 
   void Save(JobSession& session) override {
-    if (!saves_) return;
-    JobDraft draft;
-    AddSave(draft, raster_);
-    draft.Close("close.raster", raster_);
-    const JobResults results = session.Run(draft, Interrupts::kWait);
-    CheckClosed(results, "close.raster");
-    if (ParseValue<bool>(results.Find("save").returns.Find("Return"))) return;
-    throw HostError(kExitFailed, GetSource().file + ": the statistics could not be saved");
+    if (saves_) SaveValues(session, GetSource(), kSaveCommand, raster_, "statistics");
   }
 
   void Tell() override {
