@@ -234,8 +234,38 @@ def warp(bench):
                                   {"gdalwarp": command}, {"gdalwarp": of_method.get(resampling)})
 
 
+def make_labels(path, size):
+    """A label raster of blocks of 8 x 8 with single pixels of another label in them."""
+    import numpy
+    from osgeo import gdal, osr
+    gdal.UseExceptions()
+    random = numpy.random.default_rng(2)
+    labels = numpy.kron(random.integers(0, 4, (size // 8, size // 8)), numpy.ones((8, 8))).astype("int32")
+    labels[random.random(labels.shape) < 0.008] = 9
+    out = gdal.GetDriverByName("GTiff").Create(str(path), labels.shape[1], labels.shape[0], 1, gdal.GDT_Int32)
+    out.SetGeoTransform((500000, 30, 0, 9100000, 0, -30))
+    system = osr.SpatialReference()
+    system.ImportFromEPSG(32725)
+    out.SetProjection(system.ExportToWkt())
+    out.GetRasterBand(1).WriteArray(labels)
+
+
+def polygons(bench):
+    """About 250,000 polygons of a label raster of 4000 x 4000."""
+    labels = bench.work / f"labels-{bench.options.size}.tif"
+    if not labels.exists():
+        maker = multiprocessing.get_context("spawn").Process(target=make_labels, args=(labels, bench.options.size))
+        maker.start()
+        maker.join()
+    for ending, driver, aim in (("fxv", "FlatGeobuf", 0.15), ("fgb", "FlatGeobuf", 0.4), ("gpkg", "GPKG", 0.3)):
+        made, theirs = bench.work / f"polygons.{ending}", bench.work / f"gdal-polygons-{driver}"
+        bench.compare(f"polygons to {ending}", [bench.vexg, "polygonize", labels, made, "-q"],
+                      {"gdal_polygonize": ["gdal_polygonize.py", "-q", labels, "-f", driver, theirs]}, aim,
+                      [made, theirs])
+
+
 SECTIONS = {"stats": stats, "hist": hist, "calibrate": calibrate, "pyramid": pyramid, "warp": warp,
-            "memory": memory}
+            "polygons": polygons, "memory": memory}
 
 
 def main():

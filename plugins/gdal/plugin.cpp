@@ -1,9 +1,35 @@
+#include "common/library.h"
 #include "data/data_connection.h"
 #include "gdal_factory.h"
 #include "orva_factory.h"
+#include "vector_sink.h"
+#include "vector_source.h"
+
+namespace {
+
+class GdalVectorRecordFactory final : public lumo::VectorRecordFactory {
+ public:
+  std::vector<std::string> SinkEndings() override { return lumo::VectorSinkEndings(); }
+  lumo::VectorRecordSourcePtr Open(const std::string& path) override {
+    return lumo::OpenVectorSource(path);
+  }
+  lumo::VectorRecordSinkPtr Create(const std::string& path,
+                                   const lumo::VectorLayer& layer) override {
+    return lumo::CreateVectorSink(path, layer);
+  }
+};
+
+}  // namespace
 
 /// The entry point of the plug-in.
 extern "C" VEXG_EXPORT lumo::DataConnectionFactory* CreateDataConnectionFactory(
     lumo::FormatRecord* record) {
   return record->driver == "ORVA" ? lumo::MakeOrvaFactory(*record) : lumo::MakeGdalFactory(*record);
+}
+
+/// The entry point for files of records.
+extern "C" VEXG_EXPORT lumo::VectorRecordFactory* CreateVectorRecordFactory() {
+  lumo::gdal::StartGdal();
+  static GdalVectorRecordFactory factory;
+  return &factory;
 }

@@ -55,7 +55,7 @@ std::unique_ptr<Layer> Layer::Create(const gdal::Format& format, const gdal::Sou
                                      const VectorDef& def) {
   const std::string& path = source.name;
   std::error_code ignored;
-  const OGRwkbGeometryType type = LayerTypeOf(def.geometry);
+  const OGRwkbGeometryType type = gdal::LayerTypeOf(def.geometry);
   const char* const why =
       path.starts_with("/vsi") || !HasShapeName(path)       ? "a new shapefile's name ends in .shp"
       : Exists(path) && !fs::is_regular_file(path, ignored) ? "not a file"
@@ -96,7 +96,7 @@ bool Layer::TakeDataset(gdal::DatasetPtr dataset) {
   if (dataset_ == nullptr) return false;
   layer_ = GDALDatasetGetLayer(dataset_.get(), 0);
   const bool hasShapes =
-      layer_ != nullptr && GeometryOf(OGR_L_GetGeomType(layer_)) != VectorGeometry::kUnknown;
+      layer_ != nullptr && gdal::GeometryOf(OGR_L_GetGeomType(layer_)) != VectorGeometry::kUnknown;
   if (!hasShapes) return FailWith(Name(), "holds no points, lines or polygons");
   return NumberFeatures();
 }
@@ -108,7 +108,7 @@ bool Layer::NumberFeatures() {
   const char* const withoutShapes[] = {"OGR_GEOMETRY", nullptr};
   OGR_L_SetIgnoredFields(layer_, const_cast<const char**>(withoutShapes));
   OGR_L_ResetReading(layer_);
-  while (const FeaturePtr feature{OGR_L_GetNextFeature(layer_)}) {
+  while (const gdal::FeaturePtr feature{OGR_L_GetNextFeature(layer_)}) {
     numbers_.push_back(OGR_F_GetFID(feature.get()));
   }
   OGR_L_SetIgnoredFields(layer_, nullptr);
@@ -159,7 +159,7 @@ void Layer::Discard() const {
 VectorDef Layer::Describe() const {
   const Messages messages;
   VectorDef def;
-  def.geometry = GeometryOf(OGR_L_GetGeomType(layer_));
+  def.geometry = gdal::GeometryOf(OGR_L_GetGeomType(layer_));
   def.format = String(format_.key);
   def.dataType = kDataTypeOf<double>;
   def.features = Features();
@@ -214,7 +214,7 @@ bool Layer::Sync() {
 }
 
 bool Layer::Put(OGRFeatureH feature) {
-  const FeaturePtr changed(OGR_F_Clone(feature));
+  const gdal::FeaturePtr changed(OGR_F_Clone(feature));
   last_.reset();  // it isn't what the file holds
   if (!OpenForUpdate()) return false;
   const Messages messages;
@@ -230,7 +230,7 @@ bool Layer::Append(OGRGeometryH geometry) {
     return false;
   }
   const Messages messages;
-  const FeaturePtr feature(OGR_F_Create(OGR_L_GetLayerDefn(layer_)));
+  const gdal::FeaturePtr feature(OGR_F_Create(OGR_L_GetLayerDefn(layer_)));
   const bool isPut = OGR_F_SetGeometryDirectly(feature.get(), geometry) == OGRERR_NONE &&
                      OGR_L_CreateFeature(layer_, feature.get()) == OGRERR_NONE && Sync();
   if (isPut && !messages.HasError()) {

@@ -3,7 +3,7 @@
 #include <memory>
 
 #include "common/source.h"
-#include "shape_geometry.h"
+#include "common/shape_geometry.h"
 
 namespace lumo::shapefile {
 
@@ -57,7 +57,7 @@ class Layer {
   gdal::DatasetPtr dataset_;
   OGRLayerH layer_ = nullptr;
   std::vector<GIntBig> numbers_;  // GDAL's, of the features that are not deleted
-  FeaturePtr last_;
+  gdal::FeaturePtr last_;
   std::int32_t lastIndex_ = -1;
   bool isUpdated_ = false;
   bool isDoomed_ = false;

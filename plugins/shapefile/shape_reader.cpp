@@ -24,7 +24,7 @@ std::int32_t Reader::Vertices() {
   for (unsigned i = 0; i < layer_.Features(); ++i) {
     OGRFeatureH const feature = layer_.Get(static_cast<std::int32_t>(i));
     if (feature == nullptr) return 0;
-    for (OGRGeometryH const part : PartsOf(feature)) count += CountOf(part);
+    for (OGRGeometryH const part : gdal::PartsOf(feature)) count += CountOf(part);
   }
   if (count <= std::numeric_limits<std::int32_t>::max()) return static_cast<std::int32_t>(count);
   gdal::FailWith(layer_.Name(), "more vertices than can be counted");
@@ -36,7 +36,8 @@ bool Reader::ReadGeometryT2(double* vertices, unsigned* featureEnds) {
   for (unsigned i = 0; i < layer_.Features(); ++i) {
     OGRFeatureH const feature = layer_.Get(static_cast<std::int32_t>(i));
     if (feature == nullptr) return false;
-    for (OGRGeometryH const part : PartsOf(feature)) vertices = CopyPart(part, vertices);
+    for (OGRGeometryH const part : gdal::PartsOf(feature))
+      vertices = gdal::CopyPart(part, vertices);
     featureEnds[i] = static_cast<unsigned>((vertices - begin) / 2);
   }
   return true;
@@ -46,8 +47,8 @@ bool Reader::ReadGeometryT1(std::int32_t feature, double* vertices, unsigned* pa
   OGRFeatureH const found = layer_.Get(feature);
   if (found == nullptr) return false;
   unsigned end = 0;
-  for (OGRGeometryH const part : PartsOf(found)) {
-    vertices = CopyPart(part, vertices);
+  for (OGRGeometryH const part : gdal::PartsOf(found)) {
+    vertices = gdal::CopyPart(part, vertices);
     end += CountOf(part);
     *partEnds++ = end;
   }
@@ -58,9 +59,9 @@ bool Reader::WriteGeometryT1(std::int32_t feature, const double* vertices,
                              const unsigned* partEnds) {
   OGRFeatureH const found = layer_.Get(feature);
   if (found == nullptr) return false;
-  const auto parts = PartsOf(found);
-  const bool isRings =
-      GeometryOf(OGR_G_GetGeometryType(OGR_F_GetGeometryRef(found))) == VectorGeometry::kPolygon;
+  const auto parts = gdal::PartsOf(found);
+  const bool isRings = gdal::GeometryOf(OGR_G_GetGeometryType(OGR_F_GetGeometryRef(found))) ==
+                       VectorGeometry::kPolygon;
   unsigned begin = 0;
   for (std::size_t i = 0; i < parts.size(); ++i) {
     const unsigned end = begin + CountOf(parts[i]);
@@ -73,7 +74,7 @@ bool Reader::WriteGeometryT1(std::int32_t feature, const double* vertices,
     begin = end;
   }
   for (OGRGeometryH const part : parts) {
-    MovePart(part, vertices);
+    gdal::MovePart(part, vertices);
     vertices += 2 * std::size_t{CountOf(part)};
   }
   return layer_.Put(found);
@@ -85,7 +86,7 @@ bool Reader::AppendGeometry(std::int32_t geometry, std::int32_t vertexCount,
   if (kind != layer_.Describe().geometry) {
     return gdal::FailWith(layer_.Name(), "holds shapes of another kind");
   }
-  OGRGeometryH const made = MakeGeometry(kind, vertexCount, vertices);
+  OGRGeometryH const made = gdal::MakeGeometry(kind, vertexCount, vertices);
   if (made == nullptr) {
     return gdal::FailWith(layer_.Name(), "these vertices are no point, line or closed ring");
   }
@@ -98,10 +99,10 @@ bool Reader::GetFeatureInfo(std::int32_t feature, std::int32_t* geometry, unsign
   if (found == nullptr) return false;
   OGRGeometryH const shape = OGR_F_GetGeometryRef(found);
   const auto kind =
-      shape != nullptr ? GeometryOf(OGR_G_GetGeometryType(shape)) : VectorGeometry::kUnknown;
+      shape != nullptr ? gdal::GeometryOf(OGR_G_GetGeometryType(shape)) : VectorGeometry::kUnknown;
   *geometry = static_cast<std::int32_t>(kind);
   *parts = *vertexCount = 0;
-  for (OGRGeometryH const part : PartsOf(found)) {
+  for (OGRGeometryH const part : gdal::PartsOf(found)) {
     ++*parts;
     *vertexCount += CountOf(part);
   }

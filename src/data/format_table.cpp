@@ -35,20 +35,6 @@ std::recursive_mutex& LoadMutex() {
   return mutex;
 }
 
-/// Loads a plug-in from the first place that holds its file.
-platform::Module LoadLibraryFile(const std::string& name, std::string& fault) {
-  const String binDirectory = GetGlobalEnvironmentImpl().Find(Environment::kBinDirectory);
-  for (const std::string& directory : {binDirectory.ToUTF8(), platform::LibraryDirectory()}) {
-    if (directory.empty()) continue;
-    const std::filesystem::path path = std::filesystem::path(directory) / name;
-    std::error_code missing;
-    if (std::filesystem::exists(path, missing)) {
-      return platform::Module::Load(path.string(), &fault);
-    }
-  }
-  return platform::Module::Load(name, &fault);
-}
-
 DataConnectionFactory* AskForFactory(const platform::Module& module, FormatRecord& record) {
   auto* const create =
       module.Find<CreateDataConnectionFactoryFunction>("CreateDataConnectionFactory");
@@ -100,6 +86,19 @@ FormatRecord gCdfFormatRecords[kFormatCount] = {
 };
 
 const std::uint32_t gCdfFormatRecordCount = kFormatCount;
+
+platform::Module LoadPlugin(const std::string& name, std::string& fault) {
+  const String binDirectory = GetGlobalEnvironmentImpl().Find(Environment::kBinDirectory);
+  for (const std::string& directory : {binDirectory.ToUTF8(), platform::LibraryDirectory()}) {
+    if (directory.empty()) continue;
+    const std::filesystem::path path = std::filesystem::path(directory) / name;
+    std::error_code missing;
+    if (std::filesystem::exists(path, missing)) {
+      return platform::Module::Load(path.string(), &fault);
+    }
+  }
+  return platform::Module::Load(name, &fault);
+}
 
 const String& LibraryName(const FormatRecord& record) {
 #if defined(_WIN32)
@@ -157,7 +156,7 @@ void LoadFormat(std::uint32_t row) {
   const std::lock_guard lock(LoadMutex());
   if (GetFactory(record) != nullptr) return;
   std::string fault;
-  const platform::Module module = LoadLibraryFile(LibraryName(record).ToUTF8(), fault);
+  const platform::Module module = LoadPlugin(LibraryName(record).ToUTF8(), fault);
   if (!module.IsLoaded()) {
     SetFault(fault);
     return;

@@ -4,6 +4,7 @@
 #include <initializer_list>
 
 #include "foundation/array.h"
+#include "platform/module.h"
 
 namespace lumo {
 
@@ -62,10 +63,13 @@ VEXG_EXPORT FormatRecord* FindFormat(const String& name);
 /// unknown name, or when the plug-in is missing or unusable; the fault text then says which.
 VEXG_EXPORT DataConnectionFactory* FactoryForFormat(const String& name);
 
+/// Loads a plug-in by its file name: from the environment's binary directory, else from beside this
+/// library, else by the system's rules. @param fault  [out] why it could not be loaded.
+VEXG_EXPORT platform::Module LoadPlugin(const std::string& name, std::string& fault);
+
 /// Loads the plug-in of a row and asks it for the row's factory, unless that is done; nothing for a
-/// number outside the table. The file is looked for in the environment's binary directory, then
-/// beside this library, then by the system's rules. A library without the entry point counts as
-/// missing. What fails is tried again the next time. May be called on any thread.
+/// number outside the table. A library without the entry point counts as missing. What fails is
+/// tried again the next time. May be called on any thread.
 VEXG_EXPORT void LoadFormat(std::uint32_t row);
 
 /// The factory of a row, without loading anything; null when there is none yet.

@@ -20,6 +20,9 @@ namespace fs = std::filesystem;
 
 /// The ends of the names of files that describe another one.
 constexpr const char* kSideEndings[] = {".hdr", ".aux.xml", ".ovr", ".msk"};
+/// The same of a shapefile, in the place of its own ending.
+constexpr const char* kShapeEndings[] = {".shx", ".dbf", ".prj", ".cpg",
+                                         ".qpj", ".qix", ".sbn", ".sbx"};
 
 std::string LastFault() {
   const int code = errno;
@@ -172,6 +175,9 @@ std::vector<std::string> OutputFile::SideNames() const {
     // "scene.hdr" may be of "scene.img" as well.
     const bool isOwn = target_.has_extension() || ending != ".hdr";
     if (rules_.hasSides && isOwn) names.push_back(target_.filename().string() + ending);
+  }
+  if (rules_.hasSides && target_.extension() == ".shp") {
+    for (const char* const ending : kShapeEndings) names.push_back(target_.stem().string() + ending);
   }
   return names;
 }

@@ -8,6 +8,7 @@
 #include "foundation/near_name.h"
 #include "json_number.h"
 #include "raster_source.h"
+#include "vector_info.h"
 #include "verb.h"
 
 namespace lumo::host {
@@ -204,11 +205,31 @@ JobDraft MakeDraft(const SourceOptions& source) {
 
 int PrintJobs(const Options& options) {
   for (const std::string& file : options.files) {
+    if (IsVectorName(file)) {
+      std::cout << MakeVectorQuery(file, 0).Write().ToUTF8() << '\n';
+      continue;
+    }
     std::cout
         << MakeDraft({file, options.source.format, options.source.subdataset}).Write().ToUTF8()
         << '\n';
   }
   return kExitSuccess;
+}
+
+/// Adds what a file is to one of the two.
+void Tell(JobSession& session, const Options& options, const std::string& file, Json& all,
+          std::string& text) {
+  const char* const gap = text.empty() ? "" : "\n";
+  if (IsVectorName(file)) {
+    const std::vector<VectorLayerInfo> layers = ReadVectorLayers(session, file);
+    options.json ? all.push_back(VectorAsJson(file, layers))
+                 : void(text.append(gap).append(VectorAsText(file, layers)));
+    return;
+  }
+  const RasterInfo info = ReadInfo(
+      session.Run(MakeDraft({file, options.source.format, options.source.subdataset})), "raster");
+  options.json ? all.push_back(AsJson(file, info))
+               : void(text.append(gap).append(AsText(file, info)));
 }
 
 int Info(const Options& options) {
@@ -219,14 +240,7 @@ int Info(const Options& options) {
   std::string text;
   for (const std::string& file : options.files) {
     try {
-      const RasterInfo info =
-          ReadInfo(session.Run(MakeDraft({file, options.source.format, options.source.subdataset})),
-                   "raster");
-      if (options.json) {
-        all.push_back(AsJson(file, info));
-      } else {
-        text.append(text.empty() ? "" : "\n").append(AsText(file, info));
-      }
+      Tell(session, options, file, all, text);
     } catch (const HostError& error) {
       if (error.code == kExitNoServer) throw;
       session.CheckInterrupt();
@@ -242,13 +256,16 @@ int Info(const Options& options) {
 }
 
 const VerbRegistration registration(
-    "info", "Tells what a raster file is and where it lies", [](CLI::App& app) {
+    "info", "Tells what a raster or vector file is and where it lies", [](CLI::App& app) {
       const auto options = std::make_shared<Options>();
       app.footer(
           "With --json, one file gives an object and several give a list of them; no-data values "
-          "are a list with null for a band that has none, and \"nan\" or \"inf\" as a text.\n"
+          "are a list with null for a band that has none, and \"nan\" or \"inf\" as a text. Of a "
+          "vector file, which its ending tells, there are \"file\" and \"layers\".\n"
           "Example: vexg info --json scene.tif\n");
-      app.add_option("files", options->files, "The rasters")->type_name("FILE")->required();
+      app.add_option("files", options->files, "Rasters and vector files")
+          ->type_name("FILE")
+          ->required();
       app.add_flag("--json", options->json, "As JSON");
       options->source.AddFormatTo(app);
       options->job.AddTo(app);

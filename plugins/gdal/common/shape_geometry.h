@@ -6,7 +6,7 @@
 
 #include "data/vector_def.h"
 
-namespace lumo::shapefile {
+namespace lumo::gdal {
 
 struct FeatureDeleter {
   void operator()(OGRFeatureH feature) const { OGR_F_Destroy(feature); }
@@ -35,4 +35,4 @@ void MovePart(OGRGeometryH part, const double* vertices);
 /// Writes the places of a part. Gives the end of what was written.
 double* CopyPart(OGRGeometryH part, double* vertices);
 
-}  // namespace lumo::shapefile
+}  // namespace lumo::gdal

@@ -1,6 +1,6 @@
-#include "shape_geometry.h"
+#include "common/shape_geometry.h"
 
-namespace lumo::shapefile {
+namespace lumo::gdal {
 namespace {
 
 void AddParts(OGRGeometryH geometry, std::vector<OGRGeometryH>& parts) {
@@ -101,4 +101,4 @@ double* CopyPart(OGRGeometryH part, double* vertices) {
   return vertices;
 }
 
-}  // namespace lumo::shapefile
+}  // namespace lumo::gdal

@@ -1,0 +1,134 @@
+#include <filesystem>
+
+#include "foundation/fault.h"
+#include "geometry/fxv_file.h"
+#include "geometry/raster_to_vector.h"
+#include "geometry/record_writer.h"
+#include "raster/raster_command.h"
+#include "raster/raster_def.h"
+
+namespace lumo {
+namespace {
+
+const CommandDeclaration kPolygonize{
+    "PolygonizeCommand",
+    "Vectors",
+    "Turns areas of equal value of a raster into polygons of a vector file. A command of this "
+    "library's own.",
+    {{"URI", Presence::kRequired, ValueKind::kURI, "the raster"},
+     {"Vectors", Presence::kRequired, ValueKind::kText,
+      "the file to make, in the format of its ending: .fxv, or one of a vector plug-in"},
+     {"Band", Presence::kOptional, ValueKind::kInteger, "from 0; 0 when absent"},
+     {"Layer", Presence::kOptional, ValueKind::kText,
+      "name of the layer; the file's name without its ending when absent"},
+     {"Field", Presence::kOptional, ValueKind::kText,
+      "name of the column of values; label when absent"},
+     {"MinSize", Presence::kOptional, ValueKind::kNumber,
+      "smaller polygons are left out, which leaves their places empty; none when absent",
+      "pixels"}},
+    {{"Polygons", ValueKind::kInteger, "how many were written"},
+     {"LeftOut", ValueKind::kInteger, "how many were too small"},
+     {"Warning", ValueKind::kText,
+      "what the user should know of the result; absent when there is nothing"}}};
+
+using FxvWriter = FxvPolygonWriter<std::int32_t, std::uint32_t>;
+
+class PolygonizeCommand final : public RasterCommand {
+  CommandResult Execute() override {
+    if (!CheckInputs()) return Fail();
+    const BasicRasterPtr raster = FindRaster();
+    if (!raster) return Fail();
+    path_ = Read<String>("Vectors").ToUTF8();
+    band_ = HasInput("Band") ? Read<unsigned>("Band") : 0;
+    if (band_ >= raster->Bands()) {
+      return Fail("Band: the raster has " + std::to_string(raster->Bands()) + " bands");
+    }
+    bool isDone = false;
+    const bool isKnown = DispatchType(EightTypes{}, raster->DataType(), [&]<typename T>() {
+      isDone = Polygonize(RasterPtr<T>(raster));
+      return true;
+    });
+    if (!isKnown) return Fail("URI: a raster of this pixel type can't be vectorized");
+    if (!isDone) return Fail(TakeFaultOr("the raster could not be vectorized"));
+    Write("Polygons", written_);
+    Write("LeftOut", leftOut_);
+    if (changed_ != 0) {
+      Write("Warning", String(std::to_string(changed_) +
+                           " polygons have a value that the file can't hold; they stand there "
+                           "under another"));
+    }
+    return Succeed();
+  }
+
+  template <typename T>
+  bool Polygonize(const RasterPtr<T>& raster) {
+    return IsFxvName(path_) ? ToFxv<T>(raster) : ToRecords<T>(raster);
+  }
+
+  /// Runs the process into a writer. False, with the fault told, when not all polygons are written.
+  template <typename T>
+  bool Run(const RasterPtr<T>& raster, const ObjectPtr& writer) {
+    RasterToVectorProcess<T> process(raster, band_, writer, GetIPC());
+    const bool hasRun = process.RunProcess(process.kHere);
+    changed_ = process.Counts().changed;
+    written_ = process.Counts().polygons;
+    const bool isAborted = GetIPC().abort->IsSet();
+    if (hasRun && !isAborted) return true;
+    SetFault(isAborted ? String("the vectorizing was aborted") : process.GetFault());
+    return false;
+  }
+
+  template <typename T>
+  bool ToFxv(const RasterPtr<T>& raster) {
+    if (HasInput("MinSize")) {
+      SetFault("MinSize: an FXV file holds all polygons");
+      return false;
+    }
+    const Pointer<FxvWriter> writer(new FxvWriter(URI(String(path_))));
+    if (!writer->IsValid()) return false;
+    if (Run<T>(raster, writer)) return writer->Close();
+    writer->Abandon();
+    return false;
+  }
+
+  template <typename T>
+  bool ToRecords(const RasterPtr<T>& raster) {
+    VectorRecordFactory* const factory = GetVectorRecordFactory();
+    if (factory == nullptr) return false;
+    PolygonRecordOptions options;
+    options.geoRef = raster->GetRasterDef().geoRef;
+    options.leastPixels = HasInput("MinSize") ? Read<double>("MinSize") : 0;
+    const VectorRecordSinkPtr sink = factory->Create(path_, Describe<T>(options.geoRef));
+    if (!sink) return false;
+    auto* const records = new RecordPolygonWriter<T>(sink, options);
+    const ObjectPtr writer(records);
+    if (!Run<T>(raster, writer)) return false;
+    written_ = records->Written();
+    leftOut_ = records->LeftOut();
+    return sink->Close();
+  }
+
+  template <typename T>
+  VectorLayer Describe(const GeoRefPtr& geoRef) {
+    VectorLayer layer;
+    layer.name = HasInput("Layer") ? Read<String>("Layer").ToUTF8()
+                                   : std::filesystem::path(path_).stem().string();
+    layer.geometry = VectorGeometry::kPolygon;
+    if (geoRef) layer.coordSys = geoRef->CoordinateSystem();
+    const std::string field = HasInput("Field") ? Read<String>("Field").ToUTF8() : "label";
+    layer.fields = {
+        {field, std::is_integral_v<T> ? VectorFieldType::kInteger : VectorFieldType::kReal}};
+    return layer;
+  }
+
+  std::string path_;
+  unsigned band_ = 0;
+  std::uint64_t written_ = 0;
+  std::uint64_t leftOut_ = 0;
+  std::uint64_t changed_ = 0;
+};
+
+const CommandFactoryT<PolygonizeCommand> factory(kPolygonize);
+
+}  // namespace
+}  // namespace lumo

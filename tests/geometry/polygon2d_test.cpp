@@ -1,0 +1,99 @@
+#include "geometry/polygon2d.h"
+
+#include <cmath>
+#include <numbers>
+
+#include <gtest/gtest.h>
+
+namespace lumo {
+namespace {
+
+using M = PolygonMeasure;
+
+/// A square of 10 with a hole of 2 by 4 in it, clockwise on axes that run right and down.
+Contour2DArray<double> Frame() {
+  return {{{{0, 0}, {10, 0}, {10, 10}, {0, 10}, {0, 0}}, false},
+          {{{1, 1}, {1, 5}, {3, 5}, {3, 1}, {1, 1}}, true}};
+}
+
+TEST(Polygon2D, MeasuresFollowFromRectangles) {
+  const Polygon2D<double> frame(Frame(), 5);
+  EXPECT_EQ(frame.Label(), 5);
+  EXPECT_FALSE(frame.HasMeasure(4));
+  EXPECT_DOUBLE_EQ(frame.Measure(M::kSignedArea), 92);
+  EXPECT_TRUE(frame.HasMeasure(27));
+  EXPECT_DOUBLE_EQ(frame.Measure(M::kHolesSignedArea), -8);
+  EXPECT_DOUBLE_EQ(frame.Measure(12), 8);
+  EXPECT_DOUBLE_EQ(frame.Measure(M::kOuterSignedArea), 100);
+  // Centroid by composition: square about (5, 5), hole about (2, 3).
+  const double cx = (100 * 5.0 - 8 * 2.0) / 92, cy = (100 * 5.0 - 8 * 3.0) / 92;
+  EXPECT_NEAR(frame.Measure(M::kCentroidX), cx, 1e-12);
+  EXPECT_NEAR(frame.Measure(M::kCentroidY), cy, 1e-12);
+  // Second moments by the theorem of parallel axes; a rectangle's own is side^2 / 12.
+  const double ixx = (100 * (100 / 12.0 + 25) - 8 * (4 / 12.0 + 4)) / 92 - cx * cx;
+  const double iyy = (100 * (100 / 12.0 + 25) - 8 * (16 / 12.0 + 9)) / 92 - cy * cy;
+  const double ixy = (100 * 25.0 - 8 * 6.0) / 92 - cx * cy;
+  EXPECT_NEAR(frame.Measure(M::kIxx), ixx, 1e-12);
+  EXPECT_NEAR(frame.Measure(M::kIyy), iyy, 1e-12);
+  EXPECT_NEAR(frame.Measure(M::kIxy), ixy, 1e-12);
+  for (unsigned moment = 13; moment < 18; ++moment) EXPECT_EQ(frame.Measure(moment), 0);
+  EXPECT_NEAR(frame.Measure(20), 5, 1e-12);
+  EXPECT_DOUBLE_EQ(frame.Measure(M::kPerimeter), 52);
+  EXPECT_DOUBLE_EQ(frame.Measure(M::kHolesPerimeter), 12);
+  EXPECT_DOUBLE_EQ(frame.Measure(M::kOuterPerimeter), 40);
+  EXPECT_EQ(frame.Measure(28), 0);
+}
+
+TEST(Polygon2D, MovesKeepWhatStaysTrue) {
+  Polygon2D<double> frame(Frame());
+  const double ixx = frame.Measure(M::kIxx);
+  frame.Translate(-3, 4);
+  EXPECT_TRUE(frame.HasMeasure(static_cast<unsigned>(M::kIxx)));
+  for (unsigned index : {0U, 3U, 6U, 7U, 13U, 14U, 20U, 21U}) EXPECT_FALSE(frame.HasMeasure(index));
+  EXPECT_EQ(frame.Measure(M::kMinX), -3);
+  EXPECT_NEAR(frame.Measure(M::kIxx), ixx, 1e-12);
+  frame.Scale(2, 1);
+  EXPECT_DOUBLE_EQ(frame.Measure(M::kSignedArea), 184);
+  frame.Rotate(std::numbers::pi / 2, {0, 0});
+  EXPECT_NEAR(frame.Measure(M::kSignedArea), 184, 1e-9);
+  EXPECT_NEAR(frame.Measure(M::kMinX), -14, 1e-12);
+  EXPECT_NEAR(frame.Measure(M::kMaxY), 14, 1e-12);
+}
+
+TEST(Polygon2D, HullLeavesOutHolesAndPointsWithin) {
+  const Polygon2D<std::uint32_t> shape(
+      {{{{5, 0}, {5, 5}, {10, 5}, {10, 10}, {0, 10}, {0, 3}, {5, 0}}, false},
+       {{{1, 8}, {1, 9}, {2, 9}, {2, 8}, {1, 8}}, true}});
+  const Polygon2D<std::uint32_t> hull = shape.ConvexHull();
+  ASSERT_EQ(hull.Rings().size(), 1U);
+  const Point2DArray<std::uint32_t> expected{{5, 0}, {10, 5}, {10, 10}, {0, 10}, {0, 3}, {5, 0}};
+  EXPECT_EQ(hull.Rings()[0].points, expected);
+  EXPECT_GT(hull.Measure(M::kSignedArea), 0);
+  EXPECT_EQ(shape.BoundingRectangle().Measure(M::kArea), 100);
+  EXPECT_FALSE(Polygon2D<double>().ConvexHull().IsValid());
+}
+
+TEST(Polygon2D, BadArraysMakeNoPolygon) {
+  Array<bool> holes{ArrayDims(2)};
+  holes[0] = false;
+  holes[1] = true;
+  Array<unsigned> starts{ArrayDims(2)};
+  starts[0] = 0;
+  starts[1] = 3;
+  Array<double> coordinates{ArrayDims(12)};
+  for (unsigned i = 0; i < 12; ++i) coordinates[i] = i;
+  EXPECT_TRUE(Polygon2D<double>(1, holes, starts, coordinates).IsValid());
+  for (const unsigned start : {0U, 6U, 4000000000U}) {
+    starts[1] = start;
+    const Polygon2D<double> bad(1, holes, starts, coordinates);
+    EXPECT_EQ(bad.GetErrorState().code, PolygonErrorBadPolygon::Code) << start;
+  }
+  EXPECT_EQ(Polygon2D<double>().GetErrorState().code, PolygonErrorBadPolygon::Code);
+  const Polygon2D<double> odd({{{{-0.6, 1.5}, {2.4, 9e9}}, false}});
+  const Polygon2D<std::int32_t> whole(odd);
+  EXPECT_EQ(whole.Rings()[0].points[0], (Point2D<std::int32_t>{-1, 2}));
+  EXPECT_EQ(whole.Rings()[0].points[1].y, INT32_MAX);
+}
+
+}  // namespace
+}  // namespace lumo

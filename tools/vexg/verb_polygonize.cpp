@@ -1,0 +1,80 @@
+#include <CLI/CLI.hpp>
+#include <fmt/format.h>
+
+#include "file_verb.h"
+
+namespace lumo::host {
+namespace {
+
+constexpr const char* kMakeStep = "make";
+
+class PolygonizeVerb final : public FileVerb {
+ public:
+  explicit PolygonizeVerb(CLI::App& app) : FileVerb(app) {
+    app.footer(
+        "Pixels of equal value that share a side are one polygon. The ending of the output chooses "
+        "its format: .gpkg, .fgb, .geojson, .geojsons, .shp, .csv, or .fxv, the file of this "
+        "library's own steps, which is in pixels.\n"
+        "Example: vexg polygonize classes.tif classes.gpkg --min-size 9\n");
+    app.add_option("output", output_, "The polygons")->type_name("OUT")->required();
+    app.add_option("--band", band_, "Band of the values, from 0")->capture_default_str();
+    app.add_option("--min-size", leastPixels_,
+                   "Leave out polygons of fewer pixels; their places stay empty")
+        ->type_name("PIXELS")
+        ->check(CLI::NonNegativeNumber);
+    app.add_option("--layer", layer_, "Name of the layer; by default that of the file")
+        ->type_name("NAME");
+    app.add_option("--field", field_, "Name of the column of values; label by default")
+        ->type_name("NAME");
+    AddOverwriteTo(app, "a file that is there");
+  }
+
+ private:
+  std::vector<std::string> GetOutputs() const override { return {output_}; }
+
+  void AddOpening(JobDraft& draft) const override {
+    AddOpen(draft, "source", GetSource());
+    AddQuery(draft, "source", "$source");
+  }
+
+  void Plan(JobSession& /*session*/, const JobResults& opened) override {
+    const RasterInfo info = ReadInfo(opened, "source");
+    if (band_ < info.bands) return;
+    throw HostError(kExitUsage, fmt::format("--band: the raster has {} bands", info.bands));
+  }
+
+  JobDraft MakeDraft(const std::string& file) const {
+    JobDraft draft;
+    AddOpen(draft, "source", GetSource());
+    JobWriterCommand& make = draft.Step(kMakeStep, "PolygonizeCommand");
+    make.AddVariableInput("URI", "$source");
+    make.AddInput("Vectors", String(file));
+    if (band_ != 0) make.AddInput("Band", band_);
+    if (leastPixels_ > 0) make.AddInput("MinSize", leastPixels_);
+    if (!layer_.empty()) make.AddInput("Layer", String(layer_));
+    if (!field_.empty()) make.AddInput("Field", String(field_));
+    draft.Close("close", "$source");
+    return draft;
+  }
+
+  JobDraft GetJob(const Outputs& outputs) const override {
+    return MakeDraft(outputs.Get(0).GetName());
+  }
+
+  void Make(JobSession& session, const Outputs& outputs) override {
+    const JobDraft draft = MakeDraft(outputs.Get(0).GetWorkName());
+    const ProgressView view(ProgressOfStep(session, draft, kMakeStep), GetProgressStyle());
+    session.Run(draft);
+  }
+
+  std::string output_, layer_, field_;
+  unsigned band_ = 0;
+  double leastPixels_ = 0;
+};
+
+const VerbRegistration registration("polygonize",
+                                    "Makes polygons of areas of equal value, in a vector file",
+                                    &SetUp<PolygonizeVerb>);
+
+}  // namespace
+}  // namespace lumo::host
