@@ -2,6 +2,7 @@
 #include <fmt/format.h>
 
 #include "file_verb.h"
+#include "raster_target.h"
 
 namespace lumo::host {
 namespace {
