@@ -161,7 +161,10 @@ std::unique_ptr<OpenRaster> OpenRaster::Create(const Format& format, const Sourc
   raster->isUpdated_ = true;
   raster->canWrite_ = Answer::kYes;
   if (raster->TakeDataset(std::move(dataset))) return raster;
+  const String why = TakeFault();
   raster->newRaster_->Doom();
+  raster.reset();
+  SetFault(why);  // rather than that its end gives
   return nullptr;
 }
 

@@ -36,7 +36,7 @@ lumo::RasterDef Reader<T>::RasterDef() {
   lumo::RasterDef def = pyramid_.Def();
   if (!def.geoRef && values_.geoRef) def.SetGeoRef(values_.geoRef);
   if (!values_.fileState.empty()) {
-    def.metadata.Set(DetailPath("FileState"), String(values_.fileState));
+    def.metadata.Set(FileStatePath(), String(values_.fileState));
   }
   def.noData.clear();
   for (const auto& [band, value] : values_.noData) {
@@ -204,7 +204,7 @@ void Reader<T>::InheritNoDataValues(const lumo::RasterDef& from) {
     }
   }
   values_.geoRef = CloneOf(from.geoRef);
-  inheritedState_ = FindDetail(from.metadata, DetailPath("FileState"));
+  inheritedState_ = FindDetail(from.metadata, FileStatePath());
 }
 
 template <typename T>

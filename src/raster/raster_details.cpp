@@ -75,6 +75,10 @@ String BandDetailPath(unsigned band, const std::string& name) {
   return String(kRoot + kBands + std::to_string(band) + "/" + name);
 }
 
+String FileStatePath() {
+  return "/private/FileState";
+}
+
 std::string FindDetail(const Metadata& metadata, const String& path) {
   String text;
   return metadata.GetString(path, text) ? text.ToUTF8() : std::string();

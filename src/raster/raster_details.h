@@ -21,8 +21,6 @@
 //   CoordSys                 WKT of a system of the Grid, the Points, or of nothing
 //   Points/<n>               a ground control point: pixel, line, x, y, z; from the upper left
 //   corner
-//   FileState                of a pyramid file: the bytes and the time of change, in ns since 1970,
-//                            of the file of the raster that it was built from
 //
 // A format's reader enters them, views choose and move them, a format's writer keeps them.
 
@@ -42,6 +40,10 @@ VEXG_EXPORT std::span<const EnumWord<KeptDetails>> WordsOf(KeptDetails);
 /// @param name  as in the list above.
 VEXG_EXPORT String DetailPath(const std::string& name);
 VEXG_EXPORT String BandDetailPath(unsigned band, const std::string& name);
+
+/// The path of what a pyramid file tells of the file of the raster that it was built from: the bytes
+/// and the time of change, in ns since 1970. It is no detail, and stays with the pyramid.
+VEXG_EXPORT String FileStatePath();
 
 /// The text of a detail; no text where it isn't told.
 VEXG_EXPORT std::string FindDetail(const Metadata& metadata, const String& path);

@@ -40,7 +40,7 @@ std::string FindMismatch(RasterDataConnection& source, RasterDataConnection& pyr
       raster.bands != levels.bands) {
     return "is of a raster of another size";
   }
-  const std::string kept = FindDetail(levels.metadata, DetailPath("FileState"));
+  const std::string kept = FindDetail(levels.metadata, FileStatePath());
   if (!kept.empty()) {
     const std::string now = FileStateOf(source);
     return now.empty() || now == kept ? "" : "was built from another state of the raster";

@@ -33,7 +33,7 @@ ReaderRaster<T>::ReaderRaster(const RasterReaderPtr<T>& reader,
     RasterDef told = def;
     told.metadata = Metadata();
     const std::string state = connection_ ? FileStateOf(*connection_) : std::string();
-    if (!state.empty()) told.metadata.Set(DetailPath("FileState"), String(state));
+    if (!state.empty()) told.metadata.Set(FileStatePath(), String(state));
     pyramidReader_->InheritNoDataValues(told);
   }
   uri_ = uri;

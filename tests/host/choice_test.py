@@ -78,9 +78,8 @@ class Levels(FolderTest):
         pyramid, own = file.with_name("s.tif.pyr"), file.with_name("s.tif.ovr")
         now = time.time()
         for older, newer, words in ((pyramid, own, "its own are used"), (own, pyramid, "those of the pyramid file are used")):
-            os.utime(file, (now - 300, now - 300))
-            os.utime(older, (now - 200, now - 200))
-            os.utime(newer, (now - 100, now - 100))
+            os.utime(older, (now + 100, now + 100))
+            os.utime(newer, (now + 200, now + 200))
             for verb in (["quicklook", file, self.folder / "q.png", "--size", "50", "--overwrite"], ["stats", file]):
                 code, out, err = run(*verb)
                 self.assertEqual((code, len(err.strip().splitlines())), (0, 1), err)

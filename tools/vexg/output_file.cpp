@@ -98,7 +98,8 @@ void OutputFile::RefuseInput(const std::string& input) {
 
 OutputFile::~OutputFile() {
   std::error_code ignored;
-  if (!folder_.empty()) fs::remove_all(folder_, ignored);
+  // An empty one goes by its name, which takes nothing that a process can run out of.
+  if (!folder_.empty() && !fs::remove(folder_, ignored)) fs::remove_all(folder_, ignored);
 }
 
 void OutputFile::Refuse(const std::string& why) const {

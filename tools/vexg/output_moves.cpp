@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <cerrno>
+#include <cstdio>
 #include <filesystem>
 #include <fstream>
 #include <string_view>
@@ -135,15 +136,33 @@ void OutputMoves::TakeBack() const {
   errno = code;
 }
 
+/// What is left of older files and notes when all moves are done, each folder behind its content.
+std::vector<std::string> OutputMoves::ListRemains() const {
+  std::vector<std::string> remains;
+  for (const Part& part : parts_) {
+    for (const std::string& name : part.files.old) remains.push_back(part.Aside(name));
+    remains.push_back((fs::path(part.files.folder) / kAside).string());
+    remains.push_back(part.NotePath());
+    remains.push_back(part.files.folder);
+  }
+  return remains;
+}
+
 bool OutputMoves::Run(std::string* fault) {
+  const std::vector<std::string> remains = ListRemains();
   if (!WriteNotes(fault)) return false;
   const bool isDone =
       std::all_of(parts_.begin(), parts_.end(),
                   [&](Part& part) { return part.MoveAside(fault); }) &&
       std::all_of(parts_.begin(), parts_.end(), [&](Part& part) { return part.MoveIn(fault); }) &&
       (!isDurable_ || SyncPlaces(fault));
-  if (!isDone) TakeBack();
-  return isDone;
+  if (!isDone) {
+    TakeBack();
+    return false;
+  }
+  // By name: where the process has too little of anything, a folder can't be read any more.
+  for (const std::string& path : remains) std::remove(path.c_str());
+  return true;
 }
 
 std::vector<std::string> OutputMoves::GetStuckFolders() const {

@@ -27,6 +27,7 @@ class OutputMoves {
   ///                   the caller's.
   OutputMoves(const std::vector<MovedFiles>& outputs, bool isDurable);
 
+  /// Removes the older files, and the folders, when all new ones are in place.
   /// @return false when a move failed; `fault` gets the reason, and all is as it was.
   bool Run(std::string* fault);
 
@@ -61,6 +62,7 @@ class OutputMoves {
   OutputMoves() = default;
   bool WriteNotes(std::string* fault) const;
   bool SyncPlaces(std::string* fault) const;
+  std::vector<std::string> ListRemains() const;
   void TakeBack() const;
   static Part ReadPart(const std::string& folder, const std::string& place,
                        std::vector<Part>* others);
