@@ -4,6 +4,7 @@
 
 #include "data/file_uri.h"
 #include "foundation/fault.h"
+#include "foundation/file_faults.h"
 #include "pyramid_reader.h"
 
 namespace lumo::pyramid {
@@ -198,7 +199,11 @@ bool Connection::Delete() {
   LeaveBuild();
   file_.reset();
   cache_.Clear();
-  if (!IsPyramidFile(path_)) return Fail("there is no pyramid");
+  const FileFaults faults;
+  if (!IsPyramidFile(path_)) {
+    const FileFault* const unread = faults.FirstOf(path_);
+    return Fail(unread != nullptr ? unread->Text() : "there is no pyramid");
+  }
   std::error_code fault;
   return std::filesystem::remove(path_, fault) || Fail(fault.message());
 }

@@ -1,10 +1,12 @@
 #include "document.h"
 
+#include <cerrno>
 #include <fstream>
 #include <iostream>
 #include <iterator>
 
 #include "commands/shared_memory_channel.h"
+#include "platform/memory_shortage.h"
 #include "verb.h"
 
 namespace lumo::host {
@@ -45,18 +47,23 @@ void ForEach(const XMLElement& element, Visit&& visit) {
 }  // namespace
 
 std::string ReadFile(const std::string& file) {
+  const auto fail = [&](const char* what) {
+    const std::string why = errno != 0 ? ": " + platform::SystemErrorText(errno) : std::string();
+    throw HostError(kExitUsage,
+                    file + ": can't be " + what + why + "; name a file, or - for standard input");
+  };
   std::ifstream opened;
+  errno = 0;
   if (file != "-") {
     opened.open(file, std::ios::binary);
-    if (!opened) {
-      throw HostError(kExitUsage, file + ": can't be opened; name a file, or - for standard input");
-    }
+    if (!opened) fail("opened");
   }
   std::istream& in = file != "-" ? opened : std::cin;
   try {
     return {std::istreambuf_iterator<char>(in), std::istreambuf_iterator<char>()};
   } catch (const std::ios::failure&) {  // a directory, for example
-    throw HostError(kExitUsage, file + ": can't be read; name a file, or - for standard input");
+    fail("read");
+    throw;
   }
 }
 

@@ -28,6 +28,19 @@ void SayReason(const NamedCommand& command, const XMLElement& result) {
   }
 }
 
+/// Tells what a command that succeeded has lost: one that closes a raster does so by its form, also
+/// where the file could not be completed. @return false when there was something.
+bool SayLoss(const NamedCommand& command, const XMLElement& result) {
+  if (result.attributes.Find("Result") != "Success") return true;
+  for (const XMLElementPtr& child : result.children) {
+    const std::string fault = child->attributes.Find("Fault").ToUTF8();
+    if (child->name != "Return" || fault.empty()) continue;
+    Say("command \"" + command.name + "\" (" + command.id + "): " + fault);
+    return false;
+  }
+  return true;
+}
+
 bool IsKnownHere(const NamedCommand& command) {
   return GetCommandRegistry().HasKey(command.id);
 }
@@ -185,7 +198,9 @@ int ExitCodeOf(const Document& job, const String& resultDocument) {
     if (command->name != "Command") continue;
     if (command->attributes.Find("Result") != "Success") failed = true;
     while (next != asked.end() && next->name != command->attributes.Find("Name").ToUTF8()) ++next;
-    if (next != asked.end()) SayReason(*next++, *command);
+    if (next == asked.end()) continue;
+    SayReason(*next, *command);
+    failed = !SayLoss(*next++, *command) || failed;
   }
   return failed ? kExitFailed : kExitSuccess;
 }
