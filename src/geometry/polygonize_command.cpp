@@ -19,6 +19,8 @@ const CommandDeclaration kPolygonize{
      {"Vectors", Presence::kRequired, ValueKind::kText,
       "the file to make, in the format of its ending: .fxv, or one of a vector plug-in"},
      {"Band", Presence::kOptional, ValueKind::kInteger, "from 0; 0 when absent"},
+     {"MaskURI", Presence::kOptional, ValueKind::kURI,
+      "a raster of the same size; where its first band is 0 or not valid, pixels do not count"},
      {"Layer", Presence::kOptional, ValueKind::kText,
       "name of the layer; the file's name without its ending when absent"},
      {"Field", Presence::kOptional, ValueKind::kText,
@@ -43,6 +45,7 @@ class PolygonizeCommand final : public RasterCommand {
     if (band_ >= raster->Bands()) {
       return Fail("Band: the raster has " + std::to_string(raster->Bands()) + " bands");
     }
+    if (HasInput("MaskURI") && !FindMask(*raster)) return Fail();
     bool isDone = false;
     const bool isKnown = DispatchType(EightTypes{}, raster->DataType(), [&]<typename T>() {
       isDone = Polygonize(RasterPtr<T>(raster));
@@ -54,10 +57,22 @@ class PolygonizeCommand final : public RasterCommand {
     Write("LeftOut", leftOut_);
     if (changed_ != 0) {
       Write("Warning", String(std::to_string(changed_) +
-                           " polygons have a value that the file can't hold; they stand there "
-                           "under another"));
+                              " polygons have a value that the file can't hold; they stand there "
+                              "under another"));
     }
     return Succeed();
+  }
+
+  bool FindMask(const BasicRaster& raster) {
+    const BasicRasterPtr mask = FindRaster("MaskURI");
+    if (!mask) return false;
+    const bool fits = mask->Samples() == raster.Samples() && mask->Lines() == raster.Lines();
+    mask_ = fits ? MakeLabelMask(mask) : LabelMaskPtr();
+    if (!mask_) {
+      SetFault(fits ? "MaskURI: a raster of this pixel type can't be a mask"
+                    : "MaskURI: the mask has another size than the raster");
+    }
+    return bool(mask_);
   }
 
   template <typename T>
@@ -69,6 +84,7 @@ class PolygonizeCommand final : public RasterCommand {
   template <typename T>
   bool Run(const RasterPtr<T>& raster, const ObjectPtr& writer) {
     RasterToVectorProcess<T> process(raster, band_, writer, GetIPC());
+    process.SetMask(mask_);
     const bool hasRun = process.RunProcess(process.kHere);
     changed_ = process.Counts().changed;
     written_ = process.Counts().polygons;
@@ -122,6 +138,7 @@ class PolygonizeCommand final : public RasterCommand {
   }
 
   std::string path_;
+  LabelMaskPtr mask_;
   unsigned band_ = 0;
   std::uint64_t written_ = 0;
   std::uint64_t leftOut_ = 0;

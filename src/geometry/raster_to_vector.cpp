@@ -9,6 +9,7 @@ struct VectorizePlan : Object {
   std::uint32_t width = 0;
   std::uint32_t lines = 0;
   ObjectPtr writer;
+  LabelMaskPtr mask;  // empty: all count
   LabelCounts counts;
 };
 
@@ -34,6 +35,11 @@ class VectorizeTask final : public SequentialTask {
     const TilePtr<T> tile(args.Get(0));
     if (HasError() || !IsBlockOfLines(tile.Get(), plan_->width)) {
       if (!HasError()) SetErrorState(TaskErrorBadArgs());
+      return false;
+    }
+    if (plan_->mask &&
+        !plan_->mask->Apply(tile->Origin().second, tile->Height(), tile->StateArray().GetData())) {
+      SetErrorState(TaskError());
       return false;
     }
     const Pointer<PolygonBatch> batch(new PolygonBatch);
@@ -178,6 +184,11 @@ RasterToVectorProcess<T>::RasterToVectorProcess(const RasterPtr<T>& raster, unsi
 
 template <typename T>
 RasterToVectorProcess<T>::~RasterToVectorProcess() = default;
+
+template <typename T>
+void RasterToVectorProcess<T>::SetMask(const LabelMaskPtr& mask) {
+  stages_->plan->mask = mask;
+}
 
 template <typename T>
 LabelCounts RasterToVectorProcess<T>::Counts() const {

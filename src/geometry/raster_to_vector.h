@@ -2,6 +2,7 @@
 
 #include <memory>
 
+#include "geometry/label_mask.h"
 #include "geometry/polygon_batch.h"
 #include "raster/raster_tasks.h"
 #include "tasks/process_builder.h"
@@ -38,6 +39,10 @@ class VEXG_EXPORT RasterToVectorProcess final : public ProcessBuilder<Process> {
   RasterToVectorProcess(const RasterPtr<T>& raster, unsigned band, const ObjectPtr& writer,
                         const IPC& ipc = {}, const AsyncCallbackPtr& callback = {});
   ~RasterToVectorProcess() override;
+
+  /// Leaves out the pixels of which a mask of the raster's size says that they do not count. Before
+  /// a run.
+  void SetMask(const LabelMaskPtr& mask);
 
   /// The polygons that the runs have written.
   LabelCounts Counts() const;

@@ -74,6 +74,22 @@ class Polygonize(PipeTest, FolderTest):
         self.fails(2, "is there already", "polygonize", self.labels, made)
         self.fine("polygonize", self.labels, made, "--overwrite")
 
+    def test_a_mask_leaves_pixels_out(self):
+        mask = self.folder / "mask.tif"
+        subprocess.run(["gdal_translate", "-q", "-b", "1", "-scale", "60", "61", "0", "1", "-ot", "Byte",
+                        DATA / "landsat7_olinda.tif", mask], check=True)
+        kept = sum(pixel != 0 for pixel in gdal_pixels(mask))
+        made = self.folder / "fields.gpkg"
+        self.fine("polygonize", self.labels, made, "--mask", mask)
+        size = json.loads(self.fine("info", "--json", self.labels))["geoRef"]["pixelSize"]
+        count, area, valid = self.sums(made)
+        self.assertEqual(valid, count)
+        self.assertAlmostEqual(area / abs(size[0] * size[1]) / kept, 1, 9)
+        self.assertLess(kept, len(gdal_pixels(mask)))
+        part = self.folder / "part.tif"
+        subprocess.run(["gdal_translate", "-q", "-srcwin", "0", "0", "9", "9", mask, part], check=True)
+        self.fails(1, "another size", "polygonize", self.labels, made, "--mask", part, "--overwrite")
+
     def test_bad_input_leaves_nothing(self):
         before = sorted(self.folder.iterdir())
         self.fails(1, "ending", "polygonize", self.labels, self.folder / "fields.doc")

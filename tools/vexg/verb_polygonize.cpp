@@ -19,6 +19,9 @@ class PolygonizeVerb final : public FileVerb {
         "Example: vexg polygonize classes.tif classes.gpkg --min-size 9\n");
     app.add_option("output", output_, "The polygons")->type_name("OUT")->required();
     app.add_option("--band", band_, "Band of the values, from 0")->capture_default_str();
+    app.add_option("--mask", mask_,
+                   "A raster of the same size: where its first band is 0, pixels do not count")
+        ->type_name("FILE");
     app.add_option("--min-size", leastPixels_,
                    "Leave out polygons of fewer pixels; their places stay empty")
         ->type_name("PIXELS")
@@ -32,6 +35,10 @@ class PolygonizeVerb final : public FileVerb {
 
  private:
   std::vector<std::string> GetOutputs() const override { return {output_}; }
+
+  std::vector<std::string> GetFurtherInputs() const override {
+    return mask_.empty() ? std::vector<std::string>() : std::vector<std::string>{mask_};
+  }
 
   void AddOpening(JobDraft& draft) const override {
     AddOpen(draft, "source", GetSource());
@@ -47,13 +54,16 @@ class PolygonizeVerb final : public FileVerb {
   JobDraft MakeDraft(const std::string& file) const {
     JobDraft draft;
     AddOpen(draft, "source", GetSource());
+    if (!mask_.empty()) AddOpen(draft, "mask", {mask_, ""});
     JobWriterCommand& make = draft.Step(kMakeStep, "PolygonizeCommand");
     make.AddVariableInput("URI", "$source");
     make.AddInput("Vectors", String(file));
     if (band_ != 0) make.AddInput("Band", band_);
+    if (!mask_.empty()) make.AddVariableInput("MaskURI", "$mask");
     if (leastPixels_ > 0) make.AddInput("MinSize", leastPixels_);
     if (!layer_.empty()) make.AddInput("Layer", String(layer_));
     if (!field_.empty()) make.AddInput("Field", String(field_));
+    if (!mask_.empty()) draft.Close("close.mask", "$mask");
     draft.Close("close", "$source");
     return draft;
   }
@@ -68,7 +78,7 @@ class PolygonizeVerb final : public FileVerb {
     session.Run(draft);
   }
 
-  std::string output_, layer_, field_;
+  std::string output_, mask_, layer_, field_;
   unsigned band_ = 0;
   double leastPixels_ = 0;
 };
