@@ -44,6 +44,7 @@ constinit Next<void*(std::size_t)> gMalloc("malloc");
 constinit Next<void*(std::size_t, std::size_t)> gCalloc("calloc");
 constinit Next<void*(void*, std::size_t)> gRealloc("realloc");
 constinit Next<void*(std::size_t, std::size_t)> gAlignedAlloc("aligned_alloc");
+constinit Next<void*(std::size_t, std::size_t)> gMemalign("memalign");
 constinit Next<int(void**, std::size_t, std::size_t)> gPosixMemalign("posix_memalign");
 
 void Look(bool isMade, std::size_t bytes) {
@@ -69,6 +70,12 @@ void* calloc(std::size_t count, std::size_t bytes) {
 
 void* realloc(void* memory, std::size_t bytes) {
   void* const made = gRealloc.Get()(memory, bytes);
+  Look(made != nullptr, bytes);
+  return made;
+}
+
+void* memalign(std::size_t alignment, std::size_t bytes) {
+  void* const made = gMemalign.Get()(alignment, bytes);
   Look(made != nullptr, bytes);
   return made;
 }
