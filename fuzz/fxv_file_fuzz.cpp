@@ -1,5 +1,5 @@
-// An FXV file: it opens or it doesn't; of one that opens all records are read, through deques and as
-// polygons alike, and written again they give the same records.
+// An FXV file: it opens or it doesn't; of one that opens all records are read, through deques and
+// as polygons alike, and written again they give the same records.
 
 #include <cstdint>
 #include <cstdlib>

@@ -2,8 +2,8 @@
 
 #include <memory>
 
-#include "common/source.h"
 #include "common/shape_geometry.h"
+#include "common/source.h"
 
 namespace lumo::shapefile {
 

@@ -41,8 +41,8 @@ VEXG_EXPORT std::span<const EnumWord<KeptDetails>> WordsOf(KeptDetails);
 VEXG_EXPORT String DetailPath(const std::string& name);
 VEXG_EXPORT String BandDetailPath(unsigned band, const std::string& name);
 
-/// The path of what a pyramid file tells of the file of the raster that it was built from: the bytes
-/// and the time of change, in ns since 1970. It is no detail, and stays with the pyramid.
+/// The path of what a pyramid file tells of the file of the raster that it was built from: the
+/// bytes and the time of change, in ns since 1970. It is no detail, and stays with the pyramid.
 VEXG_EXPORT String FileStatePath();
 
 /// The text of a detail; no text where it isn't told.

@@ -140,8 +140,8 @@ TEST_F(FxvFile, TheCommandMakesTheExpectedFilesByteForByte) {
   if (cases.empty()) GTEST_SKIP() << "no sample data";
   unsigned count = 0;
   for (const fs::directory_entry& entry : fs::directory_iterator(cases)) {
-    const auto opened =
-        test::RunCommand("OpenRasterCommand", {{"ConnStr", (entry.path() / "labels.tif").string()}});
+    const auto opened = test::RunCommand("OpenRasterCommand",
+                                         {{"ConnStr", (entry.path() / "labels.tif").string()}});
     ASSERT_TRUE(opened.Succeeded()) << opened.reason;
     const auto made = test::RunCommand(
         "FxRasterToVectorCommand", {{"LabelURI", opened.outputs.at("URI")}, {"VectorFXV", Path()}});

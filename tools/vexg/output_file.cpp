@@ -178,7 +178,8 @@ std::vector<std::string> OutputFile::SideNames() const {
     if (rules_.hasSides && isOwn) names.push_back(target_.filename().string() + ending);
   }
   if (rules_.hasSides && target_.extension() == ".shp") {
-    for (const char* const ending : kShapeEndings) names.push_back(target_.stem().string() + ending);
+    for (const char* const ending : kShapeEndings)
+      names.push_back(target_.stem().string() + ending);
   }
   return names;
 }
