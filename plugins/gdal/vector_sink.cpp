@@ -62,16 +62,19 @@ OGRFieldType TypeOf(VectorFieldType type) {
 }
 
 /// Settings of GDAL for this thread while it lives: what is made here is no file of anybody's until
-/// it is whole, so SQLite need not see to it that a crash leaves it so.
+/// it is whole, so SQLite need not see to it that a crash leaves it so; and it reads and writes
+/// through GDAL's files, which note why a call fails.
 class Settings {
  public:
   Settings() {
     CPLSetThreadLocalConfigOption("OGR_SQLITE_SYNCHRONOUS", "OFF");
     CPLSetThreadLocalConfigOption("OGR_SQLITE_JOURNAL", "OFF");
+    CPLSetThreadLocalConfigOption("SQLITE_USE_OGR_VFS", "YES");
   }
   ~Settings() {
     CPLSetThreadLocalConfigOption("OGR_SQLITE_SYNCHRONOUS", nullptr);
     CPLSetThreadLocalConfigOption("OGR_SQLITE_JOURNAL", nullptr);
+    CPLSetThreadLocalConfigOption("SQLITE_USE_OGR_VFS", nullptr);
   }
   Settings(const Settings&) = delete;
   Settings& operator=(const Settings&) = delete;

@@ -63,8 +63,8 @@ class Build {
 
   /// Notes that values were stored in the file, or could not be.
   void NoteValues(bool areStored) { values_ = areStored ? values_ + 1 : kLost; }
-  /// True when values were stored in the file, and none failed to be.
-  bool HasValues() const { return values_ > 0; }
+  /// True when statistics and histograms were stored in the file, and none failed to be.
+  bool HasValues() const { return values_ >= kStores; }
 
   /// Gives a complete file its place, unless another was put there since the build began.
   bool TakePlace();
@@ -77,6 +77,7 @@ class Build {
  private:
   struct Packed;
 
+  static constexpr int kStores = 2;  // of a build: histograms, then statistics
   static constexpr int kLost = -1000;
 
   Build(const std::string& path, const Header& header);

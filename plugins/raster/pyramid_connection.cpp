@@ -158,6 +158,7 @@ bool Connection::BeginBuild(const Header& wanted) {
 }
 
 bool Connection::Refresh(const std::string& values, bool getsStats) {
+  bool hasTakenPlace = false;
   const bool isWhole = build_ != nullptr && !build_->IsOver() && build_->IsWhole();
   if (isWhole) build_->Complete(values);
   if (build_ != nullptr && build_->HasFailed()) {
@@ -170,11 +171,13 @@ bool Connection::Refresh(const std::string& values, bool getsStats) {
     if (isMissing) build_->GiveUp();
     LeaveBuild();
     if (!isMissing && !hasPlace) return false;
+    hasTakenPlace = hasPlace;
   }
   if (build_ != nullptr && (build_->IsOver() || build_.use_count() == 1)) LeaveBuild();
   if (file_ != nullptr && file_->IsCurrent() && file_->Path() == PathShown()) return true;
   std::error_code ignored;
-  if (std::filesystem::exists(PathShown(), ignored)) return OpenFile();
+  // What stands in its place is whole, also where it can't be shown here.
+  if (std::filesystem::exists(PathShown(), ignored)) return OpenFile() || hasTakenPlace;
   file_.reset();
   cache_.Clear();
   return Fail("there is no pyramid");

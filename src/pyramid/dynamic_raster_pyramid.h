@@ -58,6 +58,7 @@ class DynamicRasterPyramid final : public PyramidCallback<T> {
   bool CanTakeResults() const;
   bool ResultsHold() const { return reader_->WriteCount(0) == writes_; }
   bool IsKeptByTheLibrary() const;
+  bool AreLevelsShown() const;
   AsyncPtr Start(const PyramidBuilderPtr& builder);
 
   mutable std::mutex lock_;  // guards the results and the builder
@@ -70,6 +71,7 @@ class DynamicRasterPyramid final : public PyramidCallback<T> {
   PyramidBuilderPtr builder_;  // that runs, or was the last one
   mutable bool isEndTaken_ = true;
   std::uint64_t writes_ = 0;  // of the raster's pixels, when the last build began
+  String levelsFault_;        // why the levels of the last build can't be shown
   std::vector<RasterBandStats<T>> bandStats_;
   std::vector<RasterBandHistogram<T>> bandHistograms_;
 };

@@ -148,7 +148,19 @@ void DynamicRasterPyramid<T>::OnLevelsWritten() {
   if (stats.GetCount() != 0 && IsKeptByTheLibrary() && pyramidReader_->CanWriteStats()) {
     pyramidReader_->WriteStats(stats);
   }
-  Refresh();
+  if (Refresh()) return;
+  const std::lock_guard lock(lock_);
+  levelsFault_ = TakeFault();
+}
+
+/// False, with the fault told, where the levels that were made can't be shown: what belongs to them
+/// would go elsewhere.
+template <typename T>
+bool DynamicRasterPyramid<T>::AreLevelsShown() const {
+  if (!IsKeptByTheLibrary() || pyramidReader_->PyramidExists()) return true;
+  const std::lock_guard lock(lock_);
+  SetFault(levelsFault_);
+  return false;
 }
 
 template <typename T>
@@ -184,6 +196,7 @@ bool DynamicRasterPyramid<T>::TakeHistogram(const RasterHistogram<T>& histogram,
     }
     all = detail::ArrayOf(bandHistograms_);
   }
+  if (!AreLevelsShown()) return false;
   if (!pyramidReader_->CanWriteHistogram()) return true;
   if (!pyramidReader_->WriteHistogram(all)) return false;
   pyramidReader_->SetHistogramsHoldFor(writes);
@@ -209,6 +222,7 @@ bool DynamicRasterPyramid<T>::TakeStats(const RasterStats<T>& stats) requires(
     }
     all = detail::ArrayOf(bandStats_);
   }
+  if (!AreLevelsShown()) return false;
   if (!pyramidReader_->CanWriteStats()) return true;
   if (!pyramidReader_->WriteStats(all)) return false;
   pyramidReader_->SetStatsHoldFor(writes);

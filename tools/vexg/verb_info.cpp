@@ -7,6 +7,7 @@
 
 #include "foundation/near_name.h"
 #include "json_number.h"
+#include "platform/memory_shortage.h"
 #include "raster_source.h"
 #include "vector_info.h"
 #include "verb.h"
@@ -242,7 +243,7 @@ int Info(const Options& options) {
     try {
       Tell(session, options, file, all, text);
     } catch (const HostError& error) {
-      if (error.code == kExitNoServer) throw;
+      if (error.code == kExitNoServer || platform::CountMemoryShortages() != 0) throw;
       session.CheckInterrupt();
       Say(error.what());
       code = std::max(code, error.code);
