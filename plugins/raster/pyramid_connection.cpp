@@ -177,7 +177,14 @@ bool Connection::Refresh(const std::string& values, bool getsStats) {
   if (file_ != nullptr && file_->IsCurrent() && file_->Path() == PathShown()) return true;
   std::error_code ignored;
   // What stands in its place is whole, also where it can't be shown here.
-  if (std::filesystem::exists(PathShown(), ignored)) return OpenFile() || hasTakenPlace;
+  if (std::filesystem::exists(PathShown(), ignored)) {
+    const bool isShown = OpenFile();
+    if (!isShown && IsPending()) {
+      build_->GiveUp();  // what can't be read again isn't given its place
+      LeaveBuild();
+    }
+    return isShown || hasTakenPlace;
+  }
   file_.reset();
   cache_.Clear();
   return Fail("there is no pyramid");

@@ -18,9 +18,10 @@ bool ReadHeader(const RandomAccessFile& file, Header& header, std::string& fault
     StoredHeader stored{};
     Header found;
     std::string why = "isn't a whole pyramid";
-    const bool isThere = place + sizeof stored <= fileBytes &&
-                         file.Read(place, &stored, sizeof stored) &&
-                         Load(stored, fileBytes, found, why);
+    const bool hasRoom = place + sizeof stored <= fileBytes;
+    // The other one may be older: what can't be read is not passed over.
+    if (hasRoom && !file.Read(place, &stored, sizeof stored, &fault)) return false;
+    const bool isThere = hasRoom && Load(stored, fileBytes, found, why);
     if (isThere && (!isFound || found.sequence > header.sequence)) header = found;
     isFound = isFound || isThere;
     if (firstFault.empty()) firstFault = why;
