@@ -258,7 +258,8 @@ def polygons(bench):
         maker.start()
         maker.join()
     for ending, driver, aim in (("fxv", "FlatGeobuf", 0.15), ("fgb", "FlatGeobuf", 0.4), ("gpkg", "GPKG", 0.3)):
-        made, theirs = bench.work / f"polygons.{ending}", bench.work / f"gdal-polygons-{driver}"
+        made = bench.work / f"polygons.{ending}"
+        theirs = bench.work / ("gdal-polygons" + {"FlatGeobuf": ".fgb", "GPKG": ".gpkg"}[driver])
         bench.compare(f"polygons to {ending}", [bench.vexg, "polygonize", labels, made, "-q"],
                       {"gdal_polygonize": ["gdal_polygonize.py", "-q", labels, "-f", driver, theirs]}, aim,
                       [made, theirs])
