@@ -453,7 +453,7 @@ bool NewRaster::TakePlace() const {
 bool NewRaster::MoveFiles(platform::FileSwap& swap, std::string& why) const {
   // A header of our own format would tell of the new file as if it were the older one.
   if (orva::HasHeader(path_) && !swap.MoveAside(orva::HeaderPath(path_), &why)) return false;
-  // What the older file has beside it tells of other pixels.
+  // Files beside the older one tell of other pixels.
   for (const char* const suffix : kSideFiles) {
     if (!swap.MoveAside(path_ + suffix, &why)) return false;
   }

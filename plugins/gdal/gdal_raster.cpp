@@ -453,7 +453,7 @@ bool OpenRaster::ChangeStored(const std::function<bool()>& change) {
   std::string busy;
   if (!lock.IsHeld(&busy)) return FailWith(Name(), busy);
   if (levels_.empty() || !Reopen()) return false;
-  // What could not be read would be lost when the file beside the raster is written anew.
+  // Values that could not be read would be lost when the file beside the raster is written anew.
   if (messages.Files().First() != nullptr) return messages.Fail(Name());
   if (!IsSideFileWhole(Name() + ".aux.xml")) {
     if (messages.Files().First() != nullptr) return messages.Fail(Name());

@@ -75,7 +75,7 @@ PJ* CachedTransform(const std::string& key, const std::function<PjPtr(PJ_CONTEXT
   if (state.transforms.size() >= kMostTransforms) state.transforms.clear();
   const platform::MemoryWatch memory;
   PjPtr made = make(state.context);
-  // What memory was too short for is not what can't be made.
+  // A transform that memory was too short for is not one that can't be made.
   if (made == nullptr && memory.WasShort()) throw std::bad_alloc();
   return state.transforms.emplace(key, std::move(made)).first->second.get();
 }

@@ -44,7 +44,7 @@ void MarkFailed(const PointSpan& points) {
   }
 }
 
-/// What `find` gives; null, with the shortage noted, where memory is too short to make it.
+/// Gives what `find` does; null, with the shortage noted, where memory is too short to make it.
 template <typename Find>
 PJ* FindOrNull(Find&& find) {
   try {

@@ -176,7 +176,7 @@ bool Connection::Refresh(const std::string& values, bool getsStats) {
   if (build_ != nullptr && (build_->IsOver() || build_.use_count() == 1)) LeaveBuild();
   if (file_ != nullptr && file_->IsCurrent() && file_->Path() == PathShown()) return true;
   std::error_code ignored;
-  // What stands in its place is whole, also where it can't be shown here.
+  // The file that stands in its place is whole, also where it can't be shown here.
   if (std::filesystem::exists(PathShown(), ignored)) {
     const bool isShown = OpenFile();
     if (!isShown && IsPending()) {

@@ -86,7 +86,7 @@ class VEXG_EXPORT VectorRecordSink {
 
 using VectorRecordSinkPtr = Pointer<VectorRecordSink>;
 
-/// What a plug-in supplies for files of records. Threads: any, several at once.
+/// Opens and makes files of records; a plug-in supplies one. Threads: any, several at once.
 class VEXG_EXPORT VectorRecordFactory {
  public:
   /// The endings, each with its dot, by which a path chooses the format of a new file.

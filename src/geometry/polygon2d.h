@@ -59,7 +59,7 @@ enum class PolygonMeasure : unsigned {
   kOuterPerimeter = 27,
 };
 
-/// What the polygons of all coordinate types have in common: one type code.
+/// Base of the polygons of all coordinate types, which share one type code.
 class VEXG_EXPORT Polygon2DObject : public Object {
  public:
   static const unsigned TypeCode;

@@ -50,8 +50,8 @@ bool IsOfFailure(const char* text, Messages::Damage damage) {
 }  // namespace
 
 struct Messages::Handler {
-  /// What is fatal to GDAL, as a small allocation that fails, would end the process when this
-  /// returns. It leaves as an exception instead, as that of a container of GDAL's own would.
+  /// A fault that is fatal to GDAL, as a small allocation that fails, would end the process when
+  /// this returns. It leaves as an exception instead, as that of a container of GDAL's own would.
   static void CPL_STDCALL Take(CPLErr severity, CPLErrorNum number, const char* text) {
     auto* const messages = static_cast<Messages*>(CPLGetErrorHandlerUserData());
     if (IsOfMemory(number, text)) {
