@@ -69,7 +69,7 @@ constexpr unsigned kSamples = 4096;
 constexpr unsigned kLines = 2048;
 constexpr unsigned kBands = 4;
 
-/// What is done with a scaled value: nothing.
+/// Leaves a scaled value as it is.
 struct Keep {
   double operator()(double value) const { return value; }
 };

@@ -7,7 +7,7 @@
 
 namespace lumo {
 
-/// What became of the labels of a run.
+/// Counts the polygons of a run, and those whose labels were changed.
 struct LabelCounts {
   std::uint64_t polygons = 0;  ///< written
   std::uint64_t changed = 0;   ///< of those, the ones whose label the writer's type can't hold

@@ -3,7 +3,7 @@
 namespace lumo {
 namespace {
 
-/// What the stages of a run share.
+/// Holds the values that the stages of a run share.
 template <typename T>
 struct VectorizePlan : Object {
   std::uint32_t width = 0;

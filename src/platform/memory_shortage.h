@@ -6,7 +6,7 @@
 
 namespace lumo::platform {
 
-// What is known of memory that the process asked for and did not get. Libraries hide many such
+// A count is kept of memory that the process asked for and did not get. Libraries hide many such
 // failures behind another reason, or go on without what they could not make, so whoever is about to
 // believe a result asks here whether memory was short meanwhile.
 

@@ -43,9 +43,9 @@ class DynamicRasterPyramid final : public PyramidCallback<T> {
   RasterBandStats<T> BandStats(unsigned band) const;
   Array<RasterBandHistogram<T>> BandHistogram(unsigned band) const;
 
-  // What a build tells, on its thread. What it has computed goes into the pyramid's store too:
-  // false, with the fault told, when the store can't take it, or the raster has been written to
-  // meanwhile.
+  // A build calls these on its thread. The values that it has computed goes into the pyramid's
+  // store too: false, with the fault told, when the store can't take it, or the raster has been
+  // written to meanwhile.
   void OnLevelsWritten() override;
   bool TakeHistogram(const RasterHistogram<T>& histogram,
                      HistogramSign sign) requires(std::is_arithmetic_v<T>);

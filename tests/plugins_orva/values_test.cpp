@@ -158,7 +158,7 @@ TEST(OrvaValues, ConnectionsDoNotUndoOneAnother) {
   auto fifth = OpenSource({"ORVA", path});
   EXPECT_TRUE(ReaderOf<float>(fifth)->StatsExist(1));
   EXPECT_FALSE(ReaderOf<float>(fifth)->StatsExist(0));
-  // What one knows of goes, and only that.
+  // A writer takes away the values that it knows of, and no others.
   Array<RasterBandHistogram<float>> ofThree = ofOne;
   for (RasterBandHistogram<float>& histogram : ofThree) histogram.band = 3;
   ASSERT_TRUE(first->WriteHistogram(ofThree));

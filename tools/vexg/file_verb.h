@@ -69,9 +69,9 @@ class FileVerb {
   virtual std::uint64_t GetBytes(std::size_t /*output*/) const { return 0; }
   virtual void Make(JobSession& session, const Outputs& outputs) = 0;
   virtual void Save(JobSession& /*session*/) {}
-  /// What is printed on standard output, made before anything changes.
+  /// Gives the text for standard output, made before anything changes.
   virtual std::string Describe() const { return {}; }
-  /// What is said on standard error, made before anything changes.
+  /// Gives the line for standard error, made before anything changes.
   virtual std::string Remark() const { return {}; }
 
   const SourceOptions& GetSource() const { return source_; }

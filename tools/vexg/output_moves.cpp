@@ -136,7 +136,8 @@ void OutputMoves::TakeBack() const {
   errno = code;
 }
 
-/// What is left of older files and notes when all moves are done, each folder behind its content.
+/// Lists what is left of older files and notes when all moves are done, each folder behind its
+/// content.
 std::vector<std::string> OutputMoves::ListRemains() const {
   std::vector<std::string> remains;
   for (const Part& part : parts_) {

@@ -102,7 +102,7 @@ class RasterVerb : public FileVerb {
   virtual FillValues GetNoData(const FillValues& chosen) const { return chosen; }
   /// Adds commands that ask the raster that is shown, when the file is made.
   virtual void AddLastQuestions(JobDraft& /*draft*/, const String& /*shown*/) const {}
-  /// What the file shall hold, by the results of the job.
+  /// Reads from the results of the job what the file shall hold.
   virtual RasterContents ReadWanted(const JobResults& results) const;
   /// Adds what the format did not keep to the losses.
   virtual void Compare(MadeRaster& raster, Losses& losses) const { CompareKept(raster, losses); }
