@@ -43,7 +43,7 @@ class DynamicRasterPyramid final : public PyramidCallback<T> {
   RasterBandStats<T> BandStats(unsigned band) const;
   Array<RasterBandHistogram<T>> BandHistogram(unsigned band) const;
 
-  // A build calls these on its thread. The values that it has computed goes into the pyramid's
+  // A build calls these on its thread. The values that it has computed go into the pyramid's
   // store too: false, with the fault told, when the store can't take it, or the raster has been
   // written to meanwhile.
   void OnLevelsWritten() override;
