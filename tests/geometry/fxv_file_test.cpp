@@ -9,6 +9,7 @@
 
 #include "foundation/fault.h"
 #include "geometry/raster_to_vector.h"
+#include "geometry/vector_read_task.h"
 #include "support/file_bytes.h"
 #include "support/file_size_limit.h"
 #include "support/run_command.h"
@@ -112,6 +113,30 @@ TEST_F(FxvFile, RefusesWhatIsNotWhole) {
   std::ofstream(Path(), std::ios::binary) << huge;
   Polygon2D<std::uint32_t> polygon;
   EXPECT_FALSE((Reader{URI(String(Path()))}.Read(polygon)));
+}
+
+TEST_F(FxvFile, AReadTaskGivesAsManyAsTheHeaderSays) {
+  WriteTwo();
+  const std::string whole = FileBytes(Path());
+  for (const bool isCut : {false, true}) {
+    std::ofstream(Path(), std::ios::binary) << whole.substr(0, whole.size() - (isCut ? 1 : 0));
+    ArgList setup(1);
+    setup.Set(0, Pointer<Reader>(new Reader{URI(String(Path()))}));
+    VectorReadTask<std::int32_t, std::uint32_t> task(setup);
+    ASSERT_FALSE(task.HasError());
+    ArgList token(1);
+    ASSERT_TRUE(task.Execute(token));
+    EXPECT_EQ(Polygon2DPtr<std::uint32_t>(token.Get(0))->Label(), -7);
+    EXPECT_EQ(task.Execute(token), !isCut);
+    EXPECT_FALSE(task.Execute(token));
+    EXPECT_EQ(task.HasError(), isCut);  // without an error false is the end of the data
+    const bool isTold = TakeFault().ToUTF8().find("polygon 2 of 2") != std::string::npos;
+    EXPECT_EQ(isTold, isCut);
+    task.ClearErrorState();
+  }
+  ArgList none(1);
+  EXPECT_EQ((VectorReadTask<std::int32_t, std::uint32_t>(none).GetErrorState().code),
+            TaskErrorBadParams::Code);
 }
 
 TEST_F(FxvFile, AFailedOrAbandonedWriterLeavesNoMark) {

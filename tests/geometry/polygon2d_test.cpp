@@ -1,7 +1,11 @@
 #include "geometry/polygon2d.h"
 
 #include <cmath>
+#include <functional>
+#include <geos_c.h>
+#include <memory>
 #include <numbers>
+#include <random>
 
 #include <gtest/gtest.h>
 
@@ -42,6 +46,58 @@ TEST(Polygon2D, MeasuresFollowFromRectangles) {
   EXPECT_DOUBLE_EQ(frame.Measure(M::kHolesPerimeter), 12);
   EXPECT_DOUBLE_EQ(frame.Measure(M::kOuterPerimeter), 40);
   EXPECT_EQ(frame.Measure(28), 0);
+}
+
+/// A ring about (0, 0) whose corners lie at growing angles and random distances.
+Point2DArray<double> Star(std::mt19937& random, double nearest, double farthest, bool backwards) {
+  std::uniform_real_distribution<double> distance(nearest, farthest);
+  Point2DArray<double> ring;
+  const int corners = 5 + static_cast<int>(random() % 40);
+  for (int i = 0; i < corners; ++i) {
+    const double angle = (backwards ? -2 : 2) * std::numbers::pi * i / corners;
+    const double length = distance(random);
+    ring.push_back({1000 + length * std::cos(angle), -500 + length * std::sin(angle)});
+  }
+  ring.push_back(ring.front());
+  return ring;
+}
+
+TEST(Polygon2D, MeasuresAreThoseOfGeos) {
+  const std::unique_ptr<GEOSContextHandle_HS, decltype(&GEOS_finish_r)> context(GEOS_init_r(),
+                                                                                &GEOS_finish_r);
+  GEOSContextHandle_t const geos = context.get();
+  using Shape = std::unique_ptr<GEOSGeometry, std::function<void(GEOSGeometry*)>>;
+  const auto own = [&](GEOSGeometry* made) {
+    return Shape(made, [geos](GEOSGeometry* shape) { GEOSGeom_destroy_r(geos, shape); });
+  };
+  const auto ringOf = [&](const Point2DArray<double>& points) {
+    GEOSCoordSequence* const sequence =
+        GEOSCoordSeq_create_r(geos, static_cast<unsigned>(points.size()), 2);
+    for (unsigned i = 0; i < points.size(); ++i) {
+      GEOSCoordSeq_setXY_r(geos, sequence, i, points[i].x, points[i].y);
+    }
+    return GEOSGeom_createLinearRing_r(geos, sequence);
+  };
+  std::mt19937 random(11);
+  for (int round = 0; round < 200; ++round) {
+    const Contour2DArray<double> rings{{Star(random, 50, 90, false), false},
+                                       {Star(random, 5, 25, true), true}};
+    const Polygon2D<double> polygon(rings);
+    GEOSGeometry* hole = ringOf(rings[1].points);
+    const Shape shape = own(GEOSGeom_createPolygon_r(geos, ringOf(rings[0].points), &hole, 1));
+    double area = 0, length = 0, x = 0, y = 0, hullArea = 0;
+    GEOSArea_r(geos, shape.get(), &area);
+    GEOSLength_r(geos, shape.get(), &length);
+    const Shape centroid = own(GEOSGetCentroid_r(geos, shape.get()));
+    GEOSGeomGetX_r(geos, centroid.get(), &x);
+    GEOSGeomGetY_r(geos, centroid.get(), &y);
+    GEOSArea_r(geos, own(GEOSConvexHull_r(geos, shape.get())).get(), &hullArea);
+    EXPECT_NEAR(polygon.Measure(M::kSignedArea), area, 1e-6);
+    EXPECT_NEAR(polygon.Measure(M::kPerimeter), length, 1e-8);
+    EXPECT_NEAR(polygon.Measure(M::kCentroidX), x, 1e-6);
+    EXPECT_NEAR(polygon.Measure(M::kCentroidY), y, 1e-6);
+    EXPECT_NEAR(polygon.ConvexHull().Measure(M::kArea), hullArea, 1e-6);
+  }
 }
 
 TEST(Polygon2D, MovesKeepWhatStaysTrue) {
