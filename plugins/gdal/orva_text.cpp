@@ -4,6 +4,8 @@
 #include <charconv>
 #include <set>
 
+#include "foundation/text_case.h"
+
 namespace lumo::orva {
 namespace {
 
@@ -14,14 +16,6 @@ std::string_view Trim(std::string_view text) {
   const std::size_t begin = text.find_first_not_of(kBlanks);
   if (begin == std::string_view::npos) return {};
   return text.substr(begin, text.find_last_not_of(kBlanks) + 1 - begin);
-}
-
-std::string LowerCase(std::string_view text) {
-  std::string lower(text);
-  for (char& c : lower) {
-    if (c >= 'A' && c <= 'Z') c = static_cast<char>(c - 'A' + 'a');
-  }
-  return lower;
 }
 
 /// Takes lines off a text and counts them.

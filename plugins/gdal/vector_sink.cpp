@@ -13,6 +13,7 @@
 #include "common/shape_geometry.h"
 #include "common/source.h"
 #include "data/access_policy.h"
+#include "foundation/text_case.h"
 #include "platform/file_moves.h"
 #include "platform/temporary_file.h"
 
@@ -46,9 +47,7 @@ const std::vector<SinkFormat>& SinkFormats() {
 }
 
 const SinkFormat* FindSinkFormat(const std::string& path) {
-  std::string ending = fs::path(path).extension().string();
-  std::transform(ending.begin(), ending.end(), ending.begin(),
-                 [](unsigned char c) { return static_cast<char>(std::tolower(c)); });
+  const std::string ending = LowerCase(fs::path(path).extension().string());
   for (const SinkFormat& format : SinkFormats()) {
     if (ending == format.ending) return &format;
   }

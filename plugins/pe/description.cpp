@@ -8,6 +8,7 @@
 #include <string_view>
 #include <vector>
 
+#include "foundation/text_case.h"
 #include "georef/coordsys.h"
 
 namespace lumo::pe {
@@ -61,9 +62,8 @@ std::string NumberText(double value) {
 }
 
 /// Names that stand for no name: two systems that have them are not the same for that.
-bool IsNoName(std::string name) {
-  std::transform(name.begin(), name.end(), name.begin(),
-                 [](unsigned char c) { return static_cast<char>(std::tolower(c)); });
+bool IsNoName(const std::string& text) {
+  const std::string name = LowerCase(text);
   return name.empty() || name == "unknown" || name == "unnamed" || name == "undefined" ||
          name == "custom";
 }

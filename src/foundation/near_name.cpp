@@ -5,16 +5,10 @@
 #include <cstdio>
 #include <numeric>
 
+#include "foundation/text_case.h"
+
 namespace lumo {
 namespace {
-
-std::string Lower(std::string_view text) {
-  std::string lower(text);
-  for (char& c : lower) {
-    if (c >= 'A' && c <= 'Z') c = static_cast<char>(c - 'A' + 'a');
-  }
-  return lower;
-}
 
 /// The number of letters to change, add, leave out or swap with their neighbour to make one of the
 /// other (the restricted Damerau-Levenshtein distance).
@@ -68,14 +62,14 @@ std::string Escaped(char c) {
 std::string NearestName(std::string_view name, const std::vector<std::string>& known) {
   constexpr std::size_t kLongest = 200;  // nobody types more
   if (name.empty() || name.size() > kLongest) return {};
-  const std::string wanted = Lower(name);
+  const std::string wanted = LowerCase(name);
   std::size_t best = std::max<std::size_t>(1, (wanted.size() + 2) / 3) + 1;
   if (wanted.size() == 1) best = 1;  // any other letter would be near
   std::string nearest;
   for (const std::string& candidate : known) {
     const auto lengths = std::minmax({wanted.size(), candidate.size()});
     if (lengths.second - lengths.first >= best) continue;  // so many letters to add at least
-    const std::size_t distance = Distance(wanted, Lower(candidate));
+    const std::size_t distance = Distance(wanted, LowerCase(candidate));
     if (distance >= best || distance >= std::max(wanted.size(), candidate.size())) continue;
     best = distance;
     nearest = candidate;

@@ -7,6 +7,7 @@
 #include <filesystem>
 
 #include "foundation/fault.h"
+#include "foundation/text_case.h"
 
 namespace lumo {
 namespace {
@@ -60,10 +61,7 @@ bool PutInChunks(const List& list, Put&& put) {
 }  // namespace
 
 bool IsFxvName(const std::string& path) {
-  std::string ending = std::filesystem::path(path).extension().string();
-  std::transform(ending.begin(), ending.end(), ending.begin(),
-                 [](unsigned char c) { return static_cast<char>(std::tolower(c)); });
-  return ending == ".fxv";
+  return LowerCase(std::filesystem::path(path).extension().string()) == ".fxv";
 }
 
 FxvPolygonWriter<std::int32_t, std::uint32_t>::FxvPolygonWriter(const URI& uri, unsigned bufferSize)

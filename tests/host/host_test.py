@@ -4,6 +4,7 @@ import json
 import os
 import pathlib
 import pty
+import re
 import signal
 import subprocess
 import tempfile
@@ -121,11 +122,46 @@ class Commands(unittest.TestCase):
         self.assertIn("Seconds  required, number in s", help_text)
         self.assertEqual(run("help", "run")[1], run("run", "--help")[1])
 
+    def test_verbs_are_described_for_programs_and_readers(self):
+        verbs = {verb["name"]: verb for verb in json.loads(run("help", "--json")[1])["verbs"]}
+        listed = run("--help")[1].split("Subcommands:")[1].split()
+        self.assertLessEqual(set(verbs), set(listed))
+        for name, verb in verbs.items():
+            shown = run(name, "--help")[1]
+            manual = run("help", "--man", name)[1].replace("\\", "")
+            named = set(re.findall(r"^  (?:-\w,)?(--[\w-]+)", shown, re.M)) - {"--help"}
+            options = [option for option in verb["options"] if option["names"][0].startswith("--")]
+            self.assertEqual({option["names"][0] for option in options}, named)
+            for option in verb["options"]:
+                self.assertIn("fB" + ", ".join(option["names"]) + "fR", manual)
+        tile = next(o for o in verbs["pyramid"]["options"] if o["names"] == ["--tile"])
+        self.assertEqual((tile["type"], tile["least"], tile["most"], tile["default"]), ("whole number", 1, 2048, "128"))
+        elevation = next(o for o in verbs["calibrate"]["options"] if o["names"] == ["--sun-elevation"])
+        self.assertEqual((elevation["type"], elevation["unit"]), ("number", "degrees"))
+        self.assertEqual(run("help", "--json", "--man")[0], 2)
+
+    def test_bad_values_are_refused_in_one_line(self):
+        for arguments, want in [
+                (["pyramid", "build", "x", "--tile", "0"], "--tile: 0 is not in 1 to 2048"),
+                (["pyramid", "build", "x", "--tile", "-1"], '"-1" is no whole number'),
+                (["abort", "vexg", "99999999999"], "job: \"99999999999\" is too large"),
+                (["hist", "x", "--lower", "low"], '--lower: "low" is no number'),
+                (["calibrate", "radiance", "x", "y", "--gain", "1,,2"], '--gain: "" is no number'),
+                (["calibrate", "radiance", "x", "y", "--distance", "1 km"], "the unit is astronomical units"),
+                (["read", "x"], "--output is required"),
+                (["stats", "a", "b"], "The following argument was not expected: b")]:
+            code, out, err = run(*arguments)
+            self.assertEqual((code, out), (2, ""), arguments)
+            self.assertEqual(len(err.splitlines()), 1, err)
+            self.assertIn(want, err)
+
     def test_complete_in_a_shell(self):
         script = subprocess.run([VEXG, "completion", "bash"], capture_output=True, text=True, check=True)
         words = 'COMP_WORDS=(vexg {}); COMP_CWORD={}; _vexg; echo "${{COMPREPLY[@]}}"'
         for typed, index, want in [("ru", 1, "run"), ("help ExampleS", 2, "ExampleSumCommand"),
-                                   ("submit --serv", 2, "--server"), ("commands --mark", 2, "--markdown")]:
+                                   ("submit --serv", 2, "--server"), ("commands --mark", 2, "--markdown"),
+                                   ("read --interleave bs", 3, "bsq"), ("read --interleave = bs", 4, "bsq"),
+                                   ("pyramid de", 2, "delete")]:
             # The shell finds vexg by its name; the example commands are loaded for it here.
             function = f'vexg() {{ "{VEXG}" --load "{EXAMPLES}" "$@"; }}\n'
             shell = subprocess.run(["bash", "-c", function + script.stdout + words.format(typed, index)],

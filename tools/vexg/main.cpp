@@ -1,8 +1,4 @@
-#include <algorithm>
 #include <iostream>
-#include <map>
-
-#include <CLI/CLI.hpp>
 
 #include "data/access_policy.h"
 #include "foundation/environment.h"
@@ -10,7 +6,7 @@
 #include "foundation/library.h"
 #include "foundation/near_name.h"
 #include "foundation/thrown.h"
-#include "option_values.h"
+#include "options/command_line.h"
 #include "platform/debug_output.h"
 #include "platform/interrupt.h"
 #include "platform/memory_shortage.h"
@@ -21,17 +17,23 @@
 namespace lumo::host {
 namespace {
 
-struct Verb {
-  const char* summary;
-  VerbRegistration::Setup setup;
+struct GeneralOptions {
+  std::vector<std::string> libraries;
+  bool isLenient = false;
+  OptionSet options;
+
+  GeneralOptions() {
+    options.Add("--load", libraries, "A library of commands to load first; may come again")
+        .IsFile();
+    options.Add("--lenient", isLenient,
+                "Let jobs read what can't be read as 0 or nothing, and pass over unknown names");
+  }
 };
 
-std::map<std::string, Verb>& Verbs() {
-  static std::map<std::string, Verb> verbs;
-  return verbs;
+GeneralOptions& General() {
+  static GeneralOptions general;
+  return general;
 }
-
-bool gIsLenient = false;
 
 /// Loads libraries of commands; what they hold registers itself.
 void LoadLibraries(const std::vector<std::string>& files) {
@@ -46,48 +48,26 @@ void LoadLibraries(const std::vector<std::string>& files) {
 }
 
 int Run(int argc, char** argv) {
-  CLI::App app("Processing core for remote-sensing images: runs jobs of named commands.", "vexg");
-  app.set_version_flag("--version", std::string("vexg ") + GetLibraryVersion());
-  app.require_subcommand(1);
-  app.fallthrough();
-  std::vector<std::string> libraries;
-  app.add_option("--load", libraries, "A library of commands to load first; may come again")
-      ->type_name("FILE")
-      ->allow_extra_args(false);
-
-  app.add_flag("--lenient", gIsLenient,
-               "Let jobs read what can't be read as 0 or nothing, and pass over unknown names");
-
-  std::map<const CLI::App*, VerbRegistration::Work> works;
-  for (const auto& [name, verb] : Verbs()) {
-    CLI::App* const sub = app.add_subcommand(name, verb.summary);
-    works[sub] = verb.setup(*sub);
+  const CommandLine line = ReadCommandLine(std::vector<std::string>(argv + 1, argv + argc));
+  if (line.verb == nullptr) {
+    std::cout << line.text;
+    return kExitSuccess;
   }
-  const std::vector<std::string> arguments =
-      JoinLists(app, std::vector<std::string>(argv + 1, argv + argc));
-  try {
-    std::vector<std::string> line = arguments;
-    std::reverse(line.begin(), line.end());  // as the parser takes them
-    app.parse(line);
-  } catch (const CLI::ParseError& error) {
-    if (error.get_exit_code() == 0) return app.exit(error);  // help or version
-    throw HostError(kExitUsage, DescribeBadLine(app, arguments, error));
-  }
-  LoadLibraries(libraries);
+  LoadLibraries(General().libraries);
   InitEnvironment();
   VEXInit();
   AccessPolicy policy;
   policy.special = false;  // nobody waits for a pipe that nobody writes to
   SetAccessPolicy(policy);
-  const int code = works.at(app.get_subcommands().front())();
+  const int code = line.verb->work();
   if (!std::cout.flush()) throw HostError(kExitFailed, "standard output can't be written");
   return code;
 }
 
 }  // namespace
 
-VerbRegistration::VerbRegistration(const char* name, const char* summary, Setup setup) {
-  Verbs()[name] = {summary, setup};
+const OptionSet& GetGeneralOptions() {
+  return General().options;
 }
 
 void Say(const std::string& line) {
@@ -95,7 +75,7 @@ void Say(const std::string& line) {
 }
 
 bool ChecksAreStrict() {
-  return !gIsLenient;
+  return !General().isLenient;
 }
 
 }  // namespace lumo::host

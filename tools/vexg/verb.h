@@ -3,10 +3,9 @@
 #include <functional>
 #include <stdexcept>
 #include <string>
+#include <vector>
 
-namespace CLI {
-class App;
-}
+#include "options/option.h"
 
 namespace lumo::host {
 
@@ -33,14 +32,31 @@ void Say(const std::string& line);
 /// True unless the user asked for --lenient: jobs have their inputs checked before they run.
 bool ChecksAreStrict();
 
-/// One verb of the command line. A static object beside the verb's code puts it into the list.
+/// The options that stand in front of every verb, or behind it.
+const OptionSet& GetGeneralOptions();
+
+/// One verb of the command line.
+struct Verb {
+  std::string name;
+  std::string summary;  ///< one line for the list of verbs
+  OptionSet options;
+  std::function<int()> work;  ///< runs when the verb was chosen; gives the exit code, may throw
+};
+
+/// All verbs, by name. Their options are set up by the first call.
+const std::vector<Verb>& GetVerbs();
+
+/// The verb of a name; null for none.
+const Verb* FindVerb(const std::string& name);
+
+/// Puts a verb into the list. A static object beside the verb's code does it.
 ///
-/// `setup` adds options to the verb's part of the command line and gives the function that does the
-/// work, which runs when the verb was chosen and gives the exit code. It may throw HostError.
+/// `setup` adds the verb's options and gives the function that does the work, which runs when the
+/// verb was chosen and gives the exit code. It may throw HostError.
 class VerbRegistration {
  public:
   using Work = std::function<int()>;
-  using Setup = Work (*)(CLI::App& app);
+  using Setup = Work (*)(OptionSet& line);
 
   VerbRegistration(const char* name, const char* summary, Setup setup);
 };

@@ -10,6 +10,7 @@
 
 #include "common/hdf5_files.h"
 #include "foundation/fault.h"
+#include "foundation/text_case.h"
 #include "platform/memory_shortage.h"
 
 namespace lumo::gdal {
@@ -17,9 +18,7 @@ namespace {
 
 /// True for a text that holds one of the pieces, whatever the case of its letters.
 bool HoldsOneOf(const char* text, std::initializer_list<std::string_view> pieces) {
-  std::string lower(text);
-  std::transform(lower.begin(), lower.end(), lower.begin(),
-                 [](unsigned char c) { return static_cast<char>(std::tolower(c)); });
+  const std::string lower = LowerCase(text);
   return std::any_of(pieces.begin(), pieces.end(),
                      [&](std::string_view piece) { return lower.find(piece) != lower.npos; });
 }

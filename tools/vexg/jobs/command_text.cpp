@@ -1,0 +1,173 @@
+#include "jobs/command_text.h"
+
+#include <algorithm>
+#include <map>
+#include <string_view>
+#include <vector>
+
+#include <fmt/format.h>
+#include <fmt/ranges.h>
+#include <nlohmann/json.hpp>
+
+#include "commands/command.h"
+
+namespace lumo::host {
+namespace {
+
+using Group = std::vector<const CommandDeclaration*>;
+
+/// All registered commands by group, each group by name.
+std::map<std::string, Group> Groups() {
+  std::map<std::string, Group> groups;
+  for (const auto& [name, factory] : GetCommandRegistry()) {
+    const CommandDeclaration& command = factory->GetDeclaration();
+    groups[command.group].push_back(&command);
+  }
+  return groups;
+}
+
+std::string KindOf(ValueKind kind, const char* unit) {
+  return *unit == 0 ? Describe(kind).name : fmt::format("{} in {}", Describe(kind).name, unit);
+}
+
+const char* PresenceWord(Presence presence) {
+  return presence == Presence::kRequired ? "required" : "optional";
+}
+
+std::size_t WidestName(const CommandDeclaration& command) {
+  std::size_t widest = 0;
+  for (const auto& input : command.inputs)
+    widest = std::max(widest, std::string(input.name).size());
+  for (const auto& output : command.outputs) {
+    widest = std::max(widest, std::string(output.name).size());
+  }
+  return widest;
+}
+
+nlohmann::ordered_json AsJson(const CommandDeclaration& command) {
+  nlohmann::ordered_json inputs = nlohmann::ordered_json::array();
+  for (const InputDeclaration& input : command.inputs) {
+    inputs.push_back(
+        {{"name", input.name},
+         {"required", input.presence == Presence::kRequired},
+         {"kind", Describe(input.kind).name},
+         {"form", Describe(input.kind).form},
+         {"unit", input.unit},
+         {"words", input.words == nullptr ? std::vector<const char*>() : input.words()},
+         {"meaning", input.meaning}});
+  }
+  nlohmann::ordered_json outputs = nlohmann::ordered_json::array();
+  for (const OutputDeclaration& output : command.outputs) {
+    outputs.push_back({{"name", output.name},
+                       {"kind", Describe(output.kind).name},
+                       {"form", Describe(output.kind).form},
+                       {"unit", output.unit},
+                       {"returned", output.returned},
+                       {"meaning", output.meaning}});
+  }
+  return {{"name", command.name},
+          {"group", command.group},
+          {"meaning", command.meaning},
+          {"inputs", inputs},
+          {"outputs", outputs}};
+}
+
+std::string AsMarkdown(const CommandDeclaration& command) {
+  std::string text = fmt::format("\n### {}\n\n{}\n", command.name, command.meaning);
+  if (!command.inputs.empty()) text += "\n| Input | | Kind | Meaning |\n|---|---|---|---|\n";
+  for (const InputDeclaration& input : command.inputs) {
+    text += fmt::format("| `{}` | {} | {} | {} |\n", input.name, PresenceWord(input.presence),
+                        KindOf(input.kind, input.unit), input.meaning);
+  }
+  if (!command.outputs.empty()) text += "\n| Output | | Kind | Meaning |\n|---|---|---|---|\n";
+  for (const OutputDeclaration& output : command.outputs) {
+    text += fmt::format("| `{}` | {} | {} | {} |\n", output.name, output.returned ? "returned" : "",
+                        KindOf(output.kind, output.unit), output.meaning);
+  }
+  return text;
+}
+
+/// The words of an input, joined by `separator`; empty for one without.
+std::string JoinWords(const InputDeclaration& input, const char* separator) {
+  return input.words == nullptr ? "" : fmt::format("{}", fmt::join(input.words(), separator));
+}
+
+bool IsToldForm(const InputDeclaration& input) {
+  return input.words != nullptr && std::string_view(input.words().front()) == "Told";
+}
+
+/// The table of the inputs that choose between the told form of a result and a better one.
+std::string ToldFormsAsMarkdown() {
+  std::string text =
+      "\n## Told forms\n\n"
+      "These inputs choose between the form of a result that has always been given, `Told`, and a\n"
+      "better one. Without the input the told form is given; the verbs of the command line ask "
+      "for\n"
+      "the better one.\n\n| Command | Input | Words | Meaning |\n|---|---|---|---|\n";
+  for (const auto& [name, factory] : GetCommandRegistry()) {
+    for (const InputDeclaration& input : factory->GetDeclaration().inputs) {
+      if (!IsToldForm(input)) continue;
+      text += fmt::format("| `{}` | `{}` | {} | {} |\n", factory->GetDeclaration().name, input.name,
+                          JoinWords(input, ", "), input.meaning);
+    }
+  }
+  return text;
+}
+
+}  // namespace
+
+std::string CommandsAsList() {
+  std::string text;
+  for (const auto& [group, commands] : Groups()) {
+    text += fmt::format("{}{}\n", text.empty() ? "" : "\n", group);
+    for (const CommandDeclaration* command : commands) {
+      text += fmt::format("  {:<40} {}\n", command->name, command->meaning);
+    }
+  }
+  return text;
+}
+
+std::string CommandsAsNames() {
+  std::string text;
+  for (const auto& entry : GetCommandRegistry()) text += entry.first.ToUTF8() + "\n";
+  return text;
+}
+
+std::string CommandsAsJson() {
+  nlohmann::ordered_json all = nlohmann::ordered_json::array();
+  for (const auto& entry : GetCommandRegistry())
+    all.push_back(AsJson(entry.second->GetDeclaration()));
+  return all.dump(2) + "\n";
+}
+
+std::string CommandsAsMarkdown() {
+  std::string text =
+      "# Commands\n\n"
+      "Made by `vexg commands --markdown` from what the commands declare. How their values are\n"
+      "written as text is told in [job-documents.md](job-documents.md).\n";
+  for (const auto& [group, commands] : Groups()) {
+    text += fmt::format("\n## {}\n", group);
+    for (const CommandDeclaration* command : commands) text += AsMarkdown(*command);
+  }
+  return text + ToldFormsAsMarkdown();
+}
+
+std::string CommandAsHelp(const CommandDeclaration& command) {
+  const std::size_t width = WidestName(command);
+  std::string text = fmt::format("{}: {}\n", command.name, command.meaning);
+  if (!command.inputs.empty()) text += "\nInputs, in the order in which they are checked:\n";
+  for (const InputDeclaration& input : command.inputs) {
+    text +=
+        fmt::format("  {:<{}}  {}, {} ({}): {}\n", input.name, width, PresenceWord(input.presence),
+                    KindOf(input.kind, input.unit), Describe(input.kind).form, input.meaning);
+  }
+  if (!command.outputs.empty()) text += "\nOutputs:\n";
+  for (const OutputDeclaration& output : command.outputs) {
+    text +=
+        fmt::format("  {:<{}}  {}: {}{}\n", output.name, width, KindOf(output.kind, output.unit),
+                    output.meaning, output.returned ? "" : " (not in the result document)");
+  }
+  return text;
+}
+
+}  // namespace lumo::host

@@ -1,0 +1,180 @@
+#include "options/verb_text.h"
+
+#include <fmt/format.h>
+#include <fmt/ranges.h>
+#include <nlohmann/json.hpp>
+
+#include "foundation/library.h"
+
+namespace lumo::host {
+namespace {
+
+using Json = nlohmann::ordered_json;
+
+Json OptionAsJson(const OptionSpec& option) {
+  Json json{{"names", option.names}, {"type", NameOf(option.type)}};
+  if (!option.shown.empty()) json["shown"] = option.shown;
+  if (!option.unit.empty()) json["unit"] = option.unit;
+  if (!option.choices.empty()) json["choices"] = option.choices;
+  if (option.least) json["least"] = *option.least;
+  if (option.most) json["most"] = *option.most;
+  if (!option.defaultText.empty()) json["default"] = option.defaultText;
+  if (!option.example.empty()) json["example"] = option.example;
+  json["required"] = option.isRequired;
+  json["repeatable"] = option.isRepeatable;
+  json["list"] = option.isList;
+  json["help"] = option.help;
+  return json;
+}
+
+Json OptionsAsJson(const OptionSet& options) {
+  Json list = Json::array();
+  for (const OptionSpec& option : options.Options()) list.push_back(OptionAsJson(option));
+  return list;
+}
+
+/// Lets a text stand in a manual page: a backslash is an escape there, a dot or quote at the start
+/// of a line a request, and a plain dash may be broken or replaced.
+std::string Troff(const std::string& text) {
+  std::string escaped;
+  for (const char c : text) {
+    if (c == '\\' || c == '-') escaped += '\\';
+    escaped += c == '\\' ? 'e' : c;
+  }
+  return escaped.starts_with('.') || escaped.starts_with('\'') ? "\\&" + escaped : escaped;
+}
+
+std::string ShownInManual(const OptionSpec& option) {
+  std::string text =
+      fmt::format("\\fB{}\\fR", Troff(fmt::format("{}", fmt::join(option.names, ", "))));
+  if (option.type == OptionType::kFlag || option.IsByPlace()) return text;
+  const std::string value = !option.shown.empty() ? option.shown
+                            : !option.choices.empty()
+                                ? fmt::format("{}", fmt::join(option.choices, "|"))
+                                : std::string("VALUE");
+  return text + " \\fI" + Troff(value) + "\\fR";
+}
+
+std::string OptionAsManual(const OptionSpec& option) {
+  std::string text = ".TP\n" + ShownInManual(option) + "\n" + Troff(option.help) + ".";
+  if (!option.choices.empty() && !option.shown.empty()) {
+    text += " One of " + Troff(fmt::format("{}", fmt::join(option.choices, ", "))) + ".";
+  }
+  if (option.least) text += fmt::format(" From {} to {}.", *option.least, *option.most);
+  if (!option.unit.empty()) text += " In " + Troff(option.unit) + ".";
+  if (!option.defaultText.empty()) text += " By default " + Troff(option.defaultText) + ".";
+  if (!option.example.empty()) text += " For example " + Troff(option.example) + ".";
+  return text + "\n";
+}
+
+std::string HeadOfManual(const std::string& name, const std::string& summary) {
+  return fmt::format(".TH {} 1 \"\" \"vexg {}\"\n.SH NAME\n{} \\- {}\n", name, GetLibraryVersion(),
+                     Troff(name), Troff(summary));
+}
+
+std::string ManualOf(const Verb& verb) {
+  std::string text = HeadOfManual("vexg-" + verb.name, verb.summary);
+  text += ".SH SYNOPSIS\n.B vexg " + Troff(verb.name) + "\n[\\fIOPTIONS\\fR]";
+  for (const OptionSpec& option : verb.options.Options()) {
+    if (!option.IsByPlace()) continue;
+    const std::string name = "\\fI" + Troff(option.Name()) + "\\fR";
+    text += option.isRequired ? " " + name : " [" + name + "]";
+    if (option.isRepeatable) text += " ...";
+  }
+  text += "\n.SH DESCRIPTION\n";
+  for (const std::string& note : verb.options.Notes()) text += ".PP\n" + Troff(note) + "\n";
+  text += ".SH OPTIONS\n";
+  for (const OptionSpec& option : verb.options.Options()) text += OptionAsManual(option);
+  for (const OptionSpec& option : GetGeneralOptions().Options()) text += OptionAsManual(option);
+  text += ".SH EXAMPLES\n";
+  for (const std::string& example : verb.options.Examples()) {
+    text += ".PP\n.nf\n" + Troff(example) + "\n.fi\n";
+  }
+  return text +
+         ".SH EXIT STATUS\n0 for success, 1 when a command failed, 2 for a wrong command "
+         "line or document, 3 when no server answers.\n.SH SEE ALSO\n.BR vexg (1)\n";
+}
+
+}  // namespace
+
+std::string VerbsAsJson() {
+  Json verbs = Json::array();
+  for (const Verb& verb : GetVerbs()) {
+    verbs.push_back({{"name", verb.name},
+                     {"summary", verb.summary},
+                     {"options", OptionsAsJson(verb.options)},
+                     {"notes", verb.options.Notes()},
+                     {"examples", verb.options.Examples()}});
+  }
+  const Json all{{"version", GetLibraryVersion()},
+                 {"options", OptionsAsJson(GetGeneralOptions())},
+                 {"verbs", verbs}};
+  return all.dump(2) + "\n";
+}
+
+std::string VerbAsManual(const Verb* verb) {
+  if (verb != nullptr) return ManualOf(*verb);
+  std::string text = HeadOfManual("vexg", "processing core for remote-sensing images");
+  text += ".SH SYNOPSIS\n.B vexg\n[\\fIOPTIONS\\fR] \\fIVERB\\fR ...\n.SH OPTIONS\n";
+  for (const OptionSpec& option : GetGeneralOptions().Options()) text += OptionAsManual(option);
+  text += ".SH VERBS\n";
+  for (const Verb& each : GetVerbs()) {
+    text += ".TP\n.BR vexg\\-" + Troff(each.name) + " (1)\n" + Troff(each.summary) + ".\n";
+  }
+  return text;
+}
+
+std::string VerbsAsBashCompletion() {
+  const auto longNames = [](const OptionSet& options) {
+    std::string names;
+    for (const OptionSpec& option : options.Options()) {
+      if (!option.IsByPlace()) names += " " + option.Name();
+    }
+    return names;
+  };
+  std::string verbs = longNames(GetGeneralOptions()) + " --help --version", values, options;
+  for (const Verb& verb : GetVerbs()) {
+    verbs += " " + verb.name;
+    options += fmt::format("    {}) words=\"--help{}\" ;;\n", verb.name, longNames(verb.options));
+    for (const OptionSpec& option : verb.options.Options()) {
+      if (option.choices.empty()) continue;
+      // The first argument by its place stands behind the verb.
+      const std::string before = option.IsByPlace() ? verb.name : option.Name();
+      values += fmt::format("    \"{} {}\") words=\"{}\" ;;\n", verb.name, before,
+                            fmt::join(option.choices, " "));
+    }
+  }
+  return R"sh(# Completion of vexg for bash: eval "$(vexg completion bash)"
+_vexg() {
+  local current=${COMP_WORDS[COMP_CWORD]} before=${COMP_WORDS[COMP_CWORD-1]} verb=${COMP_WORDS[1]}
+  local words=
+  if ((COMP_CWORD == 1)); then
+    COMPREPLY=($(compgen -W ")sh" +
+         verbs + R"sh(" -- "$current"))
+    return
+  fi
+  if [[ $current == = ]]; then current=; elif [[ $before == = ]]; then before=${COMP_WORDS[COMP_CWORD-2]}; fi
+  if [[ $verb == help && $current != -* ]]; then
+    words=$("${COMP_WORDS[0]}" commands --names)
+  fi
+  case "$verb $before" in
+)sh" + values +
+         R"sh(  esac
+  if [[ -n $words ]]; then
+    COMPREPLY=($(compgen -W "$words" -- "$current"))
+    return
+  fi
+  case $verb in
+)sh" + options +
+         R"sh(  esac
+  if [[ $current == -* ]]; then
+    COMPREPLY=($(compgen -W "$words" -- "$current"))
+  else
+    COMPREPLY=($(compgen -f -- "$current"))
+  fi
+}
+complete -F _vexg vexg
+)sh";
+}
+
+}  // namespace lumo::host

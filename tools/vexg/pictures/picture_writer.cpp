@@ -1,0 +1,83 @@
+#include "pictures/picture_writer.h"
+
+#include <filesystem>
+#include <vector>
+
+#include "pictures/jpeg_writer.h"
+#include "pictures/png_writer.h"
+#include "verb.h"
+
+namespace lumo::host {
+namespace {
+
+/// A JPEG of a picture that may have alpha.
+class OpaquePicture final : public PictureWriter {
+ public:
+  OpaquePicture(const OutputFile& output, unsigned width, unsigned height, unsigned channels)
+      : shown_(output.GetShownName()),
+        width_(width),
+        colors_(channels < 3 ? 1 : 3),
+        hasAlpha_(channels % 2 == 0),
+        writer_(MakeJpegWriter(output, width, height, colors_)),
+        opaque_(std::size_t{width} * colors_) {}
+
+  void WriteLine(const unsigned char* line) override {
+    if (!hasAlpha_) {
+      writer_->WriteLine(line);
+      return;
+    }
+    for (std::size_t x = 0; x < width_; ++x, line += colors_ + 1) {
+      constexpr unsigned char kWhite = 255;
+      const bool isOpaque = line[colors_] != 0;
+      for (std::size_t i = 0; i < colors_; ++i) {
+        opaque_[x * colors_ + i] = isOpaque ? line[i] : kWhite;
+      }
+    }
+    writer_->WriteLine(opaque_.data());
+  }
+
+  void Close() override {
+    writer_->Close();
+    if (!hasAlpha_) return;
+    Say(shown_ + ": note: a JPEG has no transparent pixels: those that are not valid are white");
+  }
+
+ private:
+  const std::string shown_;
+  const unsigned width_;
+  const unsigned colors_;
+  const bool hasAlpha_;
+  const std::unique_ptr<PictureWriter> writer_;
+  std::vector<unsigned char> opaque_;
+};
+
+enum class Format { kNone, kPng, kJpeg };
+
+Format FormatOf(const std::string& name) {
+  std::string ending = std::filesystem::path(name).extension().string();
+  for (char& c : ending) {
+    if (c >= 'A' && c <= 'Z') c = static_cast<char>(c - 'A' + 'a');
+  }
+  return ending == ".png"                        ? Format::kPng
+         : ending == ".jpg" || ending == ".jpeg" ? Format::kJpeg
+                                                 : Format::kNone;
+}
+
+}  // namespace
+
+void CheckPictureName(const std::string& name) {
+  if (FormatOf(name) != Format::kNone) return;
+  throw HostError(kExitUsage, name + ": a picture is named .png, .jpg or .jpeg");
+}
+
+std::unique_ptr<PictureWriter> MakePictureWriter(const OutputFile& output, unsigned width,
+                                                 unsigned height, unsigned channels) {
+  CheckPictureName(output.GetShownName());
+  if (FormatOf(output.GetShownName()) == Format::kPng) {
+    constexpr unsigned kBits = 8;
+    return MakePngWriter(output, width, height, channels, kBits);
+  }
+  return std::make_unique<OpaquePicture>(output, width, height, channels);
+}
+
+}  // namespace lumo::host

@@ -1,0 +1,62 @@
+#pragma once
+
+#include <string>
+#include <vector>
+
+#include "options/option.h"
+#include "output/output_file.h"
+#include "rasters/raster_source.h"
+
+namespace lumo::host {
+
+/// A raster file to make, as the command line names it.
+struct TargetOptions {
+  std::string output;
+  std::string format;   ///< key; empty: as the name's ending tells
+  bool strict = false;  ///< what the format does not keep is a failure
+
+  /// @param meaning  what the file is, for the help.
+  void AddTo(OptionSet& line, const std::string& meaning);
+};
+
+/// The key of the format to make. Throws HostError for none that is known.
+std::string ChooseFormat(const TargetOptions& target);
+
+/// Bytes that a raster of this size, bands and pixel type takes at least in a file of this format;
+/// 0 for a format that makes them smaller by nobody knows how much.
+std::uint64_t BytesInFile(const std::string& format, const RasterInfo& raster);
+
+/// A format that a raster is made in, and where.
+struct TargetPlace {
+  std::string file;
+  std::string format;
+};
+
+/// Adds the command that makes a raster, into the variable "$target". Further inputs are the
+/// caller's.
+/// @param like  a variable or URI: the raster whose description is the start.
+/// @param details  which of its details the raster gets: a word of KeptDetails.
+/// @param noData   of the first bands; others have that of the description.
+JobWriterCommand& AddCreate(JobDraft& draft, const TargetPlace& place, const String& like,
+                            const char* details, const std::vector<double>& noData);
+
+/// Adds the command that ends the making of "$target".
+void AddCloseTarget(JobDraft& draft);
+
+constexpr const char* kCloseTargetStep = "close.target";
+
+/// Throws HostError when the closing of a raster told a fault.
+/// @param step  that closed it; what AddCloseTarget added by default.
+void CheckClosed(const JobResults& results, const char* step = kCloseTargetStep);
+
+/// Throws HostError when a raster that was made isn't of the size, bands and pixel type that were
+/// wanted.
+/// @param shown  what the user calls the file.
+void CheckSame(const RasterInfo& made, const RasterInfo& wanted, const std::string& format,
+               const std::string& shown);
+
+/// Progress of the step of this name, of a draft whose steps run one after the other.
+ProgressReportPtr ProgressOfStep(const JobSession& session, const JobDraft& draft,
+                                 const std::string& name);
+
+}  // namespace lumo::host

@@ -1,0 +1,104 @@
+#include "rasters/raster_verb.h"
+
+#include "rasters/raster_target.h"
+
+namespace lumo::host {
+
+JobWriterCommand& RasterChain::AddView(const std::string& name, const char* command) {
+  JobWriterCommand& view = draft_.Open(name, command);
+  view.AddVariableInput("SrcURI", GetTop());
+  Take(name);
+  return view;
+}
+
+void RasterChain::Close() {
+  for (auto raster = opened_.rbegin(); raster != opened_.rend(); ++raster) {
+    draft_.Close("close." + raster->ToUTF8().substr(1), *raster);
+  }
+}
+
+void RasterVerb::AddFilesTo(OptionSet& line, const std::string& meaning) {
+  GetSource().AddTo(line);
+  target_.AddTo(line, meaning);
+  AddOverwriteTo(line, "files that are there");
+}
+
+void RasterVerb::AddSource(RasterChain& chain) const {
+  AddOpen(chain.GetDraft(), "source", GetSource());
+  chain.Take("source");
+}
+
+void RasterVerb::AddMaking(JobDraft& draft, const String& shown, const FillValues& noData) const {
+  JobWriterCommand& copy = draft.Step(kMakeStep, "CopyRasterCommand");
+  copy.AddVariableInput("SrcURI", shown);
+  copy.AddVariableInput("DstURI", "$target");
+  copy.AddInput("Invalid", String(FillsNoData(noData) ? "NoData" : "Told"));
+}
+
+RasterContents RasterVerb::ReadWanted(const JobResults& results) const {
+  RasterContents wanted = ReadContents(results, kShown);
+  wanted.valid = ReadValidPixels(results, kMakeStep);
+  return wanted;
+}
+
+void RasterVerb::CheckOptions() {
+  format_ = ChooseFormat(target_);
+}
+
+void RasterVerb::AddOpening(JobDraft& draft) const {
+  RasterChain chain(draft);
+  AddSource(chain);
+  AddQuery(draft, kShown, chain.GetTop());
+  AddQuestions(draft);
+}
+
+void RasterVerb::Plan(JobSession& session, const JobResults& opened) {
+  planned_ = PlanRaster(session, opened, ReadInfo(opened, kShown));
+}
+
+std::uint64_t RasterVerb::GetBytes(std::size_t /*output*/) const {
+  return BytesInFile(format_, planned_);
+}
+
+/// The making as a whole: opens the source, stands views on it, makes the file and closes all.
+JobDraft RasterVerb::MakeDraft(const std::string& file, const FillValues& noData) const {
+  JobDraft draft;
+  RasterChain chain(draft);
+  AddSource(chain);
+  AddViews(chain);
+  const String shown = chain.GetTop();
+  AddQuery(draft, kShown, shown);
+  AddDetailsQuery(draft, kShown, shown);
+  AddToCreate(draft, AddCreate(draft, {file, format_}, shown, GetKeptDetails(), GetNoData(noData)));
+  AddMaking(draft, shown, noData);
+  AddCloseTarget(draft);
+  AddLastQuestions(draft, shown);
+  chain.Close();
+  return draft;
+}
+
+JobDraft RasterVerb::GetJob(const Outputs& outputs) const {
+  return MakeDraft(outputs.Get(0).GetName(), {});
+}
+
+void RasterVerb::Make(JobSession& session, const Outputs& outputs) {
+  const OutputFile& output = outputs.Get(0);
+  Losses losses(output.GetShownName(), format_, target_.strict);
+  MadeRaster raster = MakeKept(
+      session, {output.GetWorkName(), format_}, losses, MayChooseNoData(),
+      [&](const FillValues& noData) {
+        const JobDraft draft = MakeDraft(output.GetWorkName(), noData);
+        JobResults results;
+        {
+          const ProgressView view(ProgressOfStep(session, draft, kMakeStep), GetProgressStyle());
+          results = session.Run(draft);
+        }
+        CheckClosed(results);
+        return ReadWanted(results);
+      });
+  Compare(raster, losses);
+  session.CheckInterrupt();
+  losses.Settle();
+}
+
+}  // namespace lumo::host

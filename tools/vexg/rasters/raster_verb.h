@@ -1,0 +1,132 @@
+#pragma once
+
+#include <string>
+#include <vector>
+
+#include "output/keeping.h"
+#include "rasters/file_verb.h"
+
+namespace lumo::host {
+
+/// Rasters of a job that stand on one another, from the source upwards.
+class RasterChain {
+ public:
+  explicit RasterChain(JobDraft& draft) : draft_(draft) {}
+
+  /// The variable of the uppermost raster.
+  const String& GetTop() const { return opened_.back(); }
+
+  /// Adds the command that stands a view on the uppermost raster. Further inputs are the caller's.
+  /// @param name  of the variable, without "$".
+  JobWriterCommand& AddView(const std::string& name, const char* command);
+
+  /// Takes a raster in that other commands of the draft have opened, as the uppermost.
+  void Take(const std::string& name) { opened_.emplace_back("$" + name); }
+
+  JobDraft& GetDraft() { return draft_; }
+
+  /// Adds the commands that close all, the uppermost first.
+  void Close();
+
+ private:
+  JobDraft& draft_;
+  std::vector<String> opened_;
+};
+
+/// A verb that makes a raster file out of a raster.
+///
+/// The verb says what stands on the source, as commands; making the file, keeping what is known of
+/// the pixels, comparing the file with what was put in, and all that FileVerb does, is done here.
+/// The whole of a verb that masks a raster by another one:
+///
+/// ```
+/// class MaskVerb final : public RasterVerb {
+///  public:
+///   explicit MaskVerb(OptionSet& line) : RasterVerb(line, "The masked raster") {
+///     line.Add("--by", mask_, "The mask").IsFile().Required();
+///   }
+///
+///  private:
+///   std::vector<std::string> GetFurtherInputs() const override { return {mask_}; }
+///   RasterInfo PlanRaster(JobSession&, const JobResults&, const RasterInfo& source) override {
+///     return source;  // of the same size, bands and pixel type
+///   }
+///   void AddViews(RasterChain& chain) const override {
+///     AddOpen(chain.GetDraft(), "mask", {mask_, ""});
+///     chain.AddView("masked", "CreateMaskRasterCommand").AddVariableInput("MaskURI", "$mask");
+///     chain.GetDraft().Close("close.mask", "$mask");
+///   }
+///
+///   std::string mask_;
+/// };
+///
+/// const VerbRegistration registration("mask", "Leaves out what a mask tells", &SetUp<MaskVerb>);
+/// ```
+class RasterVerb : public FileVerb {
+ protected:
+  /// Adds the raster and the output to the command line.
+  /// @param meaning  what the output is, for the help.
+  RasterVerb(OptionSet& line, const std::string& meaning) { AddFilesTo(line, meaning); }
+  /// Leaves that to a verb that has something in front of them.
+  RasterVerb() = default;
+  void AddFilesTo(OptionSet& line, const std::string& meaning);
+
+  // A verb says what is made:
+
+  /// Decides what is made of the source.
+  /// @param opened  what the commands of AddOpening gave.
+  /// @return the size, bands and pixel type of what is made. Throws HostError.
+  virtual RasterInfo PlanRaster(JobSession& session, const JobResults& opened,
+                                const RasterInfo& source) = 0;
+  /// Adds the views that show what is made; none by default.
+  virtual void AddViews(RasterChain& /*chain*/) const {}
+
+  // It may say more:
+
+  /// Opens the source for the chain.
+  virtual void AddSource(RasterChain& chain) const;
+  /// Adds what is to be known before the plan is made, beside the raster.
+  virtual void AddQuestions(JobDraft& /*draft*/) const {}
+  /// Which of the details of what is shown the file gets: a word of KeptDetails.
+  virtual const char* GetKeptDetails() const { return "All"; }
+  /// Adds inputs to the command that makes the file, and commands behind it.
+  virtual void AddToCreate(JobDraft& /*draft*/, JobWriterCommand& /*create*/) const {}
+  /// Adds the step kMakeStep, which fills "$target"; by default a copy of what is shown.
+  /// @param noData  as they were chosen for bands, in the place of pixels that are not valid.
+  virtual void AddMaking(JobDraft& draft, const String& shown, const FillValues& noData) const;
+  /// Whether a copy has the no-data value of the file in the place of pixels that are not valid.
+  virtual bool FillsNoData(const FillValues& noData) const { return !noData.empty(); }
+  /// Whether pixels that are not valid may get a no-data value where the format has nothing else.
+  virtual bool MayChooseNoData() const { return true; }
+  /// The no-data values of the file, where these were chosen; none for those of what is shown.
+  virtual FillValues GetNoData(const FillValues& chosen) const { return chosen; }
+  /// Adds commands that ask the raster that is shown, when the file is made.
+  virtual void AddLastQuestions(JobDraft& /*draft*/, const String& /*shown*/) const {}
+  /// Reads from the results of the job what the file shall hold.
+  virtual RasterContents ReadWanted(const JobResults& results) const;
+  /// Adds what the format did not keep to the losses.
+  virtual void Compare(MadeRaster& raster, Losses& losses) const { CompareKept(raster, losses); }
+
+  static constexpr const char* kMakeStep = "make";
+  /// Name of what is shown in queries.
+  static constexpr const char* kShown = "shown";
+
+  const std::string& GetFormat() const { return format_; }
+
+  void CheckOptions() override;
+
+ private:
+  std::vector<std::string> GetOutputs() const final { return {target_.output}; }
+  void AddOpening(JobDraft& draft) const final;
+  void Plan(JobSession& session, const JobResults& opened) final;
+  JobDraft GetJob(const Outputs& outputs) const final;
+  std::uint64_t GetBytes(std::size_t output) const final;
+  void Make(JobSession& session, const Outputs& outputs) final;
+  JobDraft MakeDraft(const std::string& file, const FillValues& noData) const;
+
+  TargetOptions target_;
+  std::string format_;
+  RasterInfo planned_;
+};
+
+}  // namespace lumo::host

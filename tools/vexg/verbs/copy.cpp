@@ -1,0 +1,136 @@
+#include <fmt/format.h>
+
+#include "foundation/color.h"
+#include "options/option_values.h"
+#include "pictures/palette_reading.h"
+#include "raster/pixel_types.h"
+#include "rasters/raster_verb.h"
+
+namespace lumo::host {
+namespace {
+
+/// A colour table of the copy.
+struct BandPalette {
+  unsigned band;
+  Palette palette;
+};
+
+class CopyVerb final : public RasterVerb {
+ public:
+  explicit CopyVerb(OptionSet& line) : RasterVerb(line, "The copy") {
+    line.AddNote(
+        "The copy keeps which pixels are valid, pixel type, no-data values, geo-reference, "
+        "palettes, names, units and scales of bands and metadata items, as far as its format can; "
+        "what it can't is said, and with --strict a failure.");
+    line.AddExample("vexg copy scene.tif part.dat --format ORVA --rect 0,0,99,49 --bands 2,1,0");
+    line.Add("--rect", rectText_,
+             "Pixels: left,top,right,bottom, from 0, inclusive; all by default")
+        .Shows("L,T,R,B")
+        .Example("0,0,511,511");
+    line.Add("--bands", bandsText_, "Bands in the order wanted, from 0; all by default")
+        .Shows("B,B...")
+        .Example("3,2,1");
+    line.Add("--level", level_,
+             "Level of its pyramid: 0 the raster itself, each further one half the size")
+        .Within(0, 31)
+        .ShowsDefault();
+    line.Add("--interleave", interleave_, "Order of the pixels in the copy")
+        .Takes(OneOf({"bip", "bil", "bsq"}));
+    line.Add("--type", type_, "Pixel type that the source has to have")
+        .Shows("TYPE")
+        .Takes(PixelTypeName());
+  }
+
+ private:
+  void AddSource(RasterChain& chain) const override {
+    if (level_ == 0) {
+      RasterVerb::AddSource(chain);
+      return;
+    }
+    AddOpenWithPyramid(chain.GetDraft(), "source", GetSource());
+    chain.Take("source");
+    AddLevel(chain.GetDraft(), "level", "$source", level_);
+    chain.Take("level");
+  }
+
+  RasterInfo PlanRaster(JobSession& session, const JobResults& opened,
+                        const RasterInfo& source) override {
+    if (!type_.empty() && DataTypeName(source.dataType) != String(type_)) {
+      throw HostError(kExitUsage, fmt::format("--type: the pixels are {}, and a copy does not "
+                                              "change their type to {}",
+                                              DataTypeName(source.dataType).ToUTF8(), type_));
+    }
+    rect_ = ParseRect(rectText_, source);
+    isPart_ = !(rect_ == source.GetRect());
+    bands_ = ParseBands(bandsText_, source);
+    ReadPalettes(session,
+                 level_ == 0 ? opened.Find("source").returns.Find("URI")
+                             : opened.Find("level").returns.Find("PyramidURI"),
+                 source);
+    RasterInfo planned = source;
+    planned.samples = rect_.Width();
+    planned.lines = rect_.Height();
+    planned.bands = bands_.GetCount();
+    return planned;
+  }
+
+  /// Reads the palettes of the bands that are copied, by their place in the copy.
+  void ReadPalettes(JobSession& session, const String& raster, const RasterInfo& source) {
+    for (unsigned i = 0; i < bands_.GetCount(); ++i) {
+      if (!source.hasPalette[bands_[i]]) continue;
+      palettes_.push_back({i, ReadPalette(session, raster, bands_[i])});
+    }
+  }
+
+  void AddViews(RasterChain& chain) const override {
+    if (isPart_) {
+      JobWriterCommand& view = chain.AddView("part", "CreateSpatialSubsetRasterCommand");
+      view.AddInput("SubRect", rect_);
+      view.AddInput("Placing", Form::kExact);
+    }
+    if (!bandsText_.empty()) {
+      AddBandView(chain.GetDraft(), "bands", chain.GetTop(), bands_);
+      chain.Take("bands");
+    }
+  }
+
+  void AddToCreate(JobDraft& draft, JobWriterCommand& create) const override {
+    if (!interleave_.empty()) create.AddInput("Interleave", ParseInterleave(interleave_));
+    for (const BandPalette& entry : palettes_) {
+      JobWriterCommand& set =
+          draft.Step("palette" + std::to_string(entry.band), "SetRasterPaletteCommand");
+      set.AddInput("URI", String("$target"));
+      set.AddInput("Band", entry.band);
+      set.AddInput("Palette", entry.palette);
+    }
+  }
+
+  void Compare(MadeRaster& raster, Losses& losses) const override {
+    CompareKept(raster, losses);
+    const RasterInfo& made = raster.made.info;
+    for (const BandPalette& entry : palettes_) {
+      if (!made.hasPalette[entry.band]) {
+        losses.Add("the palette of band " + std::to_string(entry.band));
+      }
+    }
+    const bool isOrdered = !interleave_.empty() && made.bands > 1;
+    if (isOrdered && made.interleave != ParseInterleave(interleave_)) {
+      losses.Add("the order " + interleave_);
+    }
+    if (GetFormat() == "JPEG") losses.Add("the values of pixels exactly");
+  }
+
+  std::string rectText_, bandsText_, interleave_, type_;
+  unsigned level_ = 0;  // of the source's pyramid; 0: the source itself
+
+  SubRect rect_;
+  bool isPart_ = false;  // the rectangle isn't the whole raster
+  Array<unsigned> bands_;
+  std::vector<BandPalette> palettes_;
+};
+
+const VerbRegistration registration(
+    "copy", "Copies a raster into a new file, of the same or another format", &SetUp<CopyVerb>);
+
+}  // namespace
+}  // namespace lumo::host

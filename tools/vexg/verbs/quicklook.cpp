@@ -1,0 +1,159 @@
+#include <algorithm>
+#include <charconv>
+#include <cstdlib>
+
+#include "pictures/block_reader.h"
+#include "pictures/palette_reading.h"
+#include "pictures/picture_writer.h"
+#include "pictures/quicklook_picture.h"
+#include "rasters/file_verb.h"
+
+namespace lumo::host {
+namespace {
+
+/// "none", or two percentiles.
+QuicklookPicture::Stretch ParseStretch(const std::string& text) {
+  QuicklookPicture::Stretch stretch;
+  if (text.empty()) return stretch;
+  stretch.isPercentile = text != "none";
+  if (!stretch.isPercentile) return stretch;
+  char* end = nullptr;
+  stretch.low = std::strtod(text.c_str(), &end);
+  bool isGood = end != text.c_str() && *end == ',';
+  if (isGood) {
+    const char* const second = end + 1;
+    stretch.high = std::strtod(second, &end);
+    isGood = end != second && *end == '\0' && stretch.low >= 0.0 && stretch.high <= 100.0 &&
+             stretch.low < stretch.high;
+  }
+  if (isGood) return stretch;
+  throw HostError(kExitUsage,
+                  "--stretch: \"" + text + "\" is neither none nor two percentiles such as 2,98");
+}
+
+/// The bands shown: those asked for, else red, green and blue where there are three or more.
+Array<unsigned> ChooseBands(const std::string& text, const RasterInfo& info) {
+  std::string chosen = text;
+  if (chosen.empty()) chosen = info.bands > 3 ? "2,1,0" : info.bands == 3 ? "0,1,2" : "0";
+  const Array<unsigned> bands = ParseBands(chosen, info);
+  if (bands.GetCount() == 1 || bands.GetCount() == 3) return bands;
+  throw HostError(kExitUsage, "--bands: a picture shows one band or three");
+}
+
+/// The smallest level of the pyramid that is as large as the picture; 0 for the raster itself.
+unsigned ChooseLevel(const RasterInfo& info, unsigned size) {
+  if (!info.hasPyramid) return 0;
+  const unsigned longer = std::max(info.samples, info.lines);
+  unsigned level = info.levelMax;
+  while (level >= std::max(info.levelMin, 1U) && (longer >> level) < size) --level;
+  const bool isThere = level >= info.levelMin && (std::min(info.samples, info.lines) >> level) != 0;
+  return isThere ? level : 0;
+}
+
+class QuicklookVerb final : public FileVerb {
+ public:
+  explicit QuicklookVerb(OptionSet& line) : FileVerb(line) {
+    line.AddNote(
+        "A band with a palette shows its colours, unless --stretch is given. Pixels without data "
+        "are transparent; in a JPEG white.");
+    line.AddExample("vexg quicklook scene.tif scene.png --bands 3,2,1 --stretch 1,99");
+    line.Add("output", output_, "The picture, a PNG or JPEG as its name tells")
+        .IsFile("OUT.png|jpg")
+        .Required();
+    line.Add("--bands", bandsText_,
+             "One band, or red,green,blue; by default 2,1,0 of four bands or more, 0,1,2 of "
+             "three, else 0")
+        .Shows("B[,B,B]");
+    line.Add("--stretch", stretchText_,
+             "Percentiles of each band that become black and white, 2,98 by default; or "
+             "none, to cut values to 0 and 255")
+        .Shows("LO,HI")
+        .Example("0,3000");
+    line.Add("--size", size_, "Pixels of the longer side at most").Within(1, 16384).ShowsDefault();
+    AddOverwriteTo(line, "a file that is there");
+  }
+
+ private:
+  void CheckOptions() override {
+    stretch_ = ParseStretch(stretchText_);
+    CheckPictureName(output_);
+  }
+
+  std::vector<std::string> GetOutputs() const override { return {output_}; }
+
+  void AddOpening(JobDraft& draft) const override {
+    AddOpenWithPyramid(draft, "raster", GetSource());
+    AddQuery(draft, "raster", "$raster");
+  }
+
+  void Plan(JobSession& session, const JobResults& opened) override {
+    raster_ = opened.Find("raster").returns.Find("URI");
+    info_ = ReadInfo(opened, "raster");
+    bands_ = ChooseBands(bandsText_, info_);
+    hasPalette_ = bands_.GetCount() == 1 && info_.hasPalette[bands_[0]] && stretchText_.empty();
+    shown_ = raster_;
+    level_ = ChooseLevel(info_, size_);
+    if (level_ != 0) ShowLevel(session);
+    picture_ = std::make_unique<QuicklookPicture>(info_, size_, bands_);
+  }
+
+  /// Shows a level as a raster of its own.
+  void ShowLevel(JobSession& session) {
+    JobDraft draft;
+    AddLevel(draft, "level", raster_, level_);
+    AddQuery(draft, "level", "$level");
+    const JobResults results = session.Run(draft);
+    shown_ = results.Find("level").returns.Find("PyramidURI");
+    info_ = ReadInfo(results, "level");
+  }
+
+  /// Each block has memory of its own there.
+  JobDraft GetJob(const Outputs& /*outputs*/) const override {
+    JobDraft draft;
+    AddOpening(draft);
+    if (level_ != 0) AddLevel(draft, "level", "$raster", level_);
+    AddBlockSteps(draft, level_ != 0 ? "$level" : "$raster", info_, bands_, Interleave::BIP,
+                  picture_->GetBlocks());
+    if (level_ != 0) draft.Close("close.level", "$level");
+    draft.Close("close", "$raster");
+    return draft;
+  }
+
+  void Make(JobSession& session, const Outputs& outputs) override {
+    BlockReader reader(session, shown_, info_, GetSource().file);
+    reader.ReadAll(picture_->GetBlocks(), bands_, Interleave::BIP, GetProgressStyle(),
+                   [&](const SubRect& block) {
+                     picture_->Take(block, reader.GetPixels(), reader.GetStates());
+                   });
+    const QuicklookPicture::Bytes bytes =
+        hasPalette_ ? picture_->Draw(ReadPalette(session, raster_, bands_[0]))
+                    : picture_->Draw(stretch_);
+    const auto writer = MakePictureWriter(outputs.Get(0), picture_->GetWidth(),
+                                          picture_->GetHeight(), bytes.channels);
+    const std::size_t lineBytes = std::size_t{picture_->GetWidth()} * bytes.channels;
+    for (std::size_t y = 0; y < picture_->GetHeight(); ++y) {
+      session.CheckInterrupt();
+      writer->WriteLine(&bytes.pixels[y * lineBytes]);
+    }
+    writer->Close();
+  }
+
+  std::string output_, bandsText_, stretchText_;
+  unsigned size_ = 1024;
+
+  QuicklookPicture::Stretch stretch_;
+  String raster_;       // URI
+  unsigned level_ = 0;  // of the pyramid that the picture is made from
+  String shown_;        // URI of the level, or of the raster
+  RasterInfo info_;     // of that
+  Array<unsigned> bands_;
+  bool hasPalette_ = false;  // the picture is in the colours of the band
+  std::unique_ptr<QuicklookPicture> picture_;
+};
+
+const VerbRegistration registration("quicklook",
+                                    "Makes a picture of a raster at the size of a screen",
+                                    &SetUp<QuicklookVerb>);
+
+}  // namespace
+}  // namespace lumo::host

@@ -1,0 +1,53 @@
+#include <memory>
+
+#include "commands/catalog_session.h"
+#include "commands/job_parser.h"
+#include "commands/job_result.h"
+#include "foundation/abandonment.h"
+#include "jobs/progress_view.h"
+#include "jobs/result_output.h"
+#include "platform/durability.h"
+#include "platform/interrupt.h"
+#include "verb.h"
+
+namespace lumo::host {
+namespace {
+
+int RunJobFile(const JobOptions& options) {
+  String text;
+  const Document document = ReadJob(options, text);
+  Output output(options.output, options.file);
+  platform::SetDurable(options.isDurable);
+  Job job;
+  JobParser(job).Parse(text);
+  job.tellsReasons = true;
+  if (AsksForStrictChecks(document)) job.checks = JobChecks::kStrict;
+  const AbortFlagPtr abort = job.GetIPC().abort;
+  String result;
+  auto outcome = Outcome::kDone;
+  {
+    const platform::InterruptWatch interrupts([&] { abort->Set(true); }, output.IsStandardOutput());
+    ProgressView view(job.GetIPC().progress, ChooseProgressStyle(options.progress, options.quiet));
+    RunJob(job);
+    if (abort->IsSet()) {
+      const AbandonScope abandonment;  // of files that aren't whole
+      catalog::Empty();
+    }
+    result = JobResultWriter(job).Write();
+    outcome = OutcomeOf(result, abort->IsSet());
+    view.SetOutcome(outcome);
+  }
+  WriteResult(document, result, options.json, output);
+  return ExitCodeAfter(outcome, ExitCodeOf(document, result));
+}
+
+const VerbRegistration registration(
+    "run", "Runs a job document in this process and prints its result", [](OptionSet& line) {
+      const auto options = std::make_shared<JobOptions>();
+      line.AddExample("vexg run --json job.xml");
+      options->AddTo(line);
+      return VerbRegistration::Work([options] { return RunJobFile(*options); });
+    });
+
+}  // namespace
+}  // namespace lumo::host

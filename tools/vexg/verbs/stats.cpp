@@ -1,0 +1,257 @@
+#include <fmt/format.h>
+
+#include "foundation/near_name.h"
+#include "output/json_number.h"
+#include "output/saved_values.h"
+#include "rasters/file_verb.h"
+#include "rasters/raster_target.h"
+#include "stats/turn.h"
+
+namespace lumo::host {
+namespace {
+
+constexpr const char* kStatsStep = "stats";
+constexpr const char* kSaveCommand = "SaveRasterStatsCommand";
+
+/// A value in both forms of output.
+struct Cell {
+  Json json;  ///< null for what there is none of, and for what no number of JSON can be
+  std::string text;
+};
+
+template <typename T>
+Cell CellOf(T value) {
+  if constexpr (std::is_floating_point_v<T>) {
+    return {NumberAsJson(value), fmt::format("{:.10g}", static_cast<double>(value))};
+  } else {
+    return {NumberAsJson(value), std::to_string(value)};
+  }
+}
+
+using Column = std::vector<Cell>;
+
+/// Statistics of bands.
+struct BandTable {
+  std::vector<unsigned> bands;
+  std::vector<std::pair<const char*, Column>> columns;
+  std::vector<Column> sumXY, cov;  ///< a row for each band; none unless asked for
+};
+
+template <typename T>
+Column ReadColumn(const Map<String, String>& returns, const char* name) {
+  Column column;
+  for (const T& value : ParseValue<Array<T>>(returns.Find(name))) column.push_back(CellOf(value));
+  return column;
+}
+
+/// The rows of a matrix of `bands` by `bands`.
+std::vector<Column> ReadRows(const Map<String, String>& returns, const char* name,
+                             std::size_t bands) {
+  std::vector<Column> rows;
+  for (const Cell& value : ReadColumn<double>(returns, name)) {
+    if (rows.empty() || rows.back().size() == bands) rows.emplace_back();
+    rows.back().push_back(value);
+  }
+  return rows;
+}
+
+/// Takes away what isn't known: all but the count of a band without a valid pixel, and a count that
+/// was stored without.
+void MarkUnknown(BandTable& table) {
+  Column& counts = table.columns.front().second;
+  for (std::size_t i = 0; i < counts.size(); ++i) {
+    if (counts[i].json != 0) continue;
+    bool isEmpty = true;
+    for (const auto& [name, column] : table.columns) isEmpty = isEmpty && column[i].json == 0;
+    if (!isEmpty) {
+      counts[i] = {Json(), "unknown"};
+      continue;
+    }
+    const Cell none{Json(), "-"};
+    for (auto& [name, column] : table.columns) {
+      if (&column != &counts) column[i] = none;
+    }
+    for (std::vector<Column>* const rows : {&table.sumXY, &table.cov}) {
+      for (std::size_t j = 0; j < rows->size(); ++j) (*rows)[i][j] = (*rows)[j][i] = none;
+    }
+  }
+}
+
+/// @param file  what the user calls the raster.
+BandTable ReadTable(const Map<String, String>& returns, const std::string& file, bool isExtended,
+                    const Array<unsigned>& bands, unsigned dataType) {
+  BandTable table;
+  table.bands.assign(bands.begin(), bands.end());
+  Column min, max;
+  DispatchType(TenTypes{}, dataType, [&]<typename T>() {
+    min = ReadColumn<T>(returns, "Min");
+    max = ReadColumn<T>(returns, "Max");
+    return true;
+  });
+  table.columns = {{"count", ReadColumn<unsigned long long>(returns, "Count")},
+                   {"min", min},
+                   {"max", max},
+                   {"mean", ReadColumn<double>(returns, "Mean")},
+                   {"std", ReadColumn<double>(returns, "Std")},
+                   {"sum", ReadColumn<double>(returns, "Sum")},
+                   {"sum2", ReadColumn<double>(returns, "Sum2")},
+                   {"rms", ReadColumn<double>(returns, "RMS")}};
+  for (const auto& [name, column] : table.columns) {
+    if (column.size() == table.bands.size()) continue;
+    throw HostError(kExitFailed, file + ": there are no statistics of all bands");
+  }
+  if (isExtended) {
+    table.sumXY = ReadRows(returns, "SumXY", table.bands.size());
+    table.cov = ReadRows(returns, "Cov", table.bands.size());
+    if (table.sumXY.size() != table.bands.size() || table.cov.size() != table.bands.size()) {
+      throw HostError(kExitFailed, file + ": there are no statistics between bands");
+    }
+  }
+  MarkUnknown(table);
+  return table;
+}
+
+Json AsJson(const Column& row) {
+  Json list = Json::array();
+  for (const Cell& value : row) list.push_back(value.json);
+  return list;
+}
+
+Json AsJson(const std::string& file, const BandTable& table) {
+  Json bands = Json::array();
+  for (std::size_t i = 0; i < table.bands.size(); ++i) {
+    Json band{{"band", table.bands[i]}};
+    for (const auto& [name, column] : table.columns) band[name] = column[i].json;
+    if (!table.cov.empty()) {
+      band["sumXY"] = AsJson(table.sumXY[i]);
+      band["cov"] = AsJson(table.cov[i]);
+    }
+    bands.push_back(band);
+  }
+  return {{"file", file}, {"bands", bands}};
+}
+
+void AppendMatrix(std::string& text, const char* title, const BandTable& table,
+                  const std::vector<Column>& rows) {
+  text += fmt::format("\n{}\n{:>4}", title, "");
+  for (const unsigned band : table.bands) text += fmt::format(" {:>16}", band);
+  text += '\n';
+  for (std::size_t i = 0; i < rows.size(); ++i) {
+    text += fmt::format("{:>4}", table.bands[i]);
+    for (const Cell& value : rows[i]) text += fmt::format(" {:>16}", value.text);
+    text += '\n';
+  }
+}
+
+std::string AsText(const std::string& file, const BandTable& table) {
+  std::string text = fmt::format("{}\nband", Printable(file));
+  for (const auto& [name, column] : table.columns) text += fmt::format(" {:>16}", name);
+  text += '\n';
+  for (std::size_t i = 0; i < table.bands.size(); ++i) {
+    text += fmt::format("{:>4}", table.bands[i]);
+    for (const auto& [name, column] : table.columns) {
+      text += fmt::format(" {:>16}", column[i].text);
+    }
+    text += '\n';
+  }
+  if (table.cov.empty()) return text;
+  AppendMatrix(text, "covariances", table, table.cov);
+  AppendMatrix(text, "sums of products", table, table.sumXY);
+  return text;
+}
+
+class StatsVerb final : public FileVerb {
+ public:
+  explicit StatsVerb(OptionSet& line) : FileVerb(line) {
+    line.AddNote(
+        "Pixels without data, masked ones, NaN and infinities do not count. The deviation is that "
+        "of a sample, divided by n - 1. With --json: \"file\" and \"bands\", a list of objects "
+        "with \"band\" (from 0), \"count\", \"min\", \"max\", \"mean\", \"std\", \"sum\", "
+        "\"sum2\", \"rms\", and with --extended \"sumXY\" and \"cov\", one value for each band. Of "
+        "a band without a valid pixel all but the count is null, and a dash in the table; a count "
+        "that isn't known is null, and NaN and infinities are.");
+    line.AddExample("vexg stats scene.tif --bands 3,2,1 --extended");
+    line.Add("--bands", bandsText_, "Bands, from 0; all by default").Shows("B,B...").Example("3,2,1");
+    line.Add("--extended", isExtended_, "With covariances and sums of products");
+    line.Add("--save", saves_, "Store them with the raster, so that they are known from now on");
+    line.Add("--json", isJson_, "As JSON");
+  }
+
+ private:
+  void CheckOptions() override {
+    if (!saves_ || bandsText_.empty()) return;
+    throw HostError(kExitUsage,
+                    "--save: the statistics of all bands are saved together; leave --bands out");
+  }
+
+  std::vector<std::string> GetChangedFiles() const override {
+    return saves_ ? FilesOfSavedValues(GetSource()) : std::vector<std::string>();
+  }
+
+  void AddOpening(JobDraft& draft) const override {
+    AddOpenWithPyramid(draft, "raster", GetSource());
+    AddQuery(draft, "raster", "$raster");
+  }
+
+  void Plan(JobSession& /*session*/, const JobResults& opened) override {
+    raster_ = opened.Find("raster").returns.Find("URI");
+    info_ = ReadInfo(opened, "raster");
+    bands_ = ParseBands(bandsText_, info_);
+  }
+
+  /// @param raster  a variable or URI.
+  void AddStats(JobDraft& draft, const String& raster) const {
+    if (!bandsText_.empty()) AddBandView(draft, "bands", raster, bands_);
+    JobWriterCommand& stats = draft.Step(
+        kStatsStep, isExtended_ ? "GetExtendedRasterStatsCommand" : "GetBasicRasterStatsCommand");
+    stats.AddInput("URI", bandsText_.empty() ? raster : "$bands");
+    stats.AddInput("Wait", Waiting::kAlways);
+    if (!bandsText_.empty()) draft.Close("close.bands", "$bands");
+  }
+
+  JobDraft GetJob(const Outputs& /*outputs*/) const override {
+    JobDraft draft;
+    AddOpenWithPyramid(draft, "raster", GetSource());
+    AddStats(draft, "$raster");
+    if (saves_) AddSave(draft, kSaveCommand, "$raster");
+    draft.Close("close.raster", "$raster");
+    return draft;
+  }
+
+  void Make(JobSession& session, const Outputs& /*outputs*/) override {
+    JobDraft draft;
+    AddStats(draft, raster_);
+    JobResults results;
+    {
+      const ProgressView view(ProgressOfStep(session, draft, kStatsStep), GetProgressStyle());
+      results = session.Run(draft);
+    }
+    table_ = ReadTable(results.Find(kStatsStep).returns, GetSource().file, isExtended_, bands_,
+                       info_.dataType);
+  }
+
+  void Save(JobSession& session) override {
+    if (saves_) SaveValues(session, GetSource(), kSaveCommand, raster_, "statistics");
+  }
+
+  std::string Describe() const override {
+    return isJson_ ? AsJson(GetSource().file, table_).dump(2) + "\n"
+                   : AsText(GetSource().file, table_);
+  }
+
+  std::string bandsText_;
+  bool isExtended_ = false;
+  bool saves_ = false;
+  bool isJson_ = false;
+
+  String raster_;  // URI
+  RasterInfo info_;
+  Array<unsigned> bands_;
+  BandTable table_;
+};
+
+const VerbRegistration registration("stats", "Tells the statistics of a raster's bands",
+                                    &SetUp<StatsVerb>);
+
+}  // namespace
+}  // namespace lumo::host
