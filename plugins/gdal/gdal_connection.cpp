@@ -1,6 +1,6 @@
 #include "gdal_connection.h"
 
-#include "common/messages.h"
+#include "gdal_common/messages.h"
 #include "gdal_metadata.h"
 #include "gdal_reader.h"
 #include "metadata/metadata_parser.h"

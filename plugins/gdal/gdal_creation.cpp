@@ -7,7 +7,7 @@
 #include <filesystem>
 #include <set>
 
-#include "common/messages.h"
+#include "gdal_common/messages.h"
 #include "foundation/abandonment.h"
 #include "foundation/fault.h"
 #include "gdal_details.h"
@@ -15,7 +15,7 @@
 #include "gdal_no_data.h"
 #include "gdal_side_file.h"
 #include "gdal_types.h"
-#include "orva_file.h"
+#include "orva/orva_file.h"
 #include "platform/file_swap.h"
 #include "platform/folder_lock.h"
 #include "platform/random_access_file.h"

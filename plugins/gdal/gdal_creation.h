@@ -5,7 +5,7 @@
 #include <string>
 #include <vector>
 
-#include "common/source.h"
+#include "gdal_common/source.h"
 #include "gdal_band_values.h"
 #include "gdal_new_mask.h"
 #include "platform/file_identity.h"

@@ -1,6 +1,6 @@
 #include "gdal_factory.h"
 
-#include "common/messages.h"
+#include "gdal_common/messages.h"
 #include "gdal_connection.h"
 
 namespace lumo {

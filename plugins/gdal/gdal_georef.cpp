@@ -6,7 +6,7 @@
 #include <gdal_alg.h>
 #include <string>
 
-#include "common/coordsys.h"
+#include "gdal_common/coordsys.h"
 #include "georef/std_rpc_georef.h"
 
 namespace lumo::gdal {

@@ -5,8 +5,8 @@
 #include <cpl_string.h>
 #include <cpl_vsi.h>
 
-#include "common/messages.h"
-#include "common/setting.h"
+#include "gdal_common/messages.h"
+#include "gdal_common/setting.h"
 
 namespace lumo::gdal {
 namespace {

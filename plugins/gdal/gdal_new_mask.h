@@ -4,7 +4,7 @@
 #include <string>
 #include <vector>
 
-#include "common/source.h"
+#include "gdal_common/source.h"
 #include "gdal_raster.h"
 
 namespace lumo::gdal {

@@ -4,8 +4,8 @@
 #include <cstdint>
 #include <string>
 
-#include "common/messages.h"
-#include "common/setting.h"
+#include "gdal_common/messages.h"
+#include "gdal_common/setting.h"
 #include "foundation/library.h"
 
 namespace lumo::gdal {

@@ -1,6 +1,6 @@
 #pragma once
 
-#include "common/source.h"
+#include "gdal_common/source.h"
 
 namespace lumo::gdal {
 

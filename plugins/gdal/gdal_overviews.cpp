@@ -5,7 +5,7 @@
 #include <cstdint>
 #include <filesystem>
 
-#include "common/messages.h"
+#include "gdal_common/messages.h"
 #include "foundation/fault.h"
 #include "foundation/staged_files.h"
 

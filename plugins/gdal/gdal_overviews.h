@@ -3,7 +3,7 @@
 #include <string>
 #include <vector>
 
-#include "common/source.h"
+#include "gdal_common/source.h"
 
 namespace lumo::gdal {
 

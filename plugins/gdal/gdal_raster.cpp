@@ -5,8 +5,8 @@
 #include <cpl_minixml.h>
 #include <filesystem>
 
-#include "common/file_guard.h"
-#include "common/messages.h"
+#include "gdal_common/file_guard.h"
+#include "gdal_common/messages.h"
 #include "foundation/fault.h"
 #include "foundation/warnings.h"
 #include "gdal_band_values.h"

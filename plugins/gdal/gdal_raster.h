@@ -4,7 +4,7 @@
 #include <map>
 #include <memory>
 
-#include "common/source.h"
+#include "gdal_common/source.h"
 #include "raster/raster_def.h"
 
 namespace lumo::gdal {

@@ -9,7 +9,7 @@
 #include <locale>
 #include <sstream>
 
-#include "common/messages.h"
+#include "gdal_common/messages.h"
 #include "gdal_band_values.h"
 #include "gdal_no_data.h"
 #include "gdal_reader.h"

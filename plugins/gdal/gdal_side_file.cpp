@@ -4,8 +4,8 @@
 #include <cmath>
 #include <gdal_pam.h>
 
-#include "common/coordsys.h"
-#include "common/source.h"
+#include "gdal_common/coordsys.h"
+#include "gdal_common/source.h"
 #include "gdal_details.h"
 #include "gdal_georef.h"
 #include "gdal_no_data.h"

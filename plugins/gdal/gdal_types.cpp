@@ -2,7 +2,7 @@
 
 #include <string>
 
-#include "common/messages.h"
+#include "gdal_common/messages.h"
 
 namespace lumo::gdal {
 namespace {

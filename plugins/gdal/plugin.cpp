@@ -1,7 +1,7 @@
-#include "common/library.h"
+#include "gdal_common/library.h"
 #include "data/data_connection.h"
 #include "gdal_factory.h"
-#include "orva_factory.h"
+#include "orva/orva_factory.h"
 #include "vector_sink.h"
 #include "vector_source.h"
 

@@ -2,7 +2,7 @@
 
 #include <cstring>
 
-#include "common/messages.h"
+#include "gdal_common/messages.h"
 #include "foundation/fault.h"
 #include "tiff_directory.h"
 

@@ -8,10 +8,10 @@
 #include <filesystem>
 #include <ogr_api.h>
 
-#include "common/coordsys.h"
-#include "common/messages.h"
-#include "common/shape_geometry.h"
-#include "common/source.h"
+#include "gdal_common/coordsys.h"
+#include "gdal_common/messages.h"
+#include "gdal_common/shape_geometry.h"
+#include "gdal_common/source.h"
 #include "data/access_policy.h"
 #include "foundation/text_case.h"
 #include "platform/file_moves.h"

@@ -1,5 +1,5 @@
-#include "common/messages.h"
-#include "common/source.h"
+#include "gdal_common/messages.h"
+#include "gdal_common/source.h"
 #include "shape_connection.h"
 
 namespace lumo::shapefile {

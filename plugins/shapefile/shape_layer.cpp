@@ -2,8 +2,8 @@
 
 #include <filesystem>
 
-#include "common/coordsys.h"
-#include "common/messages.h"
+#include "gdal_common/coordsys.h"
+#include "gdal_common/messages.h"
 #include "foundation/abandonment.h"
 #include "foundation/fault.h"
 #include "georef/std_georef.h"

@@ -2,8 +2,8 @@
 
 #include <memory>
 
-#include "common/shape_geometry.h"
-#include "common/source.h"
+#include "gdal_common/shape_geometry.h"
+#include "gdal_common/source.h"
 
 namespace lumo::shapefile {
 

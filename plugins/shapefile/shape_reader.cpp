@@ -2,7 +2,7 @@
 
 #include <limits>
 
-#include "common/messages.h"
+#include "gdal_common/messages.h"
 
 namespace lumo::shapefile {
 namespace {

@@ -3,7 +3,7 @@
 #include <cstddef>
 #include <functional>
 
-#include "orva_file.h"
+#include "orva/orva_file.h"
 #include "raster/flat_block.h"
 
 namespace lumo::orva {

@@ -1,4 +1,4 @@
-#include "common/shape_geometry.h"
+#include "gdal_common/shape_geometry.h"
 
 namespace lumo::gdal {
 namespace {

@@ -2,7 +2,7 @@
 
 #include <string>
 
-#include "common/source.h"
+#include "gdal_common/source.h"
 
 namespace lumo::gdal {
 

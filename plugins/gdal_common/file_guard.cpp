@@ -1,4 +1,4 @@
-#include "common/file_guard.h"
+#include "gdal_common/file_guard.h"
 
 #include <cerrno>
 #include <cpl_conv.h>

@@ -1,13 +1,13 @@
-#include "common/library.h"
+#include "gdal_common/library.h"
 
 #include <cpl_conv.h>
 #include <gdal.h>
 #include <map>
 #include <mutex>
 
-#include "common/file_guard.h"
-#include "common/file_system.h"
-#include "common/messages.h"
+#include "gdal_common/file_guard.h"
+#include "gdal_common/file_system.h"
+#include "gdal_common/messages.h"
 #include "foundation/environment.h"
 
 namespace lumo::gdal {

@@ -1,7 +1,7 @@
-#include "orva_factory.h"
+#include "orva/orva_factory.h"
 
 #include "foundation/fault.h"
-#include "orva_connection.h"
+#include "orva/orva_connection.h"
 
 namespace lumo {
 namespace {

@@ -4,7 +4,7 @@
 #include <string>
 
 #include "georef/georef.h"
-#include "orva_text.h"
+#include "orva/orva_text.h"
 #include "raster/flat_block.h"
 #include "raster/pixel_types.h"
 #include "raster/raster_def.h"

@@ -1,4 +1,4 @@
-#include "common/messages.h"
+#include "gdal_common/messages.h"
 
 #include <algorithm>
 #include <cctype>
@@ -8,7 +8,7 @@
 #include <stdexcept>
 #include <string_view>
 
-#include "common/hdf5_files.h"
+#include "gdal_common/hdf5_files.h"
 #include "foundation/fault.h"
 #include "foundation/text_case.h"
 #include "platform/memory_shortage.h"

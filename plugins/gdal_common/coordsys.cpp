@@ -1,4 +1,4 @@
-#include "common/coordsys.h"
+#include "gdal_common/coordsys.h"
 
 #include <algorithm>
 #include <cpl_conv.h>

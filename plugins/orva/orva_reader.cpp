@@ -1,4 +1,4 @@
-#include "orva_reader_body.h"
+#include "orva/orva_reader_body.h"
 
 namespace lumo::orva {
 

@@ -5,7 +5,7 @@
 #include <string>
 #include <vector>
 
-#include "common/library.h"
+#include "gdal_common/library.h"
 #include "foundation/string.h"
 
 namespace lumo::gdal {

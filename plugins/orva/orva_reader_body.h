@@ -2,8 +2,8 @@
 
 #include "data/merge_values.h"
 #include "foundation/fault.h"
-#include "orva_pixels.h"
-#include "orva_reader.h"
+#include "orva/orva_pixels.h"
+#include "orva/orva_reader.h"
 #include "raster/no_data_marker.h"
 
 namespace lumo::orva {

@@ -1,8 +1,8 @@
-#include "orva_connection.h"
+#include "orva/orva_connection.h"
 
 #include "data/file_uri.h"
 #include "foundation/fault.h"
-#include "orva_reader.h"
+#include "orva/orva_reader.h"
 
 namespace lumo::orva {
 

@@ -1,7 +1,7 @@
 #pragma once
 
 #include "georef/georef.h"
-#include "orva_text.h"
+#include "orva/orva_text.h"
 
 namespace lumo::orva {
 

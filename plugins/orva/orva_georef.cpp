@@ -1,11 +1,11 @@
-#include "orva_georef.h"
+#include "orva/orva_georef.h"
 
 #include <cmath>
 
 #include "commands/value_text.h"
 #include "georef/affine_link.h"
 #include "georef/std_georef.h"
-#include "orva_header.h"
+#include "orva/orva_header.h"
 
 namespace lumo::orva {
 namespace {

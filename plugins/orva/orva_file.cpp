@@ -1,4 +1,4 @@
-#include "orva_file.h"
+#include "orva/orva_file.h"
 
 #include <filesystem>
 

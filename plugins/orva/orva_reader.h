@@ -1,7 +1,7 @@
 #pragma once
 
-#include "orva_connection.h"
-#include "orva_values.h"
+#include "orva/orva_connection.h"
+#include "orva/orva_values.h"
 
 namespace lumo::orva {
 

@@ -3,7 +3,7 @@
 #include <functional>
 #include <memory>
 
-#include "orva_header.h"
+#include "orva/orva_header.h"
 #include "platform/file_identity.h"
 #include "platform/random_access_file.h"
 

@@ -1,4 +1,4 @@
-#include "orva_pixels.h"
+#include "orva/orva_pixels.h"
 
 #include <bit>
 #include <cstring>

@@ -1,4 +1,4 @@
-#include "common/source.h"
+#include "gdal_common/source.h"
 
 #include <algorithm>
 #include <cctype>
@@ -6,9 +6,9 @@
 #include <string_view>
 #include <utility>
 
-#include "common/file_guard.h"
-#include "common/hdf5_files.h"
-#include "common/messages.h"
+#include "gdal_common/file_guard.h"
+#include "gdal_common/hdf5_files.h"
+#include "gdal_common/messages.h"
 #include "data/access_policy.h"
 #include "data/file_uri.h"
 #include "foundation/warnings.h"

@@ -1,4 +1,4 @@
-#include "orva_header.h"
+#include "orva/orva_header.h"
 
 #include <bit>
 #include <charconv>
@@ -6,7 +6,7 @@
 #include <limits>
 
 #include "commands/value_text.h"
-#include "orva_georef.h"
+#include "orva/orva_georef.h"
 #include "raster/no_data_number.h"
 #include "raster/raster_details.h"
 

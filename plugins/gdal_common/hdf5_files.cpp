@@ -1,10 +1,10 @@
-#include "common/hdf5_files.h"
+#include "gdal_common/hdf5_files.h"
 
 #include <filesystem>
 #include <hdf5.h>
 #include <vector>
 
-#include "common/messages.h"
+#include "gdal_common/messages.h"
 #include "data/access_policy.h"
 
 namespace lumo::gdal {

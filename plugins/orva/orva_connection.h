@@ -3,7 +3,7 @@
 #include <memory>
 
 #include "data/raster_reader.h"
-#include "orva_file.h"
+#include "orva/orva_file.h"
 
 namespace lumo::orva {
 

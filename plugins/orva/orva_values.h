@@ -4,7 +4,7 @@
 #include <vector>
 
 #include "foundation/color.h"
-#include "orva_header.h"
+#include "orva/orva_header.h"
 #include "raster/band_values.h"
 
 namespace lumo::orva {

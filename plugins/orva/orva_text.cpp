@@ -1,4 +1,4 @@
-#include "orva_text.h"
+#include "orva/orva_text.h"
 
 #include <algorithm>
 #include <charconv>

@@ -1,4 +1,4 @@
-#include "common/file_system.h"
+#include "gdal_common/file_system.h"
 
 #include <algorithm>
 #include <cerrno>

@@ -1,4 +1,4 @@
-#include "orva_values.h"
+#include "orva/orva_values.h"
 
 #include <sstream>
 
