@@ -52,7 +52,7 @@ void AddTo(CLI::App& app, const OptionSpec& option) {
   if (!option.defaultText.empty()) added->default_str(option.defaultText);
   if (!option.isRepeatable) return;
   added->expected(1, CLI::detail::expected_max_vector_size);
-  if (!option.IsByPlace()) added->allow_extra_args(false);
+  added->allow_extra_args(option.IsByPlace());  // else what follows may be the file
 }
 
 std::string FooterOf(const OptionSet& options) {

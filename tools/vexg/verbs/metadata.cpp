@@ -53,7 +53,7 @@ JobDraft MakeDraft(const Options& options, const MetadataSource& source) {
 /// The paths of the values to show, in order. Throws HostError for a path below which there is
 /// none.
 std::vector<std::string> ReadPaths(const Options& options, const JobResults& results) {
-  std::vector<std::string> paths{"/"};
+  std::vector<std::string> paths;
   for (std::size_t i = 0; i < options.paths.size(); ++i) {
     const std::size_t before = paths.size();
     for (const char* const kind : {"names", "private"}) {
