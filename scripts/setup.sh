@@ -30,10 +30,20 @@ install_packages_of() {
     $missing >/dev/null
 }
 
-# Configures and builds one preset; a second call does only what has changed.
+# Configures one preset and builds the targets named behind it, or all; a second call does only what
+# has changed.
 build() {
   local preset=$1
+  shift
   echo "Building ($preset)"
   [[ -f build/$preset/build.ninja ]] || cmake --preset "$preset" >/dev/null
-  cmake --build --preset "$preset"
+  cmake --build --preset "$preset" ${1:+--target "$@"}
+}
+
+# Runs a command and says how long it took.
+timed() {
+  local name=$1 begin=$SECONDS
+  shift
+  "$@"
+  printf '%s: %d min %02d s\n' "$name" $(((SECONDS - begin) / 60)) $(((SECONDS - begin) % 60))
 }

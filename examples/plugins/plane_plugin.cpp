@@ -1,7 +1,7 @@
-// A plug-in as small as one can be: it serves the row "EXTERNAL" of the table of formats. Its
-// sources are no files but formulas, "plane:<samples>x<lines>", whose pixel is sample + 2 * line.
-// Build it as a shared library against vexg under the name that the row has, libvexzep.so, and put
-// it beside libvexg.so or into the environment's binary directory.
+// A plug-in as small as one can be: it brings a format of its own, "Plane". Its sources are no
+// files but formulas, "plane:<samples>x<lines>", whose pixel is sample + 2 * line. Build it as a
+// shared library against vexg under a name that begins with libvexgformat_, and put it into the
+// folder vexg/plugins-<version> beside libvexg.so or into the environment's binary directory.
 
 #include <cstdio>
 
@@ -25,7 +25,7 @@ class PlaneReader final : public lumo::PlainRasterReader<float> {
     def.bands = 1;
     def.interleave = lumo::Interleave::BSQ;
     def.dataType = lumo::kDataTypeOf<float>;
-    def.format = "EXTERNAL";
+    def.format = "Plane";
     return def;
   }
 
@@ -96,8 +96,16 @@ class PlaneFactory final : public lumo::DataConnectionFactory {
 
 }  // namespace
 
+/// The entry point of every plug-in.
 extern "C" VEXG_EXPORT lumo::DataConnectionFactory* CreateDataConnectionFactory(
     lumo::FormatRecord* record) {
   static PlaneFactory factory;
-  return record->name == "EXTERNAL" ? &factory : nullptr;
+  return record->name == "Plane" ? &factory : nullptr;
+}
+
+/// The formats that this plug-in brings.
+extern "C" VEXG_EXPORT const lumo::FormatDescription* DescribeFormats(std::uint32_t* count) {
+  static const lumo::FormatDescription plane{"Plane", "", lumo::DataSourceKind::kRaster};
+  *count = 1;
+  return &plane;
 }

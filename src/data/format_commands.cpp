@@ -42,12 +42,12 @@ const CommandDeclaration kList{
 
 class ListFormatsCommand final : public Command {
   CommandResult Execute() override {
-    const ArrayDims dims(kFormatCount);
+    const ArrayDims dims(FormatCount());
     Array<String> names(dims), plugins(dims), faults(dims);
     Array<std::int32_t> kinds(dims);
     Array<bool> loaded(dims), available(dims);
-    for (unsigned row = 0; row < kFormatCount; ++row) {
-      const FormatRecord& format = gCdfFormatRecords[row];
+    for (unsigned row = 0; row < names.GetCount(); ++row) {
+      const FormatRecord& format = GetFormat(row);
       TakeFault();
       LoadFormat(row);
       DataConnectionFactory* const factory = GetFactory(format);

@@ -2,17 +2,17 @@
 
 #include <algorithm>
 #include <atomic>
+#include <deque>
 #include <exception>
 #include <filesystem>
 #include <mutex>
+#include <set>
 #include <vector>
 
 #include "data/data_connection.h"
-#include "foundation/environment.h"
 #include "foundation/fault.h"
 #include "foundation/near_name.h"
 #include "foundation/thrown.h"
-#include "platform/module.h"
 
 namespace lumo {
 namespace {
@@ -53,6 +53,73 @@ DataConnectionFactory* AskForFactory(const platform::Module& module, FormatRecor
   return nullptr;
 }
 
+/// Loads the plug-in of a format, unless it has a factory.
+void Load(FormatRecord& record) {
+  if (GetFactory(record) != nullptr) return;
+  const std::lock_guard lock(LoadMutex());
+  if (GetFactory(record) != nullptr) return;
+  std::string fault;
+  const platform::Module module = LoadPlugin(LibraryName(record).ToUTF8(), fault);
+  if (!module.IsLoaded()) {
+    SetFault(fault);
+    return;
+  }
+  record.library = module.Handle();
+  std::atomic_ref(record.factory).store(AskForFactory(module, record));
+}
+
+/// Adds the formats that a library brings. One whose key is taken is left out.
+void AddFormatsOf(const std::string& library, std::deque<FormatRecord>& formats) {
+  std::string fault;
+  const platform::Module module = LoadPlugin(library, fault);
+  auto* const describe =
+      module.IsLoaded() ? module.Find<DescribeFormatsFunction>("DescribeFormats") : nullptr;
+  if (describe == nullptr) return;
+  std::uint32_t count = 0;
+  const FormatDescription* const described = describe(&count);
+  for (std::uint32_t i = 0; i < count; ++i) {
+    const auto hasKey = [&](const FormatRecord& record) {
+      return record.name == described[i].name;
+    };
+    const bool isTaken =
+        std::any_of(std::begin(gCdfFormatRecords), std::end(gCdfFormatRecords), hasKey) ||
+        std::any_of(formats.begin(), formats.end(), hasKey);
+    if (isTaken) continue;
+    FormatRecord& record = formats.emplace_back();
+    record.name = described[i].name;
+    record.windowsLibrary = record.linuxLibrary = record.macLibrary = library;
+    record.driver = described[i].driver;
+    record.kind = static_cast<std::int32_t>(described[i].kind);
+  }
+}
+
+/// Finds the libraries in PluginDirectories that bring formats, by their names.
+std::set<std::string> FindLibrariesOfFormats() {
+  std::set<std::string> libraries;
+  const std::filesystem::path sample = platform::ModuleFileName(kFormatPlugin);
+  for (const std::string& directory : PluginDirectories()) {
+    std::error_code fault;
+    for (std::filesystem::directory_iterator at(directory, fault), end; !fault && at != end;
+         at.increment(fault)) {
+      const std::string name = at->path().filename().string();
+      const bool isOne =
+          name.starts_with(sample.stem().string()) && at->path().extension() == sample.extension();
+      if (isOne) libraries.insert(name);
+    }
+  }
+  return libraries;
+}
+
+/// The formats that plug-ins bring, in the order of the names of their libraries.
+std::deque<FormatRecord>& FurtherFormats() {
+  static std::deque<FormatRecord> further = [] {
+    std::deque<FormatRecord> formats;
+    for (const std::string& library : FindLibrariesOfFormats()) AddFormatsOf(library, formats);
+    return formats;
+  }();
+  return further;
+}
+
 }  // namespace
 
 FormatRecord gCdfFormatRecords[kFormatCount] = {
@@ -87,17 +154,16 @@ FormatRecord gCdfFormatRecords[kFormatCount] = {
 
 const std::uint32_t gCdfFormatRecordCount = kFormatCount;
 
-platform::Module LoadPlugin(const std::string& name, std::string& fault) {
-  const String binDirectory = GetGlobalEnvironmentImpl().Find(Environment::kBinDirectory);
-  for (const std::string& directory : {binDirectory.ToUTF8(), platform::LibraryDirectory()}) {
-    if (directory.empty()) continue;
-    const std::filesystem::path path = std::filesystem::path(directory) / name;
-    std::error_code missing;
-    if (std::filesystem::exists(path, missing)) {
-      return platform::Module::Load(path.string(), &fault);
-    }
-  }
-  return platform::Module::Load(name, &fault);
+DataConnectionFactory* GetFactory(const FormatRecord& record) {
+  return std::atomic_ref(const_cast<FormatRecord&>(record).factory).load();
+}
+
+std::uint32_t FormatCount() {
+  return kFormatCount + static_cast<std::uint32_t>(FurtherFormats().size());
+}
+
+FormatRecord& GetFormat(std::uint32_t row) {
+  return row < kFormatCount ? gCdfFormatRecords[row] : FurtherFormats()[row - kFormatCount];
 }
 
 const String& LibraryName(const FormatRecord& record) {
@@ -111,8 +177,8 @@ const String& LibraryName(const FormatRecord& record) {
 }
 
 FormatRecord* FindFormat(const String& name) {
-  for (FormatRecord& record : gCdfFormatRecords) {
-    if (record.name == name) return &record;
+  for (std::uint32_t row = 0; row < FormatCount(); ++row) {
+    if (GetFormat(row).name == name) return &GetFormat(row);
   }
   return nullptr;
 }
@@ -146,35 +212,22 @@ String SplitConnStr(const Array<String>& connStrings, Array<String>& rest) {
   return FindFormatName(connStrings);
 }
 
-DataConnectionFactory* GetFactory(const FormatRecord& record) {
-  return std::atomic_ref(const_cast<FormatRecord&>(record).factory).load();
-}
-
 void LoadFormat(std::uint32_t row) {
-  if (row >= kFormatCount || GetFactory(gCdfFormatRecords[row]) != nullptr) return;
-  FormatRecord& record = gCdfFormatRecords[row];
-  const std::lock_guard lock(LoadMutex());
-  if (GetFactory(record) != nullptr) return;
-  std::string fault;
-  const platform::Module module = LoadPlugin(LibraryName(record).ToUTF8(), fault);
-  if (!module.IsLoaded()) {
-    SetFault(fault);
-    return;
-  }
-  record.library = module.Handle();
-  std::atomic_ref(record.factory).store(AskForFactory(module, record));
+  if (row < FormatCount()) Load(GetFormat(row));
 }
 
 DataConnectionFactory* FactoryForFormat(const String& name) {
   FormatRecord* const record = FindFormat(name);
   if (record == nullptr) {
     std::vector<std::string> known;
-    for (const FormatRecord& row : gCdfFormatRecords) known.push_back(row.name.ToUTF8());
+    for (std::uint32_t row = 0; row < FormatCount(); ++row) {
+      known.push_back(GetFormat(row).name.ToUTF8());
+    }
     const std::string text = name.ToUTF8();
     SetFault(text + ": no such format" + DidYouMean(text, known));
     return nullptr;
   }
-  LoadFormat(static_cast<std::uint32_t>(record - gCdfFormatRecords));
+  Load(*record);
   return GetFactory(*record);
 }
 

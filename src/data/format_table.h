@@ -4,7 +4,7 @@
 #include <initializer_list>
 
 #include "foundation/array.h"
-#include "platform/module.h"
+#include "foundation/plugin_library.h"
 
 namespace lumo {
 
@@ -63,13 +63,29 @@ VEXG_EXPORT FormatRecord* FindFormat(const String& name);
 /// unknown name, or when the plug-in is missing or unusable; the fault text then says which.
 VEXG_EXPORT DataConnectionFactory* FactoryForFormat(const String& name);
 
-/// Loads a plug-in by its file name: from the environment's binary directory, else from beside this
-/// library, else by the system's rules. @param fault  [out] why it could not be loaded.
-VEXG_EXPORT platform::Module LoadPlugin(const std::string& name, std::string& fault);
+/// A format that a plug-in brings beside those of the table.
+struct FormatDescription {
+  const char* name;    ///< the format's key; none of the table, nor of another plug-in
+  const char* driver;  ///< what the plug-in calls the format inside itself
+  DataSourceKind kind;
+};
 
-/// Loads the plug-in of a row and asks it for the row's factory, unless that is done; nothing for a
-/// number outside the table. A library without the entry point counts as missing. What fails is
-/// tried again the next time. May be called on any thread.
+/// The entry point "DescribeFormats" of a plug-in that brings formats of its own: gives their
+/// descriptions, which live until the process ends, and their number. Such a plug-in lies in one of
+/// PluginDirectories, and the name of its library begins with kFormatPlugin.
+inline constexpr const char* kFormatPlugin = "vexgformat_";
+using DescribeFormatsFunction = const FormatDescription*(std::uint32_t* count);
+
+/// How many formats there are: those of the table, which come first, and those that plug-ins bring.
+/// The first call looks for such plug-ins and loads them. May be called on any thread.
+VEXG_EXPORT std::uint32_t FormatCount();
+
+/// A format by its number, below FormatCount(). It stays where it is until the process ends.
+VEXG_EXPORT FormatRecord& GetFormat(std::uint32_t row);
+
+/// Loads the plug-in of a format and asks it for the format's factory, unless that is done; nothing
+/// for a number of no format. A library without the entry point counts as missing. What fails is
+/// tried again the next time, see LoadPlugin. May be called on any thread.
 VEXG_EXPORT void LoadFormat(std::uint32_t row);
 
 /// The factory of a row, without loading anything; null when there is none yet.

@@ -53,12 +53,13 @@ std::vector<DataConnectionFactory*> FindWilling(const Array<String>& connStrings
                               ? std::filesystem::absolute(connStrings[0].ToUTF8(), fault).string()
                               : std::string();
   const FileFaults faults;
-  for (std::uint32_t row = 0; row < kFormatCount; ++row) {
-    if (!MayUseFormat(gCdfFormatRecords[row])) continue;
+  for (std::uint32_t row = 0; row < FormatCount(); ++row) {
+    const FormatRecord& format = GetFormat(row);
+    if (!MayUseFormat(format)) continue;
     LoadFormat(row);
-    DataConnectionFactory* const factory = GetFactory(gCdfFormatRecords[row]);
+    DataConnectionFactory* const factory = GetFactory(format);
     if (factory == nullptr) {
-      if (unread.GetLength() == 0) unread = WhyNotLoaded(gCdfFormatRecords[row]);
+      if (unread.GetLength() == 0) unread = WhyNotLoaded(format);
       continue;
     }
     if (Guarded([&] { return factory->CanConnect(connStrings); })) willing.push_back(factory);

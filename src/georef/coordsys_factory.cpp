@@ -5,6 +5,7 @@
 #include <mutex>
 
 #include "foundation/environment.h"
+#include "foundation/plugin_library.h"
 #include "georef/coordsys_log.h"
 
 namespace lumo {
@@ -24,15 +25,14 @@ String ReadEnvironment(const ContextKey& key) {
   return text.GetLength() != 0 ? text : String("Not Set");
 }
 
-/// The directory to load the plug-in from: `preferred`, unless the plug-in only lies beside the
-/// library.
+/// The first directory that holds the plug-in; `preferred` when none does.
 String PluginDirectory(const String& preferred) {
   const std::string name = platform::ModuleFileName("vexpe");
-  const std::string beside = platform::LibraryDirectory();
   std::error_code fault;
-  const bool onlyBeside = !std::filesystem::exists(preferred.ToUTF8() + "/" + name, fault) &&
-                          std::filesystem::exists(beside + "/" + name, fault);
-  return onlyBeside ? String(beside) : preferred;
+  for (const std::string& directory : PluginDirectories()) {
+    if (std::filesystem::exists(directory + "/" + name, fault)) return String(directory);
+  }
+  return preferred;
 }
 
 }  // namespace

@@ -25,6 +25,8 @@ void LookForPluginsIn(const fs::path& directory) {
 
 TEST(PluginLibrary, TheExampleServesItsFormat) {
   LookForPluginsIn(Built("examples/plugins"));
+  ASSERT_EQ(FormatCount(), kFormatCount + 1);
+  EXPECT_EQ(GetFormat(kFormatCount).name, String("Plane"));
   const RasterDataConnectionPtr plane(
       GetGlobalDataManager().Connect(ConnStrings({"plane:5x4"}), {}, {}));
   ASSERT_TRUE(plane) << TakeFault().ToUTF8();
@@ -37,7 +39,7 @@ TEST(PluginLibrary, TheExampleServesItsFormat) {
   ASSERT_TRUE(reader->ReadBlock({3, 1, 4, 3}, band, 0, Interleave::BIP, pixels, state));
   EXPECT_EQ(std::vector<float>(pixels.begin(), pixels.end()),
             (std::vector<float>{5, 6, 7, 8, 9, 10}));
-  EXPECT_FALSE(GetGlobalDataManager().Connect(ConnStrings({"EXTERNAL", "plane:5x"}), {}, {}));
+  EXPECT_FALSE(GetGlobalDataManager().Connect(ConnStrings({"Plane", "plane:5x"}), {}, {}));
   EXPECT_THAT(TakeFault().ToUTF8(), testing::HasSubstr("plane:<samples>x<lines>"));
 }
 
@@ -46,7 +48,7 @@ TEST(PluginLibrary, ManyThreadsMakeOneFactory) {
   std::vector<DataConnectionFactory*> found(8);
   std::vector<std::thread> threads;
   for (auto& factory : found) {
-    threads.emplace_back([&factory] { factory = FactoryForFormat("EXTERNAL"); });
+    threads.emplace_back([&factory] { factory = FactoryForFormat("Plane"); });
   }
   for (auto& thread : threads) thread.join();
   for (const auto* factory : found) EXPECT_EQ(factory, found.front());
@@ -64,6 +66,13 @@ TEST(PluginLibrary, OneWithoutTheEntryPointCountsAsMissing) {
   fs::rename(directory.Path() / "libvexzep2.so", directory.Path() / "libvexzep.so");
   EXPECT_EQ(FactoryForFormat("EXTERNAL"), nullptr);
   EXPECT_THAT(TakeFault().ToUTF8(), testing::HasSubstr("libvexzep.so"));
+  // It is tried again when there is another file, and not before.
+  EXPECT_EQ(FactoryForFormat("EXTERNAL"), nullptr);
+  fs::remove(directory.Path() / "libvexzep.so");
+  EXPECT_EQ(FactoryForFormat("EXTERNAL"), nullptr);
+  fs::create_symlink(Built("lib/libvexg_example_commands.so"), directory.Path() / "libvexzep.so");
+  EXPECT_EQ(FactoryForFormat("EXTERNAL"), nullptr);
+  EXPECT_THAT(TakeFault().ToUTF8(), testing::HasSubstr("CreateDataConnectionFactory"));
 }
 
 }  // namespace

@@ -21,7 +21,7 @@ endfunction()
 
 run(${CMAKE_COMMAND} --install ${BUILD} --prefix ${prefix})
 run(${CMAKE_COMMAND} -G Ninja -S ${SOURCE}/tests/install/consumer -B ${BUILD}/install-test/consumer
-    -DCMAKE_PREFIX_PATH=${prefix} -DCMAKE_CXX_COMPILER=${CXX})
+    -DCMAKE_PREFIX_PATH=${prefix} -DCMAKE_CXX_COMPILER=${CXX} -DSOURCE=${SOURCE})
 run(${CMAKE_COMMAND} --build ${BUILD}/install-test/consumer)
 expect_success(${BUILD}/install-test/consumer/consumer)
 
@@ -36,3 +36,13 @@ run(${CXX} ${SOURCE}/tests/install/consumer/main.cpp -o ${BUILD}/install-test/by
 expect_success(${BUILD}/install-test/by-pkg-config)
 
 run(${prefix}/bin/vexg --version)
+
+# The installed program finds the installed plug-ins, and one that is put beside them.
+file(GLOB plugins ${prefix}/*/vexg/plugins-* ${prefix}/*/*/vexg/plugins-*)
+file(COPY ${BUILD}/install-test/consumer/libvexgformat_plane.so DESTINATION ${plugins})
+run(${prefix}/bin/vexg formats)
+foreach(line "TIFF +raster +libvexgdal.so +yes +yes" "Plane +raster +libvexgformat_plane.so +yes +no")
+  if(NOT output MATCHES "${line}")
+    message(FATAL_ERROR "vexg formats has no line ${line}:\n${output}")
+  endif()
+endforeach()

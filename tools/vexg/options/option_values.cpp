@@ -167,10 +167,13 @@ Strings SplitList(const std::string& list) {
 
 std::string FormatKey(const std::string& option, const std::string& text) {
   Strings keys;
-  for (const FormatRecord& record : gCdfFormatRecords) keys.push_back(record.name.ToUTF8());
+  for (std::uint32_t row = 0; row < FormatCount(); ++row) {
+    keys.push_back(GetFormat(row).name.ToUTF8());
+  }
   if (std::find(keys.begin(), keys.end(), text) != keys.end()) return text;
   if (const std::optional<std::string> key = FindWord(keys, text)) return *key;
-  for (const FormatRecord& record : gCdfFormatRecords) {
+  for (std::uint32_t row = 0; row < FormatCount(); ++row) {
+    const FormatRecord& record = GetFormat(row);
     if (record.driver.GetLength() != 0 && LowerCase(record.driver.ToUTF8()) == LowerCase(text)) {
       return record.name.ToUTF8();
     }

@@ -59,7 +59,7 @@ void AddVariable(std::vector<std::string>& paths, const char* name) {
 /// Has the kernel keep the server to the roots too: a library that opens a file by itself can't
 /// reach further then.
 void FenceIn(bool quiet) {
-  for (std::uint32_t row = 0; row < kFormatCount; ++row) LoadFormat(row);
+  for (std::uint32_t row = 0; row < FormatCount(); ++row) LoadFormat(row);
   TakeFault();  // of formats that have no plug-in here
   const AccessPolicy policy = GetAccessPolicy();
   const EnvironmentImpl& folders = GetGlobalEnvironmentImpl();

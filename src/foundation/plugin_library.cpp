@@ -1,0 +1,71 @@
+#include "foundation/plugin_library.h"
+
+#include <filesystem>
+#include <map>
+#include <mutex>
+
+#include "foundation/environment.h"
+
+namespace lumo {
+namespace {
+
+namespace fs = std::filesystem;
+
+/// The version of the interfaces that plug-ins are built against.
+std::string InterfaceVersion() {
+  const std::string version = VEXG_VERSION;
+  return version.substr(0, version.rfind('.'));
+}
+
+/// When the files of a plug-in's name were last changed, the smallest time where there is none.
+using Changes = std::vector<fs::file_time_type>;
+
+Changes ChangesOf(const std::vector<std::string>& paths) {
+  Changes changes;
+  for (const std::string& path : paths) {
+    std::error_code missing;
+    const fs::file_time_type time = fs::last_write_time(path, missing);
+    changes.push_back(missing ? fs::file_time_type::min() : time);
+  }
+  return changes;
+}
+
+struct Failure {
+  Changes changes;
+  std::string fault;
+};
+
+}  // namespace
+
+std::vector<std::string> PluginDirectories() {
+  std::vector<std::string> directories;
+  const String bin = GetGlobalEnvironmentImpl().Find(Environment::kBinDirectory);
+  if (bin.GetLength() != 0) directories.push_back(bin.ToUTF8());
+  const std::string own = platform::LibraryDirectory();
+  if (own.empty()) return directories;
+  directories.push_back(own + "/vexg/plugins-" + InterfaceVersion());
+  directories.push_back(own);
+  return directories;
+}
+
+platform::Module LoadPlugin(const std::string& name, std::string& fault) {
+  static std::mutex mutex;
+  static std::map<std::vector<std::string>, Failure> failures;
+  std::vector<std::string> paths = PluginDirectories();
+  for (std::string& path : paths) path.append("/").append(name);
+  const Changes changes = ChangesOf(paths);
+  const std::lock_guard lock(mutex);
+  const auto known = failures.find(paths);
+  if (known != failures.end() && known->second.changes == changes) {
+    fault = known->second.fault;
+    return {};
+  }
+  platform::Module module;
+  std::size_t i = 0;
+  while (i < paths.size() && changes[i] == fs::file_time_type::min()) ++i;
+  module = platform::Module::Load(i < paths.size() ? paths[i] : name, &fault);
+  if (!module.IsLoaded()) failures[paths] = {changes, fault};
+  return module;
+}
+
+}  // namespace lumo
