@@ -2,7 +2,7 @@
 
 #include "foundation/fault.h"
 #include "raster/raster_command.h"
-#include "stats/turn.h"
+#include "stats/histogram_run.h"
 
 namespace lumo {
 namespace {
@@ -70,19 +70,7 @@ class CalculateRasterHistogramCommand final : public RasterCommand {
     } else {
       request.binSize = Read<double>("BinSize");
     }
-    const std::uint64_t writes = raster.WriteCount();
-    AsyncPtr run = raster.CountHistogram(request, GetIPC());
-    // Another run may have begun meanwhile.
-    while (!run && raster.HistogramAsync() && turn.AwaitRuns()) {
-      run = raster.CountHistogram(request, GetIPC());
-    }
-    if (!run) return FaultOr("the run could not be started");
-    run->WaitFinished();
-    if (run->IsValid() && run->IsAborted()) return "the run was aborted";
-    raster.HistogramAsync();  // takes the run over, and its fault
-    if (!run->IsValid()) return FaultOr("the pixels could not be counted");
-    if (raster.WriteCount() != writes) return "the pixels were written while they were counted";
-    return {};
+    return RunHistogram(raster, request, turn, GetIPC());
   }
 
   /// Reads the bounds, limited to the pixel type. @return false when neither of them nor what lies
@@ -102,12 +90,6 @@ class CalculateRasterHistogramCommand final : public RasterCommand {
     request.lower = limited(lower, "LowerBound");
     request.upper = limited(upper, "UpperBound");
     return !(lower > static_cast<double>(kMost) || upper < static_cast<double>(kLeast));
-  }
-
-  /// The fault that was told; `text` when none was.
-  static String FaultOr(const char* text) {
-    const String fault = TakeFault();
-    return fault.GetLength() != 0 ? fault : String(text);
   }
 };
 

@@ -173,13 +173,16 @@ class Hist(RasterTest):
         self.assertIn("Histograms", pathlib.Path(f"{file}.aux.xml").read_text())
 
     def test_complaints(self):
-        for options, words in ((["--bins", "9", "--bin-size", "1"], "exclude"), (["--bin-size", "0"], "above 0"),
-                               (["--lower", "9", "--upper", "3"], "is above the upper"),
-                               (["--lower", "1.5"], "can't be 1.5"), (["--upper", "nan"], "can't be nan"),
-                               (["--lower", "300", "--upper", "400"], "no value that the pixels can have")):
+        # What can be judged without the raster is a wrong command line; the rest the command refuses.
+        for options, want, words in ((["--bins", "9", "--bin-size", "1"], 2, "exclude"),
+                                     (["--bin-size", "0"], 2, "above 0"),
+                                     (["--lower", "9", "--upper", "3"], 1, "is above the upper"),
+                                     (["--lower", "1.5"], 1, "can't be 1.5"), (["--upper", "nan"], 1, "can't be nan"),
+                                     (["--lower", "300", "--upper", "400"], 1, "no value that the pixels can have"),
+                                     (["--bin-size", "1e-9"], 1, "more than 16777216 bins")):
             with self.subTest(words):
                 code, out, err = run("hist", str(DATA / "rgb1.tif"), *options)
-                self.assertEqual((code, out), (2, ""))
+                self.assertEqual((code, out), (want, ""))
                 self.assertIn(words, err)
 
 
