@@ -5,7 +5,7 @@
 #include <cmath>
 #include <vector>
 
-#include "data/block_shape.h"
+#include "raster/block_shape.h"
 #include "georef/affine_link.h"
 #include "georef/derived_georef.h"
 #include "mosaic/overlap_raster.h"

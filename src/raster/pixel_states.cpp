@@ -34,4 +34,12 @@ std::size_t MaskValid(const unsigned char* states, std::size_t count, unsigned c
   return valid;
 }
 
+bool AllHaveState(const unsigned char* states, std::size_t count, PixelValueState::Code bit) {
+  return std::all_of(states, states + count, [bit](unsigned char s) { return (s & bit) != 0; });
+}
+
+bool AnyHasState(const unsigned char* states, std::size_t count, PixelValueState::Code bit) {
+  return std::any_of(states, states + count, [bit](unsigned char s) { return (s & bit) != 0; });
+}
+
 }  // namespace lumo
