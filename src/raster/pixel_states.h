@@ -10,9 +10,6 @@
 
 namespace lumo {
 
-/// Tells that none of the states has a bit that makes a pixel count for nothing.
-VEXG_EXPORT bool AllValid(const unsigned char* states, std::size_t count);
-
 /// Turns states into bytes of ones where a value is valid, else zeros. `states` may be null: all
 /// valid. @return how many are valid.
 VEXG_EXPORT std::size_t MaskValid(const unsigned char* states, std::size_t count,
@@ -21,9 +18,13 @@ VEXG_EXPORT std::size_t MaskValid(const unsigned char* states, std::size_t count
 /// Tells whether a bit is set in every state; true without any.
 VEXG_EXPORT bool AllHaveState(const unsigned char* states, std::size_t count,
                               PixelValueState::Code bit);
-/// Tells whether a bit is set in some state.
-VEXG_EXPORT bool AnyHasState(const unsigned char* states, std::size_t count,
-                             PixelValueState::Code bit);
+/// Tells whether some state has one of the bits.
+VEXG_EXPORT bool AnyHasState(const unsigned char* states, std::size_t count, unsigned char bits);
+
+/// Tells that none of the states has a bit that makes a pixel count for nothing.
+inline bool AllValid(const unsigned char* states, std::size_t count) {
+  return !AnyHasState(states, count, PixelValueState::NotValid);
+}
 
 /// Sets a bit of a state, or clears it.
 inline void SetState(unsigned char& state, PixelValueState::Code bit, bool on) {

@@ -29,8 +29,6 @@ const unsigned Raster<T>::TypeCode =
 
 namespace {
 
-constexpr unsigned kPairs = StatsMask::SumXY | StatsMask::Cov;
-
 /// Tells whether all statistics of `mask` are there, and those between bands for all bands.
 template <typename T>
 bool IsWhole(const RasterBandStats<T>& stats, unsigned mask, unsigned bands) {
@@ -47,7 +45,8 @@ template <typename T>
 RasterBandStats<T> Raster<T>::ComputeBandStats(unsigned band, unsigned mask, const IPC& ipc,
                                                unsigned shares) {
   const unsigned bands = Bands();
-  double left = std::popcount(mask & ~kPairs) + 1.0 * bands * std::popcount(mask & kPairs);
+  double left = std::popcount(mask & ~StatsMask::Pairs) +
+                1.0 * bands * std::popcount(mask & StatsMask::Pairs);
   const double divisor = left * shares;
   const auto share = [&](double weight) {
     left -= weight;
@@ -61,7 +60,7 @@ RasterBandStats<T> Raster<T>::ComputeBandStats(unsigned band, unsigned mask, con
   for (unsigned bit = StatsMask::Min; bit <= StatsMask::Cov; bit <<= 1) {
     const auto stat = static_cast<StatsMask::Code>(mask & bit);
     if (stat == StatsMask::None) continue;
-    if ((stat & kPairs) != 0) {
+    if ((stat & StatsMask::Pairs) != 0) {
       Array<double>& pairs = stat == StatsMask::SumXY ? stats.sumXY : stats.cov;
       if (!pairs.Resize(ArrayDims(bands))) return stats;
       for (unsigned other = 0; other < bands; ++other) pairs[other] = ask(stat, other).number;

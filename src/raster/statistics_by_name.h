@@ -1,6 +1,6 @@
 #pragma once
 
-#include "foundation/run_controls.h"
+#include "foundation/async.h"
 #include "raster/band_values.h"
 
 // The statistics and histograms of a raster by their names: each name is one line over the one

@@ -204,8 +204,8 @@ std::uint64_t DynamicRasterStats<T>::PixelCount(unsigned band, const IPC& ipc) {
 template <typename T>
 StatValue<T> DynamicRasterStats<T>::StatOf(StatsMask::Code stat, unsigned band, unsigned otherBand,
                                            const IPC& ipc) {
-  const bool isBetweenBands = stat == StatsMask::SumXY || stat == StatsMask::Cov;
-  if (isBetweenBands && StatsMode() != lumo::StatsMode::kExtended) return {};
+  const bool isOfPair = (stat & StatsMask::Pairs) != 0;
+  if (isOfPair && StatsMode() != lumo::StatsMode::kExtended) return {};
   return Get(band, stat, ipc, [=](const auto& entry) { return entry.ValueOf(stat, otherBand); });
 }
 

@@ -63,8 +63,6 @@ class BandStackRaster final : public ComputedRaster<T> {
   std::uint64_t WriteCount() const override;
 
  private:
-  static constexpr unsigned kPairs = StatsMask::SumXY | StatsMask::Cov;
-
   /// Where a band of the stack comes from.
   struct Source {
     unsigned member;

@@ -97,16 +97,18 @@ RasterPtr<T> BandStackRaster<T>::PyramidLevel(unsigned level) {
 
 template <typename T>
 bool BandStackRaster<T>::StatsExist(unsigned band, unsigned mask) const {
-  if ((mask & kPairs) != 0 && !ComputedRaster<T>::StatsExist(band, mask & kPairs)) return false;
+  if ((mask & StatsMask::Pairs) != 0 &&
+      !ComputedRaster<T>::StatsExist(band, mask & StatsMask::Pairs))
+    return false;
   return AskMember(band, [&](Raster<T>& member, unsigned local) {
-    return member.StatsExist(local, mask & ~kPairs);
+    return member.StatsExist(local, mask & ~StatsMask::Pairs);
   });
 }
 
 template <typename T>
 StatValue<T> BandStackRaster<T>::StatOf(StatsMask::Code stat, unsigned band, unsigned otherBand,
                                         const IPC& ipc) {
-  if ((stat & kPairs) != 0) return ComputedRaster<T>::StatOf(stat, band, otherBand, ipc);
+  if ((stat & StatsMask::Pairs) != 0) return ComputedRaster<T>::StatOf(stat, band, otherBand, ipc);
   return AskMember(
       band, [&](Raster<T>& member, unsigned local) { return member.StatOf(stat, local, 0, ipc); });
 }
@@ -168,7 +170,7 @@ RasterBandStats<T> BandStackRaster<T>::BandStats(unsigned band) const {
   stats.band = band;
   stats.sumXY = own.sumXY;
   stats.cov = own.cov;
-  stats.mask = (stats.mask & ~kPairs) | (own.mask & kPairs);
+  stats.mask = (stats.mask & ~StatsMask::Pairs) | (own.mask & StatsMask::Pairs);
   return stats;
 }
 

@@ -8,6 +8,7 @@
 #include "npy_writer.h"
 #include "option_values.h"
 #include "png_writer.h"
+#include "raster/pixel_states.h"
 #include "raster/pixel_types.h"
 
 namespace lumo::host {
@@ -69,9 +70,7 @@ class PngSink final : public PixelSink {
 /// True when a mask or a region excludes some of the pixels that were read. What a no-data value
 /// says, the values say themselves.
 bool AnyExcluded(const unsigned char* states, std::uint64_t count) {
-  unsigned char any = 0;
-  for (std::uint64_t i = 0; i < count; ++i) any |= states[i];
-  return (any & (PixelValueState::Masked | PixelValueState::OutsideROI)) != 0;
+  return AnyHasState(states, count, PixelValueState::Masked | PixelValueState::OutsideROI);
 }
 
 class ReadVerb final : public FileVerb {
