@@ -16,7 +16,7 @@ bool Scale(const TileInputs<TIn>& input, const std::vector<double>& gains,
       const auto to = RowOf(out, part, y);
       for (std::size_t i = 0; i < from.count;) {
         for (unsigned band = 0; band < bands; ++band, ++i) {
-          const bool valid = (from.states[i] & PixelValueState::NotValid) == 0;
+          const bool valid = IsValidState(from.states[i]);
           to.values[i] = valid ? TOut(gains[band] * from.values[i] + offsets[band]) : TOut();
         }
       }

@@ -15,6 +15,7 @@
 #include "gdal_reader.h"
 #include "raster/block_strides.h"
 #include "raster/no_data_marker.h"
+#include "raster/pixel_states.h"
 #include "raster/pixel_value.h"
 #include "raster/raster_details.h"
 
@@ -393,9 +394,7 @@ std::vector<unsigned char> Reader<T>::FindUntold(const BlockPlace& place, const 
                                                  const unsigned char* state) const {
   const std::size_t plane = std::size_t{place.width} * place.height;
   const std::size_t bands = place.bands.GetCount(), count = plane * bands;
-  unsigned char any = 0;
-  for (std::size_t i = 0; i < count; ++i) any |= state[i];
-  if ((any & PixelValueState::NotValid) == 0) return {};
+  if (AllValid(state, count)) return {};
   std::vector<std::optional<T>> values;
   for (const unsigned band : place.bands) values.push_back(noData_[band]);
   std::vector<unsigned char> told(count);
@@ -414,7 +413,7 @@ std::vector<unsigned char> Reader<T>::FindUntold(const BlockPlace& place, const 
       for (std::size_t x = 0; x < place.width; ++x, ++pixel) {
         const std::size_t at = y * strides.line + x * strides.pixel;
         const std::size_t here = at + band * strides.band;
-        if ((state[here] & PixelValueState::NotValid) == 0 || told[here] != 0) continue;
+        if (IsValidState(state[here]) || told[here] != 0) continue;
         if (hasAlpha && pixels[at + alpha * strides.band] == T{}) continue;
         untold[pixel] = 1;
         isAny = true;

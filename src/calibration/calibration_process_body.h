@@ -20,7 +20,7 @@ void FillInvalid(const unsigned char* state, T* out, std::size_t pixels,
   if (AllValid(state, pixels * bands)) return;
   for (std::size_t pixel = 0, i = 0; pixel < pixels; ++pixel) {
     for (std::size_t band = 0; band < bands; ++band, ++i) {
-      if ((state[i] & PixelValueState::NotValid) != 0) out[i] = fill[band];
+      if (!IsValidState(state[i])) out[i] = fill[band];
     }
   }
 }

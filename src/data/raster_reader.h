@@ -9,6 +9,7 @@
 #include "foundation/errors.h"
 #include "foundation/sub_rect.h"
 #include "raster/band_values.h"
+#include "raster/interleave.h"
 #include "raster/tile_dimensions.h"
 
 namespace lumo {
@@ -65,10 +66,6 @@ class VEXG_EXPORT BasicRasterReader {
 
   virtual ~BasicRasterReader() = default;
 };
-
-/// The bands that a block asked for in an interleave has: without an interleave one, whatever is
-/// asked for.
-VEXG_EXPORT Array<unsigned> BandsOfBlock(const Array<unsigned>& bands, Interleave interleave);
 
 /// The face of a raster source for pixel type T, one of TwelveTypes.
 template <typename T>

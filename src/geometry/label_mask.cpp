@@ -21,7 +21,7 @@ class RasterLabelMask final : public LabelMask {
     rect.bottom = line + lines - 1;
     if (!raster_->GetSubRect(rect, bands_, Interleave::BSQ, pixels_, states_)) return false;
     for (unsigned i = 0; i < pixels_.GetCount(); ++i) {
-      const bool counts = pixels_[i] != T() && (states_[i] & PixelValueState::NotValid) == 0;
+      const bool counts = pixels_[i] != T() && IsValidState(states_[i]);
       if (!counts) states[i] |= PixelValueState::Masked;
     }
     return true;

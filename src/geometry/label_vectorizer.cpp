@@ -20,7 +20,7 @@ void LabelVectorizer<T>::TakeLabels(const T* labels, const unsigned char* states
   std::copy_n(labels, line_.size(), line_.data());
   if (states != nullptr) {
     for (std::size_t x = 0; x < line_.size(); ++x) {
-      if ((states[x] & PixelValueState::NotValid) != 0) line_[x] = kExcluded;
+      if (!IsValidState(states[x])) line_[x] = kExcluded;
     }
   }
   if constexpr (std::is_floating_point_v<T>) {

@@ -5,10 +5,10 @@
 #include <cmath>
 #include <vector>
 
-#include "data/block_shape.h"
 #include "georef/affine_link.h"
 #include "georef/derived_georef.h"
 #include "mosaic/overlap_raster.h"
+#include "raster/block_shape.h"
 #include "raster/block_strides.h"
 #include "tasks/parallel_ranges.h"
 #include "views/reprojection.h"
@@ -167,8 +167,7 @@ class OverlapRasterGetDataParallel final : public ArrayParallelFor {
           const std::size_t at = out + band * strides_.band;
           const unsigned both = given_.firstState[in] | given_.secondState[in];
           pixels_[at] = given_.pixels[in];
-          state_[at] = (both & PixelValueState::NotValid) == 0 ? PixelValueState::Valid
-                                                               : PixelValueState::NoData;
+          state_[at] = IsValidState(both) ? PixelValueState::Valid : PixelValueState::NoData;
         }
       }
     }

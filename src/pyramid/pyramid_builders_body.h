@@ -226,8 +226,9 @@ bool AsyncOrvaPyramidBuilder<T>::MakeHistogram(const Rasters& rasters) {
     const unsigned bands = level->Bands();
     Array<T> mins{ArrayDims(bands)}, maxes{ArrayDims(bands)};
     for (unsigned band = 0; band < bands; ++band) {
-      mins[band] = level->Min(band, apart);
-      maxes[band] = level->Max(band, apart);
+      const auto stats = level->ComputeBandStats(band, StatsMask::Min | StatsMask::Max, apart);
+      mins[band] = stats.min;
+      maxes[band] = stats.max;
     }
     if (IsAborted()) return true;
     const RasterHistogramPtr<T> histogram = order_.def.bins == Form::kExact

@@ -5,6 +5,13 @@
 
 namespace lumo {
 
+/// The value of one statistic of a band: for Min and Max a pixel, for every other a number.
+template <typename T>
+struct StatValue {
+  T pixel{};
+  double number = 0;
+};
+
 /// The statistics of one band. A plain value; `mask` tells which of its fields are at hand.
 ///
 /// Its text form is band, mask, min, max, mean, std, sum, sum2, rms, then sumXY and cov as arrays,
@@ -28,6 +35,33 @@ struct RasterBandStats {
   /// Sets the entry of `otherBand`, the last of the array from then on, and the bit of the mask.
   void SetSumXY(unsigned otherBand, double value);
   void SetCov(unsigned otherBand, double value);
+
+  /// The field of a statistic that is a number of the band alone; null for every other.
+  static double RasterBandStats::*NumberField(StatsMask::Code stat) {
+    switch (stat) {
+      case StatsMask::Mean:
+        return &RasterBandStats::mean;
+      case StatsMask::Std:
+        return &RasterBandStats::std;
+      case StatsMask::Sum:
+        return &RasterBandStats::sum;
+      case StatsMask::Sum2:
+        return &RasterBandStats::sum2;
+      case StatsMask::RMS:
+        return &RasterBandStats::rms;
+      default:
+        return nullptr;
+    }
+  }
+  /// The value of a statistic as it stands here, at hand or not; of a pair that there isn't 0.
+  StatValue<T> ValueOf(StatsMask::Code stat, unsigned otherBand) const {
+    if (stat == StatsMask::Min || stat == StatsMask::Max) {
+      return {stat == StatsMask::Min ? min : max, 0};
+    }
+    if (const auto field = NumberField(stat)) return {T(), this->*field};
+    const Array<double>& pairs = stat == StatsMask::SumXY ? sumXY : cov;
+    return {T(), otherBand < pairs.GetCount() ? pairs[otherBand] : 0.0};
+  }
 };
 
 template <typename T>

@@ -31,7 +31,7 @@ void Fill(Tile<T>& tile, const std::vector<std::optional<T>>& fill) {
     for (std::size_t line = 0; line < tile.Height(); ++line) {
       std::size_t at = band * strides.band + line * strides.line;
       for (unsigned x = 0; x < tile.Width(); ++x, at += strides.pixel) {
-        const bool isValid = (tile.StateArray().GetData()[at] & PixelValueState::NotValid) == 0;
+        const bool isValid = IsValidState(tile.StateArray().GetData()[at]);
         if (!isValid) tile.PixelArray().GetData()[at] = *fill[band];
       }
     }

@@ -240,6 +240,12 @@ bool IsInterleave(Interleave interleave) {
 
 }  // namespace
 
+Array<unsigned> BandsOfBlock(const Array<unsigned>& bands, Interleave interleave) {
+  Array<unsigned> kept(bands);
+  if (interleave == Interleave::None && kept.GetCount() > 1) kept.Resize(ArrayDims(1));
+  return kept;
+}
+
 ArrayDims BlockDims(Interleave interleave, unsigned samples, unsigned lines, unsigned bands) {
   switch (interleave) {
     case Interleave::None:

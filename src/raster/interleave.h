@@ -2,6 +2,7 @@
 
 #include <cstddef>
 
+#include "foundation/array.h"
 #include "raster/raster_enums.h"
 
 namespace lumo {
@@ -10,6 +11,10 @@ namespace lumo {
 /// Without an interleave only lines and samples. An interleave that doesn't exist gives rank 0.
 VEXG_EXPORT ArrayDims BlockDims(Interleave interleave, unsigned samples, unsigned lines,
                                 unsigned bands);
+
+/// The bands that a block asked for in an interleave has: without an interleave one, whatever is
+/// asked for.
+VEXG_EXPORT Array<unsigned> BandsOfBlock(const Array<unsigned>& bands, Interleave interleave);
 
 /// Copies a block of samples by lines by bands elements from one order of its axes into another.
 /// The blocks have no gaps and do not overlap. The same call serves pixels and state bytes.

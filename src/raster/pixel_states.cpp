@@ -8,16 +8,16 @@
 namespace lumo {
 
 VEXG_VECTOR_CLONES
-bool AllValid(const unsigned char* states, std::size_t count) {
-  // In pieces, so that an early state that isn't valid ends it.
+bool AnyHasState(const unsigned char* states, std::size_t count, unsigned char bits) {
+  // In pieces, so that an early state ends it.
   constexpr std::size_t kPiece = 4096;
   for (std::size_t i = 0; i < count; i += kPiece) {
     const std::size_t end = std::min(i + kPiece, count);
     unsigned char any = 0;
     for (std::size_t j = i; j < end; ++j) any |= states[j];
-    if ((any & PixelValueState::NotValid) != 0) return false;
+    if ((any & bits) != 0) return true;
   }
-  return true;
+  return false;
 }
 
 VEXG_VECTOR_CLONES
@@ -27,11 +27,15 @@ std::size_t MaskValid(const unsigned char* states, std::size_t count, unsigned c
     return count;
   }
   for (std::size_t i = 0; i < count; ++i) {
-    mask[i] = (states[i] & PixelValueState::NotValid) == 0 ? 0xFF : 0;
+    mask[i] = IsValidState(states[i]) ? 0xFF : 0;
   }
   std::uint32_t valid = 0;
   for (std::size_t i = 0; i < count; ++i) valid += mask[i] & 1;
   return valid;
+}
+
+bool AllHaveState(const unsigned char* states, std::size_t count, PixelValueState::Code bit) {
+  return std::all_of(states, states + count, [bit](unsigned char s) { return (s & bit) != 0; });
 }
 
 }  // namespace lumo

@@ -2,18 +2,51 @@
 
 #include <cstddef>
 
-#include "raster/raster_enums.h"
+#include "foundation/sub_rect.h"
+#include "raster/block_strides.h"
+#include "raster/interleave.h"
 
-// Questions about state bytes, many at a time.
+// Questions about state bytes and changes of them, many at a time.
 
 namespace lumo {
-
-/// Tells that none of the states has a bit that makes a pixel count for nothing.
-VEXG_EXPORT bool AllValid(const unsigned char* states, std::size_t count);
 
 /// Turns states into bytes of ones where a value is valid, else zeros. `states` may be null: all
 /// valid. @return how many are valid.
 VEXG_EXPORT std::size_t MaskValid(const unsigned char* states, std::size_t count,
                                   unsigned char* mask);
+
+/// Tells whether a bit is set in every state; true without any.
+VEXG_EXPORT bool AllHaveState(const unsigned char* states, std::size_t count,
+                              PixelValueState::Code bit);
+/// Tells whether some state has one of the bits.
+VEXG_EXPORT bool AnyHasState(const unsigned char* states, std::size_t count, unsigned char bits);
+
+/// Tells that none of the states has a bit that makes a pixel count for nothing.
+inline bool AllValid(const unsigned char* states, std::size_t count) {
+  return !AnyHasState(states, count, PixelValueState::NotValid);
+}
+
+/// Sets a bit of a state, or clears it.
+inline void SetState(unsigned char& state, PixelValueState::Code bit, bool on) {
+  state = static_cast<unsigned char>(on ? state | bit : state & ~bit);
+}
+
+/// Sets a bit in the states of a block where `isMarked(x, y, band)` is true, and clears it
+/// elsewhere. x and y are pixels of the raster, and `states` is what GetSubRect has given.
+template <typename IsMarked>
+void MarkStates(const SubRect& rect, const Array<unsigned>& bands, Interleave interleave,
+                PixelValueState::Code bit, Array<unsigned char>& states, const IsMarked& isMarked) {
+  const Array<unsigned> shown = BandsOfBlock(bands, interleave);
+  const std::size_t width = rect.Width(), height = rect.Height();
+  const BlockStrides strides(interleave, width, height, shown.GetCount());
+  for (unsigned i = 0; i < shown.GetCount(); ++i) {
+    for (unsigned y = 0; y < height; ++y) {
+      unsigned char* state = states.GetData() + i * strides.band + y * strides.line;
+      for (unsigned x = 0; x < width; ++x, state += strides.pixel) {
+        SetState(*state, bit, isMarked(rect.left + x, rect.top + y, shown[i]));
+      }
+    }
+  }
+}
 
 }  // namespace lumo

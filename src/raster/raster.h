@@ -3,7 +3,7 @@
 #include "foundation/async.h"
 #include "foundation/color.h"
 #include "foundation/sub_rect.h"
-#include "raster/band_values.h"
+#include "raster/statistics_by_name.h"
 #include "raster/tile_dimensions.h"
 
 namespace lumo {
@@ -22,7 +22,7 @@ struct RasterDef;
 /// Threads:   every operation may be called on any thread, at the same time.
 /// Failure:   operations give false, 0 or empty. A raster that could not be made has IsValid()
 ///            false.
-class VEXG_EXPORT BasicRaster : public Object {
+class VEXG_EXPORT BasicRaster : public Object, public NumbersByName<BasicRaster> {
  public:
   static const unsigned TypeCode;
 
@@ -62,15 +62,9 @@ class VEXG_EXPORT BasicRaster : public Object {
   /// Stores the statistics through the data source.
   virtual bool WriteStats() = 0;
 
-  // Statistics of the valid pixels of a band, computed when they are not at hand. 0 on a failure.
-  virtual double Mean(unsigned band, const IPC& ipc) = 0;
-  virtual double Std(unsigned band, const IPC& ipc) = 0;  ///< of a sample: divided by n - 1
-  virtual double Sum(unsigned band, const IPC& ipc) = 0;
-  virtual double Sum2(unsigned band, const IPC& ipc) = 0;  ///< sum of the squares
-  virtual double RMS(unsigned band, const IPC& ipc) = 0;
-  // Between two bands; need StatsMode::kExtended.
-  virtual double SumXY(unsigned band, unsigned otherBand, const IPC& ipc) = 0;
-  virtual double Cov(unsigned band, unsigned otherBand, const IPC& ipc) = 0;
+  /// A statistic as a number, as Mean and the like give it: Raster<T>::StatOf without the pixel.
+  virtual double NumberOf(StatsMask::Code stat, unsigned band, unsigned otherBand,
+                          const IPC& ipc) = 0;
 
   /// The histogram run that goes on now; empty when none does.
   virtual AsyncPtr HistogramAsync() const = 0;
@@ -106,7 +100,9 @@ using RasterPtr = Pointer<Raster<T>>;
 
 /// A raster of pixel type T, one of TwelveTypes.
 template <typename T>
-class Raster : public BasicRaster {
+class Raster : public BasicRaster,
+               public ExtremesByName<Raster<T>, T>,
+               public HistogramsByName<Raster<T>, T> {
  public:
   static const unsigned TypeCode;
 
@@ -126,23 +122,27 @@ class Raster : public BasicRaster {
   virtual RasterBandStats<T> BandStats(unsigned band) const = 0;
   /// How many valid pixels were counted; 0 for a raster that does not count them.
   virtual std::uint64_t PixelCount(unsigned /*band*/, const IPC& /*ipc*/) { return 0; }
-  virtual T Min(unsigned band, const IPC& ipc) = 0;
-  virtual T Max(unsigned band, const IPC& ipc) = 0;
+  /// The value of one statistic, computed when it isn't at hand: the one question behind Min, Max,
+  /// Mean and the like. 0 on a failure.
+  /// @param otherBand  of SumXY and Cov alone, which need StatsMode::kExtended.
+  virtual StatValue<T> StatOf(StatsMask::Code stat, unsigned band, unsigned otherBand,
+                              const IPC& ipc) = 0;
+  double NumberOf(StatsMask::Code stat, unsigned band, unsigned otherBand, const IPC& ipc) final {
+    return StatOf(stat, band, otherBand, ipc).number;
+  }
+  /// The statistics of a band that `mask` names, those not at hand computed. A source may hold some
+  /// of them, of pixels that have changed since; then all come from one computation. The mask of
+  /// the result tells which ones are there: none after a failure.
+  /// @param shares  how many such calls, one after the other, share the progress.
+  RasterBandStats<T> ComputeBandStats(unsigned band, unsigned mask, const IPC& ipc,
+                                      unsigned shares = 1);
 
   /// Enters a known histogram by hand.
   virtual void SetBandHistogram(const RasterBandHistogram<T>& histogram) = 0;
   /// All the histograms at hand for the band.
   virtual Array<RasterBandHistogram<T>> BandHistogram(unsigned band) const = 0;
-  // Start to compute histograms of the values from `lower` to `upper`, both inclusive. Empty when
-  // that could not be started.
-  virtual AsyncPtr HistogramByBinSize(T lower, T upper, double binSize,
-                                      const Array<unsigned>& bands, HistogramSign sign,
-                                      const IPC& ipc) = 0;
-  virtual AsyncPtr HistogramByBinCount(T lower, T upper, unsigned binCount,
-                                       const Array<unsigned>& bands, HistogramSign sign,
-                                       const IPC& ipc) = 0;
-  virtual AsyncPtr HistogramAllBands(T lower, T upper, unsigned binCount, HistogramSign sign,
-                                     const IPC& ipc) = 0;
+  /// Starts to count histograms, in either form of bins. Empty when that could not be started.
+  virtual AsyncPtr CountHistogram(const HistogramRequest<T>& request, const IPC& ipc) = 0;
 
   virtual T NoDataValue(unsigned band) const = 0;
 
@@ -160,22 +160,10 @@ class Raster : public BasicRaster {
   virtual bool PutSubRect(const SubRect& rect, const Array<unsigned>& bands, Interleave interleave,
                           Array<T>& pixels, Array<unsigned char>& state) = 0;
 
-  /// Starts to count histograms, in either form of bins. Empty when that could not be started.
-  virtual AsyncPtr CountHistogram(const HistogramRequest<T>& request, const IPC& ipc);
-
   /// How often pixels that this raster shows have been written, by whatever way: a view gives what
   /// the rasters that it stands on give. Statistics and histograms hold for one such number.
   virtual std::uint64_t WriteCount() const { return 0; }
 };
-
-template <typename T>
-AsyncPtr Raster<T>::CountHistogram(const HistogramRequest<T>& request, const IPC& ipc) {
-  if (request.bins != Form::kTold) return {};  // a class that knows no other form
-  const auto& [lower, upper, binSize, binCount, bands, sign, bins] = request;
-  if (binSize > 0) return HistogramByBinSize(lower, upper, binSize, bands, sign, ipc);
-  return bands.GetCount() != 0 ? HistogramByBinCount(lower, upper, binCount, bands, sign, ipc)
-                               : HistogramAllBands(lower, upper, binCount, sign, ipc);
-}
 
 VEXG_EXTERN(TWELVE, Raster);
 

@@ -82,6 +82,11 @@ struct PixelValueState {
   };
 };
 
+/// Tells whether a pixel with this state counts.
+constexpr bool IsValidState(unsigned char state) {
+  return (state & PixelValueState::NotValid) == 0;
+}
+
 /// Which values of a RasterBandStats are at hand.
 struct StatsMask {
   enum Code : unsigned {
@@ -95,6 +100,7 @@ struct StatsMask {
     RMS = 64,
     SumXY = 128,
     Cov = 256,
+    Pairs = 384,     ///< SumXY and Cov, those between two bands
     Basic = 127,     ///< what StatsMode::kBasic gives
     Extended = 511,  ///< what StatsMode::kExtended gives
   };

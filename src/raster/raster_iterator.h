@@ -47,14 +47,14 @@ class VEXG_EXPORT BasicRasterIterator : public Object {
   bool IsA(unsigned typeCode) const override;
 
   /// Tiles in a row of the grid; 0 when there is no raster, or it has no pixels.
-  virtual unsigned Columns() const;
-  virtual unsigned Rows() const;
+  unsigned Columns() const;
+  unsigned Rows() const;
   /// The grid: tile size, borders, and band count of the raster.
-  virtual TileDimensions Dimensions() const { return dimensions_; }
-  virtual lumo::BorderMode BorderMode() const { return borderMode_; }
-  virtual unsigned BandCount() const { return bands_.GetCount(); }
+  TileDimensions Dimensions() const { return dimensions_; }
+  lumo::BorderMode BorderMode() const { return borderMode_; }
+  unsigned BandCount() const { return bands_.GetCount(); }
   /// The bands of the raster that a tile has, in its order.
-  virtual const Array<unsigned>& Bands() const { return bands_; }
+  const Array<unsigned>& Bands() const { return bands_; }
   /// The order of the axes in which tiles are read: BIP, unless a derived class says otherwise.
   Interleave Order() const { return order_; }
 

@@ -86,7 +86,7 @@ class QueryRasterValidityCommand final : public RasterCommand {
       for (std::size_t line = 0; line < tile.Height(); ++line) {
         std::size_t at = band * strides.band + line * strides.line;
         for (unsigned x = 0; x < tile.Width(); ++x, at += strides.pixel) {
-          if ((states[at] & PixelValueState::NotValid) == 0) use[band].Note(pixels[at]);
+          if (IsValidState(states[at])) use[band].Note(pixels[at]);
         }
       }
     }

@@ -6,7 +6,8 @@
 namespace lumo {
 
 /// A raster that stands on another one and leaves every operation to it: the base of the views,
-/// which write only what they change.
+/// which write only what they change. A view of other places overrides PlaceInParent, one of other
+/// bands BandOrder, and one of other states or values GetSubRect.
 ///
 /// Over an empty parent IsValid() is false, and operations give false, 0 or empty. GetURI and
 /// PixelCount are the view's own. Exists for TwelveTypes.
@@ -31,13 +32,6 @@ class RasterView : public Raster<T> {
   void SetStatsMode(lumo::StatsMode mode) override;
   lumo::StatsMode StatsMode() const override;
   bool WriteStats() override;
-  double Mean(unsigned band, const IPC& ipc) override;
-  double Std(unsigned band, const IPC& ipc) override;
-  double Sum(unsigned band, const IPC& ipc) override;
-  double Sum2(unsigned band, const IPC& ipc) override;
-  double RMS(unsigned band, const IPC& ipc) override;
-  double SumXY(unsigned band, unsigned otherBand, const IPC& ipc) override;
-  double Cov(unsigned band, unsigned otherBand, const IPC& ipc) override;
   AsyncPtr HistogramAsync() const override;
   bool WriteHistogram() override;
   unsigned Samples() const override;
@@ -54,32 +48,36 @@ class RasterView : public Raster<T> {
   RasterPtr<T> StoredPyramidLevel(unsigned level) override;
   void SetBandStats(const RasterBandStats<T>& stats) override;
   RasterBandStats<T> BandStats(unsigned band) const override;
-  T Min(unsigned band, const IPC& ipc) override;
-  T Max(unsigned band, const IPC& ipc) override;
+  StatValue<T> StatOf(StatsMask::Code stat, unsigned band, unsigned otherBand,
+                      const IPC& ipc) override;
   void SetBandHistogram(const RasterBandHistogram<T>& histogram) override;
   Array<RasterBandHistogram<T>> BandHistogram(unsigned band) const override;
-  AsyncPtr HistogramByBinSize(T lower, T upper, double binSize, const Array<unsigned>& bands,
-                              HistogramSign sign, const IPC& ipc) override;
-  AsyncPtr HistogramByBinCount(T lower, T upper, unsigned binCount, const Array<unsigned>& bands,
-                               HistogramSign sign, const IPC& ipc) override;
-  AsyncPtr HistogramAllBands(T lower, T upper, unsigned binCount, HistogramSign sign,
-                             const IPC& ipc) override;
+  AsyncPtr CountHistogram(const HistogramRequest<T>& request, const IPC& ipc) override;
   T NoDataValue(unsigned band) const override;
   bool GetSubRect(const SubRect& rect, const Array<unsigned>& bands, Interleave interleave,
                   Array<T>& pixels, Array<unsigned char>& state) override;
   bool PutSubRect(const SubRect& rect, const Array<unsigned>& bands, Interleave interleave,
                   Array<T>& pixels, Array<unsigned char>& state) override;
-  AsyncPtr CountHistogram(const HistogramRequest<T>& request, const IPC& ipc) override;
   std::uint64_t WriteCount() const override;
 
  protected:
   const RasterPtr<T>& Parent() const { return parent_; }
+  /// The pixels of the parent that a block of the view stands on.
+  virtual SubRect PlaceInParent(const SubRect& rect) const { return rect; }
+  /// The parent's band behind each band of the view, in order; null where they are the same. All
+  /// that is told by band then is the parent's with its numbers translated, in arrays of statistics
+  /// between bands as well. A band that the view doesn't have is the parent's first.
+  virtual const Array<unsigned>* BandOrder() const { return nullptr; }
   /// Lets go of the parent, as a destructor does that needs it closed.
   void ResetParent() { parent_ = RasterPtr<T>(); }
 
  private:
   template <typename Call>
   auto Ask(const Call& call) const;
+  template <typename Call>
+  auto AskBand(unsigned band, const Call& call) const;
+  template <typename Call>
+  bool AskBlock(const Array<unsigned>& bands, const Call& call) const;
 
   RasterPtr<T> parent_;
 };

@@ -1,5 +1,6 @@
 #pragma once
 
+#include "raster/band_order.h"
 #include "raster/raster_view.h"
 
 namespace lumo {
@@ -16,6 +17,23 @@ auto RasterView<T>::Ask(const Call& call) const {
   }
 }
 
+/// What `call(parent, its number of the band)` gives.
+template <typename T>
+template <typename Call>
+auto RasterView<T>::AskBand(unsigned band, const Call& call) const {
+  return Ask([&](Raster<T>& parent) { return call(parent, BandIn(BandOrder(), band)); });
+}
+
+/// What `call(parent, its numbers of the bands)` gives.
+template <typename T>
+template <typename Call>
+bool RasterView<T>::AskBlock(const Array<unsigned>& bands, const Call& call) const {
+  return Ask([&](Raster<T>& parent) {
+    const Array<unsigned>* const order = BandOrder();
+    return order != nullptr ? call(parent, BandsIn(*order, bands)) : call(parent, bands);
+  });
+}
+
 template <typename T>
 bool RasterView<T>::IsValid() const {
   return Raster<T>::IsValid() && Ask([](Raster<T>& parent) { return parent.IsValid(); });
@@ -28,7 +46,11 @@ bool RasterView<T>::CanWrite() const {
 
 template <typename T>
 RasterDef RasterView<T>::GetRasterDef() const {
-  return Ask([](Raster<T>& parent) { return parent.GetRasterDef(); });
+  return Ask([&](Raster<T>& parent) {
+    RasterDef def = parent.GetRasterDef();
+    if (const Array<unsigned>* const order = BandOrder()) ChooseBands(def, *order);
+    return def;
+  });
 }
 
 template <typename T>
@@ -64,7 +86,8 @@ bool RasterView<T>::PyramidRefresh() {
 
 template <typename T>
 bool RasterView<T>::StatsExist(unsigned band, unsigned mask) const {
-  return Ask([&](Raster<T>& parent) { return parent.StatsExist(band, mask); });
+  return AskBand(band,
+                 [&](Raster<T>& parent, unsigned asked) { return parent.StatsExist(asked, mask); });
 }
 
 template <typename T>
@@ -93,41 +116,6 @@ bool RasterView<T>::WriteStats() {
 }
 
 template <typename T>
-double RasterView<T>::Mean(unsigned band, const IPC& ipc) {
-  return Ask([&](Raster<T>& parent) { return parent.Mean(band, ipc); });
-}
-
-template <typename T>
-double RasterView<T>::Std(unsigned band, const IPC& ipc) {
-  return Ask([&](Raster<T>& parent) { return parent.Std(band, ipc); });
-}
-
-template <typename T>
-double RasterView<T>::Sum(unsigned band, const IPC& ipc) {
-  return Ask([&](Raster<T>& parent) { return parent.Sum(band, ipc); });
-}
-
-template <typename T>
-double RasterView<T>::Sum2(unsigned band, const IPC& ipc) {
-  return Ask([&](Raster<T>& parent) { return parent.Sum2(band, ipc); });
-}
-
-template <typename T>
-double RasterView<T>::RMS(unsigned band, const IPC& ipc) {
-  return Ask([&](Raster<T>& parent) { return parent.RMS(band, ipc); });
-}
-
-template <typename T>
-double RasterView<T>::SumXY(unsigned band, unsigned otherBand, const IPC& ipc) {
-  return Ask([&](Raster<T>& parent) { return parent.SumXY(band, otherBand, ipc); });
-}
-
-template <typename T>
-double RasterView<T>::Cov(unsigned band, unsigned otherBand, const IPC& ipc) {
-  return Ask([&](Raster<T>& parent) { return parent.Cov(band, otherBand, ipc); });
-}
-
-template <typename T>
 AsyncPtr RasterView<T>::HistogramAsync() const {
   return Ask([](Raster<T>& parent) { return parent.HistogramAsync(); });
 }
@@ -149,32 +137,38 @@ unsigned RasterView<T>::Lines() const {
 
 template <typename T>
 unsigned RasterView<T>::Bands() const {
-  return Ask([](Raster<T>& parent) { return parent.Bands(); });
+  return Ask([&](Raster<T>& parent) {
+    const Array<unsigned>* const order = BandOrder();
+    return order != nullptr ? order->GetCount() : parent.Bands();
+  });
 }
 
 template <typename T>
 bool RasterView<T>::HasNoDataValue(unsigned band) const {
-  return Ask([&](Raster<T>& parent) { return parent.HasNoDataValue(band); });
+  return AskBand(band,
+                 [&](Raster<T>& parent, unsigned asked) { return parent.HasNoDataValue(asked); });
 }
 
 template <typename T>
 bool RasterView<T>::HasPalette(unsigned band) const {
-  return Ask([&](Raster<T>& parent) { return parent.HasPalette(band); });
+  return AskBand(band, [&](Raster<T>& parent, unsigned asked) { return parent.HasPalette(asked); });
 }
 
 template <typename T>
 PalettePtr RasterView<T>::Palette(unsigned band) const {
-  return Ask([&](Raster<T>& parent) { return parent.Palette(band); });
+  return AskBand(band, [&](Raster<T>& parent, unsigned asked) { return parent.Palette(asked); });
 }
 
 template <typename T>
 bool RasterView<T>::WritePalette(unsigned band, const PalettePtr& palette) {
-  return Ask([&](Raster<T>& parent) { return parent.WritePalette(band, palette); });
+  return AskBand(
+      band, [&](Raster<T>& parent, unsigned asked) { return parent.WritePalette(asked, palette); });
 }
 
 template <typename T>
 bool RasterView<T>::DeletePalette(unsigned band) {
-  return Ask([&](Raster<T>& parent) { return parent.DeletePalette(band); });
+  return AskBand(band,
+                 [](Raster<T>& parent, unsigned asked) { return parent.DeletePalette(asked); });
 }
 
 template <typename T>
@@ -199,84 +193,85 @@ RasterPtr<T> RasterView<T>::StoredPyramidLevel(unsigned level) {
 
 template <typename T>
 void RasterView<T>::SetBandStats(const RasterBandStats<T>& stats) {
-  return Ask([&](Raster<T>& parent) { return parent.SetBandStats(stats); });
+  Ask([&](Raster<T>& parent) {
+    const Array<unsigned>* const order = BandOrder();
+    if (order == nullptr) return parent.SetBandStats(stats);
+    const RasterBandStats<T> known = parent.BandStats(BandIn(order, stats.band));
+    parent.SetBandStats(StatsOfParent(stats, *order, known, parent.Bands()));
+  });
 }
 
 template <typename T>
 RasterBandStats<T> RasterView<T>::BandStats(unsigned band) const {
-  return Ask([&](Raster<T>& parent) { return parent.BandStats(band); });
+  return AskBand(band, [&](Raster<T>& parent, unsigned asked) {
+    RasterBandStats<T> stats = parent.BandStats(asked);
+    if (const Array<unsigned>* const order = BandOrder()) stats = StatsOfView(stats, *order, band);
+    return stats;
+  });
 }
 
 template <typename T>
-T RasterView<T>::Min(unsigned band, const IPC& ipc) {
-  return Ask([&](Raster<T>& parent) { return parent.Min(band, ipc); });
-}
-
-template <typename T>
-T RasterView<T>::Max(unsigned band, const IPC& ipc) {
-  return Ask([&](Raster<T>& parent) { return parent.Max(band, ipc); });
+StatValue<T> RasterView<T>::StatOf(StatsMask::Code stat, unsigned band, unsigned otherBand,
+                                   const IPC& ipc) {
+  const unsigned other = BandIn(BandOrder(), otherBand);
+  return AskBand(band, [&](Raster<T>& parent, unsigned asked) {
+    return parent.StatOf(stat, asked, other, ipc);
+  });
 }
 
 template <typename T>
 void RasterView<T>::SetBandHistogram(const RasterBandHistogram<T>& histogram) {
-  return Ask([&](Raster<T>& parent) { return parent.SetBandHistogram(histogram); });
+  AskBand(histogram.band, [&](Raster<T>& parent, unsigned asked) {
+    RasterBandHistogram<T> mapped = histogram;
+    mapped.band = asked;
+    parent.SetBandHistogram(mapped);
+  });
 }
 
 template <typename T>
 Array<RasterBandHistogram<T>> RasterView<T>::BandHistogram(unsigned band) const {
-  return Ask([&](Raster<T>& parent) { return parent.BandHistogram(band); });
-}
-
-template <typename T>
-AsyncPtr RasterView<T>::HistogramByBinSize(T lower, T upper, double binSize,
-                                           const Array<unsigned>& bands, HistogramSign sign,
-                                           const IPC& ipc) {
-  return Ask([&](Raster<T>& parent) {
-    return parent.HistogramByBinSize(lower, upper, binSize, bands, sign, ipc);
-  });
-}
-
-template <typename T>
-AsyncPtr RasterView<T>::HistogramByBinCount(T lower, T upper, unsigned binCount,
-                                            const Array<unsigned>& bands, HistogramSign sign,
-                                            const IPC& ipc) {
-  return Ask([&](Raster<T>& parent) {
-    return parent.HistogramByBinCount(lower, upper, binCount, bands, sign, ipc);
-  });
-}
-
-template <typename T>
-AsyncPtr RasterView<T>::HistogramAllBands(T lower, T upper, unsigned binCount, HistogramSign sign,
-                                          const IPC& ipc) {
-  return Ask([&](Raster<T>& parent) {
-    return parent.HistogramAllBands(lower, upper, binCount, sign, ipc);
+  return AskBand(band, [&](Raster<T>& parent, unsigned asked) {
+    auto histograms = parent.BandHistogram(asked);
+    if (asked != band) {
+      for (RasterBandHistogram<T>& histogram : histograms) histogram.band = band;
+    }
+    return histograms;
   });
 }
 
 template <typename T>
 T RasterView<T>::NoDataValue(unsigned band) const {
-  return Ask([&](Raster<T>& parent) { return parent.NoDataValue(band); });
+  return AskBand(band,
+                 [&](Raster<T>& parent, unsigned asked) { return parent.NoDataValue(asked); });
 }
 
 template <typename T>
 bool RasterView<T>::GetSubRect(const SubRect& rect, const Array<unsigned>& bands,
                                Interleave interleave, Array<T>& pixels,
                                Array<unsigned char>& state) {
-  return Ask(
-      [&](Raster<T>& parent) { return parent.GetSubRect(rect, bands, interleave, pixels, state); });
+  return AskBlock(bands, [&](Raster<T>& parent, const Array<unsigned>& asked) {
+    return parent.GetSubRect(PlaceInParent(rect), asked, interleave, pixels, state);
+  });
 }
 
 template <typename T>
 bool RasterView<T>::PutSubRect(const SubRect& rect, const Array<unsigned>& bands,
                                Interleave interleave, Array<T>& pixels,
                                Array<unsigned char>& state) {
-  return Ask(
-      [&](Raster<T>& parent) { return parent.PutSubRect(rect, bands, interleave, pixels, state); });
+  return AskBlock(bands, [&](Raster<T>& parent, const Array<unsigned>& asked) {
+    return parent.PutSubRect(PlaceInParent(rect), asked, interleave, pixels, state);
+  });
 }
 
 template <typename T>
 AsyncPtr RasterView<T>::CountHistogram(const HistogramRequest<T>& request, const IPC& ipc) {
-  return Ask([&](Raster<T>& parent) { return parent.CountHistogram(request, ipc); });
+  return Ask([&](Raster<T>& parent) {
+    const Array<unsigned>* const order = BandOrder();
+    if (order == nullptr) return parent.CountHistogram(request, ipc);
+    HistogramRequest<T> mapped = request;
+    mapped.bands = request.bands.GetCount() != 0 ? BandsIn(*order, request.bands) : *order;
+    return parent.CountHistogram(mapped, ipc);
+  });
 }
 
 template <typename T>

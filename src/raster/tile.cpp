@@ -1,34 +1,10 @@
 #include "raster/tile.h"
 
 #include "foundation/type_code.h"
-#include "raster/interleave.h"
+#include "raster/pixel_states.h"
 #include "raster/tile_body.h"
 
 namespace lumo {
-namespace {
-
-bool AnyBit(const BasicTile& tile, int x, int y, unsigned char bit) {
-  const unsigned char* const states = tile.StateArray().GetData() + tile.Offset(x, y);
-  return std::any_of(states, states + tile.Bands(), [bit](unsigned char s) { return s & bit; });
-}
-
-bool AllBits(const BasicTile& tile, int x, int y, unsigned char bit) {
-  const unsigned char* const states = tile.StateArray().GetData() + tile.Offset(x, y);
-  return std::all_of(states, states + tile.Bands(), [bit](unsigned char s) { return s & bit; });
-}
-
-void SetBit(unsigned char& state, unsigned char bit, bool on) {
-  state = static_cast<unsigned char>(on ? state | bit : state & ~bit);
-}
-
-void SetBits(BasicTile& tile, int x, int y, unsigned char bit, bool on) {
-  unsigned char* const states = tile.StateArray().GetData() + tile.Offset(x, y);
-  for (unsigned band = 0; band < tile.Bands(); ++band) SetBit(states[band], bit, on);
-}
-
-using State = PixelValueState;
-
-}  // namespace
 
 const unsigned BasicTile::TypeCode = GloballyUniqueObjectTypeCode("BasicTile");
 
@@ -51,7 +27,7 @@ bool BasicTile::Resize(unsigned width, unsigned height, unsigned bands) {
 
 bool BasicTile::Resize(const TileDimensions& dimensions) {
   if (!Size(dimensions, Interleave::BIP)) return false;
-  std::ranges::fill(state_, static_cast<unsigned char>(State::Valid));
+  std::ranges::fill(state_, static_cast<unsigned char>(PixelValueState::Valid));
   return true;
 }
 
@@ -79,52 +55,20 @@ bool BasicTile::Size(const TileDimensions& dimensions, Interleave order) {
   return false;
 }
 
-bool BasicTile::AllNoData(int x, int y) const {
-  return AllBits(*this, x, y, State::NoData);
-}
-bool BasicTile::AnyNoData(int x, int y) const {
-  return AnyBit(*this, x, y, State::NoData);
-}
-bool BasicTile::IsNoData(int x, int y, unsigned band) const {
-  return (PixelState(x, y, band) & State::NoData) != 0;
-}
-void BasicTile::SetNoData(int x, int y, unsigned band, bool on) {
-  SetBit(state_[Offset(x, y) + band], State::NoData, on);
-}
-void BasicTile::SetNoDataAll(int x, int y, bool on) {
-  SetBits(*this, x, y, State::NoData, on);
+bool BasicTile::AllHave(int x, int y, PixelValueState::Code bit) const {
+  return AllHaveState(state_.GetData() + Offset(x, y), Bands(), bit);
 }
 
-bool BasicTile::AllMasked(int x, int y) const {
-  return AllBits(*this, x, y, State::Masked);
-}
-bool BasicTile::AnyMasked(int x, int y) const {
-  return AnyBit(*this, x, y, State::Masked);
-}
-bool BasicTile::IsMasked(int x, int y, unsigned band) const {
-  return (PixelState(x, y, band) & State::Masked) != 0;
-}
-void BasicTile::SetMasked(int x, int y, unsigned band, bool on) {
-  SetBit(state_[Offset(x, y) + band], State::Masked, on);
-}
-void BasicTile::SetMaskedAll(int x, int y, bool on) {
-  SetBits(*this, x, y, State::Masked, on);
+bool BasicTile::AnyHas(int x, int y, PixelValueState::Code bit) const {
+  return AnyHasState(state_.GetData() + Offset(x, y), Bands(), bit);
 }
 
-bool BasicTile::AllOutsideROI(int x, int y) const {
-  return AllBits(*this, x, y, State::OutsideROI);
+void BasicTile::Set(int x, int y, unsigned band, PixelValueState::Code bit, bool on) {
+  SetState(state_[Offset(x, y) + band], bit, on);
 }
-bool BasicTile::AnyOutsideROI(int x, int y) const {
-  return AnyBit(*this, x, y, State::OutsideROI);
-}
-bool BasicTile::IsOutsideROI(int x, int y, unsigned band) const {
-  return (PixelState(x, y, band) & State::OutsideROI) != 0;
-}
-void BasicTile::SetOutsideROI(int x, int y, unsigned band, bool on) {
-  SetBit(state_[Offset(x, y) + band], State::OutsideROI, on);
-}
-void BasicTile::SetOutsideROIAll(int x, int y, bool on) {
-  SetBits(*this, x, y, State::OutsideROI, on);
+
+void BasicTile::SetAll(int x, int y, PixelValueState::Code bit, bool on) {
+  for (unsigned band = 0; band < Bands(); ++band) Set(x, y, band, bit, on);
 }
 
 void JoinStates(const BasicTile& shape, BasicTile& tile) {
@@ -138,12 +82,12 @@ void JoinStates(const BasicTile& shape, BasicTile& tile) {
   unsigned char* to = tile.StateArray().GetData();
   for (std::int64_t y = top; y < top + static_cast<std::int64_t>(tile.FullHeight()); ++y) {
     for (std::int64_t x = left; x < left + static_cast<std::int64_t>(tile.FullWidth()); ++x) {
-      unsigned char joined = State::NoData;
+      unsigned char joined = PixelValueState::NoData;
       if (contains(x, y)) {
         joined = 0;
         const unsigned char* const from = shape.StateArray().GetData() + shape.Offset(x, y);
         for (unsigned band = 0; band < shape.Bands(); ++band) joined |= from[band];
-        joined &= State::NotValid;
+        joined &= PixelValueState::NotValid;
       }
       to = std::fill_n(to, tile.Bands(), joined);
     }

@@ -26,31 +26,31 @@ class VEXG_EXPORT BasicTile : public Object {
   static const unsigned TypeCode;
   bool IsA(unsigned typeCode) const override;
 
-  virtual unsigned Width() const { return dimensions_.width; }
-  virtual unsigned Height() const { return dimensions_.height; }
-  virtual unsigned Bands() const { return dimensions_.bands; }
-  virtual unsigned BorderLeft() const { return dimensions_.borderLeft; }
-  virtual unsigned BorderRight() const { return dimensions_.borderRight; }
-  virtual unsigned BorderTop() const { return dimensions_.borderTop; }
-  virtual unsigned BorderBottom() const { return dimensions_.borderBottom; }
-  virtual unsigned BorderClamp() const { return dimensions_.borderClamp; }
+  unsigned Width() const { return dimensions_.width; }
+  unsigned Height() const { return dimensions_.height; }
+  unsigned Bands() const { return dimensions_.bands; }
+  unsigned BorderLeft() const { return dimensions_.borderLeft; }
+  unsigned BorderRight() const { return dimensions_.borderRight; }
+  unsigned BorderTop() const { return dimensions_.borderTop; }
+  unsigned BorderBottom() const { return dimensions_.borderBottom; }
+  unsigned BorderClamp() const { return dimensions_.borderClamp; }
 
   /// The first pixel inside the borders, in raster coordinates.
-  virtual void SetOrigin(const TilePosition& origin) { origin_ = origin; }
-  virtual TilePosition Origin() const { return origin_; }
+  void SetOrigin(const TilePosition& origin) { origin_ = origin; }
+  TilePosition Origin() const { return origin_; }
   /// Column and row in the grid of the iterator.
-  virtual void SetIndex(const TilePosition& index) { index_ = index; }
-  virtual TilePosition Index() const { return index_; }
+  void SetIndex(const TilePosition& index) { index_ = index; }
+  TilePosition Index() const { return index_; }
 
   /// Sizes the tile: states become 0, pixels keep whatever the storage holds. Storage is used again
   /// where it is large enough.
   /// @return false for a width, height or band count of 0, or a size that can't be had.
-  virtual bool Resize(unsigned width, unsigned height, unsigned bands, unsigned left,
-                      unsigned right, unsigned top, unsigned bottom);
-  virtual bool Resize(unsigned width, unsigned height, unsigned bands, unsigned border);
-  virtual bool Resize(unsigned width, unsigned height, unsigned bands);
-  virtual bool Resize(const TileDimensions& dimensions);
-  virtual TileDimensions Dimensions() const { return dimensions_; }
+  bool Resize(unsigned width, unsigned height, unsigned bands, unsigned left, unsigned right,
+              unsigned top, unsigned bottom);
+  bool Resize(unsigned width, unsigned height, unsigned bands, unsigned border);
+  bool Resize(unsigned width, unsigned height, unsigned bands);
+  bool Resize(const TileDimensions& dimensions);
+  TileDimensions Dimensions() const { return dimensions_; }
   /// Sizes a tile that is written whole next: its pixels and its states keep whatever the storage
   /// holds.
   /// @param order  of the axes: the arrays are in the shape of BlockDims; BIP where there are
@@ -61,29 +61,41 @@ class VEXG_EXPORT BasicTile : public Object {
 
   // For each bit of the state: set in every band (true without bands), in some band, in one band;
   // and its changes.
-  virtual bool AllNoData(int x, int y) const;
-  virtual bool AnyNoData(int x, int y) const;
-  virtual bool IsNoData(int x, int y, unsigned band) const;
-  virtual void SetNoData(int x, int y, unsigned band, bool on);
-  virtual void SetNoDataAll(int x, int y, bool on);
-  virtual bool AllMasked(int x, int y) const;
-  virtual bool AnyMasked(int x, int y) const;
-  virtual bool IsMasked(int x, int y, unsigned band) const;
-  virtual void SetMasked(int x, int y, unsigned band, bool on);
-  virtual void SetMaskedAll(int x, int y, bool on);
-  virtual bool AllOutsideROI(int x, int y) const;
-  virtual bool AnyOutsideROI(int x, int y) const;
-  virtual bool IsOutsideROI(int x, int y, unsigned band) const;
-  virtual void SetOutsideROI(int x, int y, unsigned band, bool on);
-  virtual void SetOutsideROIAll(int x, int y, bool on);
+  bool AllNoData(int x, int y) const { return AllHave(x, y, PixelValueState::NoData); }
+  bool AnyNoData(int x, int y) const { return AnyHas(x, y, PixelValueState::NoData); }
+  bool IsNoData(int x, int y, unsigned band) const {
+    return Has(x, y, band, PixelValueState::NoData);
+  }
+  void SetNoData(int x, int y, unsigned band, bool on) {
+    Set(x, y, band, PixelValueState::NoData, on);
+  }
+  void SetNoDataAll(int x, int y, bool on) { SetAll(x, y, PixelValueState::NoData, on); }
+  bool AllMasked(int x, int y) const { return AllHave(x, y, PixelValueState::Masked); }
+  bool AnyMasked(int x, int y) const { return AnyHas(x, y, PixelValueState::Masked); }
+  bool IsMasked(int x, int y, unsigned band) const {
+    return Has(x, y, band, PixelValueState::Masked);
+  }
+  void SetMasked(int x, int y, unsigned band, bool on) {
+    Set(x, y, band, PixelValueState::Masked, on);
+  }
+  void SetMaskedAll(int x, int y, bool on) { SetAll(x, y, PixelValueState::Masked, on); }
+  bool AllOutsideROI(int x, int y) const { return AllHave(x, y, PixelValueState::OutsideROI); }
+  bool AnyOutsideROI(int x, int y) const { return AnyHas(x, y, PixelValueState::OutsideROI); }
+  bool IsOutsideROI(int x, int y, unsigned band) const {
+    return Has(x, y, band, PixelValueState::OutsideROI);
+  }
+  void SetOutsideROI(int x, int y, unsigned band, bool on) {
+    Set(x, y, band, PixelValueState::OutsideROI, on);
+  }
+  void SetOutsideROIAll(int x, int y, bool on) { SetAll(x, y, PixelValueState::OutsideROI, on); }
 
   /// The state bytes, in the shape of the pixels.
-  virtual const Array<unsigned char>& StateArray() const { return state_; }
-  virtual Array<unsigned char>& StateArray() { return state_; }
-  virtual void SetPixelState(int x, int y, unsigned band, unsigned char state) {
+  const Array<unsigned char>& StateArray() const { return state_; }
+  Array<unsigned char>& StateArray() { return state_; }
+  void SetPixelState(int x, int y, unsigned band, unsigned char state) {
     state_[Offset(x, y) + band] = state;
   }
-  virtual unsigned char PixelState(int x, int y, unsigned band) const {
+  unsigned char PixelState(int x, int y, unsigned band) const {
     return state_[Offset(x, y) + band];
   }
 
@@ -109,6 +121,13 @@ class VEXG_EXPORT BasicTile : public Object {
 
  private:
   bool Size(const TileDimensions& dimensions, Interleave order);
+  bool AllHave(int x, int y, PixelValueState::Code bit) const;
+  bool AnyHas(int x, int y, PixelValueState::Code bit) const;
+  bool Has(int x, int y, unsigned band, PixelValueState::Code bit) const {
+    return (PixelState(x, y, band) & bit) != 0;
+  }
+  void Set(int x, int y, unsigned band, PixelValueState::Code bit, bool on);
+  void SetAll(int x, int y, PixelValueState::Code bit, bool on);
 
   TilePosition origin_;
   TilePosition index_;

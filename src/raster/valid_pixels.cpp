@@ -24,7 +24,7 @@ void ValidPixels::Add(const BasicTile& tile) {
     for (std::size_t line = 0; line < tile.Height(); ++line) {
       const unsigned char* state = states + band * strides.band + line * strides.line;
       for (unsigned x = 0; x < tile.Width(); ++x, state += strides.pixel) {
-        valid += (*state & PixelValueState::NotValid) == 0 ? 1 : 0;
+        valid += IsValidState(*state) ? 1 : 0;
       }
     }
     const std::lock_guard lock(mutex_);

@@ -25,22 +25,16 @@ namespace lumo {
 /// Threads:   every operation may be called on any thread. The lock is never held while pixels are
 ///            read.
 template <typename T>
-class DynamicRasterHistogram : public ErrorState {
+class DynamicRasterHistogram : public ErrorState,
+                               public HistogramsByName<DynamicRasterHistogram<T>, T> {
  public:
   explicit DynamicRasterHistogram(Raster<T>* raster);
   ~DynamicRasterHistogram() override;
   DynamicRasterHistogram(const DynamicRasterHistogram&) = delete;
   DynamicRasterHistogram& operator=(const DynamicRasterHistogram&) = delete;
 
-  // Start a run over the values from `lower` to `upper`, both inclusive, of the bands given, or of
-  // all for an empty list. Empty while a run goes on, for a band that the raster doesn't have, and
-  // when none could be started. See RasterHistogram for the bins.
-  AsyncPtr HistogramByBinSize(T lower, T upper, double binSize, const Array<unsigned>& bands,
-                              HistogramSign sign, const IPC& ipc);
-  AsyncPtr HistogramByBinCount(T lower, T upper, unsigned binCount, const Array<unsigned>& bands,
-                               HistogramSign sign, const IPC& ipc);
-  AsyncPtr HistogramAllBands(T lower, T upper, unsigned binCount, HistogramSign sign,
-                             const IPC& ipc);
+  /// Starts a run. Empty while a run goes on, for a band that the raster doesn't have, and when
+  /// none could be started. See RasterHistogram for the bins.
   AsyncPtr CountHistogram(const HistogramRequest<T>& request, const IPC& ipc);
   /// The run that goes on now; empty when none does.
   AsyncPtr HistogramAsync() const;
@@ -66,24 +60,11 @@ class DynamicRasterHistogram : public ErrorState {
 
 /// The empty form for complex numbers.
 template <typename T>
-class DynamicRasterHistogram<Complex<T>> : public ErrorState {
+class DynamicRasterHistogram<Complex<T>>
+    : public ErrorState, public HistogramsByName<DynamicRasterHistogram<Complex<T>>, Complex<T>> {
  public:
   explicit DynamicRasterHistogram(Raster<Complex<T>>* /*raster*/) {}
 
-  AsyncPtr HistogramByBinSize(Complex<T> /*lower*/, Complex<T> /*upper*/, double /*binSize*/,
-                              const Array<unsigned>& /*bands*/, HistogramSign /*sign*/,
-                              const IPC& /*ipc*/) {
-    return {};
-  }
-  AsyncPtr HistogramByBinCount(Complex<T> /*lower*/, Complex<T> /*upper*/, unsigned /*binCount*/,
-                               const Array<unsigned>& /*bands*/, HistogramSign /*sign*/,
-                               const IPC& /*ipc*/) {
-    return {};
-  }
-  AsyncPtr HistogramAllBands(Complex<T> /*lower*/, Complex<T> /*upper*/, unsigned /*binCount*/,
-                             HistogramSign /*sign*/, const IPC& /*ipc*/) {
-    return {};
-  }
   AsyncPtr CountHistogram(const HistogramRequest<Complex<T>>& /*request*/, const IPC& /*ipc*/) {
     return {};
   }

@@ -103,26 +103,6 @@ AsyncPtr DynamicRasterHistogram<T>::CountHistogram(const HistogramRequest<T>& re
 }
 
 template <typename T>
-AsyncPtr DynamicRasterHistogram<T>::HistogramByBinSize(T lower, T upper, double binSize,
-                                                       const Array<unsigned>& bands,
-                                                       HistogramSign sign, const IPC& ipc) {
-  return CountHistogram({lower, upper, binSize, 0, bands, sign}, ipc);
-}
-
-template <typename T>
-AsyncPtr DynamicRasterHistogram<T>::HistogramByBinCount(T lower, T upper, unsigned binCount,
-                                                        const Array<unsigned>& bands,
-                                                        HistogramSign sign, const IPC& ipc) {
-  return CountHistogram({lower, upper, 0, binCount, bands, sign}, ipc);
-}
-
-template <typename T>
-AsyncPtr DynamicRasterHistogram<T>::HistogramAllBands(T lower, T upper, unsigned binCount,
-                                                      HistogramSign sign, const IPC& ipc) {
-  return CountHistogram({lower, upper, 0, binCount, {}, sign}, ipc);
-}
-
-template <typename T>
 AsyncPtr DynamicRasterHistogram<T>::HistogramAsync() const {
   const std::lock_guard lock(lock_);
   return CheckRunning() ? AsyncPtr(run_->process) : AsyncPtr();

@@ -27,7 +27,9 @@ namespace lumo {
 ///            read, or while a getter waits.
 /// Failure:   getters give 0, and have told the fault text.
 template <typename T>
-class DynamicRasterStats : public ErrorState {
+class DynamicRasterStats : public ErrorState,
+                           public NumbersByName<DynamicRasterStats<T>>,
+                           public ExtremesByName<DynamicRasterStats<T>, T> {
  public:
   explicit DynamicRasterStats(Raster<T>* raster);
   ~DynamicRasterStats() override;
@@ -52,19 +54,14 @@ class DynamicRasterStats : public ErrorState {
   /// What is at hand for the band; with mask 0 when nothing is.
   RasterBandStats<T> BandStats(unsigned band) const;
 
-  // The value at hand; else after a computation that is started here, or the one that runs, has
-  // ended. 0 when it is then still missing.
+  /// The value at hand; else after a computation that is started here, or the one that runs, has
+  /// ended. 0 when it is then still missing, and for SumXY and Cov in the basic mode. Min, Mean and
+  /// the like ask it.
+  StatValue<T> StatOf(StatsMask::Code stat, unsigned band, unsigned otherBand, const IPC& ipc);
+  double NumberOf(StatsMask::Code stat, unsigned band, unsigned otherBand, const IPC& ipc) {
+    return StatOf(stat, band, otherBand, ipc).number;
+  }
   std::uint64_t PixelCount(unsigned band, const IPC& ipc);
-  T Min(unsigned band, const IPC& ipc);
-  T Max(unsigned band, const IPC& ipc);
-  double Mean(unsigned band, const IPC& ipc);
-  double Std(unsigned band, const IPC& ipc);  ///< of a sample: divided by n - 1
-  double Sum(unsigned band, const IPC& ipc);
-  double Sum2(unsigned band, const IPC& ipc);  ///< sum of the squares
-  double RMS(unsigned band, const IPC& ipc);
-  // Between two bands, of the pixels that are valid in both. 0 in the basic mode.
-  double SumXY(unsigned band, unsigned otherBand, const IPC& ipc);
-  double Cov(unsigned band, unsigned otherBand, const IPC& ipc);
 
  private:
   struct Run;
@@ -89,7 +86,10 @@ class DynamicRasterStats : public ErrorState {
 
 /// The empty form for complex numbers.
 template <typename T>
-class DynamicRasterStats<Complex<T>> : public ErrorState {
+class DynamicRasterStats<Complex<T>>
+    : public ErrorState,
+      public NumbersByName<DynamicRasterStats<Complex<T>>>,
+      public ExtremesByName<DynamicRasterStats<Complex<T>>, Complex<T>> {
  public:
   explicit DynamicRasterStats(Raster<Complex<T>>* /*raster*/) {}
 
@@ -105,15 +105,14 @@ class DynamicRasterStats<Complex<T>> : public ErrorState {
     return stats;
   }
   std::uint64_t PixelCount(unsigned /*band*/, const IPC& /*ipc*/) { return 0; }
-  Complex<T> Min(unsigned /*band*/, const IPC& /*ipc*/) { return {}; }
-  Complex<T> Max(unsigned /*band*/, const IPC& /*ipc*/) { return {}; }
-  double Mean(unsigned /*band*/, const IPC& /*ipc*/) { return 0; }
-  double Std(unsigned /*band*/, const IPC& /*ipc*/) { return 0; }
-  double Sum(unsigned /*band*/, const IPC& /*ipc*/) { return 0; }
-  double Sum2(unsigned /*band*/, const IPC& /*ipc*/) { return 0; }
-  double RMS(unsigned /*band*/, const IPC& /*ipc*/) { return 0; }
-  double SumXY(unsigned /*band*/, unsigned /*otherBand*/, const IPC& /*ipc*/) { return 0; }
-  double Cov(unsigned /*band*/, unsigned /*otherBand*/, const IPC& /*ipc*/) { return 0; }
+  StatValue<Complex<T>> StatOf(StatsMask::Code /*stat*/, unsigned /*band*/, unsigned /*otherBand*/,
+                               const IPC& /*ipc*/) {
+    return {};
+  }
+  double NumberOf(StatsMask::Code /*stat*/, unsigned /*band*/, unsigned /*otherBand*/,
+                  const IPC& /*ipc*/) {
+    return 0;
+  }
 };
 
 template <typename T>

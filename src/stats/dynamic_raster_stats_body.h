@@ -200,49 +200,13 @@ template <typename T>
 std::uint64_t DynamicRasterStats<T>::PixelCount(unsigned band, const IPC& ipc) {
   return Get(band, StatsMask::Min, ipc, [](const auto& entry) { return entry.pixelCount; });
 }
-template <typename T>
-T DynamicRasterStats<T>::Min(unsigned band, const IPC& ipc) {
-  return Get(band, StatsMask::Min, ipc, [](const auto& entry) { return entry.min; });
-}
-template <typename T>
-T DynamicRasterStats<T>::Max(unsigned band, const IPC& ipc) {
-  return Get(band, StatsMask::Max, ipc, [](const auto& entry) { return entry.max; });
-}
-template <typename T>
-double DynamicRasterStats<T>::Mean(unsigned band, const IPC& ipc) {
-  return Get(band, StatsMask::Mean, ipc, [](const auto& entry) { return entry.mean; });
-}
-template <typename T>
-double DynamicRasterStats<T>::Std(unsigned band, const IPC& ipc) {
-  return Get(band, StatsMask::Std, ipc, [](const auto& entry) { return entry.std; });
-}
-template <typename T>
-double DynamicRasterStats<T>::Sum(unsigned band, const IPC& ipc) {
-  return Get(band, StatsMask::Sum, ipc, [](const auto& entry) { return entry.sum; });
-}
-template <typename T>
-double DynamicRasterStats<T>::Sum2(unsigned band, const IPC& ipc) {
-  return Get(band, StatsMask::Sum2, ipc, [](const auto& entry) { return entry.sum2; });
-}
-template <typename T>
-double DynamicRasterStats<T>::RMS(unsigned band, const IPC& ipc) {
-  return Get(band, StatsMask::RMS, ipc, [](const auto& entry) { return entry.rms; });
-}
 
 template <typename T>
-double DynamicRasterStats<T>::SumXY(unsigned band, unsigned otherBand, const IPC& ipc) {
-  if (StatsMode() != lumo::StatsMode::kExtended) return 0;
-  return Get(band, StatsMask::SumXY, ipc, [otherBand](const auto& entry) {
-    return otherBand < entry.sumXY.GetCount() ? entry.sumXY[otherBand] : 0.0;
-  });
-}
-
-template <typename T>
-double DynamicRasterStats<T>::Cov(unsigned band, unsigned otherBand, const IPC& ipc) {
-  if (StatsMode() != lumo::StatsMode::kExtended) return 0;
-  return Get(band, StatsMask::Cov, ipc, [otherBand](const auto& entry) {
-    return otherBand < entry.cov.GetCount() ? entry.cov[otherBand] : 0.0;
-  });
+StatValue<T> DynamicRasterStats<T>::StatOf(StatsMask::Code stat, unsigned band, unsigned otherBand,
+                                           const IPC& ipc) {
+  const bool isOfPair = (stat & StatsMask::Pairs) != 0;
+  if (isOfPair && StatsMode() != lumo::StatsMode::kExtended) return {};
+  return Get(band, stat, ipc, [=](const auto& entry) { return entry.ValueOf(stat, otherBand); });
 }
 
 }  // namespace lumo

@@ -1,7 +1,6 @@
 #include <algorithm>
 
 #include "foundation/fault.h"
-#include "foundation/progress.h"
 #include "raster/raster_command.h"
 #include "stats/turn.h"
 
@@ -32,9 +31,8 @@ class ComputeStatsCommand : public RasterCommand {
     });
     if (!typed) return Fail("statistics are of real numbers, and the raster has others");
     if (GetIPC().abort->IsSet()) return Fail("the computation was aborted");
-    const unsigned mask = mode == StatsMode::kBasic ? StatsMask::Basic : StatsMask::Extended;
     for (unsigned band = 0; band < raster->Bands(); ++band) {
-      if (raster->StatsExist(band, mask)) continue;
+      if (raster->StatsExist(band, MaskOf(mode))) continue;
       const String fault = TakeFault();
       return Fail(fault.GetLength() != 0 ? fault : "the statistics could not be computed");
     }
@@ -42,40 +40,14 @@ class ComputeStatsCommand : public RasterCommand {
   }
 
  private:
-  /// All statistics of a band, those not at hand computed. A source may hold some of them, of
-  /// pixels that have changed since; then all come from one computation.
-  template <typename T, typename Share>
-  RasterBandStats<T> Ask(Raster<T>& raster, unsigned band, bool extended, const Share& share) {
-    RasterBandStats<T> stats;
-    stats.min = raster.Min(band, share());
-    if (!raster.StatsExist(band, StatsMask::Min)) return stats;  // nor will the others
-    stats.max = raster.Max(band, share());
-    stats.mean = raster.Mean(band, share());
-    stats.std = raster.Std(band, share());
-    stats.sum = raster.Sum(band, share());
-    stats.sum2 = raster.Sum2(band, share());
-    stats.rms = raster.RMS(band, share());
-    const unsigned bands = extended ? raster.Bands() : 0;
-    for (unsigned other = 0; other < bands; ++other) {
-      stats.SetSumXY(other, raster.SumXY(band, other, share()));
-      stats.SetCov(other, raster.Cov(band, other, share()));
-    }
-    const RasterBandStats<T> whole = raster.BandStats(band);
-    const unsigned mask = extended ? StatsMask::Extended : StatsMask::Basic;
-    const bool hasPairs = whole.sumXY.GetCount() == bands && whole.cov.GetCount() == bands;
-    return (whole.mask & mask) == mask && (!extended || hasPairs) ? whole : stats;
+  static unsigned MaskOf(StatsMode mode) {
+    return mode == StatsMode::kExtended ? StatsMask::Extended : StatsMask::Basic;
   }
 
   template <typename T>
   void WriteStats(Raster<T>& raster, StatsMode mode) {
     const unsigned bands = raster.Bands();
     const bool extended = mode == StatsMode::kExtended;
-    const double calls = (extended ? 2.0 * bands + 7 : 7) * bands;
-    // A share of the progress for each call; the calls follow each other.
-    const auto share = [&] {
-      return IPC(GetIPC().abort,
-                 ProgressReportPtr(new ScaledProgressReport(GetIPC().progress, calls)));
-    };
     const ArrayDims each(bands);
     Array<T> min(each), max(each);
     Array<unsigned long long> count(each);
@@ -88,8 +60,8 @@ class ComputeStatsCommand : public RasterCommand {
       std::fill(cov.begin(), cov.end(), 0.0);
     }
     for (unsigned band = 0; band < bands; ++band) {
-      const RasterBandStats<T> stats = Ask(raster, band, extended, share);
-      if (!raster.StatsExist(band, StatsMask::Min)) break;
+      const auto stats = raster.ComputeBandStats(band, MaskOf(mode), GetIPC(), bands);
+      if (stats.mask == StatsMask::None) break;
       min[band] = stats.min;
       max[band] = stats.max;
       mean[band] = stats.mean;

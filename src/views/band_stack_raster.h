@@ -41,13 +41,8 @@ class BandStackRaster final : public ComputedRaster<T> {
   bool StatsExist(unsigned band, unsigned mask) const override;
   bool WriteStats() override;
   RasterBandStats<T> BandStats(unsigned band) const override;
-  T Min(unsigned band, const IPC& ipc) override;
-  T Max(unsigned band, const IPC& ipc) override;
-  double Mean(unsigned band, const IPC& ipc) override;
-  double Std(unsigned band, const IPC& ipc) override;
-  double Sum(unsigned band, const IPC& ipc) override;
-  double Sum2(unsigned band, const IPC& ipc) override;
-  double RMS(unsigned band, const IPC& ipc) override;
+  StatValue<T> StatOf(StatsMask::Code stat, unsigned band, unsigned otherBand,
+                      const IPC& ipc) override;
   bool WriteHistogram() override;
 
   bool HasNoDataValue(unsigned band) const override;
@@ -68,8 +63,6 @@ class BandStackRaster final : public ComputedRaster<T> {
   std::uint64_t WriteCount() const override;
 
  private:
-  static constexpr unsigned kPairs = StatsMask::SumXY | StatsMask::Cov;
-
   /// Where a band of the stack comes from.
   struct Source {
     unsigned member;

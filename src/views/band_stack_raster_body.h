@@ -2,7 +2,7 @@
 
 #include <algorithm>
 
-#include "data/block_shape.h"
+#include "raster/block_shape.h"
 #include "views/band_stack_raster.h"
 
 namespace lumo {
@@ -97,47 +97,20 @@ RasterPtr<T> BandStackRaster<T>::PyramidLevel(unsigned level) {
 
 template <typename T>
 bool BandStackRaster<T>::StatsExist(unsigned band, unsigned mask) const {
-  if ((mask & kPairs) != 0 && !ComputedRaster<T>::StatsExist(band, mask & kPairs)) return false;
+  if ((mask & StatsMask::Pairs) != 0 &&
+      !ComputedRaster<T>::StatsExist(band, mask & StatsMask::Pairs))
+    return false;
   return AskMember(band, [&](Raster<T>& member, unsigned local) {
-    return member.StatsExist(local, mask & ~kPairs);
+    return member.StatsExist(local, mask & ~StatsMask::Pairs);
   });
 }
 
 template <typename T>
-T BandStackRaster<T>::Min(unsigned band, const IPC& ipc) {
-  return AskMember(band, [&](Raster<T>& member, unsigned local) { return member.Min(local, ipc); });
-}
-
-template <typename T>
-T BandStackRaster<T>::Max(unsigned band, const IPC& ipc) {
-  return AskMember(band, [&](Raster<T>& member, unsigned local) { return member.Max(local, ipc); });
-}
-
-template <typename T>
-double BandStackRaster<T>::Mean(unsigned band, const IPC& ipc) {
-  return AskMember(band,
-                   [&](Raster<T>& member, unsigned local) { return member.Mean(local, ipc); });
-}
-
-template <typename T>
-double BandStackRaster<T>::Std(unsigned band, const IPC& ipc) {
-  return AskMember(band, [&](Raster<T>& member, unsigned local) { return member.Std(local, ipc); });
-}
-
-template <typename T>
-double BandStackRaster<T>::Sum(unsigned band, const IPC& ipc) {
-  return AskMember(band, [&](Raster<T>& member, unsigned local) { return member.Sum(local, ipc); });
-}
-
-template <typename T>
-double BandStackRaster<T>::Sum2(unsigned band, const IPC& ipc) {
-  return AskMember(band,
-                   [&](Raster<T>& member, unsigned local) { return member.Sum2(local, ipc); });
-}
-
-template <typename T>
-double BandStackRaster<T>::RMS(unsigned band, const IPC& ipc) {
-  return AskMember(band, [&](Raster<T>& member, unsigned local) { return member.RMS(local, ipc); });
+StatValue<T> BandStackRaster<T>::StatOf(StatsMask::Code stat, unsigned band, unsigned otherBand,
+                                        const IPC& ipc) {
+  if ((stat & StatsMask::Pairs) != 0) return ComputedRaster<T>::StatOf(stat, band, otherBand, ipc);
+  return AskMember(
+      band, [&](Raster<T>& member, unsigned local) { return member.StatOf(stat, local, 0, ipc); });
 }
 
 template <typename T>
@@ -197,7 +170,7 @@ RasterBandStats<T> BandStackRaster<T>::BandStats(unsigned band) const {
   stats.band = band;
   stats.sumXY = own.sumXY;
   stats.cov = own.cov;
-  stats.mask = (stats.mask & ~kPairs) | (own.mask & kPairs);
+  stats.mask = (stats.mask & ~StatsMask::Pairs) | (own.mask & StatsMask::Pairs);
   return stats;
 }
 

@@ -32,26 +32,13 @@ class ComputedRaster : public RasterView<T> {
   bool WriteStats() override;
   void SetBandStats(const RasterBandStats<T>& stats) override;
   RasterBandStats<T> BandStats(unsigned band) const override;
-  T Min(unsigned band, const IPC& ipc) override;
-  T Max(unsigned band, const IPC& ipc) override;
-  double Mean(unsigned band, const IPC& ipc) override;
-  double Std(unsigned band, const IPC& ipc) override;
-  double Sum(unsigned band, const IPC& ipc) override;
-  double Sum2(unsigned band, const IPC& ipc) override;
-  double RMS(unsigned band, const IPC& ipc) override;
-  double SumXY(unsigned band, unsigned otherBand, const IPC& ipc) override;
-  double Cov(unsigned band, unsigned otherBand, const IPC& ipc) override;
+  StatValue<T> StatOf(StatsMask::Code stat, unsigned band, unsigned otherBand,
+                      const IPC& ipc) override;
 
   AsyncPtr HistogramAsync() const override;
   bool WriteHistogram() override;
   void SetBandHistogram(const RasterBandHistogram<T>& histogram) override;
   Array<RasterBandHistogram<T>> BandHistogram(unsigned band) const override;
-  AsyncPtr HistogramByBinSize(T lower, T upper, double binSize, const Array<unsigned>& bands,
-                              HistogramSign sign, const IPC& ipc) override;
-  AsyncPtr HistogramByBinCount(T lower, T upper, unsigned binCount, const Array<unsigned>& bands,
-                               HistogramSign sign, const IPC& ipc) override;
-  AsyncPtr HistogramAllBands(T lower, T upper, unsigned binCount, HistogramSign sign,
-                             const IPC& ipc) override;
   AsyncPtr CountHistogram(const HistogramRequest<T>& request, const IPC& ipc) override;
 
  protected:

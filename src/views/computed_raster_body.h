@@ -90,57 +90,10 @@ RasterBandStats<T> ComputedRaster<T>::BandStats(unsigned band) const {
 }
 
 template <typename T>
-T ComputedRaster<T>::Min(unsigned band, const IPC& ipc) {
-  return OfStats([&](auto& stats) { return stats.Min(band, ipc); },
-                 [&] { return RasterView<T>::Min(band, ipc); });
-}
-
-template <typename T>
-T ComputedRaster<T>::Max(unsigned band, const IPC& ipc) {
-  return OfStats([&](auto& stats) { return stats.Max(band, ipc); },
-                 [&] { return RasterView<T>::Max(band, ipc); });
-}
-
-template <typename T>
-double ComputedRaster<T>::Mean(unsigned band, const IPC& ipc) {
-  return OfStats([&](auto& stats) { return stats.Mean(band, ipc); },
-                 [&] { return RasterView<T>::Mean(band, ipc); });
-}
-
-template <typename T>
-double ComputedRaster<T>::Std(unsigned band, const IPC& ipc) {
-  return OfStats([&](auto& stats) { return stats.Std(band, ipc); },
-                 [&] { return RasterView<T>::Std(band, ipc); });
-}
-
-template <typename T>
-double ComputedRaster<T>::Sum(unsigned band, const IPC& ipc) {
-  return OfStats([&](auto& stats) { return stats.Sum(band, ipc); },
-                 [&] { return RasterView<T>::Sum(band, ipc); });
-}
-
-template <typename T>
-double ComputedRaster<T>::Sum2(unsigned band, const IPC& ipc) {
-  return OfStats([&](auto& stats) { return stats.Sum2(band, ipc); },
-                 [&] { return RasterView<T>::Sum2(band, ipc); });
-}
-
-template <typename T>
-double ComputedRaster<T>::RMS(unsigned band, const IPC& ipc) {
-  return OfStats([&](auto& stats) { return stats.RMS(band, ipc); },
-                 [&] { return RasterView<T>::RMS(band, ipc); });
-}
-
-template <typename T>
-double ComputedRaster<T>::SumXY(unsigned band, unsigned otherBand, const IPC& ipc) {
-  return OfStats([&](auto& stats) { return stats.SumXY(band, otherBand, ipc); },
-                 [&] { return RasterView<T>::SumXY(band, otherBand, ipc); });
-}
-
-template <typename T>
-double ComputedRaster<T>::Cov(unsigned band, unsigned otherBand, const IPC& ipc) {
-  return OfStats([&](auto& stats) { return stats.Cov(band, otherBand, ipc); },
-                 [&] { return RasterView<T>::Cov(band, otherBand, ipc); });
+StatValue<T> ComputedRaster<T>::StatOf(StatsMask::Code stat, unsigned band, unsigned otherBand,
+                                       const IPC& ipc) {
+  return OfStats([&](auto& stats) { return stats.StatOf(stat, band, otherBand, ipc); },
+                 [&] { return RasterView<T>::StatOf(stat, band, otherBand, ipc); });
 }
 
 template <typename T>
@@ -164,38 +117,6 @@ template <typename T>
 Array<RasterBandHistogram<T>> ComputedRaster<T>::BandHistogram(unsigned band) const {
   return OfHistogram([&](auto& histogram) { return histogram.BandHistogram(band); },
                      [&] { return RasterView<T>::BandHistogram(band); });
-}
-
-template <typename T>
-AsyncPtr ComputedRaster<T>::HistogramByBinSize(T lower, T upper, double binSize,
-                                               const Array<unsigned>& bands, HistogramSign sign,
-                                               const IPC& ipc) {
-  return OfHistogram(
-      [&](auto& histogram) {
-        return histogram.HistogramByBinSize(lower, upper, binSize, bands, sign, ipc);
-      },
-      [&] { return RasterView<T>::HistogramByBinSize(lower, upper, binSize, bands, sign, ipc); });
-}
-
-template <typename T>
-AsyncPtr ComputedRaster<T>::HistogramByBinCount(T lower, T upper, unsigned binCount,
-                                                const Array<unsigned>& bands, HistogramSign sign,
-                                                const IPC& ipc) {
-  return OfHistogram(
-      [&](auto& histogram) {
-        return histogram.HistogramByBinCount(lower, upper, binCount, bands, sign, ipc);
-      },
-      [&] { return RasterView<T>::HistogramByBinCount(lower, upper, binCount, bands, sign, ipc); });
-}
-
-template <typename T>
-AsyncPtr ComputedRaster<T>::HistogramAllBands(T lower, T upper, unsigned binCount,
-                                              HistogramSign sign, const IPC& ipc) {
-  return OfHistogram(
-      [&](auto& histogram) {
-        return histogram.HistogramAllBands(lower, upper, binCount, sign, ipc);
-      },
-      [&] { return RasterView<T>::HistogramAllBands(lower, upper, binCount, sign, ipc); });
 }
 
 template <typename T>

@@ -35,7 +35,7 @@ class RasterElevation final : public ElevationModel {
       return false;
     }
     for (unsigned i = 0; i < heights.GetCount(); ++i) {
-      const bool valid = (state[i] & PixelValueState::NotValid) == 0;
+      const bool valid = IsValidState(state[i]);
       heights[i] =
           valid ? static_cast<double>(pixels[i]) : std::numeric_limits<double>::quiet_NaN();
     }

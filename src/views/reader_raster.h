@@ -57,15 +57,9 @@ class ReaderRaster final : public ComputedRaster<T>, public SourceRaster {
   bool StatsExist(unsigned band, unsigned mask) const override;
   bool WriteStats() override;
   RasterBandStats<T> BandStats(unsigned band) const override;
-  T Min(unsigned band, const IPC& ipc) override;
-  T Max(unsigned band, const IPC& ipc) override;
-  double Mean(unsigned band, const IPC& ipc) override;
-  double Std(unsigned band, const IPC& ipc) override;
-  double Sum(unsigned band, const IPC& ipc) override;
-  double Sum2(unsigned band, const IPC& ipc) override;
-  double RMS(unsigned band, const IPC& ipc) override;
-  double SumXY(unsigned band, unsigned otherBand, const IPC& ipc) override;
-  double Cov(unsigned band, unsigned otherBand, const IPC& ipc) override;
+  /// What is at hand, or else computed, one caller after the other.
+  StatValue<T> StatOf(StatsMask::Code stat, unsigned band, unsigned otherBand,
+                      const IPC& ipc) override;
 
   bool WriteHistogram() override;
   /// What the pyramid's file, this raster and the source hold, each histogram once.
@@ -99,9 +93,6 @@ class ReaderRaster final : public ComputedRaster<T>, public SourceRaster {
   bool AnyReaderWithStats(const Call& call) const;
   bool HistogramsHold(const RasterReaderPtr<T>& reader) const;
   void DropStatsOfPyramid();
-  template <typename Value, typename Computed>
-  auto StatValue(unsigned band, unsigned bit, const IPC& ipc, const Value& value,
-                 const Computed& computed);
   template <typename Can, typename Store>
   bool StoreIn(const Can& can, const Store& store);
   bool Holds(const SubRect& rect, const Array<unsigned>& bands) const;

@@ -183,93 +183,18 @@ RasterBandStats<T> ReaderRaster<T>::BandStats(unsigned band) const {
   return stats;
 }
 
-/// A statistic at hand, or else what `computed` gives.
 template <typename T>
-template <typename Value, typename Computed>
-auto ReaderRaster<T>::StatValue(unsigned band, unsigned bit, const IPC& ipc, const Value& value,
-                                const Computed& computed) {
+StatValue<T> ReaderRaster<T>::StatOf(StatsMask::Code stat, unsigned band, unsigned otherBand,
+                                     const IPC& ipc) {
   const std::lock_guard lock(statsLock_);
-  if (StatsExist(band, bit)) {
+  if (StatsExist(band, stat)) {
     const RasterBandStats<T> stats = BandStats(band);
-    if ((stats.mask & bit) != 0) {
+    if ((stats.mask & stat) != 0) {
       ipc.progress->Update(1.0);
-      return value(stats);
+      return stats.ValueOf(stat, otherBand);
     }
   }
-  return computed();
-}
-
-namespace detail {
-
-inline double ElementOf(const Array<double>& values, unsigned index) {
-  return index < values.GetCount() ? values[index] : 0.0;
-}
-
-}  // namespace detail
-
-template <typename T>
-T ReaderRaster<T>::Min(unsigned band, const IPC& ipc) {
-  return StatValue(
-      band, StatsMask::Min, ipc, [](const auto& stats) { return stats.min; },
-      [&] { return ComputedRaster<T>::Min(band, ipc); });
-}
-
-template <typename T>
-T ReaderRaster<T>::Max(unsigned band, const IPC& ipc) {
-  return StatValue(
-      band, StatsMask::Max, ipc, [](const auto& stats) { return stats.max; },
-      [&] { return ComputedRaster<T>::Max(band, ipc); });
-}
-
-template <typename T>
-double ReaderRaster<T>::Mean(unsigned band, const IPC& ipc) {
-  return StatValue(
-      band, StatsMask::Mean, ipc, [](const auto& stats) { return stats.mean; },
-      [&] { return ComputedRaster<T>::Mean(band, ipc); });
-}
-
-template <typename T>
-double ReaderRaster<T>::Std(unsigned band, const IPC& ipc) {
-  return StatValue(
-      band, StatsMask::Std, ipc, [](const auto& stats) { return stats.std; },
-      [&] { return ComputedRaster<T>::Std(band, ipc); });
-}
-
-template <typename T>
-double ReaderRaster<T>::Sum(unsigned band, const IPC& ipc) {
-  return StatValue(
-      band, StatsMask::Sum, ipc, [](const auto& stats) { return stats.sum; },
-      [&] { return ComputedRaster<T>::Sum(band, ipc); });
-}
-
-template <typename T>
-double ReaderRaster<T>::Sum2(unsigned band, const IPC& ipc) {
-  return StatValue(
-      band, StatsMask::Sum2, ipc, [](const auto& stats) { return stats.sum2; },
-      [&] { return ComputedRaster<T>::Sum2(band, ipc); });
-}
-
-template <typename T>
-double ReaderRaster<T>::RMS(unsigned band, const IPC& ipc) {
-  return StatValue(
-      band, StatsMask::RMS, ipc, [](const auto& stats) { return stats.rms; },
-      [&] { return ComputedRaster<T>::RMS(band, ipc); });
-}
-
-template <typename T>
-double ReaderRaster<T>::SumXY(unsigned band, unsigned otherBand, const IPC& ipc) {
-  return StatValue(
-      band, StatsMask::SumXY, ipc,
-      [=](const auto& stats) { return detail::ElementOf(stats.sumXY, otherBand); },
-      [&] { return ComputedRaster<T>::SumXY(band, otherBand, ipc); });
-}
-
-template <typename T>
-double ReaderRaster<T>::Cov(unsigned band, unsigned otherBand, const IPC& ipc) {
-  return StatValue(
-      band, StatsMask::Cov, ipc,
-      [=](const auto& stats) { return detail::ElementOf(stats.cov, otherBand); },
-      [&] { return ComputedRaster<T>::Cov(band, otherBand, ipc); });
+  return ComputedRaster<T>::StatOf(stat, band, otherBand, ipc);
 }
 
 template <typename T>

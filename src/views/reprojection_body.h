@@ -4,7 +4,7 @@
 #include <memory>
 #include <vector>
 
-#include "data/block_shape.h"
+#include "raster/block_shape.h"
 #include "foundation/fault.h"
 #include "georef/coordsys_log.h"
 #include "raster/pixel_states.h"

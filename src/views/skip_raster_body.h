@@ -2,7 +2,7 @@
 
 #include <algorithm>
 
-#include "data/block_shape.h"
+#include "raster/block_shape.h"
 #include "georef/derived_georef.h"
 #include "views/skip_raster.h"
 

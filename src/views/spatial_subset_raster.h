@@ -33,16 +33,12 @@ class SpatialSubsetRaster final : public ComputedRaster<T> {
   RasterPtr<T> PyramidLevel(unsigned level) override;
   RasterPtr<T> StoredPyramidLevel(unsigned) override { return {}; }
 
-  bool GetSubRect(const SubRect& rect, const Array<unsigned>& bands, Interleave interleave,
-                  Array<T>& pixels, Array<unsigned char>& state) override;
-  bool PutSubRect(const SubRect& rect, const Array<unsigned>& bands, Interleave interleave,
-                  Array<T>& pixels, Array<unsigned char>& state) override;
-
   const SubRect& Rect() const { return rect_; }  ///< in the parent's pixels
 
- private:
-  SubRect InParent(const SubRect& rect) const;
+ protected:
+  SubRect PlaceInParent(const SubRect& rect) const override;
 
+ private:
   SubRect rect_;
   Form form_;
   RasterDef def_;

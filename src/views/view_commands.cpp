@@ -2,10 +2,10 @@
 #include "views/band_stack_raster.h"
 #include "views/complex_raster.h"
 #include "views/projected_raster.h"
-#include "views/publish_raster.h"
 #include "views/skip_raster.h"
 #include "views/spatial_subset_raster.h"
 #include "views/spectral_subset_raster.h"
+#include "views/view_command.h"
 #include "views/virtual_raster.h"
 
 // The commands that make views. The view stays in the catalog with count 1.
@@ -13,35 +13,10 @@
 namespace lumo {
 namespace {
 
-const InputDeclaration kSource{"SrcURI", Presence::kRequired, ValueKind::kURI,
-                               "the raster to stand on"};
-
-/// A command that makes a view on one raster of EightTypes.
-class ViewCommand : public PublishCommand {
- protected:
-  /// Publishes what `make(RasterPtr<T>)` gives.
-  template <typename Make>
-  CommandResult PublishView(const Make& make) {
-    if (!CheckInputs()) return Fail();
-    const BasicRasterPtr source = FindRaster("SrcURI");
-    if (!source) return Fail();
-    BasicRasterPtr view;
-    const bool typed = DispatchType(EightTypes{}, source->DataType(), [&]<typename T>() {
-      view = BasicRasterPtr(make(RasterPtr<T>(source)));
-      return true;
-    });
-    if (!typed) return Fail("SrcURI: there is no such view on this pixel type");
-    if (view->IsValid() && (view->Samples() == 0 || view->Lines() == 0)) {
-      return Fail("the view would show no pixel of the raster");
-    }
-    return Publish(view);
-  }
-};
-
 const CommandDeclaration kSpatial{"CreateSpatialSubsetRasterCommand",
                                   "Views",
                                   "Shows a rectangle of a raster as a raster.",
-                                  {kSource,
+                                  {SourceInput(),
                                    {"SubRect", Presence::kRequired, ValueKind::kRectangle,
                                     "pixels of the source; cut to its extent"},
                                    {"Placing", Presence::kOptional, ValueKind::kWord,
@@ -54,9 +29,7 @@ class CreateSpatialSubsetRasterCommand final : public ViewCommand {
   CommandResult Execute() override {
     const auto rect = Read<SubRect>("SubRect");
     const Form form = HasInput("Placing") ? Read<Form>("Placing") : Form::kTold;
-    return PublishView([&]<typename T>(const RasterPtr<T>& source) {
-      return RasterPtr<T>(new SpatialSubsetRaster<T>(source, rect, form));
-    });
+    return PublishView<SpatialSubsetRaster>(rect, form);
   }
 };
 
@@ -65,7 +38,7 @@ const CommandFactoryT<CreateSpatialSubsetRasterCommand> spatialFactory(kSpatial)
 const CommandDeclaration kSpectral{"CreateSpectralSubsetRasterCommand",
                                    "Views",
                                    "Shows bands of a raster, in any order, as a raster.",
-                                   {kSource,
+                                   {SourceInput(),
                                     {"Bands", Presence::kRequired, ValueKind::kIntegerArray,
                                      "bands of the source, from 0; one may come twice"}},
                                    PublishedOutputs()};
@@ -76,9 +49,7 @@ class CreateSpectralSubsetRasterCommand final : public ViewCommand {
     const auto bands = Read<Array<unsigned>>("Bands");
     const BasicRasterPtr source = FindRaster("SrcURI");
     if (!source || !CheckBands(*source, bands)) return Fail();
-    return PublishView([&]<typename T>(const RasterPtr<T>& parent) {
-      return RasterPtr<T>(new SpectralSubsetRaster<T>(parent, bands));
-    });
+    return PublishView<SpectralSubsetRaster>(bands);
   }
 };
 
@@ -88,7 +59,7 @@ const CommandDeclaration kSkip{
     "CreateSkipRasterCommand",
     "Views",
     "Shows every n-th pixel and line of a raster as a raster.",
-    {kSource,
+    {SourceInput(),
      {"SkipX", Presence::kRequired, ValueKind::kInteger, "step along a line, from 1", "pixels"},
      {"SkipY", Presence::kRequired, ValueKind::kInteger, "step from line to line, from 1",
       "lines"}},
@@ -100,9 +71,7 @@ class CreateSkipRasterCommand final : public ViewCommand {
     const auto skipX = Read<unsigned>("SkipX");
     const auto skipY = Read<unsigned>("SkipY");
     if (skipX == 0 || skipY == 0) return Fail("SkipX and SkipY start at 1");
-    return PublishView([&]<typename T>(const RasterPtr<T>& source) {
-      return RasterPtr<T>(new SkipRaster<T>(source, skipX, skipY, true));
-    });
+    return PublishView<SkipRaster>(skipX, skipY, true);
   }
 };
 
@@ -147,15 +116,11 @@ const CommandFactoryT<CreateBandStackRasterCommand> stackFactory(kStack);
 const CommandDeclaration kVirtual{"CreateVirtualRasterCommand",
                                   "Views",
                                   "Gives a raster a second identifier.",
-                                  {kSource},
+                                  {SourceInput()},
                                   PublishedOutputs()};
 
 class CreateVirtualRasterCommand final : public ViewCommand {
-  CommandResult Execute() override {
-    return PublishView([]<typename T>(const RasterPtr<T>& source) {
-      return RasterPtr<T>(new VirtualRaster<T>(source));
-    });
-  }
+  CommandResult Execute() override { return PublishView<VirtualRaster>(); }
 };
 
 const CommandFactoryT<CreateVirtualRasterCommand> virtualFactory(kVirtual);
@@ -164,7 +129,7 @@ const CommandDeclaration kProjected{
     "CreateProjectedRasterCommand",
     "Views",
     "Shows a raster in the grid of another geo-reference.",
-    {kSource,
+    {SourceInput(),
      {"GeoRef", Presence::kRequired, ValueKind::kGeoRef, "of type Std: the grid"},
      {"ReprojectionMethod", Presence::kRequired, ValueKind::kWord,
       "Polynomial: fitted to each block, or on an exact grid to its fixed squares; Rigorous: a "
@@ -203,9 +168,7 @@ class CreateProjectedRasterCommand final : public ViewCommand {
     if (parent && !FitsPixel(parent->DataType(), *options.noData)) {
       return Fail("NoData: the pixel type can't hold this value");
     }
-    return PublishView([&]<typename T>(const RasterPtr<T>& source) {
-      return RasterPtr<T>(new ProjectedRaster<T>(source, target, method, resampling, options));
-    });
+    return PublishView<ProjectedRaster>(target, method, resampling, options);
   }
 };
 
@@ -230,7 +193,7 @@ class CreateComplexRasterCommand final : public PublishCommand {
 };
 
 CommandDeclaration ComplexDeclaration(const char* name, const char* meaning) {
-  return {name, "Views", meaning, {kSource}, PublishedOutputs()};
+  return {name, "Views", meaning, {SourceInput()}, PublishedOutputs()};
 }
 
 const CommandDeclaration kReal =

@@ -128,7 +128,7 @@ class NearestNeighborParallel final : public WarpParallel<T> {
     for (unsigned band = 0; band < target.bands; ++band) {
       std::size_t at = out + band * target.strides.band;
       for (unsigned i = 0; i < chunk.count; ++i, at += target.strides.pixel) {
-        const bool isValid = (target.state[at] & PixelValueState::NotValid) == 0;
+        const bool isValid = IsValidState(target.state[at]);
         if (!isValid) target.pixels[at] = target.background[band];
       }
     }
@@ -261,7 +261,7 @@ class NeighbourhoodParallel : public WarpParallel<T> {
       }
       unsigned char any = 0;
       for (unsigned tap = 0; tap < kTaps; ++tap) any |= state[from[tap][i]];
-      if ((any & PixelValueState::NotValid) == 0) continue;
+      if (IsValidState(any)) continue;
       target.state[at] = WeighValid(chunk, from, lanes, state, i, target.pixels[at]);
       if (target.state[at] != 0) target.pixels[at] = target.background[band];
     }

@@ -233,6 +233,104 @@ TEST(RasterView, LeavesEveryOperationToItsParent) {
         EXPECT_EQ(*pixel++, RampValue<std::int16_t>(sample, line, band));
 }
 
+/// Answers every statistic with its bit and its bands, and has none at hand but those.
+class Answering final : public TestRaster<float> {
+ public:
+  Answering() : TestRaster(2, 2, 3) {}
+  bool StatsExist(unsigned band, unsigned) const override { return band < known; }
+  StatValue<float> StatOf(StatsMask::Code stat, unsigned band, unsigned otherBand,
+                          const IPC& ipc) override {
+    ipc.progress->Update(1.0);
+    reports.push_back(ipc.progress->GetProgress());
+    return {-Value(stat, band, otherBand), Value(stat, band, otherBand)};
+  }
+  RasterBandStats<float> BandStats(unsigned) const override { return atHand; }
+
+  static float Value(unsigned stat, unsigned band, unsigned otherBand) {
+    return static_cast<float>(stat * 100 + band * 10 + otherBand);
+  }
+  unsigned known = 3;
+  RasterBandStats<float> atHand;
+  std::vector<double> reports;
+};
+
+TEST(Raster, EachNameAsksForItsStatistic) {
+  Answering raster;
+  BasicRaster& basic = raster;
+  const IPC ipc;
+  EXPECT_EQ(raster.Min(2, ipc), -120);
+  EXPECT_EQ(raster.Max(2, ipc), -220);
+  EXPECT_EQ(basic.Mean(2, ipc), 420);
+  EXPECT_EQ(basic.Std(2, ipc), 820);
+  EXPECT_EQ(basic.Sum(2, ipc), 1620);
+  EXPECT_EQ(basic.Sum2(2, ipc), 3220);
+  EXPECT_EQ(basic.RMS(2, ipc), 6420);
+  EXPECT_EQ(basic.SumXY(2, 1, ipc), 12821);
+  EXPECT_EQ(basic.Cov(2, 1, ipc), 25621);
+}
+
+TEST(Raster, GivesTheStatisticsOfABandInOneCall) {
+  Answering raster;
+  const IPC ipc;
+  const auto stats = raster.ComputeBandStats(1, StatsMask::Extended, ipc, 2);
+  EXPECT_EQ(stats.mask, StatsMask::Extended);
+  EXPECT_EQ(stats.min, -110);
+  EXPECT_EQ(stats.max, -210);
+  EXPECT_EQ(std::vector({stats.mean, stats.std, stats.sum, stats.sum2, stats.rms}),
+            (std::vector<double>{410, 810, 1610, 3210, 6410}));
+  EXPECT_EQ(std::vector(stats.sumXY.begin(), stats.sumXY.end()),
+            (std::vector<double>{12810, 12811, 12812}));
+  EXPECT_EQ(std::vector(stats.cov.begin(), stats.cov.end()),
+            (std::vector<double>{25610, 25611, 25612}));
+  ASSERT_EQ(raster.reports.size(), 13U);
+  for (std::size_t i = 0; i < 13; ++i) EXPECT_NEAR(raster.reports[i], (i + 1.0) / 26, 1e-12);
+
+  // What one computation left goes first, and ends the questions.
+  raster.reports.clear();
+  raster.atHand.mask = StatsMask::Basic;
+  raster.atHand.mean = 5;
+  EXPECT_EQ(raster.ComputeBandStats(1, StatsMask::Basic, ipc, 2).mean, 5);
+  EXPECT_EQ(raster.reports.size(), 1U);
+  EXPECT_NEAR(ipc.progress->GetProgress(), 1.0, 1e-12);
+  // Without the arrays of all bands it isn't whole.
+  raster.atHand.mask = StatsMask::Extended;
+  EXPECT_EQ(raster.ComputeBandStats(1, StatsMask::Extended, ipc).cov.GetCount(), 3U);
+
+  raster.reports.clear();
+  raster.known = 0;
+  EXPECT_EQ(raster.ComputeBandStats(1, StatsMask::Basic, ipc).mask, StatsMask::None);
+  EXPECT_EQ(raster.reports.size(), 1U);
+}
+
+TEST(RasterView, ShowsOtherBandsByTheirOrderAlone) {
+  class Source final : public RasterView<float> {
+   public:
+    using RasterView::RasterView;
+    RasterDef GetRasterDef() const override {
+      RasterDef def = RasterView::GetRasterDef();
+      def.noData = {{1, 5.0}, {2, 7.0}};
+      return def;
+    }
+  };
+  class Picked final : public RasterView<float> {
+   public:
+    using RasterView::RasterView;
+    const Array<unsigned>* BandOrder() const override { return &order; }
+    Array<unsigned> order = MakeArray<unsigned>({2U, 0U});
+  };
+  const Pointer<MemoryTestRaster<float>> store(new MemoryTestRaster<float>(2, 1, 3));
+  Picked view{RasterPtr<float>(new Source(store))};
+  EXPECT_EQ(view.Bands(), 2U);
+  EXPECT_EQ(view.GetRasterDef().bands, 2U);
+  EXPECT_EQ(view.GetRasterDef().noData, (std::map<unsigned, double>{{0, 7.0}}));
+  EXPECT_EQ(view.NoDataValue(0), RampValue<float>(77, 0, 2));
+  Array<float> pixels = MakeArray<float>({1, 2, 3, 4});
+  Array<unsigned char> states = MakeArray<unsigned char>({0, 0, 0, 0});
+  ASSERT_TRUE(view.PutSubRect({0, 0, 1, 0}, MakeArray<unsigned>({0U, 1U}), Interleave::BIP, pixels,
+                              states));
+  EXPECT_EQ(store->pixels, (std::vector<float>{2, 0, 1, 4, 0, 3}));
+}
+
 TEST(RasterView, WithoutAParentGivesEmptyAnswers) {
   RasterView<float> view;
   const IPC ipc;

@@ -139,7 +139,7 @@ void QuicklookPicture::TakeTyped(const SubRect& block, const T* pixels,
       const std::size_t line = lines_[y] - block.top;
       const std::size_t at = (line * block.Width() + columns_[x] - block.left) * bands;
       for (unsigned band = 0; band < bands; ++band) {
-        if ((states[at + band] & PixelValueState::NotValid) != 0) continue;
+        if (!IsValidState(states[at + band])) continue;
         values_[band][y * columns_.size() + x] = AsDouble(pixels[at + band]);
       }
     }

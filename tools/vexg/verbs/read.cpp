@@ -6,6 +6,7 @@
 #include "pictures/block_reader.h"
 #include "pictures/npy_writer.h"
 #include "pictures/png_writer.h"
+#include "raster/pixel_states.h"
 #include "raster/pixel_types.h"
 #include "rasters/file_verb.h"
 
@@ -68,9 +69,7 @@ class PngSink final : public PixelSink {
 /// True when a mask or a region excludes some of the pixels that were read. What a no-data value
 /// says, the values say themselves.
 bool AnyExcluded(const unsigned char* states, std::uint64_t count) {
-  unsigned char any = 0;
-  for (std::uint64_t i = 0; i < count; ++i) any |= states[i];
-  return (any & (PixelValueState::Masked | PixelValueState::OutsideROI)) != 0;
+  return AnyHasState(states, count, PixelValueState::Masked | PixelValueState::OutsideROI);
 }
 
 class ReadVerb final : public FileVerb {
@@ -78,7 +77,8 @@ class ReadVerb final : public FileVerb {
   explicit ReadVerb(OptionSet& line) : FileVerb(line) {
     line.AddNote(
         "The array has the axes (lines, samples, bands), or those of --interleave: bil (lines, "
-        "bands, samples), bsq (bands, lines, samples). A PNG holds Byte or UInt16 pixels of 1 to 4 "
+        "bands, samples), bsq (bands, lines, samples). A PNG holds Byte or UInt16 pixels of 1 to "
+        "4 "
         "bands as they are.");
     line.AddExample("vexg read scene.tif --rect 0,0,99,49 --bands 2,1,0 -o part.npy");
     line.Add("--output,-o", output_, "The .npy or .png file").IsFile("OUT").Required();

@@ -1,6 +1,6 @@
 #pragma once
 
-#include "data/raster_reader.h"
+#include "foundation/sub_rect.h"
 #include "raster/interleave.h"
 
 namespace lumo {
