@@ -47,8 +47,7 @@ class VEXG_EXPORT MapObject : public Object {
 ///
 ///     Map<String, unsigned> codes(kUnknown);
 ///     codes[String("water")] = 1;
-///     const unsigned code = codes.Find(String("forest"));  // kUnknown; the map still has one
-///     entry
+///     const unsigned code = codes.Find(String("forest"));  // kUnknown; adds no entry
 template <typename K, typename V>
 class Map : public MapObject {
  public:

@@ -68,9 +68,9 @@ using PointerRoot = typename decltype(FindPointerRoot<T>())::type;
 ///
 /// Cost:      a Pointer has the size of a pointer and a table of virtual functions; its block is
 /// one
-///            allocation more, which an empty Pointer makes too. A copy is one atomic addition.///
-///            Ownership: a raw pointer given to the constructor changes hands, unless `noDelete` is
-///            set, which wraps an object that belongs to somebody else and outlives the Pointer.
+///            allocation more, which an empty Pointer makes too. A copy is one atomic addition.
+/// Ownership: a raw pointer given to the constructor changes hands, unless `noDelete` is set, which
+///            wraps an object that belongs to somebody else and outlives the Pointer.
 /// Threads:   only the count is protected. Copies may live on different threads; one Pointer may
 ///            not be assigned on one thread while another uses it.
 template <typename T>
