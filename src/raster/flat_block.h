@@ -8,8 +8,8 @@
 
 namespace lumo {
 
-/// How the elements of a raster lie one after the other, in a file or in memory: without gaps, in
-/// the order of an interleave.
+/// Describes a raster whose elements lie one after the other, in a file or in memory: without gaps,
+/// in the order of an interleave.
 struct FlatLayout {
   Interleave interleave = Interleave::BSQ;  ///< not None, which one band does not need
   unsigned samples = 0;

@@ -9,7 +9,13 @@
 namespace lumo {
 
 /// Marks the pixels of a block that hold the no-data value of their band: they get the state bit
-/// NoData. Values are compared exactly; NaN is equal to every NaN. Exists for TwelveTypes.
+/// NoData, and other bits stay. Values are compared exactly; NaN is equal to every NaN. Exists for
+/// TwelveTypes.
+///
+///     const NoDataMarker<float> marker({-9999.0F, std::nullopt}, Interleave::BIP, width, height);
+///     if (marker.IsNeeded()) marker.Mark(0, count, pixels, state);
+///
+/// Threads: stretches of a block may be marked on several at once.
 template <typename T>
 class NoDataMarker {
  public:

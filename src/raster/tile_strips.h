@@ -12,28 +12,37 @@
 
 namespace lumo {
 
-/// A rectangle of a tile, in its pixels.
+/// A rectangle of a tile, in its pixels from 0, without the borders; both ends are behind the last.
 struct TilePart {
   unsigned rowFrom;
-  unsigned rowTo;  ///< behind the last
+  unsigned rowTo;
   unsigned columnFrom;
   unsigned columnTo;
 };
 
 /// Points to the pixels of a part in one line of a pixel-interleaved tile, with all their bands:
-/// `count` values that lie together, and their states.
+/// `count` values that lie together, and their states. It refers to the tile.
+///
+///     for (unsigned y = part.rowFrom; y < part.rowTo; ++y) {
+///       const TileRow<float, unsigned char> row = RowOf(tile, part, y);
+///       for (std::size_t i = 0; i < row.count; ++i) {
+///         if (IsValidState(row.states[i])) row.values[i] *= 2;
+///       }
+///     }
 template <typename T, typename State>
 struct TileRow {
   T* values;
   State* states;
   std::size_t count;
 };
+/// The pixels of a part in line `y` of a tile, to read.
 template <typename T>
 TileRow<const T, const unsigned char> RowOf(const Tile<T>& tile, const TilePart& part, unsigned y) {
   const std::size_t at = tile.Offset(part.columnFrom, y);
   return {tile.PixelArray().GetData() + at, tile.StateArray().GetData() + at,
           std::size_t{part.columnTo - part.columnFrom} * tile.Bands()};
 }
+/// The pixels of a part in line `y` of a tile, to write.
 template <typename T>
 TileRow<T, unsigned char> RowOf(Tile<T>& tile, const TilePart& part, unsigned y) {
   const std::size_t at = tile.Offset(part.columnFrom, y);
@@ -41,8 +50,8 @@ TileRow<T, unsigned char> RowOf(Tile<T>& tile, const TilePart& part, unsigned y)
           std::size_t{part.columnTo - part.columnFrom} * tile.Bands()};
 }
 
-/// How a tile is cut for a parallel loop: rows first, and rows of long tiles into pieces. The cut
-/// depends on the size of the tile alone.
+/// Cuts a tile for a parallel loop: between rows first, and rows of long tiles into pieces, at most
+/// 64 of both. The cut depends on the size of the tile alone.
 class TileStrips {
  public:
   /// @param leastPixels  of a strip, as far as the tile has them.
@@ -55,8 +64,10 @@ class TileStrips {
     columns_ = static_cast<unsigned>(std::min<std::size_t>(wanted / std::max(rows_, 1U), width_));
   }
 
+  /// Strips of the tile, 1 or more unless it is empty.
   unsigned Count() const { return rows_ * columns_; }
 
+  /// Strip `index`, from 0, row of strips by row of strips.
   TilePart Strip(unsigned index) const {
     const unsigned row = index / columns_;
     const unsigned column = index % columns_;
@@ -83,7 +94,7 @@ inline std::size_t LeastStripPixels(unsigned bands) {
 
 namespace detail {
 
-/// Calls a function that tells by a bool whether it succeeded, or by nothing that it did.
+/// Calls a function that returns whether it succeeded, or nothing, which counts as success.
 template <typename F, typename... Args>
 bool Succeeds(const F& work, Args&&... args) {
   if constexpr (std::is_void_v<std::invoke_result_t<const F&, Args...>>) {
