@@ -6,9 +6,8 @@ namespace lumo {
 
 /// While one lives, new sources whose last holder lets go on this thread are given up: their files
 /// are removed rather than put in their places. A source's own thread follows the thread that it
-/// works for.
-/// It nests: the innermost one on a thread decides, and the state before it comes back with its
-/// end.
+/// works for. It nests: the innermost one on a thread decides, and the state before it comes back
+/// with its end.
 ///
 ///     {
 ///       AbandonScope abandon;       // the copy was interrupted

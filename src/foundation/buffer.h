@@ -12,8 +12,8 @@
 
 namespace lumo {
 
-/// Holds for the buffers of all element types the file, its header block, and the window
-/// as bytes. See Buffer.
+/// Holds for the buffers of all element types the file, its header block, and the window as bytes.
+/// See Buffer.
 class VEXG_EXPORT BasicBuffer : public Object {
  public:
   static const unsigned TypeCode;

@@ -42,8 +42,8 @@ class VEXG_EXPORT MapObject : public Object {
   bool IsA(unsigned typeCode) const override;
 };
 
-/// An ordered map with a default value, which a lookup of an absent key gives.
-/// A lookup takes a number of compares that grows with the logarithm of the count.
+/// An ordered map with a default value, which a lookup of an absent key gives. A lookup takes a
+/// number of compares that grows with the logarithm of the count.
 ///
 ///     Map<String, unsigned> codes(kUnknown);
 ///     codes[String("water")] = 1;

@@ -5,8 +5,8 @@
 namespace lumo {
 
 // The reason of a failure in words, beside operations that only give false or empty: who detects
-// the failure sets it here, and who reports to a person takes it. The text belongs to the
-// thread; whatever hands work to another thread and waits for it carries the text back.
+// the failure sets it here, and who reports to a person takes it. The text belongs to the thread;
+// whatever hands work to another thread and waits for it carries the text back.
 
 /// Keeps `text`, one line that says what and where, as the reason of the failure that this thread
 /// is in. A later one replaces it.

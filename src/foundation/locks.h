@@ -25,8 +25,8 @@ class VEXG_EXPORT PrivateLock {
   PrivateLock() = default;
 };
 
-/// Holds a recursive mutex: the thread that holds it may enter it again.
-/// It blocks until the mutex is free, without a bound in time.
+/// Holds a recursive mutex: the thread that holds it may enter it again. It blocks until the mutex
+/// is free, without a bound in time.
 class VEXG_EXPORT MutexLock : public PrivateLock {
  public:
   /// @param mutex  outlives the lock.
@@ -56,9 +56,8 @@ class VEXG_EXPORT Lockable {
 };
 
 /// A fair read-write mutex: waiting threads are served in the order in which they came. It is not
-/// recursive. Used through QueuingRWMutexLock.
-/// Many may hold it for reading, or one for writing. A thread that enters it twice waits for
-/// itself.
+/// recursive. Used through QueuingRWMutexLock. Many may hold it for reading, or one for writing. A
+/// thread that enters it twice waits for itself.
 class VEXG_EXPORT QueuingRWMutex {
  public:
   QueuingRWMutex();

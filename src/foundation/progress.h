@@ -8,8 +8,8 @@ namespace lumo {
 
 /// One stage's share of a parent report: Update(v) reports v * weight / divisor above what the
 /// parent had reached when this was made. For `n` equal stages, one is made at the start of each
-/// stage with `n` as divisor.
-/// For example, three passes over a raster, each of which reports 0 to 1:
+/// stage with `n` as divisor. For example, three passes over a raster, each of which reports 0 to
+/// 1:
 ///
 ///     for (const Pass& pass : passes) {
 ///       pass.Run(IPC(ipc.abort, ProgressReportPtr(new ScaledProgressReport(ipc.progress, 3))));

@@ -11,9 +11,8 @@
 
 namespace lumo {
 
-/// A thread that nobody joins: it runs on by itself when this object goes.
-/// An exception of the body ends the thread alone. JoinThreads waits for all of them at the end of
-/// a program.
+/// A thread that nobody joins: it runs on by itself when this object goes. An exception of the body
+/// ends the thread alone. JoinThreads waits for all of them at the end of a program.
 ///
 ///     if (!Thread().Start([work] { work->Execute(); })) return false;
 class VEXG_EXPORT Thread {

@@ -13,15 +13,13 @@ namespace lumo {
 template <typename Class>
 class NumbersByName {
  public:
-  /// Mean of the valid values.
-  /// Standard deviation of a sample; 0 for fewer than two values.
+  /// Mean of the valid values. Standard deviation of a sample; 0 for fewer than two values.
   double Mean(unsigned band, const IPC& ipc) { return Ask(StatsMask::Mean, band, 0, ipc); }
   /// Standard deviation of a sample, divided by n - 1; 0 for fewer than two values.
   double Std(unsigned band, const IPC& ipc) { return Ask(StatsMask::Std, band, 0, ipc); }
   /// Sum of the valid values.
   double Sum(unsigned band, const IPC& ipc) { return Ask(StatsMask::Sum, band, 0, ipc); }
-  /// Sum of their squares.
-  /// Sum of their squares.
+  /// Sum of their squares. Sum of their squares.
   double Sum2(unsigned band, const IPC& ipc) { return Ask(StatsMask::Sum2, band, 0, ipc); }
   /// Square root of the mean of their squares.
   double RMS(unsigned band, const IPC& ipc) { return Ask(StatsMask::RMS, band, 0, ipc); }

@@ -7,8 +7,8 @@
 
 namespace lumo {
 
-/// A loop over the samples, lines and bands of a tile, without its borders.
-/// A derived class overrides Body(begin0, end0, begin1, end1, begin2, end2).
+/// A loop over the samples, lines and bands of a tile, without its borders. A derived class
+/// overrides Body(begin0, end0, begin1, end1, begin2, end2).
 template <typename T>
 class TileParallelFor3 : public ArrayParallelFor3 {
  public:

@@ -11,8 +11,8 @@
 namespace lumo {
 
 /// The tokens of one run. A token that has ended is emptied and used again, so a run makes no more
-/// of them than are in flight at once.
-/// Tokens belong to it and go with it. Threads: tokens may be taken and returned on any.
+/// of them than are in flight at once. Tokens belong to it and go with it. Threads: tokens may be
+/// taken and returned on any.
 class TokenPool {
  public:
   explicit TokenPool(unsigned argCount) : argCount_(argCount) {}

@@ -42,8 +42,8 @@ class ScratchPool {
     return Loan(*this, std::move(object));
   }
 
-  /// Takes all out of the pool. Nobody borrows meanwhile.
-  /// Their order is that in which they came back, which differs from run to run.
+  /// Takes all out of the pool. Nobody borrows meanwhile. Their order is that in which they came
+  /// back, which differs from run to run.
   std::vector<std::unique_ptr<T>> TakeAll() {
     const std::lock_guard lock(mutex_);
     return std::move(free_);
