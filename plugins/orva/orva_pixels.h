@@ -8,7 +8,7 @@
 
 namespace lumo::orva {
 
-/// Told when a stretch of a block has been read, in the byte order of this machine: its first
+/// Called when a stretch of a block has been read, in the byte order of this machine: its first
 /// element and their number. Stretches come in order and are small enough to lie in the cache yet.
 using StretchRead = std::function<void(std::uint64_t first, std::uint64_t count)>;
 

@@ -44,7 +44,7 @@ inline constexpr unsigned kMostTileSide = 2048;
 inline constexpr std::uint64_t kHeaderPlaces[] = {0, 4096};
 inline constexpr std::uint64_t kDataBegin = 8192;
 
-/// What a pyramid file says of itself.
+/// The description of a pyramid file at its start.
 struct Header {
   std::uint64_t sequence = 0;
   std::uint64_t fileBytes = 0;  ///< that are in use
@@ -85,7 +85,7 @@ inline constexpr char kMagic[16] = "VEXGPYRAMID01\n";
 /// The bytes of a header.
 StoredHeader Store(const Header& header);
 
-/// What makes the description of a raster and its levels impossible; null when nothing does.
+/// Gives the reason why no raster and levels can be as described; null when they can.
 const char* FindFault(const Header& header);
 
 /// Takes over a header from its bytes.

@@ -25,7 +25,7 @@ struct AccessPolicy {
 };
 
 /// Takes over a policy for the process, before the first source is opened. False, with the fault
-/// text told and nothing changed, when a root is no directory.
+/// set and nothing changed, when a root is no directory.
 VEXG_EXPORT bool SetAccessPolicy(const AccessPolicy& policy);
 
 /// The policy in force, its roots resolved.
@@ -47,7 +47,7 @@ VEXG_EXPORT String TakeRefusal();
 /// True when a policy with roots is in force.
 VEXG_EXPORT bool AreFilesLimited();
 
-/// True when sources of the format may be opened and made; else tells the fault.
+/// True when sources of the format may be opened and made; else sets the fault.
 VEXG_EXPORT bool MayUseFormat(const FormatRecord& format);
 
 /// While one lives, this thread may open the library's own blocks of memory, whatever the policy.
@@ -71,7 +71,7 @@ class VEXG_EXPORT AdmittedSourceScope {
   AdmittedSourceScope& operator=(const AdmittedSourceScope&) = delete;
 };
 
-/// True when a source may be used; else tells the fault. Of the pieces that are no format's key the
+/// True when a source may be used; else sets the fault. Of the pieces that are no format's key the
 /// first is the source's name: a file, or a name that holds one ("HDF5:"a.h5"://band"). Further
 /// pieces NAME=VALUE are options, whose values count as files only where there is such a file.
 /// @param making  the source is to be made: it need not exist, its folder has to.

@@ -9,7 +9,7 @@ namespace lumo {
 
 /// Finds the format of a source and opens it, directly or behind a proxy. It is the factory that
 /// the rest of the library sees; a DataManager owns it.
-/// Failure: an empty pointer, with the fault text told.
+/// Failure: an empty pointer, with the fault set.
 class VEXG_EXPORT MtDataConnectionFactory final : public DataConnectionFactory {
  public:
   bool IsAvailable() override { return true; }

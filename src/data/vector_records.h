@@ -70,7 +70,7 @@ class VEXG_EXPORT VectorRecordSource {
   /// Begins to read a layer.
   /// @param box  gives only records whose bounds touch it; null for all.
   virtual bool Begin(std::uint32_t layer, const MapRect* box) = 0;
-  /// Reads the next record. @return false at the end, and, with the fault told, on a failure.
+  /// Reads the next record. @return false at the end, and, with the fault set, on a failure.
   virtual bool Next(VectorRecord& record) = 0;
   virtual ~VectorRecordSource() = default;
 };

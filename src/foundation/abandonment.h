@@ -25,7 +25,7 @@ class VEXG_EXPORT AbandonScope {
   const bool before_;
 };
 
-/// Tells whether a new source that ends on this thread now is given up.
+/// True when a new source that ends on this thread now is given up.
 VEXG_EXPORT bool IsAbandoning();
 
 }  // namespace lumo

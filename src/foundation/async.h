@@ -29,9 +29,9 @@ namespace lumo {
 ///     sum->WaitFinished();      // sum->total may be read from here on
 class VEXG_EXPORT Async : public ErrorState {
  public:
-  /// Makes an abort flag and a progress report that tell `callback`.
+  /// Makes an abort flag and a progress report that `callback` observes.
   explicit Async(const AsyncCallbackPtr& callback = {});
-  /// Uses the flag and the report of `ipc`; `callback` is told of the start and the end.
+  /// Uses the flag and the report of `ipc`; `callback` hears of the start and the end.
   explicit Async(const IPC& ipc, const AsyncCallbackPtr& callback = {});
 
   /// False once an error is stored: the result is then of no use.

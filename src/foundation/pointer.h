@@ -167,7 +167,7 @@ class Pointer {
                   "the classes do not belong to one family");
     bool fits = !other.IsNull();
     if constexpr (!std::is_base_of_v<T, U>) {
-      // Under sanitizers the compiler can't tell two addresses apart; then there is no check.
+      // Under sanitizers the compiler can't compare two addresses; then there is no check.
       static_assert(!__builtin_constant_p(&T::TypeCode == &Object::TypeCode) ||
                         &T::TypeCode != &Object::TypeCode,
                     "the class has no type code of its own");

@@ -89,8 +89,8 @@ class VEXG_EXPORT MetadataObject {
   virtual bool Is2D() const { return rows_ > 0 && columns_ > 0; }
   /// The shape of elements that are stored as rows and columns. False for others.
   virtual bool Dims(unsigned& rows, unsigned& columns) const;
-  /// One line of text that tells path, type, shape and value, for the parse log. A container gives
-  /// the lines of its children in the order of their names.
+  /// One line of text with path, type, shape and value, for the parse log. A container gives the
+  /// lines of its children in the order of their names.
   virtual String Describe(const String& path) const;
 
   /// Declares the elements rows and columns; their product is the number of elements.

@@ -152,7 +152,7 @@ class StripReduction final : public ArrayParallelReduce<StripResult<R>> {
 
 /// Runs `work(TilePart)` for the strips of a tile on all threads. `work` gives a bool, or nothing.
 /// @param abort  is looked at before each strip; null for none.
-/// @return false when some strip failed; what it told by SetFault is then told on this thread.
+/// @return false when some strip failed; the fault that it set is then set on this thread.
 template <typename F>
 bool ForEachStrip(const BasicTile& tile, std::size_t leastPixels, const AbortFlag* abort,
                   const F& work) {
@@ -169,7 +169,7 @@ bool ForEachStrip(const BasicTile& tile, std::size_t leastPixels, const AbortFla
 /// The joins follow the cut, which the size of the tile alone decides, so the result has the same
 /// bits for any number of threads. `part` gives an R, or an optional that is empty where it failed;
 /// `merge` a bool, or nothing.
-/// @return empty when something failed, with its fault told on this thread, or was aborted.
+/// @return empty when something failed, with its fault set on this thread, or was aborted.
 template <typename R, typename Part, typename Merge>
 std::optional<R> ReduceStrips(const BasicTile& tile, std::size_t leastPixels,
                               const AbortFlag* abort, const Part& part, const Merge& merge) {

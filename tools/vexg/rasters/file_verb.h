@@ -10,7 +10,7 @@
 
 namespace lumo::host {
 
-/// A verb that opens a raster and makes files from it, or tells of it, or saves something with it.
+/// A verb that opens a raster and makes files from it, or describes it, or saves something with it.
 ///
 /// Run goes through the steps that all such verbs have in common, in one order:
 ///
