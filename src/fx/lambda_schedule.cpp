@@ -180,7 +180,7 @@ void LambdaSchedule::UpdateNearest(std::uint32_t neighbour, std::uint32_t pair, 
 }
 
 bool LambdaSchedule::Step(Merge& merge) {
-  while (!queue_.empty() && !pairs_[queue_.top().pair].isQueued) queue_.pop();
+  while (!queue_.empty() && !IsCurrent(queue_.top())) queue_.pop();
   if (queue_.empty()) return false;
   const Queued top = queue_.top();
   queue_.pop();

@@ -75,7 +75,8 @@ class VEXG_EXPORT LambdaSchedule {
     std::uint32_t Other(std::uint32_t region) const { return ids[0] == region ? ids[1] : ids[0]; }
   };
 
-  /// A pair in the queue; out of date when it was merged, or is no longer the nearest of both.
+  /// A pair in the queue. It is out of date when the pair has left the queue since, or has come
+  /// back at another cost.
   struct Queued {
     double cost;
     std::uint32_t pair;
@@ -84,6 +85,10 @@ class VEXG_EXPORT LambdaSchedule {
     }
   };
 
+  bool IsCurrent(const Queued& entry) const {
+    const Pair& pair = pairs_[entry.pair];
+    return pair.isQueued && pair.cost == entry.cost;
+  }
   template <typename Visit>
   void ForEachPair(std::uint32_t region, Visit&& visit);
   void Link(std::uint32_t pair, std::uint32_t region);
