@@ -15,7 +15,7 @@
 #include "data/data_manager.h"
 #include "pyramid/pyramid_process.h"
 #include "support/temporary_directory.h"
-#include "views/reader_raster.h"
+#include "views/sources/reader_raster.h"
 
 namespace lumo {
 namespace {

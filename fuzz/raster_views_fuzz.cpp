@@ -19,13 +19,13 @@
 #include "support/test_rasters.h"
 #include "views/band_stack_raster.h"
 #include "views/complex_raster.h"
-#include "views/memory_raster.h"
-#include "views/projected_raster.h"
 #include "views/skip_raster.h"
+#include "views/sources/memory_raster.h"
+#include "views/sources/temp_raster.h"
 #include "views/spatial_subset_raster.h"
 #include "views/spectral_subset_raster.h"
-#include "views/temp_raster.h"
 #include "views/virtual_raster.h"
+#include "warp/projected_raster.h"
 
 namespace {
 

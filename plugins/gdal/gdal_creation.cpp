@@ -7,9 +7,9 @@
 #include <filesystem>
 #include <set>
 
-#include "gdal_common/messages.h"
 #include "foundation/abandonment.h"
 #include "foundation/fault.h"
+#include "gdal_common/messages.h"
 #include "gdal_details.h"
 #include "gdal_georef.h"
 #include "gdal_no_data.h"

@@ -5,8 +5,8 @@
 #include <string>
 #include <vector>
 
-#include "gdal_common/source.h"
 #include "gdal_band_values.h"
+#include "gdal_common/source.h"
 #include "gdal_new_mask.h"
 #include "platform/file_identity.h"
 #include "platform/file_swap.h"

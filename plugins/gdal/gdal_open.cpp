@@ -4,9 +4,9 @@
 #include <cstdint>
 #include <string>
 
+#include "foundation/library.h"
 #include "gdal_common/messages.h"
 #include "gdal_common/setting.h"
-#include "foundation/library.h"
 
 namespace lumo::gdal {
 namespace {

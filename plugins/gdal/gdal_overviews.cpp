@@ -5,9 +5,9 @@
 #include <cstdint>
 #include <filesystem>
 
-#include "gdal_common/messages.h"
 #include "foundation/fault.h"
 #include "foundation/staged_files.h"
+#include "gdal_common/messages.h"
 
 namespace lumo::gdal {
 namespace {

@@ -5,11 +5,11 @@
 #include <cpl_minixml.h>
 #include <filesystem>
 
-#include "gdal_common/file_guard.h"
-#include "gdal_common/messages.h"
 #include "foundation/fault.h"
 #include "foundation/warnings.h"
 #include "gdal_band_values.h"
+#include "gdal_common/file_guard.h"
+#include "gdal_common/messages.h"
 #include "gdal_creation.h"
 #include "gdal_georef.h"
 #include "gdal_masks.h"

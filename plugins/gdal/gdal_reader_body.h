@@ -9,8 +9,8 @@
 #include <locale>
 #include <sstream>
 
-#include "gdal_common/messages.h"
 #include "gdal_band_values.h"
+#include "gdal_common/messages.h"
 #include "gdal_no_data.h"
 #include "gdal_reader.h"
 #include "raster/block_strides.h"

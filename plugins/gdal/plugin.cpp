@@ -1,5 +1,5 @@
-#include "gdal_common/library.h"
 #include "data/data_connection.h"
+#include "gdal_common/library.h"
 #include "gdal_factory.h"
 #include "orva/orva_factory.h"
 #include "vector_sink.h"

@@ -2,8 +2,8 @@
 
 #include <cstring>
 
-#include "gdal_common/messages.h"
 #include "foundation/fault.h"
+#include "gdal_common/messages.h"
 #include "tiff_directory.h"
 
 namespace lumo::gdal {

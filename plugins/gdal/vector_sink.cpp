@@ -8,12 +8,12 @@
 #include <filesystem>
 #include <ogr_api.h>
 
+#include "data/access_policy.h"
+#include "foundation/text_case.h"
 #include "gdal_common/coordsys.h"
 #include "gdal_common/messages.h"
 #include "gdal_common/shape_geometry.h"
 #include "gdal_common/source.h"
-#include "data/access_policy.h"
-#include "foundation/text_case.h"
 #include "platform/file_moves.h"
 #include "platform/temporary_file.h"
 

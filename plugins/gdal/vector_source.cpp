@@ -3,12 +3,12 @@
 #include <filesystem>
 #include <ogr_api.h>
 
+#include "data/access_policy.h"
 #include "gdal_common/coordsys.h"
 #include "gdal_common/file_guard.h"
 #include "gdal_common/messages.h"
 #include "gdal_common/shape_geometry.h"
 #include "gdal_common/source.h"
-#include "data/access_policy.h"
 
 namespace lumo {
 namespace {

@@ -4,8 +4,8 @@
 #include <hdf5.h>
 #include <vector>
 
-#include "gdal_common/messages.h"
 #include "data/access_policy.h"
+#include "gdal_common/messages.h"
 
 namespace lumo::gdal {
 namespace {

@@ -5,10 +5,10 @@
 #include <map>
 #include <mutex>
 
+#include "foundation/environment.h"
 #include "gdal_common/file_guard.h"
 #include "gdal_common/file_system.h"
 #include "gdal_common/messages.h"
-#include "foundation/environment.h"
 
 namespace lumo::gdal {
 namespace {

@@ -8,9 +8,9 @@
 #include <stdexcept>
 #include <string_view>
 
-#include "gdal_common/hdf5_files.h"
 #include "foundation/fault.h"
 #include "foundation/text_case.h"
+#include "gdal_common/hdf5_files.h"
 #include "platform/memory_shortage.h"
 
 namespace lumo::gdal {

@@ -6,12 +6,12 @@
 #include <string_view>
 #include <utility>
 
-#include "gdal_common/file_guard.h"
-#include "gdal_common/hdf5_files.h"
-#include "gdal_common/messages.h"
 #include "data/access_policy.h"
 #include "data/file_uri.h"
 #include "foundation/warnings.h"
+#include "gdal_common/file_guard.h"
+#include "gdal_common/hdf5_files.h"
+#include "gdal_common/messages.h"
 
 namespace lumo::gdal {
 namespace {

@@ -5,8 +5,8 @@
 #include <string>
 #include <vector>
 
-#include "gdal_common/library.h"
 #include "foundation/string.h"
+#include "gdal_common/library.h"
 
 namespace lumo::gdal {
 

@@ -2,10 +2,10 @@
 
 #include <filesystem>
 
-#include "gdal_common/coordsys.h"
-#include "gdal_common/messages.h"
 #include "foundation/abandonment.h"
 #include "foundation/fault.h"
+#include "gdal_common/coordsys.h"
+#include "gdal_common/messages.h"
 #include "georef/std_georef.h"
 #include "platform/file_moves.h"
 #include "platform/random_access_file.h"

@@ -1,5 +1,6 @@
 #include "commands/arg_list.h"
 
+#include "commands/command_errors.h"
 #include "foundation/grow_array.h"
 
 namespace lumo {

@@ -1,6 +1,7 @@
 #include "commands/command.h"
 
 #include "commands/catalog.h"
+#include "commands/command_errors.h"
 #include "foundation/fault.h"
 #include "foundation/library.h"
 #include "foundation/thrown.h"

@@ -1,8 +1,8 @@
 #include "data/dc_srv.h"
 
+#include "data/data_errors.h"
 #include "data/data_manager.h"
 #include "foundation/abandonment.h"
-#include "foundation/errors.h"
 #include "foundation/fault.h"
 #include "foundation/thrown.h"
 #include "foundation/warnings.h"

@@ -5,8 +5,8 @@
 #include <tuple>
 
 #include "data/data_connection.h"
+#include "data/data_errors.h"
 #include "foundation/color.h"
-#include "foundation/errors.h"
 #include "foundation/sub_rect.h"
 #include "raster/band_values.h"
 #include "raster/interleave.h"

@@ -3,7 +3,7 @@
 #include <tuple>
 
 #include "data/data_connection.h"
-#include "foundation/errors.h"
+#include "data/data_errors.h"
 #include "raster/pixel_types.h"
 
 namespace lumo {

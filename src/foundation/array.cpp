@@ -4,6 +4,7 @@
 #include <cmath>
 #include <vector>
 
+#include "foundation/errors.h"
 #include "foundation/type_code.h"
 
 namespace lumo {

@@ -3,7 +3,6 @@
 #include <atomic>
 
 #include "foundation/array.h"
-#include "foundation/errors.h"
 #include "foundation/progress.h"
 #include "foundation/run_controls.h"
 #include "foundation/thread.h"

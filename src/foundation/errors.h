@@ -31,42 +31,6 @@ struct VEXG_EXPORT AsyncErrorExecuteFailed : ObjectError {
   static const unsigned Code;
 };
 
-/// An input check of a command failed, or its body gave up.
-struct VEXG_EXPORT CommandErrorFail : ObjectError {
-  CommandErrorFail() : ObjectError(Code) {}
-  static const unsigned Code;
-};
-
-/// A parallel body found its data unusable.
-struct VEXG_EXPORT ParallelError : ObjectError {
-  ParallelError() : ObjectError(Code) {}
-  static const unsigned Code;
-};
-
-/// A read, a write or a parallel loop of a pipeline stage failed.
-struct VEXG_EXPORT TaskError : ObjectError {
-  TaskError() : ObjectError(Code) {}
-  static const unsigned Code;
-};
-
-/// A task got arguments of the wrong number or type.
-struct VEXG_EXPORT TaskErrorBadArgs : ObjectError {
-  TaskErrorBadArgs() : ObjectError(Code) {}
-  static const unsigned Code;
-};
-
-/// A task got parameters that it could not use.
-struct VEXG_EXPORT TaskErrorBadParams : ObjectError {
-  TaskErrorBadParams() : ObjectError(Code) {}
-  static const unsigned Code;
-};
-
-/// An argument list could not grow.
-struct VEXG_EXPORT ArgListError : ObjectError {
-  ArgListError() : ObjectError(Code) {}
-  static const unsigned Code;
-};
-
 /// An array operation met an array that is not valid.
 struct VEXG_EXPORT ArrayErrorInvalidArray : ObjectError {
   ArrayErrorInvalidArray() : ObjectError(Code) {}
@@ -97,18 +61,6 @@ struct VEXG_EXPORT BufferWarningReadOnly : ObjectWarning {
   static const unsigned Code;
 };
 
-/// A region attribute record could not be laid out.
-struct VEXG_EXPORT RegionAttributeErrorBadAllocation : ObjectError {
-  RegionAttributeErrorBadAllocation() : ObjectError(Code) {}
-  static const unsigned Code;
-};
-
-/// A polygon can't be used.
-struct VEXG_EXPORT PolygonErrorBadPolygon : ObjectError {
-  PolygonErrorBadPolygon() : ObjectError(Code) {}
-  static const unsigned Code;
-};
-
 /// A matrix to invert is singular.
 struct VEXG_EXPORT MatrixErrorSingular : ObjectError {
   MatrixErrorSingular() : ObjectError(Code) {}
@@ -118,24 +70,6 @@ struct VEXG_EXPORT MatrixErrorSingular : ObjectError {
 /// The dimensions of matrices do not fit.
 struct VEXG_EXPORT MatirxErrorBadDims : ObjectError {
   MatirxErrorBadDims() : ObjectError(Code) {}
-  static const unsigned Code;
-};
-
-/// The data connection server has no thread for a call.
-struct VEXG_EXPORT DcSrvErrorNoThread : ObjectError {
-  DcSrvErrorNoThread() : ObjectError(Code) {}
-  static const unsigned Code;
-};
-
-/// A raster reader dispatch has no valid reader.
-struct VEXG_EXPORT RasterReaderErrorInvalid : ObjectError {
-  RasterReaderErrorInvalid() : ObjectError(Code) {}
-  static const unsigned Code;
-};
-
-/// A vector reader dispatch has no valid reader.
-struct VEXG_EXPORT VectorReaderErrorInvalid : ObjectError {
-  VectorReaderErrorInvalid() : ObjectError(Code) {}
   static const unsigned Code;
 };
 

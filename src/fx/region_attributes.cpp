@@ -4,6 +4,7 @@
 #include <new>
 
 #include "foundation/type_code.h"
+#include "fx/region_errors.h"
 
 namespace lumo {
 namespace {

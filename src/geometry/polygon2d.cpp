@@ -5,6 +5,7 @@
 #include <limits>
 
 #include "foundation/type_code.h"
+#include "geometry/polygon_errors.h"
 
 namespace lumo {
 namespace {

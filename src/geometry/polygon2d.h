@@ -5,10 +5,10 @@
 #include <vector>
 
 #include "foundation/array.h"
-#include "foundation/errors.h"
 #include "foundation/object.h"
 #include "foundation/point.h"
 #include "foundation/pointer.h"
+#include "geometry/polygon_errors.h"
 
 namespace lumo {
 

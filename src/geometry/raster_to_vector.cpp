@@ -1,5 +1,7 @@
 #include "geometry/raster_to_vector.h"
 
+#include "tasks/task_errors.h"
+
 namespace lumo {
 namespace {
 

@@ -3,6 +3,7 @@
 #include <string>
 
 #include "foundation/fault.h"
+#include "tasks/task_errors.h"
 
 namespace lumo {
 

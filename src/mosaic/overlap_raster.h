@@ -5,7 +5,7 @@
 
 #include "raster/raster_def.h"
 #include "views/computed_raster.h"
-#include "views/warp_map.h"
+#include "warp/warp_map.h"
 
 namespace lumo {
 

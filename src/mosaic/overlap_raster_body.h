@@ -11,7 +11,7 @@
 #include "raster/block_shape.h"
 #include "raster/block_strides.h"
 #include "tasks/parallel_ranges.h"
-#include "views/reprojection.h"
+#include "warp/reprojection.h"
 
 namespace lumo {
 

@@ -6,6 +6,7 @@
 #include "foundation/fault.h"
 #include "foundation/scalar.h"
 #include "pyramid/pyramid_tasks.h"
+#include "tasks/task_errors.h"
 
 namespace lumo {
 

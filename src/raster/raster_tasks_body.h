@@ -1,6 +1,7 @@
 #pragma once
 
 #include "raster/raster_tasks.h"
+#include "tasks/task_errors.h"
 
 namespace lumo {
 

@@ -3,6 +3,7 @@
 #include "foundation/fault.h"
 #include "stats/histogram_counter.h"
 #include "stats/raster_histogram_process.h"
+#include "tasks/task_errors.h"
 
 namespace lumo {
 

@@ -2,6 +2,7 @@
 
 #include "raster/tile_functions.h"
 #include "stats/raster_stats_process.h"
+#include "tasks/task_errors.h"
 
 namespace lumo {
 

@@ -4,6 +4,7 @@
 #include <utility>
 
 #include "foundation/array.h"
+#include "foundation/errors.h"
 #include "foundation/point.h"
 #include "tasks/parallel_ranges.h"
 

@@ -1,5 +1,7 @@
 #include "tasks/function_stage.h"
 
+#include "tasks/task_errors.h"
+
 namespace lumo {
 
 /// Calls the function of a stage, which outlives it.

@@ -7,9 +7,9 @@
 #include <utility>
 #include <vector>
 
-#include "foundation/errors.h"
 #include "foundation/fault.h"
 #include "foundation/run_controls.h"
+#include "tasks/task_errors.h"
 
 // Parallel loops over ranges. A body says how large its range is and what to do with a part of it;
 // a runner hands the parts to the engine's threads and returns when all are done. Bodies are plain

@@ -3,7 +3,7 @@
 #include <vector>
 
 #include "raster/raster_command.h"
-#include "views/catalog_raster_ref.h"
+#include "views/sources/catalog_raster_ref.h"
 
 namespace lumo {
 

@@ -2,8 +2,8 @@
 
 #include <algorithm>
 
-#include "raster/block_shape.h"
 #include "georef/derived_georef.h"
+#include "raster/block_shape.h"
 #include "views/skip_raster.h"
 
 namespace lumo {

@@ -1,7 +1,7 @@
 #include "commands/command.h"
 
 #include "commands/arg_list.h"
-#include "foundation/errors.h"
+#include "commands/command_errors.h"
 #include "support/test_commands.h"
 
 namespace lumo {

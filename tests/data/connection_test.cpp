@@ -1,3 +1,4 @@
+#include "data/data_errors.h"
 #include "data/data_manager.h"
 #include "data/mt_connection.h"
 #include "foundation/fault.h"

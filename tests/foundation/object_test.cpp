@@ -4,12 +4,17 @@
 #include <sstream>
 #include <thread>
 
+#include "commands/command_errors.h"
+#include "data/data_errors.h"
 #include "foundation/containers.h"
 #include "foundation/errors.h"
 #include "foundation/library.h"
 #include "foundation/pointer.h"
 #include "foundation/scalar.h"
 #include "foundation/type_code.h"
+#include "fx/region_errors.h"
+#include "geometry/polygon_errors.h"
+#include "tasks/task_errors.h"
 
 namespace lumo {
 namespace {

@@ -16,6 +16,7 @@
 #include "support/sample_data.h"
 #include "support/temporary_directory.h"
 #include "support/test_rasters.h"
+#include "tasks/task_errors.h"
 
 namespace lumo {
 namespace {

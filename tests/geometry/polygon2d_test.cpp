@@ -9,6 +9,8 @@
 
 #include <gtest/gtest.h>
 
+#include "geometry/polygon_errors.h"
+
 namespace lumo {
 namespace {
 

@@ -8,7 +8,8 @@
 #include "support/file_bytes.h"
 #include "support/run_command.h"
 #include "support/temporary_directory.h"
-#include "views/memory_raster.h"
+#include "tasks/task_errors.h"
+#include "views/sources/memory_raster.h"
 
 namespace lumo {
 namespace {

@@ -7,7 +7,7 @@
 #include "support/file_size_limit.h"
 #include "support/sample_data.h"
 #include "support/temporary_directory.h"
-#include "views/catalog_raster_ref.h"
+#include "views/sources/catalog_raster_ref.h"
 
 namespace lumo {
 namespace {

@@ -1,4 +1,4 @@
-#include "views/memory_raster.h"
+#include "views/sources/memory_raster.h"
 
 #include <cmath>
 #include <cstdio>

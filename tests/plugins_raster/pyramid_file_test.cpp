@@ -1,7 +1,7 @@
 #include <fstream>
 
 #include "support/pyramid_scene.h"
-#include "views/file_state.h"
+#include "views/sources/file_state.h"
 
 namespace lumo::test {
 namespace {

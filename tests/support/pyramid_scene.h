@@ -6,7 +6,7 @@
 #include "support/fake_source.h"
 #include "support/raster_sources.h"
 #include "support/temporary_directory.h"
-#include "views/catalog_raster_ref.h"
+#include "views/sources/catalog_raster_ref.h"
 
 namespace lumo::test {
 

@@ -13,6 +13,7 @@
 #include "foundation/library.h"
 #include "tasks/array_operations.h"
 #include "tasks/parallel_ranges.h"
+#include "tasks/task_errors.h"
 #include "tasks/thread_limit.h"
 
 namespace lumo {

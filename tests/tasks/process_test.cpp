@@ -9,6 +9,7 @@
 
 #include "foundation/scalar.h"
 #include "tasks/process_builder.h"
+#include "tasks/task_errors.h"
 #include "tasks/thread_limit.h"
 
 namespace lumo {

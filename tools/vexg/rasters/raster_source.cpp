@@ -11,7 +11,7 @@
 #include "options/option_values.h"
 #include "raster/pixel_types.h"
 #include "verb.h"
-#include "views/catalog_raster_ref.h"
+#include "views/sources/catalog_raster_ref.h"
 
 namespace lumo::host {
 namespace {

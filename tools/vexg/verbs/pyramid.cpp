@@ -10,7 +10,7 @@
 #include "output/json_number.h"
 #include "rasters/file_verb.h"
 #include "rasters/raster_target.h"
-#include "views/catalog_raster_ref.h"
+#include "views/sources/catalog_raster_ref.h"
 
 namespace lumo::host {
 namespace {

@@ -171,7 +171,9 @@ class StatsVerb final : public FileVerb {
         "a band without a valid pixel all but the count is null, and a dash in the table; a count "
         "that isn't known is null, and NaN and infinities are.");
     line.AddExample("vexg stats scene.tif --bands 3,2,1 --extended");
-    line.Add("--bands", bandsText_, "Bands, from 0; all by default").Shows("B,B...").Example("3,2,1");
+    line.Add("--bands", bandsText_, "Bands, from 0; all by default")
+        .Shows("B,B...")
+        .Example("3,2,1");
     line.Add("--extended", isExtended_, "With covariances and sums of products");
     line.Add("--save", saves_, "Store them with the raster, so that they are known from now on");
     line.Add("--json", isJson_, "As JSON");

@@ -1,0 +1,113 @@
+#pragma once
+
+#include <cstddef>
+#include <cstdint>
+#include <queue>
+#include <vector>
+
+#include "fx/label_pairs.h"
+
+namespace lumo {
+
+/// Neighbouring segments of a label image, and the cost of joining them: for segments of a and b
+/// pixels with mean band vectors u and v and a common boundary of l pixel edges
+/// a b / (a + b) * |u - v|^2 / l (Robinson, Redding and Crisp, Implementation of a fast algorithm
+/// for segmenting SAR imagery, 2002). Merges the cheapest pair of mutually nearest segments, one
+/// after the other, with costs brought up to date after each.
+///
+/// Ties: a segment's nearest neighbour is the one of the lowest label among equal costs when all
+/// are searched, and the pair that was found first when a cost has changed; of equal costs the pair
+/// that was found first in the image is merged first.
+///
+/// Cost: a merge looks at the neighbours of the two segments, and at those of neighbours whose
+/// nearest was one of the two.
+/// Threads: one at a time; the arrays are kept from image to image.
+class VEXG_EXPORT LambdaSchedule {
+ public:
+  /// A merge of `higher` into `lower`.
+  struct Merge {
+    double lambda = 0;  ///< the cost
+    std::uint32_t lower = 0;
+    std::uint32_t higher = 0;
+  };
+
+  /// Forgets everything, and makes room for labels below `labelCount`, of `bands` bands.
+  void Begin(std::uint32_t labelCount, std::uint32_t bands);
+
+  /// Adds a pixel to its segment.
+  /// @param label   not 0.
+  /// @param values  one for each band.
+  template <typename T>
+  void AddPixel(std::uint32_t label, const T* values, std::size_t bandStride) {
+    double* const sums = means_.data() + std::size_t{label} * bands_;
+    for (std::uint32_t band = 0; band < bands_; ++band) {
+      sums[band] += static_cast<double>(values[band * bandStride]);
+    }
+    regions_[label].area += 1.0;
+  }
+  /// Computes means and costs, and finds the nearest neighbours. Behind all pixels.
+  /// @param pairs  of neighbours; none has the label 0.
+  void Build(const std::vector<LabelPair>& pairs);
+
+  /// Merges the next pair. @return false when there is none.
+  bool Step(Merge& merge);
+
+ private:
+  static constexpr std::uint32_t kNone = 0xFFFFFFFF;
+
+  struct Region {
+    double area = 0;
+    std::uint32_t minimum = kNone;  // pair
+    std::uint32_t first = kNone;    // of its pairs
+  };
+
+  /// A pair stands in the lists of both of its regions; slot i of the links belongs to ids[i].
+  struct Pair {
+    std::uint32_t ids[2] = {};  // lower label first
+    std::uint32_t next[2] = {};
+    std::uint32_t previous[2] = {};
+    double length = 0;
+    double cost = 0;
+    bool isChosen = false;
+    bool isQueued = false;
+
+    unsigned SlotOf(std::uint32_t region) const { return ids[0] == region ? 0 : 1; }
+    std::uint32_t Other(std::uint32_t region) const { return ids[0] == region ? ids[1] : ids[0]; }
+  };
+
+  /// A pair in the queue. It is out of date when the pair has left the queue since, or has come
+  /// back at another cost.
+  struct Queued {
+    double cost;
+    std::uint32_t pair;
+    bool operator<(const Queued& other) const {  // the cheapest on top
+      return cost != other.cost ? cost > other.cost : pair > other.pair;
+    }
+  };
+
+  bool IsCurrent(const Queued& entry) const {
+    const Pair& pair = pairs_[entry.pair];
+    return pair.isQueued && pair.cost == entry.cost;
+  }
+  template <typename Visit>
+  void ForEachPair(std::uint32_t region, Visit&& visit);
+  void Link(std::uint32_t pair, std::uint32_t region);
+  void Unlink(std::uint32_t pair, std::uint32_t region);
+  void Relabel(std::uint32_t pair, std::uint32_t from, std::uint32_t to);
+  double CostOf(const Pair& pair) const;
+  void Choose(std::uint32_t region, std::uint32_t pair);
+  void FindNearest(std::uint32_t region);
+  void JoinMeans(std::uint32_t lower, std::uint32_t higher);
+  void TakeOverPairs(std::uint32_t lower, std::uint32_t higher);
+  void UpdateNearest(std::uint32_t neighbour, std::uint32_t pair, std::uint32_t lower,
+                     std::uint32_t higher);
+
+  std::uint32_t bands_ = 0;
+  std::vector<Region> regions_;  // by label
+  std::vector<double> means_;    // by label, then band
+  std::vector<Pair> pairs_;
+  std::priority_queue<Queued> queue_;
+  std::vector<std::uint32_t> pairTo_;  // by label: the pair of the region that is merged into
+};
+
+}  // namespace lumo

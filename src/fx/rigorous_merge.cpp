@@ -1,0 +1,105 @@
+#include "fx/rigorous_merge.h"
+
+#include <algorithm>
+#include <numeric>
+
+namespace lumo {
+namespace {
+
+/// The groups of labels that are joined: numbered from 1 in the order in which they arise.
+class Groups {
+ public:
+  explicit Groups(std::size_t labels) : ofLabel_(labels), parents_(1) {}
+
+  void Join(std::uint32_t a, std::uint32_t b) {
+    std::uint32_t& groupOfA = ofLabel_[a];
+    std::uint32_t& groupOfB = ofLabel_[b];
+    if (groupOfA == 0 && groupOfB == 0) {
+      groupOfA = groupOfB = Count() + 1;
+      parents_.push_back(0);
+    } else if (groupOfA == 0) {
+      groupOfA = groupOfB;
+    } else if (groupOfB == 0) {
+      groupOfB = groupOfA;
+    } else if (groupOfA != groupOfB) {
+      const std::uint32_t low = RootOf(std::min(groupOfA, groupOfB));
+      const std::uint32_t high = RootOf(std::max(groupOfA, groupOfB));
+      if (low != high) parents_[low] = high;
+    }
+  }
+
+  /// How many groups have arisen, those included that are part of others by now.
+  std::uint32_t Count() const { return static_cast<std::uint32_t>(parents_.size() - 1); }
+
+  std::vector<std::uint32_t> NumberLabels() const {
+    std::vector<std::uint32_t> numbers(ofLabel_.size());
+    if (Count() == 0) {
+      std::iota(numbers.begin(), numbers.end(), 0U);
+      return numbers;
+    }
+    std::uint32_t next = Count();
+    for (std::size_t label = 0; label < numbers.size(); ++label) {
+      numbers[label] = ofLabel_[label] != 0 ? RootOf(ofLabel_[label]) : next++;
+    }
+    return numbers;
+  }
+
+ private:
+  std::uint32_t RootOf(std::uint32_t group) const {
+    while (parents_[group] != 0) group = parents_[group];
+    return group;
+  }
+
+  std::vector<std::uint32_t> ofLabel_;
+  std::vector<std::uint32_t> parents_;  // by group; 0 for a root
+};
+
+}  // namespace
+
+void RigorousMerge::Begin(std::uint32_t labelCount, std::uint32_t bands, RegionSums sums) {
+  bands_ = bands;
+  sums_ = sums;
+  const std::size_t labels = std::size_t{labelCount} + 1;
+  counts_.assign(labels, 0.0F);
+  toldSums_.assign(sums == RegionSums::kTold ? labels * bands : 0, 0.0F);
+  exactSums_.assign(sums == RegionSums::kExact ? labels * bands : 0, 0.0);
+}
+
+double RigorousMerge::MeanOf(std::uint32_t label, std::uint32_t band) const {
+  const float count = counts_[label];
+  if (count == 0) return 0;
+  const std::size_t at = std::size_t{label} * bands_ + band;
+  if (sums_ == RegionSums::kExact) return exactSums_[at] / static_cast<double>(count);
+  return static_cast<double>(toldSums_[at] / count);
+}
+
+float RigorousMerge::CostOf(const LabelPair& pair) const {
+  double sum = 0;
+  for (std::uint32_t band = 0; band < bands_; ++band) {
+    const double difference = MeanOf(pair.low, band) - MeanOf(pair.high, band);
+    sum += difference * difference;
+  }
+  const auto a = static_cast<double>(counts_[pair.low]),
+             b = static_cast<double>(counts_[pair.high]);
+  // Of two segments without a pixel that counts it is no number, and not below any threshold.
+  return static_cast<float>(b * a / (b + a) * sum / static_cast<double>(pair.length));
+}
+
+std::vector<std::uint32_t> RigorousMerge::Join(const std::vector<LabelPair>& pairs,
+                                               double threshold) {
+  Groups groups(counts_.size());
+  if (threshold > 0) {
+    std::vector<std::uint32_t> order(pairs.size());
+    std::iota(order.begin(), order.end(), 0U);
+    std::stable_sort(order.begin(), order.end(),
+                     [&](std::uint32_t a, std::uint32_t b) { return pairs[a].low < pairs[b].low; });
+    for (const std::uint32_t at : order) {
+      if (threshold > static_cast<double>(CostOf(pairs[at]))) {
+        groups.Join(pairs[at].low, pairs[at].high);
+      }
+    }
+  }
+  return groups.NumberLabels();
+}
+
+}  // namespace lumo

@@ -1,7 +1,0 @@
-#include "views/reader_raster_body.h"
-
-namespace lumo {
-
-VEXG_INSTANCES(TWELVE, ReaderRaster);
-
-}  // namespace lumo

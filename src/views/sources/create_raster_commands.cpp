@@ -1,0 +1,70 @@
+#include "data/data_manager.h"
+#include "data/open_sources.h"
+#include "foundation/fault.h"
+#include "raster/raster_details.h"
+#include "views/sources/raster_def_command.h"
+#include "views/sources/temp_raster.h"
+
+namespace lumo {
+namespace {
+
+const CommandDeclaration kCreate{
+    "CreateRasterCommand", "Rasters", "Makes a new raster in a data source.",
+    RasterDefInputs({{"ConnStr", Presence::kRequired, ValueKind::kTextList, "where it is made"},
+                     {"Format", Presence::kOptional, ValueKind::kText, "key of the format"},
+                     {"Interleave", Presence::kOptional, ValueKind::kWord,
+                      "BIP, BIL, BSQ: the order in the source", "", &WordsIn<Interleave>},
+                     {"Details", Presence::kOptional, ValueKind::kWord,
+                      "of the raster in SrcURI, as far as the format has room for them. Told: "
+                      "none; Names: the names of bands; Bands: all of the bands and the raster, "
+                      "such as units, scales and further items; All: also the place, as control "
+                      "points",
+                      "", &WordsIn<KeptDetails>}}),
+    PublishedOutputs()};
+
+class CreateRasterCommand final : public RasterDefCommand {
+  CommandResult Execute() override {
+    RasterDef def;
+    if (!CheckInputs() || !ReadRasterDef(def)) return Fail();
+    KeepDetails(def.metadata, Read<KeptDetails>("Details"));
+    const auto connStrings = Read<Array<String>>("ConnStr");
+    const SourceClaim claim(connStrings);
+    if (!claim.IsGranted()) {
+      return Fail("the source is open already, and left as it is: " +
+                  connStrings[connStrings.GetCount() - 1]);
+    }
+    return Publish(MakeReaderRaster(GetGlobalDataManager().CreateRaster(connStrings, def)));
+  }
+};
+
+const CommandFactoryT<CreateRasterCommand> createFactory(kCreate);
+
+const CommandDeclaration kCreateTemp{
+    "CreateTempRasterCommand", "Rasters",
+    "Makes a raster in a temporary file, which goes away with the raster.",
+    RasterDefInputs({{"Directory", Presence::kOptional, ValueKind::kText,
+                      "where the file lies; the system's choice when absent"}}),
+    PublishedOutputs()};
+
+class CreateTempRasterCommand final : public RasterDefCommand {
+  CommandResult Execute() override {
+    RasterDef def;
+    if (!CheckInputs() || !ReadRasterDef(def)) return Fail();
+    Context context;
+    if (HasInput("Directory")) {
+      context[Context::kWorkingDirectory].text = Read<String>("Directory");
+    }
+    BasicRasterPtr made;
+    const bool typed = DispatchType(EightTypes{}, def.dataType, [&]<typename T>() {
+      made.Reset(new TempRaster<T>(context, def));
+      return true;
+    });
+    return typed ? Publish(made)
+                 : Fail("DataType is no pixel type that a temporary raster can have");
+  }
+};
+
+const CommandFactoryT<CreateTempRasterCommand> createTempFactory(kCreateTemp);
+
+}  // namespace
+}  // namespace lumo

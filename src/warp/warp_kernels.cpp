@@ -1,0 +1,122 @@
+#include "warp/warp_kernels.h"
+
+#include <algorithm>
+#include <cmath>
+#include <limits>
+#include <type_traits>
+
+#include "platform/vector_clones.h"
+
+namespace lumo {
+namespace {
+
+/// A result as a pixel value.
+template <typename T, bool kNearest>
+[[gnu::always_inline]] inline T Store(double value) {
+  if constexpr (std::is_floating_point_v<T>) {
+    return static_cast<T>(value);
+  } else {
+    if constexpr (kNearest) value = std::floor(value + 0.5);
+    const double low = std::numeric_limits<T>::min(), high = std::numeric_limits<T>::max();
+    value = value < low ? low : value;
+    value = value > high ? high : value;
+    // By way of a type that vector code converts to.
+    if constexpr (sizeof(T) < 4) return static_cast<T>(static_cast<std::int32_t>(value));
+    return static_cast<T>(value);
+  }
+}
+
+template <typename T, bool kNearest>
+[[gnu::always_inline]] inline void Linear(WarpLanes<T, 4>& lanes, const double* as,
+                                          const double* bs, unsigned count) {
+  for (unsigned i = 0; i < count; ++i) {
+    const auto p00 = static_cast<double>(lanes.taps[0][i]);
+    const auto p10 = static_cast<double>(lanes.taps[1][i]);
+    const auto p01 = static_cast<double>(lanes.taps[2][i]);
+    const auto p11 = static_cast<double>(lanes.taps[3][i]);
+    const double a = as[i], b = bs[i];
+    const double value = p00 + (p10 - p00) * a + (p01 - p00) * b + (p11 + p00 - p01 - p10) * a * b;
+    lanes.out[i] = Store<T, kNearest>(value);
+  }
+}
+
+/// The kernel on four values in a row, at the fraction t between the middle two.
+[[gnu::always_inline]] inline double Convolve(double p0, double p1, double p2, double p3,
+                                              double t) {
+  constexpr double k = -1.0;
+  return p1 + t * (-(p2 - p0) * k + t * (((p3 - p1) + (p2 - p0) * 2) * k - (p1 - p2) * 3 +
+                                         t * ((p0 + p1 - p2 - p3) * k + (p1 - p2) * 2)));
+}
+
+template <typename T>
+[[gnu::always_inline]] inline void Cubic(WarpLanes<T, 16>& lanes, const double* as,
+                                         const double* bs, unsigned count) {
+  for (unsigned i = 0; i < count; ++i) {
+    const auto tap = [&](unsigned n) { return static_cast<double>(lanes.taps[n][i]); };
+    const double a = as[i], b = bs[i];
+    const double c0 = Convolve(tap(0), tap(4), tap(8), tap(12), b);
+    const double c1 = Convolve(tap(1), tap(5), tap(9), tap(13), b);
+    const double c2 = Convolve(tap(2), tap(6), tap(10), tap(14), b);
+    const double c3 = Convolve(tap(3), tap(7), tap(11), tap(15), b);
+    lanes.out[i] = Store<T, false>(Convolve(c0, c1, c2, c3, a));
+  }
+}
+
+template <typename T>
+[[gnu::always_inline]] inline void Weigh(WarpLanes<T, 16>& lanes, const CubicWeights& x,
+                                         const CubicWeights& y, unsigned count) {
+  for (unsigned i = 0; i < count; ++i) {
+    const auto line = [&](unsigned n) {
+      return static_cast<double>(lanes.taps[n][i]) * x.of[0][i] +
+             static_cast<double>(lanes.taps[n + 1][i]) * x.of[1][i] +
+             static_cast<double>(lanes.taps[n + 2][i]) * x.of[2][i] +
+             static_cast<double>(lanes.taps[n + 3][i]) * x.of[3][i];
+    };
+    lanes.out[i] = Store<T, true>(line(0) * y.of[0][i] + line(4) * y.of[1][i] +
+                                  line(8) * y.of[2][i] + line(12) * y.of[3][i]);
+  }
+}
+
+}  // namespace
+
+VEXG_VECTOR_CLONES
+void FindCubicWeights(const double* ways, unsigned count, CubicWeights& weights) {
+  for (unsigned i = 0; i < count; ++i) {
+    const double t = ways[i], t2 = t * t, t3 = t2 * t;
+    weights.of[0][i] = 2 * t2 - t3 - t;
+    weights.of[1][i] = 1 - 2 * t2 + t3;
+    weights.of[2][i] = t + t2 - t3;
+    weights.of[3][i] = t3 - t2;
+  }
+}
+
+#define VEXG_WARP_KERNELS(T)                                                                       \
+  VEXG_VECTOR_CLONES                                                                               \
+  void InterpolateLinear(WarpLanes<T, 4>& lanes, const double* a, const double* b, unsigned count, \
+                         WarpRounding rounding) {                                                  \
+    if (rounding == WarpRounding::kNearest) {                                                      \
+      Linear<T, true>(lanes, a, b, count);                                                         \
+    } else {                                                                                       \
+      Linear<T, false>(lanes, a, b, count);                                                        \
+    }                                                                                              \
+  }                                                                                                \
+  VEXG_VECTOR_CLONES                                                                               \
+  void InterpolateCubic(WarpLanes<T, 16>& lanes, const double* a, const double* b,                 \
+                        unsigned count) {                                                          \
+    Cubic(lanes, a, b, count);                                                                     \
+  }                                                                                                \
+  VEXG_VECTOR_CLONES                                                                               \
+  void WeighCubic(WarpLanes<T, 16>& lanes, const CubicWeights& x, const CubicWeights& y,           \
+                  unsigned count) {                                                                \
+    Weigh(lanes, x, y, count);                                                                     \
+  }
+VEXG_WARP_KERNELS(std::uint8_t)
+VEXG_WARP_KERNELS(std::int8_t)
+VEXG_WARP_KERNELS(std::uint16_t)
+VEXG_WARP_KERNELS(std::int16_t)
+VEXG_WARP_KERNELS(std::uint32_t)
+VEXG_WARP_KERNELS(std::int32_t)
+VEXG_WARP_KERNELS(float)
+VEXG_WARP_KERNELS(double)
+
+}  // namespace lumo
