@@ -32,8 +32,8 @@ struct FlatLayout {
   VEXG_EXPORT bool GetBytes(unsigned elementBytes, std::uint64_t& bytes) const;
 };
 
-/// A block of a flat raster, as rows: stretches that lie together in the raster, in the order in
-/// which they follow one another in a block of the same interleave.
+/// A block of a flat raster, as rows: runs that lie together in the raster, in the order in which
+/// they follow one another in a block of the same interleave.
 ///
 /// Where bands are chosen from a pixel-interleaved raster the elements of a row don't lie together.
 /// A row then spans pixels from the lowest band chosen to the highest, and PickBands and PlaceBands

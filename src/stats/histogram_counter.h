@@ -10,9 +10,9 @@ namespace lumo {
 
 /// Counts the values of tiles, on one thread at a time. Exists for TenTypes.
 ///
-/// Types of 8 and 16 bits are counted value by value, and only what was counted is parted into
-/// bins; for the others each value's bin is found in vector registers first. Counts do not depend
-/// on how the pixels are divided among counters.
+/// Types of 8 and 16 bits are counted value by value, and only then are the counts put into bins;
+/// for the others each value's bin is found in vector registers first. Counts do not depend on how
+/// the pixels are divided among counters.
 ///
 ///     HistogramCounter<std::uint16_t> counter(bins);
 ///     counter.Count(tile, {0, tile.Height(), 0, tile.Width()});

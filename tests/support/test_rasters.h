@@ -133,7 +133,7 @@ class MemoryTestRaster final : public TestRaster<T> {
   std::vector<unsigned char> states;
 
  private:
-  /// Calls `move(place here, place in the block, elements)` for stretches that lie together.
+  /// Calls `move(place here, place in the block, elements)` for runs that lie together.
   template <typename F>
   void Move(const SubRect& rect, const Array<unsigned>& bands, const F& move) {
     bool inOrder = bands.GetCount() == this->Bands();

@@ -42,7 +42,7 @@ class OutputFile {
   void CheckPlaces() const;
 
   /// Makes the folder. Throws HostError when the disk has less room than `bytes`; 0 for a size that
-  /// nobody knows before.
+  /// is not known in advance.
   void Begin(std::uint64_t bytes);
 
   /// Where the file is to be made, from Begin on.

@@ -23,7 +23,7 @@ struct TargetOptions {
 std::string ChooseFormat(const TargetOptions& target);
 
 /// Bytes that a raster of this size, bands and pixel type takes at least in a file of this format;
-/// 0 for a format that makes them smaller by nobody knows how much.
+/// 0 when the format compresses, so that the size is not known in advance.
 std::uint64_t BytesInFile(const std::string& format, const RasterInfo& raster);
 
 /// A format that a raster is made in, and where.
