@@ -14,8 +14,8 @@ template <typename T>
 VEXG_EXPORT void ToDoubles(const T* from, double* to, std::size_t count);
 
 /// Gives each double as a T: an integer is cut toward zero to 64 bits, of which the low ones stay,
-/// so 300.7 is 44 as a byte; what 64 bits can't hold, and NaN, is the smallest 64-bit integer. A
-/// float is rounded.
+/// so 300.7 is 44 as a byte; numbers that 64 bits can't hold, and NaN, give the smallest 64-bit
+/// integer. A float is rounded.
 template <typename T>
 VEXG_EXPORT void FromDoubles(const double* from, T* to, std::size_t count);
 

@@ -14,7 +14,7 @@ struct Argument {
 using ArgID = unsigned;
 
 /// The arguments that tasks hand to one another, by position from 0. They have no names and no
-/// element types: a reader casts what it gets.
+/// element types: a reader casts the objects that it gets.
 /// Failure: a list that can't be made or grow stores ArgListError.
 class VEXG_EXPORT ArgList : public ErrorState {
  public:

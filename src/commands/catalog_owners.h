@@ -5,7 +5,7 @@
 
 #include "commands/catalog_session.h"
 
-// Keeps who has opened what, beside the catalog's own counts. For the catalog's sources only;
+// Keeps the opens of each client, beside the catalog's own counts. For the catalog's sources only;
 // everything is called under the lock of the catalog.
 
 namespace lumo::catalog {

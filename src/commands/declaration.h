@@ -52,7 +52,7 @@ struct InputDeclaration {
   const char* name;  ///< attribute in the job document
   Presence presence;
   ValueKind kind;
-  const char* meaning;            ///< for people, without a capital or a full stop
+  const char* meaning;            ///< for people, without a full stop at the end
   const char* unit = "";          ///< unit of a number; empty for none
   WordsFunction words = nullptr;  ///< of a kWord
 };

@@ -20,7 +20,7 @@ struct CommandDescriptor {
   Set<String> expanded;         ///< names of inputs whose texts hold variables
   IPC ipc;                      ///< abort flag and progress report of this command
   unsigned position = 0;        ///< in the job, while it runs
-  String complaint;             ///< what the document gets wrong about the command; see JobChecks
+  String complaint;             ///< the document's fault about the command; see JobChecks
   String explanation;           ///< a better reason than the command's own for its failure
 
   /// Why the command failed, in one line; empty when it did not, or did not say.
@@ -72,7 +72,7 @@ class VEXG_EXPORT Job {
   Deque<CommandDescriptorPtr> commands;  ///< in document order
   Map<String, unsigned> commandIndex;    ///< name to position in `commands`
   List<UnknownCommand> unknown;          ///< in document order
-  List<String> faults;                   ///< what is wrong with the document, a line each
+  List<String> faults;                   ///< faults of the document, a line each
   JobChecks checks = JobChecks::kTold;   ///< how the commands' inputs are looked at
   bool tellsReasons = false;             ///< the result document says why commands failed
   IPCPtr ipc;                            ///< empty when the document named none that can be used

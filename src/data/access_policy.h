@@ -7,8 +7,8 @@
 
 namespace lumo {
 
-/// Says what sources may be opened and made. The default allows everything, as suits a program that
-/// does what its user says; a server that takes jobs from others sets a narrower one:
+/// Says which sources may be opened and made. The default allows everything, as suits a program
+/// that does what its user says; a server that takes jobs from others sets a narrower one:
 ///
 ///     AccessPolicy policy;
 ///     policy.roots = {"/srv/scenes"};

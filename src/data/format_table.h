@@ -10,7 +10,7 @@ namespace lumo {
 
 class DataConnectionFactory;
 
-/// Names what the sources of a format hold.
+/// The kinds of sources of a format.
 enum class DataSourceKind : std::int32_t { kUnknown = 0, kRaster = 1, kVector = 2 };
 
 /// One row of the table of formats: a format that some plug-in library reads.

@@ -10,7 +10,7 @@
 namespace lumo {
 
 // Changes of the statistics and histograms that a source stores, made by one of several that have
-// it open: each takes away only what it has known of, so that what another has stored since stays.
+// it open: each takes away only values that it has known, so that those of others since then stay.
 
 /// Puts statistics into the stored ones. A band without any takes its stored ones away, unless
 /// another has replaced them since they were looked at.

@@ -75,7 +75,7 @@ class PlainRasterReader : public RasterReader<T> {
 };
 
 /// The connection of a reader that is made once the source is open: a plug-in's own derives from it
-/// and has to open the source and to say what it is.
+/// and has to open the source and to describe it.
 class VEXG_EXPORT PlainRasterConnection : public RasterDataConnection {
  public:
   /// Nothing is opened here: the factory of the plug-in makes the connection and calls SetOpened.
@@ -99,7 +99,7 @@ class VEXG_EXPORT PlainRasterConnection : public RasterDataConnection {
   DataConnectionPtr SelfPointer() override { return DataConnectionPtr(this, true); }
 
  protected:
-  /// Takes over what the source is once it is open.
+  /// Takes over the identity and the reader of the source once it is open.
   /// @param uri  the same for every connection to one source.
   template <typename T>
   void SetOpened(const Array<String>& connStrings, const lumo::URI& uri,

@@ -45,7 +45,7 @@ class VEXG_EXPORT BasicRasterReader {
   virtual bool PyramidRebuild() = 0;
   /// Removes the levels. False when there are none, or they can't be removed.
   virtual bool PyramidDelete() = 0;
-  /// Shows what the source holds by now, levels that others have made among it.
+  /// Looks again at the levels that the source holds, those that others have made among them.
   virtual bool PyramidRefresh() = 0;
 
   /// The statistics that the source can keep, bits of lumo::StatsMask.

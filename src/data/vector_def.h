@@ -4,7 +4,7 @@
 
 namespace lumo {
 
-/// Names what the features of a vector source are.
+/// The kinds of features of a vector source.
 enum class VectorGeometry : std::int32_t { kUnknown = 0, kPoint = 1, kLine = 2, kPolygon = 3 };
 
 /// The description of a vector source: a value, whose copy has a geo-reference of its own.

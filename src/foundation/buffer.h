@@ -30,7 +30,7 @@ class VEXG_EXPORT BasicBuffer : public Object {
   static constexpr unsigned kMargin = 1024;            ///< elements of a window beside its page
   static constexpr unsigned kLargeHeaderSize = 65536;  ///< bytes
 
-  /// Closes what was not closed. Nobody hears of what goes wrong here: see Close.
+  /// Closes the file unless that is done. A failure here is not seen by anybody: see Close.
   ~BasicBuffer() override;
   BasicBuffer(const BasicBuffer&) = delete;
   BasicBuffer& operator=(const BasicBuffer&) = delete;
@@ -40,10 +40,10 @@ class VEXG_EXPORT BasicBuffer : public Object {
   /// The shape that the owner gave; elements are addressed by one index all the same.
   const ArrayDims& GetDims() const { return dims_; }
 
-  /// Elements in the file, after what changed in the window has gone there; 0 after an error.
+  /// Elements in the file, after the changes in the window have gone there; 0 after an error.
   std::uint64_t Count();
 
-  /// Writes what changed in the window to the file. In kReadOnly nothing but BufferWarningReadOnly
+  /// Writes the changes in the window to the file. In kReadOnly nothing but BufferWarningReadOnly
   /// comes of it. @return false after an error.
   bool Flush();
 
@@ -59,7 +59,7 @@ class VEXG_EXPORT BasicBuffer : public Object {
   /// BufferWarningReadOnly or BufferWarningNoHeaderData, or after an error.
   bool WriteHeader();
 
-  /// Writes what changed, then the header, and closes the file. Nothing works any more after it.
+  /// Writes the changes, then the header, and closes the file. Nothing works any more after it.
   /// @return false when the file isn't as the owner left the buffer: an error is or was stored, the
   ///         header could not be written, or the file was deleted or replaced meanwhile. TakeFault
   ///         says why. A second call gives what the first gave.

@@ -61,7 +61,7 @@ class VEXG_EXPORT ErrorState {
   /// True when the stored severity has the error bit.
   bool HasError() const { return (severity_ & kSeverityError) != 0; }
 
-  /// Stores the state of `error` in place of what was there.
+  /// Stores the state of `error` in place of the earlier one.
   void SetErrorState(const ObjectErrorState& error) { Store(error.GetState()); }
 
   /// Takes over the state of another object.

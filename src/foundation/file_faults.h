@@ -36,7 +36,7 @@ class VEXG_EXPORT FileFaults {
   /// The first fault of that file; null when there was none.
   const FileFault* FirstOf(const std::string& path) const;
 
-  /// Forgets what was heard so far.
+  /// Forgets the faults heard so far.
   void Clear();
 
   /// Notes a fault. It is kept only while some FileFaults lives on this thread.

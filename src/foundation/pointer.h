@@ -113,7 +113,7 @@ class Pointer {
     return *this;
   }
 
-  /// Lets go of what is held and takes over `object`, as the constructor does.
+  /// Lets go of the object that is held and takes over `object`, as the constructor does.
   void Reset(T* object = nullptr, bool noDelete = false) {
     ControlBlock* const fresh = MakeBlock(object, noDelete);
     Release();

@@ -23,7 +23,7 @@ namespace lumo {
 class VEXG_EXPORT StagedFiles {
  public:
   explicit StagedFiles(std::string raster);
-  /// Removes what was not moved in.
+  /// Removes the files that were not moved in.
   ~StagedFiles();
   StagedFiles(const StagedFiles&) = delete;
   StagedFiles& operator=(const StagedFiles&) = delete;

@@ -113,7 +113,7 @@ class VEXG_EXPORT String {
 VEXG_EXPORT String operator+(const String& a, const String& b);
 
 /// An opaque identifier, the key of an object in the catalog. It is compared unit by unit and never
-/// parsed or normalised; what it looks like is up to whoever makes it.
+/// parsed or normalised; its form is up to its maker.
 class VEXG_EXPORT URI : public String {
  public:
   URI() = default;

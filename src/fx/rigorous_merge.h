@@ -40,7 +40,7 @@ class VEXG_EXPORT RigorousMerge {
   }
 
   /// Joins the segments whose costs are below the threshold. Behind all pixels.
-  /// @return for each label the number of what it has become part of. Numbers follow the groups
+  /// @return for each label the number of its group. Numbers follow the groups
   ///         that were joined, then the labels that stayed alone, in their order; the first of
   ///         these has the number of the last group. Without any joining each label stays.
   std::vector<std::uint32_t> Join(const std::vector<LabelPair>& pairs, double threshold);

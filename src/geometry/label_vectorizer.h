@@ -25,7 +25,7 @@ class VEXG_EXPORT LabelPolygonSink {
 /// valid, when its label is the largest value of its type, and when it is NaN; excluded pixels are
 /// in no polygon. Exists for EightTypes.
 ///
-/// Cost: two lines of labels are held, and what BoundaryTracer needs.
+/// Cost: two lines of labels are held, beside the memory of BoundaryTracer.
 /// Threads: one at a time.
 ///
 ///     LabelVectorizer<std::int32_t> vectorizer(width, sink);

@@ -44,7 +44,7 @@ class VEXG_EXPORT CoordSysLog {
   std::uint32_t EnabledMask() const { return mask_; }
 
   /// Writes one line when `mask` has a level that is switched on.
-  /// @param format  printf text, UTF-8; what comes out is cut to 4095 bytes.
+  /// @param format  printf text, UTF-8; the result is cut to 4095 bytes.
   void Write(std::uint32_t mask, const char* format, ...) __attribute__((format(printf, 3, 4)));
   void WriteList(std::uint32_t mask, const char* format, std::va_list values);
 

@@ -50,7 +50,7 @@ class VEXG_EXPORT GeoRef {
   /// The class of the model, for files and commands.
   enum Type : std::uint32_t { kUnknown = 0, kStd = 1, kRpc = 2, kStdRpc = 3 };
 
-  /// Names what IsEqual leaves out.
+  /// Names the fields that IsEqual leaves out.
   enum EqualFlags : std::uint32_t { kSkipPixelSize = 1, kSkipTiePoint = 2 };
 
   virtual ~GeoRef() = default;
@@ -180,8 +180,8 @@ class VEXG_EXPORT GeoRef {
 /// Makes a deep copy of a model; empty when `source` is.
 VEXG_EXPORT GeoRefPtr CloneOf(const GeoRefPtr& source);
 
-/// The text form: the word "Std", "Rpc" or "StdRpc", a blank, and what Write gives. A null pointer
-/// is "Unknown ".
+/// Writes the text form: the word "Std", "Rpc" or "StdRpc", a blank, and the fields as Write has
+/// them. A null pointer is "Unknown ".
 VEXG_EXPORT std::ostream& operator<<(std::ostream& out, const GeoRef& geoRef);
 /// The text form of the model that a pointer holds.
 VEXG_EXPORT std::ostream& operator<<(std::ostream& out, const GeoRefPtr& geoRef);

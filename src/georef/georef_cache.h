@@ -7,7 +7,7 @@
 
 namespace lumo {
 
-/// Keeps what a model has computed of itself: the latitude of its middle, and its extent. Threads
+/// Keeps the results that a model has computed: the latitude of its middle, and its extent. Threads
 /// that read it, or write the same values once more, do not disturb one another.
 class GeoRefCache {
  public:

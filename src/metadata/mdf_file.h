@@ -15,7 +15,7 @@ namespace lumo {
 VEXG_EXPORT bool ReadMdfFile(const String& path, MdfFormat& format, std::vector<MdfEntry>& entries);
 
 /// The same of the file's text.
-/// @param path  for what is said of a fault.
+/// @param path  for the words of a fault.
 VEXG_EXPORT bool ReadMdfText(std::u16string_view text, const String& path, MdfFormat& format,
                              std::vector<MdfEntry>& entries);
 

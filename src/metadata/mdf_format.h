@@ -24,11 +24,11 @@ struct MdfFormat {
                             ///< as the parser hands on
   std::set<std::u16string> sectionStarts;  ///< names that open a section, in upper case
   std::set<std::u16string> sectionEnds;    ///< names that close one
-  String input = "UGH";  ///< the format's word, for what the parser says of itself
-  String xmlInputType;   ///< "XmlFile", "XmlUrl" or "XmlString"
+  String input = "UGH";                    ///< the format's word, for the notes of the parser
+  String xmlInputType;                     ///< "XmlFile", "XmlUrl" or "XmlString"
 };
 
-/// One entry of a definition file: what becomes of the text at one path.
+/// One entry of a definition file: the place and type of the text at one path.
 struct MdfEntry {
   String src;              ///< path among the texts; a "#" in it stands for a running number
   String dest;             ///< path in the target

@@ -57,9 +57,9 @@ class VEXG_EXPORT Metadata : public Object {
 
   bool IsA(unsigned typeCode) const override;
 
-  /// Adds what a source says of itself, see docs/metadata.md. The strings are the word of its
-  /// format, its name and, for XML formats, what the name is: "XmlFile", "XmlUrl" or "XmlString".
-  /// No strings, or "EMPTY" as the first one, change nothing and give true.
+  /// Adds the metadata of a source, see docs/metadata.md. The strings are the word of its format,
+  /// its name and, for XML formats, the kind of the name: "XmlFile", "XmlUrl" or "XmlString". No
+  /// strings, or "EMPTY" as the first one, change nothing and give true.
   /// @return false when a string is empty, the format is unknown or the source can't be read; the
   ///         parse log and the fault text say why.
   bool Open(const Array<String>& connectionStrings);
@@ -67,7 +67,7 @@ class VEXG_EXPORT Metadata : public Object {
   /// True when there is a value, not a container, at `path`.
   bool Exists(const String& path) const;
 
-  /// Deletes what is at `path`, a container with all that is in it.
+  /// Deletes the value or container at `path`, a container with all that is in it.
   void Remove(const String& path);
 
   /// Stores one value in place of what was there; containers on the way are made. False when the
@@ -102,7 +102,7 @@ class VEXG_EXPORT Metadata : public Object {
 
   /// Calls `use(const MetadataObject&)` for the value or container at `path`, under the store's
   /// lock. `use` must not touch this Metadata.
-  /// @return what it gave; false, with no call, when there is nothing.
+  /// @return its result; false, with no call, when there is nothing.
   template <typename Use>
   bool Visit(const String& path, Use&& use) const {
     return Read(path, std::forward<Use>(use));

@@ -182,7 +182,7 @@ class VEXG_EXPORT MetadataContainer : public MetadataObject {
   ///         leads through a value.
   bool Put(const String& path, std::unique_ptr<MetadataObject> value);
 
-  /// Deletes what stands at `path`. False when nothing does.
+  /// Deletes the value or container at `path`. False when there is none.
   bool Remove(const String& path);
 
   /// Puts copies of all values of `other` at their paths.

@@ -9,9 +9,9 @@
 
 namespace lumo {
 
-/// The log of what is read into metadata stores, one for the process. Three environment variables
-/// switch it on, all of which have to be set: metadata_parse_log_dir names the directory of the
-/// file metadata_parse_log.log, metadata_parse_log_level how much is written, and
+/// The log of values that are read into metadata stores, one for the process. Three environment
+/// variables switch it on, all of which have to be set: metadata_parse_log_dir names the directory
+/// of the file metadata_parse_log.log, metadata_parse_log_level how much is written, and
 /// metadata_parse_log_console whether lines go to standard error too, when it isn't 0. The two
 /// numbers are decimal, or octal behind 0, or hexadecimal behind 0x.
 ///
@@ -19,7 +19,7 @@ namespace lumo {
 /// Failure: a file that can't be made means no log, and nothing else.
 class VEXG_EXPORT MetadataParseLog {
  public:
-  static constexpr unsigned kErrors = 1;      ///< level of what failed
+  static constexpr unsigned kErrors = 1;      ///< level of failures
   static constexpr unsigned kTranslated = 2;  ///< level of the values as they are stored
   static constexpr unsigned kCollected = 3;   ///< level of the texts as they were found
 
@@ -36,7 +36,7 @@ class VEXG_EXPORT MetadataParseLog {
   bool IsOn(unsigned level) const { return level <= level_; }
 
   /// Writes when the log is set to `level` or above.
-  /// @param format  printf text, UTF-8; what comes out is cut to 4095 bytes.
+  /// @param format  printf text, UTF-8; the result is cut to 4095 bytes.
   void Write(unsigned level, const char* format, ...) __attribute__((format(printf, 3, 4)));
 
   /// The same of all that was written to a stream.

@@ -5,7 +5,7 @@
 
 namespace lumo {
 
-// Paths under which a parser notes what it read, and how.
+// Paths under which a parser notes its input and its kind.
 inline constexpr const char* kParserInfo = "/xx vex parser info/";
 inline constexpr const char* kParserUri = "/xx vex parser info/uri/";
 inline constexpr const char* kParserType = "/xx vex parser info/type/";

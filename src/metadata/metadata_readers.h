@@ -5,9 +5,9 @@
 namespace lumo {
 
 // The readers of the metadata formats. Each ties a definition file to a parser, and translates by
-// itself what the language of definition files does not reach.
+// itself the values that the language of definition files can't express.
 //
-// `connStrings` are the format's word, the input, and for XML formats what the input is: "XmlFile",
+// `connStrings` are the format's word, the input, and for XML formats the kind of input: "XmlFile",
 // which it is when nothing is said, "XmlUrl" or "XmlString".
 
 /// Reads texts and XML documents for the readers below: parses, then translates by a definition

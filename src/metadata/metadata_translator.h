@@ -15,8 +15,8 @@ namespace lumo {
 /// Threads: used by one thread.
 class VEXG_EXPORT MetadataDefFileTranslator {
  public:
-  /// Handles the entries in their order, and carries over what is left: to its own path, or below
-  /// "/private/" where a value has that path already, and what a parser said of itself.
+  /// Handles the entries in their order, and carries over the texts that are left: to their own
+  /// paths, or below "/private/" where a value has that path already, and the notes of the parser.
   bool TranslateAll(const std::vector<MdfEntry>& entries, MetadataContainer* source,
                     MetadataContainer* target, const MdfFormat* format);
 
@@ -37,7 +37,7 @@ class VEXG_EXPORT MetadataDefFileTranslator {
  private:
   bool TranslateEach(const std::vector<MdfEntry>& entries, MetadataContainer& source,
                      MetadataContainer& target, const MdfFormat& format);
-  const MdfEntry* current_ = nullptr;  // for what is said of a failure
+  const MdfEntry* current_ = nullptr;  // for the words of a failure
 };
 
 /// The text at `path` of a collection. False when there is none.

@@ -15,7 +15,7 @@ bool DispatchMetadataTypeOf(unsigned code, Body&& body) {
 }  // namespace detail
 
 /// Runs `body` for the element type with the type code `code`, one of the ten that hold values.
-/// @return what the body gave; false, with no call, for another code.
+/// @return the result of the body; false, with no call, for another code.
 template <typename Body>
 bool DispatchMetadataType(unsigned code, Body&& body) {
   return detail::DispatchMetadataTypeOf<std::uint8_t, std::int16_t, std::int32_t, float, double,

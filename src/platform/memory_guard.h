@@ -13,7 +13,7 @@ namespace lumo::platform {
 /// Guards a mapping while it lives. When a page of it is touched that the system can't give, zeros
 /// of this process's own take the place of the whole mapping, and WasCut() is true.
 ///
-/// The first guard installs a handler for SIGBUS, which passes on what is none of its business.
+/// The first guard installs a handler for SIGBUS, which passes on signals that aren't its own.
 class MemoryGuard {
  public:
   /// @param data,size  the mapping, from a page's begin on.

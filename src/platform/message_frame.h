@@ -9,7 +9,7 @@
 
 namespace lumo::platform {
 
-/// Puts a message together from what arrives in pieces.
+/// Puts a message together from the pieces that arrive.
 class FrameReader {
  public:
   enum class Status {

@@ -4,7 +4,7 @@
 
 namespace lumo::platform {
 
-/// Bounds on what the clients of a listener can hold.
+/// Bounds for the clients of a listener.
 struct ListenerLimits {
   double idleSeconds = 30.0;  ///< without a byte, before the first message is whole
   unsigned clients = 1024;    ///< connected at a time

@@ -92,7 +92,7 @@ class VEXG_EXPORT RandomAccessFile {
   /// Cuts the file, or lets it grow by zeros that take no room on the disk.
   bool SetSize(std::uint64_t bytes, std::string* fault = nullptr);
 
-  /// Returns when what was written is on the disk.
+  /// Returns when all bytes that were written are on the disk.
   bool Flush(std::string* fault = nullptr);
 
   /// Gives the file back to the system, which may report a failed write only now. Nothing works any

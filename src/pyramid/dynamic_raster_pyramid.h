@@ -54,7 +54,7 @@ class DynamicRasterPyramid final : public PyramidCallback<T> {
   bool TakeHistogram(const RasterHistogram<T>& histogram,
                      HistogramSign sign) requires(std::is_arithmetic_v<T>);
   bool TakeStats(const RasterStats<T>& stats) requires(std::is_arithmetic_v<T>);
-  /// Shows what the store of the pyramid holds now; false when there is nothing to show.
+  /// Looks again at the levels in the store of the pyramid; false when there are none.
   bool Refresh();
 
  private:

@@ -40,7 +40,7 @@ class VEXG_EXPORT PyramidBuilder : public Async {
 
 using PyramidBuilderPtr = Pointer<PyramidBuilder>;
 
-/// Names what a build is to make of what.
+/// Names the source, the store and the levels of a build.
 struct PyramidOrder {
   Array<String> source;   ///< connection strings of the raster
   Array<String> pyramid;  ///< connection strings of the store

@@ -21,7 +21,7 @@ VEXG_EXPORT PyramidPath ChoosePyramidPath(const RasterDef& def);
 /// Names the rasters and levels that a process works on.
 template <typename T>
 struct PyramidPlan {
-  RasterPtr<T> source;    ///< what is read
+  RasterPtr<T> source;    ///< the raster that is read
   RasterPtr<T> full;      ///< whose StoredPyramidLevels are written
   unsigned levelMin = 0;  ///< first level that is made; 0 is the raster itself
   unsigned levelMax = 0;  ///< last level that is made

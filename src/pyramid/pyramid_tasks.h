@@ -30,8 +30,8 @@ class LevelStripWriter {
   /// @param level  as a raster that can be written.
   LevelStripWriter(const RasterPtr<T>& level, const LevelShape& shape, unsigned samples);
 
-  /// Takes what a block has of the level, and writes the strips that are whole with it. A row of
-  /// more than one block lies within one strip.
+  /// Takes the pixels of the level out of a block, and writes the strips that are whole with it. A
+  /// row of more than one block lies within one strip.
   /// @return false, with the fault set, when a strip can't be had or written.
   bool Take(const Tile<T>& block);
 

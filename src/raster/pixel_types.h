@@ -112,7 +112,7 @@ inline constexpr unsigned kDataTypeOf<std::int8_t> = 99;
 
 /// Runs `body` for the pixel type that `code` names: one compare per type, then one call.
 /// `DispatchType(EightTypes{}, code, [&]<typename T>() { return …; })`; pairs of types nest.
-/// @return what the body gave; false, with no call, when `code` is not in the set.
+/// @return the result of the body; false, with no call, when `code` is not in the set.
 /// For example, the bytes of a pixel:
 ///
 ///     std::size_t bytes = 0;

@@ -103,8 +103,8 @@ struct StatsMask {
     SumXY = 128,     ///< sums of products with other bands
     Cov = 256,       ///< covariances with other bands
     Pairs = 384,     ///< SumXY and Cov, those between two bands
-    Basic = 127,     ///< what StatsMode::kBasic gives
-    Extended = 511,  ///< what StatsMode::kExtended gives
+    Basic = 127,     ///< those of StatsMode::kBasic
+    Extended = 511,  ///< those of StatsMode::kExtended
   };
 };
 

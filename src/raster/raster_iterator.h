@@ -62,7 +62,7 @@ class VEXG_EXPORT BasicRasterIterator : public Object {
   Interleave Order() const { return order_; }
 
  protected:
-  /// The shape of the tile at a grid position, and what of the raster it takes.
+  /// The shape of the tile at a grid position, and the part of the raster that it takes.
   struct Placement {
     TileDimensions tile;
     unsigned x = 0;  ///< first pixel inside the borders, in raster coordinates

@@ -209,7 +209,7 @@ bool ForEachTile(const char* name, const TileInputs<Ts...>& inputs, const F& bod
 }
 
 /// Places the two stages of a reduction in a process; see ReduceTiles. `total` outlives it.
-/// @param leastPixels  of a strip; 0 for what suits work of a few steps a value.
+/// @param leastPixels  of a strip; 0 for a number that suits work of a few steps a value.
 template <typename Base, typename... Ts, typename Total, typename Part, typename Merge>
 void AddReduction(TileProcess<Base>& process, const char* name,
                   const std::tuple<TileSlot<Ts>...>& slots, Total& total, const Part& part,

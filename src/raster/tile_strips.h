@@ -105,7 +105,7 @@ bool Succeeds(const F& work, Args&&... args) {
   }
 }
 
-/// Holds what strips gave; no value for no strips.
+/// Holds the joined result of strips; no value for no strips.
 template <typename R>
 struct StripResult {
   mutable std::optional<R> value;  // a join may move it out of its right side
@@ -165,10 +165,10 @@ bool ForEachStrip(const BasicTile& tile, std::size_t leastPixels, const AbortFla
   return result.Close();
 }
 
-/// Joins what `part(TilePart)` gives for the strips of a tile: `merge(R& left, const R& right)`.
-/// The joins follow the cut, which the size of the tile alone decides, so the result has the same
-/// bits for any number of threads. `part` gives an R, or an optional that is empty where it failed;
-/// `merge` a bool, or nothing.
+/// Joins the results of `part(TilePart)` for the strips of a tile: `merge(R& left, const R&
+/// right)`. The joins follow the cut, which the size of the tile alone decides, so the result has
+/// the same bits for any number of threads. `part` gives an R, or an optional that is empty where
+/// it failed; `merge` a bool, or nothing.
 /// @return empty when something failed, with its fault set on this thread, or was aborted.
 template <typename R, typename Part, typename Merge>
 std::optional<R> ReduceStrips(const BasicTile& tile, std::size_t leastPixels,

@@ -38,7 +38,7 @@ class ValueUse {
     }
   }
 
-  /// Notes what another one has noted.
+  /// Notes the values of another one as well.
   void Join(const ValueUse& other) {
     for (std::size_t i = 0; i < used_.size(); ++i) used_[i] = used_[i] || other.used_[i];
     hasNaN_ = hasNaN_ || other.hasNaN_;

@@ -12,8 +12,8 @@ namespace lumo {
 /// that shows pixels of its own holds one and leaves its operations on statistics to it.
 ///
 /// A computation reads all pixels once, in the background, and gives all values of all bands. Its
-/// result is taken over at the next call of any operation, and then replaces what stood before. A
-/// computation that was aborted, or failed, leaves what stood.
+/// result is taken over at the next call of any operation, and then replaces the earlier one. A
+/// computation that was aborted, or failed, changes nothing.
 ///
 /// The values at hand hold for one Raster::WriteCount. Once pixels have been written they are gone,
 /// ones entered by hand as well, and a computation that was under way then gives nothing; a getter
@@ -45,13 +45,13 @@ class DynamicRasterStats : public ErrorState,
   /// The computation that runs now; empty when none does.
   AsyncPtr StatsAsync() const;
 
-  /// Ignored while a computation runs. From the basic to the extended mode what is at hand goes, so
-  /// that the next getter computes everything.
+  /// Ignored while a computation runs. From the basic to the extended mode the values at hand go,
+  /// so that the next getter computes everything.
   void SetStatsMode(lumo::StatsMode mode);
   lumo::StatsMode StatsMode() const;
 
-  /// Enters the statistics of one band, in place of what stood. Ignored while a computation runs,
-  /// and for a band that the raster doesn't have.
+  /// Enters the statistics of one band, in place of the earlier ones. Ignored while a computation
+  /// runs, and for a band that the raster doesn't have.
   void SetBandStats(const RasterBandStats<T>& stats);
   /// The values at hand for the band; mask 0 when there are none.
   RasterBandStats<T> BandStats(unsigned band) const;

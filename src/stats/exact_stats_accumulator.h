@@ -58,7 +58,7 @@ struct ExactStatsAccumulator {
   }
 };
 
-/// Sums what a pair of bands of integers of up to 16 bits has in common. Takes 2^46 samples.
+/// Sums over a pair of bands of integers of up to 16 bits. Takes 2^46 samples.
 struct ExactPairAccumulator {
   std::uint64_t count = 0;  ///< pixels that are valid in both bands
   std::int64_t sumX = 0;

@@ -51,8 +51,8 @@ class HistogramCallback {
   void OnProcessEnd(ProcessBuilder<Process>& process);
 };
 
-/// RasterHistogramProcess that hands what it counted to an object, together with statistics that
-/// were computed before.
+/// RasterHistogramProcess that hands its counts to an object, together with statistics that were
+/// computed before.
 template <typename T>
 class RasterHistogramCallbackProcess final
     : public TileProcess<ProcessBuilderCallback<Process, HistogramCallback<T>>> {

@@ -64,7 +64,7 @@ class ProcessTask final : public ISimplePipelineProcess<TaskToken> {
   BasicProcess& process_;
   const TaskDescriptor& descriptor_;
   Task* task_ = nullptr;
-  ArgList list_;  // what the task sees of the token; used again for each that comes alone
+  ArgList list_;  // the slots that the task sees; used again for each that comes alone
   std::atomic<bool> ended_{false};  // in order: no token behind this one is worked on
 };
 

@@ -41,8 +41,8 @@ VEXG_EXPORT WarpPolynomial PolynomialOf(const AffineLink& link);
 /// transformed one by one. So it goes too where some point can't be carried, and where the source
 /// comes to an end and begins anew, as at the date line and the poles.
 ///
-/// Pixels of both count from the corner of the first one, whatever their models: between that and
-/// what a camera counts, from the middle, lies a half.
+/// Pixels of both count from the corner of the first one, whatever their models. A camera counts
+/// from its middle, half a pixel on.
 ///
 /// Threads:   every operation may run on many threads at once.
 ///
