@@ -1,5 +1,5 @@
-// What a job costs beside the work of its commands. Aims: a round trip of a one-command job under
-// 0.1 ms in process and under 0.3 ms over the pipe (median).
+// Measures the cost of a job beside the work of its commands. Aims: a round trip of a one-command
+// job under 0.1 ms in process and under 0.3 ms over the pipe (median).
 
 #include <cstdlib>
 #include <memory>

@@ -9,8 +9,8 @@
 #include "raster/tile_functions.h"
 #include "tasks/thread_limit.h"
 
-// What a pipeline costs: the overhead of a token, and a chain that reads, computes and writes
-// beside a plain loop over the same memory.
+// Measures the cost of a pipeline: the overhead of a token, and a chain that reads, computes and
+// writes beside a plain loop over the same memory.
 
 namespace lumo {
 namespace {

@@ -34,7 +34,7 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
   const lumo::String text(std::string(reinterpret_cast<const char*>(data), size));
   lumo::Job job;
   lumo::JobParser(job).Parse(text);
-  constexpr unsigned kThreads = 16;  // more take long without telling more
+  constexpr unsigned kThreads = 16;  // more take long without finding more
   if (job.commands.GetCount() > kThreads) return 0;
   lumo::RunJob(job);
   const lumo::String result = lumo::JobResultWriter(job).Write();

@@ -60,7 +60,7 @@ void Expect(bool holds, const char* what) {
 template <typename T>
 struct Model {
   unsigned samples = 0, lines = 0, bands = 0;
-  bool exact = true;  // what is read can be told; else only that nothing breaks
+  bool exact = true;  // the pixels can be predicted; else only that nothing breaks
   bool writable = false;
   bool takesNone = true;  // has blocks without an interleave
   bool noneKnown = true;  // else some bands may have them, others not

@@ -19,8 +19,8 @@ void ReadWriteRead(const lumo::String& text) {
   if (first.ToUTF8() != second.ToUTF8()) std::abort();
 }
 
-/// A palette that breaks off has colours without a name, which the form can't tell from others;
-/// what stays is their number.
+/// A palette that breaks off has colours without a name, which the form can't distinguish from
+/// others; what stays is their number.
 void ReadPalette(const lumo::String& text) {
   const auto first = lumo::ParseValue<lumo::Palette>(text);
   const auto second = lumo::ParseValue<lumo::Palette>(lumo::FormatValue(first));

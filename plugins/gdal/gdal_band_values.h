@@ -9,7 +9,7 @@
 
 namespace lumo::gdal {
 
-// What a band carries beside its pixels: GDAL's numbers and ours.
+// The values that a band carries beside its pixels, as GDAL has them and as we do.
 
 /// A band's statistics as GDAL keeps them, as text so that whole numbers stay exact.
 ///
@@ -17,7 +17,7 @@ namespace lumo::gdal {
 /// beside them in a record, which counts as long as GDAL's numbers are those it was written with.
 struct StoredStats {
   std::string min, max, mean, std;
-  std::string validPercent;  ///< share of the pixels that counted, rounded; "" where not told
+  std::string validPercent;  ///< share of the pixels that counted, rounded; "" where not known
   std::string record;        ///< the pixel count and the text form of RasterBandStats; or ""
 };
 

@@ -15,7 +15,7 @@ class Connection final : public PlainRasterConnection {
 
   bool Connect(const Array<String>& connStrings, const GeoRefPtr& geoRef,
                const MetadataPtr& metadata) override;
-  /// A new raster takes its place; the fault tells when it can't.
+  /// A new raster takes its place; the fault says why when it can't.
   void Disconnect() override;
   bool CanWrite() override { return raster_ != nullptr && raster_->CanWrite(); }
   bool GetMetadata(const String& mdfPath, const LockableMetadataImplPtr& store) override;

@@ -56,7 +56,7 @@ const Maker* FindMaker(const std::string& driver) {
   return nullptr;
 }
 
-/// Files that belong to a raster by their name alone, and tell of its pixels.
+/// Files that belong to a raster by their name alone, and describe its pixels.
 constexpr const char* kSideFiles[] = {".aux.xml", ".ovr", ".msk"};
 
 bool Exists(const std::string& path) {
@@ -129,8 +129,8 @@ std::vector<unsigned char> FillValueOf(const RasterDef& def) {
   return bytes;
 }
 
-/// Adds the options that tell a TIFF file what its bands mean. Without them GDAL takes the fourth
-/// of four bands of bytes for alpha.
+/// Adds the options by which a TIFF file states the meaning of its bands. Without them GDAL takes
+/// the fourth of four bands of bytes for alpha.
 void AddMeaning(const RasterDef& def, CPLStringList& options) {
   if (IsInColors(def)) options.SetNameValue("PHOTOMETRIC", "RGB");
   if (def.bands < 2) return;
@@ -184,7 +184,7 @@ std::string NewRaster::Shown(const std::string& text) const {
   return shown;
 }
 
-/// Tells the fault of this thread by the user's name.
+/// Sets the fault of this thread by the user's name.
 bool NewRaster::ShowFault() const {
   SetFault(Shown(TakeFault().ToUTF8()));
   return false;
@@ -393,7 +393,7 @@ bool NewRaster::CopyToFormat(DatasetPtr dataset) {
   return (isMade && !messages.HasError()) || Fail(messages.Text());
 }
 
-/// What the format has no room for.
+/// Writes the values that the format has no room for into a file beside the raster.
 bool NewRaster::WriteBeside() const {
   const Messages messages;
   const bool isSet = CompleteBeside(temporary_, driver_, def_, histograms_);
@@ -451,9 +451,9 @@ bool NewRaster::TakePlace() const {
 }
 
 bool NewRaster::MoveFiles(platform::FileSwap& swap, std::string& why) const {
-  // A header of our own format would tell of the new file as if it were the older one.
+  // A header of our own format would describe the new file as if it were the older one.
   if (orva::HasHeader(path_) && !swap.MoveAside(orva::HeaderPath(path_), &why)) return false;
-  // Files beside the older one tell of other pixels.
+  // Files beside the older one describe other pixels.
   for (const char* const suffix : kSideFiles) {
     if (!swap.MoveAside(path_ + suffix, &why)) return false;
   }

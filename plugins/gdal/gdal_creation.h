@@ -21,7 +21,7 @@ namespace lumo::gdal {
 /// is one, when it is finished: what breaks before leaves nothing, and the older file as it was.
 /// Formats that are written in one go, from the first pixel to the last, are first made as
 /// something else: in memory, or as a TIFF file beside the place. Failure: false or null, with the
-/// fault told.
+/// fault set.
 ///
 /// The pixels of a TIFF file are written past GDAL.
 class NewRaster {
@@ -45,7 +45,7 @@ class NewRaster {
   /// The definition as far as the format keeps it.
   const RasterDef& Definition() const { return def_; }
 
-  /// True when the last band will tell which pixels of the others are valid.
+  /// True when the last band will mark which pixels of the others are valid.
   bool KeepsAlpha() const { return keepsAlpha_; }
 
   /// Takes the pixels that are not valid and don't say so themselves.

@@ -21,7 +21,7 @@ namespace {
 constexpr const char* kItems = "Items/";
 constexpr const char* kPoints = "Points/";
 
-/// Names of items that tell of a file and its pixels as they lie there, not of the raster.
+/// Names of items that describe a file and its pixels as they lie there, not of the raster.
 bool IsOfFile(const std::string& name) {
   return name.starts_with("STATISTICS_") || name.starts_with("NITF_") || name == "JPEG_QUALITY";
 }
@@ -65,7 +65,7 @@ bool NumbersOf(const std::string& text, std::array<double, N>& numbers) {
   return true;
 }
 
-/// Calls `enter(name, value)` for each item of the main domain that tells of the raster.
+/// Calls `enter(name, value)` for each item of the main domain that describes the raster.
 template <typename Enter>
 void VisitItems(GDALMajorObjectH object, const Enter& enter) {
   for (char** item = GDALGetMetadata(object, nullptr); item != nullptr && *item != nullptr;

@@ -8,7 +8,7 @@ class GDALPamDataset;
 
 namespace lumo::gdal {
 
-/// Enters what a source tells beside the fields of a RasterDef, see raster_details.h.
+/// Enters the details that a source has beside the fields of a RasterDef, see raster_details.h.
 /// @param hasGrid  whether the source's grid has become a geo-reference.
 void ReadDetails(GDALDatasetH dataset, bool hasGrid, Metadata& metadata);
 
@@ -22,13 +22,13 @@ bool HasPlaceDetails(const RasterDef& def);
 /// Gives a dataset those of the place. False when GDAL refuses them.
 bool WritePlaceDetails(GDALDatasetH dataset, const RasterDef& def);
 
-/// Puts those that a file doesn't tell by itself into the file beside it.
+/// Puts those that a file doesn't hold by itself into the file beside it.
 bool CompleteDetails(GDALPamDataset& file, const RasterDef& def);
 
 /// True for a raster whose last band GDAL takes for a mask when it is alpha.
 bool GivesMask(const RasterDef& def);
 
-/// True when a definition says that a band tells which pixels of the others are valid.
+/// True when a definition says that a band marks which pixels of the others are valid.
 bool IsAlpha(const RasterDef& def, unsigned band);
 
 /// True when the first three bands are red, green and blue.

@@ -6,7 +6,7 @@ class DataConnectionFactory;
 struct FormatRecord;
 
 /// The factory of a row that GDAL serves; it lives until the process ends. Null, with the fault
-/// told, when this GDAL hasn't got the row's driver.
+/// set, when this GDAL hasn't got the row's driver.
 DataConnectionFactory* MakeGdalFactory(const FormatRecord& record);
 
 }  // namespace lumo

@@ -4,7 +4,7 @@
 
 namespace lumo::gdal {
 
-/// What excludes pixels of some bands, beside their no-data values: a mask of the whole source, an
+/// Excludes pixels of some bands, beside their no-data values, by a mask of the whole source, an
 /// alpha band, or no-data values that count only when all bands have them.
 class Masks {
  public:

@@ -44,7 +44,7 @@ void VisitItems(GDALMajorObjectH object, const std::string& domain, const Visit&
   }
 }
 
-/// Calls `visit(path, value)` for each item of the domains that are told of.
+/// Calls `visit(path, value)` for each item of the domains that are shown.
 template <typename Visit>
 void VisitDomains(GDALDatasetH dataset, bool withCamera, const Visit& visit) {
   const CPLStringList domains(GDALGetMetadataDomainList(dataset), TRUE);

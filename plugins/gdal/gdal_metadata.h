@@ -8,14 +8,15 @@ namespace lumo::gdal {
 
 class OpenRaster;
 
-/// What GDAL tells of a raster in words: its items as texts at "/GDAL/<domain>/<item>", those of
-/// its default domain at "/GDAL/Items/<item>". Domains that hold documents, and those that stand
-/// for something else of the raster, are left out. The details of raster_details.h come with them.
+/// Reads the metadata that GDAL has of a raster: its items as texts at "/GDAL/<domain>/<item>",
+/// those of its default domain at "/GDAL/Items/<item>". Domains that hold documents, and those that
+/// stand for something else of the raster, are left out. The details of raster_details.h come with
+/// them.
 /// @param hasGrid  whether the source's grid has become a geo-reference.
 Metadata ReadMetadata(GDALDatasetH dataset, bool hasGrid);
 
-/// All that GDAL tells of a raster as texts, for a definition file to translate: the items of the
-/// default domain at "Items/<item>" below "/GDAL/", those of others and of the camera at
+/// All metadata that GDAL has of a raster as texts, for a definition file to translate: the items
+/// of the default domain at "Items/<item>" below "/GDAL/", those of others and of the camera at
 /// "<domain>/<item>", those of a band, counted from 1, at "Bands/<band>/<item>"; "Description",
 /// "Unit", "Scale" and "Offset" of all bands where one has them; size and place at "Raster/",
 /// "CoordSys/" and "Grid/".

@@ -10,9 +10,9 @@
 namespace lumo::gdal {
 
 /// The mask of a raster that is being made: which of its pixels are not valid though neither their
-/// values nor an alpha band tell so. It costs nothing until the first such pixel comes.
+/// values nor an alpha band mark so. It costs nothing until the first such pixel comes.
 ///
-/// Failure: false, with the fault told.
+/// Failure: false, with the fault set.
 class NewMask {
  public:
   /// @param scratch  the name of a file for masks that are too large for memory.

@@ -5,7 +5,7 @@
 namespace lumo::gdal {
 
 /// Opens a raster for reading in the way in which blocks of it come fastest. Null, with the fault
-/// told.
+/// set.
 ///
 /// TIFF files without compression are read straight into the caller's memory, past GDAL's cache of
 /// blocks. Those with large compressed blocks are decoded by several threads at once, which go past

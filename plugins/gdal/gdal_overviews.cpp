@@ -111,7 +111,7 @@ bool IsOfFactor(const LevelPair& pair, const std::vector<int>& factors) {
   });
 }
 
-/// Reads the built levels of a raster back. False, with the fault told, for one that isn't of the
+/// Reads the built levels of a raster back. False, with the fault set, for one that isn't of the
 /// raster.
 bool AreLevelsWhole(GDALDatasetH dataset, const std::string& method,
                     const std::vector<int>& factors, const std::string& name) {

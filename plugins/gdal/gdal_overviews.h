@@ -7,7 +7,7 @@
 
 namespace lumo::gdal {
 
-// Reduced levels of a raster, as GDAL builds them. Failure: false, with the fault told.
+// Reduced levels of a raster, as GDAL builds them. Failure: false, with the fault set.
 
 /// Builds levels where GDAL puts those of an open dataset, and reads them back.
 /// @param method   by GDAL's name.

@@ -228,7 +228,7 @@ bool OpenRaster::Close() {
   if (made != nullptr) return made->Finish(std::move(dataset_));
   const Messages messages;
   dataset_.reset();
-  // What was only read has nothing to lose.
+  // A raster that was only read has nothing to lose.
   return !isUpdated_ || !messages.HasError() || messages.Fail(Name());
 }
 

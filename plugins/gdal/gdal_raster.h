@@ -31,7 +31,7 @@ struct RasterLevel {
 /// An existing one is opened for reading. The first operation that changes its pixels opens it
 /// again for writing, so that a file which is only read is neither changed nor asked for rights
 /// that it doesn't give.
-/// Failure: false or null, with the fault told.
+/// Failure: false or null, with the fault set.
 class OpenRaster {
  public:
   static std::unique_ptr<OpenRaster> Open(const Format& format, const Source& source);
@@ -65,7 +65,7 @@ class OpenRaster {
   const RasterLevel* FindLevel(unsigned level) const;
   bool HasBand(unsigned band) const { return band < Bands(); }
 
-  /// What the source says of itself, without no-data values and metadata.
+  /// The description that the source itself gives, without no-data values and metadata.
   RasterDef Describe() const;
 
   /// True when the format and the file let pixels be changed. Opens nothing with GDAL.

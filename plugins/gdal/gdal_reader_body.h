@@ -134,7 +134,7 @@ StoredHistogram ToStored(const RasterBandHistogram<T>& histogram) {
   return stored;
 }
 
-/// What GDAL calls a way of reducing.
+/// Gives GDAL's name of a resampling method.
 inline const char* ResamplingName(std::int32_t method) {
   switch (static_cast<lumo::PyramidResamplingMethod>(method)) {
     case lumo::PyramidResamplingMethod::kLinear:

@@ -16,7 +16,7 @@ struct PixelType {
 PixelType PixelTypeOf(unsigned dataType);
 
 /// The code of the type that holds the pixels of all bands without loss; complex integers are
-/// widened to complex floating-point numbers. 0, with the fault told, when there is none.
+/// widened to complex floating-point numbers. 0, with the fault set, when there is none.
 unsigned CommonDataType(GDALDatasetH dataset, const std::string& name);
 
 }  // namespace lumo::gdal

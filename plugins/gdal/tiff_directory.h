@@ -13,7 +13,7 @@ enum class Placing {
 };
 
 /// Gives each block of a TIFF file its place, behind all that the file holds: the file is made long
-/// enough, and its directory told. The layout's `start` is set. A file of another machine's byte
+/// enough, and its directory read. The layout's `start` is set. A file of another machine's byte
 /// order is unsuited.
 ///
 /// Source: TIFF 6.0, sections 2, 8 and 15; the BigTIFF extension for files beyond 4 GiB.

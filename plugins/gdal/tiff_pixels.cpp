@@ -91,7 +91,7 @@ bool TiffPixels::Begin(const std::string& path, const RasterDef& def, bool byPix
 TiffPixels::TiffPixels(std::unique_ptr<platform::RandomAccessFile> file, const TiffLayout& layout,
                        const std::vector<unsigned char>& fill)
     : file_(std::move(file)), layout_(layout) {
-  // What nobody has written reads as zeros.
+  // Bytes that nobody has written read as zeros.
   if (std::all_of(fill.begin(), fill.end(), [](unsigned char byte) { return byte == 0; })) return;
   while (fillRow_.size() < layout_.RowBytes()) {
     fillRow_.insert(fillRow_.end(), fill.begin(), fill.end());

@@ -52,7 +52,7 @@ struct TiffLayout {
 /// cache of blocks: that would hold the raster twice, and copy each value twice more.
 ///
 /// The file has been made by GDAL, with all but its pixels; it is whole from Begin on. Values that
-/// nobody writes are the fill value. Failure: false, with the fault told.
+/// nobody writes are the fill value. Failure: false, with the fault set.
 class TiffPixels {
  public:
   /// False when the file can't be read or written.

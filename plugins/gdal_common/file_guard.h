@@ -14,11 +14,11 @@ void InstallFileGuard();
 /// Forgets the refusals on this thread so far.
 void ForgetRefusals();
 
-/// False, with the fault told, when GDAL was refused a file that is there since ForgetRefusals on
+/// False, with the fault set, when GDAL was refused a file that is there since ForgetRefusals on
 /// this thread: what it has opened without that file is not what its name stands for.
 bool WasRefusedNothing();
 
-/// Judges all files that a dataset is made of, as GDAL lists them. False, with the fault told, when
+/// Judges all files that a dataset is made of, as GDAL lists them. False, with the fault set, when
 /// one may not be reached. Opens the side files that GDAL had not needed so far.
 bool MayReachAllFiles(GDALDatasetH dataset);
 

@@ -36,7 +36,7 @@ bool NoteFault(const std::string& path) {
 ///
 /// A file to which a write has failed is given up: from then on every read and write of it fails,
 /// so that a library that looks for its way in what it has half written comes to an end, and its
-/// last failure is told once more when it is closed.
+/// last failure is reported once more when it is closed.
 class File final : public VSIVirtualHandle {
  public:
   /// @param shown  the path that faults are noted under.
@@ -225,7 +225,7 @@ bool IsAnswer(int code, bool isForWriting) {
   }
 }
 
-/// Tells this library's handler from GDAL's own, which has no options.
+/// Marks this library's handler beside GDAL's own, which has no options.
 constexpr const char* kMark = "<Options handler='vexg'/>";
 
 /// Plain files by File; all else as GDAL's own handler does it.

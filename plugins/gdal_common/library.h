@@ -18,7 +18,7 @@ struct Format {
 /// environment names one. Any thread.
 void StartGdal();
 
-/// The drivers of a row; none, with the fault told, when this GDAL hasn't got them.
+/// The drivers of a row; none, with the fault set, when this GDAL hasn't got them.
 Format FindDrivers(const FormatRecord& record);
 
 }  // namespace lumo::gdal

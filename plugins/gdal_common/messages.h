@@ -12,7 +12,7 @@ namespace lumo::gdal {
 /// it is the innermost.
 class Messages {
  public:
-  /// How warnings count by which codecs tell that pixels are damaged.
+  /// How warnings count by which codecs report that pixels are damaged.
   enum class Damage { kIsWarned, kIsError };
 
   explicit Messages(Damage damage = Damage::kIsWarned);
@@ -20,8 +20,8 @@ class Messages {
   Messages(const Messages&) = delete;
   Messages& operator=(const Messages&) = delete;
 
-  /// True when GDAL told an error, memory was short, or a file operation failed that it did not
-  /// tell of or, as when a file beside the raster could not be saved, only warned of.
+  /// True when GDAL reported an error, memory was short, or a file operation failed that it did not
+  /// report or, as when a file beside the raster could not be saved, only warned of.
   bool HasError() const {
     return !error_.empty() || faults_.First() != nullptr || memory_.WasShort();
   }
@@ -34,9 +34,9 @@ class Messages {
   /// The file operations that failed.
   const FileFaults& Files() const { return faults_; }
 
-  /// Tells the fault "name: what GDAL said", or why the system refused a file operation. False, to
+  /// Sets the fault "name: what GDAL said", or why the system refused a file operation. False, to
   /// be returned.
-  /// @param otherwise  what is told when GDAL said nothing.
+  /// @param otherwise  the fault when GDAL said nothing.
   bool Fail(const std::string& name, const char* otherwise = "GDAL gave no reason") const;
 
   /// Forgets what was said so far.
@@ -52,7 +52,7 @@ class Messages {
   std::string warning_;
 };
 
-/// Tells the fault "name: what". False, to be returned.
+/// Sets the fault "name: what". False, to be returned.
 bool FailWith(const std::string& name, const std::string& what);
 
 }  // namespace lumo::gdal

@@ -13,7 +13,7 @@ struct FeatureDeleter {
 };
 using FeaturePtr = std::unique_ptr<void, FeatureDeleter>;
 
-/// What GDAL's type of geometry is here.
+/// Gives our kind of shape for GDAL's type of geometry.
 VectorGeometry GeometryOf(OGRwkbGeometryType type);
 
 /// GDAL's type for a kind of features; wkbUnknown for kUnknown.

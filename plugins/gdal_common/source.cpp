@@ -51,7 +51,7 @@ URI MakeURI(const Source& source, const std::vector<std::string>& pieces) {
 }
 
 /// GDAL's name of a raster inside an open file, which for a file of one raster is that of the file;
-/// empty, with the fault told, when it holds no such.
+/// empty, with the fault set, when it holds no such.
 std::string FindSubdataset(GDALDatasetH dataset, const Source& source) {
   const std::string& wanted = source.subdataset;
   const bool isNumber = std::all_of(wanted.begin(), wanted.end(),

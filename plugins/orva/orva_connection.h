@@ -7,7 +7,7 @@
 
 namespace lumo::orva {
 
-/// An open ORVA raster. docs/file-formats.md tells the format.
+/// An open ORVA raster. docs/file-formats.md describes the format.
 ///
 /// A new raster gets its header, and thereby becomes one, when the connection is let go.
 class Connection final : public RasterDataConnection {

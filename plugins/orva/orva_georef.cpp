@@ -54,7 +54,7 @@ struct AffineFit {
 };
 
 /// The affine map with the least squares of distances, about the mean of the points. Points on one
-/// line, of which two are enough, tell of a grid that isn't turned, unless the line goes along it.
+/// line, of which two are enough, define a grid that isn't turned, unless the line goes along it.
 bool FitAffine(const std::vector<TiePoint>& points, const TiePoint& mean, AffineFit& fit) {
   double ss = 0, sl = 0, ll = 0, sx = 0, lx = 0, sy = 0, ly = 0;
   for (const TiePoint& point : points) {

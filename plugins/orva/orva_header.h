@@ -11,8 +11,8 @@
 
 namespace lumo::orva {
 
-/// What an ORVA header says of the pixels. Palettes, statistics and histograms are in `text`, see
-/// orva_values.h.
+/// The description of the pixels by an ORVA header. Palettes, statistics and histograms are in
+/// `text`, see orva_values.h.
 struct Header {
   HeaderText text;
   FlatLayout layout;
@@ -37,7 +37,7 @@ bool ParseHeader(std::string_view text, Header& header, std::string& fault);
 /// @param fault  [out] what the format can't hold.
 bool MakeHeader(const RasterDef& def, Header& header, std::string& fault);
 
-/// The description of the raster that a header tells of.
+/// The description of the raster that a header belongs to.
 RasterDef MakeRasterDef(const Header& header);
 
 /// The number that `text` is, as a T: all of it, rounded to T where T is a floating type. Of a

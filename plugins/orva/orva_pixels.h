@@ -8,8 +8,8 @@
 
 namespace lumo::orva {
 
-/// Told when a stretch of a block has been read, in the byte order of this machine: its first
-/// element and their number. Stretches come in order and are small enough to lie in the cache yet.
+/// Called when a run of a block has been read, in the byte order of this machine: its first element
+/// and their number. Runs come in order and are small enough to lie in the cache yet.
 using StretchRead = std::function<void(std::uint64_t first, std::uint64_t count)>;
 
 /// Reads a block, in the interleave of the file. Small gaps in the file are read and dropped, large

@@ -7,7 +7,7 @@ namespace lumo::orva {
 
 /// The reader of an ORVA raster. It has no pyramid; statistics, histograms and palettes are kept in
 /// the header. The first pixel that is written takes stored statistics and histograms away, since
-/// they tell of other pixels then.
+/// they belong to other pixels then.
 template <typename T>
 class Reader final : public RasterReader<T> {
  public:
@@ -32,10 +32,10 @@ class Reader final : public RasterReader<T> {
   bool PyramidDelete() override { return RefusePyramid(); }
   bool PyramidRefresh() override { return RefusePyramid(); }
 
-  /// What the stored statistics of all bands hold; everything while none are stored.
+  /// The statistics that all bands have stored; all kinds while none are stored.
   std::int32_t StatsMask() override;
   bool StatsExist(unsigned band) override { return values_.stats.contains(band); }
-  /// The format has room for them; whether the file lets itself be written, the write tells.
+  /// True: the format has room for them. Whether the file can be written shows at the write.
   bool CanWriteStats() override { return kHasStats; }
   bool CanWriteHistogram() override { return kHasStats; }
   RasterBandStats<T> ReadStats(unsigned band) override;

@@ -74,7 +74,7 @@ std::string Decode(std::string_view text) {
   return decoded;
 }
 
-/// What stands between the braces of a value, or the value when it has none.
+/// Gives the text between the braces of a value, or the value when it has none.
 std::string_view WithoutBraces(std::string_view raw) {
   if (raw.size() < 2 || raw.front() != '{') return raw;
   return raw.substr(1, raw.size() - 2);

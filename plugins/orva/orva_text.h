@@ -6,9 +6,9 @@
 
 namespace lumo::orva {
 
-/// The lines of an ORVA header, without a meaning. docs/file-formats.md tells the form.
+/// The lines of an ORVA header, without a meaning. docs/file-formats.md describes the form.
 ///
-/// What isn't touched is written again as it was read, comments and unknown names among it.
+/// Lines that aren't touched are written again as they were read, comments and unknown names too.
 class HeaderText {
  public:
   /// A line `name = value`, or several where the value is a list.

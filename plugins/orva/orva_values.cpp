@@ -16,7 +16,7 @@ bool IsAtEnd(std::istream& in) {
   return !in.fail() && (in >> std::ws).eof();
 }
 
-/// Reads the items of a list, each by `read(stream)`, which tells whether it is well and of a band
+/// Reads the items of a list, each by `read(stream)`, which is true when it is well and of a band
 /// that the raster has.
 template <typename Read>
 bool ReadItems(const Header& header, const char* name, std::string& fault, Read&& read) {

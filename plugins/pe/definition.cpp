@@ -50,7 +50,7 @@ PjPtr CreateAny(PJ_CONTEXT* context, const std::string& given) {
   return CreateFromCode(context, text);
 }
 
-/// Tells the fault when PROJ's database can't be read, without which most systems are unknown.
+/// Sets the fault when PROJ's database can't be read, without which most systems are unknown.
 void TellOfDatabase(PJ_CONTEXT* context) {
   if (proj_context_get_database_metadata(context, "EPSG.VERSION") != nullptr) return;
   const char* const path = proj_context_get_database_path(context);

@@ -8,7 +8,7 @@
 
 namespace lumo::pe {
 
-/// What was read from the text of a coordinate system; never changed after that, and shared by all
+/// The contents of the text of a coordinate system; never changed once read, and shared by all
 /// systems and threads that use it.
 struct Definition {
   std::uint64_t id = 0;      ///< one number for each definition of the process

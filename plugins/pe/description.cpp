@@ -44,7 +44,7 @@ double InBaseUnit(double value, double toSi, std::string_view category) {
   return std::abs(factor - 1.0) < 1e-12 ? value : value * factor;
 }
 
-/// What stands in quotes after the first `keyword["`.
+/// Gives the text in quotes after the first `keyword["`.
 std::string Quoted(const std::string& wkt, const std::string& keyword) {
   const std::string head = std::string(keyword).append("[\"");
   const std::size_t at = wkt.find(head);

@@ -26,7 +26,8 @@ void LogFromProj(void*, int, const char* text) {
   LogCoordSys(CoordSysLog::kErrors, "%s", text);
 }
 
-/// What a thread keeps. The transforms go before the context that they belong to.
+/// The context and the transforms of a thread. The transforms go before the context that they
+/// belong to.
 struct ThreadState {
   ThreadState() : context(proj_context_create()) {
     if (context == nullptr) throw std::bad_alloc();

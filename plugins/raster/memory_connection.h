@@ -5,7 +5,7 @@
 
 namespace lumo::memory {
 
-/// A block of memory as a raster source. Nothing but the connection text tells of the block, which
+/// A block of memory as a raster source. Nothing but the connection text describes the block, which
 /// outlives the connection.
 class Connection final : public RasterDataConnection {
  public:

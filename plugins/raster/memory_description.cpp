@@ -60,7 +60,7 @@ bool ReadAddress(FieldReader& fields, Description& block) {
   return true;
 }
 
-/// What follows the name, to the end of the text.
+/// Reads the fields that follow the name, to the end of the text.
 bool ReadAfterName(FieldReader fields, Description& block) {
   std::int32_t interleave = 0;
   std::uint16_t bands = 0;
@@ -108,7 +108,7 @@ bool ReadNoData(const std::string& text, Description& block) {
   return true;
 }
 
-/// What makes the block impossible; null when nothing does.
+/// Gives the reason why no block can be as described; null when one can.
 const char* FindFault(Description& block) {
   FlatLayout& layout = block.layout;
   const unsigned elementBytes = DataTypeBytes(block.dataType);

@@ -8,8 +8,8 @@
 
 namespace lumo::memory {
 
-/// What the connection text of a memory raster says of the block. The text has one form, in which
-/// every field stands once and in this order:
+/// The description of a block by the connection text of a memory raster. The text has one form, in
+/// which every field stands once and in this order:
 ///
 ///   PIXELDATA=address;NAME=text;SAMPLES=n;LINES=n;BANDS=n;INTERLEAVE=n;PIXELTYPE=n;
 ///   PIXELSIZE=x,y;TIEPTMAP=x,y;COORDSYS=text

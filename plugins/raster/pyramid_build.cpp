@@ -103,7 +103,7 @@ bool Build::Fail(const std::string& fault) const {
   return false;
 }
 
-/// Ends the build: tells a fault of the file, by the path that its user knows, now and later.
+/// Ends the build: sets a fault of the file, by the path that its user knows, now and later.
 bool Build::FailBy(const std::string& fault) {
   isOver_ = true;
   fault_ = fault.starts_with(temporary_) ? path_ + fault.substr(temporary_.size()) : fault;

@@ -23,7 +23,7 @@ class Build {
   /// Begins a build, in place of an older one that is not being written to.
   /// @param path    absolute, with links resolved.
   /// @param header  the raster and the levels wanted.
-  /// @param beginner  tells it from others, until it has left.
+  /// @param beginner  identifies it, until it has left.
   static std::shared_ptr<Build> Begin(const std::string& path, const Header& header,
                                       const void* beginner);
   /// The build of a path that is under way; null when there is none.
@@ -42,8 +42,8 @@ class Build {
     const unsigned char* pixels;
     const unsigned char* states;
   };
-  /// Packs and writes tiles. Of states, those stay that tell more than that there is no data.
-  /// @param writer  tells the writers apart, until each has left.
+  /// Packs and writes tiles. Of states, those stay that say more than that there is no data.
+  /// @param writer  identifies the writer, until it has left.
   bool Write(const TileRow& tiles, const void* writer);
   void Leave(const void* self);
   /// True for the one that may give the file its place: that which has begun it, or after that has
@@ -70,7 +70,7 @@ class Build {
   bool TakePlace();
   /// Nothing happens to it any more.
   bool IsOver() const { return isOver_; }
-  /// True when it has ended without its place; tells the fault.
+  /// True when it has ended without its place; sets the fault.
   bool HasFailed() const;
   void GiveUp() { isOver_ = true; }
 

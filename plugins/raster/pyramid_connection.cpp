@@ -198,7 +198,7 @@ bool Connection::ChangeValues(const std::function<bool(const std::string&, std::
   return isStored;
 }
 
-/// Tells the fault of this thread by the path that the user knows.
+/// Sets the fault of this thread by the path that the user knows.
 void Connection::ShowFault() const {
   const std::string fault = TakeFault().ToUTF8();
   const std::string& shown = PathShown();

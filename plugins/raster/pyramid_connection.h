@@ -7,7 +7,7 @@
 namespace lumo::pyramid {
 
 /// A pyramid file as a raster source: what stands on the disk, and the build that is to replace it.
-/// docs/file-formats.md tells the format.
+/// docs/file-formats.md describes the format.
 ///
 /// One that is made has no file until a build of it is whole.
 class Connection final : public PlainRasterConnection {
@@ -61,7 +61,7 @@ class Connection final : public PlainRasterConnection {
   TileCache cache_;
 };
 
-/// What connection strings say beside the format's key: the path, and how tiles are to be packed.
+/// The contents of connection strings beside the format's key: the path, and how tiles are packed.
 struct Place {
   std::string path;  ///< absolute, with links resolved; empty when the strings name none
   Compression compression = Compression::kLz4;

@@ -30,7 +30,7 @@ struct TilePlace {
   friend auto operator<=>(const TilePlace&, const TilePlace&) = default;
 };
 
-/// A whole pyramid file, open for reading. docs/file-formats.md tells the format.
+/// A whole pyramid file, open for reading. docs/file-formats.md describes the format.
 /// Threads: tiles may be read on many threads at once.
 /// Failure: false or null, with SetFault. Sizes in the file are checked before anything is
 ///          allocated by them.

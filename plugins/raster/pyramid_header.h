@@ -15,7 +15,7 @@ static_assert(std::endian::native == std::endian::little, "the file's numbers ar
 /// How the tiles of a file are packed.
 enum class Compression : std::uint32_t { kNone = 0, kLz4 = 1 };
 
-/// A stretch of the file, and the checksum of its bytes.
+/// A run of the file, and the checksum of its bytes.
 struct Extent {
   std::uint64_t offset = 0;
   std::uint64_t bytes = 0;
@@ -24,7 +24,7 @@ struct Extent {
 
 /// The checksum of the file format: XXH3, 64 bits.
 std::uint64_t Checksum(const void* bytes, std::size_t count);
-/// Of two stretches that follow one another in the file.
+/// Of two runs that follow one another in the file.
 std::uint64_t Checksum(const void* first, std::size_t firstCount, const void* second,
                        std::size_t secondCount);
 
@@ -44,7 +44,7 @@ inline constexpr unsigned kMostTileSide = 2048;
 inline constexpr std::uint64_t kHeaderPlaces[] = {0, 4096};
 inline constexpr std::uint64_t kDataBegin = 8192;
 
-/// What a pyramid file says of itself.
+/// The description of a pyramid file at its start.
 struct Header {
   std::uint64_t sequence = 0;
   std::uint64_t fileBytes = 0;  ///< that are in use
@@ -85,7 +85,7 @@ inline constexpr char kMagic[16] = "VEXGPYRAMID01\n";
 /// The bytes of a header.
 StoredHeader Store(const Header& header);
 
-/// What makes the description of a raster and its levels impossible; null when nothing does.
+/// Gives the reason why no raster and levels can be as described; null when they can.
 const char* FindFault(const Header& header);
 
 /// Takes over a header from its bytes.

@@ -9,12 +9,12 @@
 
 namespace lumo::pyramid {
 
-/// What a pyramid file keeps beside the pixels. Exists for TwelveTypes.
+/// The values that a pyramid file keeps beside the pixels. Exists for TwelveTypes.
 ///
 /// Its text has a line for each value: a word, a blank, and the text form of the value.
 template <typename T>
 struct Values {
-  /// @return false for a text that breaks off, or tells of a band that isn't there.
+  /// @return false for a text that breaks off, or names a band that isn't there.
   bool Read(const std::string& text, unsigned bands);
   std::string Write() const;
 

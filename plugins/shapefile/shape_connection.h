@@ -16,7 +16,7 @@ class Connection final : public VectorDataConnection {
   /// Shapes have no metadata here: what is given is not used.
   bool Connect(const Array<String>& connStrings, const GeoRefPtr& geoRef,
                const MetadataPtr& metadata) override;
-  /// A new file takes its place; the fault tells when it can't.
+  /// A new file takes its place; the fault says why when it can't.
   void Disconnect() override;
   bool IsConnected() override { return layer_ != nullptr; }
   Array<String> ConnectionStrings() override { return connStrings_; }

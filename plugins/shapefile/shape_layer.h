@@ -11,7 +11,7 @@ namespace lumo::shapefile {
 ///
 /// An existing one is opened for reading, and again for writing by the first operation that changes
 /// it. A new one lies beside its place under a temporary name until it is closed.
-/// Failure: false or null, with the fault told.
+/// Failure: false or null, with the fault set.
 class Layer {
  public:
   /// True for a name that ends as those of shapefiles do.

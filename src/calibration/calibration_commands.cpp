@@ -21,7 +21,7 @@ std::vector<InputDeclaration> Inputs(std::vector<InputDeclaration> own) {
   return inputs;
 }
 
-/// What the three commands have in common.
+/// Does the work of all three commands but for the formula.
 class CalibrateCommand : public RasterCommand {
  protected:
   CommandResult Execute() final {

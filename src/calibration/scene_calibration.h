@@ -7,13 +7,13 @@
 
 namespace lumo {
 
-/// What the metadata of a scene say that calibration needs. What they don't say is empty.
+/// Holds what calibration needs of the metadata of a scene. Fields that these lack are empty.
 struct SceneCalibration {
-  std::vector<String> bandNames;       ///< of the bands below, in their order; empty when not told
-  std::vector<double> gains;           ///< radiance of one count, W/(m2 sr um)
-  std::vector<double> offsets;         ///< radiance of count 0, W/(m2 sr um)
-  std::vector<double> irradiances;     ///< of the sun at 1 astronomical unit, W/(m2 um)
-  std::optional<double> sunElevation;  ///< degrees above the horizon
+  std::vector<String> bandNames;           ///< of the bands below, in their order; may be empty
+  std::vector<double> gains;               ///< radiance of one count, W/(m2 sr um)
+  std::vector<double> offsets;             ///< radiance of count 0, W/(m2 sr um)
+  std::vector<double> irradiances;         ///< of the sun at 1 astronomical unit, W/(m2 um)
+  std::optional<double> sunElevation;      ///< degrees above the horizon
   std::optional<double> earthSunDistance;  ///< on the day, astronomical units
 };
 

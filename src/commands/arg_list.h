@@ -7,7 +7,7 @@ namespace lumo {
 
 /// One positional argument: any object, or none.
 struct Argument {
-  ObjectPtr object;
+  ObjectPtr object;  ///< empty for none
 };
 
 /// Position in the argument table of a process, from 0.
@@ -18,10 +18,12 @@ using ArgID = unsigned;
 /// Failure: a list that can't be made or grow stores ArgListError.
 class VEXG_EXPORT ArgList : public ErrorState {
  public:
+  /// An empty list, which grows as arguments are set.
   ArgList() = default;
   /// `count` empty arguments.
   explicit ArgList(unsigned count);
 
+  /// False for a list that could not be made or grow.
   bool IsValid() const { return !HasError(); }
 
   /// Puts `object` at `index`; a list that is too short grows to hold it.

@@ -21,6 +21,10 @@ VEXG_EXPORT LockableMap<URI, CatalogEntry>& GetGlobalDataMap();
 
 /// The operations on the catalog. Each is atomic and may be called on any thread; an object that
 /// goes is destroyed after the catalog's lock was let go.
+///
+///     catalog::Add(raster);  // the command that opens
+///     const BasicRasterPtr found(catalog::Find(raster->GetURI()));  // another, later
+///     catalog::Release(raster->GetURI());  // the command that closes
 namespace catalog {
 
 /// Adds an object with count 1. When its identifier is there already the count goes up by 1, and

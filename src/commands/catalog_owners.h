@@ -5,12 +5,12 @@
 
 #include "commands/catalog_session.h"
 
-// Who has opened what, beside the catalog's own counts. For the catalog's sources only; everything
-// is called under the lock of the catalog.
+// Keeps who has opened what, beside the catalog's own counts. For the catalog's sources only;
+// everything is called under the lock of the catalog.
 
 namespace lumo::catalog {
 
-/// Opens of one object by session; what the catalog counts beyond them is nobody's.
+/// Opens of one object by session; those that the catalog counts beyond them are nobody's.
 using Owners = std::map<const Session*, unsigned>;
 
 std::map<URI, Owners>& AllOwners();

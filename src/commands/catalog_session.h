@@ -7,8 +7,8 @@
 
 namespace lumo::catalog {
 
-/// The opens of one client in the catalog. What a thread adds while a SessionScope of it lives, and
-/// all threads of a job that such a thread runs, counts as the client's.
+/// The opens of one client in the catalog. Objects that a thread adds while a SessionScope of it
+/// lives, and those of all threads of a job that such a thread runs, count as the client's.
 ///
 /// Where a client closes what another one has opened, one of its own opens goes first, then one
 /// that is nobody's, then another client's. Threads: any. It outlives its scopes.
@@ -16,20 +16,23 @@ class VEXG_EXPORT Session {
  public:
   /// @param client  number of the client's process.
   explicit Session(int client) : client_(client) {}
-  /// Leaves what is still open to nobody.
+  /// Leaves the objects that are still open to nobody.
   ~Session();
   Session(const Session&) = delete;
   Session& operator=(const Session&) = delete;
 
+  /// Number of the client's process.
   int GetClient() const { return client_; }
 
   /// Closes all that the client has opened and not closed. New sources that a job of its had opened
   /// which was aborted are not put in their places: they may not be whole.
   void ReleaseAll();
 
-  /// Begins the job whose opens are told to EndJob.
+  /// Begins the job whose opens EndJob ends.
   void BeginJob();
-  /// @param isAborted  what the job opened and nobody closes is given up in the end.
+  /// Ends the job that BeginJob began.
+  /// @param isAborted  new sources that the job opened, and that nobody closes, are given up in the
+  ///                   end.
   void EndJob(bool isAborted);
 
  private:
@@ -56,9 +59,9 @@ VEXG_EXPORT Session* CurrentSession();
 
 /// The opens of one object that belong to one client.
 struct OpenObject {
-  URI uri;
-  unsigned opens = 0;
-  int client = 0;  ///< number of its process; 0 for nobody's
+  URI uri;             ///< its key in the catalog
+  unsigned opens = 0;  ///< how often the client has opened and not closed it
+  int client = 0;      ///< number of its process; 0 for nobody's
 };
 
 /// All that is open, by whom, in the order of the identifiers.

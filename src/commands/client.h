@@ -6,14 +6,20 @@
 namespace lumo {
 
 /// Sends jobs to a server. Used by one thread at a time.
+///
+///     PipeClient client("vexg");
+///     if (!client.Connect()) return false;  // no server has that name
+///     const Map<String, JobResult> results = client.Submit(document);
+///     const bool well = results.Find("statistics").result == "Success";
 class VEXG_EXPORT Client {
  public:
   using PointerRoot = Client;
 
   virtual ~Client() = default;
 
-  /// What it is connected to, for people.
+  /// The name of the server that it is connected to, for people.
   virtual String GetName() const = 0;
+  /// True while there is a private server, as far as is known.
   virtual bool IsConnected() const = 0;
 
   /// Gets a private server; true at once when there is one already.
@@ -32,8 +38,11 @@ class VEXG_EXPORT Client {
   virtual Map<String, JobResult> Submit(const String& jobDocument) = 0;
 
   // A text that the caller may keep here; nothing in the library reads it.
+  /// Keeps a text.
   virtual void SetNote(const String& note) = 0;
+  /// Makes the text empty.
   virtual void ClearNote() = 0;
+  /// The text, which may be written.
   virtual String& GetNote() = 0;
 };
 

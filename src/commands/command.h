@@ -19,13 +19,13 @@ struct Parameter {
 /// Named values; an absent name reads as an empty ObjectPtr.
 using ParameterMap = Map<String, Parameter>;
 
-/// How a run of a command ended.
+/// The ways in which a run of a command ends.
 enum class CommandResult : unsigned { kNone = 0, kSuccess = 1, kFailed = 2, kAborted = 3 };
 
 /// "None", "Success", "Failed", "Aborted"; "Unknown" for any other value.
 VEXG_EXPORT const char* GetResultWord(CommandResult result);
 
-/// Where a command stands; it only goes forward.
+/// The steps of a command, from its making to the end; it only goes forward.
 enum class CommandState : unsigned {
   kCreated = 0,   ///< made
   kStarted = 1,   ///< handed out to be run
@@ -39,7 +39,21 @@ enum class CommandState : unsigned {
 ///
 /// A concrete command declares its inputs and outputs, overrides Execute, and registers a
 /// CommandFactoryT of itself. Execute checks the inputs, reads the values, finds its objects, does
-/// the work, stores the outputs and gives Succeed() or Fail().
+/// the work, stores the outputs and gives Succeed() or Fail():
+///
+///     class DoubleCommand final : public Command {
+///       CommandResult Execute() override {
+///         if (!CheckInputs()) return Fail();
+///         Write("Doubled", 2 * Read<double>("Value"));
+///         return Succeed();
+///       }
+///     };
+///
+///     const CommandDeclaration declaration{
+///         "DoubleCommand", "Examples", "Doubles a number.",
+///         {{"Value", Presence::kRequired, ValueKind::kNumber, "the number"}},
+///         {{"Doubled", ValueKind::kNumber, "twice the number"}}};
+///     const CommandFactoryT<DoubleCommand> factory(declaration);
 ///
 /// Threads: used by one thread at a time; only the state may be asked for on any thread.
 /// Failure: CommandErrorFail in the error state, kFailed as the result, and a line that says why.
@@ -52,6 +66,7 @@ class VEXG_EXPORT Command : public ErrorState {
     double cpu = 0.0;   ///< used by the process
   };
 
+  /// False once the command has failed.
   bool IsValid() const { return !HasError(); }
 
   /// Runs the command, which must be in state kStarted; in any other state, or with an error
@@ -61,10 +76,14 @@ class VEXG_EXPORT Command : public ErrorState {
   /// @return the outputs, which the command keeps.
   ParameterMap& Run(const ParameterMap& inputs, const IPC& ipc);
 
+  /// Where the command stands; any thread may ask.
   CommandState GetState() const { return state_; }
   void SetState(CommandState state) { state_ = state; }
+  /// How the run ended; kNone before its end.
   CommandResult GetResult() const { return result_; }
+  /// The moment at which Run began.
   Times GetStartTimes() const { return startTimes_; }
+  /// The moment at which Run ended; zeros before.
   Times GetEndTimes() const { return endTimes_; }
 
   /// Why the command failed, in one line; empty when it did not, or did not say.
@@ -76,17 +95,18 @@ class VEXG_EXPORT Command : public ErrorState {
   /// Ends a command that could not be run at all as failed.
   void FailUnstarted(const String& reason);
 
-  /// What the command declares; null for one that was not made by a factory with a declaration.
+  /// The command's declaration; null for one that was not made by a factory.
   const CommandDeclaration* GetDeclaration() const { return declaration_; }
 
  protected:
-  /// The work. Gives what Succeed() or Fail() give.
+  /// Does the work, and returns the result of Succeed() or Fail().
   virtual CommandResult Execute();
 
-  /// Copies into the returns what the result document shall hold. The base takes every output that
-  /// is declared as returned and was stored, in its whole-text form.
+  /// Fills the returns, which the result document holds. The base takes every output that is
+  /// declared as returned and was stored, in its whole-text form.
   virtual void BuildReturn();
 
+  /// True when the job gives the input, whatever it holds.
   bool HasInput(const char* name) const { return inputs_ != nullptr && inputs_->HasKey(name); }
   /// The input, or an empty ObjectPtr.
   ObjectPtr GetInput(const char* name) const;
@@ -165,12 +185,14 @@ class VEXG_EXPORT CommandFactory {
   CommandFactory(const CommandFactory&) = delete;
   CommandFactory& operator=(const CommandFactory&) = delete;
 
+  /// Makes a command; an allocation that fails comes out as std::bad_alloc.
   virtual CommandPtr Create() const = 0;
 
+  /// The declaration of the commands that it makes.
   const CommandDeclaration& GetDeclaration() const { return declaration_; }
 
  protected:
-  /// Takes over a new command and tells it what it has declared.
+  /// Takes over a new command and gives it the declaration.
   CommandPtr Adopt(Command* command) const;
 
  private:

@@ -7,10 +7,11 @@
 
 namespace lumo {
 
-/// What a command needs of an input before it runs.
+/// Says whether an input has to be there before a command runs.
 enum class Presence { kRequired, kOptional };
 
-/// How the text of an input or output is to be read.
+/// The kinds of values that inputs and outputs hold, by which their texts are read; Describe gives
+/// the form of each.
 enum class ValueKind {
   kText,
   kURI,
@@ -32,9 +33,10 @@ enum class ValueKind {
 
 /// The name of a kind and its text form, for people.
 struct ValueKindText {
-  const char* name;
-  const char* form;
+  const char* name;  ///< one or two words
+  const char* form;  ///< how the text is written
 };
+/// The name and the form of a kind.
 VEXG_EXPORT ValueKindText Describe(ValueKind kind);
 
 /// Gives the words that an input takes; an unknown word reads as the first of them, unless the
@@ -47,25 +49,25 @@ using WordsFunction = std::vector<const char*> (*)();
 /// given and a better one. Without the input the told form is given; the verbs of the command line
 /// ask for the better one. The reference document lists these inputs in one table.
 struct InputDeclaration {
-  const char* name;
+  const char* name;  ///< attribute in the job document
   Presence presence;
   ValueKind kind;
-  const char* meaning;
+  const char* meaning;            ///< for people, without a capital or a full stop
   const char* unit = "";          ///< unit of a number; empty for none
   WordsFunction words = nullptr;  ///< of a kWord
 };
 
 /// One output of a command.
 struct OutputDeclaration {
-  const char* name;
+  const char* name;  ///< attribute in the job document
   ValueKind kind;
-  const char* meaning;
-  const char* unit = "";
-  bool returned = true;  ///< stands in the result document too
+  const char* meaning;    ///< for people
+  const char* unit = "";  ///< unit of a number; empty for none
+  bool returned = true;   ///< stands in the result document too
 };
 
-/// What a command says of itself, once: the input checks, the lists of commands, the help, the
-/// completion of the shell and the reference document are all made from it.
+/// Describes a command, once: the input checks, the lists of commands, the help, the completion of
+/// the shell and the reference document are all made from it. See Command for an example.
 struct CommandDeclaration {
   const char* name;                      ///< class name, and key in the registry
   const char* group;                     ///< heading under which lists show it

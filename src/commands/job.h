@@ -10,9 +10,9 @@ struct CommandDescriptor {
   using PointerRoot = CommandDescriptor;
   virtual ~CommandDescriptor() = default;
 
-  String name;  ///< as the document gives it, possibly empty
-  String id;    ///< class name
-  CommandPtr command;
+  String name;                  ///< as the document gives it, possibly empty
+  String id;                    ///< class name
+  CommandPtr command;           ///< made by the parser
   Set<CommandPtr> dependsOn;    ///< must be retired first
   unsigned dependsOnFirst = 0;  ///< as many from the first of the job too; @ALL in a long job
   Map<String, String> inputs;   ///< input name to a literal or, with a leading $, a variable
@@ -31,8 +31,8 @@ struct CommandDescriptor {
 
 using CommandDescriptorPtr = Pointer<CommandDescriptor>;
 
-/// How often a job looks for the nearest name in its own: each look goes over all of them, and a
-/// document may be wrong in a hundred thousand places.
+/// The most times that a job looks for the nearest name in its own: each look goes over all of
+/// them, and a document may be wrong in a hundred thousand places.
 inline constexpr unsigned kMostHints = 100;
 
 /// A command of a document that names no command known here. It is no part of the job; a host may
@@ -48,6 +48,12 @@ struct UnknownCommand {
 };
 
 /// Commands with their inputs, outputs and order, and the channel through which a host watches.
+///
+///     Job job;
+///     JobParser(job).Parse(document);
+///     RunJob(job);
+///     const String results = JobResultWriter(job).Write();
+///
 /// Threads: built and asked by one thread; RunJob runs its commands on others.
 class VEXG_EXPORT Job {
  public:
@@ -70,7 +76,7 @@ class VEXG_EXPORT Job {
   JobChecks checks = JobChecks::kTold;   ///< how the commands' inputs are looked at
   bool tellsReasons = false;             ///< the result document says why commands failed
   IPCPtr ipc;                            ///< empty when the document named none that can be used
-  IPC defaultIpc;
+  IPC defaultIpc;                        ///< stands in where `ipc` is empty
 };
 
 /// Runs all commands of `job` and returns when the last has retired. A command starts once all that

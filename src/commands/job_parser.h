@@ -17,6 +17,7 @@ namespace lumo {
 /// A document that breaks off leaves what it had named so far in the job.
 class VEXG_EXPORT JobParser : public XMLSimpleParser {
  public:
+  /// @param job  gets what the document holds, and outlives the parser.
   explicit JobParser(Job& job) : job_(job) {}
 
   /// Parses the document; one that can't be parsed to its end is a fault of the job too.

@@ -7,9 +7,9 @@
 
 namespace lumo {
 
-/// Divides the report of a job over its commands: what is reported is their mean. A report costs
-/// the same for a job of any size but for its square root, where ConcurrentProgressReport adds up
-/// all slots each time.
+/// Divides the report of a job over its commands, and reports their mean. A report costs the same
+/// for a job of any size but for its square root, where ConcurrentProgressReport adds up all slots
+/// each time.
 ///
 /// Ownership: owns its slots; a ProgressReportPtr to one must not outlive it.
 /// Threads:   any number of threads may update slots. The target is updated under a lock, so that
@@ -21,6 +21,7 @@ class JobProgress {
   JobProgress(const JobProgress&) = delete;
   JobProgress& operator=(const JobProgress&) = delete;
 
+  /// The report of command `index`, from 0.
   ProgressReportPtr GetSlot(unsigned index);
 
  private:

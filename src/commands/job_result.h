@@ -5,14 +5,14 @@
 
 namespace lumo {
 
-/// What a result document says of one command, as text.
+/// Holds the results of one command as a result document has them, as text.
 struct JobResult {
-  String result;  ///< "Success", "Failed", "Aborted" or "None"
-  Map<String, String> returns;
-  String cpu;   ///< processor time, see FormatDuration
-  String wall;  ///< wall-clock time
-  String usage;
-  String reason;  ///< why it failed; only where the job asked for reasons
+  String result;                ///< "Success", "Failed", "Aborted" or "None"
+  Map<String, String> returns;  ///< return value by name
+  String cpu;                   ///< processor time, see FormatDuration
+  String wall;                  ///< wall-clock time
+  String usage;                 ///< "0"
+  String reason;                ///< why it failed; only where the job asked for reasons
 };
 
 /// A duration as a whole number with its unit behind it: "850us", "12ms", "3s", "2min", "1hr". The
@@ -38,6 +38,7 @@ class VEXG_EXPORT JobResultWriterValue : public XMLElement {
 class VEXG_EXPORT JobResultWriter : public ErrorState {
  public:
   explicit JobResultWriter(Job& job) : job_(job) {}
+  /// Writes the document; an empty text on a failure.
   String Write();
 
  private:
@@ -48,6 +49,7 @@ class VEXG_EXPORT JobResultWriter : public ErrorState {
 /// or without one, the last stands.
 class VEXG_EXPORT JobResultParser : public XMLSimpleParser {
  public:
+  /// @param results  is added to, and outlives the parser.
   explicit JobResultParser(Map<String, JobResult>& results) : results_(results) {}
 
   void StartElement(const String& name, const Map<String, String>& attributes) override;

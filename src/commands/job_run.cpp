@@ -83,7 +83,7 @@ class JobExecutorThread : public SimpleThread {
   void Run() override {
     SetRunning();
     const catalog::SessionScope session(run_->session);
-    // What this command held up runs here, rather than on a thread that has to be made first.
+    // Commands that this one held up run here, rather than on threads that have to be made first.
     while (descriptor_ != nullptr) {
       run_->Execute(*descriptor_);
       descriptor_ = run_->finisher.WriteAndTake(*descriptor_);
@@ -159,7 +159,7 @@ ObjectPtr JobVariables::FindOrMake(const String& variable) {
   return variables_[variable];
 }
 
-/// Why `variable` holds nothing, as far as the job can tell.
+/// Why `variable` holds nothing, as far as the job knows.
 String JobVariables::ExplainEmpty(const CommandDescriptor& reader, const String& variable) {
   const std::string name = Printable(variable.ToUTF8(), 80);
   const auto found = writers_.find(variable);

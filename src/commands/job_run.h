@@ -61,7 +61,7 @@ class JobVariables {
   unsigned hints_ = kMostHints;
 };
 
-/// The first stage of a run: hands out the commands as what they depend on retires.
+/// The first stage of a run: hands out each command once all that it depends on have retired.
 class JobStarter : public IPipelineReader<CommandDescriptor> {
  public:
   /// Gives each command the job's abort flag and a slot of the job's progress.

@@ -8,10 +8,9 @@
 
 namespace lumo {
 
-/// Which commands of a job may start: those all of whose dependencies have retired, the first in
-/// the document first. Each step costs as much as the dependencies that it resolves, so that a run
-/// is linear in the job.
-/// Threads: used under one lock.
+/// Chooses the command of a job that may start next: one whose dependencies have all retired, the
+/// first in the document first. Each step costs as much as the dependencies that it resolves, so
+/// that a run is linear in the job. Threads: used under one lock.
 class JobSchedule {
  public:
   /// Numbers the commands of `job`, none of which has begun.
@@ -23,8 +22,11 @@ class JobSchedule {
   /// Notes that a command of the job has retired.
   void Retire(const CommandDescriptor& descriptor);
 
+  /// True when a command may start now.
   bool HasReady() const { return !ready_.empty(); }
+  /// True when every command was handed out.
   bool AllStarted() const { return started_ == steps_.size(); }
+  /// True when every command has retired: the run is at its end.
   bool AllRetired() const { return retired_ == steps_.size(); }
 
  private:

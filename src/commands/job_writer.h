@@ -33,6 +33,16 @@ class VEXG_EXPORT JobWriterCommand : public XMLElement {
 };
 
 /// Writes a job document.
+///
+///     JobWriter writer;
+///     JobWriterCommand* const open = writer.AddCommand("open", "OpenRasterCommand");
+///     open->AddInput("ConnStr", path);
+///     open->AddOutput("URI", "$raster");
+///     JobWriterCommand* const stats = writer.AddCommand("stats", "GetBasicRasterStatsCommand");
+///     stats->AddVariableInput("URI", "$raster");
+///     stats->AddDependsOn("open");
+///     const String document = writer.Write();
+///
 /// Failure: ObjectErrorIO and an empty text.
 class VEXG_EXPORT JobWriter : public ErrorState {
  public:
@@ -42,6 +52,7 @@ class VEXG_EXPORT JobWriter : public ErrorState {
   /// @param id  class name of the command.
   JobWriterCommand* AddCommand(const String& name, const String& id);
 
+  /// The document, in UTF-8 on one line; an empty text on a failure.
   String Write();
 
  private:

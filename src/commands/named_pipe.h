@@ -31,14 +31,15 @@ class VEXG_EXPORT NamedPipe : public Lockable {
   /// Path of the socket on which the pipe stands; no text when the name is not allowed.
   const String& GetFullName() const { return fullName_; }
 
-  /// The name is allowed.
+  /// True when the name is allowed.
   bool IsValid() const { return fullName_.GetLength() != 0; }
-  /// Listen has a client.
+  /// True when Listen has a client, or Connect a server.
   bool IsConnected() const { return connected_; }
 
   /// Server side: takes the name, so that clients can come from now on. Listen does so by itself.
-  /// @return false when a living server has it, or the system refuses; GetFault() tells which.
+  /// @return false when a living server has it, or the system refuses; GetFault() says which.
   bool Create();
+  /// Why the last Create or Listen could not have the name.
   platform::PipeFault GetFault() const { return fault_; }
 
   /// Server side: ends the exchange before and waits for the next client, which has come once its

@@ -11,10 +11,10 @@ namespace lumo {
 
 /// A job that a private server is running.
 struct ServedJobInfo {
-  unsigned number = 0;   ///< counted from 1 in this process
-  int client = 0;        ///< number of the process that sent it
-  double seconds = 0.0;  ///< since it began
-  double progress = 0.0;
+  unsigned number = 0;      ///< counted from 1 in this process
+  int client = 0;           ///< number of the process that sent it
+  double seconds = 0.0;     ///< since it began
+  double progress = 0.0;    ///< fraction done, 0 to 1
   bool aborted = false;     ///< its abort flag is up
   std::vector<String> ids;  ///< classes of the commands that run now
 };
@@ -23,12 +23,15 @@ struct ServedJobInfo {
 /// Threads: any.
 class VEXG_EXPORT ServedJobs {
  public:
+  /// The list of the process.
   static ServedJobs& Get();
 
+  /// The jobs in the order in which they began.
   std::vector<ServedJobInfo> List();
 
   /// Raises the abort flag of one job; false when no such job runs.
   bool Abort(unsigned number);
+  /// Raises the abort flags of all jobs that run now.
   void AbortAll();
 
   /// Aborts every job that comes from now on.

@@ -76,7 +76,7 @@ class VEXG_EXPORT PipeServerDispatch : public ServerDispatch {
   const String& GetName() const { return name_; }
 
   /// Takes the pipe's name; Run does so by itself.
-  /// @return false when the name can't be had; GetFault() tells why.
+  /// @return false when the name can't be had; GetFault() says why.
   bool Open();
   platform::PipeFault GetFault() const { return pipe_.GetFault(); }
 

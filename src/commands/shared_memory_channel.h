@@ -59,6 +59,9 @@ class VEXG_EXPORT ConnectSharedMemory : public SharedMemory {
 /// A block that can't be opened, an offset outside it, a progress offset that is no multiple of 4,
 /// or a flag inside the progress value leave the channel unusable: its flag and report are then its
 /// own and nobody sees them.
+///
+///     const ORVAIPC channel("job-7", 64);  // the other process made /dev/shm/job-7
+///     if (channel.IsUsable()) …
 template <typename A, typename P>
 class SHMIPC : public IPC {
  public:
@@ -74,6 +77,7 @@ class SHMIPC : public IPC {
     abort = AbortFlagPtr(new ExternalAbortFlag<A>(reinterpret_cast<A*>(data + abortOffset)));
   }
 
+  /// True when the flag and the report lie in the block.
   bool IsUsable() const { return usable_; }
 
  private:
@@ -97,6 +101,7 @@ class VEXG_EXPORT ORVAIPC : public SHMIPC<unsigned char, float> {
 /// An ORVAIPC of fixed size.
 class VEXG_EXPORT TQFProcessIPC : public ORVAIPC {
  public:
+  /// Bytes of the block.
   static constexpr unsigned kSize = 1034;
   explicit TQFProcessIPC(const String& name) : ORVAIPC(name, kSize) {}
 };

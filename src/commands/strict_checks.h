@@ -6,11 +6,11 @@
 
 namespace lumo {
 
-/// How a job looks at what its commands are given.
+/// The ways in which a job looks at the inputs and outputs that its commands are given.
 ///
 /// Told: a text that holds no value reads as 0 or nothing, an unknown word as the value that its
-/// enumeration tells, and unknown names are passed over. Strict: such a command fails before it
-/// runs, with a reason that names the nearest known name.
+/// enumeration has for it, and unknown names are passed over. Strict: such a command fails before
+/// it runs, with a reason that names the nearest known name.
 enum class JobChecks { kTold, kStrict };
 
 /// "Told", "Strict".

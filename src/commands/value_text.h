@@ -14,8 +14,8 @@
 //
 //   String         all of the text, trimmed         bool      0 or 1
 //   URI            [text] and a blank               numbers   the stream's form
-//   Array<String>  pieces joined by |               Array<T>  rank:extent extent [a b c] and a
-//   blank enumerations   one word                         others    their operator<< and operator>>
+//   Array<String>  pieces joined by |               Array<T>  rank:extent extent [a b c]
+//   enumerations   one word                         others    their operator<< and operator>>
 
 namespace lumo {
 
@@ -25,7 +25,7 @@ namespace lumo {
 /// and `const char* UnknownWordOf(E)`, how a value that is not in the list is written (as no text).
 template <typename E>
 struct EnumWord {
-  const char* word;
+  const char* word;  ///< compared exactly
   E value;
 };
 
@@ -37,7 +37,8 @@ std::vector<const char*> WordsIn() {
   return words;
 }
 
-/// Which form of a result a command gives: the one that has always been given, or the exact one.
+/// The forms of a result that a command gives: the one that has always been given, and the exact
+/// one.
 enum class Form { kTold, kExact };
 
 /// "Told", "Exact".
@@ -51,9 +52,12 @@ VEXG_EXPORT ObjectPtr MakeText(const String& text);
 
 namespace detail {
 
+/// The pieces between the bars of a text.
 VEXG_EXPORT Array<String> SplitAtBars(const String& text);
+/// The pieces with a bar between each two.
 VEXG_EXPORT String JoinWithBars(const Array<String>& pieces);
 
+/// Reads the next word as a value of an enumeration.
 template <typename E>
 E ReadEnumWord(std::istream& in) {
   const std::string text = ReadWordText(in).ToUTF8();
@@ -70,7 +74,11 @@ E ReadEnumWord(std::istream& in) {
 }  // namespace detail
 
 /// Reads a value of type T from its text form. A text that holds no such value gives T(); a word
-/// that the enumeration lacks gives its UnknownValueOf.
+/// that the enumeration lacks gives its UnknownValueOf. Text behind the value is not looked at.
+///
+///     const auto rect = ParseValue<SubRect>("0 0 99 49");
+///     const auto form = ParseValue<Form>("Exact");
+///     const String text = FormatValue(rect);  // "0 0 99 49"
 template <typename T>
 T ParseValue(const String& text) {
   std::istringstream in = MakeTextReader(text);
@@ -93,7 +101,7 @@ T ParseValue(const String& text) {
   }
 }
 
-/// The text form of `value`.
+/// The text form of `value`, from which ParseValue makes an equal one.
 template <typename T>
 String FormatValue(const T& value) {
   std::ostringstream out = MakeTextWriter();

@@ -59,7 +59,7 @@ bool IsArray(ValueKind kind) {
          kind == ValueKind::kBooleanArray || kind == ValueKind::kURIArray;
 }
 
-/// The array of the elements in a list, which are parted by blanks; a URI ends with its bracket.
+/// The array of the elements in a list, which are separated by blanks; a URI ends with its bracket.
 std::string MakeArray(const std::string& list) {
   std::string elements;
   unsigned count = 0;

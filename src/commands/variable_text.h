@@ -18,9 +18,9 @@ VEXG_EXPORT void ForEachVariable(const String& text,
 
 /// Puts the values of variables in the place of their names.
 ///
-/// For an array the text is a list of elements parted by blanks, and the array of them comes back:
-/// "$red $nir" gives "1:2 [[red.tif] [nir.tif] ] ". A text that is an array already stays one, with
-/// its variables replaced. In a text list the blanks around a value are left out.
+/// For an array the text is a list of elements separated by blanks, and the array of them comes
+/// back: "$red $nir" gives "1:2 [[red.tif] [nir.tif] ] ". A text that is an array already stays
+/// one, with its variables replaced. In a text list the blanks around a value are left out.
 /// @return false when one of the variables holds no text.
 VEXG_EXPORT bool ExpandVariables(const String& text, ValueKind kind, const VariableReader& read,
                                  String& expanded);

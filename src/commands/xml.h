@@ -6,8 +6,8 @@
 namespace lumo {
 
 /// Limits on the documents that are parsed. A document beyond them counts as not well formed.
-inline constexpr unsigned kMaxXMLBytes = 64U << 20;
-inline constexpr unsigned kMaxXMLDepth = 1000;
+inline constexpr unsigned kMaxXMLBytes = 64U << 20;   ///< of the document
+inline constexpr unsigned kMaxXMLDepth = 1000;        ///< elements inside one another
 inline constexpr unsigned kMaxXMLAttributes = 10000;  ///< of one element
 
 /// Reads an XML document and hands its events to the operations that a derived class overrides.
@@ -15,19 +15,25 @@ inline constexpr unsigned kMaxXMLAttributes = 10000;  ///< of one element
 /// A document with a DOCTYPE is refused before anything in it is expanded, and nothing outside the
 /// document is ever opened.
 /// Failure: ObjectErrorIO for an empty text, one that is not well formed or one beyond the limits.
-///          What was seen before the fault has had its effect.
+///          Events before the fault have had their effect.
 /// Threads: used by one thread.
 class VEXG_EXPORT XMLSimpleParser : public ErrorState {
  public:
+  /// Called before the first element.
   virtual void StartDocument() {}
+  /// Called behind the last element; not for a document that breaks off.
   virtual void EndDocument() {}
+  /// Called where an element begins.
   virtual void StartElement(const String& /*name*/, const Map<String, String>& /*attributes*/) {}
+  /// Called where an element ends.
   virtual void EndElement(const String& /*name*/) {}
+  /// Called with text of the element that is open, which may come in several parts.
   virtual void Characters(const String& /*text*/) {}
 
+  /// Reads a document and calls the operations in its order.
   void Parse(const String& document);
 
-  /// What was wrong with the document and where, in one line; empty when nothing was.
+  /// The fault of the document and its place, in one line; empty when there was none.
   const String& GetFault() const { return fault_; }
 
  private:
@@ -50,9 +56,9 @@ class VEXG_EXPORT XMLElement {
   /// Adds a child at the end; this element owns it.
   XMLElement* AddChild(const String& childName);
 
-  String name;
-  Map<String, String> attributes;
-  String text;  ///< written when its length is not 0
+  String name;                     ///< has to be one that XML allows
+  Map<String, String> attributes;  ///< written in the order of their names
+  String text;                     ///< written when its length is not 0
   Deque<XMLElementPtr> children;
 };
 
@@ -69,6 +75,7 @@ struct XMLDocumentRoot {
 /// Threads: used by one thread.
 class VEXG_EXPORT XMLSimpleWriter : public ErrorState {
  public:
+  /// Writes a document; an empty text on a failure.
   String Write(const XMLDocumentRoot& root);
 };
 

@@ -9,6 +9,7 @@ namespace lumo {
 class XMLRuntime {
  public:
   XMLRuntime();
+  /// False once the library was unloaded.
   bool IsReady() const { return ready_; }
 
  private:

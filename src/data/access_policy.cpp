@@ -98,7 +98,7 @@ bool NamesSpecialFile(const std::string& name) {
 }
 
 /// Where a name leads: links are followed, and what isn't there yet lies in its folder. False when
-/// that can't be told, as for a link that leads nowhere: making the file would follow it.
+/// that can't be found out, as for a link that leads nowhere: making the file would follow it.
 bool Resolve(const std::string& name, fs::path& resolved) {
   std::error_code fault;
   const fs::path named(name);

@@ -7,8 +7,13 @@
 
 namespace lumo {
 
-/// What sources may be opened and made. The default allows everything, as suits a program that does
-/// what its user says; a server that takes jobs from others sets a narrower one.
+/// Says what sources may be opened and made. The default allows everything, as suits a program that
+/// does what its user says; a server that takes jobs from others sets a narrower one:
+///
+///     AccessPolicy policy;
+///     policy.roots = {"/srv/scenes"};
+///     policy.network = policy.memory = policy.special = false;
+///     if (!SetAccessPolicy(policy)) return TakeFault();
 struct AccessPolicy {
   /// Folders that hold all sources, outputs and temporary files, links resolved; none: no limit.
   std::vector<std::string> roots;
@@ -20,7 +25,7 @@ struct AccessPolicy {
 };
 
 /// Takes over a policy for the process, before the first source is opened. False, with the fault
-/// text told and nothing changed, when a root is no directory.
+/// set and nothing changed, when a root is no directory.
 VEXG_EXPORT bool SetAccessPolicy(const AccessPolicy& policy);
 
 /// The policy in force, its roots resolved.
@@ -28,7 +33,7 @@ VEXG_EXPORT AccessPolicy GetAccessPolicy();
 
 /// True when the process may reach the file at `path`, which may be a link and need not exist: it
 /// lies in one of the roots once all links are followed. The library's own folders, as the
-/// environment names them, may be read. Else tells the fault. Whatever opens files asks here, with
+/// environment names them, may be read. Else sets the fault. Whatever opens files asks here, with
 /// the name that it is about to open.
 /// @param writing  the file is to be made, changed, renamed or removed.
 VEXG_EXPORT bool MayReachFile(const std::string& path, bool writing);
@@ -42,12 +47,13 @@ VEXG_EXPORT String TakeRefusal();
 /// True when a policy with roots is in force.
 VEXG_EXPORT bool AreFilesLimited();
 
-/// True when sources of the format may be opened and made; else tells the fault.
+/// True when sources of the format may be opened and made; else sets the fault.
 VEXG_EXPORT bool MayUseFormat(const FormatRecord& format);
 
 /// While one lives, this thread may open the library's own blocks of memory, whatever the policy.
 class VEXG_EXPORT OwnMemoryScope {
  public:
+  /// Begins on the thread that makes it, which also ends it.
   OwnMemoryScope();
   ~OwnMemoryScope();
   OwnMemoryScope(const OwnMemoryScope&) = delete;
@@ -58,13 +64,14 @@ class VEXG_EXPORT OwnMemoryScope {
 /// to: the policy has admitted them before.
 class VEXG_EXPORT AdmittedSourceScope {
  public:
+  /// Begins on the thread that makes it, which also ends it.
   AdmittedSourceScope();
   ~AdmittedSourceScope();
   AdmittedSourceScope(const AdmittedSourceScope&) = delete;
   AdmittedSourceScope& operator=(const AdmittedSourceScope&) = delete;
 };
 
-/// True when a source may be used; else tells the fault. Of the pieces that are no format's key the
+/// True when a source may be used; else sets the fault. Of the pieces that are no format's key the
 /// first is the source's name: a file, or a name that holds one ("HDF5:"a.h5"://band"). Further
 /// pieces NAME=VALUE are options, whose values count as files only where there is such a file.
 /// @param making  the source is to be made: it need not exist, its folder has to.

@@ -14,6 +14,7 @@ namespace lumo {
 template <typename Value>
 class BandAnswers {
  public:
+  /// Bands in a row after which answers are asked ahead.
   static constexpr unsigned kPatience = 64;
   static constexpr unsigned kAhead = 4096;  ///< bands of one call at most
 

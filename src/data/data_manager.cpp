@@ -11,7 +11,7 @@ std::recursive_mutex* gpLocalDataManagerMutex = nullptr;
 
 namespace {
 
-/// What VEXInit makes here; it lives as long as the process.
+/// Makes the part of VEXInit that lies here; it lives as long as the process.
 bool MakeManagers() {
   static auto* const mutex = new std::recursive_mutex;
   static auto* const manager = new DataManager;

@@ -9,7 +9,7 @@ namespace lumo {
 
 /// Finds the format of a source and opens it, directly or behind a proxy. It is the factory that
 /// the rest of the library sees; a DataManager owns it.
-/// Failure: an empty pointer, with the fault text told.
+/// Failure: an empty pointer, with the fault set.
 class VEXG_EXPORT MtDataConnectionFactory final : public DataConnectionFactory {
  public:
   bool IsAvailable() override { return true; }
@@ -31,6 +31,7 @@ class VEXG_EXPORT MtDataConnectionFactory final : public DataConnectionFactory {
   /// Makes a source straight from the plug-in of `def.format`; a format's key in the strings is
   /// dropped.
   DataConnectionPtr CreateRasterDirect(const Array<String>& connStrings, const RasterDef& def);
+  /// Makes a vector source, likewise.
   DataConnectionPtr CreateVectorDirect(const Array<String>& connStrings, const VectorDef& def);
 };
 
@@ -63,6 +64,7 @@ class VEXG_EXPORT DataManager : public ErrorState, public Lockable {
   unsigned refCount_ = 1;
 };
 
+/// The manager of the process; null until VEXInit or the first GetGlobalDataManager.
 VEXG_EXPORT extern DataManager* gpGlobalDataManager;
 /// Guards the managers of the threads.
 VEXG_EXPORT extern std::recursive_mutex* gpLocalDataManagerMutex;
@@ -73,6 +75,7 @@ VEXG_EXPORT DataManager& GetGlobalDataManager();
 /// The manager of this thread, made at the first call. Each call is paired with one of
 /// FreeLocalDataManager on the same thread; the last of them deletes the manager.
 VEXG_EXPORT DataManager& GetLocalDataManager();
+/// Takes back one GetLocalDataManager of this thread.
 VEXG_EXPORT void FreeLocalDataManager();
 
 }  // namespace lumo

@@ -93,7 +93,7 @@ void DcSrv::Run(DcSrvCmd& cmd, DcSrvContext& context) {
 }
 
 void DcSrv::Reply(DcSrvCmd& cmd) {
-  // Told under the lock: the caller may destroy the command as soon as it is let in.
+  // Notified under the lock: the caller may destroy the command as soon as it is let in.
   const std::lock_guard lock(cmd.mutex_);
   cmd.done_ = true;
   cmd.replied_.notify_one();

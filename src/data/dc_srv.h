@@ -10,10 +10,10 @@
 
 namespace lumo {
 
-/// What lives on the thread of a source: the one connection of the plug-in.
+/// Holds what lives on the thread of a source: the one connection of the plug-in.
 struct DcSrvContext {
-  bool exit = false;
-  DataConnectionPtr conn;
+  bool exit = false;       ///< the thread is to end
+  DataConnectionPtr conn;  ///< empty while nothing is open
 };
 
 /// A call into a source, handed to the source's thread and waited for. It lives on the stack of the
@@ -27,7 +27,9 @@ class VEXG_EXPORT DcSrvCmd {
   /// The call; runs on the source's thread.
   virtual void Execute(DcSrvContext& context) = 0;
 
+  /// The number of the operation, for logs.
   std::int32_t Code() const { return code_; }
+  /// The name of the operation, for people.
   const char* Name() const { return name_; }
 
  private:
@@ -39,7 +41,7 @@ class VEXG_EXPORT DcSrvCmd {
   std::condition_variable replied_;
   bool done_ = false;      // the reply
   bool abandons_ = false;  // as the thread that it works for
-  String fault_;           // what the thread told while it ran this
+  String fault_;           // the fault text that was set while the thread ran this
   std::vector<std::string> warnings_;
 };
 
@@ -48,6 +50,7 @@ class VEXG_EXPORT DcSrvCmd {
 ///
 /// Threads: any number of threads may Execute. A plug-in that is being called must not wait for its
 ///          own source: that call would queue behind the running one for ever.
+/// Cost: a call is two changes of threads. CallServer and CallConnection wrap it.
 class VEXG_EXPORT DcSrv : public ErrorState {
  public:
   /// Starts the thread unless it runs. False, with DcSrvErrorNoThread stored, when the system gives

@@ -6,8 +6,8 @@
 
 namespace lumo::detail {
 
-/// A call into the connection of a source, and what it gives; the result stays as it was made when
-/// there is nothing to call, or when the plug-in throws.
+/// A call into the connection of a source, and its result, which stays as it was made when there is
+/// nothing to call, or when the plug-in throws.
 template <typename Result, typename Body>
 class DcSrvCall final : public DcSrvCmd {
  public:
@@ -31,7 +31,11 @@ Result CallServer(DcSrv* server, std::int32_t code, const char* name, Result ini
   return std::move(call.result);
 }
 
-/// Runs `body(connection)` for the plug-in's connection, when there is one.
+/// Runs `body(connection)` for the plug-in's connection, when there is one. For example, how many
+/// bands a source has:
+///
+///     const auto bands = detail::CallConnection<unsigned>(
+///         server, kBands, "Bands", [](DataConnection& source) { return CountBands(source); });
 template <typename Result, typename Body>
 Result CallConnection(DcSrv* server, std::int32_t code, const char* name, Body&& body,
                       Result initial = Result()) {

@@ -8,7 +8,7 @@
 namespace lumo {
 namespace {
 
-/// What IsAvailable answers; false, with the fault told, for a plug-in that throws.
+/// Gives the answer of IsAvailable; false, with the fault set, for a plug-in that throws.
 bool IsAvailable(DataConnectionFactory& factory) {
   try {
     if (factory.IsAvailable()) return true;

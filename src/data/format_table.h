@@ -10,21 +10,22 @@ namespace lumo {
 
 class DataConnectionFactory;
 
-/// What a format's sources hold.
+/// Names what the sources of a format hold.
 enum class DataSourceKind : std::int32_t { kUnknown = 0, kRaster = 1, kVector = 2 };
 
 /// One row of the table of formats: a format that some plug-in library reads.
 struct FormatRecord {
   String name;            ///< the format's key, compared exactly
   String windowsLibrary;  ///< file names of the plug-in
-  String linuxLibrary;
+  String linuxLibrary;    ///< see LibraryName
   String macLibrary;
-  String driver;  ///< what the plug-in calls the format inside itself; nothing here reads it
-  std::int32_t kind = 0;                     ///< a DataSourceKind
-  void* library = nullptr;                   ///< null until the plug-in is loaded
+  String driver;            ///< the plug-in's own name for the format; nothing here reads it
+  std::int32_t kind = 0;    ///< a DataSourceKind
+  void* library = nullptr;  ///< null until the plug-in is loaded
   DataConnectionFactory* factory = nullptr;  ///< null until the plug-in has made it; see GetFactory
 };
 
+/// Rows of the table.
 inline constexpr std::uint32_t kFormatCount = 27;
 
 /// The table, in the order in which a source of unknown format is offered to its rows. Its names
@@ -44,7 +45,7 @@ using CreateDataConnectionFactoryFunction = DataConnectionFactory*(FormatRecord*
 /// File name of the plug-in of a row on this system.
 VEXG_EXPORT const String& LibraryName(const FormatRecord& record);
 
-/// The array of these pieces.
+/// Makes the array of these pieces: ConnStrings({"TIFF", path}).
 VEXG_EXPORT Array<String> ConnStrings(std::initializer_list<String> pieces);
 
 /// The first piece, in the order of the array, that is a format's key; no text when none is.
@@ -65,9 +66,9 @@ VEXG_EXPORT DataConnectionFactory* FactoryForFormat(const String& name);
 
 /// A format that a plug-in brings beside those of the table.
 struct FormatDescription {
-  const char* name;    ///< the format's key; none of the table, nor of another plug-in
-  const char* driver;  ///< what the plug-in calls the format inside itself
-  DataSourceKind kind;
+  const char* name;     ///< the format's key; none of the table, nor of another plug-in
+  const char* driver;   ///< the plug-in's own name for the format
+  DataSourceKind kind;  ///< of its sources
 };
 
 /// The entry point "DescribeFormats" of a plug-in that brings formats of its own: gives their

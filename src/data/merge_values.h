@@ -12,10 +12,11 @@ namespace lumo {
 // Changes of the statistics and histograms that a source stores, made by one of several that have
 // it open: each takes away only what it has known of, so that what another has stored since stays.
 
-/// Puts statistics into the stored ones.
+/// Puts statistics into the stored ones. A band without any takes its stored ones away, unless
+/// another has replaced them since they were looked at.
 /// @param given   of some bands; one without any stands for none.
-/// @param known   that were stored when they were last looked at.
-/// @param stored  [in, out] by now.
+/// @param known   those that were stored when they were last looked at.
+/// @param stored  [in, out] those that are stored by now.
 template <typename T>
 void MergeStats(const Array<RasterBandStats<T>>& given,
                 const std::map<unsigned, RasterBandStats<T>>& known,
@@ -35,7 +36,11 @@ void MergeStats(const Array<RasterBandStats<T>>& given,
   }
 }
 
-/// Puts histograms in the place of the stored ones that were known.
+/// Puts histograms in the place of the stored ones that were known. Those that another has stored
+/// since stay, behind the given ones.
+/// @param given   all histograms that are to be stored.
+/// @param known   those that were stored when they were last looked at.
+/// @param stored  [in, out] those that are stored by now.
 template <typename T>
 void MergeHistograms(const Array<RasterBandHistogram<T>>& given,
                      const std::vector<RasterBandHistogram<T>>& known,

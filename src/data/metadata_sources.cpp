@@ -5,7 +5,7 @@
 #include "foundation/fault.h"
 #include "foundation/thrown.h"
 
-// What this floor does for Metadata::Open.
+// The part of this floor in Metadata::Open.
 
 namespace lumo {
 namespace {

@@ -13,7 +13,7 @@
 
 namespace lumo {
 
-/// What the two proxies have in common: the source's thread.
+/// Keeps the source's thread for both proxies, and hands each operation to it.
 /// @tparam Base  RasterDataConnection or VectorDataConnection.
 template <typename Base>
 class MtConnection : public Base {
@@ -27,6 +27,7 @@ class MtConnection : public Base {
   /// behind: the source gets an empty one.
   bool Connect(const Array<String>& connStrings, const GeoRefPtr& geoRef,
                const MetadataPtr& metadata) override;
+  /// Closes the source and lets go of its readers; the thread stays for the next one.
   void Disconnect() override;
   bool IsConnected() override;
   /// An array with ArrayErrorInvalidArray stored when there is no thread.

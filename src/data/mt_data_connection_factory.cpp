@@ -14,7 +14,7 @@
 namespace lumo {
 namespace {
 
-/// What `call` gives; its default, with the fault told, when the plug-in throws.
+/// Gives the result of `call`; its default, with the fault set, when the plug-in throws.
 template <typename Call>
 auto Guarded(Call&& call) -> decltype(call()) {
   try {

@@ -8,10 +8,16 @@
 
 namespace lumo {
 
-/// The files that the name of a source stands for, as they were at one moment.
+/// The files that the name of a source stands for, as they were at one moment. A name that stands
+/// for no file has none.
+///
+///     const SourceStamp before(connStrings);
+///     …
+///     if (!before.IsCurrent()) …  // somebody has changed or replaced a file since
 class VEXG_EXPORT SourceStamp {
  public:
   SourceStamp() = default;
+  /// Looks at the files now.
   explicit SourceStamp(const Array<String>& connStrings);
 
   /// True while every file is the same one and has neither changed its size nor its time. A file
@@ -20,10 +26,11 @@ class VEXG_EXPORT SourceStamp {
   /// True while every file is the same one, whatever was written to it.
   bool HasSameFiles() const;
 
+  /// A file as it was.
   struct File {
-    std::string path;
-    URI uri;
-    platform::FileIdentity identity;
+    std::string path;                 ///< as the name has it
+    URI uri;                          ///< with links resolved, see FileURI
+    platform::FileIdentity identity;  ///< which file it is, its size and time
   };
   const std::vector<File>& GetFiles() const { return files_; }
 
@@ -34,6 +41,7 @@ class VEXG_EXPORT SourceStamp {
 /// Counts a source among the open ones while it lives. Held by the proxy of the source.
 class VEXG_EXPORT OpenSource {
  public:
+  /// @param stamp  of the files just before they were opened.
   explicit OpenSource(const SourceStamp& stamp);
   ~OpenSource();
   OpenSource(const OpenSource&) = delete;
@@ -54,6 +62,7 @@ class VEXG_EXPORT SourceClaim {
   SourceClaim(const SourceClaim&) = delete;
   SourceClaim& operator=(const SourceClaim&) = delete;
 
+  /// True when the source may be made.
   bool IsGranted() const { return granted_; }
 
  private:

@@ -5,9 +5,21 @@
 
 namespace lumo {
 
-/// A reader that answers for a source without pyramid, statistics, histograms, palettes and
-/// no-data values, which can't be written: a plug-in overrides what its source has more. What
-/// remains are RasterDef and ReadPixels.
+/// A reader that answers for a source without pyramid, statistics, histograms, palettes and no-data
+/// values, which can't be written: a plug-in overrides what its source has more. What remains are
+/// RasterDef and ReadPixels.
+///
+///     class Reader final : public PlainRasterReader<float> {
+///      public:
+///       using PlainRasterReader::PlainRasterReader;
+///       lumo::RasterDef RasterDef() override { return def_; }
+///       bool ReadPixels(unsigned left, unsigned top, unsigned width, unsigned height,
+///                       const Array<unsigned>& bands, unsigned level, float* pixels,
+///                       unsigned char* state) override;
+///       …
+///     };
+///
+/// examples/plugins/plane_plugin.cpp is a whole plug-in.
 template <typename T>
 class PlainRasterReader : public RasterReader<T> {
  public:
@@ -15,10 +27,12 @@ class PlainRasterReader : public RasterReader<T> {
 
   bool OpBool() override { return true; }
   std::int32_t ReaderType() override { return 0; }
+  /// Size and bands come from RasterDef; each level would halve the size.
   unsigned Samples(unsigned level) override { return this->RasterDef().samples >> level; }
   unsigned Lines(unsigned level) override { return this->RasterDef().lines >> level; }
   unsigned Bands() override { return this->RasterDef().bands; }
 
+  /// No levels.
   std::int32_t PyramidType() override { return 0; }
   std::int32_t PyramidResamplingMethod() override { return 0; }
   std::int32_t PyramidLevelMin() override { return 0; }
@@ -31,6 +45,7 @@ class PlainRasterReader : public RasterReader<T> {
   bool PyramidDelete() override { return false; }
   bool PyramidRefresh() override { return false; }
 
+  /// No statistics or histograms, and no room for any.
   std::int32_t StatsMask() override { return lumo::StatsMask::None; }
   bool StatsExist(unsigned) override { return false; }
   RasterBandStats<T> ReadStats(unsigned) override { return {}; }
@@ -40,6 +55,7 @@ class PlainRasterReader : public RasterReader<T> {
   bool CanWriteHistogram() override { return false; }
   bool WriteHistogram(const Array<RasterBandHistogram<T>>&) override { return false; }
 
+  /// All pixels count, and none stands for a colour.
   bool HasNoDataValue(unsigned) override { return false; }
   T NoDataValue(unsigned) override { return T(); }
   bool CanInheritNoDataValues() override { return false; }
@@ -50,6 +66,7 @@ class PlainRasterReader : public RasterReader<T> {
   bool WritePalette(unsigned, const lumo::Palette&) override { return false; }
   bool DeletePalette(unsigned) override { return false; }
 
+  /// Nothing can be written.
   bool CanWritePixels(unsigned) override { return false; }
   bool WritePixels(unsigned, unsigned, unsigned, unsigned, const Array<unsigned>&, unsigned,
                    const T*, const unsigned char*) override {
@@ -61,10 +78,12 @@ class PlainRasterReader : public RasterReader<T> {
 /// and has to open the source and to say what it is.
 class VEXG_EXPORT PlainRasterConnection : public RasterDataConnection {
  public:
+  /// Nothing is opened here: the factory of the plug-in makes the connection and calls SetOpened.
   bool Connect(const Array<String>&, const GeoRefPtr&, const MetadataPtr&) override {
     return false;
   }
   void Disconnect() override { dispatch_ = RasterReaderDispatchPtr(); }
+  /// True from SetOpened to Disconnect.
   bool IsConnected() override { return bool(dispatch_); }
   Array<String> ConnectionStrings() override { return connStrings_; }
   lumo::URI URI() override { return uri_; }

@@ -14,33 +14,36 @@
 
 namespace lumo {
 
-/// What can be asked of a raster source without its pixel type. Level 0 is the source itself, each
-/// further one a stored reduction. See data_connection.h for threads and failure.
+/// Answers for a raster source what needs no pixel type. Level 0 is the source itself, each further
+/// one a stored reduction. See data_connection.h for threads and failure.
 class VEXG_EXPORT BasicRasterReader {
  public:
   using PointerRoot = BasicRasterReader;
 
-  /// The reader is usable.
+  /// True when the reader is usable.
   virtual bool OpBool() = 0;
   /// The plug-in's own number for this kind of reader; nothing here reads it.
   virtual std::int32_t ReaderType() = 0;
+  /// The description of the source.
   virtual lumo::RasterDef RasterDef() = 0;
-  virtual unsigned Samples(unsigned level) = 0;
-  virtual unsigned Lines(unsigned level) = 0;
-  virtual unsigned Bands() = 0;
+  virtual unsigned Samples(unsigned level) = 0;  ///< pixels of a line of the level
+  virtual unsigned Lines(unsigned level) = 0;    ///< lines of the level
+  virtual unsigned Bands() = 0;                  ///< of every level
 
   virtual std::int32_t PyramidType() = 0;              ///< a lumo::PyramidType
   virtual std::int32_t PyramidResamplingMethod() = 0;  ///< a lumo::PyramidResamplingMethod
-  virtual std::int32_t PyramidLevelMin() = 0;
-  virtual std::int32_t PyramidLevelMax() = 0;
-  virtual bool PyramidExists() = 0;
+  virtual std::int32_t PyramidLevelMin() = 0;          ///< first level stored
+  virtual std::int32_t PyramidLevelMax() = 0;          ///< last level stored
+  virtual bool PyramidExists() = 0;                    ///< levels can be read
   /// Makes the levels `levelMin` to `levelMax`. A source of the type kOrva only gets ready to be
   /// given their pixels: what it held before stays to be read until PyramidRefresh finds them
   /// whole.
   /// @param tiles  how the levels are to be stored: squares of its height.
   virtual bool PyramidBuild(std::int32_t levelMin, std::int32_t levelMax,
                             std::int32_t resamplingMethod, const TileDimensions& tiles) = 0;
+  /// Makes the levels that are there once more, from the pixels as they are now.
   virtual bool PyramidRebuild() = 0;
+  /// Removes the levels. False when there are none, or they can't be removed.
   virtual bool PyramidDelete() = 0;
   /// Shows what the source holds by now, levels that others have made among it.
   virtual bool PyramidRefresh() = 0;
@@ -49,19 +52,28 @@ class VEXG_EXPORT BasicRasterReader {
   virtual std::int32_t StatsMask() = 0;
   /// True when the source holds statistics of the band now.
   virtual bool StatsExist(unsigned band) = 0;
+  /// True when WriteStats can succeed.
   virtual bool CanWriteStats() = 0;
+  /// True when WriteHistogram can succeed.
   virtual bool CanWriteHistogram() = 0;
 
+  /// True when one value marks pixels of the band that aren't valid.
   virtual bool HasNoDataValue(unsigned band) = 0;
   /// True for a source that takes its no-data values from another one, as a pyramid file does.
   virtual bool CanInheritNoDataValues() = 0;
+  /// Takes the values over, for a source that can.
   virtual void InheritNoDataValues(const lumo::RasterDef& from) = 0;
 
+  /// True when the band has a colour table.
   virtual bool HasPalette(unsigned band) = 0;
+  /// The colour table of the band; without colours when it has none.
   virtual lumo::Palette Palette(unsigned band) = 0;
+  /// Stores a colour table for the band.
   virtual bool WritePalette(unsigned band, const lumo::Palette& palette) = 0;
+  /// Removes the colour table of the band.
   virtual bool DeletePalette(unsigned band) = 0;
 
+  /// True when WritePixels can succeed for the level.
   virtual bool CanWritePixels(unsigned level) = 0;
 
   virtual ~BasicRasterReader() = default;
@@ -74,14 +86,19 @@ class RasterReader : public BasicRasterReader {
   /// @param connection  the owner, which outlives the reader.
   explicit RasterReader(RasterDataConnection* connection) : connection_(connection) {}
 
+  /// The connection that owns this reader.
   virtual RasterDataConnection* Connection() { return connection_; }
 
+  /// The stored statistics of a band; mask None when there are none.
   virtual RasterBandStats<T> ReadStats(unsigned band) = 0;
+  /// Stores statistics of some bands, each under its `band`.
   virtual bool WriteStats(const Array<RasterBandStats<T>>& stats) = 0;
   /// The stored histograms of a band; none when the source keeps none.
   virtual Array<RasterBandHistogram<T>> Histogram(unsigned band) = 0;
+  /// Stores histograms of some bands, each under its `band`.
   virtual bool WriteHistogram(const Array<RasterBandHistogram<T>>& histograms) = 0;
 
+  /// The value of pixels that aren't valid; without a meaning unless HasNoDataValue.
   virtual T NoDataValue(unsigned band) = 0;
 
   /// Reads a block in the source's own interleave, the one of RasterDef().
@@ -117,8 +134,8 @@ class RasterReader : public BasicRasterReader {
   /// How often WriteBlock has handed pixels of a level to the source, well or not.
   std::uint64_t WriteCount(unsigned level) const { return writes_[PlaceOf(level)]; }
 
-  // For which number of writes to its raster's pixels the values hold that the source stores: 0
-  // for those that it was opened with, UINT64_MAX for none. Whoever has new ones stored tells it.
+  // The number of writes to its raster's pixels for which the stored values hold: 0 for those that
+  // the source was opened with, UINT64_MAX for none. Whoever has new ones stored sets it.
   std::uint64_t StatsHoldFor() const { return statsHoldFor_; }
   void SetStatsHoldFor(std::uint64_t writes) { statsHoldFor_ = writes; }
   std::uint64_t HistogramsHoldFor() const { return histogramsHoldFor_; }
@@ -147,6 +164,7 @@ using RasterReaderPtr = Pointer<RasterReader<T>>;
 /// Failure: one without a reader has RasterReaderErrorInvalid stored, and type code 0.
 class VEXG_EXPORT RasterReaderDispatch : public ErrorState {
  public:
+  /// A dispatch without a reader.
   RasterReaderDispatch() { SetErrorState(RasterReaderErrorInvalid()); }
 
   template <typename T>

@@ -4,7 +4,7 @@
 
 namespace lumo {
 
-/// What the features of a vector source are.
+/// Names what the features of a vector source are.
 enum class VectorGeometry : std::int32_t { kUnknown = 0, kPoint = 1, kLine = 2, kPolygon = 3 };
 
 /// The description of a vector source: a value, whose copy has a geo-reference of its own.
@@ -17,11 +17,11 @@ struct VEXG_EXPORT VectorDef {
   ~VectorDef() = default;
 
   VectorGeometry geometry = VectorGeometry::kUnknown;
-  String format = "Unknown";
-  GeoRefPtr geoRef;       ///< carries the coordinate system; empty when there is none
-  unsigned dataType = 5;  ///< code of the coordinate type
-  unsigned features = 0;  ///< how many the source holds
-  MapRect bounds;         ///< of all features, in the source's coordinates
+  String format = "Unknown";  ///< the format's key
+  GeoRefPtr geoRef;           ///< carries the coordinate system; empty when there is none
+  unsigned dataType = 5;      ///< code of the coordinate type
+  unsigned features = 0;      ///< how many the source holds
+  MapRect bounds;             ///< of all features, in the source's coordinates
 };
 
 }  // namespace lumo

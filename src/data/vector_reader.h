@@ -8,16 +8,17 @@
 
 namespace lumo {
 
-/// What can be asked of a vector source without its coordinate type. See data_connection.h for
-/// threads and failure.
+/// Answers for a vector source what needs no coordinate type. See data_connection.h for threads and
+/// failure.
 class VEXG_EXPORT BasicVectorReader {
  public:
   using PointerRoot = BasicVectorReader;
 
-  /// The reader is usable.
+  /// True when the reader is usable.
   virtual bool OpBool() = 0;
   /// The plug-in's own number for this kind of reader; nothing here reads it.
   virtual std::int32_t ReaderType() = 0;
+  /// The description of the source.
   virtual lumo::VectorDef VectorDef() = 0;
   /// Vertices of all features together.
   virtual std::int32_t Vertices() = 0;
@@ -30,13 +31,21 @@ class VEXG_EXPORT BasicVectorReader {
 /// each has one or more parts (the rings of polygons, outer and inner, each closed), and a vertex
 /// is a pair x, y in the source's coordinate system.
 ///
-/// All buffers belong to the caller. GetFeatureInfo and Vertices tell how large they have to be.
+/// All buffers belong to the caller. GetFeatureInfo and Vertices say how large they have to be:
+///
+///     std::int32_t kind = 0;
+///     unsigned parts = 0, count = 0;
+///     if (!reader->GetFeatureInfo(feature, &kind, &parts, &count)) return false;
+///     std::vector<double> vertices(2 * count);
+///     std::vector<unsigned> partEnds(parts);
+///     if (!reader->ReadGeometryT1(feature, vertices.data(), partEnds.data())) return false;
 template <typename T>
 class VectorReader : public BasicVectorReader {
  public:
   /// @param connection  the owner, which outlives the reader.
   explicit VectorReader(VectorDataConnection* connection) : connection_(connection) {}
 
+  /// The connection that owns this reader.
   virtual VectorDataConnection* Connection() { return connection_; }
 
   /// Reads all features, one after the other.

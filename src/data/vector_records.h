@@ -9,11 +9,15 @@
 #include "foundation/pointer.h"
 #include "georef/coordsys.h"
 
-// Records of shapes with fields, one after the other: what vector files of every GIS hold. Beside
-// VectorReader, which knows shapes without fields.
+// Records of shapes with fields, one after the other, as vector files of every GIS hold them. They
+// stand beside VectorReader, which knows shapes without fields.
+//
+//     const VectorRecordSourcePtr file = GetVectorRecordFactory()->Open(path);
+//     if (!file || !file->Begin(0, nullptr)) return false;
+//     for (VectorRecord record; file->Next(record);) Use(record);
 //
 // Threads: one at a time; a source and a sink stay on the thread that made them or move with it.
-// Failure: false or empty, with SetFault telling why.
+// Failure: false or empty, with the reason set by SetFault.
 
 namespace lumo {
 
@@ -59,12 +63,14 @@ class VEXG_EXPORT VectorRecordSource {
  public:
   using PointerRoot = VectorRecordSource;
 
+  /// Layers of the file.
   virtual std::uint32_t LayerCount() = 0;
+  /// The description of a layer, from 0.
   virtual VectorLayer Layer(std::uint32_t layer) = 0;
   /// Begins to read a layer.
   /// @param box  gives only records whose bounds touch it; null for all.
   virtual bool Begin(std::uint32_t layer, const MapRect* box) = 0;
-  /// Reads the next record. @return false at the end, and, with the fault told, on a failure.
+  /// Reads the next record. @return false at the end, and, with the fault set, on a failure.
   virtual bool Next(VectorRecord& record) = 0;
   virtual ~VectorRecordSource() = default;
 };
@@ -79,7 +85,7 @@ class VEXG_EXPORT VectorRecordSink {
 
   /// Writes a record with a value for each field of the layer.
   virtual bool Write(const VectorRecord& record) = 0;
-  /// Completes the file.
+  /// Completes the file, and puts it in its place. Nothing is written after that.
   virtual bool Close() = 0;
   virtual ~VectorRecordSink() = default;
 };

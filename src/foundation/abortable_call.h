@@ -15,15 +15,19 @@ namespace lumo {
 
 /// Runs a call that may block for ever, as the opening of a file does, so that an abort ends the
 /// wait for it: the call runs on a thread of its own, and whoever asked goes on without it when the
-/// flag is raised. What the call gives then is dropped on its thread, whenever that is.
+/// flag is raised. A result that comes after that is dropped on the call's thread, whenever that
+/// is.
 ///
-/// The flag may lie in memory of another process, which can't wake anybody: it is looked at every
-/// now and then.
+/// The flag may lie in memory of another process, which can't wake anybody, so it is looked at
+/// every 20 ms. Where no thread can be had the call runs on this one, and can't be given up.
+///
+///     std::string text;
+///     const bool read = RunAbortable<std::string>(
+///         *ipc.abort, [path] { return ReadAll(path); }, text);  // `path` is copied into the call
 ///
 /// @param call    holds copies of all that it uses. An exception of it gives no result.
-/// @param result  [out] what the call gives; stays as it is otherwise. The call's fault text
-/// becomes
-///                this thread's.
+/// @param result  [out] the call's result, or a default one after an exception; unchanged when the
+///             wait was given up. The call's fault text becomes this thread's.
 /// @return false when the wait was given up.
 template <typename Result>
 bool RunAbortable(const AbortFlag& abort, std::function<Result()> call, Result& result) {

@@ -44,13 +44,15 @@ std::istream& operator>>(std::istream& in, Complex<T>& value) {
 
 /// The shape of an array: up to eight dimensions, the last the fastest in storage.
 struct VEXG_EXPORT ArrayDims {
+  /// The most dimensions that an array can have.
   static constexpr unsigned kMaxRank = 8;
 
   unsigned extent[kMaxRank] = {1, 1, 1, 1, 1, 1, 1, 1};  ///< unused dimensions hold 1
   unsigned rank = 0;                                     ///< dimensions in use, 0 to 8
-  unsigned count =
-      0;  ///< product of the extents, 0 for rank 0; kTooMany when 32 bits can't hold it
+  /// Product of the extents, 0 for rank 0; kTooMany when 32 bits can't hold it.
+  unsigned count = 0;
 
+  /// The count of a shape whose elements 32 bits can't count: no array can have it.
   static constexpr unsigned kTooMany = 0xFFFFFFFF;
 
   ArrayDims() = default;
@@ -58,12 +60,14 @@ struct VEXG_EXPORT ArrayDims {
   /// is not 0; a zero before it counts as 1.
   explicit ArrayDims(unsigned e0, unsigned e1 = 0, unsigned e2 = 0, unsigned e3 = 0,
                      unsigned e4 = 0, unsigned e5 = 0, unsigned e6 = 0, unsigned e7 = 0);
+  /// The same from a list of eight extents.
   explicit ArrayDims(const unsigned (&extents)[kMaxRank]);
 
   friend bool operator==(const ArrayDims&, const ArrayDims&) = default;
 };
 
-/// What the arrays of all element types have in common: one type code.
+/// Gives the arrays of all element types one type code, so that IsA finds an Array among Objects
+/// but not its element type.
 class VEXG_EXPORT ArrayObject : public Object {
  public:
   static const unsigned TypeCode;
@@ -77,12 +81,19 @@ class VEXG_EXPORT ArrayObject : public Object {
 /// it can only change shape. Its capacity never shrinks, so an array that is re-shaped in a loop
 /// allocates once. Elements of plain data are not initialised; others are constructed.
 ///
+///     Array<float> block(ArrayDims(lines, samples));
+///     if (!block.IsValid()) return false;                    // there was no memory
+///     block[line * block.GetExtent(1) + sample] = 1.0F;
+///     Array<float> view(pixels, ArrayDims(lines, samples));  // wraps `pixels`, copies nothing
+///
+/// Cost:    a copy of an owning array copies every element; a move trades the storage.
 /// Threads: like a standard container: many readers or one writer.
 /// Failure: an allocation that fails leaves an empty array with ObjectErrorOutOfMemory stored;
 ///          IsValid() is then false. Element access is not checked.
 template <typename T>
 class Array : public ArrayObject {
  public:
+  /// An empty array of rank 0 that owns its elements and can grow.
   Array() = default;
 
   /// Allocates `dims.count` elements.
@@ -94,9 +105,12 @@ class Array : public ArrayObject {
 
   /// Copies the elements of an array that owns them; wraps the same memory as one that doesn't.
   Array(const Array& other) : ArrayObject(other) { CopyFrom(other); }
+  /// Takes the elements over, wrapped ones too; `other` is left empty.
   Array(Array&& other) noexcept { Swap(other); }
   ~Array() override { Release(); }
 
+  /// Becomes a copy as the copy constructor makes it; memory that was wrapped before is let go, not
+  /// written.
   Array& operator=(const Array& other) {
     if (this == &other) return *this;
     Release();
@@ -104,27 +118,34 @@ class Array : public ArrayObject {
     CopyFrom(other);
     return *this;
   }
+  /// Trades elements, shape and error state with `other`.
   Array& operator=(Array&& other) noexcept {
     Swap(other);
     return *this;
   }
 
-  /// Changes the shape; the elements at the start of the storage stay.
+  /// Changes the shape; the elements at the start of the storage stay, in storage order. It
+  /// allocates only when the new count is above the capacity.
   /// @return false when memory that isn't owned is too small, with no change; or when an allocation
-  ///         failed: the array is then empty, and ObjectErrorOutOfMemory is stored unless the array
-  ///         had no elements asked of it.
+  ///          failed: the array is then empty, with ObjectErrorOutOfMemory stored.
   bool Resize(const ArrayDims& dims);
 
+  /// Number of elements: the product of the extents.
   unsigned GetCount() const { return dims_.count; }
+  /// Dimensions in use, 0 to 8; 0 for an empty array.
   unsigned GetRank() const { return dims_.rank; }
   /// Size of dimension `index`, 0 to 7; 1 for a dimension that isn't in use.
   unsigned GetExtent(unsigned index) const { return dims_.extent[index]; }
   const ArrayDims& GetDims() const { return dims_; }
+  /// Elements up to which Resize needs no allocation.
   unsigned GetCapacity() const { return capacity_; }
+  /// False for an array that wraps memory of somebody else.
   bool OwnsData() const { return ownsData_ != 0; }
 
+  /// The first element; null for an array that never had any.
   T* GetData() { return data_; }
   const T* GetData() const { return data_; }
+  /// The element at a place of the storage, which has to be below GetCount(): nothing checks it.
   T& operator[](std::size_t index) { return data_[index]; }
   const T& operator[](std::size_t index) const { return data_[index]; }
 
@@ -262,26 +283,37 @@ std::istream& operator>>(std::istream& in, Array<T>& array) {
 
 /// Inverse of a square matrix, GetExtent(0) rows by GetExtent(1) columns; of one that isn't square,
 /// of its leading square. LU decomposition by Crout's method with implicit partial pivoting (Press
-/// et al., Numerical Recipes, section 2.3).
+/// et al., Numerical Recipes, section 2.3); a pivot of 0 counts as 1e-20. The cost grows with the
+/// cube of the rows.
 /// @return an array of the same shape; one with MatrixErrorSingular stored when a row holds only
-///         zeros.
+///          zeros.
 VEXG_EXPORT Array<double> Inverse(const Array<double>& matrix);
 
-/// What the jagged arrays of all element types have in common: one type code.
+/// Gives the jagged arrays of all element types one type code.
 class VEXG_EXPORT JaggedArrayObject : public Object {
  public:
   static const unsigned TypeCode;
   bool IsA(unsigned typeCode) const override;
 };
 
-/// Rows of uneven length, each an array of its own.
+/// Rows of uneven length, each an array of its own. A new one has empty rows; each is sized by
+/// itself:
+///
+///     JaggedArray2D<unsigned> neighbours(regions);
+///     neighbours.Row(region).Resize(ArrayDims(count));
+///
+/// Failure: IsValid() is false when the rows could not be allocated; a row that could not be sized
+///          has its own error state.
 template <typename T>
 class JaggedArray2D : public JaggedArrayObject {
  public:
+  /// @param rows  how many there are from now on; they begin empty.
   explicit JaggedArray2D(unsigned rows) : rows_(ArrayDims(rows)) {}
 
   bool IsValid() const override { return Object::IsValid() && rows_.IsValid(); }
+  /// How many rows there are, empty ones among them.
   unsigned GetRowCount() const { return rows_.GetCount(); }
+  /// The row `index`, from 0, which has to be there.
   Array<T>& Row(unsigned index) { return rows_[index]; }
   const Array<T>& Row(unsigned index) const { return rows_[index]; }
 

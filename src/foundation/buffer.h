@@ -12,20 +12,21 @@
 
 namespace lumo {
 
-/// What the buffers of all element types have in common: the file, its header block, and the window
-/// as bytes. See Buffer.
+/// Holds for the buffers of all element types the file, its header block, and the window as bytes.
+/// See Buffer.
 class VEXG_EXPORT BasicBuffer : public Object {
  public:
   static const unsigned TypeCode;
 
+  /// How a file is opened.
   enum Mode : unsigned {
-    kReadOnly = 0,
-    kReadWrite = 1,
-    kCreate = 2,  ///< cuts a file that is there to nothing
+    kReadOnly = 0,   ///< reads only; a write is a warning, and is lost
+    kReadWrite = 1,  ///< reads and writes what is there
+    kCreate = 2,     ///< cuts a file that is there to nothing
   };
 
   static constexpr unsigned kHeaderSize = 1024;        ///< bytes
-  static constexpr unsigned kPageSize = 1024;          ///< elements, unless told otherwise
+  static constexpr unsigned kPageSize = 1024;          ///< elements, the default
   static constexpr unsigned kMargin = 1024;            ///< elements of a window beside its page
   static constexpr unsigned kLargeHeaderSize = 65536;  ///< bytes
 
@@ -138,6 +139,10 @@ class VEXG_EXPORT BasicBuffer : public Object {
 ///          when the file can't be opened, read or written. Nothing is done under an error.
 ///          References that Ref and At give then lead to an element of no file, which is 0 at
 ///          first.
+///
+///     Buffer<double> areas(path, ArrayDims(regions));  // creates the file
+///     for (unsigned i = 0; i < regions; ++i) areas.Ref(i) = area[i];
+///     if (!areas.Close()) return false;                // TakeFault() says why
 template <typename T>
 class Buffer final : public BasicBuffer {
   static_assert(std::is_trivially_copyable_v<T> && alignof(T) <= alignof(std::max_align_t));

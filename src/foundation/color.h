@@ -10,11 +10,13 @@ namespace lumo {
 
 /// One row of the table of named colours.
 struct NamedColor {
+  /// Its name, in lower case.
   const char* name;
   std::uint32_t value;  ///< red in the lowest byte, then green, blue and alpha
   bool isNull;
 };
 
+/// Rows of the table of named colours.
 inline constexpr unsigned kNamedColorCount = 146;
 
 /// The named colours in their fixed order; the last is "null", the only one with the null flag.
@@ -28,18 +30,20 @@ class VEXG_EXPORT Color {
 
   /// The colour "null": all components 0 and the null flag set.
   Color();
+  /// A colour that is not "null". The name is free: nothing looks the components up in the table.
+  /// @param red,green,blue,alpha  0 to 255; an alpha of 255 is opaque.
   Color(const String& colorName, std::uint8_t red, std::uint8_t green, std::uint8_t blue,
         std::uint8_t alpha = 255);
   Color(const Color&) = default;
   Color& operator=(const Color&) = default;
   virtual ~Color() = default;
 
-  String name;
-  std::uint8_t r = 0;
-  std::uint8_t g = 0;
-  std::uint8_t b = 0;
-  std::uint8_t a = 0;
-  bool isNull = true;
+  String name;         ///< one word: the text form ends it at a blank
+  std::uint8_t r = 0;  ///< red
+  std::uint8_t g = 0;  ///< green
+  std::uint8_t b = 0;  ///< blue
+  std::uint8_t a = 0;  ///< alpha, 255 opaque
+  bool isNull = true;  ///< stands for no colour
 };
 
 using ColorPtr = Pointer<Color>;
@@ -47,7 +51,9 @@ using ColorPtr = Pointer<Color>;
 /// The table's colour of that name, compared exactly; the colour "null" for a name not in it.
 VEXG_EXPORT Color FindNamedColor(const String& name);
 
+/// Writes the text form of a colour, without a blank behind it.
 VEXG_EXPORT std::ostream& operator<<(std::ostream& out, const Color& color);
+/// Reads the text form. A component that is no number from 0 to 255 becomes 0 and fails the stream.
 VEXG_EXPORT std::istream& operator>>(std::istream& in, Color& color);
 
 /// The colour table of a band. Its text form is the count, " [", then "(" colour ") " for each
@@ -85,6 +91,7 @@ class VEXG_EXPORT Palette {
 
 using PalettePtr = Pointer<Palette>;
 
+/// Writes the text form; an index below the count without a colour is written as "null".
 VEXG_EXPORT std::ostream& operator<<(std::ostream& out, const Palette& palette);
 
 /// Reads what operator<< writes into an emptied palette. A text that breaks off gives colours

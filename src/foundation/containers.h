@@ -35,17 +35,24 @@ bool Guarded(ErrorState& container, Work&& work) {
 
 }  // namespace detail
 
+/// Gives the maps of all types one type code.
 class VEXG_EXPORT MapObject : public Object {
  public:
   static const unsigned TypeCode;
   bool IsA(unsigned typeCode) const override;
 };
 
-/// An ordered map with a default value, which a lookup of an absent key gives.
+/// An ordered map with a default value, which a lookup of an absent key gives. A lookup takes a
+/// number of compares that grows with the logarithm of the count.
+///
+///     Map<String, unsigned> codes(kUnknown);
+///     codes[String("water")] = 1;
+///     const unsigned code = codes.Find(String("forest"));  // kUnknown; adds no entry
 template <typename K, typename V>
 class Map : public MapObject {
  public:
   Map() = default;
+  /// @param defaultValue  is copied; lookups of absent keys give it from then on.
   explicit Map(const V& defaultValue) : defaultValue_(defaultValue) {}
 
   /// The value of `key`, made as a copy of the default when absent. When it can't be made the error
@@ -63,12 +70,16 @@ class Map : public MapObject {
     return at != map_.end() ? at->second : defaultValue_;
   }
 
+  /// True when the key has a value of its own, be it equal to the default.
   bool HasKey(const K& key) const { return map_.find(key) != map_.end(); }
+  /// Takes the key out; nothing for an absent one.
   void Remove(const K& key) { map_.erase(key); }
+  /// Number of keys.
   unsigned GetCount() const { return static_cast<unsigned>(map_.size()); }
+  /// Takes all keys out; the default stays.
   void Clear() { map_.clear(); }
 
-  /// All keys, in order.
+  /// All keys, in ascending order; an invalid array when there is no memory for it.
   Array<K> GetKeys() const {
     Array<K> keys{ArrayDims(GetCount())};
     K* next = keys.begin();
@@ -78,6 +89,7 @@ class Map : public MapObject {
     return keys;
   }
 
+  /// Iterators over pairs of key and value, in ascending order of the keys.
   auto begin() { return map_.begin(); }
   auto end() { return map_.end(); }
   auto begin() const { return map_.begin(); }
@@ -89,8 +101,11 @@ class Map : public MapObject {
   V unplaced_ = V();
 };
 
-/// A Map that enters its lock for each of its operations. References that it gives are safe only
-/// while the caller holds Lock().
+/// A Map that enters its lock for each of its operations, so that threads may share it. References
+/// that it gives, and its iterators, are safe only while the caller holds Lock():
+///
+///     const MutexLock lock = map.Lock();
+///     for (const auto& [key, value] : map) …
 template <typename K, typename V>
 class LockableMap : public Map<K, V>, public Lockable {
   using Base = Map<K, V>;
@@ -128,13 +143,14 @@ class LockableMap : public Map<K, V>, public Lockable {
   }
 };
 
+/// Gives the sets of all types one type code.
 class VEXG_EXPORT SetObject : public Object {
  public:
   static const unsigned TypeCode;
   bool IsA(unsigned typeCode) const override;
 };
 
-/// An ordered set.
+/// An ordered set, iterated in ascending order.
 template <typename T>
 class Set : public SetObject {
  public:
@@ -142,7 +158,9 @@ class Set : public SetObject {
   bool Insert(const T& value) {
     return detail::Guarded(*this, [&] { set_.insert(value); });
   }
+  /// True when an equal value is in the set.
   bool Contains(const T& value) const { return set_.find(value) != set_.end(); }
+  /// Takes the value out; nothing for an absent one.
   void Remove(const T& value) { set_.erase(value); }
   unsigned GetCount() const { return static_cast<unsigned>(set_.size()); }
 
@@ -153,19 +171,22 @@ class Set : public SetObject {
   std::set<T> set_;
 };
 
+/// Gives the lists of all types one type code.
 class VEXG_EXPORT ListObject : public Object {
  public:
   static const unsigned TypeCode;
   bool IsA(unsigned typeCode) const override;
 };
 
-/// A doubly linked list.
+/// A doubly linked list: elements stay where they are in memory while others come and go.
 template <typename T>
 class List : public ListObject {
  public:
+  /// Puts a copy at the end. False when there is no memory.
   bool PushBack(const T& value) {
     return detail::Guarded(*this, [&] { list_.push_back(value); });
   }
+  /// Puts a copy at the front. False when there is no memory.
   bool PushFront(const T& value) {
     return detail::Guarded(*this, [&] { list_.push_front(value); });
   }
@@ -185,19 +206,22 @@ class List : public ListObject {
   std::list<T> list_;
 };
 
+/// Gives the deques of all types one type code.
 class VEXG_EXPORT DequeObject : public Object {
  public:
   static const unsigned TypeCode;
   bool IsA(unsigned typeCode) const override;
 };
 
-/// A double-ended queue.
+/// A double-ended queue, whose ends grow and shrink in constant time.
 template <typename T>
 class Deque : public DequeObject {
  public:
+  /// Puts a copy at the end. False when there is no memory.
   bool PushBack(const T& value) {
     return detail::Guarded(*this, [&] { deque_.push_back(value); });
   }
+  /// Puts a copy at the front. False when there is no memory.
   bool PushFront(const T& value) {
     return detail::Guarded(*this, [&] { deque_.push_front(value); });
   }
@@ -228,6 +252,7 @@ class Deque : public DequeObject {
 template <typename T>
 class Stack : public Deque<T> {
  public:
+  /// Puts a copy on top. False when there is no memory.
   bool Push(const T& value) { return this->PushBack(value); }
   /// Drops the top; nothing on an empty stack.
   void Pop() { this->PopBack(); }

@@ -6,11 +6,12 @@ namespace lumo {
 
 /// Key of a Context: case-sensitive text.
 struct ContextKey {
+  /// Compared unit by unit.
   String text;
   friend bool operator<(const ContextKey& a, const ContextKey& b) { return a.text < b.text; }
 };
 
-/// Value of a Context.
+/// Value of a Context, which its holder may write.
 struct ContextValue {
   String text;
 };
@@ -40,8 +41,12 @@ class VEXG_EXPORT Context : public Object {
   Map<ContextKey, ContextValue> values_;
 };
 
-/// What a host tells the library about its surroundings. It is filled before the first operation
-/// and only read after that.
+/// Names the directories that the library reads from. The host fills the environment before the
+/// first operation, and after that it is only read:
+///
+///     GetGlobalEnvironmentImpl()[Environment::kMdfDirectory].text = String("/opt/vexg/mdf");
+///     InitEnvironment();  // the rest by itself
+///
 /// Threads: no lock. Reading a key that the host left out makes it, so a host sets all keys first.
 class VEXG_EXPORT Environment : public Object {
  public:
@@ -62,7 +67,7 @@ class VEXG_EXPORT EnvironmentImpl : public Context {};
 VEXG_EXPORT EnvironmentImpl& GetGlobalEnvironmentImpl();
 
 /// Fills the directories of the environment that nobody has set, as far as they can be found, for a
-/// program that has no surroundings of its own to tell of:
+/// program that has none of its own to name:
 ///   kBinDirectory   the folder of this library, where its plug-ins lie;
 ///   kMdfDirectory   "share/vexg/mdf" as it is built and installed beside the library;
 ///   kXmlDirectory   "share/vexg";

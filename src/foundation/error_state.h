@@ -22,6 +22,7 @@ class VEXG_EXPORT ObjectErrorState {
   explicit ObjectErrorState(unsigned code = 0) : code_(code) {}
   virtual ~ObjectErrorState() = default;
 
+  /// The severity of the class with this object's code.
   virtual ErrorStateValue GetState() const { return {kSeverityNone, code_}; }
 
  protected:
@@ -45,10 +46,16 @@ class VEXG_EXPORT ObjectWarning : public ObjectErrorState {
 /// Root of whatever can fail. An operation that fails stores the state of an error value here and
 /// then returns false, a null pointer or an empty value; the state stays until it is cleared.
 /// Threads: no protection; an object is used by one thread at a time unless its class says more.
+///
+///     if (!buffer.Flush() && buffer.GetErrorState().code == ObjectErrorIO::Code) …
+///
+/// A success doesn't clear the state of an earlier failure. The reason in words is not kept here
+/// but with the thread, see fault.h.
 class VEXG_EXPORT ErrorState {
  public:
   virtual ~ErrorState() = default;
 
+  /// The state that was stored last; severity and code 0 when there is none.
   ErrorStateValue GetErrorState() const { return {severity_, code_}; }
 
   /// True when the stored severity has the error bit.
@@ -66,6 +73,7 @@ class VEXG_EXPORT ErrorState {
     std::swap(code_, other.code_);
   }
 
+  /// Forgets the state: the object is valid again, as far as this goes.
   void ClearErrorState() { SetErrorState(ObjectErrorState()); }
 
  private:

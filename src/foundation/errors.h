@@ -13,25 +13,26 @@ struct VEXG_EXPORT ObjectErrorOutOfMemory : ObjectError {
   static const unsigned Code;
 };
 
-/// An object whose constructor could not complete is used.
+/// An object is used whose constructor could not complete, or whose arguments were missing.
 struct VEXG_EXPORT ObjectErrorNotConstructed : ObjectError {
   ObjectErrorNotConstructed() : ObjectError(Code) {}
   static const unsigned Code;
 };
 
-/// Reading or writing a file, an XML document or a buffer failed.
+/// Reading or writing a file, an XML document or a buffer failed; the fault text says which and
+/// why.
 struct VEXG_EXPORT ObjectErrorIO : ObjectError {
   ObjectErrorIO() : ObjectError(Code) {}
   static const unsigned Code;
 };
 
-/// A piece of asynchronous work could not be run.
+/// A piece of asynchronous work threw, failed, or got no thread to run on.
 struct VEXG_EXPORT AsyncErrorExecuteFailed : ObjectError {
   AsyncErrorExecuteFailed() : ObjectError(Code) {}
   static const unsigned Code;
 };
 
-/// An array operation met an array that is not valid.
+/// An array operation met an array that is not valid, or a text that is no array.
 struct VEXG_EXPORT ArrayErrorInvalidArray : ObjectError {
   ArrayErrorInvalidArray() : ObjectError(Code) {}
   static const unsigned Code;

@@ -8,7 +8,7 @@
 namespace lumo {
 namespace {
 
-/// Faults beyond these tell nothing new.
+/// Faults beyond these say nothing new.
 constexpr std::size_t kMaxKept = 64;
 
 thread_local std::vector<FileFault> tFaults;

@@ -17,16 +17,20 @@ VEXG_EXPORT const char* GetLibraryVersion();
 /// The scheduler's own number of threads for this machine; LUMO_THREADS_HINT does not change it.
 VEXG_EXPORT std::int32_t GetProcessingCores();
 
-/// What the environment variable LUMO_THREADS_HINT said when the library was loaded: the number of
-/// threads that the scheduler may use, 1 or more; -1 for "automatic", which stands for a variable
-/// that is not set, not a number, or under 1.
+/// The value of the environment variable LUMO_THREADS_HINT when the library was loaded: the number
+/// of threads that the scheduler may use, 1 or more; -1 for "automatic", which stands for a
+/// variable that is not set, not a number, or under 1.
 VEXG_EXPORT std::int32_t GetThreadsHint();
 
 /// Wall-clock seconds since the library was loaded.
 VEXG_EXPORT double WallSeconds();
 
-/// One step of VEXInit. A floor that has something to make there defines a static one; the step
-/// looks itself whether its work is done already. Steps run in the order of their numbers.
+/// One step of VEXInit. A floor that has something to make there defines a static one, in a source
+/// file of its own; the step looks itself whether its work is done already:
+///
+///     const InitStep step(20, [] { GetGlobalDataMap(); });
+///
+/// Steps run in the order of their numbers.
 class VEXG_EXPORT InitStep {
  public:
   InitStep(unsigned order, void (*run)());

@@ -4,8 +4,8 @@
 
 #include <oneapi/tbb/queuing_rw_mutex.h>
 
-// The scheduler's library is not built for the thread sanitizer, so what its mutex orders is told
-// to the sanitizer here.
+// The scheduler's library is not built for the thread sanitizer, so the order that its mutex makes
+// is shown to the sanitizer here.
 #if defined(__SANITIZE_THREAD__)
 #include <sanitizer/tsan_interface.h>
 #define VEXG_TSAN(call) call

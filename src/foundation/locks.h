@@ -7,7 +7,7 @@
 
 namespace lumo {
 
-/// Root of the scoped locks: held from construction to destruction.
+/// Holds a lock from its construction to its destruction: the root of the scoped locks.
 class VEXG_EXPORT PrivateLock {
  public:
   virtual ~PrivateLock() = default;
@@ -25,9 +25,11 @@ class VEXG_EXPORT PrivateLock {
   PrivateLock() = default;
 };
 
-/// Holds a recursive mutex: the thread that holds it may enter it again.
+/// Holds a recursive mutex: the thread that holds it may enter it again. It blocks until the mutex
+/// is free, without a bound in time.
 class VEXG_EXPORT MutexLock : public PrivateLock {
  public:
+  /// @param mutex  outlives the lock.
   explicit MutexLock(std::recursive_mutex& mutex) : mutex_(&mutex) { mutex_->lock(); }
   ~MutexLock() override { mutex_->unlock(); }
 
@@ -35,13 +37,18 @@ class VEXG_EXPORT MutexLock : public PrivateLock {
   std::recursive_mutex* mutex_;
 };
 
-/// Mixin of the classes that guard themselves by one recursive mutex.
+/// Mixin of the classes that guard themselves by one recursive mutex. An operation that holds it
+/// may call others of the same object that take it too.
+///
+///     const MutexLock lock = table.Lock();  // several operations as one
+///     if (!table.HasKey(key)) table[key] = value;
 class VEXG_EXPORT Lockable {
  public:
   Lockable() = default;
   Lockable(const Lockable&) {}  // a copy has a mutex of its own
   Lockable& operator=(const Lockable&) { return *this; }
 
+  /// Enters the mutex; it is left when the result goes.
   MutexLock Lock() const { return MutexLock(mutex_); }
 
  private:
@@ -49,7 +56,8 @@ class VEXG_EXPORT Lockable {
 };
 
 /// A fair read-write mutex: waiting threads are served in the order in which they came. It is not
-/// recursive. Used through QueuingRWMutexLock.
+/// recursive. Used through QueuingRWMutexLock. Many may hold it for reading, or one for writing. A
+/// thread that enters it twice waits for itself.
 class VEXG_EXPORT QueuingRWMutex {
  public:
   QueuingRWMutex();
@@ -64,8 +72,15 @@ class VEXG_EXPORT QueuingRWMutex {
 };
 
 /// Holds a QueuingRWMutex for reading or for writing.
+///
+///     QueuingRWMutexLock lock(mutex, false);  // to read
+///     if (cache.Has(key)) return cache.At(key);
+///     lock.UpgradeToWriter();                 // others may have been here: look again
+///     if (!cache.Has(key)) cache.Make(key);
 class VEXG_EXPORT QueuingRWMutexLock : public PrivateLock {
  public:
+  /// @param mutex  outlives the lock.
+  /// @param write  false to share it with other readers.
   explicit QueuingRWMutexLock(QueuingRWMutex& mutex, bool write = true);
   ~QueuingRWMutexLock() override;
 

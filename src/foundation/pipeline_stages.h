@@ -24,6 +24,8 @@ class IPipelineProcess {
   virtual bool IsParallel() const = 0;
   /// True when items must pass in the order in which they were read.
   virtual bool IsOrdered() const = 0;
+  /// Makes the item for the next stage, on any worker. Null is no item, and what comes of it is up
+  /// to the runner.
   virtual U* Process(T* item) = 0;
   virtual ~IPipelineProcess() = default;
 };
@@ -36,6 +38,7 @@ class ISimplePipelineProcess : public IPipelineProcess<T, T> {};
 template <typename T>
 class IPipelineWriter {
  public:
+  /// Takes an item out of the pipeline. False when it could not be used.
   virtual bool Write(T* item) = 0;
   virtual ~IPipelineWriter() = default;
 };

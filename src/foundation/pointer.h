@@ -9,12 +9,13 @@
 
 namespace lumo {
 
-/// What the Pointers to one object share. An empty Pointer has one too, with a null object.
+/// Holds the state that the Pointers to one object share. An empty Pointer has one too, with a null
+/// object.
 struct ControlBlock {
-  std::atomic<unsigned> count{1};  ///< Pointers that share this block
-  void* object = nullptr;          ///< address of the object's root base, see PointerRoot
-  bool noDelete = false;           ///< the object belongs to somebody else
-  void (*destroy)(void*) = nullptr;
+  std::atomic<unsigned> count{1};    ///< Pointers that share this block
+  void* object = nullptr;            ///< address of the object's root base, see PointerRoot
+  bool noDelete = false;             ///< the object belongs to somebody else
+  void (*destroy)(void*) = nullptr;  ///< deletes the object by its root base
 };
 
 /// Base of the classes whose objects can give out a Pointer to themselves, as work does that
@@ -61,6 +62,13 @@ using PointerRoot = typename decltype(FindPointerRoot<T>())::type;
 /// Two Pointers made from one raw pointer do not know of each other; sharing goes through copying.
 /// `XPtr` stands for Pointer<X>.
 ///
+///     const RasterPtr<float> floats(raster);  // shares `raster` where its pixels are float
+///     if (floats.IsNull()) return false;      // they are of another type
+///     const ColorPtr wrapped(&color, true);   // `color` stays its owner's
+///
+/// Cost:      a Pointer has the size of a pointer and a table of virtual functions; its block is
+/// one
+///            allocation more, which an empty Pointer makes too. A copy is one atomic addition.
 /// Ownership: a raw pointer given to the constructor changes hands, unless `noDelete` is set, which
 ///            wraps an object that belongs to somebody else and outlives the Pointer.
 /// Threads:   only the count is protected. Copies may live on different threads; one Pointer may
@@ -68,9 +76,13 @@ using PointerRoot = typename decltype(FindPointerRoot<T>())::type;
 template <typename T>
 class Pointer {
  public:
+  /// An empty Pointer.
   Pointer() : block_(new ControlBlock) {}
   Pointer(std::nullptr_t) : Pointer() {}
+  /// Takes over `object`, which no other Pointer may own, or wraps it. When there is no memory for
+  /// the block an object that was to be owned is deleted, and std::bad_alloc comes out.
   explicit Pointer(T* object, bool noDelete = false) : block_(MakeBlock(object, noDelete)) {}
+  /// Shares the object of another Pointer.
   Pointer(const Pointer& other) : block_(other.block_) { ++block_->count; }
 
   /// Shares the object of a Pointer to another class when it is a T: known at compile time for a
@@ -91,6 +103,7 @@ class Pointer {
 
   virtual ~Pointer() { Release(); }
 
+  /// Shares the object of `other`; the one held before is deleted when this was its last Pointer.
   Pointer& operator=(const Pointer& other) {
     if (this == &other) return *this;
     ControlBlock* const shared = other.block_;
@@ -107,14 +120,17 @@ class Pointer {
     block_ = fresh;
   }
 
+  /// True without an object.
   bool IsNull() const { return block_->object == nullptr; }
   explicit operator bool() const { return !IsNull(); }
 
+  /// The object, which belongs to the Pointers that share it; null when there is none. `->` and `*`
+  /// have to be guarded by IsNull().
   T* Get() const { return static_cast<T*>(static_cast<detail::PointerRoot<T>*>(block_->object)); }
   T* operator->() const { return Get(); }
   T& operator*() const { return *Get(); }
 
-  /// How many Pointers share the object at this moment.
+  /// How many Pointers share the object at this moment; another thread may change it at once.
   unsigned GetCount() const { return block_->count; }
 
   /// By the address of the control block: Pointers that share are equal.
@@ -151,7 +167,7 @@ class Pointer {
                   "the classes do not belong to one family");
     bool fits = !other.IsNull();
     if constexpr (!std::is_base_of_v<T, U>) {
-      // Under sanitizers the compiler can't tell two addresses apart; then there is no check.
+      // Under sanitizers the compiler can't compare two addresses; then there is no check.
       static_assert(!__builtin_constant_p(&T::TypeCode == &Object::TypeCode) ||
                         &T::TypeCode != &Object::TypeCode,
                     "the class has no type code of its own");

@@ -14,8 +14,12 @@ class VEXG_EXPORT AsyncCallback {
   using PointerRoot = AsyncCallback;
 
   virtual ~AsyncCallback() = default;
+  /// The work begins.
   virtual void OnStart() {}
+  /// The work has ended, whether well or not. Those who wait for it see it finished only after
+  /// this.
   virtual void OnFinish() {}
+  /// The abort flag was set to the value, which need not be another one than before.
   virtual void OnAbort(const bool&) {}
   /// @param progress  fraction done, 0 to 1.
   virtual void OnProgress(double /*progress*/) {}
@@ -23,16 +27,23 @@ class VEXG_EXPORT AsyncCallback {
 
 using AsyncCallbackPtr = Pointer<AsyncCallback>;
 
-/// The request to abort a long operation. The root keeps nothing and only tells its observer.
+/// The request to abort a long operation. The root keeps nothing and only hands the request to its
+/// observer; StandardAbortFlag is the one to use.
+///
+/// The operation looks at the flag now and then, a loop at each part and a process at each token,
+/// so an abort takes effect a little later and leaves an incomplete result. It is no failure: who
+/// needs to know asks IsSet() after the call.
 class VEXG_EXPORT AbortFlag {
  public:
   using PointerRoot = AbortFlag;
 
   explicit AbortFlag(const AsyncCallbackPtr& callback = {}) : callback_(callback) {}
 
+  /// Raises the flag, or takes the request back. May be called on any thread.
   virtual void Set(const bool& abort) {
     if (!callback_.IsNull()) callback_->OnAbort(abort);
   }
+  /// True while the operation is to end.
   virtual bool IsSet() const { return false; }
   virtual ~AbortFlag() = default;
 
@@ -78,19 +89,23 @@ class VEXG_EXPORT StandardAbortFlag : public ExternalAbortFlag<unsigned char> {
   unsigned char flag_ = 0;
 };
 
-/// Where a long operation reports how far it has come, as a fraction from 0 to 1. The root keeps
-/// nothing and only tells its observer.
+/// Takes the reports of a long operation on how far it has come, as a fraction from 0 to 1. The
+/// root keeps nothing and only hands them to its observer; StandardProgressReport is the one to
+/// use.
 class VEXG_EXPORT ProgressReport {
  public:
   using PointerRoot = ProgressReport;
 
   explicit ProgressReport(const AsyncCallbackPtr& callback = {}) : callback_(callback) {}
 
+  /// Reports a fraction from 0 to 1. Nothing makes a later one larger than an earlier one.
   virtual void Update(double progress) { Tell(progress); }
+  /// The fraction that was reported last; 0 before the first.
   virtual double GetProgress() const { return 0.0; }
   virtual ~ProgressReport() = default;
 
  protected:
+  /// Hands a fraction to the observer, when there is one.
   void Tell(double progress) {
     if (!callback_.IsNull()) callback_->OnProgress(progress);
   }
@@ -141,13 +156,22 @@ class VEXG_EXPORT StandardProgressReport : public ExternalProgressReport<double>
   double value_ = 0.0;
 };
 
-/// What goes with every long operation: the flag that aborts it and the report of its progress. A
-/// copy shares both. The default has a flag and a report of its own, without observers.
+/// Pairs the flag that aborts a long operation with the report of its progress. A copy shares both.
+/// The default has a flag and a report of its own, without observers.
+///
+///     const IPC ipc;
+///     const AsyncPtr stats = raster->StatsBuild(ipc);
+///     …                                     // meanwhile, on any thread:
+///     std::cout << ipc.progress->GetProgress();
+///     ipc.abort->Set(true);
+///
+/// Functions that take one look at neither pointer for null: both have to be there.
 class VEXG_EXPORT IPC {
  public:
   using PointerRoot = IPC;
 
   IPC() : abort(new StandardAbortFlag), progress(new StandardProgressReport) {}
+  /// Pairs a flag and a report of others, neither of them empty.
   IPC(const AbortFlagPtr& abortFlag, const ProgressReportPtr& progressReport)
       : abort(abortFlag), progress(progressReport) {}
   IPC(const IPC&) = default;

@@ -4,15 +4,18 @@
 
 namespace lumo {
 
-/// What the scalars of all value types have in common: one type code. A cast by IsA therefore can't
-/// tell a Scalar<String> from a Scalar<double>.
+/// Gives the scalars of all value types one type code. A cast by IsA therefore finds a
+/// Scalar<String> as well where a Scalar<double> is meant; FindScalarValue doesn't.
 class VEXG_EXPORT ScalarObject : public Object {
  public:
   static const unsigned TypeCode;
   bool IsA(unsigned typeCode) const override;
 };
 
-/// One value in an object, so that it can travel through an ObjectPtr.
+/// One value in an object, so that it can travel through an ObjectPtr:
+///
+///     const ObjectPtr input(new Scalar<String>(String("Byte")));
+///     const String* const text = FindScalarValue<String>(input);  // null for another value type
 template <typename T>
 class Scalar : public ScalarObject {
  public:

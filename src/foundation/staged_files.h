@@ -15,6 +15,11 @@ namespace lumo {
 ///
 /// Covers the files whose names begin with that of the raster and go on (".ovr"), not the raster
 /// itself. One at a time on a thread. Failure: false or no text, with errno set.
+///
+///     StagedFiles staged(path);         // path + ".ovr" and the like, on this thread
+///     BuildOverviews(dataset);          // the library believes that it writes them in place
+///     std::string fault;
+///     if (!staged.MoveIn(fault)) …      // what was there before is there still
 class VEXG_EXPORT StagedFiles {
  public:
   explicit StagedFiles(std::string raster);
@@ -32,11 +37,13 @@ class VEXG_EXPORT StagedFiles {
 
   /// The one of this thread; null when there is none.
   static StagedFiles* OfThread();
+  /// True for a file whose name begins with that of the raster and goes on.
   bool Covers(const std::string& path) const;
   /// Where a file lies for now; a name of nothing for one that was removed.
   std::string PlaceOf(const std::string& path) const;
   /// Where a file is to be written: a copy of it, or for a new one a name. No text on failure.
   std::string Stage(const std::string& path, bool isNew);
+  /// Makes a file look removed to the library; it goes when all is moved in.
   bool Remove(const std::string& path);
 
  private:

@@ -20,20 +20,26 @@ namespace lumo {
 /// Threads: any number of threads may read one String, also when they ask for narrow copies; a
 ///          thread that changes it must be alone.
 /// Failure: an allocation that fails leaves as std::bad_alloc; the text is then as it was.
+///
+///     const String name("Ägypten.tif");       // UTF-8 in
+///     const unsigned at = name.Find(".tif");  // 7, in units
+///     std::puts(name.Left(at).GetUTF8());     // as long as the String lives
 class VEXG_EXPORT String {
  public:
-  /// What Find gives for a text that isn't there.
+  /// The result of Find for a text that isn't there.
   static constexpr unsigned kNotFound = 0xFFFFFFFF;
 
   String() = default;               ///< no text
   String(const char* utf8);         ///< up to the terminator; null gives no text
   String(const char16_t* units);    ///< up to the terminator; null gives no text
   String(const std::string& utf8);  ///< up to the first NUL; an empty one gives no text
+  /// Exactly `count` units, NULs among them; null gives no text.
   String(const char16_t* units, std::size_t count);
   String(const String& other);      ///< the text only; narrow copies are made anew
   String(String&& other) noexcept;  ///< `other` is left without a text
   ~String();
 
+  /// Takes the text over, or that there is none; a narrow copy is made anew when it is asked for.
   String& operator=(const String& other);
   String& operator=(String&& other) noexcept;
 
@@ -84,6 +90,7 @@ class VEXG_EXPORT String {
                         static_cast<Unsigned>(value));
   }
 
+  /// Equal unit by unit; no text equals no text alone.
   friend VEXG_EXPORT bool operator==(const String& a, const String& b);
   /// By unsigned 16-bit units, without a locale.
   friend VEXG_EXPORT bool operator<(const String& a, const String& b);
@@ -102,6 +109,7 @@ class VEXG_EXPORT String {
   unsigned length_ = 0;
 };
 
+/// The two texts in a row; no text when neither side has one.
 VEXG_EXPORT String operator+(const String& a, const String& b);
 
 /// An opaque identifier, the key of an object in the catalog. It is compared unit by unit and never

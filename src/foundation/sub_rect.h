@@ -11,9 +11,13 @@ namespace lumo {
 /// A rectangle of pixels with inclusive corners, left <= right and top <= bottom however it was
 /// made. The default is the single pixel at the origin. Its text form is the four numbers in the
 /// order left, top, right, bottom.
+///
+///     SubRect rect(10, 20, 19, 24);       // 10 samples by 5 lines
+///     rect = rect.Clip(raster.Samples() - 1, raster.Lines() - 1);
 class SubRect {
  public:
   SubRect() = default;
+  /// Any two corners that face each other.
   SubRect(unsigned x0, unsigned y0, unsigned x1, unsigned y1)
       : left(std::min(x0, x1)),
         top(std::min(y0, y1)),
@@ -34,7 +38,9 @@ class SubRect {
   SubRect(const SubRect&) = default;
   SubRect& operator=(const SubRect&) = default;
 
+  /// Samples of a line, 1 or more; 0 for a rectangle of all 2^32 columns.
   unsigned Width() const { return right - left + 1; }
+  /// Lines, 1 or more; 0 for a rectangle of all 2^32 lines.
   unsigned Height() const { return bottom - top + 1; }
 
   /// Raises left and top to the low bounds, lowers right and bottom to the high ones, and orders
@@ -43,18 +49,21 @@ class SubRect {
     return {std::max(left, lowX), std::max(top, lowY), std::min(right, highX),
             std::min(bottom, highY)};
   }
+  /// Cuts the rectangle to pixels 0 to the high bounds, inclusive. One that lies wholly outside
+  /// comes out between the bound and itself.
   SubRect Clip(unsigned highX, unsigned highY) const { return Clip(0, 0, highX, highY); }
 
   friend bool operator==(const SubRect& a, const SubRect& b) {
     return a.left == b.left && a.top == b.top && a.right == b.right && a.bottom == b.bottom;
   }
 
-  unsigned left = 0;
-  unsigned top = 0;
-  unsigned right = 0;
-  unsigned bottom = 0;
+  unsigned left = 0;    ///< first column
+  unsigned top = 0;     ///< first line
+  unsigned right = 0;   ///< last column, inclusive
+  unsigned bottom = 0;  ///< last line, inclusive
 };
 
+/// Writes the four numbers with a blank between them.
 inline std::ostream& operator<<(std::ostream& out, const SubRect& rect) {
   return out << rect.left << ' ' << rect.top << ' ' << rect.right << ' ' << rect.bottom;
 }

@@ -30,6 +30,7 @@ inline std::ostream& operator<<(std::ostream& out, const URI& uri) {
   WriteBracketedText(out, uri);
   return out;
 }
+/// Reads the bracketed form.
 inline std::istream& operator>>(std::istream& in, URI& uri) {
   uri = URI(ReadBracketedText(in));
   return in;
@@ -45,8 +46,10 @@ VEXG_EXPORT std::istringstream MakeTextReader(const String& text);
 VEXG_EXPORT std::ostringstream MakeTextWriter();
 
 namespace detail {
+/// Reads a number as ReadNumber does for floating types.
 template <typename T>
 VEXG_EXPORT bool ReadFloating(std::istream& in, T& value);
+/// Writes a number as WriteNumber does for floating types.
 template <typename T>
 VEXG_EXPORT void WriteFloating(std::ostream& out, T value);
 }  // namespace detail

@@ -15,7 +15,7 @@ void RunGuarded(std::function<void()>& body) {
   try {
     body();
   } catch (...) {
-    // Whoever waits for the thread's work sees that it isn't done; there is nobody else to tell.
+    // Whoever waits for the thread's work sees that it isn't done; nobody else waits for it.
     NoteException();
   }
   body = nullptr;  // lets go of what it holds before the thread leaves

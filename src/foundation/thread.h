@@ -11,7 +11,10 @@
 
 namespace lumo {
 
-/// A thread that nobody joins: it runs on by itself when this object goes.
+/// A thread that nobody joins: it runs on by itself when this object goes. An exception of the body
+/// ends the thread alone. JoinThreads waits for all of them at the end of a program.
+///
+///     if (!Thread().Start([work] { work->Execute(); })) return false;
 class VEXG_EXPORT Thread {
  public:
   Thread() = default;
@@ -28,6 +31,18 @@ class VEXG_EXPORT Thread {
 };
 
 /// The body of a thread that serves for long. StartThread runs it and keeps it alive meanwhile.
+///
+///     class Ticker final : public SimpleThread {
+///       void Run() override {
+///         SetRunning();
+///         while (!StopRequested()) Tick();
+///       }
+///     };
+///     const SimpleThreadPtr ticker(new Ticker);
+///     if (StartThread(ticker)) ticker->WaitRunning();
+///     …
+///     ticker->RequestStop();
+///     ticker->WaitEnded();
 class VEXG_EXPORT SimpleThread {
  public:
   using PointerRoot = SimpleThread;
@@ -39,6 +54,7 @@ class VEXG_EXPORT SimpleThread {
 
   /// Asks Run to end; it only goes one way.
   void RequestStop() { stopRequested_ = true; }
+  /// True once RequestStop was called, on whichever thread.
   bool StopRequested() const { return stopRequested_; }
 
   /// True from the start of Run until it has returned.
@@ -50,6 +66,7 @@ class VEXG_EXPORT SimpleThread {
   void WaitEnded() const;
 
  protected:
+  /// Wakes those in WaitRunning: the thread is ready to serve.
   void SetRunning();
 
  private:
@@ -67,10 +84,12 @@ using SimpleThreadPtr = Pointer<SimpleThread>;
 /// @return false, with Run never called, when the system gives no thread.
 VEXG_EXPORT bool StartThread(const SimpleThreadPtr& thread);
 
-/// A queue between threads, first in, first out and without a bound.
+/// A queue between threads, first in, first out and without a bound. Any number of threads may put
+/// items in and take them out; one waiter wakes for each item.
 template <typename T>
 class MTQueue {
  public:
+  /// Puts a copy at the end, and wakes one that waits.
   void Push(const T& item) {
     {
       const std::lock_guard lock(mutex_);

@@ -14,6 +14,7 @@ namespace lumo {
 /// wait for the very last of each before its static data go.
 class ThreadRoll {
  public:
+  /// The one of the process.
   static ThreadRoll& Get();
 
   /// Takes over a thread, which calls Leave as its last act. Joins those that have left.

@@ -7,9 +7,9 @@
 
 namespace lumo {
 
-// Warnings tell in words what went wrong beside an operation that succeeded: a file that was found
-// by itself and could not be read, say. Who notices it tells it here, and who reports to a person
-// takes it. The texts belong to the thread, as fault texts do; a call into a source carries them
+// Warnings say in words that something went wrong beside an operation that succeeded, as a file
+// beside a raster that could not be read. Who notices it adds one here, and who reports to a person
+// takes them. The texts belong to the thread, as fault texts do; a call into a source carries them
 // back.
 
 /// Keeps `text`, one line that says what and where and that the work went on. The same text counts

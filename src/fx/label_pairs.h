@@ -10,8 +10,8 @@ namespace lumo {
 
 /// Two labels whose pixels share edges.
 struct LabelPair {
-  std::uint32_t low = 0;
-  std::uint32_t high = 0;
+  std::uint32_t low = 0;     ///< the smaller label
+  std::uint32_t high = 0;    ///< the larger one
   std::uint32_t length = 0;  ///< of their common boundary, in pixel edges
 };
 
@@ -19,6 +19,10 @@ struct LabelPair {
 ///
 /// Cost: a look into a hash table for each edge that is not of the pair of the edge before.
 /// Threads: one at a time; the memory is kept from image to image.
+///
+///     pairs.Begin(labelCount);
+///     ForEachEdge({width, height, width, height}, labels, nullptr,
+///                 [&](std::uint32_t a, std::uint32_t b) { pairs.AddEdge(a, b); });
 class VEXG_EXPORT LabelPairs {
  public:
   /// Forgets all pairs. @param labelCount  about how many labels there are.
@@ -34,6 +38,7 @@ class VEXG_EXPORT LabelPairs {
     ++pairs_[lastPair_].length;
   }
 
+  /// The pairs so far; the reference is good until the next edge.
   const std::vector<LabelPair>& Pairs() const { return pairs_; }
 
  private:
@@ -51,13 +56,13 @@ class VEXG_EXPORT LabelPairs {
   std::uint32_t lastPair_ = 0;
 };
 
-/// Where the edges of a label image are counted: between pixels of the first `columns` columns and
-/// `rows` rows and their neighbours on the right and below.
+/// Says where the edges of a label image are counted: between pixels of the first `columns` columns
+/// and `rows` rows and their neighbours on the right and below.
 struct EdgeScan {
-  std::uint32_t width = 0;  ///< of the image
-  std::uint32_t height = 0;
+  std::uint32_t width = 0;    ///< of the image
+  std::uint32_t height = 0;   ///< of the image
   std::uint32_t columns = 0;  ///< at most the width
-  std::uint32_t rows = 0;
+  std::uint32_t rows = 0;     ///< at most the height
 };
 
 /// Calls `visit(label, other)` for each edge between included pixels of different labels: row by

@@ -22,6 +22,12 @@ namespace lumo {
 /// Cost: a merge looks at the neighbours of the two segments, and at those of neighbours whose
 /// nearest was one of the two.
 /// Threads: one at a time; the arrays are kept from image to image.
+///
+///     schedule.Begin(labelCount + 1, bands);
+///     for (std::size_t i = 0; i < pixels; ++i) schedule.AddPixel(labels[i], values + i, pixels);
+///     schedule.Build(pairs.Pairs());
+///     LambdaSchedule::Merge merge;
+///     while (schedule.Step(merge) && merge.lambda < most) parent[merge.higher] = merge.lower;
 class VEXG_EXPORT LambdaSchedule {
  public:
   /// A merge of `higher` into `lower`.

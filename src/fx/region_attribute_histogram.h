@@ -4,8 +4,13 @@
 
 namespace lumo {
 
-/// A histogram of each attribute over all regions. Indexes are not checked. Threads: one at a time,
-/// for reading too.
+/// Keeps a histogram of each attribute over all regions. Indexes are not checked. Threads: one at a
+/// time, for reading too.
+///
+///     RegionAttributeHistogramMap<float> histograms(bands, attributes, 256);
+///     histograms.LowerLimit(band, attribute) = 0;
+///     histograms.UpperLimit(band, attribute) = 510;  // bins of 2
+///     ++histograms.Count(band, attribute, bin);
 template <typename T>
 class RegionAttributeHistogram : public AttributeTable {
  public:
@@ -15,6 +20,7 @@ class RegionAttributeHistogram : public AttributeTable {
     return typeCode == TypeCode || Object::IsA(typeCode);
   }
 
+  /// Bins of each histogram.
   virtual unsigned Bins() const { return bins_; }
 
   /// The lowest value of the first bin, to read and to write.
@@ -31,7 +37,7 @@ class RegionAttributeHistogram : public AttributeTable {
   virtual T& UpperLimit(unsigned band, unsigned attribute) {
     return limits_[LimitOf(band, attribute) + 1];
   }
-  /// (upper - lower) / (bins - 1); of a single bin upper - lower + 1.
+  /// The width of a bin: (upper - lower) / (bins - 1); of a single bin upper - lower + 1.
   virtual T BinSize(unsigned band, unsigned attribute) const;
 
   /// The number of values in a bin, to read and to write.
@@ -69,6 +75,7 @@ class RegionAttributeHistogramMap final : public RegionAttributeHistogram<T> {
  public:
   static const unsigned TypeCode;
 
+  /// All counts and limits begin at 0.
   RegionAttributeHistogramMap(unsigned bands, unsigned attributes, unsigned bins);
 
   bool IsA(unsigned typeCode) const override { return typeCode == TypeCode || Base::IsA(typeCode); }
@@ -100,6 +107,7 @@ class RegionAttributeHistogramFile final : public RegionAttributeHistogram<T> {
 
  public:
   static const unsigned TypeCode;
+  /// Bins of each histogram of a file.
   static constexpr unsigned kBins = 256;
   static constexpr unsigned kMostPairs = 8190;  ///< of band and attribute: the header holds no more
 

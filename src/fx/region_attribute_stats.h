@@ -4,38 +4,49 @@
 
 namespace lumo {
 
-/// Statistics of each attribute over all regions: five for each band and attribute. Indexes are not
-/// checked. Threads: one at a time, for reading too.
+/// Keeps statistics of each attribute over all regions: five for each band and attribute. Indexes
+/// are not checked. Threads: one at a time, for reading too.
+///
+///     RegionAttributeStatsFile<float> stats(uri, bands, attributes);  // creates the file
+///     stats.Mean(band, attribute) = mean;
+///     if (!stats.Close()) return false;
 template <typename T>
 class RegionAttributeStats : public AttributeTable {
  public:
   static const unsigned TypeCode;
+  /// The statistics, in the order of the file.
   enum Statistic : unsigned { kMean, kStdDev, kMin, kMax, kCount, kStatistics };
 
   bool IsA(unsigned typeCode) const override {
     return typeCode == TypeCode || Object::IsA(typeCode);
   }
 
-  /// A statistic to read, and to write. @param index  a Statistic.
+  /// A statistic to read, and to write; a reference into a file is good until the next call.
+  /// @param index  a Statistic.
   virtual const T& Value(unsigned band, unsigned attribute, unsigned index) const = 0;
   virtual T& Value(unsigned band, unsigned attribute, unsigned index) = 0;
 
+  /// Mean of the attribute over the regions that are there.
   virtual const T& Mean(unsigned band, unsigned attribute) const {
     return Value(band, attribute, kMean);
   }
   virtual T& Mean(unsigned band, unsigned attribute) { return Value(band, attribute, kMean); }
+  /// Its standard deviation.
   virtual const T& StdDev(unsigned band, unsigned attribute) const {
     return Value(band, attribute, kStdDev);
   }
   virtual T& StdDev(unsigned band, unsigned attribute) { return Value(band, attribute, kStdDev); }
+  /// Its smallest value.
   virtual const T& Min(unsigned band, unsigned attribute) const {
     return Value(band, attribute, kMin);
   }
   virtual T& Min(unsigned band, unsigned attribute) { return Value(band, attribute, kMin); }
+  /// Its largest value.
   virtual const T& Max(unsigned band, unsigned attribute) const {
     return Value(band, attribute, kMax);
   }
   virtual T& Max(unsigned band, unsigned attribute) { return Value(band, attribute, kMax); }
+  /// The number of regions behind them.
   virtual const T& Count(unsigned band, unsigned attribute) const {
     return Value(band, attribute, kCount);
   }

@@ -7,8 +7,12 @@
 
 namespace lumo {
 
-/// Values for each region, band and attribute. A region is a segment of a label raster, and its
-/// label is its index here. The last attribute of a band tells whether the region is there.
+/// Keeps values for each region, band and attribute. A region is a segment of a label raster, and
+/// its label is its index here. The last attribute of a band marks that the region is there.
+///
+///     SpectralRegionAttributesMap regions(bands);
+///     regions.Value(label, 0, SpectralRegionAttributes::kMean) += pixel;
+///     ++regions.Value(label, 0, SpectralRegionAttributes::kPixelCount);  // and with it the mark
 ///
 /// Bands and attributes are not checked.
 ///
@@ -32,7 +36,7 @@ class RegionAttributes : public AttributeTable {
 
   /// The value to read.
   virtual const T& Value(unsigned region, unsigned band, unsigned attribute) const = 0;
-  /// The value to write.
+  /// The value to write; in a file the reference is good until another value is touched.
   virtual T& Value(unsigned region, unsigned band, unsigned attribute) = 0;
 
   /// Forgets all regions of a map. Has no effect on a file.
@@ -85,7 +89,8 @@ class RegionAttributesMap : public RegionAttributes<T> {
 };
 
 /// Regions in a file of the form "FXA50", see docs/file-formats.md: a record lies at a place that
-/// its region tells, so all regions up to the largest are there, with 0 where nothing was written.
+/// the number of its region gives, so all regions up to the largest are there, with 0 where nothing
+/// was written.
 ///
 /// Valid once the header was checked or made, as long as no error is stored. Of a file that has
 /// another header nothing is read, and nothing in it changes.

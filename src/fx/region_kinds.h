@@ -4,8 +4,8 @@
 
 namespace lumo {
 
-// What the attributes of a band are, for each kind of store. Each kind is a tag that its stores
-// derive from. The last attribute of each marks that the region is there.
+// The attributes of a band, for each kind of store. Each kind is a tag that its stores derive from.
+// The last attribute of each marks that the region is there.
 
 /// The mean of the pixels of a region.
 struct RegionMeans {
@@ -18,7 +18,7 @@ struct RegionMeans {
   static constexpr const char* kName = "RegionMeans";
 };
 
-/// How the pixels of a region are distributed.
+/// The distribution of the pixels of a region.
 struct SpectralRegionAttributes {
   enum : unsigned {
     kMean,    ///< the sum, until all pixels were seen
@@ -32,7 +32,7 @@ struct SpectralRegionAttributes {
   static constexpr const char* kName = "SpectralRegionAttributes";
 };
 
-/// Means over a region of what windows round its pixels hold.
+/// Means over a region of the texture in windows round its pixels.
 struct TextureRegionAttributes {
   enum : unsigned { kRange, kMean, kVariance, kEntropy, kPixelCount, kAttributes };
   static constexpr unsigned kBands = 0;
@@ -42,8 +42,8 @@ struct TextureRegionAttributes {
 /// The shape of a region; lengths in map units, angles in degrees.
 struct SpatialRegionAttributes {
   enum : unsigned {
-    kArea,
-    kPerimeter,
+    kArea,       ///< square map units
+    kPerimeter,  ///< map units
     kCompactness,
     kConvexity,
     kSolidity,
@@ -51,9 +51,9 @@ struct SpatialRegionAttributes {
     kFormFactor,
     kElongation,
     kRectangularFit,
-    kMainDirection,
-    kMajorLength,
-    kMinorLength,
+    kMainDirection,  ///< degrees
+    kMajorLength,    ///< map units
+    kMinorLength,    ///< map units
     kHoleCount,
     kHoleToSolidRatio,
     kPresence,  ///< 1
@@ -69,8 +69,10 @@ class RegionMapOf final : public RegionAttributesMap<float>, public Kind {
  public:
   static const unsigned TypeCode;
 
+  /// A map for the bands of an image.
   explicit RegionMapOf(unsigned bands) requires(Kind::kBands == 0)
       : RegionAttributesMap(bands, Kind::kAttributes) {}
+  /// A map for the kind's own number of bands.
   RegionMapOf() requires(Kind::kBands != 0)
       : RegionAttributesMap(Kind::kBands, Kind::kAttributes) {}
 
@@ -93,6 +95,7 @@ class RegionFileOf final : public RegionAttributesFile<float>, public Kind {
   /// Creates a file.
   RegionFileOf(const URI& uri, unsigned bands) requires(Kind::kBands == 0)
       : RegionAttributesFile(uri, bands, Kind::kAttributes) {}
+  /// Creates a file for the kind's own number of bands.
   explicit RegionFileOf(const URI& uri) requires(Kind::kBands != 0)
       : RegionAttributesFile(uri, Kind::kBands, Kind::kAttributes) {}
 

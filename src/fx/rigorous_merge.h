@@ -7,8 +7,8 @@
 
 namespace lumo {
 
-/// How the values of segments are added up. Told: as float, in the order of the pixels. Exact: as
-/// double.
+/// Says how the values of segments are added up. Told: as float, in the order of the pixels. Exact:
+/// as double.
 enum class RegionSums : unsigned char { kTold, kExact };
 
 /// Joins all neighbouring segments of a label image whose cost (see LambdaSchedule) is below a
@@ -39,7 +39,7 @@ class VEXG_EXPORT RigorousMerge {
     counts_[label] += 1.0F;
   }
 
-  /// Joins what is below the threshold. Behind all pixels.
+  /// Joins the segments whose costs are below the threshold. Behind all pixels.
   /// @return for each label the number of what it has become part of. Numbers follow the groups
   ///         that were joined, then the labels that stayed alone, in their order; the first of
   ///         these has the number of the last group. Without any joining each label stays.

@@ -8,11 +8,13 @@
 
 namespace lumo {
 
-/// What the stores of region values have in common: values for each band and attribute. A store
-/// with 0 of either keeps as many as one with 1.
+/// Counts the bands and attributes of a store of region values, and places pairs of them. A store
+/// with 0 of either keeps as many values as one with 1.
 class VEXG_EXPORT AttributeTable : public Object {
  public:
+  /// Bands, as the store was made with them.
   virtual unsigned Bands() const { return bands_; }
+  /// Attributes of a band, as the store was made with them.
   virtual unsigned Attributes() const { return attributes_; }
 
  protected:
@@ -42,14 +44,14 @@ class VEXG_EXPORT AttributeTable : public Object {
 
 namespace detail {
 
-/// Bands and attributes, as a header tells them.
+/// Bands and attributes, as a header has them.
 struct StoreCounts {
   unsigned bands = 0;
   unsigned attributes = 0;
 };
 
-/// What the header of a buffer that was just opened tells, where it begins with `mark`; nothing of
-/// another, or of one that isn't whole.
+/// Reads the header of a buffer that was just opened; nothing for one that doesn't begin with
+/// `mark`, or isn't whole.
 VEXG_EXPORT std::optional<StoreCounts> ReadStoreHeader(const BasicBuffer& buffer,
                                                        std::string_view mark);
 
@@ -87,6 +89,7 @@ class StoreFile {
 
   bool IsValid() const { return counts_ && buffer_.IsValid(); }
   detail::StoreCounts Counts() const { return counts_.value_or(detail::StoreCounts()); }
+  /// The elements behind the header.
   Buffer<T>& Elements() { return buffer_; }
 
   /// Makes the file not valid, and lets it go.

@@ -40,7 +40,7 @@ class VEXG_EXPORT TileStitcher {
   std::uint32_t LabelCount() const { return given_; }
 
  private:
-  /// What a label of the tile becomes.
+  /// The new label of one of the tile's.
   struct Target {
     std::int32_t label = 0;    ///< 0: to be given
     std::uint32_t shared = 0;  ///< pixels that it shares with that label

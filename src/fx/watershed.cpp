@@ -5,7 +5,7 @@
 namespace lumo {
 namespace {
 
-// What a pixel drains to: a neighbour, in the order in which the last one wins, or one of these.
+// The drains of a pixel: a neighbour, in the order in which the last one wins, or one of these.
 enum Drain : std::uint8_t {
   kUp = 0,
   kLeft = 1,

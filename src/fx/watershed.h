@@ -22,6 +22,10 @@ namespace lumo {
 ///
 /// Cost: linear in the pixels; a byte a pixel, and 4 for the longest front on plateaus.
 /// Threads: one at a time; the work arrays are kept from image to image.
+///
+///     Watershed watershed;
+///     std::vector<std::int32_t> labels(width * height);
+///     const unsigned basins = watershed.Label(gradient, nullptr, width, height, labels.data());
 class VEXG_EXPORT Watershed {
  public:
   /// Labels an image.

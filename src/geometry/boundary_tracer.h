@@ -16,6 +16,7 @@ struct TracedPolygon {
   std::vector<std::uint32_t> starts;       ///< for each ring, the index of its first vertex
   std::vector<std::uint32_t> coordinates;  ///< x, y of all vertices
 
+  /// Empties the polygon; memory stays.
   void Clear() {
     holes.clear();
     starts.clear();
@@ -40,7 +41,7 @@ class TracedPolygonSink {
 /// (corners of pixels) at a time, and completes each polygon at the last node of its outer ring.
 ///
 /// A boundary is a chain of vectors, one for each place where it began; a vector grows at both
-/// ends. A union-find over the vectors tells when a link joins a chain to itself, which closes its
+/// ends. A union-find over the vectors finds a link that joins a chain to itself, which closes its
 /// ring.
 ///
 /// Cost: a row costs a few operations on words of 64 nodes, and constant time for each node where a

@@ -14,7 +14,7 @@ namespace lumo {
 /// polygons, then a record for each polygon. See docs/file-formats.md.
 inline constexpr unsigned kFxvHeaderSize = 1024;
 
-/// Bytes that the reader and the writer hold of a file, unless told otherwise.
+/// The default of the bytes that the reader and the writer hold of a file.
 inline constexpr unsigned kFxvBufferSize = 1 << 18;
 
 /// True for a path that ends as those of FXV files do, in any case.
@@ -22,6 +22,10 @@ VEXG_EXPORT bool IsFxvName(const std::string& path);
 
 /// Writes an FXV file. The header is zero until the file is complete, so that nobody takes one for
 /// whole that a run left which failed or was killed.
+///
+///     FxvPolygonWriter<std::int32_t, std::uint32_t> file{URI("areas.fxv")};
+///     for (const Polygon2D<std::uint32_t>& polygon : polygons) file.Write(polygon);
+///     if (!file.Close()) return false;  // TakeFault() says why
 ///
 /// Failure: ObjectErrorIO when the file can't be made or written; nothing is written then any more,
 ///          and the header stays zero. TakeFault says why.
@@ -56,6 +60,7 @@ class VEXG_EXPORT FxvPolygonWriter<std::int32_t, std::uint32_t> final
   /// Closes the file without a header: it stands for nothing.
   void Abandon();
 
+  /// Polygons that were written.
   std::uint32_t Count() const { return count_; }
 
  private:
@@ -81,6 +86,8 @@ template <>
 class VEXG_EXPORT FxvPolygonReader<std::int32_t, std::uint32_t> final
     : public PolygonReader<std::int32_t, std::uint32_t> {
  public:
+  /// Opens a file and reads its header; IsValid() is false when that fails.
+  /// @param bufferSize  bytes that are read at once.
   explicit FxvPolygonReader(const URI& uri, unsigned bufferSize = kFxvBufferSize);
   ~FxvPolygonReader() override;
 
@@ -89,6 +96,7 @@ class VEXG_EXPORT FxvPolygonReader<std::int32_t, std::uint32_t> final
   bool Read(std::int32_t& label, Array<bool>& holes, Array<unsigned>& starts,
             Array<std::uint32_t>& coordinates) override;
   using PolygonReader::Read;
+  /// Polygons of the file, as its header has it.
   unsigned Count() const override { return count_; }
 
  private:

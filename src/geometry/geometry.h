@@ -21,6 +21,9 @@ enum GeometryKind : std::int32_t { kPolygonRecord = 0, kPolylineRecord = 1, kPoi
 /// A record is named by its id, a part by its id within the record. An id that isn't there gives 0,
 /// false or an empty result.
 ///
+/// Revisions are for those who keep something that they made from the data: it is out of date once
+/// a revision differs.
+///
 /// Threads: as the derived class says.
 class VEXG_EXPORT Geometry : public Object {
  public:
@@ -33,18 +36,21 @@ class VEXG_EXPORT Geometry : public Object {
   virtual std::uint32_t RecordRevision(std::uint32_t record) const = 0;
   /// How often the vertices of a part have changed.
   virtual std::uint32_t PartRevision(std::uint32_t record, std::uint32_t part) const = 0;
+  /// Number of records.
   virtual std::uint32_t RecordCount() const = 0;
   /// The ids of all records, ascending.
   virtual Array<int> RecordIds() const = 0;
   /// The kind of a record, see GeometryKind.
   virtual std::int32_t RecordKind(std::uint32_t record) const = 0;
+  /// Number of parts of a record.
   virtual std::uint32_t PartCount(std::uint32_t record) const = 0;
   /// The ids of all parts of a record, ascending.
   virtual Array<int> PartIds(std::uint32_t record) const = 0;
+  /// Number of vertices of a part.
   virtual std::uint32_t VertexCount(std::uint32_t record, std::uint32_t part) const = 0;
-  /// Whether a part is a hole of a polygon.
+  /// True for a part that is a hole of a polygon.
   virtual bool IsHole(std::uint32_t record, std::uint32_t part) const = 0;
-  /// The vertices of a part.
+  /// The vertices of a part, in the units of CoordSys().
   virtual Array<Point2D<double>> Coordinates(std::uint32_t record, std::uint32_t part) const = 0;
   /// The places of a record among the records, and of a part among its parts.
   virtual bool FindPart(std::uint32_t record, std::uint32_t part, std::uint32_t& recordIndex,
@@ -69,7 +75,12 @@ class VEXG_EXPORT Geometry : public Object {
   std::uint32_t revision_ = 0;
 };
 
-/// Vector data that can be changed.
+/// Vector data that can be changed. Each change raises the revision that it belongs to.
+///
+///     const MemoryGeometryPtr areas(new MemoryGeometry(coordSys));
+///     std::uint32_t record = 0, ring = 0;
+///     if (!areas->AddRecord(kPolygonRecord, record)) return false;
+///     areas->AddPart(record, false, ring, points);
 class VEXG_EXPORT WritableGeometry : public Geometry {
  public:
   static const unsigned TypeCode;
@@ -78,6 +89,7 @@ class VEXG_EXPORT WritableGeometry : public Geometry {
   /// Adds a record behind all others.
   /// @param id  [out] of the record; never used again in this geometry.
   virtual bool AddRecord(std::int32_t kind, std::uint32_t& id) = 0;
+  /// Removes a record with its parts. False when it isn't there.
   virtual bool RemoveRecord(std::uint32_t record) = 0;
   /// Removes all records.
   virtual void Clear() = 0;
@@ -86,6 +98,7 @@ class VEXG_EXPORT WritableGeometry : public Geometry {
                        const Array<Point2D<double>>& points) = 0;
   /// Adds a part without vertices.
   virtual bool AddPart(std::uint32_t record, bool hole, std::uint32_t& id) = 0;
+  /// Removes a part. False when it isn't there.
   virtual bool RemovePart(std::uint32_t record, std::uint32_t part) = 0;
   /// Replaces the vertices of a part.
   virtual bool SetCoordinates(std::uint32_t record, std::uint32_t part,
@@ -102,8 +115,11 @@ class VEXG_EXPORT GeometryPart : public Object {
   GeometryPart(std::uint32_t id, bool hole) : hole_(hole), id_(id) {}
   bool IsA(unsigned typeCode) const override;
 
+  /// Its id within the record.
   std::uint32_t Id() const { return id_; }
+  /// True for a hole of a polygon.
   bool IsHole() const { return hole_; }
+  /// Its vertices.
   const Point2DArray<double>& Points() const { return points_; }
   void SetPoints(Point2DArray<double> points) {
     points_ = std::move(points);
@@ -131,18 +147,25 @@ class VEXG_EXPORT GeometryRecord : public Object {
   GeometryRecord& operator=(const GeometryRecord&) = delete;
   bool IsA(unsigned typeCode) const override;
 
+  /// A GeometryKind.
   std::int32_t Kind() const { return kind_; }
   std::uint32_t Id() const { return id_; }
-  std::uint32_t Revision() const;
-  std::uint32_t PartCount() const;
-  Array<int> PartIds() const;
+  std::uint32_t Revision() const;   ///< how often parts were added or taken away
+  std::uint32_t PartCount() const;  ///< number of parts
+  Array<int> PartIds() const;       ///< of all parts, ascending
+  /// The place of a part among the others. False when it isn't there.
   bool FindPart(std::uint32_t part, std::uint32_t& index) const;
   /// Calls `read` with a part under the lock. @return false when it isn't there.
   template <typename Read>
   bool ReadPart(std::uint32_t part, Read&& read) const;
 
+  /// Adds a part behind all others.
+  /// @param id      [out] of the part; never used again in this record.
+  /// @param points  are taken out of it; null for none.
   bool AddPart(bool hole, std::uint32_t& id, Point2DArray<double>* points);
+  /// Removes a part. False when it isn't there.
   bool RemovePart(std::uint32_t part);
+  /// Replaces the vertices of a part. False when it isn't there.
   bool SetPoints(std::uint32_t part, Point2DArray<double> points);
 
  private:
@@ -165,6 +188,7 @@ using GeometryRecordPtr = Pointer<GeometryRecord>;
 class VEXG_EXPORT MemoryGeometry final : public WritableGeometry {
  public:
   static const unsigned TypeCode;
+  /// @param coordSys  the system of all coordinates.
   explicit MemoryGeometry(const lumo::CoordSys& coordSys);
   bool IsA(unsigned typeCode) const override;
 
@@ -213,6 +237,8 @@ using MemoryGeometryPtr = Pointer<MemoryGeometry>;
 class VEXG_EXPORT ProjectedGeometry final : public Geometry {
  public:
   static const unsigned TypeCode;
+  /// @param inner   is shared, and not empty.
+  /// @param target  the system in which coordinates are given.
   ProjectedGeometry(const GeometryPtr& inner, const lumo::CoordSys& target)
       : Geometry(target), inner_(inner) {}
   bool IsA(unsigned typeCode) const override;

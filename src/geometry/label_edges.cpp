@@ -91,7 +91,7 @@ template <typename T>
 void MarkEdgesInLine(const T* line, std::size_t width, ColumnBits& bits) {
   std::uint64_t* const words = bits.Words();
   std::fill_n(words, bits.WordCount(), 0);
-  // Word i of the comparison from pixel 64 i on tells of the edges 64 i + 1 to 64 i + 64.
+  // Word i of the comparison from pixel 64 i on stands for the edges 64 i + 1 to 64 i + 64.
   if (width > 1) {
     MarkDifferences(line, line + 1, width - 1, words);
     std::uint64_t carry = 0;

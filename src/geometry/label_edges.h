@@ -12,12 +12,16 @@ namespace lumo {
 class ColumnBits {
  public:
   ColumnBits() = default;
+  /// @param columns  bits, all 0 at first.
   explicit ColumnBits(std::size_t columns) : words_((columns + 63) / 64) {}
 
+  /// Words of 64 columns.
   std::size_t WordCount() const { return words_.size(); }
   std::uint64_t Word(std::size_t index) const { return words_[index]; }
   std::uint64_t* Words() { return words_.data(); }
+  /// Sets the bit of a column, which has to be there.
   void Set(std::size_t column) { words_[column / 64] |= std::uint64_t{1} << (column % 64); }
+  /// Clears all bits.
   void Clear() { words_.assign(words_.size(), 0); }
   /// Sets the bits of the first `columns` columns, and no others.
   void SetFirst(std::size_t columns);

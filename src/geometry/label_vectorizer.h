@@ -27,9 +27,14 @@ class VEXG_EXPORT LabelPolygonSink {
 ///
 /// Cost: two lines of labels are held, and what BoundaryTracer needs.
 /// Threads: one at a time.
+///
+///     LabelVectorizer<std::int32_t> vectorizer(width, sink);
+///     for (unsigned y = 0; y < height; ++y) vectorizer.AddLine(labels + y * width, nullptr);
+///     vectorizer.Finish();  // the sink has all polygons now
 template <typename T>
 class VEXG_EXPORT LabelVectorizer final : TracedPolygonSink {
  public:
+  /// The label of excluded pixels.
   static constexpr T kExcluded = std::numeric_limits<T>::max();
 
   /// @param width  pixels of a line.
@@ -41,7 +46,8 @@ class VEXG_EXPORT LabelVectorizer final : TracedPolygonSink {
   /// @param states  a state byte for each; null when all are valid.
   /// @return false when the sink has stopped.
   bool AddLine(const T* labels, const unsigned char* states);
-  /// Completes what the last line leaves open. No line may follow.
+  /// Completes the polygons that the last line leaves open. No line may follow.
+  /// @return false when the sink has stopped.
   bool Finish();
 
   /// The number of lines that were added.

@@ -12,6 +12,7 @@
 
 namespace lumo {
 
+/// The vertices of a ring, a line or a set of points.
 template <typename T>
 using Point2DArray = std::vector<Point2D<T>>;
 
@@ -22,6 +23,7 @@ struct Contour2D {
   bool hole = false;
 };
 
+/// The rings of a polygon.
 template <typename T>
 using Contour2DArray = std::vector<Contour2D<T>>;
 
@@ -29,10 +31,10 @@ using Contour2DArray = std::vector<Contour2D<T>>;
 struct Polygon2DAttribute {
   double value = 0;
   unsigned kind = 13;  ///< 13 for a measure, 6 for a label
-  bool valid = false;
+  bool valid = false;  ///< the value is at hand
 };
 
-/// Which rings a measure is of.
+/// Names the rings that a measure is of.
 enum class RingGroup : unsigned {
   kAll = 0,
   kHoles = 1,  ///< those whose hole flag is set
@@ -77,6 +79,10 @@ class VEXG_EXPORT Polygon2DObject : public Object {
 /// Threads: one at a time, readers included, since measures are filled in when they are read.
 /// Failure: a polygon without a ring, or of arrays that do not fit each other, holds
 ///          PolygonErrorBadPolygon.
+///
+///     Polygon2D<double> square({{{{0, 0}, {4, 0}, {4, 4}, {0, 4}, {0, 0}}}}, 7);
+///     const double area = square.Measure(PolygonMeasure::kArea);            // 16
+///     const double perimeter = square.Measure(PolygonMeasure::kPerimeter);  // 16
 template <typename T>
 class Polygon2D : public Polygon2DObject {
  public:
@@ -84,6 +90,7 @@ class Polygon2D : public Polygon2DObject {
 
   /// A polygon without a ring.
   Polygon2D() { SetErrorState(PolygonErrorBadPolygon()); }
+  /// @param rings  the outer ring and its holes, closed for the measures to have a meaning.
   explicit Polygon2D(Contour2DArray<T> rings, double label = 0);
   /// A polygon of arrays, as files hold it.
   /// @param holes        for each ring, whether it is a hole.
@@ -96,7 +103,9 @@ class Polygon2D : public Polygon2DObject {
   template <typename U>
   explicit Polygon2D(const Polygon2D<U>& other);
 
+  /// The rings, in the order in which they were given.
   const Contour2DArray<T>& Rings() const { return rings_; }
+  /// The label, as a number that a double holds.
   double Label() const { return label_[0].value; }
   void SetLabel(double label) { label_[0] = {label, 6, true}; }
   /// Replaces the shape; its measures are forgotten.
@@ -110,6 +119,7 @@ class Polygon2D : public Polygon2DObject {
 
   /// Turns the shape by an angle in radians, from x towards y, about a point.
   void Rotate(double angle, const Point2D<double>& about);
+  /// Multiplies all coordinates.
   void Scale(double factorX, double factorY);
   /// Moves the shape. All measures stay but the bounding box and the centroids.
   void Translate(double byX, double byY);

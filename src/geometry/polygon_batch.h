@@ -19,7 +19,9 @@ struct LabelCounts {
 /// Threads: one at a time.
 class VEXG_EXPORT PolygonBatch final : public Object, public LabelPolygonSink {
  public:
+  /// Adds a polygon.
   bool Take(double label, TracedPolygon& polygon) override;
+  /// Drops all polygons; memory stays.
   void Clear();
   bool IsEmpty() const { return entries_.empty(); }
 

@@ -5,7 +5,7 @@
 
 namespace lumo {
 
-/// Where polygons go, one after the other. L is the type of labels, C that of coordinates.
+/// Takes polygons, one after the other. L is the type of labels, C that of coordinates.
 ///
 /// The rings of a polygon are given by three lists: for each ring whether it is a hole, for each
 /// ring the index of its first vertex, and x, y of all vertices.
@@ -41,7 +41,10 @@ class FlatPolygonWriter {
                          const C* coordinates) = 0;
 };
 
-/// Where polygons come from, one after the other.
+/// Gives polygons, one after the other.
+///
+///     Polygon2D<std::uint32_t> polygon;
+///     while (reader.Read(polygon)) total += polygon.Measure(PolygonMeasure::kArea);
 ///
 /// Threads: one at a time.
 template <typename L, typename C>

@@ -80,7 +80,7 @@ class PolygonizeCommand final : public RasterCommand {
     return IsFxvName(path_) ? ToFxv<T>(raster) : ToRecords<T>(raster);
   }
 
-  /// Runs the process into a writer. False, with the fault told, when not all polygons are written.
+  /// Runs the process into a writer. False, with the fault set, when not all polygons are written.
   template <typename T>
   bool Run(const RasterPtr<T>& raster, const ObjectPtr& writer) {
     RasterToVectorProcess<T> process(raster, band_, writer, GetIPC());

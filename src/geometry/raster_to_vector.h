@@ -32,6 +32,11 @@ class VEXG_EXPORT RasterToVectorTask final : public SequentialTask {
 /// Vectorizes one band of a label raster into a writer, with the polygons, and in the order, of
 /// RasterToVectorTask. Blocks of lines are read, walked and written at the same time, each on a
 /// thread of its own. Exists for EightTypes.
+///
+///     const ObjectPtr file(new FxvPolygonWriter<std::int32_t, std::uint32_t>(uri));
+///     RasterToVectorProcess<std::int32_t> process(raster, 0, file, ipc);
+///     if (!process.RunProcess(process.kHere)) return false;
+///     const std::uint64_t polygons = process.Counts().polygons;
 template <typename T>
 class VEXG_EXPORT RasterToVectorProcess final : public ProcessBuilder<Process> {
  public:

@@ -8,7 +8,7 @@
 
 namespace lumo {
 
-/// Which polygons of a label raster become records, and how.
+/// Says which polygons of a label raster become records, and how.
 struct PolygonRecordOptions {
   GeoRefPtr geoRef;        ///< carries pixels to map coordinates; null leaves pixels
   double leastPixels = 0;  ///< smaller polygons are left out, by their area in pixels
@@ -24,6 +24,7 @@ template <typename T>
 class VEXG_EXPORT RecordPolygonWriter final : public PolygonWriter<T, std::uint32_t>,
                                               public FlatPolygonWriter<T, std::uint32_t> {
  public:
+  /// @param sink  of a layer with one field, the label; whoever made it closes it.
   RecordPolygonWriter(const VectorRecordSinkPtr& sink, const PolygonRecordOptions& options);
 
   bool Write(const T& label, const Deque<bool>& holes, const Deque<unsigned>& starts,

@@ -6,8 +6,12 @@
 
 namespace lumo {
 
-/// Carries pixels of one affine grid to those of another one of the same coordinate system:
-/// x' = x0 + xx * x + xy * y, y' = y0 + yx * x + yy * y.
+/// Carries pixels of one affine grid to those of another one of the same coordinate system: x' = x0
+/// + xx * x + xy * y, y' = y0 + yx * x + yy * y. The default is the identity.
+///
+///     if (const auto link = FindAffineLink(*from, *to)) {
+///       const double column = link->x0 + link->xx * x + link->xy * y;
+///     }
 struct AffineLink {
   double x0 = 0, xx = 1, xy = 0;
   double y0 = 0, yx = 0, yy = 1;
@@ -18,11 +22,13 @@ struct AffineLink {
 ///         coordinate systems are equal.
 VEXG_EXPORT std::optional<AffineLink> FindAffineLink(const GeoRef& from, const GeoRef& to);
 
-/// Map coordinates to pixels, in place: the inverse of PixelToMap. That is MapToPixel, but for a
-/// grid that is turned and whose pixels aren't square, where MapToPixel keeps a form that isn't.
+/// Converts map coordinates to pixels, in place: the inverse of PixelToMap. That is MapToPixel, but
+/// for a turned grid whose pixels aren't square, where MapToPixel keeps a form that is no inverse.
+/// @param points  (points, 2).
 VEXG_EXPORT bool InvertPixelToMap(const GeoRef& model, Array<double>& points);
 
-/// As from.PixelToPixel(points, to), by InvertPixelToMap.
+/// Carries pixels of `from` to those of `to`, in place, as from.PixelToPixel(points, to) but by
+/// InvertPixelToMap.
 VEXG_EXPORT bool CarryPixels(const GeoRef& from, const GeoRef& to, Array<double>& points);
 
 }  // namespace lumo

@@ -15,10 +15,20 @@ VEXG_EXPORT extern std::mutex* gpCoordSysMutex;
 /// A handle on a coordinate system: the projection plug-in's object, or nothing, which is the empty
 /// system. Without the plug-in every CoordSys is empty and work goes on without transforms.
 ///
+///     CoordSys utm, geographic;
+///     if (!utm.SetFromString("EPSG:32633") || !geographic.SetGeographic()) return false;
+///     Array<double> points(ArrayDims(1, 2));
+///     points[0] = 500000;   // easting, in metres
+///     points[1] = 5400000;  // northing
+///     utm.Unproject(points);                    // longitude and latitude on the system's datum
+///     utm.GeoTransform(geographic, points, {});  // on that of WGS 84
+///
+/// Cost:      making one from a text takes the plug-in's parser; copies are cheap.
 /// Ownership: copies share the plug-in's object.
 /// Threads:   many readers or one writer; different handles on one object are independent.
 class VEXG_EXPORT CoordSys {
  public:
+  /// The empty system.
   CoordSys();
   CoordSys(const CoordSys& other);
   CoordSys& operator=(const CoordSys& other);
@@ -35,6 +45,7 @@ class VEXG_EXPORT CoordSys {
   /// @param text  [out] the plug-in's text; the empty text for the empty system.
   void ToString(String& text) const;
 
+  /// True for the system that is none.
   bool IsEmpty() const { return impl_ == nullptr; }
 
   /// 0 none or empty, 1 geographic, 2 projected.
@@ -50,9 +61,12 @@ class VEXG_EXPORT CoordSys {
   /// True when geographic positions of the two can be used for one another.
   bool SameDatum(const CoordSys& other) const;
 
-  /// Map coordinates to geographic positions and back, see CoordSysImpl; nothing for type 0.
+  /// Converts map coordinates to geographic positions, in place, see CoordSysImpl; nothing for type
+  /// 0.
   void Unproject(Array<double>& points) const;
+  /// Converts geographic positions to map coordinates, in place; nothing for type 0.
   void Project(Array<double>& points) const;
+  /// Unproject for one point, longitude and latitude in degrees.
   void MapToGeo(double x, double y, double& longitude, double& latitude) const;
 
   /// Carries geographic positions to the datum of `other`, under the global mutex. Nothing when
@@ -81,11 +95,11 @@ class VEXG_EXPORT CoordSys {
 
 /// One row of the table of units.
 struct MapUnit {
-  const char* name;
-  const char* displayName;
-  double factor;      ///< to metres, or to degrees
-  std::int32_t kind;  ///< 0 linear, 1 angular
-  std::int32_t code;  ///< of the EPSG registry; from 109001 on, of the projection engine
+  const char* name;         ///< as in the text of a coordinate system
+  const char* displayName;  ///< for people
+  double factor;            ///< to metres, or to degrees
+  std::int32_t kind;        ///< 0 linear, 1 angular
+  std::int32_t code;        ///< of the EPSG registry; from 109001 on, of the projection engine
 };
 
 /// The units, ended by a row with code -1.

@@ -31,9 +31,11 @@ class CoordSysImpl {
   virtual std::int32_t Type() const = 0;
   /// Map coordinates to geographic positions, in place.
   virtual void Unproject(Array<double>& points) const = 0;
+  /// Unproject for one point.
   virtual void MapToGeo(double& x, double& y, double& longitude, double& latitude) const = 0;
   /// Geographic positions to map coordinates, in place.
   virtual void Project(Array<double>& points) const = 0;
+  /// Project for one point.
   virtual void GeoToMap(double longitude, double latitude, double& x, double& y) const = 0;
   /// Carries geographic positions on this system's datum to that of the system with the text
   /// `target`, in place.
@@ -46,6 +48,7 @@ class CoordSysImpl {
   virtual const CoordSysInfo* Info() const = 0;
   /// Code of the system in the EPSG registry, 0 when it has none.
   virtual std::int32_t Code() const = 0;
+  /// Adds 1 to the count.
   virtual void AddRef() = 0;
   /// @return the remaining count.
   virtual std::int32_t Release() = 0;

@@ -9,7 +9,7 @@ namespace lumo {
 /// The plain description of a coordinate system. The defaults describe the empty one.
 ///
 /// The library only carries these values and compares `name`, `unitName`, `parameters` and
-/// `datumName`; docs/georeferencing.md tells what the plug-in writes into each.
+/// `datumName`; docs/georeferencing.md says what the plug-in writes into each.
 struct CoordSysInfo {
   static constexpr unsigned kParameterCount = 16;
 
@@ -20,7 +20,7 @@ struct CoordSysInfo {
   String datumName{"D_Unknown"};
   String spheroidName{""};
   String semiMajorText{"0.0"};
-  double semiMajor = 0;  ///< metres
+  double semiMajor = 0;  ///< metres, the number of the text above
   String inverseFlatteningText{"0.0"};
   double inverseFlattening = 0;  ///< 0 for a sphere
   String primeMeridianText{"0.0"};

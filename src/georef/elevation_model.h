@@ -17,13 +17,15 @@ class VEXG_EXPORT ElevationModel {
  public:
   virtual ~ElevationModel() = default;
 
+  /// Columns of the grid.
   virtual unsigned Samples() const = 0;
+  /// Rows of the grid.
   virtual unsigned Lines() const = 0;
 
   /// Where the grid lies; null when that is not known, and the model then gives no heights.
   virtual const GeoRef* Reference() const = 0;
 
-  /// Reads a block of heights.
+  /// Reads a block of heights, in metres. False when it can't be read.
   /// @param rect     pixels, inside the grid.
   /// @param heights  [out] (height, width) of the rectangle; NaN where there is no height.
   virtual bool ReadHeights(const SubRect& rect, Array<double>& heights) const = 0;

@@ -15,7 +15,7 @@ class GeoRef;
 class GeoRefCache;
 using GeoRefPtr = Pointer<GeoRef>;
 
-/// A rectangle in map units, or in pixels where a model converts it.
+/// A rectangle in map units, or in pixels where a model converts it; min <= max on both axes.
 struct MapRect {
   double minX = 0;
   double minY = 0;
@@ -23,12 +23,20 @@ struct MapRect {
   double maxY = 0;
 };
 
-/// Tells where the pixels of a raster lie on the ground.
+/// Says where the pixels of a raster lie on the ground.
 ///
 /// Pixel coordinates are real numbers, x along the line and y down, (0, 0) the upper left corner of
 /// the first pixel of an affine model. Map coordinates are easting and northing, or longitude and
 /// latitude, in the unit of the coordinate system. A points array has x and y of a point next to
 /// one another, dimensions (points, 2).
+///
+///     const GeoRefPtr model = raster->GetRasterDef().geoRef;  // empty for an unknown place
+///     if (model.IsNull()) return false;
+///     double east = 0, north = 0;
+///     if (!model->PixelToMap(x + 0.5, y + 0.5, east, north)) return false;  // a pixel's middle
+///
+/// Many points in one array cost far less than one by one where coordinate systems or a camera take
+/// part.
 ///
 /// Threads:   conversions may run on many threads at once once SetDimensions has filled the caches;
 ///            a thread that changes the model must be alone.
@@ -39,9 +47,10 @@ class VEXG_EXPORT GeoRef {
  public:
   using PointerRoot = GeoRef;
 
+  /// The class of the model, for files and commands.
   enum Type : std::uint32_t { kUnknown = 0, kStd = 1, kRpc = 2, kStdRpc = 3 };
 
-  /// What IsEqual leaves out.
+  /// Names what IsEqual leaves out.
   enum EqualFlags : std::uint32_t { kSkipPixelSize = 1, kSkipTiePoint = 2 };
 
   virtual ~GeoRef() = default;
@@ -54,12 +63,16 @@ class VEXG_EXPORT GeoRef {
 
   /// Pixels to map coordinates, in place. The corners of a rectangle are put in order again.
   virtual bool PixelToMap(MapRect& rect) const = 0;
+  /// Pixels to map coordinates for the points of an array, in place.
   virtual bool PixelToMap(Array<double>& points) const = 0;
+  /// Pixels to map coordinates for one point.
   virtual bool PixelToMap(double x, double y, double& mapX, double& mapY) const = 0;
 
   /// Map coordinates to pixels, in place.
   virtual bool MapToPixel(MapRect& rect) const = 0;
+  /// Map coordinates to pixels for the points of an array, in place.
   virtual bool MapToPixel(Array<double>& points) const = 0;
+  /// Map coordinates to pixels for one point.
   virtual bool MapToPixel(double mapX, double mapY, double& x, double& y) const = 0;
 
   /// Carries pixels of this model to pixels of `other`, in place, through the coordinate systems of
@@ -69,7 +82,7 @@ class VEXG_EXPORT GeoRef {
   /// Carries map coordinates of this model to the coordinate system of `other`, in place.
   virtual bool MapToMap(Array<double>& points, const GeoRef& other) const;
 
-  /// Tells the size of the raster and fills the caches.
+  /// Sets the size of the raster and fills the caches.
   virtual void SetDimensions(unsigned samples, unsigned lines) = 0;
 
   /// Latitude of the middle of the raster, in degrees.
@@ -96,16 +109,22 @@ class VEXG_EXPORT GeoRef {
   /// True for an object of the class with `TypeCode`, or of one derived from it.
   bool IsA(unsigned typeCode) const;
 
+  /// A Type.
   std::uint32_t GetType() const { return type_; }
-  double PixelSizeX() const { return pixelSizeX_; }
-  double PixelSizeY() const { return pixelSizeY_; }
-  double TieMapX() const { return tieMapX_; }
+  double PixelSizeX() const { return pixelSizeX_; }  ///< map units, along the line
+  double PixelSizeY() const {
+    return pixelSizeY_;
+  }                                            ///< map units; positive for a raster with north up
+  double TieMapX() const { return tieMapX_; }  ///< map coordinates of the tie point
   double TieMapY() const { return tieMapY_; }
-  double TiePixelX() const { return tiePixelX_; }
+  double TiePixelX() const { return tiePixelX_; }  ///< its pixel coordinates
   double TiePixelY() const { return tiePixelY_; }
+  /// The system of the map coordinates; empty when it isn't known.
   const CoordSys& CoordinateSystem() const { return coordSys_; }
+  /// Size of the raster, as SetDimensions has set it; 0 before.
   unsigned Samples() const { return samples_; }
   unsigned Lines() const { return lines_; }
+  /// Degrees by which the grid is turned about the tie point.
   double Rotation() const { return rotation_; }
 
   // Each setter also fills the caches again when the size of the raster is known.
@@ -116,7 +135,9 @@ class VEXG_EXPORT GeoRef {
   void SetTieMap(double x, double y);
   /// Pixel coordinates of the tie point.
   void SetTiePixel(double x, double y);
+  /// Turns the grid about the tie point.
   void SetRotation(double degrees);
+  /// Sets the system of the map coordinates, which stay as they are.
   void SetCoordinateSystem(const CoordSys& coordSys);
 
  protected:
@@ -156,12 +177,13 @@ class VEXG_EXPORT GeoRef {
   double rotation_ = 0;  // degrees
 };
 
-/// A copy of its own of what `source` holds; empty when that is.
+/// Makes a deep copy of a model; empty when `source` is.
 VEXG_EXPORT GeoRefPtr CloneOf(const GeoRefPtr& source);
 
 /// The text form: the word "Std", "Rpc" or "StdRpc", a blank, and what Write gives. A null pointer
 /// is "Unknown ".
 VEXG_EXPORT std::ostream& operator<<(std::ostream& out, const GeoRef& geoRef);
+/// The text form of the model that a pointer holds.
 VEXG_EXPORT std::ostream& operator<<(std::ostream& out, const GeoRefPtr& geoRef);
 
 /// Reads the word and, when it names the type of `geoRef`, the rest; otherwise fails the stream.

@@ -10,6 +10,7 @@ namespace lumo {
 /// one conversion of an array.
 class HeightReader {
  public:
+  /// @param model  outlives the reader; nearest and bilinear heights are in metres, as it has them.
   explicit HeightReader(const ElevationModel& model)
       : model_(model), samples_(model.Samples()), lines_(model.Lines()) {}
 

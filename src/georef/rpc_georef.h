@@ -12,20 +12,22 @@ namespace lumo {
 /// Lines and samples count from the centre of the first pixel; heights are metres above the
 /// ellipsoid.
 struct RpcCoefficients {
+  /// The line offset of coefficients that were never set.
   static constexpr double kNeverSet = -1111100000.0;
+  /// Terms of a cubic polynomial of three variables.
   static constexpr std::size_t kTerms = 20;
   using Polynomial = std::array<double, kTerms>;
 
   double lineOffset = kNeverSet;  ///< kNeverSet: there is no model yet
-  double sampleOffset = 0;
-  double latitudeOffset = 0;
-  double longitudeOffset = 0;
-  double heightOffset = 0;
-  double lineScale = 0;
-  double sampleScale = 0;
-  double latitudeScale = 0;
-  double longitudeScale = 0;
-  double heightScale = 0;
+  double sampleOffset = 0;        ///< pixels
+  double latitudeOffset = 0;      ///< degrees
+  double longitudeOffset = 0;     ///< degrees
+  double heightOffset = 0;        ///< metres
+  double lineScale = 0;           ///< pixels
+  double sampleScale = 0;         ///< pixels
+  double latitudeScale = 0;       ///< degrees
+  double longitudeScale = 0;      ///< degrees
+  double heightScale = 0;         ///< metres
   Polynomial lineNumerator{};
   Polynomial lineDenominator{};
   Polynomial sampleNumerator{};
@@ -66,9 +68,12 @@ class VEXG_EXPORT RpcGeoRef : public GeoRef {
   void Write(std::ostream& out) const override;
   void Read(std::istream& in) override;
 
+  /// The camera of the whole scene, without the subset below.
   const RpcCoefficients& Coefficients() const { return rpc_; }
+  /// Takes over a camera.
   void SetCoefficients(const RpcCoefficients& coefficients);
 
+  /// The subset: see SetSubset.
   double SampleOffset() const { return sampleOffset_; }
   double LineOffset() const { return lineOffset_; }
   double SampleScale() const { return sampleScale_; }
@@ -78,13 +83,16 @@ class VEXG_EXPORT RpcGeoRef : public GeoRef {
   /// Divides samples and lines of all positions by two factors. The size of the raster stays.
   void Resample(double factorX, double factorY);
 
+  /// The elevation model that heights are read from; empty for none.
   const ElevationModelPtr& Dem() const { return dem_; }
+  /// Metres added to every height that is read.
   double DemHeightOffset() const { return demHeightOffset_; }
   /// @param heightOffset  metres, added to every height that is read.
   void SetDem(const ElevationModelPtr& dem, double heightOffset = 0);
 
   /// The system of the model's latitude and longitude, WGS 84 at first.
   const CoordSys& GroundCoordinateSystem() const { return groundCoordSys_; }
+  /// Sets that system; positions are carried from it to CoordinateSystem().
   void SetGroundCoordinateSystem(const CoordSys& coordSys);
 
  protected:

@@ -10,12 +10,12 @@ namespace lumo {
 struct RpcBlock {
   static constexpr std::size_t kPoints = 64;
 
-  double longitude[kPoints];
-  double latitude[kPoints];
-  double height[kPoints];  ///< normalised
-  double sample[kPoints];  ///< of the pixel grid before any subset
+  double longitude[kPoints];  ///< degrees
+  double latitude[kPoints];   ///< degrees
+  double height[kPoints];     ///< normalised
+  double sample[kPoints];     ///< of the pixel grid before any subset
   double line[kPoints];
-  std::size_t count = 0;
+  std::size_t count = 0;  ///< points in use
 };
 
 /// The bare rational polynomials: ground positions in degrees, and heights, to pixels and back.
@@ -24,8 +24,10 @@ class RpcModel {
   /// Height of a point that has none; it stands for HEIGHT_OFF.
   static constexpr double kNoHeight = -99999.0;
 
+  /// @param rpc  outlives the model.
   explicit RpcModel(const RpcCoefficients& rpc) : rpc_(rpc) {}
 
+  /// A height in metres as the polynomials take it; 0 for kNoHeight.
   double NormalisedHeight(double height) const {
     return height == kNoHeight ? 0 : (height - rpc_.heightOffset) / rpc_.heightScale;
   }

@@ -5,10 +5,17 @@
 namespace lumo {
 
 /// An affine grid: pixels of one size, a tie point, and a rotation about it.
+///
+///     StdGeoRef grid;
+///     grid.SetPixelSize(10, 10);
+///     grid.SetTiePixel(0, 0);             // the upper left corner of the raster ...
+///     grid.SetTieMap(500000, 5400000);    // ... lies here
+///     grid.SetCoordinateSystem(utm);
+///     grid.SetDimensions(samples, lines);
 class VEXG_EXPORT StdGeoRef : public GeoRef {
  public:
   static const unsigned TypeCode;
-  /// What the rotation is multiplied by: pi / 180 as single precision has it.
+  /// Radians of a degree by which rotations are computed: pi / 180 as single precision has it.
   static constexpr double kRadiansPerDegree = 0.0174532923847437;
 
   StdGeoRef() { type_ = kStd; }

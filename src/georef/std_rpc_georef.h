@@ -5,7 +5,8 @@
 
 namespace lumo {
 
-/// An affine grid, by which it converts, that also carries the camera model of the raster.
+/// An affine grid, by which it converts, that also carries the camera model of the raster, as
+/// scenes come that were resampled to a grid. The camera plays no part in the conversions.
 class VEXG_EXPORT StdRpcGeoRef : public StdGeoRef {
  public:
   static const unsigned TypeCode;
@@ -18,7 +19,9 @@ class VEXG_EXPORT StdRpcGeoRef : public StdGeoRef {
   void Write(std::ostream& out) const override;
   void Read(std::istream& in) override;
 
+  /// The camera model.
   const RpcGeoRef& Rpc() const { return rpc_; }
+  /// Takes a copy of a camera model.
   void SetRpc(const RpcGeoRef& rpc);
 
  private:

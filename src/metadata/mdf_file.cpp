@@ -23,7 +23,7 @@ constexpr std::size_t kKeptLines = 6;
 constexpr std::size_t kShortestPath = 3;
 constexpr std::uint64_t kMaxSharedElements = 65536;  // of an array that many entries fill
 
-/// What is wrong; none when nothing is.
+/// The reason why a line can't be used; none when it can.
 using Fault = std::optional<std::string>;
 
 constexpr std::pair<std::u16string_view, unsigned> kTypes[] = {

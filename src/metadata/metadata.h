@@ -9,23 +9,25 @@
 
 namespace lumo {
 
-/// A tree of values that several Metadata share, with its lock.
+/// A tree of values that several Metadata share, with its lock. Who reads or writes it by itself
+/// holds Lock().
 class VEXG_EXPORT LockableMetadataImpl : public MetadataContainer, public Lockable {
  public:
   using PointerRoot = LockableMetadataImpl;
 };
 using LockableMetadataImplPtr = Pointer<LockableMetadataImpl>;
 
-/// What stands at a path of a Metadata.
+/// Describes the value or container at a path of a Metadata.
 struct MetadataProperties {
-  String typeName;  ///< the type word; "container" for a container
-  unsigned typeCode = 0;
-  unsigned count = 0;    ///< elements, or children of a container
-  bool isArray = false;  ///< rows and columns are set
-  unsigned rows = 0;
+  String typeName;        ///< the type word; "container" for a container
+  unsigned typeCode = 0;  ///< see MetadataTypeOf; 20 for a container
+  unsigned count = 0;     ///< elements, or children of a container
+  bool isArray = false;   ///< rows and columns are set
+  unsigned rows = 0;      ///< of an array of rank 2
   unsigned columns = 0;
 };
 
+/// The ten element types that a value can have.
 template <typename T>
 concept MetadataScalar = std::is_same_v<T, std::uint8_t> || std::is_same_v<T, std::int16_t> ||
     std::is_same_v<T, std::int32_t> || std::is_same_v<T, float> || std::is_same_v<T, double> ||
@@ -36,6 +38,11 @@ concept MetadataScalar = std::is_same_v<T, std::uint8_t> || std::is_same_v<T, st
 /// A tree of typed values under paths such as "/Image/Bands/Gain/", in which slashes at the ends do
 /// not matter and case does. Paths that contain "/private/" hold internal entries, which GetNames
 /// hides.
+///
+///     Metadata metadata;
+///     metadata.Set("/Image/CloudCover", 12.5);
+///     double clouds = 0;
+///     if (metadata.Get("/Image/CloudCover", clouds)) …  // false for another type than double
 ///
 /// Copies are cheap: they share one store until one of them is written to.
 /// Threads: any operation on any thread. Each holds the store's lock for its whole length.
@@ -69,6 +76,7 @@ class VEXG_EXPORT Metadata : public Object {
   bool Set(const String& path, const T& value) {
     return Put(path, [&] { return std::make_unique<MetadataValue<T>>(std::vector<T>{value}); });
   }
+  /// Stores a text, UTF-8.
   bool Set(const String& path, const char* text) { return Set(path, String(text)); }
 
   /// Stores a value of unknown type of which only a size is known.
@@ -84,13 +92,16 @@ class VEXG_EXPORT Metadata : public Object {
   bool Get(const String& path, T& value) const {
     return Read(path, [&](const MetadataObject& object) { return object.Get(value, 0); });
   }
+  /// The text of the first element. False for a value of another type, see
+  /// MetadataObject::ValueString.
   bool GetString(const String& path, String& value) const { return Get(path, value); }
 
   /// All elements, of rank 2 when they were stored so. False as for Get.
   template <MetadataScalar T>
   bool GetArray(const String& path, Array<T>& array) const;
 
-  /// Calls `use(const MetadataObject&)` with what stands at `path`, under the store's lock.
+  /// Calls `use(const MetadataObject&)` for the value or container at `path`, under the store's
+  /// lock. `use` must not touch this Metadata.
   /// @return what it gave; false, with no call, when there is nothing.
   template <typename Use>
   bool Visit(const String& path, Use&& use) const {

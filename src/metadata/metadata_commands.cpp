@@ -15,7 +15,7 @@ const InputDeclaration kPath{"PATH", Presence::kRequired, ValueKind::kText,
 /// Base of the commands on metadata of the catalog.
 class MetadataCommand : public Command {
  protected:
-  /// The object whose URI the input holds; else empty, with the fault told.
+  /// The object whose URI the input holds; else empty, with the fault set.
   MetadataPtr FindMetadata() const {
     const MetadataPtr metadata(CatalogFind(Read<URI>("URI")));
     if (!metadata) SetFault("URI: no such metadata is open");

@@ -11,7 +11,7 @@ namespace {
 
 constexpr std::u16string_view kBlanks = u" \t\r\n";
 
-/// What stands before each delimiter of a list, and behind the last one unless that is blank.
+/// Splits a list at its delimiters; the piece behind the last one counts unless it is blank.
 std::vector<std::u16string_view> SplitList(std::u16string_view text, const MdfFormat& format) {
   const char16_t delimiters[] = {format.vsep, format.em, 0};
   std::vector<std::u16string_view> tokens;

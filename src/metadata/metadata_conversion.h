@@ -7,7 +7,7 @@
 
 namespace lumo {
 
-/// What became of a text that an entry wants as a value.
+/// The outcome for a text that an entry wants as a value.
 enum class Conversion {
   kDone,       ///< the value stands in the target
   kStaysText,  ///< the text holds no value of the type; nothing was stored

@@ -15,7 +15,7 @@ struct UndefinedCount {
   std::uint32_t value = 0;
 };
 
-/// What a metadata value's type word and code are, by element type.
+/// Names the type word and the type code of a metadata value, by its element type.
 template <typename T>
 struct MetadataTypeOf;
 
@@ -49,6 +49,7 @@ class VEXG_EXPORT MetadataObject {
   virtual String ValueString() const = 0;
   /// The elements and their number; null and 0 for a container.
   virtual const void* Data(unsigned& count) const = 0;
+  /// Elements, or children of a container.
   virtual unsigned Count() const = 0;
 
   // Element `index`; false past the end, or when the elements have another type. No class has
@@ -80,15 +81,19 @@ class VEXG_EXPORT MetadataObject {
   virtual bool Get(std::vector<std::int16_t>& values) const;
   virtual bool Get(std::vector<std::uint8_t>& values) const;
 
+  /// The type word; "container" for a container.
   virtual const char* TypeName() const = 0;
+  /// The type code; 20 for a container.
   virtual unsigned TypeCode() const = 0;
   /// True when the elements are stored as rows and columns.
   virtual bool Is2D() const { return rows_ > 0 && columns_ > 0; }
+  /// The shape of elements that are stored as rows and columns. False for others.
   virtual bool Dims(unsigned& rows, unsigned& columns) const;
-  /// One line of text that tells path, type, shape and value, for the parse log. A container gives
-  /// the lines of its children in the order of their names.
+  /// One line of text with path, type, shape and value, for the parse log. A container gives the
+  /// lines of its children in the order of their names.
   virtual String Describe(const String& path) const;
 
+  /// Declares the elements rows and columns; their product is the number of elements.
   void SetDims(unsigned rows, unsigned columns) {
     rows_ = rows;
     columns_ = columns;
@@ -99,7 +104,7 @@ class VEXG_EXPORT MetadataObject {
   unsigned columns_ = 0;
 };
 
-/// A value with elements of type T; a scalar has one.
+/// A value with elements of type T; a scalar has one. It owns them, and only its shape can change.
 template <typename T>
 class VEXG_EXPORT MetadataValue final : public MetadataObject {
  public:
@@ -126,6 +131,7 @@ class VEXG_EXPORT MetadataValue final : public MetadataObject {
   const char* TypeName() const override { return MetadataTypeOf<T>::kWord; }
   unsigned TypeCode() const override { return MetadataTypeOf<T>::kCode; }
 
+  /// The elements, row after row where there are rows.
   const std::vector<T>& Elements() const { return elements_; }
 
  private:
@@ -147,6 +153,7 @@ using MetadataULong64 = MetadataValue<std::uint64_t>;
 /// Named values in the order of their names, which are case-sensitive. It owns them.
 class VEXG_EXPORT MetadataContainer : public MetadataObject {
  public:
+  /// The type code of containers.
   static constexpr unsigned kTypeCode = 20;
   static constexpr unsigned kMaxDepth = 256;  ///< names in a path
   using Children = std::map<String, std::unique_ptr<MetadataObject>>;
@@ -163,10 +170,11 @@ class VEXG_EXPORT MetadataContainer : public MetadataObject {
   unsigned TypeCode() const override { return kTypeCode; }
   String Describe(const String& path) const override;
 
+  /// The values and containers right in this one, by name.
   const Children& GetChildren() const { return children_; }
 
-  /// What stands at `path`, pieces between slashes, empty ones dropped; null when nothing does, or
-  /// when the path has no piece.
+  /// The value or container at `path`, pieces between slashes, empty ones dropped; null when there
+  /// is none, or when the path has no piece.
   const MetadataObject* Find(const String& path) const;
 
   /// Puts a value at `path`, in place of what stood there; missing containers on the way are made.

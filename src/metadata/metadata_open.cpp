@@ -26,15 +26,14 @@ bool Fail(const char* format, Values... values) {
   return false;
 }
 
-/// Fail, with the fault told too.
+/// Fail, with the fault set too.
 template <typename... Values>
 bool FailWith(const std::string& fault, const char* format, Values... values) {
   SetFault(fault);
   return Fail(format, values...);
 }
 
-/// The row of the table for well-formed connection strings; null, with the failure told, for
-/// others.
+/// The row of the table for well-formed connection strings; null, with the fault set, for others.
 const MetadataFormat* CheckStrings(const Array<String>& strings) {
   const std::string word = strings[0].ToUTF8();
   if (strings.GetCount() < 2) {

@@ -5,7 +5,7 @@
 
 namespace lumo {
 
-// Where a parser keeps what it read, and how.
+// Paths under which a parser notes what it read, and how.
 inline constexpr const char* kParserInfo = "/xx vex parser info/";
 inline constexpr const char* kParserUri = "/xx vex parser info/uri/";
 inline constexpr const char* kParserType = "/xx vex parser info/type/";
@@ -16,6 +16,7 @@ inline constexpr const char* kParserType = "/xx vex parser info/type/";
 /// Threads: used by one thread.
 class VEXG_EXPORT MetadataParser {
  public:
+  /// Reads the whole input into the collection.
   virtual bool Parse() = 0;
   virtual void LogCollection() const;  ///< writes the texts to the parse log
   virtual ~MetadataParser() = default;

@@ -10,7 +10,8 @@ namespace lumo {
 // `connStrings` are the format's word, the input, and for XML formats what the input is: "XmlFile",
 // which it is when nothing is said, "XmlUrl" or "XmlString".
 
-/// What the readers have in common.
+/// Reads texts and XML documents for the readers below: parses, then translates by a definition
+/// file.
 class VEXG_EXPORT MetadataReader : protected MetadataDefFileTranslator {
  protected:
   /// Reads lines of names and values.
@@ -19,7 +20,7 @@ class VEXG_EXPORT MetadataReader : protected MetadataDefFileTranslator {
   bool ReadXml(const Array<String>& connStrings, const String& mdfPath, MetadataContainer& target);
 };
 
-/// Lines of names and values.
+/// Reads lines of names and values.
 class VEXG_EXPORT TextMetadataReader final : MetadataReader {
  public:
   bool Read(const Array<String>& connStrings, const String& mdfPath, MetadataContainer& target) {
@@ -27,7 +28,7 @@ class VEXG_EXPORT TextMetadataReader final : MetadataReader {
   }
 };
 
-/// XML documents.
+/// Reads XML documents.
 class VEXG_EXPORT XmlMetadataReader final : MetadataReader {
  public:
   bool Read(const Array<String>& connStrings, const String& mdfPath, MetadataContainer& target) {
@@ -35,8 +36,8 @@ class VEXG_EXPORT XmlMetadataReader final : MetadataReader {
   }
 };
 
-/// Headers of ORVA rasters. The coordinate system is one text although it stands in braces; points
-/// count from 0 in place of 1, and their map coordinates come as x, y.
+/// Reads headers of ORVA rasters. The coordinate system is one text although it stands in braces;
+/// points count from 0 in place of 1, and their map coordinates come as x, y.
 class VEXG_EXPORT OrvaMetadataReader final : MetadataReader {
  public:
   bool Read(const Array<String>& connStrings, const String& mdfPath, MetadataContainer& target) {
@@ -48,7 +49,7 @@ class VEXG_EXPORT OrvaMetadataReader final : MetadataReader {
                  const MdfFormat& format) override;
 };
 
-/// The GML of JPEG 2000 files. Names of coordinate systems become their codes.
+/// Reads the GML of JPEG 2000 files. Names of coordinate systems become their codes.
 class VEXG_EXPORT GmlMetadataReader final : MetadataReader {
  public:
   bool Read(const Array<String>& connStrings, const String& mdfPath, MetadataContainer& target) {
@@ -60,7 +61,7 @@ class VEXG_EXPORT GmlMetadataReader final : MetadataReader {
                  const MdfFormat& format) override;
 };
 
-/// Product descriptions of Pleiades scenes. Names of coordinate systems become their codes.
+/// Reads product descriptions of Pleiades scenes. Names of coordinate systems become their codes.
 class VEXG_EXPORT PleiadesDimMetadataReader final : MetadataReader {
  public:
   bool Read(const Array<String>& connStrings, const String& mdfPath, MetadataContainer& target) {
@@ -72,7 +73,7 @@ class VEXG_EXPORT PleiadesDimMetadataReader final : MetadataReader {
                  const MdfFormat& format) override;
 };
 
-/// Texts that a plug-in collected, with lists that blanks separate.
+/// Reads texts that a plug-in has collected, with lists that blanks separate.
 class VEXG_EXPORT CollectedMetadataReader final : MetadataReader {
  public:
   bool Read(MetadataContainer& collection, const String& mdfPath, MetadataContainer& target);

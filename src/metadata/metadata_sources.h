@@ -5,9 +5,9 @@
 
 namespace lumo {
 
-/// What the floors above do for Metadata::Open.
+/// Holds the functions by which the floors above serve Metadata::Open; null until they are set.
 struct MetadataSources {
-  /// True when the process may read a file or address; else tells the fault.
+  /// True when the process may read a file or address; else sets the fault.
   bool (*mayOpen)(const String& name) = nullptr;
   /// Fills a store from a source's own metadata, through its plug-in.
   bool (*readConnection)(const Array<String>& connStrings, const String& mdfPath,

@@ -6,7 +6,7 @@
 
 #include "foundation/string.h"
 
-// What the readers of metadata texts have in common. The texts are UTF-16; blanks are blanks and
+// Pieces that the readers of metadata texts share. The texts are UTF-16; blanks are blanks and
 // tabs, and case means that of ASCII letters.
 
 namespace lumo {
@@ -22,13 +22,17 @@ VEXG_EXPORT bool ReadMetadataFile(const std::string& path, std::string& bytes, s
 /// UTF-8 bytes, with or without a mark of byte order at the start, as text.
 std::u16string DecodeMetadataText(std::string_view bytes);
 
+/// The text as a String.
 String ToString(std::u16string_view text);
+/// The units of a String, as long as it lives unchanged.
 std::u16string_view View(const String& text);
 
 /// `text` without the characters of `marks` at both ends.
 std::u16string_view Trimmed(std::u16string_view text, std::u16string_view marks = u" \t");
 
+/// The text with a to z in upper case.
 std::u16string ToUpper(std::u16string_view text);
+/// The text with A to Z in lower case.
 std::u16string ToLower(std::u16string_view text);
 
 /// "/a/b/" for any way of writing that path.
@@ -50,9 +54,8 @@ class TextLines {
   unsigned number_ = 0;
 };
 
-/// Reads the unsigned number at the start of `text`, with the base told by a prefix: 0x sixteen, 0
-/// eight, else ten; a sign in front is taken as the C library takes it. What follows is not looked
-/// at.
+/// Reads the unsigned number at the start of `text`, whose prefix gives the base: 0x sixteen, 0
+/// eight, else ten; a sign in front is taken as the C library takes it. The rest is not looked at.
 /// @return where the number ends; 0 when there is none, or none that 64 bits hold.
 std::size_t ReadUnsigned(std::u16string_view text, std::uint64_t& value);
 

@@ -72,7 +72,7 @@ void LogTarget(const MetadataContainer& target) {
   log.Write(MetadataParseLog::kTranslated, out);
 }
 
-/// What ConvertText gave, as the answer of an entry.
+/// Turns the outcome of ConvertText into the answer of an entry.
 bool Settle(Conversion outcome, const MdfEntry& entry) {
   if (outcome == Conversion::kStaysText) {
     MetadataParseLog::Instance().Write(MetadataParseLog::kErrors,

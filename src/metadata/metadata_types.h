@@ -6,6 +6,7 @@ namespace lumo {
 
 namespace detail {
 
+/// Runs `body` for the one of Ts with the type code `code`.
 template <typename... Ts, typename Body>
 bool DispatchMetadataTypeOf(unsigned code, Body&& body) {
   return ((code == MetadataTypeOf<Ts>::kCode && body.template operator()<Ts>()) || ...);

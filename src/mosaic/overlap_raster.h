@@ -17,6 +17,9 @@ namespace lumo {
 ///
 /// Both rasters are read to the nearest pixel. A pixel that isn't valid may have any value.
 ///
+///     const RasterPtr<float> overlap(new OverlapRaster<float, float>(left, right));
+///     if (overlap->Samples() == 0) return false;  // they have no area in common
+///
 /// Ownership: shares both rasters, which do not know the view.
 /// Threads:   every operation may run on many threads at once, where the rasters allow it; nothing
 ///            is stored per call.

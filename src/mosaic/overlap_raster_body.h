@@ -136,7 +136,7 @@ inline std::optional<SubRect> CommonPixels(const RasterDef& first, const RasterD
 
 }  // namespace detail
 
-/// Gives pixels of the first raster, and tells where both are valid, over the lines of a block: one
+/// Gives pixels of the first raster, and marks where both are valid, over the lines of a block: one
 /// body for all interleaves.
 template <typename T>
 class OverlapRasterGetDataParallel final : public ArrayParallelFor {

@@ -1,4 +1,5 @@
 #pragma once
 
-/// Marks what libvexg.so offers to programs and plug-ins; everything else stays inside it.
+/// Marks a class or function that libvexg.so offers to programs and plug-ins; all others stay
+/// inside it.
 #define VEXG_EXPORT __attribute__((visibility("default")))

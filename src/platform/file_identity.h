@@ -7,10 +7,11 @@
 
 namespace lumo::platform {
 
-/// Tells one file from another, and from itself after a change.
+/// Identifies a file and its state, so that it can be distinguished from another one, and from
+/// itself after a change.
 struct FileIdentity {
-  bool exists = false;
-  std::uint64_t device = 0;
+  bool exists = false;       ///< there was a file
+  std::uint64_t device = 0;  ///< of the file system
   std::uint64_t number = 0;  ///< by which the file system knows it
   std::uint64_t size = 0;    ///< bytes
   std::int64_t time = 0;     ///< of the last change, in ns since 1970

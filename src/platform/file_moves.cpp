@@ -14,7 +14,7 @@
 namespace lumo::platform {
 namespace {
 
-/// Tells why a call on `path` failed; errno stays.
+/// Says why a call on `path` failed; errno stays.
 bool FailOn(const std::string& path, std::string* fault) {
   const int code = errno;
   if (fault != nullptr) *fault = path + ": " + SystemErrorText(code);

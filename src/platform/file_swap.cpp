@@ -16,7 +16,7 @@ bool FileSwap::MoveAside(const std::string& path, std::string* fault) {
     return true;
   }
   if (errno == ENOENT) return true;
-  // The temporary path would tell nobody anything.
+  // The temporary path would mean nothing to anybody.
   if (fault != nullptr) *fault = path + why.substr(why.find(": "));
   return false;
 }

@@ -12,6 +12,11 @@ namespace lumo::platform {
 ///
 /// Failure: false, and one line in `fault`, where that isn't null: "path: what"; errno holds the
 /// system's number. The next thing to do is to let the swap go.
+///
+///     FileSwap swap;
+///     if (!swap.MoveIn(newPixels, pixels, &fault)) return false;
+///     if (!swap.MoveIn(newHeader, header, &fault)) return false;  // the old pixels are back
+///     swap.Keep();
 class VEXG_EXPORT FileSwap {
  public:
   FileSwap() = default;

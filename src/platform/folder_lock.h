@@ -15,6 +15,10 @@ class FileDescriptor;
 /// It is held while little is written, never over a computation, and not twice on one thread. The
 /// system lets go of it when a process ends. Where a folder can't be locked, as on some network
 /// file systems, there is no order between programs.
+///
+///     const FolderLock lock(path);
+///     if (!lock.IsHeld(&fault)) return false;
+///     …  // read what is there by now, change it, replace the file
 class VEXG_EXPORT FolderLock {
  public:
   /// Waits for the lock on the folder that `path` lies in, up to half a minute.

@@ -4,14 +4,14 @@
 #include <cstddef>
 #include <cstdint>
 
-// What happens when a file that is mapped into this process loses its pages, as when another
-// process makes it shorter: the touch of such a page would end the process with a bus error. For
-// the sources of this folder only.
+// A file that is mapped into this process may lose its pages, as when another process makes it
+// shorter: the touch of such a page would end the process with a bus error. The guard here keeps it
+// alive. For the sources of this folder only.
 
 namespace lumo::platform {
 
 /// Guards a mapping while it lives. When a page of it is touched that the system can't give, zeros
-/// of this process's own take the place of the whole mapping, and WasCut() tells.
+/// of this process's own take the place of the whole mapping, and WasCut() is true.
 ///
 /// The first guard installs a handler for SIGBUS, which passes on what is none of its business.
 class MemoryGuard {
@@ -25,6 +25,7 @@ class MemoryGuard {
 
   /// False when the process has too many guards already; the mapping must not be used then.
   bool IsActive() const { return slot_ != nullptr; }
+  /// True once a page was touched that the system couldn't give.
   bool WasCut() const;
 
   /// A place in the table that the handler looks through. A slot with size 0 guards nothing.

@@ -10,7 +10,7 @@ namespace lumo::platform {
 // failures behind another reason, or go on without what they could not make, so whoever is about to
 // believe a result asks here whether memory was short meanwhile.
 
-/// The words of the failure, wherever it is told.
+/// The words of the failure, wherever it is reported.
 inline constexpr const char* kOutOfMemory = "out of memory";
 
 /// Notes that memory was asked for in vain. Safe anywhere, in an allocator too.
@@ -20,10 +20,11 @@ VEXG_EXPORT void NoteMemoryShortage() noexcept;
 /// meet one, and by a program that watches all its allocations (program/watched_allocation.cpp).
 VEXG_EXPORT unsigned long CountMemoryShortages() noexcept;
 
-/// Tells whether memory was short since it was made, on any thread of the process.
+/// Watches for a shortage of memory, on any thread of the process, since it was made.
 class MemoryWatch {
  public:
   MemoryWatch() noexcept : before_(CountMemoryShortages()) {}
+  /// True when memory was asked for in vain since then.
   bool WasShort() const noexcept { return CountMemoryShortages() != before_; }
 
  private:

@@ -4,8 +4,8 @@
 #include <string>
 #include <string_view>
 
-// How messages keep their boundaries on a stream socket: 4 bytes with the length, lowest byte
-// first, then the message. For the sources of this folder only.
+// Messages keep their boundaries on a stream socket by 4 bytes with the length, lowest byte first,
+// in front of each. For the sources of this folder only.
 
 namespace lumo::platform {
 

@@ -13,7 +13,7 @@
 namespace lumo::platform {
 namespace {
 
-/// Tells when something changes in the directory of the pipes.
+/// Watches for changes in the directory of the pipes.
 class DirectoryWatch {
  public:
   DirectoryWatch() : events_(inotify_init1(IN_NONBLOCK | IN_CLOEXEC)) {

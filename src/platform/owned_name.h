@@ -9,7 +9,7 @@
 namespace lumo::platform {
 
 // Names of what a process makes for itself alone, in a folder or in the system. The name holds a
-// mark of the process, so that what a killed one left can be told from the work of a running one.
+// mark of the process, which separates the remains of a killed one from the work of a running one.
 
 /// A name that nobody else uses: "beginning.mark".
 VEXG_EXPORT std::string OwnedName(const std::string& beginning);

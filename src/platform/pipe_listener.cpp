@@ -34,7 +34,7 @@ ino_t FileNumber(const std::string& path) {
   return lstat(path.c_str(), &status) == 0 ? status.st_ino : 0;
 }
 
-/// A socket in the file system, which is told from one that has taken its place.
+/// A socket in the file system, distinguished from one that has taken its place.
 struct PipeFile {
   std::string path;
   ino_t number = 0;
@@ -442,7 +442,7 @@ void PipeListener::Impl::AcceptAll() {
     if (!PeerIsOurs(client.Get())) continue;
     peers.emplace_back();
     peers.back().socket = std::move(client);
-    // What a client sends right away is mostly there by now.
+    // A message that a client sends right away is mostly there by now.
     Serve(std::prev(peers.end()), POLLIN);
   }
 }

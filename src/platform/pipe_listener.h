@@ -18,11 +18,10 @@ struct ListenerLimits {
 /// slow, or does not read its answer keeps none of the others waiting; one that breaks the rules of
 /// the frame, or belongs to another user, is closed.
 ///
-/// What clients can hold is bounded (see ListenerLimits): while Wait runs, a client that has not
-/// sent a whole message and stays silent is closed after a while, and, where there are too many
-/// clients, the one that has been silent for longest. The messages that all listeners of the
-/// process are taking in are bounded together; the client with whose message they would be too many
-/// is closed.
+/// Clients can hold no more than ListenerLimits says: while Wait runs, a client that has not sent a
+/// whole message and stays silent is closed after a while, and, where there are too many clients,
+/// the one that has been silent for longest. The messages that all listeners of the process are
+/// taking in are bounded together; the client with whose message they would be too many is closed.
 ///
 /// The name is free again when the object goes, and after the death of the process that had it.
 /// Threads: one thread uses it; only Stop may come from another.

@@ -7,7 +7,7 @@ namespace lumo::platform {
 /// True when standard error is a terminal that somebody may be watching.
 VEXG_EXPORT bool ErrorOutputIsTerminal();
 
-/// Columns of the terminal at standard error; 80 when it does not tell.
+/// Columns of the terminal at standard error; 80 when it does not say.
 VEXG_EXPORT unsigned TerminalColumns();
 
 /// Lets the process open as many files as the system allows it at most; for a program that serves

@@ -12,6 +12,8 @@ namespace lumo::platform {
 ///          process has ended already, and is expected to be short.
 class VEXG_EXPORT ProcessWatch {
  public:
+  /// @param process  its number in the system.
+  /// @param onEnd    is called once at most.
   ProcessWatch(int process, std::function<void()> onEnd);
   /// After this the function is not running and will not be called.
   ~ProcessWatch();

@@ -90,14 +90,14 @@ int Transfer(std::uint64_t offset, std::span<const Piece> pieces, Call&& call) {
   return 0;
 }
 
-/// False, with errno and the fault told, when the file gate refuses the file.
+/// False, with errno and the fault set, when the file gate refuses the file.
 bool IsLetThrough(const std::string& path, bool writing, std::string* fault) {
   if (PassesFileGate(path, writing, fault)) return true;
   errno = EACCES;
   return false;
 }
 
-/// Opens a regular file; none, with errno and the fault told, when that fails.
+/// Opens a regular file; none, with errno and the fault set, when that fails.
 FileDescriptor OpenRegular(const std::string& path, int mode, std::string* fault) {
   FileDescriptor file(RetryInterrupted(
       [&] { return open(path.c_str(), mode | O_CLOEXEC | O_NONBLOCK, kReadableByAll); }));
@@ -226,7 +226,7 @@ bool ReplaceFile(const std::string& path, std::string_view content, std::string*
   const bool written = WriteNewFile(temporary, content, &why);
   if (written && RenameFile(temporary, path, &why)) return true;
   if (written) std::remove(temporary.c_str());
-  if (fault != nullptr) {  // the temporary path would tell nobody anything
+  if (fault != nullptr) {  // the temporary path would mean nothing to anybody
     *fault = why.starts_with(temporary) ? path + why.substr(temporary.size()) : why;
   }
   return false;

@@ -12,11 +12,12 @@
 
 namespace lumo::platform {
 
-/// A stretch of memory that takes part in a transfer.
+/// A run of memory that takes part in a transfer.
 struct FilePiece {
   void* data;
   std::size_t bytes;
 };
+/// A run of memory that is written.
 struct ConstFilePiece {
   const void* data;
   std::size_t bytes;
@@ -24,11 +25,15 @@ struct ConstFilePiece {
 
 /// An open file that is read and written at any place. Nothing is buffered here.
 ///
+///     std::string fault;
+///     const auto file = RandomAccessFile::Open(path, RandomAccessFile::Access::kRead, &fault);
+///     if (!file || !file->Read(offset, data, bytes, &fault)) return false;
+///
 /// Threads: any number of threads may transfer at once; what they do to one place is theirs to
 ///          order.
 /// Failure: false or null, and one line in `fault`, where that isn't null: "path: what". errno
-/// holds
-///          the system's number. A transfer that fails half way may have moved some of its bytes.
+///          holds the system's number. A transfer that fails half way may have moved some of its
+///          bytes.
 class VEXG_EXPORT RandomAccessFile {
  public:
   enum class Access {
@@ -36,7 +41,7 @@ class VEXG_EXPORT RandomAccessFile {
     kUpdate,  ///< reading and writing
   };
 
-  /// Whether the file gate (file_gate.h) judges a file, or the caller has had it judged.
+  /// Says whether the file gate (file_gate.h) judges a file, or the caller has had it judged.
   enum class Gate { kAsk, kPassed };
 
   /// Opens a regular file that exists.
@@ -81,6 +86,7 @@ class VEXG_EXPORT RandomAccessFile {
     return Write(offset, std::span(&piece, 1), fault);
   }
 
+  /// Gets the size of the file now. @param bytes  [out] its size.
   bool GetSize(std::uint64_t& bytes, std::string* fault = nullptr) const;
 
   /// Cuts the file, or lets it grow by zeros that take no room on the disk.
@@ -89,8 +95,8 @@ class VEXG_EXPORT RandomAccessFile {
   /// Returns when what was written is on the disk.
   bool Flush(std::string* fault = nullptr);
 
-  /// Gives the file back to the system, which may tell only now of a write that failed. Nothing
-  /// works any more after it.
+  /// Gives the file back to the system, which may report a failed write only now. Nothing works any
+  /// more after it.
   bool Close(std::string* fault = nullptr);
 
   /// False when the file was deleted, or replaced by another, since it was opened.

@@ -14,7 +14,7 @@ class MemoryGuard;
 /// /dev/shm), where a block is found by its name without a leading slash.
 ///
 /// Another process may make the block shorter at any moment. Its bytes are zeros then, which nobody
-/// else sees, and WasCut() tells; the process lives on.
+/// else sees, and WasCut() is true; the process lives on.
 ///
 /// Threads: the bytes are shared with other processes; access to them is the user's to order.
 class VEXG_EXPORT SharedMemoryBlock {
@@ -36,7 +36,9 @@ class VEXG_EXPORT SharedMemoryBlock {
   SharedMemoryBlock(const SharedMemoryBlock&) = delete;
   SharedMemoryBlock& operator=(const SharedMemoryBlock&) = delete;
 
+  /// The first byte of the view.
   unsigned char* GetData() const { return data_; }
+  /// Bytes of the block, as it was opened or made.
   std::size_t GetSize() const { return size_; }
 
   /// True once bytes of the block were asked for that it doesn't have any more.

@@ -8,7 +8,7 @@
 namespace lumo::platform {
 
 // Names of files and folders that a process makes beside the place that they are to take. The name
-// says which process they belong to, so that what a killed one left can be told from the work of a
+// says which process they belong to, which separates the remains of a killed one from the work of a
 // running one.
 
 /// A path beside `path` that nobody else uses, for a file that is to take its place.
@@ -20,7 +20,7 @@ VEXG_EXPORT std::string TemporaryFolderBeside(const std::string& path);
 /// True when `folder` is one right inside `place` that TemporaryFolderBeside has named.
 VEXG_EXPORT bool IsTemporaryFolderIn(const std::string& folder, const std::string& place);
 /// `text` with the names made here replaced by those of the files that they stand for, which alone
-/// tell a user something.
+/// mean something to a user.
 VEXG_EXPORT std::string WithoutTemporaryNames(std::string text);
 
 /// Removes the files that TemporaryPathBeside named for `path` in a process of this machine that

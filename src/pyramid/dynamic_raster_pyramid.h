@@ -16,16 +16,19 @@ namespace lumo {
 ///
 /// Ownership: shares the connections. Its destructor aborts a build that goes on and waits for it.
 /// Threads:   every operation may be called on any thread. The lock is never held during a build.
-/// Failure:   an empty AsyncPtr, with the fault told, when no build could be started. A build that
-///            failed has its error stored; PyramidAsync tells the fault.
+/// Failure:   an empty AsyncPtr, with the fault set, when no build could be started. A build that
+///            failed has its error stored; PyramidAsync sets the fault.
 template <typename T>
 class DynamicRasterPyramid final : public PyramidCallback<T> {
  public:
-  /// @param makeRaster  makes the rasters that a build works on.
+  /// @param reader,connection                of the raster.
+  /// @param pyramidReader,pyramidConnection  of the store of its levels.
+  /// @param makeRaster                       makes the rasters that a build works on.
   DynamicRasterPyramid(const RasterReaderPtr<T>& reader, const RasterDataConnectionPtr& connection,
                        const RasterReaderPtr<T>& pyramidReader,
                        const RasterDataConnectionPtr& pyramidConnection,
                        const MakeSourceRaster<T>& makeRaster);
+  /// Aborts a build that goes on, and waits for its end.
   ~DynamicRasterPyramid() override;
   DynamicRasterPyramid(const DynamicRasterPyramid&) = delete;
   DynamicRasterPyramid& operator=(const DynamicRasterPyramid&) = delete;
@@ -39,13 +42,14 @@ class DynamicRasterPyramid final : public PyramidCallback<T> {
 
   /// True when the last build has left all statistics of `mask` for the band. False while one runs.
   bool StatsExist(unsigned band, unsigned mask) const;
-  /// What the last build has left; with mask 0 when that is nothing.
+  /// The statistics that the last build has left; mask 0 when it left none.
   RasterBandStats<T> BandStats(unsigned band) const;
+  /// The histograms that the last build has left for the band.
   Array<RasterBandHistogram<T>> BandHistogram(unsigned band) const;
 
-  // A build calls these on its thread. The values that it has computed go into the pyramid's
-  // store too: false, with the fault told, when the store can't take it, or the raster has been
-  // written to meanwhile.
+  // A build calls these on its thread. The values that it has computed go into the pyramid's store
+  // too: false, with the fault set, when the store can't take it, or the raster has been written to
+  // meanwhile.
   void OnLevelsWritten() override;
   bool TakeHistogram(const RasterHistogram<T>& histogram,
                      HistogramSign sign) requires(std::is_arithmetic_v<T>);

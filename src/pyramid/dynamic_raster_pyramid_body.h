@@ -153,7 +153,7 @@ void DynamicRasterPyramid<T>::OnLevelsWritten() {
   levelsFault_ = TakeFault();
 }
 
-/// False, with the fault told, where the levels that were made can't be shown: what belongs to them
+/// False, with the fault set, where the levels that were made can't be shown: what belongs to them
 /// would go elsewhere.
 template <typename T>
 bool DynamicRasterPyramid<T>::AreLevelsShown() const {
@@ -168,7 +168,7 @@ bool DynamicRasterPyramid<T>::Refresh() {
   return pyramidReader_->PyramidRefresh();
 }
 
-/// False, with the fault told, when the raster has been written to since the build began: nothing
+/// False, with the fault set, when the raster has been written to since the build began: nothing
 /// that was computed on the way is known to hold. Under the lock.
 template <typename T>
 bool DynamicRasterPyramid<T>::CanTakeResults() const {

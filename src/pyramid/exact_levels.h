@@ -7,7 +7,10 @@ namespace lumo {
 /// Has the levels that this thread asks rasters for be placed exactly, as long as it lives: a
 /// level's pixels are 2^level times as large as the raster's. Otherwise they are as large as the
 /// told form has it, the whole part of the quotient of the sizes. The operations of a raster have
-/// no room for this wish, so it goes beside the call.
+/// no room for this wish, so it goes beside the call:
+///
+///     const ExactLevels exact(true);
+///     const RasterPtr<T> level = raster->PyramidLevel(3);  // with pixels 8 times as large
 class VEXG_EXPORT ExactLevels {
  public:
   /// @param wanted  false has no effect.

@@ -10,19 +10,20 @@ namespace lumo {
 ///
 /// In its memory the tiles follow one another from left to right, each a block of its own,
 /// pixel-interleaved: the form in which the store of a pyramid takes them. States travel with the
-/// pixels where they tell more than that a pixel holds no data, which its value shows.
+/// pixels where they say more than that a pixel holds no data, which its value shows.
 template <typename T>
 class LevelWindow {
  public:
   explicit LevelWindow(const LevelShape& shape) : shape_(shape) {}
 
+  /// The level whose tiles these are.
   const LevelShape& Shape() const { return shape_; }
 
   /// Makes room for the tiles from `column` to before `endColumn` of a row.
-  /// @return false, with the fault told, when there is no memory.
+  /// @return false, with the fault set, when there is no memory.
   bool Begin(unsigned column, unsigned endColumn, unsigned row, unsigned bands);
 
-  /// Copies what a block has of the pixels of these tiles. The block may lie in any order of axes.
+  /// Copies the pixels that a block has of these tiles. The block may lie in any order of axes.
   void Take(const Tile<T>& block);
 
   /// The tiles as one, to be written.

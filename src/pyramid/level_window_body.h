@@ -29,7 +29,7 @@ void LevelWindow<T>::Take(const Tile<T>& block) {
   for (unsigned line = first; line < end; ++line) TakeLine(block, line);
 }
 
-/// A stretch of a line of the level that a block has, and where it lies in the block.
+/// A run of a line of the level that a block has, and where it lies in the block.
 template <typename T>
 struct LevelWindow<T>::Line {
   unsigned first;  // pixels of the level
@@ -54,7 +54,7 @@ void LevelWindow<T>::TakeLine(const Tile<T>& block, unsigned line) {
   }
 }
 
-/// Copies a stretch of pixels, or of states, tile by tile.
+/// Copies a run of pixels, or of states, tile by tile.
 template <typename T>
 template <typename E>
 void LevelWindow<T>::Pick(const Array<E>& from, const Tile<T>& block, const Line& line,

@@ -26,7 +26,7 @@ class VEXG_EXPORT PyramidBuilder : public Async {
  public:
   using Async::Async;
 
-  /// Why it failed, in words.
+  /// The reason of a failure, in words; no text after a success.
   String GetFault() const;
 
  protected:
@@ -40,12 +40,12 @@ class VEXG_EXPORT PyramidBuilder : public Async {
 
 using PyramidBuilderPtr = Pointer<PyramidBuilder>;
 
-/// What a build is asked for.
+/// Names what a build is to make of what.
 struct PyramidOrder {
-  Array<String> source;   ///< connection strings
-  Array<String> pyramid;  ///< connection strings
-  PyramidDef def;
-  TileDimensions tiles;
+  Array<String> source;   ///< connection strings of the raster
+  Array<String> pyramid;  ///< connection strings of the store
+  PyramidDef def;         ///< the levels
+  TileDimensions tiles;   ///< height: the side of the stored squares
 };
 
 /// Has the driver of a format build its pyramid: one call, which can't be aborted on the way.

@@ -91,7 +91,7 @@ class BuildResults final : public HistogramCallback<T> {
     owner_.Refresh();
   }
 
-  /// False, with the fault told, unless the owner took them and could store them.
+  /// False, with the fault set, unless the owner took them and could store them.
   bool AreStored() const {
     if (!areStored_ && fault_.GetLength() != 0) SetFault(fault_);
     return areStored_;
@@ -130,7 +130,7 @@ void AsyncPyramidBuilder<T>::Finish() {
   PyramidBuilder::Finish();
 }
 
-/// What a build works on.
+/// The rasters of a build.
 template <typename T>
 struct AsyncOrvaPyramidBuilder<T>::Rasters {
   Rasters(const PyramidOrder& order) : source(order.source), pyramid(order.pyramid) {}

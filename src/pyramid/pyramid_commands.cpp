@@ -54,7 +54,7 @@ class BuildObserver final : public AsyncCallback {
  public:
   explicit BuildObserver(const IPC& ipc) : ipc_(ipc) {}
 
-  /// What is to be aborted; empty for nothing any more.
+  /// Chooses the build that is to be aborted; empty for none any more.
   void Watch(const AsyncPtr& build) {
     {
       const std::lock_guard lock(lock_);
@@ -123,7 +123,7 @@ class BuildRasterPyramidCommand final : public RasterCommand {
     build->WaitFinished();
     observer->Watch(AsyncPtr());
     if (build->HasError()) {
-      raster->PyramidAsync();  // tells why
+      raster->PyramidAsync();  // sets the fault
       return Fail(TakeFaultOr("the build of the pyramid failed"));
     }
     return build->IsAborted() ? Fail("the build was aborted") : Succeed();

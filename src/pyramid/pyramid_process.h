@@ -9,29 +9,31 @@
 
 namespace lumo {
 
-/// In which order a raster is read to make the levels of its pyramid.
+/// Names the orders in which a raster is read to make the levels of its pyramid.
 enum class PyramidPath {
   kScanline,  ///< whole lines
   kRow,       ///< squares, row by row
   kMorten,    ///< one band after the other in squares along Z: needs little memory for many bands
 };
+/// The order that suits the storage of a raster, and its number of bands.
 VEXG_EXPORT PyramidPath ChoosePyramidPath(const RasterDef& def);
 
-/// What a process that makes levels works on.
+/// Names the rasters and levels that a process works on.
 template <typename T>
 struct PyramidPlan {
-  RasterPtr<T> source;  ///< what is read
-  RasterPtr<T> full;    ///< whose StoredPyramidLevels are written
-  unsigned levelMin = 0;
-  unsigned levelMax = 0;
-  unsigned tileSide = 0;
+  RasterPtr<T> source;    ///< what is read
+  RasterPtr<T> full;      ///< whose StoredPyramidLevels are written
+  unsigned levelMin = 0;  ///< first level that is made; 0 is the raster itself
+  unsigned levelMax = 0;  ///< last level that is made
+  unsigned tileSide = 0;  ///< of the stored squares, in pixels
 };
 
-/// Is told that the levels are written. Not called for a run that failed or was aborted.
+/// Hears that the levels are written. Not called for a run that failed or was aborted.
 template <typename T>
 class PyramidCallback {
  public:
   virtual ~PyramidCallback() = default;
+  /// Called once, on the thread of the run.
   virtual void OnLevelsWritten() = 0;
 
  private:
@@ -74,6 +76,10 @@ class RasterPyramidProcess : public ProcessBuilderCallback<Process, PyramidCallb
 };
 
 /// Makes the levels of a pyramid. Exists for TwelveTypes.
+///
+///     PyramidPlan<float> plan{source, full, 1, 5, 256};
+///     RasterPyramidDecimateRasterProcess<float> process(plan, nullptr, ipc);
+///     const bool well = process.RunProcess(process.kHere);
 template <typename T>
 class RasterPyramidDecimateRasterProcess final : public RasterPyramidProcess<T> {
  public:

@@ -14,11 +14,13 @@
 
 namespace lumo {
 
-/// Position `index` of the walk along Z through a square grid of so many bits on each axis.
+/// A position on the walk along Z through a square grid, on which neighbours stay close together.
 struct ZPosition {
-  std::uint64_t x = 0;
-  std::uint64_t y = 0;
+  std::uint64_t x = 0;  ///< column of the grid
+  std::uint64_t y = 0;  ///< row of the grid
 };
+/// Position `index` of the walk, from 0, through a grid of 2^bits by 2^bits: the bits of x and y
+/// alternate in the index, x lowest.
 VEXG_EXPORT ZPosition PositionAlongZ(std::uint64_t index, unsigned bits);
 
 /// Writes a level in strips, as blocks of the raster come row by row.
@@ -30,7 +32,7 @@ class LevelStripWriter {
 
   /// Takes what a block has of the level, and writes the strips that are whole with it. A row of
   /// more than one block lies within one strip.
-  /// @return false, with the fault told, when a strip can't be had or written.
+  /// @return false, with the fault set, when a strip can't be had or written.
   bool Take(const Tile<T>& block);
 
  private:
@@ -41,7 +43,7 @@ class LevelStripWriter {
   bool isBegun_ = false;
 };
 
-/// What the tasks for levels have in common.
+/// Holds the level of a task that makes one, and the block that it is given.
 template <typename T>
 class LevelTask : public SequentialTask {
  protected:
@@ -49,13 +51,17 @@ class LevelTask : public SequentialTask {
 
   /// The block in slot 0; empty, with the error stored, when there is none.
   TilePtr<T> BlockOf(ArgList& args);
+  /// Stores the error of the task. @return false.
   bool Fail();
 
+  /// The level, as a raster that can be written.
   const RasterPtr<T>& Level() const { return level_; }
   const LevelShape& Shape() const { return shape_; }
+  /// Pixels of a line of the raster.
   unsigned FullSamples() const { return samples_; }
+  /// Lines of the raster.
   unsigned FullLines() const { return lines_; }
-  /// Tiles of another side than the setup argument says.
+  /// Chooses tiles of another side than the setup argument says.
   void UseTiles(unsigned side);
 
  private:
@@ -114,8 +120,8 @@ class RasterMortenReadTask final : public SequentialTask {
   std::uint64_t done_ = 0;
 };
 
-/// Makes a level, tile by tile, out of what RasterMortenReadTask gives. Two more setup arguments:
-/// width and height of the tiles that are read.
+/// Makes a level, tile by tile, out of the tiles that RasterMortenReadTask gives. Two more setup
+/// arguments: width and height of the tiles that are read.
 template <typename T>
 class RasterPyramidMortenDecimateTask final : public LevelTask<T> {
  public:

@@ -16,7 +16,7 @@ inline unsigned BandIn(const Array<unsigned>* order, unsigned band) {
   return band < order->GetCount() ? (*order)[band] : 0;
 }
 
-/// The parent's bands of a view's.
+/// The parent's bands of several of a view's, by BandIn.
 VEXG_EXPORT Array<unsigned> BandsIn(const Array<unsigned>& order, const Array<unsigned>& bands);
 
 /// Turns the description of the parent into that of the view: bands, no-data values and metadata.
@@ -24,20 +24,22 @@ VEXG_EXPORT void ChooseBands(RasterDef& def, const Array<unsigned>& order);
 
 namespace detail {
 
-/// Carries the entries of a band's array from the parent to the view. Without an entry for one of
-/// the bands the view doesn't have the statistic.
+/// Turns an array that has an entry for each band of the parent into one for the bands of the view,
+/// in place. Where it lacks an entry for one of them, the view doesn't have the statistic: `bit` is
+/// taken out of `mask`.
 VEXG_EXPORT void PairsOfView(Array<double>& values, unsigned& mask, unsigned bit,
                              const Array<unsigned>& order);
 
-/// Carries the entries of a band's array from the view to its parent. Those of bands that the view
-/// doesn't show are `known`, what the parent has already; where that lacks one, it gets none.
+/// Turns an array that has an entry for each band of the view into one for the `bands` bands of its
+/// parent, in place. The entries of bands that the view doesn't show come from `known`, the
+/// parent's own; where that lacks one, the parent doesn't get the statistic.
 VEXG_EXPORT void PairsOfParent(Array<double>& values, unsigned& mask, unsigned bit,
                                const Array<unsigned>& order, const Array<double>& known,
                                unsigned bands);
 
 }  // namespace detail
 
-/// The parent's statistics of a band as those of the view's.
+/// Translates the parent's statistics of a band into those of the view's band `band`.
 template <typename T>
 RasterBandStats<T> StatsOfView(RasterBandStats<T> stats, const Array<unsigned>& order,
                                unsigned band) {
@@ -47,7 +49,9 @@ RasterBandStats<T> StatsOfView(RasterBandStats<T> stats, const Array<unsigned>& 
   return stats;
 }
 
-/// The view's statistics of a band as those of the parent's, which has `known` of it already.
+/// Translates the view's statistics of a band into those of the parent's, of which it has `known`
+/// already.
+/// @param bands  of the parent.
 template <typename T>
 RasterBandStats<T> StatsOfParent(RasterBandStats<T> stats, const Array<unsigned>& order,
                                  const RasterBandStats<T>& known, unsigned bands) {

@@ -8,33 +8,38 @@ namespace lumo {
 /// The value of one statistic of a band: for Min and Max a pixel, for every other a number.
 template <typename T>
 struct StatValue {
-  T pixel{};
-  double number = 0;
+  T pixel{};          ///< of Min and Max
+  double number = 0;  ///< of every other statistic
 };
 
-/// The statistics of one band. A plain value; `mask` tells which of its fields are at hand.
+/// Holds the statistics of the valid pixels of one band. A plain value; `mask` says which of its
+/// fields are at hand.
 ///
 /// Its text form is band, mask, min, max, mean, std, sum, sum2, rms, then sumXY and cov as arrays,
 /// separated by white space. Numbers are written so that they read back to the same value. The
 /// pixel count is not part of it. Exists for TenTypes.
+///
+///     const RasterBandStats<float> stats = raster->ComputeBandStats(0, StatsMask::Basic, ipc);
+///     if ((stats.mask & StatsMask::Basic) != StatsMask::Basic) return false;  // it failed
+///     const double cv = stats.std / stats.mean;
 template <typename T>
 struct RasterBandStats {
-  unsigned band = 0;
-  std::uint64_t pixelCount = 0;
-  unsigned mask = StatsMask::None;
+  unsigned band = 0;                ///< from 0, in the raster that gave them
+  std::uint64_t pixelCount = 0;     ///< valid pixels
+  unsigned mask = StatsMask::None;  ///< bits of StatsMask
   T min{};
   T max{};
   double mean = 0;
-  double std = 0;
+  double std = 0;  ///< of a sample: divided by n - 1
   double sum = 0;
-  double sum2 = 0;
-  double rms = 0;
+  double sum2 = 0;      ///< sum of the squares
+  double rms = 0;       ///< square root of the mean of the squares
   Array<double> sumXY;  ///< entry i: sum of the products with band i
   Array<double> cov;    ///< entry i: covariance with band i
 
   /// Sets the entry of `otherBand`, the last of the array from then on, and the bit of the mask.
   void SetSumXY(unsigned otherBand, double value);
-  void SetCov(unsigned otherBand, double value);
+  void SetCov(unsigned otherBand, double value);  ///< likewise
 
   /// The field of a statistic that is a number of the band alone; null for every other.
   static double RasterBandStats::*NumberField(StatsMask::Code stat) {
@@ -64,13 +69,15 @@ struct RasterBandStats {
   }
 };
 
+/// Writes the text form.
 template <typename T>
 std::ostream& operator<<(std::ostream& out, const RasterBandStats<T>& stats);
 /// A text that breaks off fails the stream and leaves the default.
 template <typename T>
 std::istream& operator>>(std::istream& in, RasterBandStats<T>& stats);
 
-/// The histogram of one band. A plain value; `source` kUnknown marks an empty one.
+/// Holds the histogram of one band: counts[i] values lie in bin i, which begins at min + i *
+/// binSize. A plain value; `source` kUnknown marks an empty one.
 ///
 /// Its text form is band, sign, binSize, binCount, min, max, the word of the source and the counts,
 /// separated by one blank; floating-point numbers in scientific form with 16 digits after the
@@ -79,19 +86,23 @@ std::istream& operator>>(std::istream& in, RasterBandStats<T>& stats);
 template <typename T>
 struct RasterBandHistogram {
   unsigned band = 0;
-  double binSize = 0;
+  double binSize = 0;  ///< width of a bin, in pixel values
   unsigned binCount = 0;
   Array<unsigned long long> counts;  ///< binCount entries
   T min{};                           ///< bounds, both inclusive
   T max{};
-  StatsSource source = StatsSource::kUnknown;
-  unsigned reserved = 0;
-  HistogramSign sign = HistogramSign::kBoth;
+  StatsSource source = StatsSource::kUnknown;  ///< who counted
+  unsigned reserved = 0;                       ///< 0
+  HistogramSign sign = HistogramSign::kBoth;   ///< which values of the bounds counted
   Form bins = Form::kTold;  ///< how values found their bins; not compared, nor part of the text
 };
 
-/// Which values of which bands are to be counted, into which bins. RasterHistogram tells the bins
-/// of both forms.
+/// Says which values of which bands are to be counted, into which bins. RasterHistogram explains
+/// the bins of both forms.
+///
+///     HistogramRequest<float> request{0.0F, 1.0F};
+///     request.binCount = 256;
+///     const AsyncPtr run = raster->CountHistogram(request, ipc);
 template <typename T>
 struct HistogramRequest {
   T lower{};  ///< of the values that count, both inclusive
@@ -100,12 +111,13 @@ struct HistogramRequest {
   unsigned binCount = 0;  ///< how many bins, where there is no size
   Array<unsigned> bands;  ///< none: all
   HistogramSign sign = HistogramSign::kBoth;
-  Form bins = Form::kTold;
+  Form bins = Form::kTold;  ///< which rule gives a value its bin
 };
 
 /// Equal in everything but the bin size.
 template <typename T>
 bool operator==(const RasterBandHistogram<T>& a, const RasterBandHistogram<T>& b);
+/// Writes the text form.
 template <typename T>
 std::ostream& operator<<(std::ostream& out, const RasterBandHistogram<T>& histogram);
 /// A text that breaks off fails the stream and leaves the default.

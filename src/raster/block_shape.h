@@ -9,6 +9,8 @@ namespace lumo {
 /// and the shape of its arrays. Without an interleave it holds the first band alone, however many
 /// are named (see BandsOfBlock).
 struct BlockShape {
+  /// @param rect   corners inclusive; only its size counts.
+  /// @param named  bands that are asked for, in the order wanted.
   BlockShape(const SubRect& rect, const Array<unsigned>& named, Interleave order)
       : interleave(order),
         bands(BandsOfBlock(named, order)),
@@ -24,7 +26,8 @@ struct BlockShape {
            dims.count == std::uint64_t{width} * height * count;
   }
 
-  /// Gives both arrays of a block that is read the shape; false when that can't be had.
+  /// Resizes both arrays of a block that is read to the shape. False when the shape is not valid,
+  /// or there is no memory.
   template <typename T>
   bool Size(Array<T>& pixels, Array<unsigned char>& state) const {
     return IsValid() && pixels.Resize(dims) && state.Resize(dims);
@@ -36,7 +39,8 @@ struct BlockShape {
     return IsValid() && pixels.GetCount() >= dims.count && state.GetCount() >= dims.count;
   }
 
-  /// Converts both arrays of a block from one interleave into another.
+  /// Converts both arrays of a block from one interleave into another. All four have room for the
+  /// block. False as ConvertInterleave.
   template <typename T>
   bool Convert(const Array<T>& fromPixels, const Array<unsigned char>& fromState, Interleave from,
                Array<T>& toPixels, Array<unsigned char>& toState, Interleave to) const {
@@ -47,11 +51,11 @@ struct BlockShape {
   }
 
   Interleave interleave;
-  Array<unsigned> bands;
-  unsigned count;  ///< of bands
-  unsigned width;
-  unsigned height;
-  ArrayDims dims;
+  Array<unsigned> bands;  ///< those that the block has
+  unsigned count;         ///< of bands
+  unsigned width;         ///< samples
+  unsigned height;        ///< lines
+  ArrayDims dims;         ///< shape of the arrays of pixels and of states
 };
 
 }  // namespace lumo

@@ -6,9 +6,16 @@
 
 namespace lumo {
 
-/// How far apart neighbours lie in a block, in elements: one arithmetic for all interleaves.
+/// Gives the distances of neighbours in a block, in elements: one arithmetic for all interleaves.
+/// The element of sample x, line y and band b stands at x * pixel + y * line + b * band:
+///
+///     const BlockStrides strides(interleave, width, height, bands);
+///     const float value = pixels[x * strides.pixel + y * strides.line + b * strides.band];
 struct BlockStrides {
   BlockStrides() = default;
+  /// Strides of a block without gaps; one without an interleave lies as in BSQ.
+  /// @param width,height  samples and lines of the block.
+  /// @param bands         of the block, not of its raster.
   BlockStrides(Interleave interleave, std::size_t width, std::size_t height, std::size_t bands) {
     switch (interleave) {
       case Interleave::BIP:
@@ -29,8 +36,8 @@ struct BlockStrides {
   }
 
   std::size_t pixel = 0;  ///< to the next sample
-  std::size_t line = 0;
-  std::size_t band = 0;
+  std::size_t line = 0;   ///< to the next line
+  std::size_t band = 0;   ///< to the next band
 };
 
 }  // namespace lumo

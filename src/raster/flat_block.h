@@ -8,8 +8,8 @@
 
 namespace lumo {
 
-/// How the elements of a raster lie one after the other, in a file or in memory: without gaps, in
-/// the order of an interleave.
+/// Describes a raster whose elements lie one after the other, in a file or in memory: without gaps,
+/// in the order of an interleave.
 struct FlatLayout {
   Interleave interleave = Interleave::BSQ;  ///< not None, which one band does not need
   unsigned samples = 0;
@@ -32,8 +32,8 @@ struct FlatLayout {
   VEXG_EXPORT bool GetBytes(unsigned elementBytes, std::uint64_t& bytes) const;
 };
 
-/// A block of a flat raster, as rows: stretches that lie together in the raster, in the order in
-/// which they follow one another in a block of the same interleave.
+/// A block of a flat raster, as rows: runs that lie together in the raster, in the order in which
+/// they follow one another in a block of the same interleave.
 ///
 /// Where bands are chosen from a pixel-interleaved raster the elements of a row don't lie together.
 /// A row then spans pixels from the lowest band chosen to the highest, and PickBands and PlaceBands

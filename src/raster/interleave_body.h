@@ -12,8 +12,8 @@
 #include <immintrin.h>
 #endif
 
-// What interleave.cpp does in vector registers. All of it moves bytes and computes nothing, so that
-// the kernels that only some machines have give what the others give.
+// The kernels of interleave.cpp in vector registers. They move bytes and compute nothing, so that
+// those that only some machines have give the same results as the others.
 
 namespace lumo {
 namespace {

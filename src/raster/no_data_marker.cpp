@@ -21,7 +21,7 @@ bool IsSame(Complex<T> a, Complex<T> b) {
   return IsSame(a.real, b.real) && (IsSame(a.imag, b.imag) || b.real != b.real);
 }
 
-// The arrays don't overlap, which the compiler has to be told of bytes.
+// The arrays don't overlap, which the compiler can't know of bytes.
 
 template <typename T>
 void MarkRun(T value, std::uint64_t count, const T* __restrict pixels,

@@ -8,18 +8,18 @@
 
 namespace lumo {
 
-/// A no-data value whatever the pixel type: a number, which of 64-bit integers has digits that a
+/// Holds a no-data value of any pixel type: a number, and for integers of 64 bits the digits that a
 /// double lacks.
 struct VEXG_EXPORT NoDataNumber {
   double number = 0;
-  std::string whole;  ///< the integer as a text; "" where the number tells all
+  std::string whole;  ///< the integer as a text; "" where the number is exact
 
   /// The value as one of pixels; nothing when no pixel can hold it.
   template <typename T>
   std::optional<T> As() const {
     return whole.empty() ? ToPixel<T>(number) : ToPixel<T>(whole);
   }
-  /// NaN is the same as NaN.
+  /// True for the same value; NaN is the same as NaN.
   bool IsSame(const NoDataNumber& other) const;
 };
 

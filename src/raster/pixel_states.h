@@ -10,18 +10,18 @@
 
 namespace lumo {
 
-/// Turns states into bytes of ones where a value is valid, else zeros. `states` may be null: all
-/// valid. @return how many are valid.
+/// Turns states into a mask: a byte of ones (0xFF) where a value is valid, else of zeros. `states`
+/// may be null, for values that are all valid. @return how many are valid.
 VEXG_EXPORT std::size_t MaskValid(const unsigned char* states, std::size_t count,
                                   unsigned char* mask);
 
-/// Tells whether a bit is set in every state; true without any.
+/// True when a bit is set in every state, and where there is no state.
 VEXG_EXPORT bool AllHaveState(const unsigned char* states, std::size_t count,
                               PixelValueState::Code bit);
-/// Tells whether some state has one of the bits.
+/// True when some state has one of the bits.
 VEXG_EXPORT bool AnyHasState(const unsigned char* states, std::size_t count, unsigned char bits);
 
-/// Tells that none of the states has a bit that makes a pixel count for nothing.
+/// True when none of the states has a bit of PixelValueState::NotValid.
 inline bool AllValid(const unsigned char* states, std::size_t count) {
   return !AnyHasState(states, count, PixelValueState::NotValid);
 }

@@ -69,7 +69,8 @@ using TwelveTypes =
 #define VEXG_FOR(SET, ...) VEXG_FOR_ALL(SET, __VA_ARGS__)
 #endif
 
-// A second name after the class makes Class<T, Name<T>>.
+// A second name after the class makes Class<T, Name<T>>: VEXG_EXTERN(TEN, Process, RasterStats)
+// declares Process<T, RasterStats<T>> for each T of TenTypes.
 #define VEXG_EXTERN_ONE(T, CLASS, ...) \
   extern template class VEXG_EXPORT CLASS<T __VA_OPT__(, __VA_ARGS__<T>)>;
 #define VEXG_EXTERN_HIDDEN_ONE(T, CLASS, ...) \
@@ -112,6 +113,13 @@ inline constexpr unsigned kDataTypeOf<std::int8_t> = 99;
 /// Runs `body` for the pixel type that `code` names: one compare per type, then one call.
 /// `DispatchType(EightTypes{}, code, [&]<typename T>() { return …; })`; pairs of types nest.
 /// @return what the body gave; false, with no call, when `code` is not in the set.
+/// For example, the bytes of a pixel:
+///
+///     std::size_t bytes = 0;
+///     DispatchType(TwelveTypes{}, raster.DataType(), [&]<typename T>() {
+///       bytes = sizeof(T);
+///       return true;
+///     });
 template <typename... Ts, typename Body>
 bool DispatchType(TypeList<Ts...>, unsigned code, Body&& body) {
   return ((code == kDataTypeOf<Ts> && body.template operator()<Ts>()) || ...);

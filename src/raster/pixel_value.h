@@ -11,10 +11,11 @@
 
 namespace lumo {
 
-/// Gives a number as a pixel value; nothing when T hasn't got it, so that no pixel can hold it.
+/// Turns a number into a pixel value; gives nothing when no pixel of type T can hold it: a fraction
+/// or a number out of range for an integer, one beyond the greatest float.
 ///
 /// This is the one way by which a no-data value becomes one of pixels: a value that the type can't
-/// hold equals no pixel and is never written into one.
+/// hold equals no pixel and is never written into one. A complex pixel gets it as its real part.
 template <typename T>
 std::optional<T> ToPixel(double value) {
   if constexpr (std::is_integral_v<T>) {
@@ -39,8 +40,9 @@ std::optional<T> ToPixel(double value) {
   }
 }
 
-/// Gives a number out of a text as a pixel value, integers exactly; nothing when the text is none,
-/// or T hasn't got it.
+/// Turns the text of a number into a pixel value, integers exactly; gives nothing when the text is
+/// no number, has anything behind it, or T can't hold it. The decimal point is ".", whatever the
+/// locale.
 template <typename T>
 std::optional<T> ToPixel(const std::string& text) {
   const char* const end = text.data() + text.size();

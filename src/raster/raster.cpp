@@ -29,7 +29,7 @@ const unsigned Raster<T>::TypeCode =
 
 namespace {
 
-/// Tells whether all statistics of `mask` are there, and those between bands for all bands.
+/// True when all statistics of `mask` are there, and those between bands for all bands.
 template <typename T>
 bool IsWhole(const RasterBandStats<T>& stats, unsigned mask, unsigned bands) {
   const auto hasPairs = [&](unsigned bit, const Array<double>& pairs) {

@@ -5,10 +5,16 @@
 
 namespace lumo {
 
-/// Base of the commands that work on rasters of the catalog.
+/// Helps commands that work on rasters of the catalog to find them:
+///
+///     CommandResult Execute() override {
+///       const BasicRasterPtr raster = FindRaster();
+///       if (raster.IsNull()) return Fail();  // with the reason that FindRaster gave
+///       …
+///     }
 class VEXG_EXPORT RasterCommand : public Command {
  protected:
-  /// The valid raster whose URI the input `name` holds; else empty, with the fault text told, so
+  /// The valid raster whose URI the input `name` holds; else empty, with the fault text set, so
   /// that Fail() says it.
   BasicRasterPtr FindRaster(const char* name = "URI") const;
 
@@ -18,7 +24,7 @@ class VEXG_EXPORT RasterCommand : public Command {
     return RasterPtr<T>(FindRaster(name));
   }
 
-  /// True when the array names bands, all of them the raster's; else tells the fault.
+  /// True when the array names bands, all of them the raster's; else sets the fault text.
   static bool CheckBands(const BasicRaster& raster, const Array<unsigned>& bands);
 };
 

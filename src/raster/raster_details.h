@@ -7,8 +7,8 @@
 #include "foundation/array.h"
 #include "metadata/metadata.h"
 
-// Details are all that a raster tells of itself beside the fields of its RasterDef. They travel in
-// the metadata of the RasterDef as internal entries, all of them texts:
+// Details are all that is known of a raster beside the fields of its RasterDef. They travel in the
+// metadata of the RasterDef as internal entries, all of them texts:
 //
 //   Bands/<n>/NoDataValue    the no-data value of band n, from 0, exactly; of 64-bit integers
 //   Bands/<n>/Description    its name
@@ -17,10 +17,10 @@
 //   Bands/<n>/Meaning        "Alpha", "Red", ...: the name of a colour interpretation
 //   Bands/<n>/Items/<name>   further items
 //   Items/<name>             further items of the raster
-//   Grid                     the six numbers of a grid that no geo-reference can tell
+//   Grid                     the six numbers of a grid that no geo-reference can express
 //   CoordSys                 WKT of a system of the Grid, the Points, or of nothing
-//   Points/<n>               a ground control point: pixel, line, x, y, z; from the upper left
-//   corner
+//   Points/<n>               a ground control point: pixel, line, x, y, z. Pixels and lines count
+//                            from the upper left corner of the raster
 //
 // A format's reader enters them, views choose and move them, a format's writer keeps them.
 
@@ -39,16 +39,19 @@ VEXG_EXPORT std::span<const EnumWord<KeptDetails>> WordsOf(KeptDetails);
 /// The path of a detail.
 /// @param name  as in the list above.
 VEXG_EXPORT String DetailPath(const std::string& name);
+/// The path of a detail of a band, from 0.
+/// @param name  as behind "Bands/<n>/" in the list above.
 VEXG_EXPORT String BandDetailPath(unsigned band, const std::string& name);
 
-/// The path of what a pyramid file tells of the file of the raster that it was built from: the
-/// bytes and the time of change, in ns since 1970. It is no detail, and stays with the pyramid.
+/// The path of the entry in which a pyramid file keeps the state of the file that it was built
+/// from: its bytes and the time of change, in ns since 1970. It is no detail, and stays with the
+/// pyramid.
 VEXG_EXPORT String FileStatePath();
 
-/// The text of a detail; no text where it isn't told.
+/// The text of a detail; empty where there is none.
 VEXG_EXPORT std::string FindDetail(const Metadata& metadata, const String& path);
 
-/// The names of all details that are told, in order.
+/// The names of all details that are there, in order.
 VEXG_EXPORT std::vector<std::string> DetailNames(const Metadata& metadata);
 
 /// Gives the details of bands another order.

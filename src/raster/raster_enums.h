@@ -5,7 +5,9 @@
 
 #include "commands/value_text.h"
 
-// The enumerations of rasters, with the words that they have in text.
+// The enumerations of rasters, with the words that they have in text. WordsOf gives the words of
+// one in the order of its values; UnknownWordOf and UnknownValueOf stand for a value without a
+// word, and a word without a value.
 
 namespace lumo {
 
@@ -39,11 +41,11 @@ inline const char* UnknownWordOf(PyramidType) {
 /// How pixels of a reduced level come about.
 enum class PyramidResamplingMethod : unsigned {
   kUnknown = 0,
-  kImpl = 1,  ///< the implementation's choice
-  kNearest = 2,
-  kLinear = 3,
-  kCubic = 4,
-  kMajority = 5,
+  kImpl = 1,      ///< the implementation's choice
+  kNearest = 2,   ///< the pixel at the place
+  kLinear = 3,    ///< from the pixels around it, by distance
+  kCubic = 4,     ///< from 4 by 4 pixels
+  kMajority = 5,  ///< the value that most of the pixels have
 };
 VEXG_EXPORT std::span<const EnumWord<PyramidResamplingMethod>> WordsOf(PyramidResamplingMethod);
 inline const char* UnknownWordOf(PyramidResamplingMethod) {
@@ -82,24 +84,24 @@ struct PixelValueState {
   };
 };
 
-/// Tells whether a pixel with this state counts.
+/// True when a pixel with this state counts.
 constexpr bool IsValidState(unsigned char state) {
   return (state & PixelValueState::NotValid) == 0;
 }
 
-/// Which values of a RasterBandStats are at hand.
+/// Bits that say which values of a RasterBandStats are at hand, or are asked for.
 struct StatsMask {
   enum Code : unsigned {
     None = 0,
     Min = 1,  ///< and the pixel count
     Max = 2,
     Mean = 4,
-    Std = 8,
+    Std = 8,  ///< of a sample: divided by n - 1
     Sum = 16,
-    Sum2 = 32,
-    RMS = 64,
-    SumXY = 128,
-    Cov = 256,
+    Sum2 = 32,       ///< sum of the squares
+    RMS = 64,        ///< square root of the mean of the squares
+    SumXY = 128,     ///< sums of products with other bands
+    Cov = 256,       ///< covariances with other bands
     Pairs = 384,     ///< SumXY and Cov, those between two bands
     Basic = 127,     ///< what StatsMode::kBasic gives
     Extended = 511,  ///< what StatsMode::kExtended gives

@@ -24,7 +24,7 @@ unsigned TilesIn(unsigned extent, unsigned size) {
   return extent == 0 || size == 0 ? 0 : (extent - 1) / size + 1;
 }
 
-/// A stretch of the tiles of one axis: where it starts, and what lies in front and behind.
+/// A run of the tiles of one axis: where it starts, and what lies in front and behind.
 struct Stretch {
   unsigned start;
   unsigned size;

@@ -40,7 +40,7 @@ VEXG_EXPORT TileDimensions SmartTiles(const BasicRaster* raster, std::size_t ele
 /// The order of the axes that costs the source least: its own, or BIP when it has none.
 VEXG_EXPORT Interleave StreamOrder(const BasicRaster* raster);
 
-/// Cuts a raster into a grid of tiles: what is known of it without the pixel type.
+/// Cuts a raster into a grid of tiles: the part of RasterIterator<T> that needs no pixel type.
 class VEXG_EXPORT BasicRasterIterator : public Object {
  public:
   static const unsigned TypeCode;
@@ -48,10 +48,13 @@ class VEXG_EXPORT BasicRasterIterator : public Object {
 
   /// Tiles in a row of the grid; 0 when there is no raster, or it has no pixels.
   unsigned Columns() const;
+  /// Tiles in a column of the grid; 0 as for Columns.
   unsigned Rows() const;
   /// The grid: tile size, borders, and band count of the raster.
   TileDimensions Dimensions() const { return dimensions_; }
+  /// How borders are filled where there is no raster.
   lumo::BorderMode BorderMode() const { return borderMode_; }
+  /// Bands of a tile.
   unsigned BandCount() const { return bands_.GetCount(); }
   /// The bands of the raster that a tile has, in its order.
   const Array<unsigned>& Bands() const { return bands_; }
@@ -114,6 +117,15 @@ struct BipTileBuffer {
 ///            after the other, and so do writes.
 /// Failure:   an iterator whose raster is missing or not valid, or whose band list names a band
 ///            that isn't there, holds ObjectErrorNotConstructed.
+///
+///     RasterIteratorSmart<float> tiles(raster);
+///     Tile<float> tile;
+///     for (unsigned row = 0; row < tiles.Rows(); ++row) {
+///       for (unsigned column = 0; column < tiles.Columns(); ++column) {
+///         if (!tiles.Read(column, row, tile)) return false;
+///         Use(tile.Pixel(0, 0, 0), tile.Origin());
+///       }
+///     }
 template <typename T>
 class RasterIterator : public BasicRasterIterator {
  public:
@@ -121,6 +133,8 @@ class RasterIterator : public BasicRasterIterator {
 
   /// All bands of the raster, in order.
   RasterIterator(const RasterPtr<T>& raster, const TileDimensions& dimensions);
+  /// Some bands of the raster, in the order given; one may come twice. A tile has them as its bands
+  /// from 0 on.
   RasterIterator(const RasterPtr<T>& raster, const TileDimensions& dimensions,
                  const Array<unsigned>& bands);
 
@@ -139,9 +153,10 @@ class RasterIterator : public BasicRasterIterator {
   ///         another number of bands, or a raster that fails.
   bool Write(unsigned column, unsigned row, Tile<T>& tile);
 
-  /// What stands in borders where there is no raster. `value` is for the modes that have one.
+  /// Sets how borders are filled where there is no raster. `value` is for the modes that have one.
   void SetBorderFill(lumo::BorderMode mode, T value);
 
+  /// The raster; empty when it was made from none.
   const RasterPtr<T>& GetRaster() const { return raster_; }
 
  private:
@@ -160,7 +175,7 @@ class RasterIterator : public BasicRasterIterator {
 template <typename T>
 using RasterIteratorPtr = Pointer<RasterIterator<T>>;
 
-/// One whole line at a time.
+/// Reads one whole line at a time.
 template <typename T>
 class RasterIteratorScanline final : public RasterIterator<T> {
  public:
@@ -168,16 +183,19 @@ class RasterIteratorScanline final : public RasterIterator<T> {
       : RasterIterator<T>(raster, WideTiles(raster.Get(), sizeof(T), 0, 0)) {}
 };
 
-/// Bands of whole lines.
+/// Reads bands of whole lines, which suits sources that are stored line by line.
 template <typename T>
 class RasterIteratorWide final : public RasterIterator<T> {
  public:
+  /// @param border  pixels on each side.
+  /// @param budget  bytes of a tile without its borders.
   explicit RasterIteratorWide(const RasterPtr<T>& raster, unsigned border = 0,
                               unsigned budget = kTileBudget)
       : RasterIterator<T>(raster, WideTiles(raster.Get(), sizeof(T), budget, border)) {}
 };
 
-/// Squares.
+/// Reads squares, with a border of one pixel unless another is asked for, which suits
+/// neighbourhoods.
 template <typename T>
 class RasterIteratorSquare final : public RasterIterator<T> {
  public:
@@ -186,7 +204,7 @@ class RasterIteratorSquare final : public RasterIterator<T> {
       : RasterIterator<T>(raster, SquareTiles(raster.Get(), sizeof(T), budget, border)) {}
 };
 
-/// Tiles of 512 by 512.
+/// Reads tiles of 512 by 512 pixels, those at the right and lower edge cut.
 template <typename T>
 class RasterIteratorTile final : public RasterIterator<T> {
  public:
@@ -195,7 +213,8 @@ class RasterIteratorTile final : public RasterIterator<T> {
       : RasterIterator<T>(raster, lumo::TileDimensions{kSide, kSide}) {}
 };
 
-/// Squares or bands of lines, as the source is stored.
+/// Reads squares or bands of lines, as the source is stored: the choice for work that goes by the
+/// coordinates of a tile.
 template <typename T>
 class RasterIteratorSmart final : public RasterIterator<T> {
  public:
@@ -228,7 +247,8 @@ class RasterIteratorStream final : public RasterIterator<T> {
   }
 };
 
-/// The grid of another iterator, borders included, on all bands of this raster.
+/// Reads a raster on the grid of another iterator, borders included, with all its bands, so that
+/// tile (column, row) of both covers the same place. The rasters are of one size.
 template <typename T>
 class RasterIteratorFromTemplate final : public RasterIterator<T> {
  public:
@@ -243,7 +263,8 @@ class RasterIteratorFromTemplate final : public RasterIterator<T> {
   }
 };
 
-/// The grid of another iterator without its borders, on all bands of this raster.
+/// Reads or writes a raster on the grid of another iterator without its borders, with all its
+/// bands.
 template <typename T>
 class RasterIteratorFromTemplateSpatial final : public RasterIterator<T> {
  public:

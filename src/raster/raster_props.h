@@ -4,8 +4,8 @@
 
 namespace lumo {
 
-/// What a process needs to know of its input without keeping the raster: its size, and the grid of
-/// an iterator on it.
+/// Keeps what a process needs to know of its input without keeping the raster: its size, and the
+/// grid of an iterator on it. A copy of the moment it was made.
 class VEXG_EXPORT RasterProps : public Object {
  public:
   static const unsigned TypeCode;
@@ -20,12 +20,12 @@ class VEXG_EXPORT RasterProps : public Object {
 
   bool IsA(unsigned typeCode) const override;
 
-  unsigned samples;
+  unsigned samples;  ///< pixels of a line
   unsigned lines;
-  unsigned bands;
-  unsigned columns;  ///< tiles in a row of the grid
-  unsigned rows;
-  TileDimensions tiles;
+  unsigned bands;        ///< of the raster
+  unsigned columns;      ///< tiles in a row of the grid
+  unsigned rows;         ///< tiles in a column of it
+  TileDimensions tiles;  ///< their size and borders
 };
 
 using RasterPropsPtr = Pointer<RasterProps>;

@@ -4,7 +4,7 @@
 namespace lumo {
 namespace {
 
-/// Writes what QueryRasterCommand tells.
+/// Writes the outputs of QueryRasterCommand.
 class QueryCommand : public RasterCommand {
  protected:
   void WriteQuery(const BasicRaster& raster) {

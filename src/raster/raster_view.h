@@ -9,14 +9,36 @@ namespace lumo {
 /// which write only what they change. A view of other places overrides PlaceInParent, one of other
 /// bands BandOrder, and one of other states or values GetSubRect.
 ///
+///     template <typename T>
+///     class LowerHalf final : public RasterView<T> {
+///      public:
+///       using RasterView<T>::RasterView;
+///       unsigned Lines() const override { return RasterView<T>::Lines() - First(); }
+///
+///      protected:
+///       SubRect PlaceInParent(const SubRect& rect) const override {
+///         return {rect.left, rect.top + First(), rect.right, rect.bottom + First()};
+///       }
+///
+///      private:
+///       unsigned First() const { return RasterView<T>::Lines() / 2; }
+///     };
+///
+/// Such a view also overrides GetRasterDef, for its size and place, and the statistics, which are
+/// the parent's unless it says otherwise; views/computed_raster.h has views with statistics of
+/// their own.
+///
 /// Over an empty parent IsValid() is false, and operations give false, 0 or empty. GetURI and
 /// PixelCount are the view's own. Exists for TwelveTypes.
 template <typename T>
 class RasterView : public Raster<T> {
  public:
+  /// @param parent  is shared; an empty one makes a view that is not valid.
   explicit RasterView(const RasterPtr<T>& parent = {}) : parent_(parent) {}
 
+  /// True over a valid parent.
   bool IsValid() const override;
+  /// As the parent's.
   bool CanWrite() const override;
   RasterDef GetRasterDef() const override;
   bool PyramidExists() const override;
@@ -61,11 +83,12 @@ class RasterView : public Raster<T> {
   std::uint64_t WriteCount() const override;
 
  protected:
+  /// The raster that this one stands on; may be empty.
   const RasterPtr<T>& Parent() const { return parent_; }
   /// The pixels of the parent that a block of the view stands on.
   virtual SubRect PlaceInParent(const SubRect& rect) const { return rect; }
-  /// The parent's band behind each band of the view, in order; null where they are the same. All
-  /// that is told by band then is the parent's with its numbers translated, in arrays of statistics
+  /// The parent's band behind each band of the view, in order; null where they are the same. Every
+  /// answer about a band then is the parent's with its numbers translated, in arrays of statistics
   /// between bands as well. A band that the view doesn't have is the parent's first.
   virtual const Array<unsigned>* BandOrder() const { return nullptr; }
   /// Lets go of the parent, as a destructor does that needs it closed.

@@ -5,7 +5,7 @@
 
 namespace lumo {
 
-/// What `call` gives for the parent; 0, false or empty when there is none.
+/// Gives the result of `call` for the parent; 0, false or empty when there is none.
 template <typename T>
 template <typename Call>
 auto RasterView<T>::Ask(const Call& call) const {
@@ -17,14 +17,14 @@ auto RasterView<T>::Ask(const Call& call) const {
   }
 }
 
-/// What `call(parent, its number of the band)` gives.
+/// Gives the result of `call(parent, its number of the band)`.
 template <typename T>
 template <typename Call>
 auto RasterView<T>::AskBand(unsigned band, const Call& call) const {
   return Ask([&](Raster<T>& parent) { return call(parent, BandIn(BandOrder(), band)); });
 }
 
-/// What `call(parent, its numbers of the bands)` gives.
+/// Gives the result of `call(parent, its numbers of the bands)`.
 template <typename T>
 template <typename Call>
 bool RasterView<T>::AskBlock(const Array<unsigned>& bands, const Call& call) const {

@@ -13,19 +13,21 @@ namespace lumo {
 template <typename Class>
 class NumbersByName {
  public:
+  /// Mean of the valid values. Standard deviation of a sample; 0 for fewer than two values.
   double Mean(unsigned band, const IPC& ipc) { return Ask(StatsMask::Mean, band, 0, ipc); }
-  double Std(unsigned band, const IPC& ipc) {  ///< of a sample: divided by n - 1
-    return Ask(StatsMask::Std, band, 0, ipc);
-  }
+  /// Standard deviation of a sample, divided by n - 1; 0 for fewer than two values.
+  double Std(unsigned band, const IPC& ipc) { return Ask(StatsMask::Std, band, 0, ipc); }
+  /// Sum of the valid values.
   double Sum(unsigned band, const IPC& ipc) { return Ask(StatsMask::Sum, band, 0, ipc); }
-  double Sum2(unsigned band, const IPC& ipc) {  ///< sum of the squares
-    return Ask(StatsMask::Sum2, band, 0, ipc);
-  }
+  /// Sum of their squares. Sum of their squares.
+  double Sum2(unsigned band, const IPC& ipc) { return Ask(StatsMask::Sum2, band, 0, ipc); }
+  /// Square root of the mean of their squares.
   double RMS(unsigned band, const IPC& ipc) { return Ask(StatsMask::RMS, band, 0, ipc); }
   // Between two bands, of the pixels that are valid in both; need StatsMode::kExtended.
   double SumXY(unsigned band, unsigned otherBand, const IPC& ipc) {
     return Ask(StatsMask::SumXY, band, otherBand, ipc);
   }
+  /// Covariance of a sample, divided by n - 1.
   double Cov(unsigned band, unsigned otherBand, const IPC& ipc) {
     return Ask(StatsMask::Cov, band, otherBand, ipc);
   }
@@ -40,7 +42,9 @@ class NumbersByName {
 template <typename Class, typename T>
 class ExtremesByName {
  public:
+  /// Smallest valid value of the band.
   T Min(unsigned band, const IPC& ipc) { return Ask(StatsMask::Min, band, ipc); }
+  /// Largest valid value of the band.
   T Max(unsigned band, const IPC& ipc) { return Ask(StatsMask::Max, band, ipc); }
 
  private:
@@ -55,14 +59,17 @@ class ExtremesByName {
 template <typename Class, typename T>
 class HistogramsByName {
  public:
+  /// Bins of a width from `lower` on.
   AsyncPtr HistogramByBinSize(T lower, T upper, double binSize, const Array<unsigned>& bands,
                               HistogramSign sign, const IPC& ipc) {
     return Start({lower, upper, binSize, 0, bands, sign}, ipc);
   }
+  /// A number of bins that share the range.
   AsyncPtr HistogramByBinCount(T lower, T upper, unsigned binCount, const Array<unsigned>& bands,
                                HistogramSign sign, const IPC& ipc) {
     return Start({lower, upper, 0, binCount, bands, sign}, ipc);
   }
+  /// HistogramByBinCount over all bands.
   AsyncPtr HistogramAllBands(T lower, T upper, unsigned binCount, HistogramSign sign,
                              const IPC& ipc) {
     return Start({lower, upper, 0, binCount, {}, sign}, ipc);

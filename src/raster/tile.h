@@ -11,7 +11,7 @@ namespace lumo {
 using TilePosition = std::pair<unsigned, unsigned>;
 
 /// A block of pixels with a state byte for each pixel and band, pixel-interleaved, with optional
-/// borders around it: what is known of it without its pixel type.
+/// borders around it: the part of Tile<T> that needs no pixel type.
 ///
 /// Tile coordinates count from the first pixel inside the borders; in a border they are below 0, or
 /// from Width() and Height() on. Access by coordinates has no bounds check.
@@ -26,9 +26,9 @@ class VEXG_EXPORT BasicTile : public Object {
   static const unsigned TypeCode;
   bool IsA(unsigned typeCode) const override;
 
-  unsigned Width() const { return dimensions_.width; }
-  unsigned Height() const { return dimensions_.height; }
-  unsigned Bands() const { return dimensions_.bands; }
+  unsigned Width() const { return dimensions_.width; }    ///< samples, without borders
+  unsigned Height() const { return dimensions_.height; }  ///< lines, without borders
+  unsigned Bands() const { return dimensions_.bands; }    ///< values of a pixel
   unsigned BorderLeft() const { return dimensions_.borderLeft; }
   unsigned BorderRight() const { return dimensions_.borderRight; }
   unsigned BorderTop() const { return dimensions_.borderTop; }
@@ -44,16 +44,21 @@ class VEXG_EXPORT BasicTile : public Object {
 
   /// Sizes the tile: states become 0, pixels keep whatever the storage holds. Storage is used again
   /// where it is large enough.
+  /// @param left,right,top,bottom  pixels of the borders.
   /// @return false for a width, height or band count of 0, or a size that can't be had.
   bool Resize(unsigned width, unsigned height, unsigned bands, unsigned left, unsigned right,
               unsigned top, unsigned bottom);
+  /// The same border on all sides.
   bool Resize(unsigned width, unsigned height, unsigned bands, unsigned border);
+  /// No borders.
   bool Resize(unsigned width, unsigned height, unsigned bands);
+  /// As the dimensions say.
   bool Resize(const TileDimensions& dimensions);
+  /// Size and borders as they were last set.
   TileDimensions Dimensions() const { return dimensions_; }
   /// Sizes a tile that is written whole next: its pixels and its states keep whatever the storage
   /// holds.
-  /// @param order  of the axes: the arrays are in the shape of BlockDims; BIP where there are
+  /// @param order  of the axes: the arrays have the shape of BlockDims; BIP where there are
   /// borders.
   bool ResizeForOverwrite(const TileDimensions& dimensions, Interleave order = Interleave::BIP);
   /// The order of the axes: BIP, unless ResizeForOverwrite sized the tile last.
@@ -92,9 +97,11 @@ class VEXG_EXPORT BasicTile : public Object {
   /// The state bytes, in the shape of the pixels.
   const Array<unsigned char>& StateArray() const { return state_; }
   Array<unsigned char>& StateArray() { return state_; }
+  /// Sets all bits of a state at once.
   void SetPixelState(int x, int y, unsigned band, unsigned char state) {
     state_[Offset(x, y) + band] = state;
   }
+  /// The state of a pixel in a band, bits of PixelValueState.
   unsigned char PixelState(int x, int y, unsigned band) const {
     return state_[Offset(x, y) + band];
   }
@@ -103,6 +110,7 @@ class VEXG_EXPORT BasicTile : public Object {
   std::size_t FullWidth() const {
     return std::size_t{dimensions_.width} + dimensions_.borderLeft + dimensions_.borderRight;
   }
+  /// Lines of the whole tile, borders included.
   std::size_t FullHeight() const {
     return std::size_t{dimensions_.height} + dimensions_.borderTop + dimensions_.borderBottom;
   }
@@ -138,6 +146,16 @@ class VEXG_EXPORT BasicTile : public Object {
 
 /// A block of pixels of type T, one of TwelveTypes. Its storage is an array of lines by samples by
 /// bands, borders included.
+///
+///     Tile<float> tile({256, 256, 3});
+///     if (!tile.IsValid()) return false;
+///     for (int y = 0; y < static_cast<int>(tile.Height()); ++y) {
+///       for (int x = 0; x < static_cast<int>(tile.Width()); ++x) {
+///         if (!tile.AnyNoData(x, y)) Use(tile.Pixel(x, y, 2));
+///       }
+///     }
+///
+/// Inner loops of quick code go by PixelArray and StateArray, see TileRow.
 template <typename T>
 class Tile : public BasicTile {
  public:
@@ -145,15 +163,19 @@ class Tile : public BasicTile {
 
   /// An empty tile, to be sized by whoever fills it.
   Tile() = default;
+  /// A tile sized by Resize; IsValid() is false when that fails.
   explicit Tile(const TileDimensions& dimensions) { BasicTile::Resize(dimensions); }
 
   bool IsA(unsigned typeCode) const override {
     return typeCode == TypeCode || BasicTile::IsA(typeCode);
   }
 
+  /// All values with those of the borders, in the order of Order().
   Array<T>& PixelArray() { return pixels_; }
   const Array<T>& PixelArray() const { return pixels_; }
 
+  /// The value of a pixel in a band, in tile coordinates, of a tile in the order BIP. Nothing
+  /// checks the bounds.
   T& Pixel(int x, int y, unsigned band) { return pixels_[Offset(x, y) + band]; }
   const T& Pixel(int x, int y, unsigned band) const { return pixels_[Offset(x, y) + band]; }
 

@@ -22,7 +22,8 @@
 // whole tile, once. It gives a bool, or nothing; false, or an exception, ends the run as a failure.
 //
 // All of them give true when the run has ended well or was aborted, which the caller sees by the
-// flag; false with the fault told when a raster doesn't fit, or something failed.
+// flag; false, with the fault text set, when a raster doesn't fit, or something failed. They block
+// until then.
 
 namespace lumo {
 
@@ -66,7 +67,7 @@ namespace detail {
 /// for every band the bits that some band of `from` has.
 VEXG_EXPORT void TakeStates(const BasicTile& from, BasicTile& to);
 
-/// Tells that a raster is missing, or has another size than the first.
+/// True when both rasters are there and of one size; else sets the fault text.
 VEXG_EXPORT bool CheckSize(const BasicRaster* first, const BasicRaster* other);
 
 template <typename... Ts>
@@ -138,6 +139,7 @@ using PartResult = typename decltype(FindResult<Part, Ts...>())::Type;
 ///
 /// @param name    of the process.
 /// @param output  of the inputs' size, can be written; may have another number of bands.
+/// @param body    is called on many threads at once.
 template <typename... TIn, typename TOut, typename F>
 bool MapTiles(const char* name, const TileInputs<TIn...>& inputs, const RasterPtr<TOut>& output,
               const F& body, const IPC& ipc = {}) {
@@ -167,6 +169,10 @@ bool MapTiles(const char* name, const TileInputs<TIn...>& inputs, const RasterPt
 }
 
 /// Copies a raster: `body(Tile<T>&)`, perhaps with a TilePart, changes tiles on the way, in place.
+///
+///     CopyTiles("Negate", TilesOf(source), target, [](Tile<float>& tile) {
+///       for (float& value : tile.PixelArray()) value = -value;
+///     });
 template <typename T, typename F>
 bool CopyTiles(const char* name, const TileInputs<T>& input, const RasterPtr<T>& output,
                const F& body, const IPC& ipc = {}) {
@@ -185,8 +191,8 @@ bool CopyTiles(const char* name, const TileInputs<T>& input, const RasterPtr<T>&
   return process.RunProcess(process.kHere);
 }
 
-/// Looks at tiles: `body(const Tile<T>&...)`, perhaps with a TilePart. What it finds it keeps
-/// itself, safe from its other calls.
+/// Looks at tiles: `body(const Tile<T>&...)`, perhaps with a TilePart. Nothing is written; results
+/// that it gathers it keeps itself, safe from its other calls.
 template <typename... Ts, typename F>
 bool ForEachTile(const char* name, const TileInputs<Ts...>& inputs, const F& body,
                  const IPC& ipc = {}) {
@@ -235,10 +241,20 @@ void AddReduction(TileProcess<Base>& process, const char* name,
               });
 }
 
-/// Joins what `part(const Tile<T>&...)`, perhaps with a TilePart, gives for tiles to `total`. A
-/// part gives an R, or an optional that is empty where it failed. `merge(left, right)` joins parts
-/// of a tile, and then tiles, to the total, in a fixed order, one at a time: so the result has the
-/// same bits for any number of threads. It may move what it joins out of its right side.
+/// Joins the results of `part(const Tile<T>&...)`, perhaps with a TilePart, for all tiles to
+/// `total`. A part gives an R, or an optional that is empty where it failed. `merge(left, right)`
+/// joins parts of a tile, and then tiles, to the total, in a fixed order, one at a time: so the
+/// result has the same bits for any number of threads. It may move what it joins out of its right
+/// side.
+///
+///     double total = 0;
+///     const bool well = ReduceTiles(
+///         "Total", TilesOf(raster), total,
+///         [](const Tile<float>& tile) {
+///           const Array<float>& pixels = tile.PixelArray();
+///           return std::accumulate(pixels.begin(), pixels.end(), 0.0);
+///         },
+///         [](double& left, double right) { left += right; });
 template <typename... Ts, typename Total, typename Part, typename Merge>
 bool ReduceTiles(const char* name, const TileInputs<Ts...>& inputs, Total& total, const Part& part,
                  const Merge& merge, const IPC& ipc = {}) {

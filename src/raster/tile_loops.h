@@ -7,7 +7,8 @@
 
 namespace lumo {
 
-/// A loop over the samples, lines and bands of a tile, without its borders.
+/// A loop over the samples, lines and bands of a tile, without its borders. A derived class
+/// overrides Body(begin0, end0, begin1, end1, begin2, end2).
 template <typename T>
 class TileParallelFor3 : public ArrayParallelFor3 {
  public:
@@ -26,6 +27,7 @@ class TileParallelFor3 : public ArrayParallelFor3 {
 template <typename T, typename R>
 class TileParallelReduce2 : public ArrayParallelReduce2<R> {
  public:
+  /// @param tile  outlives the loop.
   explicit TileParallelReduce2(Tile<T>& tile)
       : ArrayParallelReduce2<R>(tile.Width(), tile.Height()), tile_(&tile) {}
 
@@ -36,10 +38,12 @@ class TileParallelReduce2 : public ArrayParallelReduce2<R> {
   Tile<T>* tile_;
 };
 
-/// A loop over the samples and lines of a tile, borders included.
+/// A loop over the samples and lines of a tile, borders included: it begins at -BorderLeft() and
+/// -BorderTop().
 template <typename T>
 class BorderedTileParallelFor2 : public RangeParallelFor2 {
  public:
+  /// @param tile  outlives the loop.
   explicit BorderedTileParallelFor2(Tile<T>& tile)
       : RangeParallelFor2(-static_cast<int>(tile.BorderLeft()),
                           static_cast<int>(tile.Width() + tile.BorderRight()),

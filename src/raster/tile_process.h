@@ -16,6 +16,7 @@ struct TileSlot {
 
   /// The tile; empty where there is none.
   TilePtr<T> In(const ArgList& token) const { return TilePtr<T>(token.Get(id)); }
+  /// Hands a tile on to the stages behind. False for an empty one, or when there is no memory.
   bool Put(ArgList& token, const TilePtr<T>& tile) const { return token.Set(id, tile); }
 };
 
@@ -29,6 +30,7 @@ struct ValueSlot {
     const ObjectPtr object = token.Get(id);  // nothing but a Held is put there
     return object.IsNull() ? nullptr : &static_cast<Held*>(object.Get())->value;
   }
+  /// Hands a value on to the stages behind. False when there is no memory.
   bool Put(ArgList& token, T&& value) const {
     return token.Set(id, ObjectPtr(new Held(std::move(value))));
   }
@@ -43,6 +45,15 @@ struct ValueSlot {
 /// Runs stages over tiles that are functions: those who need more than the functions of
 /// tile_functions.h derive from it, or put one together. All slots are taken before the first
 /// function is placed, which sees all of them, and Close() comes last.
+///
+///     TileProcess<> process("Edges", ipc);
+///     const auto tiles = process.Read(iterator);
+///     process.Add("Edges", StageOrder::kSeveralAtOnce, [&](ArgList& token, const AbortFlag*) {
+///       const TilePtr<float> tile = tiles.In(token);
+///       return tile && MarkEdges(*tile);
+///     });
+///     process.Close();
+///     const bool well = process.RunProcess(process.kHere);
 ///
 /// @tparam Base  ProcessBuilder<Process>, or a ProcessBuilderCallback.
 template <typename Base = ProcessBuilder<Process>>

@@ -12,28 +12,37 @@
 
 namespace lumo {
 
-/// A rectangle of a tile, in its pixels.
+/// A rectangle of a tile, in its pixels from 0, without the borders; both ends are behind the last.
 struct TilePart {
   unsigned rowFrom;
-  unsigned rowTo;  ///< behind the last
+  unsigned rowTo;
   unsigned columnFrom;
   unsigned columnTo;
 };
 
 /// Points to the pixels of a part in one line of a pixel-interleaved tile, with all their bands:
-/// `count` values that lie together, and their states.
+/// `count` values that lie together, and their states. It refers to the tile.
+///
+///     for (unsigned y = part.rowFrom; y < part.rowTo; ++y) {
+///       const TileRow<float, unsigned char> row = RowOf(tile, part, y);
+///       for (std::size_t i = 0; i < row.count; ++i) {
+///         if (IsValidState(row.states[i])) row.values[i] *= 2;
+///       }
+///     }
 template <typename T, typename State>
 struct TileRow {
   T* values;
   State* states;
   std::size_t count;
 };
+/// The pixels of a part in line `y` of a tile, to read.
 template <typename T>
 TileRow<const T, const unsigned char> RowOf(const Tile<T>& tile, const TilePart& part, unsigned y) {
   const std::size_t at = tile.Offset(part.columnFrom, y);
   return {tile.PixelArray().GetData() + at, tile.StateArray().GetData() + at,
           std::size_t{part.columnTo - part.columnFrom} * tile.Bands()};
 }
+/// The pixels of a part in line `y` of a tile, to write.
 template <typename T>
 TileRow<T, unsigned char> RowOf(Tile<T>& tile, const TilePart& part, unsigned y) {
   const std::size_t at = tile.Offset(part.columnFrom, y);
@@ -41,8 +50,8 @@ TileRow<T, unsigned char> RowOf(Tile<T>& tile, const TilePart& part, unsigned y)
           std::size_t{part.columnTo - part.columnFrom} * tile.Bands()};
 }
 
-/// How a tile is cut for a parallel loop: rows first, and rows of long tiles into pieces. The cut
-/// depends on the size of the tile alone.
+/// Cuts a tile for a parallel loop: between rows first, and rows of long tiles into pieces, at most
+/// 64 of both. The cut depends on the size of the tile alone.
 class TileStrips {
  public:
   /// @param leastPixels  of a strip, as far as the tile has them.
@@ -55,8 +64,10 @@ class TileStrips {
     columns_ = static_cast<unsigned>(std::min<std::size_t>(wanted / std::max(rows_, 1U), width_));
   }
 
+  /// Strips of the tile, 1 or more unless it is empty.
   unsigned Count() const { return rows_ * columns_; }
 
+  /// Strip `index`, from 0, row of strips by row of strips.
   TilePart Strip(unsigned index) const {
     const unsigned row = index / columns_;
     const unsigned column = index % columns_;
@@ -83,7 +94,7 @@ inline std::size_t LeastStripPixels(unsigned bands) {
 
 namespace detail {
 
-/// Calls a function that tells by a bool whether it succeeded, or by nothing that it did.
+/// Calls a function that returns whether it succeeded, or nothing, which counts as success.
 template <typename F, typename... Args>
 bool Succeeds(const F& work, Args&&... args) {
   if constexpr (std::is_void_v<std::invoke_result_t<const F&, Args...>>) {
@@ -141,7 +152,7 @@ class StripReduction final : public ArrayParallelReduce<StripResult<R>> {
 
 /// Runs `work(TilePart)` for the strips of a tile on all threads. `work` gives a bool, or nothing.
 /// @param abort  is looked at before each strip; null for none.
-/// @return false when some strip failed; what it told by SetFault is then told on this thread.
+/// @return false when some strip failed; the fault that it set is then set on this thread.
 template <typename F>
 bool ForEachStrip(const BasicTile& tile, std::size_t leastPixels, const AbortFlag* abort,
                   const F& work) {
@@ -158,7 +169,7 @@ bool ForEachStrip(const BasicTile& tile, std::size_t leastPixels, const AbortFla
 /// The joins follow the cut, which the size of the tile alone decides, so the result has the same
 /// bits for any number of threads. `part` gives an R, or an optional that is empty where it failed;
 /// `merge` a bool, or nothing.
-/// @return empty when something failed, with its fault told on this thread, or was aborted.
+/// @return empty when something failed, with its fault set on this thread, or was aborted.
 template <typename R, typename Part, typename Merge>
 std::optional<R> ReduceStrips(const BasicTile& tile, std::size_t leastPixels,
                               const AbortFlag* abort, const Part& part, const Merge& merge) {

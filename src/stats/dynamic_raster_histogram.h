@@ -11,6 +11,11 @@ namespace lumo {
 /// The histograms of one raster: those at hand, and the run that counts one more. A raster that
 /// shows pixels of its own holds one and leaves its operations on histograms to it.
 ///
+///     const AsyncPtr run = histograms.CountHistogram(request, ipc);
+///     if (!run) return false;  // another run goes on, or the request doesn't fit the raster
+///     run->WaitFinished();
+///     const Array<RasterBandHistogram<float>> all = histograms.BandHistogram(0);
+///
 /// A run reads the pixels of its bands once, in the background. Its histograms are taken over at
 /// the next call of any operation, and join those at hand unless an equal one is there. So does
 /// what a run had counted when it was aborted; one that failed leaves nothing.
@@ -28,7 +33,9 @@ template <typename T>
 class DynamicRasterHistogram : public ErrorState,
                                public HistogramsByName<DynamicRasterHistogram<T>, T> {
  public:
+  /// @param raster  owns this object, and is read by its runs.
   explicit DynamicRasterHistogram(Raster<T>* raster);
+  /// Aborts a run that goes on, and waits for its end.
   ~DynamicRasterHistogram() override;
   DynamicRasterHistogram(const DynamicRasterHistogram&) = delete;
   DynamicRasterHistogram& operator=(const DynamicRasterHistogram&) = delete;

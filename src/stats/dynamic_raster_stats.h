@@ -8,16 +8,16 @@
 
 namespace lumo {
 
-/// The statistics of one raster: what is at hand, and the computation that gives the rest. A raster
+/// The statistics of one raster: those at hand, and the computation that gives the rest. A raster
 /// that shows pixels of its own holds one and leaves its operations on statistics to it.
 ///
 /// A computation reads all pixels once, in the background, and gives all values of all bands. Its
 /// result is taken over at the next call of any operation, and then replaces what stood before. A
 /// computation that was aborted, or failed, leaves what stood.
 ///
-/// What is at hand holds for one Raster::WriteCount. Once pixels have been written it is gone,
-/// values entered by hand as well, and a computation that was under way then gives nothing; a
-/// getter that waits for it starts another one.
+/// The values at hand hold for one Raster::WriteCount. Once pixels have been written they are gone,
+/// ones entered by hand as well, and a computation that was under way then gives nothing; a getter
+/// that waits for it starts another one.
 ///
 /// Exists for TwelveTypes; for complex numbers it is empty, computes nothing and keeps nothing.
 ///
@@ -25,13 +25,15 @@ namespace lumo {
 ///            destructor aborts a computation that goes on, which reads the raster to that moment.
 /// Threads:   every operation may be called on any thread. The lock is never held while pixels are
 ///            read, or while a getter waits.
-/// Failure:   getters give 0, and have told the fault text.
+/// Failure:   getters give 0, with the fault set.
 template <typename T>
 class DynamicRasterStats : public ErrorState,
                            public NumbersByName<DynamicRasterStats<T>>,
                            public ExtremesByName<DynamicRasterStats<T>, T> {
  public:
+  /// @param raster  owns this object, and is read by its computations.
   explicit DynamicRasterStats(Raster<T>* raster);
+  /// Aborts a computation that goes on, and waits for its end.
   ~DynamicRasterStats() override;
   DynamicRasterStats(const DynamicRasterStats&) = delete;
   DynamicRasterStats& operator=(const DynamicRasterStats&) = delete;
@@ -51,7 +53,7 @@ class DynamicRasterStats : public ErrorState,
   /// Enters the statistics of one band, in place of what stood. Ignored while a computation runs,
   /// and for a band that the raster doesn't have.
   void SetBandStats(const RasterBandStats<T>& stats);
-  /// What is at hand for the band; with mask 0 when nothing is.
+  /// The values at hand for the band; mask 0 when there are none.
   RasterBandStats<T> BandStats(unsigned band) const;
 
   /// The value at hand; else after a computation that is started here, or the one that runs, has
@@ -61,6 +63,7 @@ class DynamicRasterStats : public ErrorState,
   double NumberOf(StatsMask::Code stat, unsigned band, unsigned otherBand, const IPC& ipc) {
     return StatOf(stat, band, otherBand, ipc).number;
   }
+  /// How many valid pixels the band has, computed when that isn't at hand. 0 on a failure.
   std::uint64_t PixelCount(unsigned band, const IPC& ipc);
 
  private:

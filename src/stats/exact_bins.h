@@ -7,17 +7,19 @@
 
 #include "stats/exact_stats_accumulator.h"
 
-// How many bins of the exact form there are, and how large they are.
+// The number and the size of the bins of the exact form.
 
 namespace lumo::detail {
 
-/// How many integers there are from `lower` to `upper`, both counted.
+/// The number of integers from `lower` to `upper`, both counted; below 1 when `upper` is smaller.
 template <typename T>
 Int128 ValuesBetween(T lower, T upper) {
   return static_cast<Int128>(upper) - static_cast<Int128>(lower) + 1;
 }
 
-/// The size of `count` bins that share the values from `lower` to `upper`.
+/// The size of `count` bins that share the values from `lower` to `upper`. An integer v stands for
+/// all from v to v + 1. It is above 0; 1 for equal bounds of a floating-point type.
+/// @param count  1 or more.
 template <typename T>
 double ExactBinSize(T lower, T upper, unsigned count) {
   if constexpr (std::is_integral_v<T>) {
@@ -31,8 +33,9 @@ double ExactBinSize(T lower, T upper, unsigned count) {
   }
 }
 
-/// How many bins of a size hold the values from `lower` to `upper`; `most` + 1 for more than
-/// `most`.
+/// The number of bins of a size that hold the values from `lower` to `upper`; `most` + 1 for more
+/// than `most`.
+/// @param size  above 0, in pixel values.
 template <typename T>
 unsigned ExactBinCount(T lower, T upper, double size, unsigned most) {
   const double low = static_cast<double>(lower), high = static_cast<double>(upper);

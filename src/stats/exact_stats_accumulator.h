@@ -13,12 +13,13 @@ __extension__ using UInt128 = unsigned __int128;
 /// The statistics of one band of integers of up to 32 bits. Takes 2^63 samples.
 template <typename T>
 struct ExactStatsAccumulator {
-  std::uint64_t count = 0;
+  std::uint64_t count = 0;  ///< samples
   Int128 sum = 0;
-  UInt128 sum2 = 0;
+  UInt128 sum2 = 0;  ///< sum of the squares
   T min = std::numeric_limits<T>::max();
   T max = std::numeric_limits<T>::lowest();
 
+  /// Takes in what another one has seen, in any order.
   void Merge(const ExactStatsAccumulator& other) {
     count += other.count;
     sum += other.sum;
@@ -57,21 +58,24 @@ struct ExactStatsAccumulator {
   }
 };
 
-/// What a pair of bands of integers of up to 16 bits has in common. Takes 2^46 samples.
+/// Sums what a pair of bands of integers of up to 16 bits has in common. Takes 2^46 samples.
 struct ExactPairAccumulator {
-  std::uint64_t count = 0;
+  std::uint64_t count = 0;  ///< pixels that are valid in both bands
   std::int64_t sumX = 0;
   std::int64_t sumY = 0;
-  Int128 products = 0;
+  Int128 products = 0;  ///< sum of x * y
 
+  /// Takes in what another one has seen, in any order.
   void Merge(const ExactPairAccumulator& other) {
     count += other.count;
     sumX += other.sumX;
     sumY += other.sumY;
     products += other.products;
   }
+  /// Sum of the products x * y, rounded once.
   double SumXY() const { return static_cast<double>(products); }
-  /// Sum of the products of the differences from both means.
+  /// Sum of the products of the differences from both means, which n - 1 divides to the covariance.
+  /// Needs a sample.
   double C() const {
     // With 2^46 samples both products fit 128 bits.
     const auto n = static_cast<Int128>(count);

@@ -5,7 +5,8 @@
 namespace lumo {
 
 /// Statistics with the products and covariances between bands, which count the pixels that are
-/// valid in both. Exists for TenTypes. Those of integers of up to 16 bits come from exact sums.
+/// valid in both. Exists for TenTypes. Those of integers of up to 16 bits come from exact sums. Its
+/// cost grows with the square of the bands, in time and in memory.
 template <typename T>
 class ExtendedRasterStats : public RasterStats<T> {
  public:
@@ -25,9 +26,10 @@ class ExtendedRasterStats : public RasterStats<T> {
   bool Merge(const ExtendedRasterStats& other);
   bool Finish();
 
-  // The results of Finish, bands by bands, symmetric; empty before.
+  /// Sums of the products, bands by bands, symmetric; empty before Finish.
   const Array<double>& SumXY() const { return sumXY_; }
-  /// Of a sample, divided by n - 1; 0 for fewer than two pixels. On the diagonal the variances.
+  /// Covariances of a sample, divided by n - 1, in the same shape; 0 for fewer than two pixels. On
+  /// the diagonal stand the variances.
   const Array<double>& Cov() const { return cov_; }
 
  private:

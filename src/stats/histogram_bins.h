@@ -8,18 +8,20 @@
 
 namespace lumo {
 
-/// The bins of one band, and which values count. RasterHistogram tells the rules of both forms.
+/// The bins of one band, and which values count. RasterHistogram explains the rules of both forms.
+/// Each Find has no branch for the types of up to 32 bits, so that the compiler makes vector code
+/// of a loop over it; FindBins is that loop.
 template <typename T>
 struct HistogramBins {
   __extension__ using WholeSpan = unsigned __int128;
 
   T lower{};  ///< of the values that count, both inclusive: within the bounds, and of the sign
-  T upper{};
-  T min{};                      ///< where the first bin begins
+  T upper{};  ///< the other bound
+  T min{};    ///< where the first bin begins
   double size = 1;              ///< of a bin; of integers a whole number, unless it is below 1
   std::uint64_t wholeSize = 1;  ///< of integers, where it isn't below 1
   std::uint32_t count = 0;      ///< of bins, below 2^31
-  Form form = Form::kTold;
+  Form form = Form::kTold;      ///< which rule gives a value its bin
   // In the exact form a value so far above the first bin's begin is in bin above * parts / span,
   // rounded down. Of integers both are whole where the bins were given by their number.
   double parts = 1;
@@ -31,6 +33,7 @@ struct HistogramBins {
     return form == Form::kExact ? FindExactly(value) : FindAsTold(value);
   }
 
+  /// Find in the exact form.
   [[gnu::always_inline]] std::uint32_t FindExactly(T value) const {
     if constexpr (std::is_integral_v<T> && sizeof(T) == 8) {
       if (value < lower || value > upper || count == 0) return count;
@@ -74,6 +77,7 @@ struct HistogramBins {
     }
   }
 
+  /// Find in the told form.
   [[gnu::always_inline]] std::uint32_t FindAsTold(T value) const {
     if constexpr (std::is_integral_v<T> && sizeof(T) == 8) {
       if (value < lower || value > upper) return count;
@@ -103,7 +107,8 @@ struct HistogramBins {
   }
 };
 
-/// Finds the bins of many values.
+/// Finds the bins of many values, as HistogramBins::Find does for each.
+/// @param out  [out] `count` numbers of bins; bins.count for a value that doesn't count.
 void FindBins(const HistogramBins<std::uint8_t>& bins, const std::uint8_t* values,
               std::size_t count, std::uint32_t* out);
 void FindBins(const HistogramBins<std::int8_t>& bins, const std::int8_t* values, std::size_t count,

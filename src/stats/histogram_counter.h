@@ -10,19 +10,23 @@ namespace lumo {
 
 /// Counts the values of tiles, on one thread at a time. Exists for TenTypes.
 ///
-/// Types of 8 and 16 bits are counted value by value, and only what was counted is parted into
-/// bins; for the others each value's bin is found in vector registers first. Counts do not depend
-/// on how the pixels are divided among counters.
+/// Types of 8 and 16 bits are counted value by value, and only then are the counts put into bins;
+/// for the others each value's bin is found in vector registers first. Counts do not depend on how
+/// the pixels are divided among counters.
+///
+///     HistogramCounter<std::uint16_t> counter(bins);
+///     counter.Count(tile, {0, tile.Height(), 0, tile.Width()});
+///     joined.Join(counter.Finish());
 template <typename T>
 class HistogramCounter {
  public:
-  /// @param bins  what is to be counted; its counts are of no account.
+  /// @param bins  are copied; counts that they hold already don't matter.
   explicit HistogramCounter(const RasterHistogram<T>& bins);
 
   /// Counts a part of a tile. @return false for a tile with another number of bands.
   bool Count(const Tile<T>& tile, const TilePart& part);
 
-  /// What was counted.
+  /// Brings the counts together. The result lives as long as the counter.
   const RasterHistogram<T>& Finish();
 
  private:

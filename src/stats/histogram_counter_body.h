@@ -98,7 +98,7 @@ bool HistogramCounter<T>::Count(const Tile<T>& tile, const TilePart& part) {
   PlaneWalk<T>(tile).ForEach(part, [&](const PlaneGroup<T>& group) {
     for (unsigned band = 0; band < bins_.size(); ++band) {
       const std::size_t at = band * group.stride;
-      // What isn't finite finds no bin.
+      // Values that aren't finite find no bin.
       const ValidPlane<T> plane =
           planes.Find(group.values + at, group.states != nullptr ? group.states + at : nullptr,
                       group.count, true);

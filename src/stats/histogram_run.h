@@ -6,7 +6,10 @@
 
 namespace lumo {
 
-/// Counts a histogram and waits for the end, after the runs of other commands that go on.
+/// Counts a histogram and waits for the end, after the runs of other commands that go on. The
+/// histogram is then among those at hand of the raster.
+/// @param request  which values, bands and bins.
+/// @param turn     whether the command waits for others.
 /// @return no text, or why it could not be counted.
 template <typename T>
 String RunHistogram(Raster<T>& raster, const HistogramRequest<T>& request, const Turn& turn,

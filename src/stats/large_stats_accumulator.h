@@ -9,21 +9,27 @@ namespace lumo {
 /// The running statistics of one band: a numerically stable form that takes one sample at a time
 /// (Welford, Note on a method for calculating corrected sums of squares and products, Technometrics
 /// 4, 1962), and merges with another by the pairwise formulas (Chan, Golub, LeVeque, Updating
-/// formulae and a pairwise algorithm for computing sample variances, 1979).
+/// formulae and a pairwise algorithm for computing sample variances, 1979). Samples have to be
+/// finite.
+///
+///     LargeStatsAccumulator<float> band;
+///     for (const float value : values) band.Add(value);
+///     const double variance = band.s / (band.count - 1);
 template <typename T>
 struct LargeStatsAccumulator {
   std::uint64_t count = 0;
   double oldMean = 0;  ///< before the last sample
   double mean = 0;
-  double oldS = 0;
-  double s = 0;  ///< sum of the squared differences from the mean
-  double oldMeanSq = 0;
-  double meanSq = 0;  ///< mean of the squares
+  double oldS = 0;       ///< likewise
+  double s = 0;          ///< sum of the squared differences from the mean
+  double oldMeanSq = 0;  ///< likewise
+  double meanSq = 0;     ///< mean of the squares
   double sum = 0;
   double sum2 = 0;  ///< sum of the squares
   T min = std::numeric_limits<T>::max();
   T max = std::numeric_limits<T>::lowest();
 
+  /// Takes in one finite sample.
   void Add(T sample) {
     const auto v = static_cast<double>(sample);
     const double q = v * v;
@@ -67,10 +73,11 @@ struct LargeStatsAccumulator {
     count += other.count;
   }
 
+  /// The running form, as ExactStatsAccumulator has it too.
   const LargeStatsAccumulator& ToLarge() const { return *this; }
 };
 
-/// The running statistics of a pair of bands x and y: those of x, and what they have in common.
+/// The running statistics of a pair of bands x and y: those of x, and the sums over both.
 template <typename T>
 struct LargeStatsAccumulator2 : LargeStatsAccumulator<T> {
   double oldMeanY = 0;
@@ -79,6 +86,7 @@ struct LargeStatsAccumulator2 : LargeStatsAccumulator<T> {
   double c = 0;  ///< sum of the products of the differences from both means
   double sumXY = 0;
 
+  /// Takes in one pixel that is valid in both bands.
   void Add(T sampleX, T sampleY) {
     LargeStatsAccumulator<T>::Add(sampleX);
     const auto x = static_cast<double>(sampleX);
@@ -95,6 +103,7 @@ struct LargeStatsAccumulator2 : LargeStatsAccumulator<T> {
     sumXY += y * x;
   }
 
+  /// Takes in what another one has seen. No sample is to be added afterwards.
   void Merge(const LargeStatsAccumulator2& other) {
     if (other.count == 0) return;
     if (this->count == 0) {
@@ -110,7 +119,9 @@ struct LargeStatsAccumulator2 : LargeStatsAccumulator<T> {
     LargeStatsAccumulator<T>::Merge(other);
   }
 
+  /// Sum of the products x * y.
   double SumXY() const { return sumXY; }
+  /// Sum of the products of the differences from both means, which n - 1 divides to the covariance.
   double C() const { return c; }
 };
 

@@ -5,15 +5,16 @@
 #include <limits>
 #include <type_traits>
 
-// What is computed on a plane: a stretch of values of one band that lie together, kPlane at most.
-// The loops are written for the vector registers; their results do not depend on the machine.
+// Computations on a plane: a run of values of one band that lie together, kPlane at most. The loops
+// are written for the vector registers; their results do not depend on the machine. A mask has a
+// byte for each value, 0xFF where it is valid and 0 elsewhere.
 
 namespace lumo {
 
-/// How many values a plane has at most. What is summed in narrow integers has room for them.
+/// The most values of a plane. Sums in narrow integers have room for them.
 inline constexpr std::size_t kPlane = 2048;
 
-/// Whether statistics of T come from exact sums.
+/// True for the types whose statistics come from exact sums.
 template <typename T>
 inline constexpr bool kExactStats = std::is_integral_v<T> && sizeof(T) <= 4;
 
@@ -21,8 +22,8 @@ inline constexpr bool kExactStats = std::is_integral_v<T> && sizeof(T) <= 4;
 template <typename T, bool kExact = kExactStats<T>>
 struct PlaneSums {
   std::int64_t sum = 0;
-  std::uint64_t sum2Low = 0;
-  std::uint64_t sum2High = 0;
+  std::uint64_t sum2Low = 0;   ///< of the squares, sum of the lower 32 bits
+  std::uint64_t sum2High = 0;  ///< sum of the bits above
   T min = std::numeric_limits<T>::max();
   T max = std::numeric_limits<T>::lowest();
 };
@@ -30,19 +31,19 @@ struct PlaneSums {
 /// The sums of a plane of other numbers: of v - shift and of (v - shift)^2.
 template <typename T>
 struct PlaneSums<T, false> {
-  double shift = 0;
+  double shift = 0;  ///< taken off each value first
   double sum = 0;
-  double sum2 = 0;
+  double sum2 = 0;     ///< sum of the squares
   bool finite = true;  ///< false: some value isn't finite, and the rest means nothing
   T min = std::numeric_limits<T>::max();
   T max = std::numeric_limits<T>::lowest();
 };
 
-/// Takes those out of a mask whose value isn't finite. @return how many are left.
+/// Clears the bytes of a mask whose value isn't finite. @return how many are left.
 std::size_t MaskFinite(const float* values, std::size_t count, unsigned char* mask);
 std::size_t MaskFinite(const double* values, std::size_t count, unsigned char* mask);
 
-/// Copies the values where the mask has ones, and `filler` elsewhere.
+/// Copies the valid values of a plane, and writes `filler` in place of the others.
 void Select(const std::uint8_t* values, const unsigned char* mask, std::size_t count,
             std::uint8_t filler, std::uint8_t* out);
 void Select(const std::int8_t* values, const unsigned char* mask, std::size_t count,
@@ -64,7 +65,7 @@ void Select(const std::uint64_t* values, const unsigned char* mask, std::size_t 
 void Select(const std::int64_t* values, const unsigned char* mask, std::size_t count,
             std::int64_t filler, std::int64_t* out);
 
-/// Sums of a plane. The shift is for the types that have one: the first value of the plane.
+/// Sums a plane. The shift, of the types that have one, is the first value of the plane.
 void SumPlane(const std::uint8_t* values, std::size_t count, PlaneSums<std::uint8_t>& sums);
 void SumPlane(const std::int8_t* values, std::size_t count, PlaneSums<std::int8_t>& sums);
 void SumPlane(const std::uint16_t* values, std::size_t count, PlaneSums<std::uint16_t>& sums);
@@ -76,7 +77,7 @@ void SumPlane(const double* values, std::size_t count, PlaneSums<double>& sums);
 void SumPlane(const std::uint64_t* values, std::size_t count, PlaneSums<std::uint64_t>& sums);
 void SumPlane(const std::int64_t* values, std::size_t count, PlaneSums<std::int64_t>& sums);
 
-/// Values less a shift, as doubles.
+/// Converts values to doubles and takes a shift off each.
 void Widen(const std::uint8_t* values, std::size_t count, double shift, double* out);
 void Widen(const std::int8_t* values, std::size_t count, double shift, double* out);
 void Widen(const std::uint16_t* values, std::size_t count, double shift, double* out);
@@ -88,21 +89,22 @@ void Widen(const double* values, std::size_t count, double shift, double* out);
 void Widen(const std::uint64_t* values, std::size_t count, double shift, double* out);
 void Widen(const std::int64_t* values, std::size_t count, double shift, double* out);
 
-/// Values of 8 bits as integers whose products are quicker to sum.
+/// Converts values of 8 bits to integers of 16, whose products are quicker to sum.
 void Widen(const std::uint8_t* values, std::size_t count, std::int16_t* out);
 void Widen(const std::int8_t* values, std::size_t count, std::int16_t* out);
 
-/// Makes a plane that of its valid values alone: one that isn't valid becomes 0, and its weight is
-/// 0, where that of others is 1.
+/// Zeroes the invalid values of a plane and fills `weights` with 1 for valid values and 0 for
+/// others.
 void WeighPlane(const unsigned char* mask, std::size_t count, double* plane, double* weights);
 void WeighPlane(const unsigned char* mask, std::size_t count, std::int16_t* plane,
                 std::int16_t* weights);
 
-/// The sums of the products of plane `x` with each of `planes` planes, which lie `stride` values
-/// apart from `y` on.
+/// Computes the sums of the products of plane `x` with each of `planes` planes, which lie `stride`
+/// values apart from `y` on.
+/// @param out  [out] one sum for each of them.
 void Dot(const double* x, const double* y, std::size_t planes, std::size_t stride,
          std::size_t count, double* out);
-/// The same for what Widen makes of 8 bits.
+/// The same for values of 8 bits that Widen has converted.
 void Dot(const std::int16_t* x, const std::int16_t* y, std::size_t planes, std::size_t stride,
          std::size_t count, std::int32_t* out);
 

@@ -10,7 +10,7 @@
 
 namespace lumo {
 
-/// What keeps the statistics of one band: exact sums where T allows it, else the running form.
+/// The accumulator for one band of T: exact sums where T allows it, else the running form.
 template <typename T>
 using BandAccumulator =
     std::conditional_t<kExactStats<T>, ExactStatsAccumulator<T>, LargeStatsAccumulator<T>>;
@@ -18,11 +18,13 @@ using BandAccumulator =
 /// The valid values of one band's plane, and their sums.
 template <typename T>
 struct SummedPlane {
-  ValidPlane<T> valid;
-  PlaneSums<T> sums;  ///< of the whole plane, with what fills it
+  ValidPlane<T> valid;  ///< which values count
+  PlaneSums<T> sums;    ///< of the whole plane, with what fills it
 };
 
 /// Sums the plane of one band. The result means something until the next call with `planes`.
+/// @param band    of the group, from 0.
+/// @param planes  gives the memory for planes with values that don't count.
 template <typename T>
 SummedPlane<T> SumBand(const PlaneGroup<T>& group, std::size_t band, ValidPlanes<T>& planes) {
   SummedPlane<T> summed;
@@ -48,7 +50,7 @@ SummedPlane<T> SumBand(const PlaneGroup<T>& group, std::size_t band, ValidPlanes
   return summed;
 }
 
-/// Takes a plane of `count` values in.
+/// Takes a plane of `count` values in; the values that fill it are taken off again.
 template <typename T>
 void AddPlane(const SummedPlane<T>& plane, std::size_t count, ExactStatsAccumulator<T>& into) {
   if (plane.valid.count == 0) return;
@@ -62,7 +64,8 @@ void AddPlane(const SummedPlane<T>& plane, std::size_t count, ExactStatsAccumula
   into.max = std::max(into.max, plane.sums.max);
 }
 
-/// Sums that left the range of a double give the running form's values, one by one.
+/// Takes a plane of `count` values in. Where its sums left the range of a double, the values are
+/// added one by one.
 template <typename T>
 void AddPlane(const SummedPlane<T>& plane, std::size_t count, LargeStatsAccumulator<T>& into) {
   if (plane.valid.count == 0) return;

@@ -12,20 +12,30 @@
 
 namespace lumo {
 
-/// Planes of the same pixels, one for each band.
+/// Planes of the same pixels, one for each band: that of band b begins at values + b * stride.
 template <typename T>
 struct PlaneGroup {
-  const T* values;
-  const unsigned char* states;  ///< null: all valid
+  const T* values;              ///< the plane of band 0
+  const unsigned char* states;  ///< in the same order; null: all valid
   std::size_t stride;           ///< from one band's plane to the next one's
   std::size_t count;            ///< pixels, kPlane at most
 };
 
 /// Cuts a part of a tile into groups of planes that fit the first caches. Where the tile's pixels
-/// are interleaved, they are parted into memory of its own; else the planes lie in the tile.
+/// are interleaved, they are deinterleaved into memory of its own; else the planes lie in the tile.
+///
+///     PlaneWalk<float> walk(tile);
+///     walk.ForEach(part, [&](const PlaneGroup<float>& group) {
+///       for (std::size_t band = 0; band < bands; ++band) {
+///         Use(band, group.values + band * group.stride, group.count);
+///       }
+///     });
+///
+/// Threads: one at a time; each thread of a loop has its own.
 template <typename T>
 class PlaneWalk {
  public:
+  /// @param tile  outlives the walk; without borders unless its order is BIP.
   explicit PlaneWalk(const Tile<T>& tile)
       : values_(tile.PixelArray().GetData()),
         states_(tile.StateArray().GetData()),
@@ -119,17 +129,17 @@ class PlaneWalk {
 /// The valid values of one plane.
 template <typename T>
 struct ValidPlane {
-  const T* values;            ///< where one isn't valid, stands one that is
-  const unsigned char* mask;  ///< ones where a value is valid; null: all are
+  const T* values;            ///< with the filler in place of those that aren't valid
+  const unsigned char* mask;  ///< 0xFF where a value is valid, else 0; null: all are
   std::size_t count;          ///< how many are valid; 0: nothing else means anything
-  T filler;                   ///< what stands where one isn't valid
+  T filler;                   ///< one of the valid values
 };
 
 /// Finds the valid values of planes, in memory that is used again.
 template <typename T>
 class ValidPlanes {
  public:
-  /// What of a plane is valid: states without a bit of NotValid, and finite values. The plane found
+  /// Finds the valid values of a plane: finite ones whose state has no bit of NotValid. The result
   /// means something until the next call.
   /// @param states  null: all valid. @param allFinite  known beforehand.
   ValidPlane<T> Find(const T* values, const unsigned char* states, std::size_t count,

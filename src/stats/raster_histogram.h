@@ -43,16 +43,19 @@ class RasterHistogram : public Object {
     return typeCode == TypeCode || Object::IsA(typeCode);
   }
 
-  /// Finds what is missing of the bins, and makes all counts 0. @return whether it is valid then.
+  /// Computes the sizes or numbers of bins that are missing, and makes all counts 0.
+  /// @return whether it is valid then.
   bool FillBins();
 
+  /// Bands that are counted.
   unsigned BandCount() const { return bandCount_; }
   HistogramSign Sign() const { return sign_; }
   Form Bins() const { return bins_; }
+  /// Width of the bins of a band, in pixel values.
   double BinSize(unsigned band) const { return binSizes_[band]; }
   unsigned BinCount(unsigned band) const { return binCounts_[band]; }
-  T Min(unsigned band) const { return mins_[band]; }
-  T Max(unsigned band) const { return maxes_[band]; }
+  T Min(unsigned band) const { return mins_[band]; }   ///< where the first bin begins
+  T Max(unsigned band) const { return maxes_[band]; }  ///< upper bound, inclusive
 
   /// The counts of a band's bins.
   unsigned long long* Counts(unsigned band) {

@@ -5,8 +5,12 @@
 #include "stats/raster_stats.h"
 #include "tasks/scratch_pool.h"
 
-// How histograms are counted: a process that reads a raster and counts several of its tiles at
-// once. T is one of TenTypes.
+// Histograms are counted by a process that reads a raster and counts several of its tiles at once.
+// T is one of TenTypes.
+//
+//     const RasterIteratorPtr<float> tiles(new RasterIteratorStream<float>(raster));
+//     RasterHistogramProcess<float> process(tiles, histogram, ipc);
+//     const bool well = process.RunProcess(process.kHere);
 
 namespace lumo {
 
@@ -25,7 +29,7 @@ class RasterHistogramAccumulateTask final : public StatelessTask {
   ScratchPool<HistogramCounter<T>> counters_;  // nothing is shared while counting
 };
 
-/// Counts the histograms of what an iterator reads, whose bands are those of `working`.
+/// Counts the histograms of the pixels that an iterator reads, whose bands are those of `working`.
 template <typename T>
 class RasterHistogramProcess final : public TileProcess<> {
  public:
@@ -38,6 +42,7 @@ template <typename T>
 class HistogramCallback {
  public:
   virtual ~HistogramCallback() = default;
+  /// Called once, on the thread of the run, after its last tile.
   virtual void TakeResults(const RasterStatsPtr<T>& stats, const RasterHistogramPtr<T>& histogram,
                            HistogramSign sign) = 0;
 

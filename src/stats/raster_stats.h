@@ -14,6 +14,13 @@ namespace lumo {
 /// up to 32 bits come from exact sums: they do not depend on how the pixels were divided.
 ///
 /// Failure: an object that could not be sized is not valid, and everything gives false.
+///
+///     RasterStats<float> stats(tile.Bands());
+///     stats.Accumulate(tile, 0, tile.Height(), 0, tile.Width());
+///     if (!stats.Finish()) return false;
+///     const double mean = stats.Means()[0];
+///
+/// Threads: one at a time. Each thread of a loop has its own, and Merge brings them together.
 template <typename T>
 class RasterStats : public Object {
  public:
@@ -28,13 +35,15 @@ class RasterStats : public Object {
 
   /// Forgets everything, and makes room for so many bands.
   void Reset(unsigned bandCount);
+  /// Bands of the raster.
   unsigned BandCount() const { return bandCount_; }
 
   /// Takes in the part of a tile from rowFrom to before rowTo and from columnFrom to before
   /// columnTo. @return false for a tile with another number of bands.
   bool Accumulate(const Tile<T>& tile, unsigned rowFrom, unsigned rowTo, unsigned columnFrom,
                   unsigned columnTo);
-  /// Takes in what another object with as many bands has seen.
+  /// Takes in what another object with as many bands has seen. The order of merges decides the last
+  /// bits of floating-point results. @return false, with no change, for another number of bands.
   bool Merge(const RasterStats& other);
   /// Computes the results, and forgets what they came from. @return false, with no results, for an
   /// object without bands, or one that is finished.
@@ -49,7 +58,7 @@ class RasterStats : public Object {
   const Array<double>& Stds() const { return stds_; }
   const Array<double>& Sums() const { return sums_; }
   const Array<double>& Sums2() const { return sums2_; }  ///< sums of the squares
-  const Array<double>& RMSs() const { return rmss_; }
+  const Array<double>& RMSs() const { return rmss_; }    ///< roots of the means of the squares
 
   /// The results of one band as a value, with the mask StatsMask::Basic.
   RasterBandStats<T> BandStats(unsigned band) const;

@@ -3,9 +3,14 @@
 #include "raster/tile_process.h"
 #include "stats/extended_raster_stats.h"
 
-// How statistics are computed: a process that reads a raster, takes in several of its tiles at
-// once, and joins what they gave in their order. T is one of TenTypes, Stats is RasterStats<T> or
+// Statistics are computed by a process that reads a raster, takes in several of its tiles at once,
+// and joins their results in their order. T is one of TenTypes, Stats is RasterStats<T> or
 // ExtendedRasterStats<T>.
+//
+//     const RasterIteratorPtr<float> tiles(new RasterIteratorStream<float>(raster));
+//     const RasterStatsPtr<float> stats(new RasterStats<float>);
+//     RasterStatsProcess<float, RasterStats<float>> process(tiles, stats, ipc);
+//     if (process.RunProcess(process.kHere)) Use(stats->Means());
 
 namespace lumo {
 

@@ -5,9 +5,9 @@
 
 namespace lumo {
 
-/// Whether a command waits for computations that go on over its raster. Told: what another command
-/// computes makes it fail, or leaves what it sets without effect. Always: it waits its turn, and
-/// finds the results of those before it at hand.
+/// Says whether a command waits for computations that go on over its raster. Told: a computation of
+/// another command makes it fail, or leaves what it sets without effect. Always: it waits its turn,
+/// and finds the results of those before it at hand.
 enum class Waiting { kTold, kAlways };
 
 /// "Told", "Always".
@@ -19,6 +19,9 @@ InputDeclaration WaitInput();
 /// The turn of a command on the statistics and histograms of a raster: of the commands that wait,
 /// one at a time has it, until it lets go.
 /// Threads: any.
+///
+///     const Turn turn(raster, waiting, ipc);  // blocks while another command has it
+///     const String fault = RunHistogram(*raster, request, turn, ipc);
 class Turn {
  public:
   /// Blocks until the turn has come and no computation goes on, or the abort flag is up. A command

@@ -15,18 +15,19 @@ namespace lumo {
 
 // One operand and a constant ----------------------------------------------------------------------
 
-/// Rounds down, then to an integer.
+/// Rounds down, then to an integer. A value outside the range of int has no defined result.
 struct UnOpClassFloor {
   int operator()(double value) const { return static_cast<int>(std::floor(value)); }
 };
 
-/// Sets the bits of a code.
+/// Sets the bits of a code in a byte, as a state bit is set in the states of a tile.
 struct BinOpASClassOr {
   unsigned char code;
+  /// The byte with the bits of `code` set as well.
   unsigned char operator()(unsigned char value) const { return value | code; }
 };
 
-/// Keeps the bits of a mask.
+/// Keeps the bits of a mask in a byte, and clears the others.
 struct BinOpASClassAnd {
   int mask;
   unsigned char operator()(unsigned char value) const {
@@ -34,7 +35,8 @@ struct BinOpASClassAnd {
   }
 };
 
-/// result[i] = operation(a[i]), over the smaller of the two counts.
+/// Applies an operation to each element: result[i] = operation(a[i]), over the smaller of the two
+/// counts. Both arrays outlive the loop, and are not resized.
 template <typename R, typename T, typename Op>
 class UnaryOperationArray final : public ArrayParallelFor {
  public:
@@ -55,7 +57,13 @@ class UnaryOperationArray final : public ArrayParallelFor {
   Array<R>& result_;
 };
 
-/// An array of the shape of `a` with `operation` of each element.
+/// Makes an array of the shape of `a` with `operation` of each element.
+///
+///     const Array<int> whole = ApplyToArray<int>(heights, UnOpClassFloor());
+///
+/// @param operation  is called on many threads at once, on a copy that the loop keeps.
+/// @param grain      elements of a part at least; 0 leaves it to the engine.
+/// @return an array with ObjectErrorOutOfMemory stored when it could not be sized.
 template <typename R, typename T, typename Op>
 Array<R> ApplyToArray(const Array<T>& a, const Op& operation, unsigned grain = 0) {
   Array<R> result(a.GetDims());
@@ -115,27 +123,37 @@ class ParallelMatrixProduct final : public ArrayParallelFor2 {
   unsigned inner_;
 };
 
+/// A times B.
 template <typename T, typename U, typename V>
 using ParallelMatrixMultiply = ParallelMatrixProduct<T, U, V, false, false>;
+/// A transposed, times B.
 template <typename T, typename U, typename V>
 using ParallelMatrixMultiplyTA = ParallelMatrixProduct<T, U, V, true, false>;
+/// A times B transposed.
 template <typename T, typename U, typename V>
 using ParallelMatrixMultiplyTB = ParallelMatrixProduct<T, U, V, false, true>;
+/// A transposed, times B transposed.
 template <typename T, typename U, typename V>
 using ParallelMatrixMultiplyTAB = ParallelMatrixProduct<T, U, V, true, true>;
 
 /// Which operands of a product are taken transposed.
 enum class MatrixMode : unsigned { kPlain = 0, kTA = 1, kTB = 2, kTAB = 3 };
 
-/// The product of two matrices. Operands whose inner extents differ give an array that holds
-/// MatirxErrorBadDims.
+/// Makes the product of two matrices, of rows of A by columns of B, each as `mode` takes it. Its
+/// cost is rows times columns times the inner extent.
+/// @param grain  rows and columns of a part at least; 0 leaves it to the engine.
+/// @return an array that holds MatirxErrorBadDims when the inner extents differ.
 VEXG_EXPORT Array<double> MultiplyMatrices(const Array<double>& a, const Array<double>& b,
                                            MatrixMode mode = MatrixMode::kPlain,
                                            unsigned grain = 0);
 
 // Extremes, sums and distinct values --------------------------------------------------------------
 
-/// The index of the largest element; of equal ones the lowest, and 0 for an empty array.
+/// Finds the index of the largest element; of equal ones the lowest, and 0 for an empty array.
+///
+///     ParallelArrayMax<double> loop(values);
+///     unsigned largest = 0;
+///     RunParallelReduce(loop, largest);
 template <typename T>
 class ParallelArrayMax final : public ArrayParallelReduce<unsigned> {
  public:
@@ -156,7 +174,8 @@ class ParallelArrayMax final : public ArrayParallelReduce<unsigned> {
   const Array<T>& values_;
 };
 
-/// The index of the smallest and of the largest element; of equal ones the lowest.
+/// Finds the indices of the smallest and of the largest element, in this order; of equal ones the
+/// lowest, and 0 for an empty array.
 template <typename T>
 class ParallelArrayMinMax final : public ArrayParallelReduce<std::pair<unsigned, unsigned>> {
  public:
@@ -179,7 +198,8 @@ class ParallelArrayMinMax final : public ArrayParallelReduce<std::pair<unsigned,
   const Array<T>& values_;
 };
 
-/// The sum of all elements.
+/// Adds up all elements as values of U. The joins follow a fixed cut, so a sum of floating-point
+/// numbers has the same bits for any number of threads.
 template <typename T, typename U>
 class ParallelArrayTotal final : public ArrayParallelReduce<U> {
  public:
@@ -198,9 +218,10 @@ class ParallelArrayTotal final : public ArrayParallelReduce<U> {
   const Array<T>& values_;
 };
 
-/// Where distinct values begin: `order` lists positions of `values` in sorted order, and `out`, at
-/// least as long, receives those of its entries at which a new value starts. The scan's sum is how
-/// many there are.
+/// Finds where distinct values begin: `order` lists positions of `values` in sorted order, and
+/// `out`, at least as long, receives those of its entries at which a new value starts. The scan's
+/// sum is how many there are. An `out` that is too short sets ParallelError, and nothing is
+/// written.
 template <typename T>
 class ParallelArrayUnsortedUnique final : public ArrayParallelScan<unsigned> {
  public:
@@ -239,8 +260,8 @@ class ParallelArrayUnsortedUnique final : public ArrayParallelScan<unsigned> {
 
 // Interpolation -----------------------------------------------------------------------------------
 
-/// Bilinear interpolation of a table of rows by columns at positions (x[i] along the rows, y[i]
-/// along the columns), clamped to the table. A NaN position reads at 0.
+/// Interpolates bilinearly in a table of rows by columns at positions (x[i] along the rows, y[i]
+/// along the columns), in elements from the first, clamped to the table. A NaN position reads at 0.
 /// @param out  sized to the positions.
 /// Failure: a table that is not of rank 2, or positions of different counts, set ParallelError here
 ///          and ArrayErrorInvalidArray on `out`.

@@ -19,8 +19,8 @@
 namespace lumo {
 namespace {
 
-/// Tells the thread sanitizer of the order that oneTBB makes: a loop begins after what its caller
-/// did before, and what its parts did comes before what the caller does next. Parts have no order
+/// Shows the thread sanitizer the order that oneTBB makes: a loop begins after the work that its
+/// caller did before, and the work of its parts comes before the caller's next. Parts have no order
 /// among themselves.
 class LoopOrder {
  public:
@@ -56,7 +56,7 @@ void InPieces(I begin, I end, std::int64_t whole, const AbortFlag* abort, const 
   }
 }
 
-/// What oneTBB sees of a loop over one dimension.
+/// Shows oneTBB a loop over one dimension.
 template <typename I>
 struct TBBParallelFor {
   IParallelFor<I>* loop;
@@ -71,7 +71,7 @@ struct TBBParallelFor {
   }
 };
 
-/// What oneTBB sees of a loop over two dimensions: rows are dimension 0, columns dimension 1.
+/// Shows oneTBB a loop over two dimensions: rows are dimension 0, columns dimension 1.
 template <typename I>
 struct TBBParallelFor2 {
   IParallelFor2<I>* loop;
@@ -88,7 +88,7 @@ struct TBBParallelFor2 {
   }
 };
 
-/// What oneTBB sees of a loop over three dimensions: pages, rows and columns are 0, 1 and 2.
+/// Shows oneTBB a loop over three dimensions: pages, rows and columns are 0, 1 and 2.
 template <typename I>
 struct TBBParallelFor3 {
   IParallelFor3<I>* loop;

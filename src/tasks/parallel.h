@@ -24,20 +24,40 @@
 // result is then of no use, which the caller sees by the flag.
 //
 // An exception of a body ends the loop and comes out of the runner.
+//
+// A loop that is a function needs none of the classes:
+//
+//     ParallelFor(lines, ipc.abort.Get(), [&](unsigned line) { Sharpen(image, line); });
+//
+// One that reduces says how parts are made and joined:
+//
+//     struct Largest final : ArrayParallelReduce<float> {  // see parallel_ranges.h
+//       explicit Largest(const Array<float>& a) : CountedRange(a.GetCount()), values(a) {}
+//       float Identity() override { return -INFINITY; }
+//       void Join(float& left, const float& right) override { left = std::max(left, right); }
+//       float Accumulate(unsigned begin, unsigned end) override {
+//         return *std::max_element(values.begin() + begin, values.begin() + end);
+//       }
+//       const Array<float>& values;
+//     } loop(values);
+//     float largest = 0;
+//     RunParallelReduce(loop, largest);
 
 namespace lumo {
 
-/// A loop over begin <= i < end.
+/// A loop over begin <= i < end. Begin and End are asked before the loop and do not change
+/// meanwhile.
 template <typename I>
 class IParallelFor {
  public:
   virtual I Begin() const = 0;
   virtual I End() const = 0;
+  /// Works on a part of the range, the end excluded.
   virtual void Body(I begin, I end) = 0;
   virtual ~IParallelFor() = default;
 };
 
-/// A loop over a rectangle of indices; dimension 1 is the slower one in memory where it matters.
+/// A loop over a rectangle of indices. Dimension 1 is the slower one in memory where it matters.
 template <typename I>
 class IParallelFor2 {
  public:
@@ -45,11 +65,12 @@ class IParallelFor2 {
   virtual I Begin1() const = 0;
   virtual I End0() const = 0;
   virtual I End1() const = 0;
+  /// Works on a part of the rectangle, both ends excluded.
   virtual void Body(I begin0, I end0, I begin1, I end1) = 0;
   virtual ~IParallelFor2() = default;
 };
 
-/// A loop over a box of indices.
+/// A loop over a box of indices; of a block of pixels dimension 0 is samples, 1 lines and 2 bands.
 template <typename I>
 class IParallelFor3 {
  public:
@@ -59,6 +80,7 @@ class IParallelFor3 {
   virtual I End0() const = 0;
   virtual I End1() const = 0;
   virtual I End2() const = 0;
+  /// Works on a part of the box, all ends excluded.
   virtual void Body(I begin0, I end0, I begin1, I end1, I begin2, I end2) = 0;
   virtual ~IParallelFor3() = default;
 };
@@ -70,8 +92,11 @@ class IParallelReduce {
  public:
   virtual I Begin() const = 0;
   virtual I End() const = 0;
+  /// The result of an empty part: joined to another, it changes nothing.
   virtual R Identity() = 0;
+  /// Joins the result of the part that follows `left` to it.
   virtual void Join(R& left, const R& right) = 0;
+  /// The result of a part, on any worker.
   virtual R Accumulate(I begin, I end) = 0;
   virtual ~IParallelReduce() = default;
 };
@@ -86,18 +111,23 @@ class IParallelReduce2 {
   virtual I End1() const = 0;
   virtual R Identity() = 0;
   virtual void Join(R& left, const R& right) = 0;
+  /// The result of a part of the rectangle, on any worker.
   virtual R Accumulate(I begin0, I end0, I begin1, I end1) = 0;
   virtual ~IParallelReduce2() = default;
 };
 
-/// A prefix scan over begin <= i < end.
+/// A prefix scan over begin <= i < end: each element sees the joined result of all before it, as in
+/// a running sum. A scan reads its data twice.
 template <typename R, typename I>
 class IParallelScan {
  public:
   virtual I Begin() const = 0;
   virtual I End() const = 0;
+  /// The sum in front of the first element.
   virtual R Identity() = 0;
+  /// Joins the sum of the part that follows to `sum`.
   virtual void Join(R& sum, const R& right) = 0;
+  /// Sets `sum` to `value`.
   virtual void Assign(R& sum, const R& value) = 0;
   /// Writes the results of a part to which everything before adds up to `sum`. Gives the new sum.
   virtual R FinalScan(I begin, I end, const R& sum) = 0;
@@ -106,10 +136,10 @@ class IParallelScan {
   virtual ~IParallelScan() = default;
 };
 
-/// How a loop tells that its data are of no use. A constructor or a body calls Fail(); bodies begin
+/// Notes that the data of a loop are of no use. A constructor or a body calls Fail(); bodies begin
 /// with a look at Failed() and do nothing when it is set, and a reduction gives its identity. After
 /// the runner has returned the caller finds ParallelError here, and must not use the result; with
-/// Close() it also gets the fault that the first one told, on whichever thread.
+/// Close() it also gets the fault text that the first failure set, on whichever thread.
 /// Threads: Fail and Failed may be called on any; the error state is for after the loop.
 class VEXG_EXPORT ParallelResult : public ErrorState {
  public:
@@ -117,13 +147,16 @@ class VEXG_EXPORT ParallelResult : public ErrorState {
   ParallelResult(const ParallelResult&) = delete;
   ParallelResult& operator=(const ParallelResult&) = delete;
 
+  /// True once some part has failed, on whichever thread.
   bool Failed() const { return failed_; }
+  /// Notes a failure, and takes the fault text off this thread. Only the first one counts.
   void Fail() {
     if (failed_.exchange(true)) return;
     fault_ = TakeFault();
     SetErrorState(ParallelError());
   }
-  /// Tells on this thread what the first failure told on its own. @return true when nothing failed.
+  /// Sets on this thread the fault text that the first failure left. @return true when nothing
+  /// failed.
   bool Close() const {
     if (fault_.GetLength() != 0) SetFault(fault_);
     return !HasError();
@@ -134,13 +167,16 @@ class VEXG_EXPORT ParallelResult : public ErrorState {
   String fault_;
 };
 
-/// Runs the parts of a loop. `grain` bounds how finely the range is cut; 0 leaves it to the engine.
-/// I is unsigned or int. An empty range calls nothing.
+/// Runs the parts of a loop, and returns when all are done. I is unsigned or int. An empty range
+/// calls nothing.
+/// @param grain  bounds how finely the range is cut; 0 leaves it to the engine.
+/// @param abort  leaves out the parts that have not begun when it rises; null for none.
 template <typename I>
 void RunParallelFor(IParallelFor<I>& loop, unsigned grain = 0, const AbortFlag* abort = nullptr);
-/// The same grain holds for both dimensions.
+/// Runs the parts of a loop over a rectangle. The same grain holds for both dimensions.
 template <typename I>
 void RunParallelFor2(IParallelFor2<I>& loop, unsigned grain = 0, const AbortFlag* abort = nullptr);
+/// Runs the parts of a loop over a box, which the engine cuts as it sees fit.
 template <typename I>
 void RunParallelFor3(IParallelFor3<I>& loop, const AbortFlag* abort = nullptr);
 
@@ -228,7 +264,7 @@ void RunParallelReduce2(IParallelReduce2<R, I>& loop, R& out, const AbortFlag* a
   detail::Isolated(run);
 }
 
-/// As RunParallelReduce2 over one dimension.
+/// Joins the results of the parts of a range, as RunParallelReduce2 does over two dimensions.
 template <typename R, typename I>
 void RunParallelReduce(IParallelReduce<R, I>& loop, R& out, const AbortFlag* abort = nullptr) {
   const detail::Extent range{loop.Begin(), loop.End()};
@@ -248,6 +284,7 @@ void RunParallelReduce(IParallelReduce<R, I>& loop, R& out, const AbortFlag* abo
 
 /// Calls `body(i)` for the numbers below `count`, or `body(begin, end)` for parts of them, on any
 /// thread: RunParallelFor for a loop that is a function.
+/// @param abort  as for RunParallelFor; null for none.
 template <typename F>
 void ParallelFor(unsigned count, const AbortFlag* abort, const F& body) {
   struct Loop final : IParallelFor<unsigned> {

@@ -10,6 +10,7 @@ namespace lumo {
 template <typename Interface>
 class CountedRange : public Interface, public ParallelResult {
  public:
+  /// @param count  the end of the range; 0 for a loop that does nothing.
   explicit CountedRange(unsigned count) : count_(count) {}
   unsigned Begin() const override { return 0; }
   unsigned End() const override { return count_; }
@@ -18,9 +19,12 @@ class CountedRange : public Interface, public ParallelResult {
   unsigned count_;
 };
 
+/// A loop over the elements of an array.
 using ArrayParallelFor = CountedRange<IParallelFor<unsigned>>;
+/// A reduction over the elements of an array to an R.
 template <typename R>
 using ArrayParallelReduce = CountedRange<IParallelReduce<R, unsigned>>;
+/// A scan over the elements of an array with sums of R.
 template <typename R>
 using ArrayParallelScan = CountedRange<IParallelScan<R, unsigned>>;
 
@@ -28,6 +32,7 @@ using ArrayParallelScan = CountedRange<IParallelScan<R, unsigned>>;
 template <typename Interface>
 class CountedRange2 : public Interface, public ParallelResult {
  public:
+  /// @param count0,count1  the ends of the dimensions; of pixels samples, then lines.
   CountedRange2(unsigned count0, unsigned count1) : count0_(count0), count1_(count1) {}
   unsigned Begin0() const override { return 0; }
   unsigned Begin1() const override { return 0; }
@@ -39,13 +44,16 @@ class CountedRange2 : public Interface, public ParallelResult {
   unsigned count1_;
 };
 
+/// A loop over a rectangle.
 using ArrayParallelFor2 = CountedRange2<IParallelFor2<unsigned>>;
+/// A reduction over a rectangle to an R.
 template <typename R>
 using ArrayParallelReduce2 = CountedRange2<IParallelReduce2<R, unsigned>>;
 
 /// A loop over 0 to each count.
 class ArrayParallelFor3 : public IParallelFor3<unsigned>, public ParallelResult {
  public:
+  /// @param count0,count1,count2  the ends of the dimensions; of pixels samples, lines, bands.
   ArrayParallelFor3(unsigned count0, unsigned count1, unsigned count2)
       : count0_(count0), count1_(count1), count2_(count2) {}
   unsigned Begin0() const override { return 0; }
@@ -61,9 +69,10 @@ class ArrayParallelFor3 : public IParallelFor3<unsigned>, public ParallelResult 
   unsigned count2_;
 };
 
-/// A loop over a rectangle that may begin below 0.
+/// A loop over a rectangle that may begin below 0, as a tile with borders does.
 class RangeParallelFor2 : public IParallelFor2<int>, public ParallelResult {
  public:
+  /// @param begin0,end0,begin1,end1  the range of each dimension, the ends excluded.
   RangeParallelFor2(int begin0, int end0, int begin1, int end1)
       : begin0_(begin0), end0_(end0), begin1_(begin1), end1_(end1) {}
   int Begin0() const override { return begin0_; }

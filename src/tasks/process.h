@@ -8,7 +8,7 @@
 
 namespace lumo {
 
-/// The list of argument ids that a TaskDescriptor takes.
+/// Makes the list of argument ids that a TaskDescriptor takes: ArgIDs({tile, sums}).
 VEXG_EXPORT Array<ArgID> ArgIDs(std::initializer_list<ArgID> ids);
 
 /// How a process makes one stage: which task, which arguments of the run its constructor receives,
@@ -29,8 +29,11 @@ class VEXG_EXPORT TaskDescriptor : public ErrorState {
   /// True when a task can be made: a factory that is ready, and no error.
   bool IsUsable() const { return !HasError() && factory_ != nullptr && factory_->IsReady(); }
 
+  /// The factory, which is not the descriptor's; null for a default one.
   TaskFactory* GetFactory() const { return factory_; }
+  /// Slots of the token that the task sees, in the order of its list.
   const Array<ArgID>& GetTokenArgs() const { return tokenArgs_; }
+  /// Arguments of the run that the task's constructor sees, in the order of its list.
   const Array<ArgID>& GetSetupArgs() const { return setupArgs_; }
 
  private:
@@ -46,16 +49,19 @@ struct TaskToken {
   explicit TaskToken(unsigned argCount) : args(argCount) {}
 
   unsigned sequence = 0;  ///< 1 for the first token of a run
-  ArgList args;
-  bool valid = true;   ///< false: no stage is to work on it any more
-  bool error = false;  ///< a stage failed on it
+  ArgList args;           ///< the slots, by the ids that TakeTokenArg gave
+  bool valid = true;      ///< false: no stage is to work on it any more
+  bool error = false;     ///< a stage failed on it
 };
 
-/// What all processes have: their stages, the counts of their arguments, and the state of a run.
+/// Holds for all processes their stages, the counts of their arguments, and the state of a run.
 ///
-/// Threads: one thread runs it; the stages ask and tell its state from any worker, under its lock.
+/// Threads: one thread runs it; the stages read and change its state from any worker, under its
+///          lock.
 class VEXG_EXPORT BasicProcess : public ErrorState, public Lockable {
  public:
+  /// @param name  for people; nothing looks it up.
+  /// @param ipc   the flag that aborts a run, and the report of its progress.
   explicit BasicProcess(const String& name, const IPC& ipc = {}) : name_(name), ipc_(ipc) {}
   virtual ~BasicProcess() = default;
   BasicProcess(const BasicProcess&) = delete;
@@ -75,8 +81,11 @@ class VEXG_EXPORT BasicProcess : public ErrorState, public Lockable {
   ArgID TakeTokenArg() { return nextTokenArg_++; }
 
   const String& GetName() const { return name_; }
+  /// Stages, places that were never filled among them.
   unsigned GetTaskCount() const { return tasks_.GetCount(); }
+  /// Slots of a token: one above the highest that a stage is bound to.
   unsigned GetTokenArgCount() const { return tokenArgCount_; }
+  /// Arguments that a run needs at least.
   unsigned GetSetupArgCount() const { return setupArgCount_; }
   const IPC& GetIPC() const { return ipc_; }
 
@@ -93,7 +102,7 @@ class VEXG_EXPORT BasicProcess : public ErrorState, public Lockable {
   /// True when a stage failed.
   bool HasFailed() const;
   /// Keeps the fault text of a stage that failed, which worked on a thread of its own. The first
-  /// one stays; Run tells it on its thread.
+  /// one stays; Run sets it on its thread.
   void KeepFault(const String& fault);
   /// The fault text of the last run; no text when there was none.
   String GetFault() const;
@@ -145,6 +154,18 @@ extern template class VEXG_EXPORT CustomProcess<ProcessInitializer, ProcessTask,
 /// unless it is a StatelessTask, which works on one for each thread; different tasks work on
 /// different tokens at once. Memory stays bounded by the tokens in flight, which are as many as
 /// there are tasks, or threads for a StatelessTask.
+///
+/// Most computations are written as functions, see raster/tile_functions.h. One put together by
+/// hand:
+///
+///     Process process(String("Scale"), ipc);
+///     const ArgID tile = process.TakeTokenArg();
+///     const ArgID source = process.TakeSetupArg();
+///     process.AddTask(0, TaskDescriptor(&reader, ArgIDs({tile}), ArgIDs({source})));
+///     process.AddTask(1, TaskDescriptor(&scaler, ArgIDs({tile}), {}));
+///     ArgList args;
+///     args.Set(source, iterator);
+///     const bool well = process.Run(args);
 class VEXG_EXPORT Process final
     : public CustomProcess<ProcessInitializer, ProcessTask, ProcessTerminator> {
  public:

@@ -33,17 +33,22 @@ class ProcessBuilder : public Async, public SelfPointing {
   ///         owns it.
   bool RunProcess(unsigned mode);
 
+  /// The mode of the last RunProcess; kHere before.
   unsigned GetRunMode() const { return runMode_; }
 
-  /// Why the last run failed, in words, as far as a stage told it.
+  /// The reason of the last run's failure in words, as far as a stage gave one; no text after a
+  /// success.
   String GetFault() const { return process_.GetFault(); }
 
   /// The work itself, for whoever starts it.
   void Execute() override;
 
  protected:
+  /// The process, for a constructor to add stages to.
   P& GetPipeline() { return process_; }
+  /// The arguments that a run gets.
   ArgList& GetArgs() { return args_; }
+  /// Declares the process complete; without it no run begins.
   void SetBuilt() { built_ = true; }
   bool IsBuilt() const { return built_; }
 
@@ -56,7 +61,7 @@ class ProcessBuilder : public Async, public SelfPointing {
 
 extern template class VEXG_EXPORT ProcessBuilder<Process>;
 
-/// A process whose end is told to an object that goes on from there, unless the run was aborted:
+/// A process whose end an object hears of, unless the run was aborted, to go on from there:
 /// `receiver->OnProcessEnd(*this)` is called on the thread of the run, after the last progress
 /// report and before a waiter sees the run finished.
 template <typename P, typename C>

@@ -11,7 +11,8 @@
 namespace lumo {
 
 /// The tokens of one run. A token that has ended is emptied and used again, so a run makes no more
-/// of them than are in flight at once.
+/// of them than are in flight at once. Tokens belong to it and go with it. Threads: tokens may be
+/// taken and returned on any.
 class TokenPool {
  public:
   explicit TokenPool(unsigned argCount) : argCount_(argCount) {}
@@ -32,6 +33,7 @@ class TokenPool {
 class ProcessInitializer final : public IPipelineReader<TaskToken> {
  public:
   ProcessInitializer(BasicProcess& process, TokenPool& pool) : process_(process), pool_(pool) {}
+  /// Gives a fresh token; null once the process should stop.
   TaskToken* Next() override;
 
  private:
@@ -70,6 +72,7 @@ class ProcessTask final : public ISimplePipelineProcess<TaskToken> {
 class ProcessTerminator final : public IPipelineWriter<TaskToken> {
  public:
   ProcessTerminator(BasicProcess& process, TokenPool& pool) : process_(process), pool_(pool) {}
+  /// Reports how the token ended to the process, and gives it back to the pool.
   bool Write(TaskToken* token) override;
 
  private:

@@ -8,6 +8,12 @@ namespace lumo {
 
 /// Lends objects to the threads of a loop, one to each: buffers that are used again, or the counts
 /// of each thread. There are as many as were out at once. Threads: any may borrow.
+///
+///     ScratchPool<std::vector<double>> lines;
+///     ParallelFor(height, abort, [&](unsigned y) {
+///       const auto line = lines.Borrow(width);  // width numbers at first; later as they were left
+///       Filter(y, *line);
+///     });
 template <typename T>
 class ScratchPool {
  public:
@@ -19,6 +25,7 @@ class ScratchPool {
     Loan(const Loan&) = delete;
     Loan& operator=(const Loan&) = delete;
 
+    /// The object, which nobody else has until the loan ends.
     T& operator*() const { return *object_; }
     T* operator->() const { return object_.get(); }
 
@@ -35,7 +42,8 @@ class ScratchPool {
     return Loan(*this, std::move(object));
   }
 
-  /// Takes all out of the pool. Nobody borrows meanwhile.
+  /// Takes all out of the pool. Nobody borrows meanwhile. Their order is that in which they came
+  /// back, which differs from run to run.
   std::vector<std::unique_ptr<T>> TakeAll() {
     const std::lock_guard lock(mutex_);
     return std::move(free_);

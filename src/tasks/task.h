@@ -18,6 +18,22 @@ class BasicProcess;
 /// Threads: Execute never overlaps with itself, so a task needs no lock for its own fields; only a
 ///          StatelessTask has none that it changes. It runs on any worker, and beside the other
 ///          stages' tasks; what it shares with them is to be safe for that.
+///
+///     class ScaleTask final : public SequentialTask {
+///      public:
+///       explicit ScaleTask(ArgList& setup) : SequentialTask("ScaleTask"), factor_(setup.Get(0)) {
+///         if (factor_.IsNull()) SetErrorState(TaskErrorBadParams());
+///       }
+///       bool Execute(ArgList& args) override {
+///         const TilePtr<float> tile(args.Get(0));
+///         if (tile.IsNull()) return false;
+///         for (float& value : tile->PixelArray()) value *= factor_->value;
+///         return true;
+///       }
+///
+///      private:
+///       ScalarPtr<float> factor_;
+///     };
 class VEXG_EXPORT Task : public ErrorState {
  public:
   virtual ~Task() = default;
@@ -34,7 +50,9 @@ class VEXG_EXPORT Task : public ErrorState {
   /// it returns is then of no consequence.
   virtual bool Execute(ArgList& args) = 0;
 
+  /// False for a task in error: the next token that reaches it fails the process.
   bool IsValid() const { return !HasError(); }
+  /// The name of the class, for people.
   const String& GetName() const { return name_; }
   /// True when the body runs parallel loops inside. For readers: the pipeline treats both alike.
   bool IsConcurrent() const { return concurrent_; }
@@ -43,6 +61,7 @@ class VEXG_EXPORT Task : public ErrorState {
 
   /// The process that runs this task, and owns it meanwhile; null outside a run.
   BasicProcess* GetProcess() const { return process_; }
+  /// Called by the process when it takes the task over.
   void SetProcess(BasicProcess* process) { process_ = process; }
 
   /// True when the run was asked to abort.
@@ -81,9 +100,10 @@ class VEXG_EXPORT StatelessTask : public ConcurrentTask {
   explicit StatelessTask(const char* name) : ConcurrentTask(name, true) {}
 };
 
-/// Makes and destroys one kind of task.
+/// Makes and destroys one kind of task. It outlives the processes that refer to it.
 class VEXG_EXPORT TaskFactory {
  public:
+  /// True when Create can make a task.
   virtual bool IsReady() = 0;
   /// @return a task that Destroy takes back; null when there is no memory for it.
   virtual Task* Create(ArgList& setupArgs) = 0;

@@ -9,9 +9,12 @@ namespace lumo {
 
 /// Shows the bands of several rasters of one pixel type as those of one raster, in order. Size and
 /// geo-reference are the first member's; a read goes to every member with the same rectangle. Min,
-/// max and the like of a band are its member's; what needs two bands, and histograms, are computed
-/// on the stack, whatever the members have: their arrays are of their own bands alone. Exists for
-/// EightTypes.
+/// max and the like of a band are its member's; statistics that need two bands, and histograms, are
+/// computed on the stack, whatever the members have: their arrays are of their own bands alone.
+/// Exists for EightTypes.
+///
+///     const RasterPtr<float> stack(new BandStackRaster<float>(members));  // of 3 bands, then 1
+///     stack->Mean(3, ipc);                                                // of the second member
 ///
 /// Ownership: shares the members, which do not know the stack.
 /// Threads:   every operation may run on many threads at once; nothing is stored per call.
@@ -25,6 +28,7 @@ class BandStackRaster final : public ComputedRaster<T> {
   ~BandStackRaster() override { this->StopComputing(); }
 
   URI GetURI() const override { return this->DefaultURI("BandStackRaster"); }
+  /// True when all members can be written.
   bool CanWrite() const override;
   RasterDef GetRasterDef() const override { return def_; }
   unsigned Bands() const override { return def_.bands; }
@@ -35,6 +39,7 @@ class BandStackRaster final : public ComputedRaster<T> {
   AsyncPtr PyramidAsync() const override { return {}; }
   bool PyramidDelete() override;
   bool PyramidRefresh() override;
+  /// The stack of the members' levels; empty where one has none.
   RasterPtr<T> PyramidLevel(unsigned level) override;
   RasterPtr<T> StoredPyramidLevel(unsigned) override { return {}; }
 

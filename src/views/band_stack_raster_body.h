@@ -48,8 +48,8 @@ BandStackRaster<T>::BandStackRaster(const Array<RasterPtr<T>>& members)
   if (def_.bands == 0) def_.Clear();
 }
 
-/// What `call(member, local band)` gives for a band of the stack; 0, false or empty for one that it
-/// doesn't have.
+/// Gives the result of `call(member, local band)` for a band of the stack; 0, false or empty for
+/// one that it doesn't have.
 template <typename T>
 template <typename Call>
 auto BandStackRaster<T>::AskMember(unsigned band, const Call& call) const {

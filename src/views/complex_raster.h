@@ -5,13 +5,13 @@
 
 namespace lumo {
 
-/// What the first of the three bands of a ComplexRaster shows of a pixel.
+/// Names the part of a pixel that the first of the three bands of a ComplexRaster shows.
 enum class ComplexPart {
-  kReal,
-  kImag,
-  kMagnitude,
-  kPower,  ///< natural logarithm of the magnitude; minus infinity of 0
-  kPhase,  ///< radians, -pi to pi
+  kReal,       ///< real part
+  kImag,       ///< imaginary part
+  kMagnitude,  ///< square root of the sum of both squares
+  kPower,      ///< natural logarithm of the magnitude; minus infinity of 0
+  kPhase,      ///< radians, -pi to pi
 };
 
 /// Magnitude of a complex number, without an overflow of the squares.
@@ -30,6 +30,7 @@ VEXG_EXPORT double ComplexPhase(double re, double im);
 template <typename T>
 class ComplexRaster final : public ComputedRaster<T> {
  public:
+  /// @param part  of the bands 0, 3, 6 and so on.
   ComplexRaster(const RasterPtr<Complex<T>>& parent, ComplexPart part);
   ~ComplexRaster() override { this->StopComputing(); }
 

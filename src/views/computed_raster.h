@@ -10,15 +10,24 @@ namespace lumo {
 /// the base of the sources, and of the views that show other pixels than their parent. It stores
 /// none of them. Everything else goes to the parent. Exists for TwelveTypes.
 ///
-/// A class derived from it says StopComputing() first in its destructor: what is being computed
+/// A class derived from it says StopComputing() first in its destructor: a computation that goes on
 /// reads the raster, which has to be whole until it has stopped.
+///
+///     template <typename T>
+///     class NegatedRaster final : public ComputedRaster<T> {
+///      public:
+///       explicit NegatedRaster(const RasterPtr<T>& parent) : ComputedRaster<T>(parent) {}
+///       ~NegatedRaster() override { this->StopComputing(); }
+///       bool GetSubRect(const SubRect& rect, const Array<unsigned>& bands, Interleave interleave,
+///                       Array<T>& pixels, Array<unsigned char>& state) override;
+///     };
 ///
 /// A view that in one of its forms shows the statistics of its parent says so to the constructor:
 /// the operations on statistics and histograms then go to the parent like everything else.
 template <typename T>
 class ComputedRaster : public RasterView<T> {
  public:
-  /// Whose statistics and histograms the raster gives.
+  /// Says whether the raster gives statistics and histograms of its own or the parent's.
   enum class StatsOf { kThis, kParent };
 
   explicit ComputedRaster(const RasterPtr<T>& parent = {}, StatsOf statsOf = StatsOf::kThis);
@@ -42,9 +51,10 @@ class ComputedRaster : public RasterView<T> {
   AsyncPtr CountHistogram(const HistogramRequest<T>& request, const IPC& ipc) override;
 
  protected:
-  /// Ends what is being computed; nothing is at hand, or can be computed, from then on.
+  /// Ends the computations that go on; nothing is at hand, or can be computed, from then on.
   void StopComputing();
 
+  /// The raster's own statistics; null where they are the parent's, or have stopped.
   DynamicRasterStats<T>* Stats() const { return stats_.Get(); }
   DynamicRasterHistogram<T>* Histogram() const { return histogram_.Get(); }
 

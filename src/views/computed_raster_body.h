@@ -25,8 +25,8 @@ void ComputedRaster<T>::StopComputing() {
   stats_ = DynamicRasterStatsPtr<T>();
 }
 
-/// What `own(statistics)` gives, 0 or empty once they have stopped; or what `parents()` does, where
-/// they are the parent's.
+/// Gives the result of `own(statistics)`, 0 or empty once they have stopped; or that of `parents()`
+/// where they are the parent's.
 template <typename T>
 template <typename Own, typename Parents>
 auto ComputedRaster<T>::OfStats(const Own& own, const Parents& parents) const {

@@ -7,7 +7,12 @@
 
 namespace lumo {
 
-/// Base of the commands that put a raster into the catalog and give its URI and DataType.
+/// Helps commands that put a raster into the catalog and give its URI and DataType:
+///
+///     CommandResult Execute() override {
+///       if (!CheckInputs()) return Fail();
+///       return Publish(BasicRasterPtr(new TempRaster<float>(samples, lines, bands, {})));
+///     }
 class VEXG_EXPORT PublishCommand : public RasterCommand {
  protected:
   /// Gives the raster that was entered, when there is a valid one; else takes it out again and

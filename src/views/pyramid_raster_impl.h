@@ -23,7 +23,8 @@ namespace lumo {
 template <typename T>
 class PyramidRasterImpl final : public ComputedRaster<T> {
  public:
-  /// @param raster  what the level belongs to: its size and geo-reference are taken over, adapted,
+  /// @param raster  the one that the level belongs to: its size and geo-reference are taken over,
+  /// adapted,
   ///                in the told form unless ExactLevels are wanted.
   PyramidRasterImpl(const Raster<T>& raster, const RasterReaderPtr<T>& reader,
                     const RasterDataConnectionPtr& connection, unsigned level);
@@ -56,7 +57,7 @@ class PyramidRasterImpl final : public ComputedRaster<T> {
                   Array<T>& pixels, Array<unsigned char>& state) override;
   bool PutSubRect(const SubRect& rect, const Array<unsigned>& bands, Interleave interleave,
                   Array<T>& pixels, Array<unsigned char>& state) override;
-  /// Of the level, and of level 0, from which it may be sampled.
+  /// Writes to the level, and to level 0, from which it may be sampled.
   std::uint64_t WriteCount() const override;
 
  private:

@@ -5,9 +5,11 @@
 
 namespace lumo {
 
-/// Shows every n-th pixel of every m-th line of its parent: pixel (x, y) of the view is pixel
-/// (x * skipX, y * skipY) of the parent. What is left over at the right and at the bottom is not
-/// shown. Statistics are the view's own. Exists for EightTypes.
+/// Shows every n-th pixel of every m-th line of its parent: pixel (x, y) of the view is pixel (x *
+/// skipX, y * skipY) of the parent. A rest at the right and at the bottom is not shown. Statistics
+/// are the view's own. Exists for EightTypes.
+///
+///     const RasterPtr<float> small(new SkipRaster<float>(raster, 10, 10, false));
 ///
 /// A read asks the parent for the lines that it shows, each from the first pixel to the last, and
 /// for those between where the parent is stored in tiles or strips; a write leaves the pixels
@@ -20,7 +22,8 @@ namespace lumo {
 template <typename T>
 class SkipRaster final : public ComputedRaster<T> {
  public:
-  /// @param topLevel  offer the parent's pyramid.
+  /// @param skipX,skipY  1 or more; 1 shows every pixel.
+  /// @param topLevel     offer the parent's pyramid.
   SkipRaster(const RasterPtr<T>& parent, unsigned skipX, unsigned skipY, bool topLevel);
   ~SkipRaster() override { this->StopComputing(); }
 

@@ -39,16 +39,16 @@ lumo::TileDimensions SkipRaster<T>::TileDimensions() const {
   return tiles;
 }
 
-/// What of the parent a line of a block stands on, from its first pixel to its last.
+/// Gives the pixels of the parent that a line of a block stands on, from its first to its last.
 template <typename T>
 SubRect SkipRaster<T>::LineInParent(const SubRect& rect, unsigned line) const {
   const unsigned y = line * skipY_;
   return {rect.left * skipX_, y, rect.right * skipX_, y};
 }
 
-/// What of a block is read with its pixel (x, y) as the first one: the lines that lie in the same
-/// row of the parent's tiles or strips, so that each of these is decoded once, and as many tiles of
-/// it as memory allows. Of a parent stored in lines no line is read in vain.
+/// Gives the part of a block that is read with its pixel (x, y) as the first one: the lines that
+/// lie in the same row of the parent's tiles or strips, so that each of these is decoded once, and
+/// as many tiles of it as memory allows. Of a parent stored in lines no line is read in vain.
 template <typename T>
 SubRect SkipRaster<T>::ReadAtOnce(const SubRect& rect, unsigned x, unsigned y,
                                   unsigned bands) const {

@@ -12,6 +12,10 @@ namespace lumo {
 /// no-data values are the parent's; the geo-reference moves with the origin. Statistics are the
 /// view's own, since it covers other pixels. Exists for EightTypes.
 ///
+///     const RasterPtr<float> corner(
+///         new SpatialSubsetRaster<float>(raster, SubRect(0, 0, 511, 511), Form::kExact));
+///     const double mean = corner->Mean(0, ipc);  // of these 512 by 512 pixels
+///
 /// Ownership: shares the parent, which does not know the view.
 /// Threads:   every operation may run on many threads at once; nothing is stored per call.
 /// Failure:   over an empty parent IsValid() is false and operations give false, 0 or empty.

@@ -20,6 +20,7 @@ class SpectralSubsetRaster final : public RasterView<T> {
 
   URI GetURI() const override { return this->DefaultURI("SpectralSubsetRaster"); }
   RasterDef GetRasterDef() const override { return def_; }
+  /// The same bands of the parent's level; empty where it has none.
   RasterPtr<T> PyramidLevel(unsigned level) override;
   RasterPtr<T> StoredPyramidLevel(unsigned) override { return {}; }
 

@@ -9,11 +9,16 @@ inline InputDeclaration SourceInput() {
   return {"SrcURI", Presence::kRequired, ValueKind::kURI, "the raster to stand on"};
 }
 
-/// Base of the commands that make a view on the raster of SourceInput, one of EightTypes, and put
-/// it into the catalog with count 1.
+/// Helps commands that make a view on the raster of SourceInput, one of EightTypes, and put it into
+/// the catalog with count 1. A whole command, beside its declaration:
+///
+///     class CreateVirtualRasterCommand final : public ViewCommand {
+///       CommandResult Execute() override { return PublishView<VirtualRaster>(); }
+///     };
 class ViewCommand : public PublishCommand {
  protected:
   /// Publishes a View<T>, made from the raster and `arguments`.
+  /// @param arguments  follow the raster in the constructor of the view.
   template <template <typename> class View, typename... Arguments>
   CommandResult PublishView(const Arguments&... arguments) {
     if (!CheckInputs()) return Fail();

@@ -8,7 +8,7 @@
 
 namespace lumo {
 
-/// Which grid a ProjectedRaster has.
+/// Names the grids that a ProjectedRaster can have.
 enum class ProjectedGrid : unsigned {
   kComputed = 0,  ///< all of the parent in the target's system, with pixels as large as its own
   kExact = 1      ///< the target as it is: its tie point, its pixel size, and its size
@@ -16,7 +16,7 @@ enum class ProjectedGrid : unsigned {
 
 VEXG_EXPORT std::span<const EnumWord<ProjectedGrid>> WordsOf(ProjectedGrid);
 
-/// What may be asked of a ProjectedRaster beside its method and resampling.
+/// Holds the wishes to a ProjectedRaster beside its method and resampling.
 struct ProjectedRasterOptions {
   ProjectedGrid grid = ProjectedGrid::kComputed;
   WarpSampling sampling = WarpSampling::kCorner;
@@ -41,6 +41,11 @@ struct ProjectedRasterOptions {
 /// Failure:   a target that isn't a StdGeoRef, a parent without geo-reference, or one that can't be
 ///            carried to the target makes a view without a parent: IsValid() is false and
 ///            operations give false, 0 or empty. Nothing can be written.
+///
+///     const GeoRefPtr grid(new StdGeoRef(target));  // with its size set
+///     const RasterPtr<float> warped(new ProjectedRaster<float>(
+///         raster, grid, ReprojectionMethod::kRigorous, PyramidResamplingMethod::kCubic,
+///         {ProjectedGrid::kExact, WarpSampling::kCentred, -9999.0}));
 template <typename T>
 class ProjectedRaster final : public ComputedRaster<T> {
  public:

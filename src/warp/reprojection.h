@@ -20,7 +20,7 @@ struct WarpSource;
 template <typename T>
 struct WarpTarget;
 
-/// How a sampler reads the neighbours of a position.
+/// Names the ways in which a sampler reads the neighbours of a position.
 enum class WarpSampling : unsigned {
   /// Linear and cubic weigh from the corners of pixels and round toward zero; a pixel's state is
   /// that of the pixel it falls into. A rigorous nearest leaves out the last column and line.
@@ -41,7 +41,7 @@ VEXG_EXPORT std::span<const EnumWord<WarpSampling>> WordsOf(WarpSampling);
 /// within one coordinate system and by the rigorous method.
 ///
 /// A pixel of the source holds the positions from its left and upper edge up to the next pixel's,
-/// that one's edge left out; WarpLimits::noise tells how positions by an affine map, or by the
+/// that one's edge left out; WarpLimits::noise says how positions by an affine map, or by the
 /// transforms of a WarpMap, are freed from the errors of arithmetic.
 ///
 /// Threads:   Reproject may run on many threads at once, where the raster allows it.
@@ -50,9 +50,9 @@ VEXG_EXPORT std::span<const EnumWord<WarpSampling>> WordsOf(WarpSampling);
 template <typename T>
 class Reprojection {
  public:
-  /// What came of a rectangle.
+  /// The outcome for a rectangle.
   enum class Outcome {
-    kDone,
+    kDone,    ///< its pixels are there
     kMissed,  ///< it lies outside the raster
     kFailed   ///< the raster could not be read
   };
@@ -64,16 +64,17 @@ class Reprojection {
   Reprojection(const Reprojection&) = delete;
   Reprojection& operator=(const Reprojection&) = delete;
 
-  /// The grid in place of the target.
+  /// Shows another grid of the target's system in place of the target.
   void SetOutputGrid(const GeoRefPtr& grid) { outputGrid_ = grid; }
-  /// Whether a position is taken at the centre of its pixel, as at first, or at its corner.
+  /// Takes positions at the centre of each pixel, as at first, or at its corner.
   void SetPixelCentres(bool at) { pixelCentres_ = at; }
+  /// Chooses how neighbours are read, kCorner at first.
   void SetSampling(WarpSampling sampling) { sampling_ = sampling; }
   /// Has positions come from a map of the grid, of the raster that Reproject is given, and no
   /// longer from the method.
   void SetMap(std::shared_ptr<const WarpMap> map) { map_ = std::move(map); }
-  /// The value of pixels outside the source; at first, and with one that T can't hold, the source's
-  /// no-data value, or 0.
+  /// Sets the value of pixels outside the source; at first, and with one that T can't hold, it is
+  /// the source's no-data value, or 0.
   void SetBackground(double value) { background_ = value; }
 
   /// Fills a rectangle of the grid from the raster.
@@ -87,7 +88,8 @@ class Reprojection {
     return Run(parent, rect, bands, interleave, data, state) == Outcome::kDone;
   }
 
-  /// As Reproject, and tells a rectangle that misses the raster from one that can't be read.
+  /// Does the same, and distinguishes a rectangle that misses the raster from one that can't be
+  /// read.
   Outcome Run(Raster<T>& parent, const SubRect& rect, const Array<unsigned>& bands,
               Interleave interleave, Array<T>& data, Array<unsigned char>& state) const;
 

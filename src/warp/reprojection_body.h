@@ -15,7 +15,7 @@
 
 namespace lumo {
 
-/// What a call works on.
+/// The raster, the block and the grid of a call.
 template <typename T>
 struct Reprojection<T>::Work {
   Raster<T>& parent;

@@ -8,11 +8,12 @@
 #include "georef/georef.h"
 #include "raster/raster_enums.h"
 
-// Where the pixels of one raster lie in another: what a reprojection knows without pixel values.
+// The geometry of a reprojection, which needs no pixel values: where the pixels of one raster lie
+// in another.
 
 namespace lumo {
 
-/// How positions are found.
+/// Names the ways in which positions are found.
 enum class ReprojectionMethod : std::uint32_t {
   kPolynomial = 0,     ///< by a bilinear polynomial fitted to the rectangle read
   kTriangulation = 1,  ///< runs as kPolynomial
@@ -34,18 +35,20 @@ struct SubRectProj {
         right(std::max(x0, x1)),
         bottom(std::max(y0, y1)) {}
 
+  /// Pixels of a line, 1 or more.
   std::int64_t Width() const { return std::int64_t{right} - left + 1; }
+  /// Lines, 1 or more.
   std::int64_t Height() const { return std::int64_t{bottom} - top + 1; }
 
-  std::int32_t left = 0;
-  std::int32_t top = 0;
-  std::int32_t right = 0;
-  std::int32_t bottom = 0;
+  std::int32_t left = 0;    ///< first column; below 0 in front of the raster
+  std::int32_t top = 0;     ///< first line
+  std::int32_t right = 0;   ///< last column, inclusive
+  std::int32_t bottom = 0;  ///< last line, inclusive
 };
 
 /// The size and place of a raster in a grid that it is carried to.
 struct OutputGrid {
-  unsigned samples = 0;
+  unsigned samples = 0;  ///< pixels of a line
   unsigned lines = 0;
   double tieX = 0;  ///< map position of its upper left corner
   double tieY = 0;
@@ -59,12 +62,12 @@ struct OutputGrid {
 VEXG_EXPORT bool ComputeOutputGrid(const GeoRef& target, const GeoRef& source, unsigned samples,
                                    unsigned lines, OutputGrid& grid);
 
-/// Pixels that a sampler reads around a position.
+/// The number of pixels that a sampler reads on each side of a position.
 VEXG_EXPORT std::int32_t SamplingMargin(PyramidResamplingMethod resampling);
 
-/// Where a rectangle of the base grid lies in a second raster.
+/// The place of a rectangle of the base grid in a second raster.
 struct CoveredRect {
-  SubRectProj rect;
+  SubRectProj rect;        ///< in pixels of the second raster
   bool misses = false;     ///< wholly outside; `rect` is empty then
   bool isPartial = false;  ///< some points could not be carried
 };

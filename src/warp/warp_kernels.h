@@ -8,20 +8,21 @@ namespace lumo {
 /// Values of one band to be interpolated at once.
 template <typename T, unsigned kTaps>
 struct WarpLanes {
-  static constexpr unsigned kLanes = 128;
-  T taps[kTaps][kLanes];  ///< neighbours of each lane, line by line
-  T out[kLanes];
+  static constexpr unsigned kLanes = 128;  ///< values at once
+  T taps[kTaps][kLanes];                   ///< neighbours of each lane, line by line
+  T out[kLanes];                           ///< the interpolated values
 };
 
-/// How a result becomes a whole number.
+/// Names the ways in which a result becomes a whole number.
 enum class WarpRounding { kTowardZero, kNearest };
 
-/// What each of the four columns, or lines, around a position counts in cubic convolution.
+/// Holds the weights of the four columns, or lines, around each position in cubic convolution.
 struct CubicWeights {
-  double of[4][128];
+  double of[4][128];  ///< by column, then position
 };
 
-/// The weights for `count` ways from the first middle column, or line, to the next one, 0 to 1.
+/// Computes the weights for `count` fractional positions between the first middle column, or line,
+/// and the next one, 0 to 1.
 void FindCubicWeights(const double* ways, unsigned count, CubicWeights& weights);
 
 /// Bilinear interpolation of `count` lanes between the taps (0, 0), (1, 0), (0, 1), (1, 1).
@@ -29,7 +30,8 @@ void FindCubicWeights(const double* ways, unsigned count, CubicWeights& weights)
 /// limited to their type (Keys, Cubic convolution interpolation for digital image processing, 1981,
 /// the kernel with a free parameter). InterpolateCubic rounds toward zero, and gives the value of
 /// four equal taps exactly; WeighCubic rounds to the nearest, and is faster.
-/// @param a  the way of each lane from its first middle column to the next one, 0 to 1.
+/// @param a  the fractional position of each lane between its first middle column and the next, 0
+/// to 1.
 /// @param b  the same between lines.
 #define VEXG_WARP_KERNELS(T)                                                                       \
   void InterpolateLinear(WarpLanes<T, 4>& lanes, const double* a, const double* b, unsigned count, \

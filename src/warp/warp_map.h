@@ -15,6 +15,7 @@ namespace lumo {
 
 /// A rectangle of a grid whose pixels are carried to a source in one way.
 struct WarpPiece {
+  /// The ways of carrying its pixels.
   enum class Way {
     kOutside,    ///< no pixel of it lies in the source
     kFit,        ///< by `fit`
@@ -27,7 +28,7 @@ struct WarpPiece {
   std::int32_t originY = 0;
 };
 
-/// The polynomial that an affine map is.
+/// Writes an affine map as a polynomial.
 VEXG_EXPORT WarpPolynomial PolynomialOf(const AffineLink& link);
 
 /// Carries the centres of the pixels of a grid to positions in a source raster, so that a pixel's
@@ -44,8 +45,13 @@ VEXG_EXPORT WarpPolynomial PolynomialOf(const AffineLink& link);
 /// what a camera counts, from the middle, lies a half.
 ///
 /// Threads:   every operation may run on many threads at once.
+///
+///     const WarpMap map(grid, source, samples, lines, WarpMap::kUsualTolerance);
+///     std::vector<WarpPiece> pieces;
+///     map.Cut({0, 0, 1023, 1023}, pieces);
 class VEXG_EXPORT WarpMap {
  public:
+  /// Pixels of the source by which a position may be off, unless another tolerance is asked for.
   static constexpr double kUsualTolerance = 0.125;
 
   /// The geo-references are copied.
@@ -92,7 +98,7 @@ class VEXG_EXPORT WarpMap {
   mutable std::unordered_map<std::uint64_t, Node> nodes_;  // some that were needed
 };
 
-/// The source's pixels on which positions of pieces fall.
+/// Gathers the bounds of the source's pixels on which positions of pieces fall.
 class VEXG_EXPORT WarpBounds {
  public:
   /// @param samples,lines  of the source; positions outside don't count.
@@ -100,8 +106,10 @@ class VEXG_EXPORT WarpBounds {
 
   /// Takes the corners of a bilinear piece in, between which all its positions lie.
   void AddFit(const WarpPiece& piece);
+  /// Takes positions in, x before y; infinite ones don't count.
   void AddPositions(const double* positions, std::size_t count);
 
+  /// True while no position fell into the source.
   bool IsEmpty() const { return !(minX_ <= maxX_ && minY_ <= maxY_); }
   /// The pixels with `margin` more on each side, cut to the source.
   SubRectProj Pixels(std::int32_t margin) const;

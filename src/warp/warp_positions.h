@@ -30,6 +30,7 @@ class WarpPositions {
   /// From an array that has them, x before y.
   WarpPositions(const double* points, unsigned width) : points_(points), width_(width) {}
 
+  /// Pixels of a line of the rectangle.
   unsigned Width() const { return width_; }
 
   /// Reads lines one after the other.
@@ -60,7 +61,7 @@ class WarpPositions {
   double firstX_ = 0, firstY_ = 0;
 };
 
-/// Where positions count, and how they are taken apart.
+/// Says where positions count, and how they are taken apart.
 struct WarpLimits {
   double lowX, lowY;    ///< a position counts from here on
   double highX, highY;  ///< up to here, itself not
@@ -73,14 +74,14 @@ struct WarpLimits {
   static constexpr double kTransformNoise = 0x1p-30;  ///< of transforms between systems
 };
 
-/// Positions of some pixels, taken apart.
+/// Holds positions of some pixels, taken apart into whole and fractional parts.
 struct WarpChunk {
-  static constexpr unsigned kPixels = 128;
-  unsigned count = 0;
-  bool allInside = false;
-  std::int32_t x[kPixels], y[kPixels];  ///< rounded down; of a position inside
-  double a[kPixels], b[kPixels];        ///< what was cut off
-  std::uint8_t inside[kPixels];
+  static constexpr unsigned kPixels = 128;  ///< at most
+  unsigned count = 0;                       ///< pixels in use
+  bool allInside = false;                   ///< no position lies outside the limits
+  std::int32_t x[kPixels], y[kPixels];      ///< rounded down; of a position inside
+  double a[kPixels], b[kPixels];            ///< the fractions that were cut off, 0 to 1
+  std::uint8_t inside[kPixels];             ///< 1 for a position within the limits, else 0
 };
 
 /// Takes chunk.count positions apart, after they have been snapped where the limits say so.

@@ -17,13 +17,13 @@ namespace lumo {
 /// The pixels of the source that a rectangle needs.
 template <typename T>
 struct WarpSource {
-  const T* pixels = nullptr;
+  const T* pixels = nullptr;             ///< of the window's first pixel
   const unsigned char* state = nullptr;  ///< null when all pixels are valid
-  SubRectProj window;
-  BlockStrides strides;
+  SubRectProj window;                    ///< the pixels that were read, in pixels of the source
+  BlockStrides strides;                  ///< of the pixels and the states
 };
 
-/// Where a rectangle's pixels go.
+/// The block that takes a rectangle's pixels.
 template <typename T>
 struct WarpTarget {
   T* pixels = nullptr;             ///< of the rectangle's first pixel
@@ -33,10 +33,14 @@ struct WarpTarget {
   const T* background = nullptr;  ///< by band
 };
 
-/// Walks the lines of a rectangle in chunks of positions.
+/// Walks the lines of a rectangle in chunks of positions: the loop of all samplers, each of which
+/// gives the pixels of a chunk. Pixels whose position lies outside the limits get the background
+/// value and the state NoData.
 template <typename T>
 class WarpParallel : public ArrayParallelFor {
  public:
+  /// All but the limits outlive the loop.
+  /// @param lines  of the rectangle.
   WarpParallel(const WarpPositions& positions, unsigned lines, const WarpLimits& limits,
                const WarpSource<T>& source, const WarpTarget<T>& target, WarpSampling sampling)
       : ArrayParallelFor(lines),
@@ -67,7 +71,9 @@ class WarpParallel : public ArrayParallelFor {
   /// @param out  element of the chunk's first pixel in the target.
   virtual void Sample(const WarpChunk& chunk, std::size_t out) = 0;
 
+  /// The pixels that are read.
   const WarpSource<T>& Source() const { return source_; }
+  /// The block that is filled.
   const WarpTarget<T>& Target() const { return target_; }
 
   /// Counts from the window's corner; outside it the nearest in it. The window comes as a copy,
@@ -99,7 +105,7 @@ class WarpParallel : public ArrayParallelFor {
   const WarpTarget<T>& target_;
 };
 
-/// The pixel that each position falls into.
+/// Takes the pixel that each position falls into, with its state.
 template <typename T>
 class NearestNeighborParallel final : public WarpParallel<T> {
  public:
@@ -168,7 +174,9 @@ class NearestNeighborParallel final : public WarpParallel<T> {
   }
 };
 
-/// Interpolates between kSide by kSide neighbours.
+/// Interpolates between kSide by kSide neighbours. With kCorner a pixel has the state of the one
+/// that it falls into; with kCentred neighbours that aren't valid are left out, and the pixel is
+/// valid when one of the nearest four is.
 template <typename T, unsigned kSide>
 class NeighbourhoodParallel : public WarpParallel<T> {
  public:
@@ -295,12 +303,14 @@ class NeighbourhoodParallel : public WarpParallel<T> {
   }
 };
 
+/// Interpolates bilinearly.
 template <typename T>
 class LinearInterpolateParallel final : public NeighbourhoodParallel<T, 2> {
  public:
   using NeighbourhoodParallel<T, 2>::NeighbourhoodParallel;
 };
 
+/// Interpolates by cubic convolution.
 template <typename T>
 class CubicInterpolateParallel final : public NeighbourhoodParallel<T, 4> {
  public:

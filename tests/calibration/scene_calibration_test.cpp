@@ -72,7 +72,7 @@ TEST(SceneCalibration, DividesTheFactorsOfBandsByTheirWidths) {
     EXPECT_NEAR(scene.earthSunDistance.value_or(0), 0.983244, 1e-4);
     EXPECT_TRUE(scene.irradiances.empty());
   }
-  // A band that the metadata don't tell of leaves all of them unknown.
+  // A band that the metadata don't describe leaves all of them unknown.
   const SceneCalibration lacking =
       ReadSceneCalibration(OpenText("DGIMD", "bandId = \"RGB\";\n" + Band("R", "1", "1")));
   EXPECT_TRUE(lacking.gains.empty() && lacking.offsets.empty() && lacking.bandNames.empty());

@@ -10,7 +10,7 @@
 namespace lumo {
 namespace {
 
-/// Writes down what it is told.
+/// Writes down each call.
 struct Recorder : AsyncCallback {
   void OnStart() override { Add("start"); }
   void OnFinish() override { Add("finish"); }

@@ -173,7 +173,7 @@ class Hist(RasterTest):
         self.assertIn("Histograms", pathlib.Path(f"{file}.aux.xml").read_text())
 
     def test_complaints(self):
-        # What can be judged without the raster is a wrong command line; the rest the command refuses.
+        # Faults that show without the raster are a wrong command line; the command refuses the rest.
         for options, want, words in ((["--bins", "9", "--bin-size", "1"], 2, "exclude"),
                                      (["--bin-size", "0"], 2, "above 0"),
                                      (["--lower", "9", "--upper", "3"], 1, "is above the upper"),

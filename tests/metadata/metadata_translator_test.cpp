@@ -61,7 +61,7 @@ TEST(MetadataTranslator, MakesValuesOfTheTypesThatEntriesName) {
       {"STRING", "0", "{one, }", "string(2) one, "},
       {"STRING", "0", "one, two", "string(2) one, two"},
       {"DOUBLE", "2", "7", "double(1) 7"},
-      // What holds no such value stays the text that it was.
+      // A text that holds no such value stays as it was.
       {"DOUBLE", "1", "N/A", "string(1) N/A"},
       {"INT", "0", "{1, two, 3}", "string(1) {1, two, 3}"},
       {"INT", "0", "{1, , 3}", "string(1) {1, , 3}"},

@@ -252,7 +252,7 @@ TEST(GdalCreation, KeepsNoDataOf64BitsAndNaN) {
   }
 }
 
-/// What is told before the raster is let go.
+/// Values that are given before the raster is let go.
 TEST(GdalCreation, KeepsStatisticsHistogramsAndPalettes) {
   test::TemporaryDirectory directory;
   for (const char* const name : {"TIFF a.tif", "Erdas a.img", "PNG a.png", "GIF a.gif"}) {

@@ -97,8 +97,8 @@ TEST(OrvaPixels, BlocksLargerThanAStretchAndPixelsLargerThanAGap) {
     SubRect rect;
     std::vector<unsigned> chosen;
   } cases[] = {
-      {3000, 90, 7, {1, 3, 2990, 88}, {6, 2, 2}},         // many stretches of picked rows
-      {90000, 2, 3, {5, 0, 89990, 1}, {1}},               // a row larger than a stretch
+      {3000, 90, 7, {1, 3, 2990, 88}, {6, 2, 2}},         // many runs of picked rows
+      {90000, 2, 3, {5, 0, 89990, 1}, {1}},               // a row larger than a run
       {6, 3, 9000, {1, 0, 4, 2}, {8999, 0, 1, 2, 4500}},  // a pixel larger than a gap
       {700, 40, 20, {690, 0, 699, 39}, {3, 17}},          // narrow: gaps small and large
       {1, 1, 1, {0, 0, 0, 0}, {0}},

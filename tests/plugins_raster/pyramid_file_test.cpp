@@ -17,7 +17,7 @@ void WriteFile(const std::string& path, const std::string& bytes) {
   std::ofstream(path, std::ios::binary) << bytes;
 }
 
-/// What a pyramid shows: all that is read of it, or nothing for a file that is refused somewhere.
+/// All that is read of a pyramid, or nothing for a file that is refused somewhere.
 struct Shown {
   bool isWhole = false;
   std::vector<std::int16_t> pixels;

@@ -285,7 +285,7 @@ TEST(Raster, GivesTheStatisticsOfABandInOneCall) {
   ASSERT_EQ(raster.reports.size(), 13U);
   for (std::size_t i = 0; i < 13; ++i) EXPECT_NEAR(raster.reports[i], (i + 1.0) / 26, 1e-12);
 
-  // What one computation left goes first, and ends the questions.
+  // The results of one computation go first, and end the questions.
   raster.reports.clear();
   raster.atHand.mask = StatsMask::Basic;
   raster.atHand.mean = 5;

@@ -119,7 +119,7 @@ TEST(MapTiles, ChoosesTilesOfItsOwnAndKeepsTheOrderOfTheAxes) {
 /// How a body ends a run in the middle.
 enum class End { kFalse, kThrow, kAbort, kReadFails };
 
-/// Maps a ramp in 60 tiles, of which number 30 ends the run; and tells how many were written whole,
+/// Maps a ramp in 60 tiles, of which number 30 ends the run; and gives how many were written whole,
 /// in order, with nothing behind them.
 unsigned WrittenTiles(End end, bool& ran) {
   const auto ramp = MakeRamp<std::int32_t>(60, 10, 1);

@@ -139,7 +139,7 @@ void ExpectReference(const ExtendedRasterStats<T>& stats, const Reference<T>& wa
     for (unsigned c = 0; c < n; ++c) {
       const std::size_t at = std::size_t{b} * n + c;
       EXPECT_TRUE(Near(stats.SumXY()[at], want.products[at])) << c;
-      // What two bands have in common is small beside what each has.
+      // The covariance of two bands is small beside their variances.
       const long double scale =
           std::sqrt(want.covariances[b * n + b] * want.covariances[c * n + c]);
       EXPECT_LE(std::fabs(stats.Cov()[at] - want.covariances[at]), 1e-12L * scale) << c;

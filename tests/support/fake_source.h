@@ -15,7 +15,7 @@
 
 namespace lumo::test {
 
-/// What the fake does, and what was done to it. Threads: filled before it is used.
+/// Orders for the fake, and a record of the calls that it got. Threads: filled before it is used.
 struct FakeBehaviour {
   unsigned samples = 7, lines = 5, bands = 3;
   unsigned dataType = kDataTypeOf<std::int16_t>;

@@ -26,7 +26,7 @@ class ParseLogOfTest {
     MetadataParseLog::Instance();
   }
 
-  /// What was written since the last call.
+  /// The lines that were written since the last call.
   std::string Take() {
     std::ifstream file(directory_.Path() / "log" / "metadata_parse_log.log", std::ios::binary);
     file.seekg(static_cast<std::streamoff>(taken_));

@@ -31,7 +31,7 @@ RasterReaderPtr<T> ReaderOf(const RasterDataConnectionPtr& source) {
   return source->RasterReaderDispatch()->template Get<T>();
 }
 
-/// Lets go of a connection, and gives the fault that this told of; empty when there was none.
+/// Lets go of a connection, and gives the fault that this set; empty when there was none.
 inline std::string Release(RasterDataConnectionPtr& source) {
   TakeFault();
   DataConnectionPtr connection(source);

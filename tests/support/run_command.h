@@ -7,7 +7,7 @@
 
 namespace lumo::test {
 
-/// What a command left.
+/// The results of a command.
 struct CommandOutcome {
   CommandResult result;
   std::string reason;

@@ -13,7 +13,7 @@
 
 namespace lumo {
 
-/// The value of a ramp's pixel, which tells its place as far as T can hold it.
+/// The value of a ramp's pixel, which shows its place as far as T can hold it.
 template <typename T>
 T RampValue(std::uint64_t sample, std::uint64_t line, std::uint64_t band) {
   const std::uint64_t value = sample + 1000 * line + 1'000'000 * band;
@@ -133,7 +133,7 @@ class MemoryTestRaster final : public TestRaster<T> {
   std::vector<unsigned char> states;
 
  private:
-  /// Calls `move(place here, place in the block, elements)` for stretches that lie together.
+  /// Calls `move(place here, place in the block, elements)` for runs that lie together.
   template <typename F>
   void Move(const SubRect& rect, const Array<unsigned>& bands, const F& move) {
     bool inOrder = bands.GetCount() == this->Bands();

@@ -29,7 +29,7 @@ int ValueOf(const ObjectPtr& object) {
   return value != nullptr ? *value : -1;
 }
 
-/// What the tasks of a test share: what they wrote down, and what each is to do.
+/// Shared by the tasks of a test: their notes, and orders for each.
 struct Script : Object {
   int tokens = 5;  // the source gives so many
   std::function<void(int)> atSource;

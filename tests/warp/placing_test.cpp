@@ -85,7 +85,7 @@ double Miss(const GeoRef& source, const GeoRef& view, double x, double y, double
   return std::max(miss, Miss(both->Rpc(), viewBoth->Rpc(), x, y, sx, sy));
 }
 
-/// Each pixel of the ramp tells its place.
+/// Each pixel of the ramp shows its place.
 void ExpectPlaced(const Source& source, const Source& view) {
   ASSERT_TRUE(view && view->IsValid());
   ASSERT_GT(view->Samples() * view->Lines(), 0u);

@@ -283,7 +283,7 @@ TEST(Reprojection, ShowsAGlobeWithoutWhatIsBehindIt) {
   }
 }
 
-/// One large band of bytes that tells how much of it is read at once.
+/// One large band of bytes that notes how much of it is read at once.
 class WideRaster final : public TestRaster<std::uint8_t> {
  public:
   explicit WideRaster(unsigned side) : TestRaster(side, side, 1) {}

@@ -9,7 +9,7 @@
 
 namespace lumo::host {
 
-/// What the program's exit code says.
+/// The meanings of the program's exit codes.
 enum ExitCode : int {
   kExitSuccess = 0,
   kExitFailed = 1,    ///< a command failed or was aborted, or its result could not be written

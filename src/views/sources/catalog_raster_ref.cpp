@@ -11,7 +11,7 @@
 namespace lumo {
 namespace {
 
-/// True when a pyramid is one of a raster of the same size and pixel type; else tells the fault.
+/// True when a pyramid is one of a raster of the same size and pixel type; else sets the fault.
 bool BelongTogether(RasterDataConnection& source, RasterDataConnection& pyramid) {
   const RasterDef raster = source.RasterDef(), levels = pyramid.RasterDef();
   const bool isSameType = source.DataType() == pyramid.DataType();

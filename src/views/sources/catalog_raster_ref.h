@@ -29,6 +29,10 @@ VEXG_EXPORT std::span<const EnumWord<PyramidCheck>> WordsOf(PyramidCheck);
 
 /// Holds an open raster while code works with it, and its place in the catalog: making one adds 1
 /// to the raster's count there.
+///
+///     const CatalogRasterRef ref(ConnStrings({path}), {}, {}, true, true);
+///     if (ref.Raster().IsNull()) return TakeFault();
+///     const double mean = ref.Raster()->Mean(0, ipc);  // closed again with `ref`
 class VEXG_EXPORT CatalogRasterRef {
  public:
   /// Adds `raster` to the catalog, unless it is empty.
@@ -36,7 +40,7 @@ class VEXG_EXPORT CatalogRasterRef {
   CatalogRasterRef(const BasicRasterPtr& raster, bool releaseOnDestroy);
 
   /// Opens a source. One that the catalog knows already gives the raster that stands there, and
-  /// what `geoRef` and `metadata` say has no effect then.
+  /// `geoRef` and `metadata` have no effect then.
   /// @param useProxy  open it on a thread of its own, as all code does whose raster outlives the
   ///                  call; else on this thread.
   CatalogRasterRef(const Array<String>& connStrings, const GeoRefPtr& geoRef,
@@ -52,7 +56,7 @@ class VEXG_EXPORT CatalogRasterRef {
   CatalogRasterRef(const CatalogRasterRef&) = delete;
   CatalogRasterRef& operator=(const CatalogRasterRef&) = delete;
 
-  /// The raster; empty when there is none, with the fault text told.
+  /// The raster; empty when there is none, with the fault set.
   const BasicRasterPtr& Raster() const { return raster_; }
   /// Code of its pixel type; 0 when there is no raster.
   unsigned DataType() const { return dataType_; }
@@ -66,7 +70,7 @@ class VEXG_EXPORT CatalogRasterRef {
 };
 
 /// The raster on an open source, and on the pyramid file of that source when there is one. Empty,
-/// with the fault text told, when a source is no raster or the pixel types differ.
+/// with the fault set, when a source is no raster or the pixel types differ.
 /// @param uri  in place of the source's, unless empty.
 VEXG_EXPORT BasicRasterPtr MakeReaderRaster(const DataConnectionPtr& connection,
                                             const DataConnectionPtr& pyramidConnection = {},

@@ -10,6 +10,10 @@ namespace lumo {
 
 /// Shows a block of pixels in memory as a raster. Exists for EightTypes.
 ///
+///     std::vector<float> block(samples * lines * bands);
+///     const RasterPtr<float> raster(new MemoryRaster<float>("block", block.data(), samples, lines,
+///                                                           bands, Interleave::BSQ, {}));
+///
 /// The block has no gaps; `interleave` gives the order of its axes. It is described in a connection
 /// string and opened through the plug-in for "MemoryRaster", whose reader does all transfers.
 ///
@@ -37,6 +41,7 @@ class MemoryRaster : public ComputedRaster<T> {
 
   bool PyramidExists() const override { return false; }
   PyramidDef GetPyramidDef() const override { return {}; }
+  /// None can be built: a block in memory needs no reduced copies.
   AsyncPtr PyramidBuild(const PyramidDef&, const lumo::TileDimensions&,
                         const AsyncCallbackPtr&) override {
     return {};

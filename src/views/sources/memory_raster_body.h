@@ -25,7 +25,7 @@ GeoRefPtr MakeStdGeoRef(double pixelSizeX, double pixelSizeY, double tieX, doubl
 /// The connection string of its no-data values: "NODATA=<band>:<value>,<band>:<value>".
 String MemoryNoDataText(const std::map<unsigned, double>& noData);
 
-/// Opens the block; empty, with the fault text told, when that can't be done.
+/// Opens the block; empty, with the fault set, when that can't be done.
 template <typename T>
 RasterPtr<T> OpenMemory(const String& name, T* pixelData, unsigned samples, unsigned lines,
                         unsigned bands, Interleave interleave, const GeoRefPtr& geoRef,
@@ -103,8 +103,8 @@ AutoMemoryRaster<T>::AutoMemoryRaster(const String& name, Block block, unsigned 
           geoRef),
       block_(std::move(block)) {}
 
-/// A block for so many pixels; none, with the fault told, when there is no memory. All pixels are
-/// 0: memory that was in use before may hold anything.
+/// A block for so many pixels; none, with the fault set, when there is no memory. All pixels are 0:
+/// memory that was in use before may hold anything.
 template <typename T>
 typename AutoMemoryRaster<T>::Block AutoMemoryRaster<T>::Allocate(unsigned samples, unsigned lines,
                                                                   unsigned bands) {

@@ -9,7 +9,7 @@ namespace lumo {
 /// "SrcURI", each of whose fields the further inputs replace.
 class VEXG_EXPORT RasterDefCommand : public PublishCommand {
  protected:
-  /// Puts the description together; false, with the fault text told, for one that makes no sense.
+  /// Puts the description together; false, with the fault set, for one that makes no sense.
   bool ReadRasterDef(RasterDef& def) const;
 
  private:

@@ -12,19 +12,19 @@ namespace lumo {
 /// The raster that stands on a data source. Exists for TwelveTypes.
 ///
 /// It turns the operations of a raster into calls of a reader, in whatever interleave is asked for.
-/// What the source stores of statistics and histograms is at hand without computing; what is
-/// computed can be stored there. A second reader, when there is one, stands on a pyramid that the
-/// library keeps in a file of its own; where it has something it goes first.
+/// Statistics and histograms that the source stores are at hand without computing; computed ones
+/// can be stored there. A second reader, when there is one, stands on a pyramid that the library
+/// keeps in a file of its own; where it has something it goes first.
 ///
-/// Once pixels have been written, what the source and the pyramid's file store of statistics and
-/// histograms is given no more. The pyramid's file loses it then, the source at the next
-/// WriteStats or WriteHistogram, unless it has lost it already.
+/// Once pixels have been written, statistics and histograms that the source and the pyramid's file
+/// store are given no more. The pyramid's file loses them then, the source at the next WriteStats
+/// or WriteHistogram, unless it has lost them already.
 ///
 /// Ownership: shares both connections, which stay open as long as the raster lives. The readers
 ///            belong to them.
 /// Threads:   every operation may run on many threads at once; one block is transferred at a time.
 /// Failure:   without a reader, operations give false, 0 or empty; those that a source refuses have
-///            the fault text told.
+///            the fault set.
 template <typename T>
 class ReaderRaster final : public ComputedRaster<T>, public SourceRaster {
  public:
@@ -57,19 +57,19 @@ class ReaderRaster final : public ComputedRaster<T>, public SourceRaster {
   bool StatsExist(unsigned band, unsigned mask) const override;
   bool WriteStats() override;
   RasterBandStats<T> BandStats(unsigned band) const override;
-  /// What is at hand, or else computed, one caller after the other.
+  /// The value at hand, or else computed, one caller after the other.
   StatValue<T> StatOf(StatsMask::Code stat, unsigned band, unsigned otherBand,
                       const IPC& ipc) override;
 
   bool WriteHistogram() override;
-  /// What the pyramid's file, this raster and the source hold, each histogram once.
+  /// The histograms that the pyramid's file, this raster and the source hold, each once.
   Array<RasterBandHistogram<T>> BandHistogram(unsigned band) const override;
 
   unsigned Samples() const override { return samples_; }
   unsigned Lines() const override { return lines_; }
   unsigned Bands() const override { return bands_; }
   lumo::TileDimensions TileDimensions() const override { return tiles_; }
-  /// Of the pyramid's file, when that has levels, else of the source.
+  /// A level of the pyramid's file, when that has levels, else of the source.
   RasterPtr<T> PyramidLevel(unsigned level) override;
   RasterPtr<T> StoredPyramidLevel(unsigned level) override;
 

@@ -2,7 +2,7 @@
 
 namespace lumo {
 
-/// A raster on a source of its own, as it speaks of the source.
+/// Answers for a raster on a source of its own whether it still shows the source.
 class SourceRaster {
  public:
   virtual ~SourceRaster() = default;

@@ -8,7 +8,7 @@ struct CommandDeclaration;
 
 namespace lumo::host {
 
-// What the registered commands declare, in the forms that people and programs read.
+// The declarations of the registered commands, in the forms that people and programs read.
 
 std::string CommandsAsList();      ///< a line each, by group
 std::string CommandsAsNames();     ///< a name each, for the completion of a shell

@@ -10,7 +10,7 @@ namespace lumo::host {
 /// All of a file, or of standard input for "-". Throws HostError.
 std::string ReadFile(const std::string& file);
 
-/// A Command element of a document, as far as it tells one from the other.
+/// A Command element of a document, by the attributes that identify it.
 struct NamedCommand {
   std::string name;
   std::string id;

@@ -31,7 +31,7 @@ class ProgressView {
   /// Ends what is on show now, as aborted; for a program that ends in the middle of it.
   static void EndAllShown();
 
-  /// Tells how the run ended, of one that no exception leaves.
+  /// Shows how the run ended, of one that no exception leaves.
   void SetOutcome(Outcome outcome) { outcome_ = outcome; }
 
  private:

@@ -49,7 +49,7 @@ class JobDraft {
   /// The document; `channel` is named in it unless null.
   String Write(const JobChannel* channel = nullptr) const;
 
-  /// What a step is called and does.
+  /// The name of a step, and its work.
   struct StepInfo {
     String name;
     String id;
@@ -69,7 +69,7 @@ using JobResults = Map<String, JobResult>;
 /// How a job goes with an interrupt.
 enum class Interrupts {
   kEnd,            ///< it is ended, and its results do not count
-  kEndUnlessDone,  ///< it is ended, which its commands tell; where they say success, it was too
+  kEndUnlessDone,  ///< it is ended, which its commands show; where they say success, it was too
                    ///< late
   kWait,           ///< it is short, changes something, and runs to its end
 };

@@ -26,7 +26,7 @@ void SayReason(const NamedCommand& command, const XMLElement& result) {
   }
 }
 
-/// Tells what a command that succeeded has lost: one that closes a raster does so by its form, also
+/// Reports the loss of a command that succeeded: one that closes a raster does so by its form, also
 /// where the file could not be completed. @return false when there was something.
 bool SayLoss(const NamedCommand& command, const XMLElement& result) {
   if (result.attributes.Find("Result") != "Success") return true;
@@ -78,7 +78,7 @@ ValueKind KindOf(const CommandDeclaration* command, const String& output) {
   return ValueKind::kText;
 }
 
-/// What a command declares; null for one that is unknown here.
+/// The declaration of a command; null for one that is unknown here.
 const CommandDeclaration* FindDeclaration(const NamedCommand& command) {
   if (!IsKnownHere(command)) return nullptr;
   return &GetCommandRegistry().Find(String(command.id))->GetDeclaration();

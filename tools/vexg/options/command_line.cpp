@@ -93,7 +93,7 @@ struct Parser {
   }
 };
 
-// What the user typed:
+// The words that the user typed:
 
 /// Finds the place of the verb among the arguments; their number for none.
 std::size_t FindVerbPlace(const Strings& arguments) {

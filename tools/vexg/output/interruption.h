@@ -17,7 +17,7 @@ namespace lumo::host {
 /// The request raises the abort flags of what runs. Work that looks at them ends by itself, the
 /// usual way. Where a library is busy with something that looks at no flag, as the packing of a
 /// picture, the process ends around it after 60 ms, and everything that it has begun is removed
-/// before. What the user is told then depends on which of the watched files have changed.
+/// before. The line that the user reads depends on which of the watched files have changed.
 ///
 /// Threads: any thread may call.
 class Interruption {
@@ -47,7 +47,7 @@ class Interruption {
   /// do.
   void SetLast();
 
-  /// The line that tells what became of the verb.
+  /// The line that says how the verb ended.
   /// @param how  it was ended.
   std::string Describe(const char* how = "interrupted") const;
 

@@ -33,7 +33,7 @@ bool IsAlpha(const std::map<std::string, std::string>& details, unsigned band) {
   return found != details.end() && found->second == "Alpha";
 }
 
-/// True when neither no-data values nor an alpha band tell of pixels that are not valid.
+/// True when neither no-data values nor an alpha band mark pixels that are not valid.
 bool HasPlainPixels(const RasterContents& raster) {
   const bool hasNoData = std::find(raster.info.hasNoData.begin(), raster.info.hasNoData.end(),
                                    true) != raster.info.hasNoData.end();

@@ -112,7 +112,7 @@ void OutputFile::FailMove(const std::string& why) const {
                                     ": has been made by somebody else meanwhile; give --overwrite "
                                     "to replace it");
   }
-  // The system's paths, also of files in the making, tell the user less than his own name.
+  // The system's paths, also of files in the making, say less to the user than his own name.
   const std::string place = target_.parent_path().string();
   const std::size_t end = why.starts_with(place) ? why.find(": ", place.size()) : why.npos;
   throw HostError(kExitFailed,

@@ -42,7 +42,7 @@ class OutputFile {
   void CheckPlaces() const;
 
   /// Makes the folder. Throws HostError when the disk has less room than `bytes`; 0 for a size that
-  /// nobody knows before.
+  /// is not known in advance.
   void Begin(std::uint64_t bytes);
 
   /// Where the file is to be made, from Begin on.
@@ -51,7 +51,7 @@ class OutputFile {
   std::string GetFolder() const { return folder_.string(); }
   /// Where it will be.
   std::string GetName() const { return target_.string(); }
-  /// What the user calls it.
+  /// The name that the user gave it.
   const std::string& GetShownName() const { return shown_; }
 
   /// A message in which the working name stands, with the name of the user in its place.

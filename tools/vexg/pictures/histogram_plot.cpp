@@ -92,7 +92,7 @@ void HistogramPlot::DrawBars(const PlottedHistogram& histogram, unsigned top, do
     const std::uint64_t count = *std::max_element(
         histogram.counts.begin() + static_cast<std::ptrdiff_t>(first),
         histogram.counts.begin() + static_cast<std::ptrdiff_t>(std::min(last, bins)));
-    // What is there shows, however little it is.
+    // A bin with a count shows, however small that is.
     const auto tall =
         static_cast<unsigned>(std::ceil(static_cast<double>(count) / highest * (kBottom - kTop)));
     const unsigned x = kLeft + static_cast<unsigned>(column);

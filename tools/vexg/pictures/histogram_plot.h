@@ -8,7 +8,7 @@
 
 namespace lumo::host {
 
-/// What a plot shows of one band.
+/// The part of a plot that shows one band.
 struct PlottedHistogram {
   std::string title;
   double lower = 0;  ///< where the first bin begins
@@ -23,7 +23,7 @@ class HistogramPlot {
   /// @param histograms  one at least, each of one bin at least.
   explicit HistogramPlot(const std::vector<PlottedHistogram>& histograms);
 
-  /// Writes the picture, in the format that the output's name tells.
+  /// Writes the picture, in the format that the ending of the output's name stands for.
   void Write(const OutputFile& output) const;
 
  private:

@@ -35,7 +35,7 @@ class JpegWriter final : public PictureWriter {
     });
   }
   ~JpegWriter() override {
-    // A buffer that has grown is told only at its end: bytes_ leads to an older one before.
+    // A buffer that has grown is reported only at its end: bytes_ leads to an older one before.
     if (jpeg_.dest != nullptr) jpeg_.dest->term_destination(&jpeg_);
     jpeg_destroy_compress(&jpeg_);
     std::free(bytes_);

@@ -17,14 +17,14 @@ class PictureWriter {
   virtual void Close() = 0;
 };
 
-/// Throws HostError unless the name's ending tells a format of pictures: .png, .jpg or .jpeg.
+/// Throws HostError unless the name's ending stands for a format of pictures: .png, .jpg or .jpeg.
 void CheckPictureName(const std::string& name);
 
-/// Makes the writer for the format that the output's name tells.
+/// Makes the writer for the format that the ending of the output's name stands for.
 ///
 /// A JPEG has no alpha: pixels that are not opaque become white there, and the user hears of it.
 /// @param channels  1 grey, 2 grey and alpha, 3 colours, 4 colours and alpha.
-/// Throws HostError for a name that tells no format, or a picture that it can't hold.
+/// Throws HostError for a name that stands for no format, or a picture that it can't hold.
 std::unique_ptr<PictureWriter> MakePictureWriter(const OutputFile& output, unsigned width,
                                                  unsigned height, unsigned channels);
 

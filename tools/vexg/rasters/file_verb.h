@@ -10,7 +10,7 @@
 
 namespace lumo::host {
 
-/// A verb that opens a raster and makes files from it, or tells of it, or saves something with it.
+/// A verb that opens a raster and makes files from it, or describes it, or saves something with it.
 ///
 /// Run goes through the steps that all such verbs have in common, in one order:
 ///
@@ -65,7 +65,7 @@ class FileVerb {
   /// The whole of the work as one document.
   /// @param outputs  with the names that the files shall have.
   virtual JobDraft GetJob(const Outputs& outputs) const = 0;
-  /// Bytes that the output of this number is known to take; 0 where nobody knows before.
+  /// Bytes that the output of this number takes; 0 when that is not known in advance.
   virtual std::uint64_t GetBytes(std::size_t /*output*/) const { return 0; }
   virtual void Make(JobSession& session, const Outputs& outputs) = 0;
   virtual void Save(JobSession& /*session*/) {}

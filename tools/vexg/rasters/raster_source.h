@@ -31,7 +31,7 @@ std::string FileOf(const SourceOptions& source);
 /// The connection strings of a source.
 Array<String> ConnStringsOf(const SourceOptions& source);
 
-/// What a raster tells of itself.
+/// The description of a raster, as its commands give it.
 struct RasterInfo {
   unsigned samples = 0;
   unsigned lines = 0;
@@ -65,7 +65,7 @@ std::string PyramidPathOf(const std::string& file);
 std::vector<std::string> FilesOfSavedValues(const SourceOptions& source);
 
 /// AddOpen, with the pyramid file beside the raster where there is one. One that was not built from
-/// the raster as it is tells of other pixels: it is left out, and the user hears of it.
+/// the raster as it is belongs to other pixels: it is left out, and the user hears of it.
 /// @param levels  which are shown of a raster that has levels of its own as well: Best or Told, see
 ///                OpenRasterCommand.
 void AddOpenWithPyramid(JobDraft& draft, const std::string& name, const SourceOptions& source,
@@ -89,7 +89,7 @@ std::string PathOf(const String& uri);
 /// @param raster  a variable or URI.
 void AddQuery(JobDraft& draft, const std::string& name, const String& raster);
 
-/// What the commands of AddQuery said. Throws HostError for what can't be.
+/// Reads the results of the commands of AddQuery. Throws HostError for values that can't be.
 RasterInfo ReadInfo(const JobResults& results, const std::string& name);
 
 /// The order that "bip", "bil" or "bsq" names.

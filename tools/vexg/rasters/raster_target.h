@@ -12,7 +12,7 @@ namespace lumo::host {
 /// A raster file to make, as the command line names it.
 struct TargetOptions {
   std::string output;
-  std::string format;   ///< key; empty: as the name's ending tells
+  std::string format;   ///< key; empty: the one of the name's ending
   bool strict = false;  ///< what the format does not keep is a failure
 
   /// @param meaning  what the file is, for the help.
@@ -23,7 +23,7 @@ struct TargetOptions {
 std::string ChooseFormat(const TargetOptions& target);
 
 /// Bytes that a raster of this size, bands and pixel type takes at least in a file of this format;
-/// 0 for a format that makes them smaller by nobody knows how much.
+/// 0 when the format compresses, so that the size is not known in advance.
 std::uint64_t BytesInFile(const std::string& format, const RasterInfo& raster);
 
 /// A format that a raster is made in, and where.
@@ -45,7 +45,7 @@ void AddCloseTarget(JobDraft& draft);
 
 constexpr const char* kCloseTargetStep = "close.target";
 
-/// Throws HostError when the closing of a raster told a fault.
+/// Throws HostError when the closing of a raster set a fault.
 /// @param step  that closed it; what AddCloseTarget added by default.
 void CheckClosed(const JobResults& results, const char* step = kCloseTargetStep);
 

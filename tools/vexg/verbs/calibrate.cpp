@@ -140,7 +140,7 @@ void AddConstants(JobDraft& draft, const MetadataSource& source) {
 }
 
 /// Takes what the line doesn't give from what the commands of AddConstants said.
-/// @return a line that tells the user of it.
+/// @return a line for the user that says so.
 std::string TakeConstants(Options& options, const JobResults& results) {
   const Map<String, String>& told = results.Find(kConstantsStep).returns;
   std::string line;

@@ -90,7 +90,7 @@ std::vector<Format> ReadFormats(const JobResults& results) {
 }
 
 /// Has a raster of a few pixels made in the format and gives whether a file came of it. A format
-/// tells nobody else what it can make.
+/// gives no other account of what it can make.
 bool TryToMake(JobSession& session, const Format& format, const fs::path& folder) {
   fs::create_directory(folder);
   JobDraft draft;

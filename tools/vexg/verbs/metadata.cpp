@@ -21,7 +21,7 @@ struct Options {
   bool json = false;
 };
 
-/// One value, as the commands tell of it.
+/// One value, as the commands describe it.
 struct Value {
   std::string path;
   unsigned type = 0;
@@ -109,7 +109,7 @@ Json ElementAsJson(const T& element, bool isJson) {
     return element.ToUTF8();
   } else if constexpr (std::is_floating_point_v<T>) {
     if (!std::isfinite(element)) return isJson ? Json() : Json(FormatValue(element).ToUTF8());
-    // The digits that tell a float apart, not those of the double nearest to it.
+    // The digits that identify a float, not those of the double nearest to it.
     return std::is_same_v<T, float> ? Json::parse(FormatValue(element).ToUTF8())
                                     : NumberAsJson(element);
   } else {

@@ -17,7 +17,7 @@ bool EndsWith(const std::string& name, const char* ending) {
   return std::filesystem::path(name).extension() == ending;
 }
 
-/// What is read of a raster, and how it lies in the output.
+/// The part of a raster that is read, and its order in the output.
 struct Request {
   RasterInfo info;
   SubRect rect;

@@ -224,7 +224,7 @@ void CheckOptions(const TransformOptions& options) {
 void CarryInput(const Carrier& carrier) {
   constexpr std::size_t kBatch = 4096;
   Batch batch(carrier);
-  std::ios::sync_with_stdio(false);  // so that the stream can tell what has arrived
+  std::ios::sync_with_stdio(false);  // so that the stream knows what has arrived
   std::size_t number = 0;
   for (std::string text; std::getline(std::cin, text);) {
     Line line;
