@@ -1,0 +1,18 @@
+#include "regions/scan_rules.h"
+
+namespace lumo {
+
+std::span<const EnumWord<ScanRules>> WordsOf(ScanRules) {
+  static constexpr EnumWord<ScanRules> kWords[] = {{"Told", ScanRules::kTold},
+                                                   {"Steady", ScanRules::kSteady}};
+  return kWords;
+}
+
+std::span<const EnumWord<ShapeCoordinates>> WordsOf(ShapeCoordinates) {
+  static constexpr EnumWord<ShapeCoordinates> kWords[] = {{"Told", ShapeCoordinates::kTold},
+                                                          {"Map", ShapeCoordinates::kMap},
+                                                          {"Pixel", ShapeCoordinates::kPixel}};
+  return kWords;
+}
+
+}  // namespace lumo
