@@ -62,10 +62,15 @@ void PixelCenterEdge::JumpTo(std::int64_t row) {
   atEnd = (endFlags & kBottomEnd) != 0 && row == lastRow;
 }
 
+std::int64_t PixelCenterEdge::RunningCell(double running) const {
+  return rules == ScanRules::kSteady ? CellOf(running + kSteadyRules, rules)
+                                     : CellOf(running, rules);
+}
+
 std::int64_t PixelCenterEdge::LeftColumn(std::int64_t row) const {
   const Comparison is(rules);
-  const std::int64_t t = Cell(xTop);
-  const std::int64_t b = Cell(xBottom);
+  const std::int64_t t = RunningCell(xTop);
+  const std::int64_t b = RunningCell(xBottom);
   const double topPart = xTop - static_cast<double>(t);
   const double bottomPart = xBottom - static_cast<double>(b);
   if (t == b) return t;
@@ -87,8 +92,8 @@ std::int64_t PixelCenterEdge::LeftColumn(std::int64_t row) const {
 
 std::int64_t PixelCenterEdge::RightColumn(std::int64_t row) const {
   const Comparison is(rules);
-  const std::int64_t t = Cell(xTop);
-  const std::int64_t b = Cell(xBottom);
+  const std::int64_t t = RunningCell(xTop);
+  const std::int64_t b = RunningCell(xBottom);
   const double topPart = xTop - static_cast<double>(t);
   const double bottomPart = xBottom - static_cast<double>(b);
   if (t == b) {
@@ -115,17 +120,19 @@ bool IsLeftOf(const PixelCenterEdge& a, const PixelCenterEdge& b) {
   const double tolerance = a.rules == ScanRules::kSteady ? kSteadyOrder : 0;
   if (std::abs(a.x - b.x) > tolerance) return a.x < b.x;
   const bool areBottomEnds = (a.endFlags & b.endFlags & PixelCenterEdge::kBottomEnd) != 0;
-  return areBottomEnds ? a.xTop < b.xTop : a.xBottom < b.xBottom;
+  return areBottomEnds ? a.xTop < b.xTop - tolerance : a.xBottom < b.xBottom - tolerance;
 }
 
 void SortEdges(std::vector<PixelCenterEdge*>& edges) {
+  constexpr std::size_t kMany = 256;
   const auto byColumn = [](const PixelCenterEdge* a, const PixelCenterEdge* b) {
     return a->x < b->x;
   };
-  if (!std::is_sorted(edges.begin(), edges.end(), byColumn)) {
+  if (edges.size() > kMany && !std::is_sorted(edges.begin(), edges.end(), byColumn)) {
     std::stable_sort(edges.begin(), edges.end(), byColumn);
   }
-  // Edges whose columns are equal go by the tie rule, which is no order for std::sort.
+  // From row to row little changes, which insertion makes good at once. It also bears that the tie
+  // rule and the tolerance are no order in the sense of std::sort.
   for (std::size_t i = 1; i < edges.size(); ++i) {
     PixelCenterEdge* const edge = edges[i];
     std::size_t at = i;

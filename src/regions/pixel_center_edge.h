@@ -58,6 +58,8 @@ class PixelCenterEdge {
   bool EndsAfter(std::int64_t row) const;
 
   std::int64_t Cell(double coordinate) const { return CellOf(coordinate, rules); }
+  /// The column of a running x, which rounding may have moved.
+  std::int64_t RunningCell(double running) const;
 
   double slope = 0;  ///< change of x for each row
   double x0 = 0;     ///< the ends, as they were moved
