@@ -47,7 +47,9 @@ class SetPixelAddressCommand final : public Command {
     const PixelAddressROIDefPtr region(CatalogFind(Read<URI>("SrcURI")));
     if (!region) return Fail("SrcURI: there is no such region of pixels");
     const auto numbers = Read<Array<unsigned long long>>("Addrs");
-    if (!numbers.IsValid()) return Fail("Addrs: the text isn't an array of whole numbers");
+    const bool isArray = Read<String>("Addrs").ToUTF8().find('[') != std::string::npos;
+    if (!isArray || !numbers.IsValid())
+      return Fail("Addrs: the text isn't an array of whole numbers");
     Array<Point2D<unsigned>> points;
     if (!points.Resize(ArrayDims(numbers.GetCount() / 2))) {
       return Fail("Addrs: there is no memory for the pixels");
