@@ -31,14 +31,15 @@ void RasterizedGeometryRecord::Refresh(std::uint64_t generation) {
 }
 
 /// The rows of a part; null when it can't be carried.
-const SpanRows* RasterizedGeometryRecord::PreparePart(const GeoRefPtr& geoRef, int part) {
+std::shared_ptr<const SpanRows> RasterizedGeometryRecord::PreparePart(const GeoRefPtr& geoRef,
+                                                                      int part) {
   RasterizedGeometryPartPtr& made = parts_[part];
   if (!made) {
     made = MakeRasterizedPart(geometry_, record_, static_cast<std::uint32_t>(part), options_);
   }
   unsigned flags = 0;
   made->WantRows(rowLimit_);
-  return made->Prepare(geoRef, flags) ? &made->Rows() : nullptr;
+  return made->Prepare(geoRef, flags) ? made->Rows() : nullptr;
 }
 
 void RasterizedGeometryRecord::WantRows(std::int64_t rowLimit) {
@@ -55,8 +56,8 @@ bool RasterizedGeometryRecord::HitTest(const GeoRefPtr& geoRef, std::uint64_t ge
   for (const int id : geometry_->PartIds(record_)) {
     part = static_cast<std::uint32_t>(id);
     if (geometry_->IsHole(record_, part)) continue;
-    const SpanRows* const rows = PreparePart(geoRef, id);
-    if (rows != nullptr && rows->Contains(pixel.left, pixel.top)) return true;
+    const std::shared_ptr<const SpanRows> rows = PreparePart(geoRef, id);
+    if (rows && rows->Contains(pixel.left, pixel.top)) return true;
   }
   return false;
 }
@@ -68,13 +69,16 @@ std::shared_ptr<const SpanRows> RasterizedGeometryRecord::Rows(const GeoRefPtr& 
   Refresh(generation);
   WantRows(rowLimit);
   if (rows_) return rows_;
+  std::vector<std::shared_ptr<const SpanRows>> held;
   std::vector<PartRows> parts;
   for (const int id : geometry_->PartIds(record_)) {
-    const SpanRows* const rows = PreparePart(geoRef, id);
-    if (rows == nullptr) return nullptr;
-    parts.push_back({rows, geometry_->IsHole(record_, static_cast<std::uint32_t>(id))});
+    const std::shared_ptr<const SpanRows> rows = PreparePart(geoRef, id);
+    if (!rows) return nullptr;
+    parts.push_back({rows.get(), geometry_->IsHole(record_, static_cast<std::uint32_t>(id))});
+    held.push_back(rows);
   }
-  rows_ = std::make_shared<const SpanRows>(CombineRows(parts));
+  const bool isOneAlone = parts.size() == 1 && !parts.front().isHole && held.front()->AreApart();
+  rows_ = isOneAlone ? held.front() : std::make_shared<const SpanRows>(CombineRows(parts));
   return rows_;
 }
 
@@ -182,14 +186,20 @@ bool RasterizedGeometry::Mask(const SubRect& rect, Array<unsigned char>& mask,
   return true;
 }
 
-bool RasterizedGeometry::Mark(RegionMarks& marks) {
+bool RasterizedGeometry::ForEachRecord(
+    const RegionWindow& window, const std::function<void(std::int32_t, const SpanRows&)>& take) {
   const Sight sight = Refresh();
-  for (const std::int32_t id : sight.index->Find(marks.Window())) {
-    const auto rows = Record(id)->Rows(geoRef_, sight.generation, RowLimitFor(marks.Window()));
+  for (const std::int32_t id : sight.index->Find(window)) {
+    const auto rows = Record(id)->Rows(geoRef_, sight.generation, RowLimitFor(window));
     if (!rows) return false;
-    rows->Mark(marks);
+    take(id, *rows);
   }
   return true;
+}
+
+bool RasterizedGeometry::Mark(RegionMarks& marks) {
+  return ForEachRecord(marks.Window(),
+                       [&](std::int32_t, const SpanRows& rows) { rows.Mark(marks); });
 }
 
 RegionCover RasterizedGeometry::Cover(const RegionWindow& window) {

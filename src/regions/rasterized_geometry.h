@@ -1,5 +1,6 @@
 #pragma once
 
+#include <functional>
 #include <memory>
 #include <mutex>
 
@@ -29,7 +30,7 @@ class VEXG_EXPORT RasterizedGeometryRecord final : public Object {
 
  private:
   void Refresh(std::uint64_t generation);
-  const SpanRows* PreparePart(const GeoRefPtr& geoRef, int part);
+  std::shared_ptr<const SpanRows> PreparePart(const GeoRefPtr& geoRef, int part);
   void WantRows(std::int64_t rowLimit);
 
   GeometryPtr geometry_;
@@ -68,6 +69,10 @@ class VEXG_EXPORT RasterizedGeometry final : public Object {
   /// @param count  [out] pixels that were set now.
   bool Mask(const SubRect& rect, Array<unsigned char>& mask, std::uint64_t& count);
 
+  /// Calls `take` with the records that may have pixels in a window, ascending by id, each with its
+  /// rows. @return false, with the fault told, when a record can't be carried to the grid.
+  bool ForEachRecord(const RegionWindow& window,
+                     const std::function<void(std::int32_t, const SpanRows&)>& take);
   bool Mark(RegionMarks& marks);
   RegionCover Cover(const RegionWindow& window);
   /// HitTest of the only pixel of a window.

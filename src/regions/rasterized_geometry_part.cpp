@@ -82,11 +82,11 @@ bool RasterizedGeometryPart::Prepare(const GeoRefPtr& geoRef, unsigned& flags) {
     if (!CarryPart(*geometry_, record_, part_, geoRef, options_.coordinates, vertices)) {
       return false;
     }
-    rows_ = Scan(std::move(vertices), rowLimit_);
+    rows_ = std::make_shared<const SpanRows>(Scan(std::move(vertices), rowLimit_));
     seenRevision_ = revision;
     isPrepared_ = true;
   }
-  flags = rows_.IsEmpty() ? 0 : kHasPixels;
+  flags = rows_->IsEmpty() ? 0 : kHasPixels;
   return true;
 }
 
@@ -99,10 +99,10 @@ bool RasterizedGeometryPart::Mask(const GeoRefPtr& geoRef, unsigned, unsigned li
   WantRows(std::max<std::int64_t>(lines, std::int64_t{rect.bottom} + 1));
   if (!Prepare(geoRef, flags)) return false;
   RegionMarks marks(WindowOf(rect), mask.GetData());
-  rows_.Mark(marks);
-  const std::int64_t last = std::min<std::int64_t>(rows_.LastRow(), rect.bottom);
-  for (std::int64_t row = std::max<std::int64_t>(rows_.FirstRow(), rect.top); row <= last; ++row) {
-    for (const ColumnSpan* span = rows_.Begin(row); span != rows_.End(row); ++span) {
+  rows_->Mark(marks);
+  const std::int64_t last = std::min<std::int64_t>(rows_->LastRow(), rect.bottom);
+  for (std::int64_t row = std::max<std::int64_t>(rows_->FirstRow(), rect.top); row <= last; ++row) {
+    for (const ColumnSpan* span = rows_->Begin(row); span != rows_->End(row); ++span) {
       const std::int64_t from = std::max<std::int64_t>(span->first, rect.left) - rect.left;
       const std::int64_t to = std::min<std::int64_t>(span->last, rect.right) - rect.left;
       if (from > to) continue;
@@ -119,11 +119,20 @@ bool RasterizedGeometryPart::Mask(const GeoRefPtr& geoRef, unsigned, unsigned li
 }
 
 SpanRows RasterizedPolygon::Scan(ScanVertices vertices, std::int64_t rowLimit) const {
+  switch (Options().pixels) {
+    case PixelRule::kCenter:
+      return ScanCenters(vertices, rowLimit);
+    case PixelRule::kTouched:
+      return ScanTouched(vertices, IsHole(), rowLimit);
+    case PixelRule::kTold:
+      break;
+  }
   return ScanPolygon(std::move(vertices), Options().rules, rowLimit);
 }
 
 SpanRows RasterizedPolyline::Scan(ScanVertices vertices, std::int64_t rowLimit) const {
-  return ScanLine(vertices, rowLimit);
+  return Options().pixels == PixelRule::kTouched ? ScanTouchedLine(vertices, rowLimit)
+                                                 : ScanLine(vertices, rowLimit);
 }
 
 SpanRows RasterizedPoints::Scan(ScanVertices vertices, std::int64_t rowLimit) const {

@@ -1,5 +1,7 @@
 #pragma once
 
+#include <memory>
+
 #include "geometry/geometry.h"
 #include "georef/georef.h"
 #include "regions/shape_scan.h"
@@ -45,7 +47,7 @@ class VEXG_EXPORT RasterizedGeometryPart : public Object {
   /// Asks for the rows down to below `rowLimit` at the next Prepare.
   void WantRows(std::int64_t rowLimit);
   /// What Prepare has made.
-  const SpanRows& Rows() const { return rows_; }
+  const std::shared_ptr<const SpanRows>& Rows() const { return rows_; }
   std::uint32_t PartId() const { return part_; }
 
  protected:
@@ -54,6 +56,7 @@ class VEXG_EXPORT RasterizedGeometryPart : public Object {
       : geometry_(geometry), record_(record), part_(part), options_(options) {}
 
   const ScanOptions& Options() const { return options_; }
+  bool IsHole() const { return geometry_->IsHole(record_, part_); }
 
  private:
   virtual SpanRows Scan(ScanVertices vertices, std::int64_t rowLimit) const = 0;
@@ -62,7 +65,7 @@ class VEXG_EXPORT RasterizedGeometryPart : public Object {
   std::uint32_t record_;
   std::uint32_t part_;
   ScanOptions options_;
-  SpanRows rows_;
+  std::shared_ptr<const SpanRows> rows_;
   std::int64_t rowLimit_ = kFirstRowLimit;
   bool isPrepared_ = false;
   std::uint32_t seenRevision_ = 0;

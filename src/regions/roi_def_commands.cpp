@@ -94,7 +94,7 @@ class CreateGeometryROIDefCommand final : public Command {
     if (HasInput("ScanRules")) options_.rules = Read<ScanRules>("ScanRules");
     if (HasInput("Coordinates")) options_.coordinates = Read<ShapeCoordinates>("Coordinates");
     for (const String& path : Read<Array<String>>("Vectors")) {
-      if (!AddFile(path.ToUTF8())) return Fail(Reason(path.ToUTF8()));
+      if (!AddFile(path.ToUTF8())) return Fail(FaultOfShapes(path.ToUTF8()));
     }
     if (shapes_ == 0) {
       return Fail(where_.empty() ? "Vectors: there is no shape in it"
@@ -107,18 +107,12 @@ class CreateGeometryROIDefCommand final : public Command {
     return Succeed();
   }
 
-  /// Why the shapes of a file can't be had, with its name.
-  static std::string Reason(const std::string& path) {
-    const std::string fault = TakeFaultOr("the shapes can't be read").ToUTF8();
-    return fault.find(path) != std::string::npos ? fault : path + ": " + fault;
-  }
-
   bool AddFile(const std::string& path) {
     const VectorRecordSourcePtr source = OpenShapes(path);
     if (!source) return false;
     const std::vector<std::uint32_t> layers = FindLayers(*source, layer_);
     for (const std::uint32_t layer : layers) {
-      const GeometryPtr shapes = ReadShapes(*source, layer, where_, GetIPC());
+      const GeometryPtr shapes = ReadShapes(*source, {layer, where_, {}}, GetIPC());
       if (!shapes) return false;
       if (shapes->RecordCount() == 0) continue;
       shapes_ += shapes->RecordCount();

@@ -15,4 +15,10 @@ std::span<const EnumWord<ShapeCoordinates>> WordsOf(ShapeCoordinates) {
   return kWords;
 }
 
+std::span<const EnumWord<PixelRule>> WordsOf(PixelRule) {
+  static constexpr EnumWord<PixelRule> kWords[] = {
+      {"Told", PixelRule::kTold}, {"Center", PixelRule::kCenter}, {"Touched", PixelRule::kTouched}};
+  return kWords;
+}
+
 }  // namespace lumo

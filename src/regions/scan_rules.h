@@ -24,10 +24,18 @@ enum class ShapeCoordinates : std::int32_t { kTold = 0, kMap = 1, kPixel = 2 };
 /// "Told", "Map", "Pixel".
 VEXG_EXPORT std::span<const EnumWord<ShapeCoordinates>> WordsOf(ShapeCoordinates);
 
+/// Which pixels a polygon has. Told: those of the inclusive scan. Center: those whose centre lies
+/// inside, so that polygons side by side share none. Touched: those whose area it touches.
+enum class PixelRule : std::int32_t { kTold = 0, kCenter = 1, kTouched = 2 };
+
+/// "Told", "Center", "Touched".
+VEXG_EXPORT std::span<const EnumWord<PixelRule>> WordsOf(PixelRule);
+
 /// How shapes become pixels.
 struct ScanOptions {
   ScanRules rules = ScanRules::kTold;
   ShapeCoordinates coordinates = ShapeCoordinates::kTold;
+  PixelRule pixels = PixelRule::kTold;
 };
 
 }  // namespace lumo

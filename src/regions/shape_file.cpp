@@ -39,6 +39,7 @@ std::optional<VectorValue> ValueFrom(const std::string& text, VectorFieldType ty
   return {};
 }
 
+/// NaN for a value that is none.
 double NumberOf(const VectorValue& value) {
   if (const auto* integer = std::get_if<std::int64_t>(&value)) return static_cast<double>(*integer);
   const auto* real = std::get_if<double>(&value);
@@ -82,6 +83,15 @@ std::optional<std::size_t> FindField(const VectorLayer& layer, const std::string
   if (found != names.end()) return static_cast<std::size_t>(found - names.begin());
   SetFault(String("layer " + Quoted(layer.name) + " has no field " + Quoted(name) +
                   DidYouMean(name, names)));
+  return {};
+}
+
+/// FindField of one that holds numbers.
+static std::optional<std::size_t> FindNumberField(const VectorLayer& layer,
+                                                  const std::string& name) {
+  const std::optional<std::size_t> found = FindField(layer, name);
+  if (!found || layer.fields[*found].type != VectorFieldType::kText) return found;
+  SetFault(String("field " + Quoted(layer.fields[*found].name) + " holds no numbers"));
   return {};
 }
 
@@ -134,12 +144,18 @@ std::optional<GeometryKind> KindOf(const VectorRecord& record) {
   return refuse(" isn't made of points, lines or polygons alone");
 }
 
-GeometryPtr ReadShapes(VectorRecordSource& source, std::uint32_t layer, const std::string& where,
-                       const IPC& ipc) {
+GeometryPtr ReadShapes(VectorRecordSource& source, const ShapeSelection& selection, const IPC& ipc,
+                       std::vector<double>* values) {
   constexpr unsigned kLookEvery = 1024;
-  const VectorLayer description = source.Layer(layer);
+  const VectorLayer description = source.Layer(selection.layer);
   RecordFilter filter;
-  if (!filter.Set(description, where) || !source.Begin(layer, nullptr)) return {};
+  if (!filter.Set(description, selection.where)) return {};
+  std::optional<std::size_t> field;
+  if (!selection.field.empty()) {
+    field = FindNumberField(description, selection.field);
+    if (!field) return {};
+  }
+  if (!source.Begin(selection.layer, nullptr)) return {};
   auto* const shapes = new PackedGeometry(description.coordSys);
   GeometryPtr geometry(shapes);
   VectorRecord record;
@@ -149,15 +165,22 @@ GeometryPtr ReadShapes(VectorRecordSource& source, std::uint32_t layer, const st
       SetFault("the reading was aborted");
       return {};
     }
-    if (record.partEnds.empty() || !filter.Accepts(record)) continue;
+    const double value = field ? NumberOf(record.values[*field]) : 0;
+    if (record.partEnds.empty() || !filter.Accepts(record) || std::isnan(value)) continue;
     const std::optional<GeometryKind> kind = KindOf(record);
     if (!kind) return {};
     shapes->Add(*kind, record);
+    if (field && values != nullptr) values->push_back(value);
   }
   const String fault = TakeFault();
   if (fault.GetLength() == 0) return geometry;
   SetFault(fault);
   return {};
+}
+
+std::string FaultOfShapes(const std::string& path) {
+  const std::string fault = TakeFaultOr("the shapes can't be read").ToUTF8();
+  return fault.find(path) != std::string::npos ? fault : path + ": " + fault;
 }
 
 }  // namespace lumo

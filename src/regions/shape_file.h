@@ -44,10 +44,20 @@ VEXG_EXPORT std::optional<std::size_t> FindField(const VectorLayer& layer, const
 ///         with a coordinate that is not a number.
 VEXG_EXPORT std::optional<GeometryKind> KindOf(const VectorRecord& record);
 
-/// Reads all shapes of a layer that pass a filter; records without a shape are left out.
-/// @param where  see RecordFilter.
-/// @param ipc    its abort flag ends the reading.
-VEXG_EXPORT GeometryPtr ReadShapes(VectorRecordSource& source, std::uint32_t layer,
-                                   const std::string& where, const IPC& ipc);
+/// Which records of a file are read.
+struct ShapeSelection {
+  std::uint32_t layer = 0;
+  std::string where;  ///< see RecordFilter
+  std::string field;  ///< whose numbers are read too; records without one are left out
+};
+
+/// Reads all shapes that are selected; records without a shape are left out.
+/// @param ipc     its abort flag ends the reading.
+/// @param values  [out] for each record, the number in the selected field, when there is one.
+VEXG_EXPORT GeometryPtr ReadShapes(VectorRecordSource& source, const ShapeSelection& selection,
+                                   const IPC& ipc, std::vector<double>* values = nullptr);
+
+/// The fault of a file of shapes, with its name in front where it isn't told.
+VEXG_EXPORT std::string FaultOfShapes(const std::string& path);
 
 }  // namespace lumo

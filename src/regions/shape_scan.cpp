@@ -5,6 +5,7 @@
 #include <numeric>
 
 #include "regions/pixel_center_edge.h"
+#include "regions/row_collector.h"
 
 namespace lumo {
 namespace {
@@ -158,47 +159,6 @@ SpanRows PolygonScanner::Scan(std::int64_t rowLimit) {
   }
   return rows;
 }
-
-/// Rows that are filled in any order.
-class RowCollector {
- public:
-  explicit RowCollector(std::int64_t rowLimit) : rowLimit_(rowLimit) {}
-
-  std::int64_t RowLimit() const { return rowLimit_; }
-  void Put(std::int64_t row, std::int64_t first, std::int64_t last) {
-    if (row >= 0 && row < rowLimit_)
-      pieces_.push_back({row, {ClampColumn(first), ClampColumn(last)}});
-  }
-
-  SpanRows GetRows() {
-    SpanRows rows;
-    if (pieces_.empty()) return rows;
-    std::stable_sort(pieces_.begin(), pieces_.end(),
-                     [](const Piece& a, const Piece& b) { return a.row < b.row; });
-    std::int64_t row = pieces_.front().row;
-    rows.Start(row);
-    std::vector<ColumnSpan> spans;
-    for (std::size_t i = 0; i < pieces_.size();) {
-      for (; row < pieces_[i].row; ++row) rows.EndRow();
-      spans.clear();
-      for (; i < pieces_.size() && pieces_[i].row == row; ++i) spans.push_back(pieces_[i].span);
-      MergeSpans(spans);
-      for (const ColumnSpan& span : spans) rows.Add(span.first, span.last);
-      rows.EndRow();
-      ++row;
-    }
-    return rows;
-  }
-
- private:
-  struct Piece {
-    std::int64_t row;
-    ColumnSpan span;
-  };
-
-  std::int64_t rowLimit_;
-  std::vector<Piece> pieces_;
-};
 
 /// numerator / denominator rounded down; the denominator is above 0.
 __extension__ using Wide = __int128;

@@ -19,6 +19,17 @@ VEXG_EXPORT bool AreScannable(const ScanVertices& vertices);
 /// where they are the lower side of the polygon.
 VEXG_EXPORT SpanRows ScanPolygon(ScanVertices vertices, ScanRules rules, std::int64_t rowLimit);
 
+/// Scans a polygon: the pixels whose centre lies inside, by the even-odd rule. A centre on the
+/// right or the upper border is inside, one on the left or the lower isn't.
+VEXG_EXPORT SpanRows ScanCenters(const ScanVertices& vertices, std::int64_t rowLimit);
+
+/// Scans a polygon: the pixels of ScanCenters, and those whose area its border enters. Of a hole
+/// these are left out, so that taking it out leaves them.
+VEXG_EXPORT SpanRows ScanTouched(const ScanVertices& vertices, bool isHole, std::int64_t rowLimit);
+
+/// Scans a line: all pixels whose area it enters, and those of its vertices.
+VEXG_EXPORT SpanRows ScanTouchedLine(const ScanVertices& vertices, std::int64_t rowLimit);
+
 /// Scans a line by Bresenham's algorithm between the pixels of its vertices (J. E. Bresenham,
 /// Algorithm for computer control of a digital plotter, 1965), each segment from its upper end.
 VEXG_EXPORT SpanRows ScanLine(const ScanVertices& vertices, std::int64_t rowLimit);

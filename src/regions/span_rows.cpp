@@ -87,6 +87,17 @@ bool SpanRows::Contains(std::int64_t column, std::int64_t row) const {
   });
 }
 
+bool SpanRows::AreApart() const {
+  std::size_t at = 0;
+  for (const std::uint32_t end : ends_) {
+    for (std::size_t i = at + 1; i < end; ++i) {
+      if (spans_[i].first <= spans_[i - 1].last) return false;
+    }
+    at = end;
+  }
+  return true;
+}
+
 SpanRows CombineRows(const std::vector<PartRows>& parts) {
   std::vector<std::size_t> waiting;  // parts that begin further down, the topmost last
   std::int64_t last = std::numeric_limits<std::int64_t>::min();

@@ -43,6 +43,8 @@ class VEXG_EXPORT SpanRows {
   void Mark(RegionMarks& marks) const;
   RegionCover Cover(const RegionWindow& window) const;
   bool Contains(std::int64_t column, std::int64_t row) const;
+  /// Whether the spans of each row are in order and apart.
+  bool AreApart() const;
 
  private:
   std::int64_t firstRow_ = 0;

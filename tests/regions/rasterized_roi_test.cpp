@@ -122,6 +122,13 @@ TEST(RasterizedGeometryROI, FailsWithTheShapeThatCannotBeCarried) {
   const RasterizedROIPtr region = RasterizeOn(RegionOf(shapes), 6, 6, {});
   Array<unsigned char> mask;
   std::uint64_t count = 0;
+  std::uint32_t part = 0;
+  ASSERT_TRUE(shapes->AddPart(0, false, part, test::PointsOf({{HUGE_VAL, 0}, {1, 1}})));
+  for (int again = 0; again < 2; ++again) {
+    EXPECT_FALSE(region->Mask({0, 0, 5, 5}, mask, count));
+    EXPECT_NE(TakeFault().ToUTF8().find("record 0, part 1"), std::string::npos);
+  }
+  ASSERT_TRUE(shapes->RemovePart(0, part));
   EXPECT_FALSE(region->Mask({0, 0, 5, 5}, mask, count));
   EXPECT_NE(TakeFault().ToUTF8().find("record 1, part 0"), std::string::npos);
   Array<unsigned char> states{ArrayDims(6, 6)};

@@ -239,6 +239,61 @@ TEST(Scan, PutsPointsNearALineOfTheGridBeyondIt) {
   EXPECT_FALSE(rows.Contains(0, 2));
 }
 
+/// Whether a segment passes through the inside of the square of a pixel: Liang and Barsky's
+/// clipping.
+bool Enters(Point2D<double> a, Point2D<double> b, double left, double top) {
+  double from = 0, to = 1;
+  const auto clip = [&](double start, double delta, double low) {
+    if (delta == 0) return start > low && start < low + 1;
+    double t0 = (low - start) / delta, t1 = (low + 1 - start) / delta;
+    if (t0 > t1) std::swap(t0, t1);
+    from = std::max(from, t0);
+    to = std::min(to, t1);
+    return from < to;
+  };
+  return clip(a.x, b.x - a.x, left) && clip(a.y, b.y - a.y, top);
+}
+
+TEST(Scan, KeepsTheCommonRulesOfCentresAndTouchedAreas) {
+  for (unsigned seed = 0; seed < 1500; ++seed) {
+    std::mt19937 random(seed);
+    Ring ring = RandomRing(random);
+    if (seed % 3 == 0) {  // crossing itself
+      std::shuffle(ring.begin(), ring.end(), random);
+    }
+    // Away from the centres, so that nothing hangs on the borders between pixels.
+    for (Point2D<double>& point : ring) point = {point.x + 0.00123, point.y + 0.00217};
+    const auto centers = Picture(ScanCenters(ring, 40), 40, 40);
+    const auto touched = Picture(ScanTouched(ring, false, 40), 40, 40);
+    const auto hole = Picture(ScanTouched(ring, true, 40), 40, 40);
+    const auto line = Picture(ScanTouchedLine(ring, 40), 40, 40);
+    for (std::size_t y = 0; y < 40; ++y) {
+      for (std::size_t x = 0; x < 40; ++x) {
+        const double left = static_cast<double>(x), top = static_cast<double>(y);
+        bool isOnLine = false;
+        for (std::size_t i = 0; i + 1 < ring.size(); ++i) {
+          isOnLine = isOnLine || Enters(ring[i], ring[i + 1], left, top);
+        }
+        const bool isOnBorder = isOnLine || Enters(ring.back(), ring.front(), left, top);
+        const bool isIn = IsInside({left + 0.5, top + 0.5}, ring);
+        ASSERT_EQ(centers[y][x] == '#', isIn) << "seed " << seed << " at " << x << ", " << y;
+        ASSERT_EQ(touched[y][x] == '#', isIn || isOnBorder) << "seed " << seed;
+        ASSERT_EQ(hole[y][x] == '#', isIn && !isOnBorder) << "seed " << seed;
+        ASSERT_EQ(line[y][x] == '#', isOnLine) << "seed " << seed << " at " << x << ", " << y;
+      }
+    }
+  }
+  // A polygon along the grid touches no pixel beyond it, and no centre belongs to two neighbours.
+  const Ring left{{1, 1}, {2.5, 1}, {2.5, 3.5}, {1, 3.5}},
+      right{{2.5, 1}, {4, 1}, {4, 3.5}, {2.5, 3.5}};
+  EXPECT_EQ(Picture(ScanTouched(left, false, 5), 5, 5),
+            std::vector<std::string>({".....", ".##..", ".##..", ".##..", "....."}));
+  EXPECT_EQ(Picture(ScanCenters(left, 5), 5, 5),
+            std::vector<std::string>({".....", ".##..", ".##..", ".....", "....."}));
+  EXPECT_EQ(Picture(ScanCenters(right, 5), 5, 5),
+            std::vector<std::string>({".....", "...#.", "...#.", ".....", "....."}));
+}
+
 TEST(SpanRows, PutPartsTogetherInTheirOrder) {
   for (unsigned seed = 0; seed < 500; ++seed) {
     std::mt19937 random(seed);

@@ -21,6 +21,10 @@ void RasterChain::Close() {
 
 void RasterVerb::AddFilesTo(CLI::App& app, const std::string& meaning) {
   GetSource().AddTo(app);
+  AddOutputTo(app, meaning);
+}
+
+void RasterVerb::AddOutputTo(CLI::App& app, const std::string& meaning) {
   target_.AddTo(app, meaning);
   AddOverwriteTo(app, "files that are there");
 }

@@ -70,6 +70,8 @@ class RasterVerb : public FileVerb {
   /// Leaves that to a verb that has something in front of them.
   RasterVerb() = default;
   void AddFilesTo(CLI::App& app, const std::string& meaning);
+  /// Adds the output alone.
+  void AddOutputTo(CLI::App& app, const std::string& meaning);
 
   // A verb says what is made:
 
