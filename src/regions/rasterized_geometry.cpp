@@ -82,6 +82,19 @@ std::shared_ptr<const SpanRows> RasterizedGeometryRecord::Rows(const GeoRefPtr& 
   return rows_;
 }
 
+bool AreProjected(const Geometry& geometry, const GeoRefPtr& geoRef, const ScanOptions& options) {
+  if (!geoRef || options.coordinates == ShapeCoordinates::kPixel) return false;
+  const CoordSys& target = geoRef->CoordinateSystem();
+  return geometry.CoordSys().Type() != 0 && target.Type() != 0 &&
+         !geometry.CoordSys().IsEqual(target);
+}
+
+GeometryPtr ShownOnGrid(const GeometryPtr& geometry, const GeoRefPtr& geoRef,
+                        const ScanOptions& options) {
+  if (!AreProjected(*geometry, geoRef, options)) return geometry;
+  return GeometryPtr(new ProjectedGeometry(geometry, geoRef->CoordinateSystem()));
+}
+
 RasterizedGeometry::RasterizedGeometry(const GeometryPtr& geometry, const GeoRefPtr& geoRef,
                                        unsigned samples, unsigned lines, const ScanOptions& options)
     : geometry_(geometry),
@@ -186,11 +199,26 @@ bool RasterizedGeometry::Mask(const SubRect& rect, Array<unsigned char>& mask,
   return true;
 }
 
+std::vector<std::int32_t> RasterizedGeometry::FindRecords(const RegionWindow& window) {
+  return Refresh().index->Find(window);
+}
+
+std::shared_ptr<const SpanRows> RasterizedGeometry::RowsOf(std::int32_t record,
+                                                           const RegionWindow& window) {
+  return RowsOf(record, window, Refresh());
+}
+
+std::shared_ptr<const SpanRows> RasterizedGeometry::RowsOf(std::int32_t record,
+                                                           const RegionWindow& window,
+                                                           const Sight& sight) {
+  return Record(record)->Rows(geoRef_, sight.generation, RowLimitFor(window));
+}
+
 bool RasterizedGeometry::ForEachRecord(
     const RegionWindow& window, const std::function<void(std::int32_t, const SpanRows&)>& take) {
   const Sight sight = Refresh();
   for (const std::int32_t id : sight.index->Find(window)) {
-    const auto rows = Record(id)->Rows(geoRef_, sight.generation, RowLimitFor(window));
+    const auto rows = RowsOf(id, window, sight);
     if (!rows) return false;
     take(id, *rows);
   }
@@ -210,7 +238,7 @@ RegionCover RasterizedGeometry::Cover(const RegionWindow& window) {
   RegionCover cover = RegionCover::kOutside;
   bool isInside = false;
   for (const std::int32_t id : found) {
-    const auto rows = Record(id)->Rows(geoRef_, sight.generation, RowLimitFor(window));
+    const auto rows = RowsOf(id, window, sight);
     if (!rows) return RegionCover::kPartly;
     const RegionCover one = rows->Cover(window);
     isInside = isInside || one == RegionCover::kInside;

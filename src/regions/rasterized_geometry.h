@@ -69,6 +69,11 @@ class VEXG_EXPORT RasterizedGeometry final : public Object {
   /// @param count  [out] pixels that were set now.
   bool Mask(const SubRect& rect, Array<unsigned char>& mask, std::uint64_t& count);
 
+  /// The records that may have pixels in a window, ascending by id.
+  std::vector<std::int32_t> FindRecords(const RegionWindow& window);
+  /// The pixels of a record, of all rows down to those of a window at least.
+  /// @return null, with the fault told, when the record can't be carried to the grid.
+  std::shared_ptr<const SpanRows> RowsOf(std::int32_t record, const RegionWindow& window);
   /// Calls `take` with the records that may have pixels in a window, ascending by id, each with its
   /// rows. @return false, with the fault told, when a record can't be carried to the grid.
   bool ForEachRecord(const RegionWindow& window,
@@ -84,6 +89,8 @@ class VEXG_EXPORT RasterizedGeometry final : public Object {
     std::uint64_t generation;
   };
   Sight Refresh();
+  std::shared_ptr<const SpanRows> RowsOf(std::int32_t record, const RegionWindow& window,
+                                         const Sight& sight);
   std::uint64_t CountChanges() const;
   RecordBox BoxOf(int record) const;
   RasterizedGeometryRecordPtr Record(int record);
@@ -101,5 +108,13 @@ class VEXG_EXPORT RasterizedGeometry final : public Object {
 };
 
 using RasterizedGeometryPtr = Pointer<RasterizedGeometry>;
+
+/// Whether shapes have to be carried to the coordinate system of a grid.
+VEXG_EXPORT bool AreProjected(const Geometry& geometry, const GeoRefPtr& geoRef,
+                              const ScanOptions& options);
+
+/// A geometry in the coordinate system of a grid, itself where it needs no carrying.
+VEXG_EXPORT GeometryPtr ShownOnGrid(const GeometryPtr& geometry, const GeoRefPtr& geoRef,
+                                    const ScanOptions& options);
 
 }  // namespace lumo

@@ -4,18 +4,6 @@
 #include "regions/projected_geometry_roi.h"
 
 namespace lumo {
-namespace {
-
-/// Whether shapes have to be carried to the coordinate system of a grid.
-bool AreProjected(const GeometryROIDef& definition, const GeoRefPtr& geoRef) {
-  if (!geoRef || definition.Options().coordinates == ShapeCoordinates::kPixel) return false;
-  const CoordSys& own = definition.Geometry()->CoordSys();
-  const CoordSys& target = geoRef->CoordinateSystem();
-  return own.Type() != 0 && target.Type() != 0 && !own.IsEqual(target);
-}
-
-}  // namespace
-
 const unsigned RasterizedGeometryROI::TypeCode =
     GloballyUniqueObjectTypeCode("RasterizedGeometryROI");
 
@@ -30,7 +18,7 @@ RasterizedGeometryROI::RasterizedGeometryROI(const GeometryROIDefPtr& definition
     SetErrorState(ObjectErrorNotConstructed());
     return;
   }
-  projected_ = AreProjected(*definition_, geoRef_);
+  projected_ = AreProjected(*definition_->Geometry(), geoRef_, definition_->Options());
   if (projected_) {
     inner_.Reset(new ProjectedGeometryROI(definition_, geoRef_));
   } else {

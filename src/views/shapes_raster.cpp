@@ -9,17 +9,6 @@
 namespace lumo {
 namespace {
 
-/// The shapes in the coordinate system of the grid.
-GeometryPtr OnGrid(const ValuedShapes& shapes) {
-  const bool isPlain = !shapes.geoRef || shapes.options.coordinates == ShapeCoordinates::kPixel ||
-                       shapes.geometry->CoordSys().Type() == 0 ||
-                       shapes.geoRef->CoordinateSystem().Type() == 0 ||
-                       shapes.geometry->CoordSys().IsEqual(shapes.geoRef->CoordinateSystem());
-  return isPlain ? shapes.geometry
-                 : GeometryPtr(
-                       new ProjectedGeometry(shapes.geometry, shapes.geoRef->CoordinateSystem()));
-}
-
 /// Writes the pixels of one record into a block.
 template <typename T>
 void Burn(const SpanRows& rows, const SubRect& rect, T value, T* pixels, unsigned char* states) {
@@ -50,7 +39,8 @@ ShapesRaster<T>::ShapesRaster(const ValuedShapes& shapes) : isNoData_(shapes.isN
   def_.interleave = Interleave::BSQ;
   def_.SetGeoRef(shapes.geoRef);
   if (isNoData_) def_.noData[0] = shapes.background;
-  shapes_.Reset(new RasterizedGeometry(OnGrid(shapes), shapes.geoRef, shapes.samples, shapes.lines,
+  shapes_.Reset(new RasterizedGeometry(ShownOnGrid(shapes.geometry, shapes.geoRef, shapes.options),
+                                       shapes.geoRef, shapes.samples, shapes.lines,
                                        shapes.options));
   const auto take = [&](double value) {
     const std::optional<T> pixel = ToPixel<T>(value);
