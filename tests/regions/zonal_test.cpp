@@ -127,16 +127,16 @@ double Figure(const std::string& name, std::vector<std::pair<double, double>> va
 
 template <typename T>
 class ZonalPassTest : public testing::Test {};
-using Types = testing::Types<std::uint8_t, std::int8_t, std::uint16_t, std::int16_t, std::uint32_t,
-                             std::int32_t, float, double>;
+using Types = testing::Types<std::uint8_t, std::int16_t, std::uint32_t, float, double>;
 TYPED_TEST_SUITE(ZonalPassTest, Types);
 
 TYPED_TEST(ZonalPassTest, GivesTheFiguresOfTheirDefinitions) {
   using T = TypeParam;
   std::mt19937 random(11);
   // Several blocks, two bands, invalid pixels, and NaN.
-  const auto raster =
-      MakePlaced<T>(MakeGrid(0, 0, 1, 900, 700), 2, [&](unsigned x, unsigned y, unsigned band) {
+  constexpr unsigned kWidth = sizeof(T) == 1 ? 900 : 500, kHeight = sizeof(T) == 1 ? 700 : 400;
+  const auto raster = MakePlaced<T>(
+      MakeGrid(0, 0, 1, kWidth, kHeight), 2, [&](unsigned x, unsigned y, unsigned band) {
         if constexpr (std::is_floating_point_v<T>) {
           if (random() % 50 == 0) return std::numeric_limits<T>::quiet_NaN();
           return static_cast<T>(std::sin(x * 0.1) * 1e4 + y + band * 0.25);
@@ -150,9 +150,11 @@ TYPED_TEST(ZonalPassTest, GivesTheFiguresOfTheirDefinitions) {
       });
   for (auto& state : raster->states) state = random() % 20 == 0 ? PixelValueState::NoData : 0;
   const auto shapes = test::MakeShapes({});
-  AddShape(*shapes, {RingAround(random, 450, 350, 480), RingAround(random, 450, 350, 100)});
+  AddShape(*shapes, {RingAround(random, kWidth / 2, kHeight / 2, 480),
+                     RingAround(random, kWidth / 2, kHeight / 2, 60)});
   for (int i = 0; i < 30; ++i) {
-    AddShape(*shapes, {RingAround(random, random() % 900, random() % 700, 3 + random() % 60)});
+    AddShape(*shapes,
+             {RingAround(random, random() % kWidth, random() % kHeight, 3 + random() % 60)});
   }
   AddShape(*shapes, {RingAround(random, 3000, 30, 20)});            // off the raster
   AddShape(*shapes, {{{10.1, 10.1}, {10.3, 10.1}, {10.3, 10.3}}});  // no centre inside
@@ -179,18 +181,18 @@ TYPED_TEST(ZonalPassTest, GivesTheFiguresOfTheirDefinitions) {
       // The weight of each pixel of the zone, one zone at a time over all of the raster.
       std::vector<SpanRows> rows;
       std::vector<PartRows> parts;
-      double left = 900, top = 700, right = 0, bottom = 0;
-      CoverageBlock coverage({0, 0, 900, 700});
+      double left = kWidth, top = kHeight, right = 0, bottom = 0;
+      CoverageBlock coverage({0, 0, kWidth, kHeight});
       for (unsigned part = 0; part < shapes->PartCount(zone); ++part) {
         const auto points = shapes->Coordinates(zone, part);
         const ScanVertices vertices(points.begin(), points.end());
-        rows.push_back(ScanCenters(vertices, 700));
+        rows.push_back(ScanCenters(vertices, kHeight));
         coverage.AddRing(vertices, part != 0);
         for (const Point2D<double>& vertex : vertices) {
           left = std::clamp(vertex.x - 2, 0.0, left),
-          right = std::clamp(vertex.x + 2, right, 900.0);
+          right = std::clamp(vertex.x + 2, right, 1.0 * kWidth);
           top = std::clamp(vertex.y - 2, 0.0, top),
-          bottom = std::clamp(vertex.y + 2, bottom, 700.0);
+          bottom = std::clamp(vertex.y + 2, bottom, 1.0 * kHeight);
         }
       }
       for (unsigned part = 0; part < rows.size(); ++part) parts.push_back({&rows[part], part != 0});
