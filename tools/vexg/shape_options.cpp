@@ -3,6 +3,7 @@
 #include <CLI/CLI.hpp>
 
 #include "option_values.h"
+#include "raster_source.h"
 
 namespace lumo::host {
 
@@ -21,7 +22,7 @@ void ShapeOptions::AddTo(CLI::App& app) {
 }
 
 void ShapeOptions::AddInputs(JobWriterCommand& command) const {
-  command.AddInput("Vectors", String(file));
+  command.AddInput("Vectors", String(AbsoluteName(file)));
   if (!layer.empty()) command.AddInput("Layer", String(layer));
   if (!where.empty()) command.AddInput("Where", String(where));
   command.AddInput("Pixels", String(rule == "told"     ? "Told"
