@@ -19,6 +19,10 @@ void RasterChain::Close() {
 
 void RasterVerb::AddFilesTo(OptionSet& line, const std::string& meaning) {
   GetSource().AddTo(line);
+  AddOutputTo(line, meaning);
+}
+
+void RasterVerb::AddOutputTo(OptionSet& line, const std::string& meaning) {
   target_.AddTo(line, meaning);
   AddOverwriteTo(line, "files that are there");
 }

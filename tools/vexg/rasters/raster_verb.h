@@ -70,6 +70,8 @@ class RasterVerb : public FileVerb {
   /// Leaves that to a verb that has something in front of them.
   RasterVerb() = default;
   void AddFilesTo(OptionSet& line, const std::string& meaning);
+  /// Adds the output alone.
+  void AddOutputTo(OptionSet& line, const std::string& meaning);
 
   // A verb says what is made:
 
