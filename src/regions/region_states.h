@@ -40,13 +40,13 @@ VEXG_EXPORT bool MaskAtLevel(RasterizedROI& region, unsigned level, const SubRec
 
 /// Which part of a raster a region covers.
 struct RegionExtent {
-  std::uint64_t pixels = 0;  ///< of the raster, in the region
+  std::uint64_t pixels = 0;  ///< in the region
   SubRect bounds;            ///< the smallest rectangle with all of them; means nothing without any
 };
 
-/// Counts the pixels of a raster of `samples` by `lines` that lie in a region.
+/// Counts the pixels of a rectangle that lie in a region.
 /// @return false, with the fault told, when the region can't be carried, or at an abort.
-VEXG_EXPORT bool MeasureRegion(RasterizedROI& region, unsigned samples, unsigned lines,
-                               const IPC& ipc, RegionExtent& extent);
+VEXG_EXPORT bool MeasureRegion(RasterizedROI& region, const SubRect& rect, const IPC& ipc,
+                               RegionExtent& extent);
 
 }  // namespace lumo

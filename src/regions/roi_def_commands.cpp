@@ -143,7 +143,9 @@ const CommandDeclaration kMeasure{
     "Regions",
     "Tells which pixels of a raster a region of interest covers. A command of this library's own.",
     {{"URI", Presence::kRequired, ValueKind::kURI, "the raster"},
-     {"ROIDefURI", Presence::kRequired, ValueKind::kURI, "the region"}},
+     {"ROIDefURI", Presence::kRequired, ValueKind::kURI, "the region"},
+     {"SubRect", Presence::kOptional, ValueKind::kRectangle,
+      "of the raster, where alone it is looked for; all when absent"}},
     {{"Pixels", ValueKind::kInteger, "how many of the raster are in the region"},
      {"SubRect", ValueKind::kRectangle,
       "the smallest rectangle with all of them; absent without any"}}};
@@ -153,12 +155,16 @@ class MeasureROICommand final : public RasterCommand {
     if (!CheckInputs()) return Fail();
     const BasicRasterPtr raster = FindRaster();
     if (!raster) return Fail();
+    if (raster->Samples() == 0 || raster->Lines() == 0) return Fail("URI: the raster has no pixel");
     const ROIDefPtr definition(CatalogFind(Read<URI>("ROIDefURI")));
     if (!definition) return Fail("ROIDefURI: there is no such region");
     const RasterizedROIPtr region =
         RasterizeOn(definition, raster->Samples(), raster->Lines(), raster->GetRasterDef().geoRef);
+    const SubRect all(0, 0, raster->Samples() - 1, raster->Lines() - 1);
+    const SubRect rect =
+        HasInput("SubRect") ? Read<SubRect>("SubRect").Clip(all.right, all.bottom) : all;
     RegionExtent extent;
-    if (!region || !MeasureRegion(*region, raster->Samples(), raster->Lines(), GetIPC(), extent)) {
+    if (!region || !MeasureRegion(*region, rect, GetIPC(), extent)) {
       return Fail(TakeFaultOr("the region can't be put on the raster"));
     }
     Write("Pixels", extent.pixels);

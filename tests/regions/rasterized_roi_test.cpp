@@ -381,14 +381,14 @@ TEST(MeasureRegion, GivesPixelsAndBounds) {
       }
     }
     RegionExtent extent;
-    ASSERT_TRUE(MeasureRegion(*form, 97, 83, IPC(), extent));
+    ASSERT_TRUE(MeasureRegion(*form, {0, 0, 96, 82}, IPC(), extent));
     EXPECT_EQ(extent.pixels, pixels);
     EXPECT_EQ(extent.bounds, SubRect(left, top, right, bottom));
   }
   const RasterizedROIPtr far =
       RasterizeOn(RegionOf(MakeShapes({Square(9000, 5000, 9001, 5001)})), 9500, 5100, GeoRefPtr());
   RegionExtent extent;
-  ASSERT_TRUE(MeasureRegion(*far, 9500, 5100, IPC(), extent));
+  ASSERT_TRUE(MeasureRegion(*far, {0, 0, 9499, 5099}, IPC(), extent));
   EXPECT_EQ(extent.pixels, 1U);
   EXPECT_EQ(extent.bounds, SubRect(9000, 5000, 9000, 5000));
 }
