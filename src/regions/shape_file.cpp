@@ -29,14 +29,20 @@ bool ReadWhole(const std::string& text, T& value) {
   return fault == std::errc() && end == text.data() + text.size();
 }
 
-/// The value of a field that a text stands for; none when it can't have it.
-std::optional<VectorValue> ValueFrom(const std::string& text, VectorFieldType type) {
+/// Reads the value of a field out of a text. @return false when the field can't have it.
+bool ReadValueOf(const std::string& text, VectorFieldType type, VectorValue& value) {
   std::int64_t integer = 0;
   double real = 0;
-  if (type == VectorFieldType::kText) return VectorValue(text);
-  if (type == VectorFieldType::kInteger && ReadWhole(text, integer)) return VectorValue(integer);
-  if (ReadWhole(text, real)) return VectorValue(real);
-  return {};
+  if (type == VectorFieldType::kText) {
+    value = text;
+  } else if (type == VectorFieldType::kInteger && ReadWhole(text, integer)) {
+    value = integer;
+  } else if (ReadWhole(text, real)) {
+    value = real;
+  } else {
+    return false;
+  }
+  return true;
 }
 
 /// NaN for a value that is none.
@@ -44,6 +50,14 @@ double NumberOf(const VectorValue& value) {
   if (const auto* integer = std::get_if<std::int64_t>(&value)) return static_cast<double>(*integer);
   const auto* real = std::get_if<double>(&value);
   return real != nullptr ? *real : std::nan("");
+}
+
+/// FindField of one that holds numbers.
+std::optional<std::size_t> FindNumberField(const VectorLayer& layer, const std::string& name) {
+  const std::optional<std::size_t> found = FindField(layer, name);
+  if (!found || layer.fields[*found].type != VectorFieldType::kText) return found;
+  SetFault(String("field " + Quoted(layer.fields[*found].name) + " holds no numbers"));
+  return {};
 }
 
 }  // namespace
@@ -86,15 +100,6 @@ std::optional<std::size_t> FindField(const VectorLayer& layer, const std::string
   return {};
 }
 
-/// FindField of one that holds numbers.
-static std::optional<std::size_t> FindNumberField(const VectorLayer& layer,
-                                                  const std::string& name) {
-  const std::optional<std::size_t> found = FindField(layer, name);
-  if (!found || layer.fields[*found].type != VectorFieldType::kText) return found;
-  SetFault(String("field " + Quoted(layer.fields[*found].name) + " holds no numbers"));
-  return {};
-}
-
 bool RecordFilter::Set(const VectorLayer& layer, const std::string& text) {
   field_.reset();
   if (text.empty()) return true;
@@ -106,13 +111,11 @@ bool RecordFilter::Set(const VectorLayer& layer, const std::string& text) {
   field_ = FindField(layer, text.substr(0, at));
   if (!field_) return false;
   const std::string wanted = text.substr(at + 1);
-  const auto value = ValueFrom(wanted, layer.fields[*field_].type);
-  if (!value) {
+  if (!ReadValueOf(wanted, layer.fields[*field_].type, value_)) {
     SetFault(String("field " + Quoted(layer.fields[*field_].name) + " holds numbers, which " +
                     Quoted(wanted) + " isn't"));
     return false;
   }
-  value_ = *value;
   return true;
 }
 
