@@ -11,10 +11,8 @@
 namespace lumo {
 namespace {
 
-std::string Lower(std::string text) {
-  std::transform(text.begin(), text.end(), text.begin(),
-                 [](char c) { return c >= 'A' && c <= 'Z' ? static_cast<char>(c + 32) : c; });
-  return text;
+char Lower(char c) {
+  return c >= 'A' && c <= 'Z' ? static_cast<char>(c + 32) : c;
 }
 
 /// A text from outside as it stands in a message.
@@ -62,6 +60,11 @@ std::optional<std::size_t> FindNumberField(const VectorLayer& layer, const std::
 
 }  // namespace
 
+bool AreSameName(const std::string& a, const std::string& b) {
+  return std::equal(a.begin(), a.end(), b.begin(), b.end(),
+                    [](char one, char other) { return Lower(one) == Lower(other); });
+}
+
 VectorRecordSourcePtr OpenShapes(const std::string& path) {
   VectorRecordFactory* const factory = GetVectorRecordFactory();
   return factory != nullptr ? factory->Open(path) : VectorRecordSourcePtr();
@@ -92,7 +95,7 @@ std::optional<std::size_t> FindField(const VectorLayer& layer, const std::string
   auto found = std::find(names.begin(), names.end(), name);
   if (found == names.end()) {
     found = std::find_if(names.begin(), names.end(),
-                         [&](const std::string& known) { return Lower(known) == Lower(name); });
+                         [&](const std::string& known) { return AreSameName(known, name); });
   }
   if (found != names.end()) return static_cast<std::size_t>(found - names.begin());
   SetFault(String("layer " + Quoted(layer.name) + " has no field " + Quoted(name) +
