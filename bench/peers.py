@@ -288,6 +288,28 @@ def make_shapes(path, size, side):
     layer.CommitTransaction()
 
 
+def make_coast(path, size, vertices):
+    """One polygon with a ragged border."""
+    import math
+    import random
+    from osgeo import ogr, osr
+    random.seed(4)
+    system = osr.SpatialReference()
+    system.ImportFromEPSG(32633)
+    ring = []
+    for number in range(vertices):
+        angle = 2 * math.pi * number / vertices
+        radius = 14 * size * (0.7 + 0.2 * math.sin(7 * angle) + 0.02 * math.sin(3001 * angle) + 0.001 * random.random())
+        ring.append(f"{600000 + 15 * size + radius * math.cos(angle)} {5000000 - 15 * size + radius * math.sin(angle)}")
+    out = ogr.GetDriverByName("GPKG").CreateDataSource(str(path))
+    layer = out.CreateLayer("coast", system, ogr.wkbPolygon)
+    layer.CreateField(ogr.FieldDefn("class", ogr.OFTInteger))
+    feature = ogr.Feature(layer.GetLayerDefn())
+    feature.SetField(0, 7)
+    feature.SetGeometry(ogr.CreateGeometryFromWkt(f"POLYGON(({', '.join([*ring, ring[0]])}))"))
+    layer.CreateFeature(feature)
+
+
 def zones(bench):
     """12,769 polygons that overlap: drawn into a raster, and as zones of six bands."""
     size = bench.options.size
@@ -310,6 +332,14 @@ def zones(bench):
     if sums[0] != sums[1]:
         raise SystemExit(f"{drawn} and {theirs} differ")
     bench.compare("12,769 polygons to pixels", ours, {"gdal_rasterize": peer}, 0.7, [drawn, theirs])
+
+    one = bench.work / f"one-{size}.gpkg"
+    if not one.exists():
+        maker = multiprocessing.get_context("spawn").Process(target=make_coast, args=(one, size, 1_000_000))
+        maker.start()
+        maker.join()
+    swap = lambda command: [one if word == shapes else word for word in command]
+    bench.compare("1,000,000 vertices to pixels", swap(ours), {"gdal_rasterize": swap(peer)}, 0.7, [drawn, theirs])
 
     table, other = bench.work / "zones.csv", bench.work / "otb-zones.gpkg"
     peers = {}

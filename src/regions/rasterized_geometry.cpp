@@ -49,10 +49,11 @@ void RasterizedGeometryRecord::WantRows(std::int64_t rowLimit) {
 }
 
 bool RasterizedGeometryRecord::HitTest(const GeoRefPtr& geoRef, std::uint64_t generation,
-                                       const RegionWindow& pixel, std::uint32_t& part) {
+                                       const RegionWindow& pixel, std::int64_t rowLimit,
+                                       std::uint32_t& part) {
   const std::lock_guard lock(mutex_);
   Refresh(generation);
-  WantRows(pixel.top + 1);
+  WantRows(rowLimit);
   for (const int id : geometry_->PartIds(record_)) {
     part = static_cast<std::uint32_t>(id);
     if (geometry_->IsHole(record_, part)) continue;
@@ -168,9 +169,11 @@ RasterizedGeometryRecordPtr RasterizedGeometry::Record(int record) {
   return records_.Find(record);
 }
 
-/// The rows to scan for a window: those of the whole grid, and more where the window lies below it.
+/// The rows to scan for a window: those of the whole grid, those below it that the last lines of
+/// its pyramid levels reach, and more where the window lies further down.
 std::int64_t RasterizedGeometry::RowLimitFor(const RegionWindow& window) const {
-  return std::max<std::int64_t>(lines_, window.Bottom() + 1);
+  constexpr std::int64_t kBelow = 1024;
+  return std::max<std::int64_t>(lines_ + kBelow, window.Bottom() + 1);
 }
 
 bool RasterizedGeometry::HitTest(const Point2D<unsigned>& point, std::uint32_t& record,
@@ -182,7 +185,7 @@ bool RasterizedGeometry::HitTest(const RegionWindow& pixel, std::uint32_t& recor
                                  std::uint32_t& part) {
   const Sight sight = Refresh();
   for (const std::int32_t id : sight.index->Find(pixel)) {
-    if (!Record(id)->HitTest(geoRef_, sight.generation, pixel, part)) continue;
+    if (!Record(id)->HitTest(geoRef_, sight.generation, pixel, RowLimitFor(pixel), part)) continue;
     record = static_cast<std::uint32_t>(id);
     return true;
   }

@@ -21,7 +21,7 @@ class VEXG_EXPORT RasterizedGeometryRecord final : public Object {
   /// The first part that holds a pixel and isn't a hole.
   /// @param generation  changes with every change of the geometry.
   bool HitTest(const GeoRefPtr& geoRef, std::uint64_t generation, const RegionWindow& pixel,
-               std::uint32_t& part);
+               std::int64_t rowLimit, std::uint32_t& part);
   /// The pixels of all parts, holes taken out.
   /// @param rowLimit  the rows wanted end below it.
   /// @return null, with the fault told, when a part can't be carried to the grid.
@@ -41,7 +41,7 @@ class VEXG_EXPORT RasterizedGeometryRecord final : public Object {
   std::uint64_t generation_ = 0;
   std::uint32_t seenRevision_ = 0;
   Map<int, RasterizedGeometryPartPtr> parts_;
-  std::int64_t rowLimit_ = kFirstRowLimit;
+  std::int64_t rowLimit_ = 0;
   std::shared_ptr<const SpanRows> rows_;
 };
 

@@ -78,6 +78,7 @@ bool RasterizedGeometryPart::Prepare(const GeoRefPtr& geoRef, unsigned& flags) {
   const std::uint32_t revision = geometry_->PartRevision(record_, part_);
   if (!isPrepared_ || revision != seenRevision_) {
     isPrepared_ = false;
+    if (rowLimit_ == 0) rowLimit_ = 0x10000;
     ScanVertices vertices;
     if (!CarryPart(*geometry_, record_, part_, geoRef, options_.coordinates, vertices)) {
       return false;

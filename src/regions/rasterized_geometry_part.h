@@ -8,9 +8,6 @@
 
 namespace lumo {
 
-/// The rows that are scanned at first end below this; more when a window asks for them.
-constexpr std::int64_t kFirstRowLimit = 0x10000;
-
 /// Carries the vertices of a part to the pixels of a grid.
 /// @param geoRef    of the grid; may be null.
 /// @param vertices  [out] none for a part that isn't there.
@@ -40,7 +37,8 @@ class VEXG_EXPORT RasterizedGeometryPart : public Object {
   /// @return false when the part can't be carried to the grid, or there is no memory.
   virtual bool Mask(const GeoRefPtr& geoRef, unsigned samples, unsigned lines, const SubRect& rect,
                     Array<unsigned char>& mask, std::uint64_t& count, SubRect& covered);
-  /// Scans the part unless that was done already.
+  /// Scans the part unless that was done already: the rows that WantRows asks for, else the first
+  /// 65,536.
   /// @param flags  [out] kHasPixels or 0.
   virtual bool Prepare(const GeoRefPtr& geoRef, unsigned& flags);
 
@@ -66,7 +64,7 @@ class VEXG_EXPORT RasterizedGeometryPart : public Object {
   std::uint32_t part_;
   ScanOptions options_;
   std::shared_ptr<const SpanRows> rows_;
-  std::int64_t rowLimit_ = kFirstRowLimit;
+  std::int64_t rowLimit_ = 0;  // the rows that were asked for end below it
   bool isPrepared_ = false;
   std::uint32_t seenRevision_ = 0;
 };

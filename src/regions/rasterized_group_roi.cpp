@@ -19,19 +19,25 @@ RasterizedGroupROI::RasterizedGroupROI(const GroupROIDefPtr& definition, unsigne
 /// Makes the forms of children that are new, and drops those of children that are gone.
 void RasterizedGroupROI::Refresh() {
   const std::uint32_t revision = definition_->Revision();
-  if (isFresh_ && revision == seenRevision_) return;
+  const std::pair offset(offsetX_, offsetY_);
+  if (isFresh_ && revision == seenRevision_ && offset == seenOffset_) return;
   Map<ROIDefPtr, RasterizedROIPtr> forms;
   children_.clear();
   for (const ROIDefPtr& child : definition_->Children()) {
     RasterizedROIPtr form = forms_.Find(child);
-    if (!form) form = RasterizeOn(child, samples_, lines_, geoRef_);
+    const bool isNew = form.IsNull();
+    if (isNew) form = RasterizeOn(child, samples_, lines_, geoRef_);
     if (!form) continue;
-    form->SetOffset(form->GridGeoRef() ? 0 : offsetX_, form->GridGeoRef() ? 0 : offsetY_);
+    // Others may be using a form that is not new, whose offset then is right already.
+    if ((isNew || offset != seenOffset_) && !form->GridGeoRef()) {
+      form->SetOffset(offsetX_, offsetY_);
+    }
     forms[child] = form;
     children_.push_back(form);
   }
   forms_ = forms;
   seenRevision_ = revision;
+  seenOffset_ = offset;
   isFresh_ = true;
 }
 

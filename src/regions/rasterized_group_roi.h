@@ -1,6 +1,8 @@
 #pragma once
 
 #include <mutex>
+#include <utility>
+#include <vector>
 
 #include "regions/rasterized_roi.h"
 
@@ -30,6 +32,7 @@ class VEXG_EXPORT RasterizedGroupROI final : public RasterizedROI {
   std::mutex mutex_;
   bool isFresh_ = false;
   std::uint32_t seenRevision_ = 0;
+  std::pair<std::int32_t, std::int32_t> seenOffset_;  // that the children have
   Map<ROIDefPtr, RasterizedROIPtr> forms_;
   std::vector<RasterizedROIPtr> children_;  // in the order of the definition
 };

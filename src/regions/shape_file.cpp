@@ -11,10 +11,8 @@
 namespace lumo {
 namespace {
 
-std::string Lower(std::string text) {
-  std::transform(text.begin(), text.end(), text.begin(),
-                 [](char c) { return c >= 'A' && c <= 'Z' ? static_cast<char>(c + 32) : c; });
-  return text;
+char Lower(char c) {
+  return c >= 'A' && c <= 'Z' ? static_cast<char>(c + 32) : c;
 }
 
 /// A text from outside as it stands in a message.
@@ -29,14 +27,20 @@ bool ReadWhole(const std::string& text, T& value) {
   return fault == std::errc() && end == text.data() + text.size();
 }
 
-/// The value of a field that a text stands for; none when it can't have it.
-std::optional<VectorValue> ValueFrom(const std::string& text, VectorFieldType type) {
+/// Reads the value of a field out of a text. @return false when the field can't have it.
+bool ReadValueOf(const std::string& text, VectorFieldType type, VectorValue& value) {
   std::int64_t integer = 0;
   double real = 0;
-  if (type == VectorFieldType::kText) return VectorValue(text);
-  if (type == VectorFieldType::kInteger && ReadWhole(text, integer)) return VectorValue(integer);
-  if (ReadWhole(text, real)) return VectorValue(real);
-  return {};
+  if (type == VectorFieldType::kText) {
+    value = text;
+  } else if (type == VectorFieldType::kInteger && ReadWhole(text, integer)) {
+    value = integer;
+  } else if (ReadWhole(text, real)) {
+    value = real;
+  } else {
+    return false;
+  }
+  return true;
 }
 
 /// NaN for a value that is none.
@@ -46,7 +50,20 @@ double NumberOf(const VectorValue& value) {
   return real != nullptr ? *real : std::nan("");
 }
 
+/// FindField of one that holds numbers.
+std::optional<std::size_t> FindNumberField(const VectorLayer& layer, const std::string& name) {
+  const std::optional<std::size_t> found = FindField(layer, name);
+  if (!found || layer.fields[*found].type != VectorFieldType::kText) return found;
+  SetFault(String("field " + Quoted(layer.fields[*found].name) + " holds no numbers"));
+  return {};
+}
+
 }  // namespace
+
+bool AreSameName(const std::string& a, const std::string& b) {
+  return std::equal(a.begin(), a.end(), b.begin(), b.end(),
+                    [](char one, char other) { return Lower(one) == Lower(other); });
+}
 
 VectorRecordSourcePtr OpenShapes(const std::string& path) {
   VectorRecordFactory* const factory = GetVectorRecordFactory();
@@ -78,20 +95,11 @@ std::optional<std::size_t> FindField(const VectorLayer& layer, const std::string
   auto found = std::find(names.begin(), names.end(), name);
   if (found == names.end()) {
     found = std::find_if(names.begin(), names.end(),
-                         [&](const std::string& known) { return Lower(known) == Lower(name); });
+                         [&](const std::string& known) { return AreSameName(known, name); });
   }
   if (found != names.end()) return static_cast<std::size_t>(found - names.begin());
   SetFault(String("layer " + Quoted(layer.name) + " has no field " + Quoted(name) +
                   DidYouMean(name, names)));
-  return {};
-}
-
-/// FindField of one that holds numbers.
-static std::optional<std::size_t> FindNumberField(const VectorLayer& layer,
-                                                  const std::string& name) {
-  const std::optional<std::size_t> found = FindField(layer, name);
-  if (!found || layer.fields[*found].type != VectorFieldType::kText) return found;
-  SetFault(String("field " + Quoted(layer.fields[*found].name) + " holds no numbers"));
   return {};
 }
 
@@ -106,13 +114,11 @@ bool RecordFilter::Set(const VectorLayer& layer, const std::string& text) {
   field_ = FindField(layer, text.substr(0, at));
   if (!field_) return false;
   const std::string wanted = text.substr(at + 1);
-  const auto value = ValueFrom(wanted, layer.fields[*field_].type);
-  if (!value) {
+  if (!ReadValueOf(wanted, layer.fields[*field_].type, value_)) {
     SetFault(String("field " + Quoted(layer.fields[*field_].name) + " holds numbers, which " +
                     Quoted(wanted) + " isn't"));
     return false;
   }
-  value_ = *value;
   return true;
 }
 

@@ -35,6 +35,9 @@ class VEXG_EXPORT RecordFilter {
   VectorValue value_;
 };
 
+/// Whether two names of fields are the same but for the case of their letters.
+VEXG_EXPORT bool AreSameName(const std::string& a, const std::string& b);
+
 /// The place of a field of a layer by its name, else by its name in letters of another case.
 /// @return none, with the fault told, when there is no such field.
 VEXG_EXPORT std::optional<std::size_t> FindField(const VectorLayer& layer, const std::string& name);

@@ -12,7 +12,7 @@ namespace {
 
 constexpr double kFarthest = 4503599627370496.0;  // 2^52: cells and halves of them are exact below
 /// How far above the raster edges are still followed row by row.
-constexpr std::int64_t kRunUp = 1 << 16;
+constexpr std::int64_t kRunUp = 1 << 12;
 
 /// Follows the edges of one polygon from row to row.
 class PolygonScanner {

@@ -14,9 +14,9 @@ struct ColumnSpan {
   std::int32_t last;
 };
 
-/// The nearest column that a span can hold.
+/// The nearest column that a span can hold; there is room for one more on each side.
 inline std::int32_t ClampColumn(std::int64_t column) {
-  constexpr std::int64_t kMost = std::numeric_limits<std::int32_t>::max();
+  constexpr std::int64_t kMost = std::numeric_limits<std::int32_t>::max() - 1;
   return static_cast<std::int32_t>(column < -kMost ? -kMost : column > kMost ? kMost : column);
 }
 

@@ -98,10 +98,10 @@ class ZonalStatisticsCommand final : public RasterCommand {
     return true;
   }
 
-  /// A name for a column that no other one has.
+  /// A name for a column that no other one has, in letters of whichever case.
   static std::string FreeName(const std::string& name, const std::vector<VectorField>& fields) {
     std::string free = name;
-    const auto isTaken = [&](const VectorField& field) { return field.name == free; };
+    const auto isTaken = [&](const VectorField& field) { return AreSameName(field.name, free); };
     for (int number = 2; std::any_of(fields.begin(), fields.end(), isTaken); ++number) {
       free = std::string(name).append("_").append(std::to_string(number));
     }

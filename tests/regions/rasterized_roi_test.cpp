@@ -80,6 +80,16 @@ TEST(RasterizedGeometryROI, AddsUpInAMaskOfItsSize) {
   EXPECT_EQ(count, 4U);
 }
 
+TEST(RasterizedGeometryROI, AnswersBelowItsGridToo) {
+  const RasterizedROIPtr region =
+      RasterizeOn(RegionOf(MakeShapes({Square(0, -90000, 3, 90000)})), 3, 3, GeoRefPtr());
+  for (const unsigned line : {2U, 1500U, 70000U, 89999U, 90000U, 1000U}) {
+    EXPECT_EQ(RowsOf(*region, {0, line, 3, line})[0], line < 90000 ? "###." : "....") << line;
+    ROIHitInfoPtr info;
+    EXPECT_EQ(region->HitTest({2, line}, info), line < 90000);
+  }
+}
+
 TEST(RasterizedGeometryROI, ShowsEveryChangeAtTheNextCall) {
   const auto shapes = MakeShapes({Square(0, 0, 2, 2)});
   const RasterizedROIPtr region = RasterizeOn(RegionOf(shapes), 6, 2, {});
@@ -402,9 +412,10 @@ TEST(RasterizedROI, MayBeAskedOnSeveralThreadsWhileItsDefinitionChanges) {
   const auto ask = [&] {
     for (int i = 0; i < 300; ++i) {
       Array<unsigned char> states{ArrayDims(64, 64)};
+      std::fill(states.begin(), states.end(), PixelValueState::OutsideROI);
       ROIHitInfoPtr info;
       if (!FillRegionStates(*form, 0, {0, 0, 63, 63}, Interleave::BSQ, 1, states) ||
-          !form->HitTest({5, 5}, info) || states[5 * 64 + 5] != (states[5 * 64 + 5] & 3)) {
+          !form->HitTest({5, 5}, info) || states[5 * 64 + 5] != PixelValueState::Valid) {
         failed = true;
       }
     }

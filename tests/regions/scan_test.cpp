@@ -182,6 +182,33 @@ TEST(Scan, TakesPolygonsThatReachFarOutside) {
   }
 }
 
+TEST(Scan, TakesAnyNumbersThatAreScannable) {
+  const double values[] = {0,    -0.0, 1e-300, 0.5,  -0.5,   1,       49.99995,     3e4,
+                           -3e4, 1e9,  -1e9,   1e12, 4.4e15, -4.4e15, 2147483648.5, -0.00005};
+  for (unsigned seed = 0; seed < 4000; ++seed) {
+    std::mt19937 random(seed);
+    Ring ring(1 + random() % 8);
+    for (Point2D<double>& point : ring) {
+      point = {values[random() % std::size(values)], values[random() % std::size(values)]};
+      if (random() % 2 == 0) point.x += static_cast<double>(random() % 100) / 7;
+    }
+    ASSERT_TRUE(AreScannable(ring));
+    for (const SpanRows& rows :
+         {ScanPolygon(ring, ScanRules::kTold, 50), ScanPolygon(ring, ScanRules::kSteady, 50),
+          ScanCenters(ring, 50), ScanTouched(ring, false, 50), ScanTouched(ring, true, 50),
+          ScanTouchedLine(ring, 50), ScanLine(ring, 50), ScanPoints(ring, 50)}) {
+      if (rows.IsEmpty()) continue;
+      ASSERT_LT(rows.LastRow(), 50) << "seed " << seed;
+      ASSERT_GE(rows.FirstRow(), 0) << "seed " << seed;
+      for (std::int64_t row = 0; row < 50; ++row) {
+        for (auto span = rows.Begin(row); span != rows.End(row); ++span) {
+          ASSERT_LE(span->first, span->last) << "seed " << seed;
+        }
+      }
+    }
+  }
+}
+
 /// The pixels of a line, step by step.
 std::vector<std::string> Drawn(const Ring& line, int width, int height) {
   std::vector<std::string> picture(static_cast<std::size_t>(height),
