@@ -4,6 +4,7 @@ import argparse
 import multiprocessing
 import os
 import pathlib
+import shutil
 import statistics
 import subprocess
 import sys
@@ -265,8 +266,113 @@ def polygons(bench):
                       [made, theirs])
 
 
+def make_shapes(path, size, side):
+    """side x side five-cornered shapes of a scene, each reaching into its neighbours."""
+    from osgeo import ogr, osr
+    system = osr.SpatialReference()
+    system.ImportFromEPSG(32633)
+    out = ogr.GetDriverByName("GPKG").CreateDataSource(str(path))
+    layer = out.CreateLayer("shapes", system, ogr.wkbPolygon)
+    layer.CreateField(ogr.FieldDefn("class", ogr.OFTInteger))
+    layer.StartTransaction()
+    step = 30 * size / side
+    for number in range(side * side):
+        # Off the grid by a little, so that no edge passes through the centre of a pixel.
+        x, y = 600000.3712 + number % side * step, 4999999.5831 - number // side * step
+        corners = ((0.1, 0), (1.3, 0.1), (1.5, 1.2), (0.4, 1.4), (-0.1, 0.7))
+        ring = ", ".join(f"{x + a * step} {y - b * step}" for a, b in (*corners, corners[0]))
+        feature = ogr.Feature(layer.GetLayerDefn())
+        feature.SetField(0, number % 251)
+        feature.SetGeometry(ogr.CreateGeometryFromWkt(f"POLYGON(({ring}))"))
+        layer.CreateFeature(feature)
+    layer.CommitTransaction()
+
+
+def make_coast(path, size, vertices):
+    """One polygon with a ragged border."""
+    import math
+    import random
+    from osgeo import ogr, osr
+    random.seed(4)
+    system = osr.SpatialReference()
+    system.ImportFromEPSG(32633)
+    ring = []
+    for number in range(vertices):
+        angle = 2 * math.pi * number / vertices
+        radius = 14 * size * (0.7 + 0.2 * math.sin(7 * angle) + 0.02 * math.sin(3001 * angle) + 0.001 * random.random())
+        ring.append(f"{600000 + 15 * size + radius * math.cos(angle)} {5000000 - 15 * size + radius * math.sin(angle)}")
+    out = ogr.GetDriverByName("GPKG").CreateDataSource(str(path))
+    layer = out.CreateLayer("coast", system, ogr.wkbPolygon)
+    layer.CreateField(ogr.FieldDefn("class", ogr.OFTInteger))
+    feature = ogr.Feature(layer.GetLayerDefn())
+    feature.SetField(0, 7)
+    feature.SetGeometry(ogr.CreateGeometryFromWkt(f"POLYGON(({', '.join([*ring, ring[0]])}))"))
+    layer.CreateFeature(feature)
+
+
+def zones(bench):
+    """12,769 polygons that overlap: drawn into a raster, and as zones of six bands."""
+    size = bench.options.size
+    shapes = bench.work / f"shapes-{size}.gpkg"
+    if not shapes.exists():
+        maker = multiprocessing.get_context("spawn").Process(target=make_shapes, args=(shapes, size, 113))
+        maker.start()
+        maker.join()
+    scene = bench.scene("Byte", "tiled")
+    drawn, theirs = bench.work / "drawn.tif", bench.work / "gdal-drawn.tif"
+    ours = [bench.vexg, "rasterize", shapes, drawn, "--like", scene, "--field", "class", "-q"]
+    peer = ["gdal_rasterize", "-q", "-a", "class", "-ot", "Byte", "-te", 600000, 5000000 - 30 * size,
+            600000 + 30 * size, 5000000, "-ts", size, size, shapes, theirs]
+    for path in (drawn, theirs):
+        path.unlink(missing_ok=True)
+    bench.once(ours)
+    bench.once(peer)
+    sums = [subprocess.run(["gdalinfo", "-checksum", path], capture_output=True, text=True, check=True)
+            .stdout.split("Checksum=")[1].split()[0] for path in (drawn, theirs)]
+    if sums[0] != sums[1]:
+        raise SystemExit(f"{drawn} and {theirs} differ")
+    bench.compare("12,769 polygons to pixels", ours, {"gdal_rasterize": peer}, 0.7, [drawn, theirs])
+
+    one = bench.work / f"one-{size}.gpkg"
+    if not one.exists():
+        maker = multiprocessing.get_context("spawn").Process(target=make_coast, args=(one, size, 1_000_000))
+        maker.start()
+        maker.join()
+    swap = lambda command: [one if word == shapes else word for word in command]
+    bench.compare("1,000,000 vertices to pixels", swap(ours), {"gdal_rasterize": swap(peer)}, 0.7, [drawn, theirs])
+
+    table, other = bench.work / "zones.csv", bench.work / "otb-zones.gpkg"
+    peers = {}
+    if shutil.which("otbcli_ZonalStatistics"):
+        peers["otbcli_ZonalStatistics"] = [
+            "otbcli_ZonalStatistics", "-in", scene, "-inzone", "vector", "-inzone.vector.in", shapes, "-out",
+            "vector", "-out.vector.filename", other]
+    if shutil.which("grass"):
+        peers["GRASS"] = grass_zones(bench, shapes, scene)
+    bench.compare("12,769 zones of 6 bands", [bench.vexg, "zonal", scene, shapes, "-o", table, "-q"], peers, 0.3,
+                  [table, other])
+    for stats in (["--weights", "coverage"], ["--stats", "median,p10,p90,majority"]):
+        bench.compare(f"zones, {stats[1]}"[:34], [bench.vexg, "zonal", scene, shapes, "-o", table, "-q", *stats], {},
+                      clean=[table])
+
+
+def grass_zones(bench, shapes, scene):
+    """r.univar with zones, band after band, of a scene that is linked and shapes that are imported first."""
+    place = bench.work / "grass"
+    quiet = {"stdout": subprocess.DEVNULL, "stderr": subprocess.DEVNULL, "check": True}
+    if not place.exists():
+        run = ["grass", place / "PERMANENT", "--exec"]
+        subprocess.run(["grass", "-c", scene, "-e", place], **quiet)
+        subprocess.run([*run, "r.external", f"input={scene.resolve()}", "output=scene"], **quiet)
+        subprocess.run([*run, "v.in.ogr", f"input={shapes.resolve()}", "output=shapes", "-c"], **quiet)
+    steps = ["g.region raster=scene.1", "v.to.rast input=shapes output=zones use=cat --overwrite"]
+    steps += [f"r.univar -t map=scene.{band + 1} zones=zones output={bench.work.resolve()}/univar{band}.csv --overwrite"
+              for band in range(BANDS)]
+    return ["sh", "-c", f"grass {place / 'PERMANENT'} --exec sh -c '{' && '.join(steps)}' 2>/dev/null"]
+
+
 SECTIONS = {"stats": stats, "hist": hist, "calibrate": calibrate, "pyramid": pyramid, "warp": warp,
-            "polygons": polygons, "memory": memory}
+            "polygons": polygons, "zones": zones, "memory": memory}
 
 
 def main():

@@ -163,6 +163,7 @@ class GdalVectorSink final : public VectorRecordSink {
 
  private:
   bool MakeLayer(const VectorLayer& layer);
+  bool SetShape(const VectorRecord& record);
   bool SetValues(const VectorRecord& record);
   bool TakePlace() const;
   std::string WorkName() const { return (fs::path(folder_) / fs::path(path_).filename()).string(); }
@@ -184,6 +185,7 @@ class GdalVectorSink final : public VectorRecordSink {
   OGRLayerH layer_ = nullptr;
   gdal::FeaturePtr feature_;
   ShapeBytes shape_;
+  bool hasShapes_ = true;
   bool isFailed_ = false;
 };
 
@@ -206,10 +208,16 @@ bool GdalVectorSink::Begin(const VectorLayer& layer) {
 
 bool GdalVectorSink::MakeLayer(const VectorLayer& layer) {
   CPLStringList options;
-  for (const char* const option : format_.options) options.AddString(option);
+  hasShapes_ = layer.hasShapes;
+  if (hasShapes_) {
+    for (const char* const option : format_.options) options.AddString(option);
+  } else {
+    options.AddString("STRING_QUOTING=IF_NEEDED");  // of a table alone, for those who read it
+  }
   OGRSpatialReferenceH const system = gdal::MakeSpatialReference(layer.coordSys);
   layer_ = GDALDatasetCreateLayer(dataset_.get(), layer.name.c_str(), system,
-                                  gdal::LayerTypeOf(layer.geometry), options.List());
+                                  hasShapes_ ? gdal::LayerTypeOf(layer.geometry) : wkbNone,
+                                  options.List());
   if (system != nullptr) OSRRelease(system);
   if (layer_ == nullptr) return false;
   for (const VectorField& field : layer.fields) {
@@ -238,19 +246,27 @@ bool GdalVectorSink::SetValues(const VectorRecord& record) {
   return true;
 }
 
+/// Gives the feature the shape of a record; none to one without parts.
+bool GdalVectorSink::SetShape(const VectorRecord& record) {
+  if (!hasShapes_) return true;
+  OGRGeometryH shape = nullptr;
+  if (!record.partEnds.empty()) {
+    const std::vector<unsigned char>& bytes = shape_.Make(record);
+    if (OGR_G_CreateFromWkb(bytes.data(), nullptr, &shape, static_cast<int>(bytes.size())) !=
+        OGRERR_NONE) {
+      return false;
+    }
+  }
+  return OGR_F_SetGeometryDirectly(feature_.get(), shape) == OGRERR_NONE;
+}
+
 bool GdalVectorSink::Write(const VectorRecord& record) {
   if (isFailed_ || dataset_ == nullptr) return false;
   const Messages messages;
-  const std::vector<unsigned char>& bytes = shape_.Make(record);
-  OGRGeometryH shape = nullptr;
-  if (OGR_G_CreateFromWkb(bytes.data(), nullptr, &shape, static_cast<int>(bytes.size())) !=
-      OGRERR_NONE) {
-    return Fail(messages);
-  }
+  if (!SetShape(record)) return Fail(messages);
   SetValues(record);
   OGR_F_SetFID(feature_.get(), record.id < 0 ? OGRNullFID : record.id);
-  if (OGR_F_SetGeometryDirectly(feature_.get(), shape) != OGRERR_NONE ||
-      OGR_L_CreateFeature(layer_, feature_.get()) != OGRERR_NONE || messages.HasError()) {
+  if (OGR_L_CreateFeature(layer_, feature_.get()) != OGRERR_NONE || messages.HasError()) {
     return Fail(messages);
   }
   return true;

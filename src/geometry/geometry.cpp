@@ -143,9 +143,12 @@ bool GeometryRecord::SetPoints(std::uint32_t part, Point2DArray<double> points) 
   return true;
 }
 
-MemoryGeometry::MemoryGeometry(const lumo::CoordSys& coordSys) : WritableGeometry(coordSys) {}
+MemoryGeometry::MemoryGeometry(const lumo::CoordSys& coordSys) : WritableGeometry(coordSys) {
+  CountChanges();
+}
 
 MemoryGeometry::MemoryGeometry(const MemoryGeometry& other) : WritableGeometry(other) {
+  CountChanges();
   const QueuingRWMutexLock lock(other.mutex_, false);
   nextRecord_ = other.nextRecord_;
   for (const GeometryRecordPtr& record : other.records_) {
@@ -277,41 +280,40 @@ void MemoryGeometry::Clear() {
   Changed();
 }
 
-bool MemoryGeometry::AddPart(std::uint32_t record, bool hole, std::uint32_t& id,
-                             const Array<Point2D<double>>& points) {
+/// Runs a change of a record under the lock, and counts it.
+template <typename Change>
+bool MemoryGeometry::ChangeRecord(std::uint32_t record, Change&& change) {
   const QueuingRWMutexLock lock(mutex_, false);
   GeometryRecord* const found = Find(record);
-  bool isAdded = false;
-  return found != nullptr &&
-         detail::Guarded(*this,
-                         [&] {
-                           Point2DArray<double> vertices = ToPoints(points);
-                           isAdded = found->AddPart(hole, id, &vertices);
-                         }) &&
-         isAdded;
+  bool hasChanged = false;
+  if (found == nullptr || !detail::Guarded(*this, [&] { hasChanged = change(*found); })) {
+    return false;
+  }
+  if (hasChanged) NoteChange();
+  return hasChanged;
+}
+
+bool MemoryGeometry::AddPart(std::uint32_t record, bool hole, std::uint32_t& id,
+                             const Array<Point2D<double>>& points) {
+  return ChangeRecord(record, [&](GeometryRecord& found) {
+    Point2DArray<double> vertices = ToPoints(points);
+    return found.AddPart(hole, id, &vertices);
+  });
 }
 
 bool MemoryGeometry::AddPart(std::uint32_t record, bool hole, std::uint32_t& id) {
-  const QueuingRWMutexLock lock(mutex_, false);
-  GeometryRecord* const found = Find(record);
-  bool isAdded = false;
-  return found != nullptr &&
-         detail::Guarded(*this, [&] { isAdded = found->AddPart(hole, id, nullptr); }) && isAdded;
+  return ChangeRecord(record,
+                      [&](GeometryRecord& found) { return found.AddPart(hole, id, nullptr); });
 }
 
 bool MemoryGeometry::RemovePart(std::uint32_t record, std::uint32_t part) {
-  const QueuingRWMutexLock lock(mutex_, false);
-  GeometryRecord* const found = Find(record);
-  return found != nullptr && found->RemovePart(part);
+  return ChangeRecord(record, [&](GeometryRecord& found) { return found.RemovePart(part); });
 }
 
 bool MemoryGeometry::SetCoordinates(std::uint32_t record, std::uint32_t part,
                                     const Array<Point2D<double>>& points) {
-  const QueuingRWMutexLock lock(mutex_, false);
-  GeometryRecord* const found = Find(record);
-  bool isSet = false;
-  return found != nullptr &&
-         detail::Guarded(*this, [&] { isSet = found->SetPoints(part, ToPoints(points)); }) && isSet;
+  return ChangeRecord(
+      record, [&](GeometryRecord& found) { return found.SetPoints(part, ToPoints(points)); });
 }
 
 GeometryPtr ProjectedGeometry::Clone() const {

@@ -1,6 +1,8 @@
 #pragma once
 
+#include <atomic>
 #include <cstdint>
+#include <memory>
 
 #include "foundation/containers.h"
 #include "foundation/locks.h"
@@ -62,17 +64,35 @@ class VEXG_EXPORT Geometry : public Object {
   const lumo::CoordSys& CoordSys() const { return coordSys_; }
   /// How often records were added or taken away.
   std::uint32_t Revision() const { return revision_; }
+  /// How often anything has changed: records, parts or vertices.
+  /// @return false where the class does not count that.
+  bool ReadChanges(std::uint64_t& changes) const {
+    if (changes_) changes = *changes_;
+    return changes_ != nullptr;
+  }
 
  protected:
   explicit Geometry(const lumo::CoordSys& coordSys) : coordSys_(coordSys) {}
   Geometry(const Geometry& other) : Object(other), coordSys_(other.coordSys_) {}
   Geometry& operator=(const Geometry&) = delete;
 
-  void Changed() { ++revision_; }
+  void Changed() {
+    ++revision_;
+    NoteChange();
+  }
+  /// Counts a change of a part or of vertices.
+  void NoteChange() {
+    if (changes_) ++*changes_;
+  }
+  /// Begins to count changes, which the class then notes without exception.
+  void CountChanges() { changes_ = std::make_shared<std::atomic<std::uint64_t>>(0); }
+  /// Takes the changes of another geometry for its own.
+  void ShareChanges(const Geometry& other) { changes_ = other.changes_; }
 
  private:
   lumo::CoordSys coordSys_;
-  std::uint32_t revision_ = 0;
+  std::atomic<std::uint32_t> revision_ = 0;
+  std::shared_ptr<std::atomic<std::uint64_t>> changes_;
 };
 
 /// Vector data that can be changed. Each change raises the revision that it belongs to.
@@ -222,6 +242,8 @@ class VEXG_EXPORT MemoryGeometry final : public WritableGeometry {
   GeometryRecord* Find(std::uint32_t record) const;
   template <typename Read>
   bool ReadPart(std::uint32_t record, std::uint32_t part, Read&& read) const;
+  template <typename Change>
+  bool ChangeRecord(std::uint32_t record, Change&& change);
 
   Deque<GeometryRecordPtr> records_;
   std::uint32_t nextRecord_ = 0;
@@ -240,7 +262,9 @@ class VEXG_EXPORT ProjectedGeometry final : public Geometry {
   /// @param inner   is shared, and not empty.
   /// @param target  the system in which coordinates are given.
   ProjectedGeometry(const GeometryPtr& inner, const lumo::CoordSys& target)
-      : Geometry(target), inner_(inner) {}
+      : Geometry(target), inner_(inner) {
+    ShareChanges(*inner_);
+  }
   bool IsA(unsigned typeCode) const override;
 
   /// Another view on the same inner geometry.

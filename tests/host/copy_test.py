@@ -61,7 +61,7 @@ class Copy(PipeTest, CopyTest):
 
     def test_parts_and_bands_in_any_order(self):
         target = self.output / "part.tif"
-        self.fine("copy", DATA / "landsat7_u16_tiled.tif", target, "--rect", "10,20,109,69", "--bands", "3,0",
+        self.fine("copy", DATA / "landsat7_u16_tiled.tif", target, "-q", "--rect", "10,20,109,69", "--bands", "3,0",
                   "--interleave", "bip")
         self.assertEqual(gdal_pixels(target),
                          gdal_pixels(DATA / "landsat7_u16_tiled.tif", "-srcwin", "10", "20", "100", "50", "-b", "4", "-b", "1"))
@@ -206,7 +206,7 @@ class Failures(PipeTest, CopyTest):
                     self.assertIn("vexg: interrupted; nothing was written", err.splitlines()[-1])
                     self.assertEqual(list(self.output.iterdir()), [])
         # The server goes on.
-        self.fine("copy", source, self.output / "o.dat", "--rect", "0,0,9,9", "--server", "test")
+        self.fine("copy", source, self.output / "o.dat", "-q", "--rect", "0,0,9,9", "--server", "test")
 
 
 class Server(PipeTest, CopyTest):

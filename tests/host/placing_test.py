@@ -50,7 +50,7 @@ class Placing(FolderTest):
             for ending in (".tif", ".dat"):
                 with self.subTest(model=name, format=ending):
                     part = self.folder / ("part" + ending)
-                    code, _, err = run("copy", str(source), str(part), "--rect", "100,50,299,249", "--overwrite")
+                    code, _, err = run("copy", str(source), str(part), "-q", "--rect", "100,50,299,249", "--overwrite")
                     # The flat format has no room for further items, which a camera's file may have.
                     self.assertEqual(code, 0, err)
                     self.assertRegex(err, r"\A(vexg: \S+ note: the format ORVA does not keep the metadata items\n)?\Z")
@@ -62,7 +62,7 @@ class Placing(FolderTest):
     def test_the_camera_of_a_part_counts_from_it(self):
         source = self.translate("both.tif", *CORNERS, "300000", "4640000", "310470", "4629440")
         part = self.folder / "part.tif"
-        self.fine("copy", source, part, "--rect", "100,50,299,249")
+        self.fine("copy", source, part, "-q", "--rect", "100,50,299,249")
         told = subprocess.run(["gdalinfo", part], capture_output=True, text=True, check=True).stdout
         self.assertIn("LINE_OFF=762\n", told)
         self.assertIn("SAMP_OFF=750\n", told)
@@ -91,13 +91,13 @@ class Placing(FolderTest):
             told = subprocess.run(["gdalinfo", copy], capture_output=True, text=True, check=True).stdout
             self.assertIn(f"Pixel Size = ({size}.0", told)
         part = self.folder / "part.tif"
-        self.fine("copy", scene, part, "--level", "3", "--rect", "10,20,59,79")
+        self.fine("copy", scene, part, "--level", "3", "-q", "--rect", "10,20,59,79")
         told = subprocess.run(["gdalinfo", part], capture_output=True, text=True, check=True).stdout
         self.assertIn("Size is 50, 60", told)
         self.assertIn("Pixel Size = (240.0", told)
         self.assertIn("Origin = (302400.0", told)
         self.fine("read", part, "-o", self.folder / "part.npy")
-        self.fine("read", scene, "-o", self.folder / "scene.npy", "--rect", "80,160,479,639")
+        self.fine("read", scene, "-o", self.folder / "scene.npy", "-q", "--rect", "80,160,479,639")
         pixels, whole = read_npy(self.folder / "part.npy")[2], read_npy(self.folder / "scene.npy")[2]
         self.assertEqual(pixels, b"".join(whole[y * 400:(y + 1) * 400:8] for y in range(0, 480, 8)))
         printed = self.fine("read", scene, "--level", "8", "-o", self.folder / "o.npy", "--print-job")

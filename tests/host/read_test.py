@@ -32,7 +32,7 @@ class Blocks(FolderTest):
         self.file = write_orva(self.folder / "large", width, height, bands, self.pixels)
 
     def read(self, *options):
-        self.fine("read", self.file, "-o", self.folder / "out.npy", "--overwrite", *options)
+        self.fine("read", self.file, "-o", self.folder / "out.npy", "--overwrite", "-q", *options)
         return read_npy(self.folder / "out.npy")
 
     def test_all_orders(self):
@@ -55,7 +55,7 @@ class Blocks(FolderTest):
         self.assertEqual(self.read("--rect", "5,6,5,6")[1:], ((1, 1, 4), part(self.pixels, width, bands, (5, 6, 5, 6))))
 
     def test_a_line_as_picture(self):
-        self.fine("read", self.file, "-o", self.folder / "out.png", "--rect", "0,0,99,1")
+        self.fine("read", self.file, "-o", self.folder / "out.png", "-q", "--rect", "0,0,99,1")
         self.assertEqual(read_png(self.folder / "out.png"), (100, 2, 4, part(self.pixels, 3000, 4, (0, 0, 99, 1))))
 
     def test_progress_ends_at_one(self):
@@ -86,7 +86,7 @@ class Read(PipeTest, FolderTest):
 
     def test_parts_of_tiles(self):
         self.fine("read", DATA / "landsat7_u16_tiled.tif", "-o", self.folder / "o.npy",
-                  "--rect", "60,100,200,300", "--bands", "4,1,1")
+                  "-q", "--rect", "60,100,200,300", "--bands", "4,1,1")
         descr, shape, data = read_npy(self.folder / "o.npy")
         self.assertEqual((descr, shape), ("<u2", (201, 141, 3)))
         self.assertEqual(data, gdal_pixels(DATA / "landsat7_u16_tiled.tif", "-srcwin", "60", "100", "141", "201",
@@ -111,7 +111,8 @@ class Read(PipeTest, FolderTest):
         self.assertEqual(read_png(self.folder / "o.png"), (349, 352, 3, bytes(swapped)))
 
     def test_a_printed_job_fills_memory_that_its_runner_makes(self):
-        job = self.fine("read", DATA / "rgb1.tif", "-o", self.folder / "o.npy", "--print-job", "--rect", "10,20,29,39")
+        job = self.fine("read", DATA / "rgb1.tif", "-o", self.folder / "o.npy", "--print-job", "-q", "--rect",
+                        "10,20,29,39")
         self.assertFalse((self.folder / "o.npy").exists())
         inputs = {}
         for element in ElementTree.fromstring(job).iter("Input"):

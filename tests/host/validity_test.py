@@ -250,7 +250,7 @@ yOff="0" xSize="20" ySize="20"/><DstRect xOff="0" yOff="0" xSize="20" ySize="20"
     def test_parts_and_other_orders_of_bands_go_with_them(self):
         source = self.source("<GCPList Projection='EPSG:4326'><GCP Id='1' Pixel='7' Line='9' X='10' Y='20'/>"
                              "</GCPList>")
-        self.fine("copy", source, self.folder / "o.tif", "--rect", "5,6,15,16", "--bands", "1,0", "--strict")
+        self.fine("copy", source, self.folder / "o.tif", "-q", "--rect", "5,6,15,16", "--bands", "1,0", "--strict")
         info = self.info(self.folder / "o.tif")
         self.assertIn("(2,3) -> (10,20,0)", info)
         self.assertLess(info.index("Description = green"), info.index("Description = red one"))
@@ -301,7 +301,7 @@ class Damage(FolderTest):
                     self.assertIn(path.name, err)
                     self.assertFalse((self.folder / line[-1]).exists() and line[0] != "stats")
         # The lines before the damage can be read.
-        self.fine("read", files[0], "-o", self.folder / "top.npy", "--rect", "0,0,99,19")
+        self.fine("read", files[0], "-o", self.folder / "top.npy", "-q", "--rect", "0,0,99,19")
 
     def test_harmless_warnings_stay_so(self):
         data = (DATA / "landsat7_rgb.jpg").read_bytes()

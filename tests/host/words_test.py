@@ -33,7 +33,7 @@ class Words(FolderTest):
         for bands in (["2,0"], ["2", "0"], ["2, 0"], ["2 0"], ["2,", "0"]):
             for arguments in (["--bands", *bands, raster], [raster, "--bands", *bands]):
                 out = self.folder / "out.npy"
-                self.fine("read", *arguments, "-o", out, "--overwrite", "--rect", "0", "0", "1", "0")
+                self.fine("read", *arguments, "-o", out, "--overwrite", "-q", "--rect", "0", "0", "1", "0")
                 want = want or read_npy(out)
                 self.assertEqual(read_npy(out), want, arguments)
         self.assertEqual(want[2], bytes((2, 0, 5, 3)))

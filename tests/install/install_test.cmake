@@ -46,3 +46,19 @@ foreach(line "TIFF +raster +libvexgdal.so +yes +yes" "Plane +raster +libvexgform
     message(FATAL_ERROR "vexg formats has no line ${line}:\n${output}")
   endif()
 endforeach()
+
+# A view and its command from outside work on a raster of the installed plug-ins.
+file(WRITE ${BUILD}/install-test/mirror.xml [[<Job>
+  <Command Name="open" ID="OpenRasterCommand">
+    <Input ConnStr="plane:5x1"/><Output URI="$plane"/></Command>
+  <Command Name="mirror" ID="ExampleMirrorCommand">
+    <DependsOn Name="open"/><Input SrcURI="$plane"/><Output URI="$mirror"/></Command>
+  <Command Name="stats" ID="GetBasicRasterStatsCommand">
+    <DependsOn Name="mirror"/><Input URI="$mirror"/></Command>
+</Job>
+]])
+run(${prefix}/bin/vexg --load ${BUILD}/install-test/consumer/libmirror.so run
+    ${BUILD}/install-test/mirror.xml)
+if(NOT output MATCHES "Max=\"1 *\\[4 \\] *\"|Max=\"[^\"]*4")
+  message(FATAL_ERROR "the mirrored plane has other statistics:\n${output}")
+endif()

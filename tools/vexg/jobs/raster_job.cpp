@@ -38,7 +38,7 @@ void RasterJobOptions::AddProgressTo(OptionSet& line) {
   line.Add("--progress", progress, "How progress shows on standard error")
       .Takes(OneOf({"auto", "bar", "json", "none"}))
       .ShowsDefault();
-  line.Add("--quiet,-q", quiet, "Show no progress");
+  line.Add("--quiet,-q", quiet, "Show neither progress nor where the area lies");
 }
 
 JobDraft::JobDraft() : root_("Job") {

@@ -20,7 +20,26 @@ void FileVerb::AddLastOptions(OptionSet& line) {
 std::vector<std::string> FileVerb::GetInputs() const {
   std::vector<std::string> inputs = GetFurtherInputs();
   inputs.push_back(source_.file);
+  for (const std::string& file : area_.GetFiles()) inputs.push_back(file);
   return inputs;
+}
+
+RasterInfo FileVerb::PlanArea(JobSession& session, const OpenRaster& whole) {
+  const RasterInfo info = area_.Plan(session, whole.uri, whole.info, source_.file);
+  const std::string area = area_.Describe(whole.info);
+  if (!area.empty() && !job_.quiet) Say(source_.file + ": " + area);
+  return info;
+}
+
+FileVerb::OpenRaster FileVerb::ShowArea(JobSession& session, const OpenRaster& whole) {
+  if (!area_.IsGiven()) return whole;
+  const RasterInfo info = PlanArea(session, whole);
+  JobDraft draft;
+  RasterChain chain(draft, whole.uri);
+  area_.AddViews(chain);
+  const std::string top = chain.GetTop().ToUTF8();
+  if (!top.starts_with('$')) return {whole.uri, info};  // all of it
+  return {session.Run(draft).Find(String(top.substr(1))).returns.Find("URI"), info};
 }
 
 /// Refuses outputs that are what the sources turned out to be.
@@ -34,6 +53,7 @@ void FileVerb::RefuseOpened(const JobDraft& draft, const JobResults& opened,
 }
 
 int FileVerb::Run() {
+  area_.Check();
   CheckOptions();
   JobSession session(job_);
   session.GetInterruption().SetLast();

@@ -5,6 +5,7 @@
 #include <vector>
 
 #include "output/output_file.h"
+#include "rasters/area_options.h"
 #include "rasters/raster_source.h"
 #include "verb.h"
 
@@ -52,6 +53,12 @@ class FileVerb {
   /// @param replaced  what it lets replace, for the help.
   void AddOverwriteTo(OptionSet& line, const char* replaced);
 
+  /// Adds the options that choose the pixels that the verb works on.
+  /// @param noDataOption  see AreaOptions.
+  void AddAreaTo(OptionSet& line, const char* noDataOption = "--no-data") {
+    area_.AddTo(line, noDataOption);
+  }
+
   virtual void CheckOptions() {}
   /// The files to make, as the user names them.
   virtual std::vector<std::string> GetOutputs() const { return {}; }
@@ -74,16 +81,31 @@ class FileVerb {
   /// Gives the line for standard error, made before anything changes.
   virtual std::string Remark() const { return {}; }
 
+  /// A raster that is open.
+  struct OpenRaster {
+    String uri;
+    RasterInfo info;
+  };
+  /// Finds the area of a raster, and says where it lies unless the user wants it quiet.
+  /// @return what shows the area is like that.
+  RasterInfo PlanArea(JobSession& session, const OpenRaster& whole);
+  /// Opens what shows the area of a raster, which stays open; gives the raster itself where the
+  /// command line names no area.
+  OpenRaster ShowArea(JobSession& session, const OpenRaster& whole);
+
   const SourceOptions& GetSource() const { return source_; }
   SourceOptions& GetSource() { return source_; }
   ProgressStyle GetProgressStyle() const { return job_.GetProgressStyle(); }
   const RasterJobOptions& GetJobOptions() const { return job_; }
+  const AreaOptions& GetArea() const { return area_; }
+  AreaOptions& GetArea() { return area_; }
 
  private:
   std::vector<std::string> GetInputs() const;
   void RefuseOpened(const JobDraft& draft, const JobResults& opened, Outputs& outputs) const;
 
   SourceOptions source_;
+  AreaOptions area_;
   RasterJobOptions job_;
   bool overwrite_ = false;
   bool isDurable_ = false;

@@ -4,21 +4,12 @@
 
 namespace lumo::host {
 
-JobWriterCommand& RasterChain::AddView(const std::string& name, const char* command) {
-  JobWriterCommand& view = draft_.Open(name, command);
-  view.AddVariableInput("SrcURI", GetTop());
-  Take(name);
-  return view;
-}
-
-void RasterChain::Close() {
-  for (auto raster = opened_.rbegin(); raster != opened_.rend(); ++raster) {
-    draft_.Close("close." + raster->ToUTF8().substr(1), *raster);
-  }
-}
-
 void RasterVerb::AddFilesTo(OptionSet& line, const std::string& meaning) {
   GetSource().AddTo(line);
+  AddOutputTo(line, meaning);
+}
+
+void RasterVerb::AddOutputTo(OptionSet& line, const std::string& meaning) {
   target_.AddTo(line, meaning);
   AddOverwriteTo(line, "files that are there");
 }
@@ -53,7 +44,14 @@ void RasterVerb::AddOpening(JobDraft& draft) const {
 }
 
 void RasterVerb::Plan(JobSession& session, const JobResults& opened) {
-  planned_ = PlanRaster(session, opened, ReadInfo(opened, kShown));
+  RasterInfo source = ReadInfo(opened, kShown);
+  if (GetArea().IsGiven()) {
+    JobDraft draft;
+    RasterChain chain(draft);
+    AddSource(chain);
+    source = PlanArea(session, {URIOf(opened, chain.GetTop()), source});
+  }
+  planned_ = PlanRaster(session, opened, source);
 }
 
 std::uint64_t RasterVerb::GetBytes(std::size_t /*output*/) const {
@@ -65,6 +63,7 @@ JobDraft RasterVerb::MakeDraft(const std::string& file, const FillValues& noData
   JobDraft draft;
   RasterChain chain(draft);
   AddSource(chain);
+  GetArea().AddViews(chain);
   AddViews(chain);
   const String shown = chain.GetTop();
   AddQuery(draft, kShown, shown);

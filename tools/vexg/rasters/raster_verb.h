@@ -5,33 +5,9 @@
 
 #include "output/keeping.h"
 #include "rasters/file_verb.h"
+#include "rasters/raster_chain.h"
 
 namespace lumo::host {
-
-/// Rasters of a job that stand on one another, from the source upwards.
-class RasterChain {
- public:
-  explicit RasterChain(JobDraft& draft) : draft_(draft) {}
-
-  /// The variable of the uppermost raster.
-  const String& GetTop() const { return opened_.back(); }
-
-  /// Adds the command that stands a view on the uppermost raster. Further inputs are the caller's.
-  /// @param name  of the variable, without "$".
-  JobWriterCommand& AddView(const std::string& name, const char* command);
-
-  /// Takes a raster in that other commands of the draft have opened, as the uppermost.
-  void Take(const std::string& name) { opened_.emplace_back("$" + name); }
-
-  JobDraft& GetDraft() { return draft_; }
-
-  /// Adds the commands that close all, the uppermost first.
-  void Close();
-
- private:
-  JobDraft& draft_;
-  std::vector<String> opened_;
-};
 
 /// A verb that makes a raster file out of a raster.
 ///
@@ -70,6 +46,8 @@ class RasterVerb : public FileVerb {
   /// Leaves that to a verb that has something in front of them.
   RasterVerb() = default;
   void AddFilesTo(OptionSet& line, const std::string& meaning);
+  /// Adds the output alone.
+  void AddOutputTo(OptionSet& line, const std::string& meaning);
 
   // A verb says what is made:
 

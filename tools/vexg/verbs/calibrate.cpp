@@ -224,6 +224,7 @@ class CalibrateVerb final : public RasterVerb {
     line.AddExample(
         "vexg calibrate reflectance scene.tif reflectance.tif --gain 0.76,0.8,0.62 --offset "
         "-1.5,-2.8,-1.2 --irradiance 1970,1843,1555 --sun-elevation 49.6 --distance 1.012");
+    AddAreaTo(line);
     line.Add("--from-metadata", options_.metadata,
              "Takes what isn't given here from the metadata of this file, and says what it "
              "took")

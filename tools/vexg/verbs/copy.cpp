@@ -23,10 +23,7 @@ class CopyVerb final : public RasterVerb {
         "palettes, names, units and scales of bands and metadata items, as far as its format can; "
         "what it can't is said, and with --strict a failure.");
     line.AddExample("vexg copy scene.tif part.dat --format ORVA --rect 0,0,99,49 --bands 2,1,0");
-    line.Add("--rect", rectText_,
-             "Pixels: left,top,right,bottom, from 0, inclusive; all by default")
-        .Shows("L,T,R,B")
-        .Example("0,0,511,511");
+    AddAreaTo(line);
     line.Add("--bands", bandsText_, "Bands in the order wanted, from 0; all by default")
         .Shows("B,B...")
         .Example("3,2,1");
@@ -60,16 +57,12 @@ class CopyVerb final : public RasterVerb {
                                               "change their type to {}",
                                               DataTypeName(source.dataType).ToUTF8(), type_));
     }
-    rect_ = ParseRect(rectText_, source);
-    isPart_ = !(rect_ == source.GetRect());
     bands_ = ParseBands(bandsText_, source);
     ReadPalettes(session,
                  level_ == 0 ? opened.Find("source").returns.Find("URI")
                              : opened.Find("level").returns.Find("PyramidURI"),
                  source);
     RasterInfo planned = source;
-    planned.samples = rect_.Width();
-    planned.lines = rect_.Height();
     planned.bands = bands_.GetCount();
     return planned;
   }
@@ -83,11 +76,6 @@ class CopyVerb final : public RasterVerb {
   }
 
   void AddViews(RasterChain& chain) const override {
-    if (isPart_) {
-      JobWriterCommand& view = chain.AddView("part", "CreateSpatialSubsetRasterCommand");
-      view.AddInput("SubRect", rect_);
-      view.AddInput("Placing", Form::kExact);
-    }
     if (!bandsText_.empty()) {
       AddBandView(chain.GetDraft(), "bands", chain.GetTop(), bands_);
       chain.Take("bands");
@@ -120,11 +108,9 @@ class CopyVerb final : public RasterVerb {
     if (GetFormat() == "JPEG") losses.Add("the values of pixels exactly");
   }
 
-  std::string rectText_, bandsText_, interleave_, type_;
+  std::string bandsText_, interleave_, type_;
   unsigned level_ = 0;  // of the source's pyramid; 0: the source itself
 
-  SubRect rect_;
-  bool isPart_ = false;  // the rectangle isn't the whole raster
   Array<unsigned> bands_;
   std::vector<BandPalette> palettes_;
 };

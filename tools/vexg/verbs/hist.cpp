@@ -100,6 +100,7 @@ class HistVerb final : public FileVerb {
     line.Add("--bands", bandsText_, "Bands, from 0; all by default")
         .Shows("B,B...")
         .Example("3,2,1");
+    AddAreaTo(line);
     line.Add("--lower", lower_, "Smallest value that counts").Shows("VALUE");
     line.Add("--upper", upper_, "Largest value that counts").Shows("VALUE");
     line.Add("--bins", binCount_, "How many bins; no more than there are whole numbers")
@@ -121,6 +122,9 @@ class HistVerb final : public FileVerb {
       throw HostError(kExitUsage, "--bin-size: the size of a bin is above 0");
     }
     if (!output_.empty()) CheckPictureName(output_);
+    if (saves_ && GetArea().IsGiven()) {
+      throw HostError(kExitUsage, "--save: the histograms of some pixels are not the raster's");
+    }
   }
 
   std::vector<std::string> GetOutputs() const override {
@@ -136,9 +140,10 @@ class HistVerb final : public FileVerb {
     AddQuery(draft, "raster", "$raster");
   }
 
-  void Plan(JobSession& /*session*/, const JobResults& opened) override {
-    raster_ = opened.Find("raster").returns.Find("URI");
-    const RasterInfo info = ReadInfo(opened, "raster");
+  void Plan(JobSession& session, const JobResults& opened) override {
+    const auto [uri, info] =
+        ShowArea(session, {URIOf(opened, "$raster"), ReadInfo(opened, "raster")});
+    raster_ = uri;
     dataType_ = info.dataType;
     bands_ = ParseBands(bandsText_, info);
     if (DispatchType(TenTypes{}, dataType_, []<typename T>() { return true; })) return;
@@ -147,10 +152,13 @@ class HistVerb final : public FileVerb {
 
   JobDraft GetJob(const Outputs& /*outputs*/) const override {
     JobDraft draft;
+    RasterChain chain(draft);
     AddOpenWithPyramid(draft, "raster", GetSource());
-    AddSteps(draft, "$raster");
+    chain.Take("raster");
+    GetArea().AddViews(chain);
+    AddSteps(draft, chain.GetTop());
     if (saves_) AddSave(draft, kSaveCommand, "$raster");
-    draft.Close("close", "$raster");
+    chain.Close();
     return draft;
   }
 

@@ -21,6 +21,7 @@ class PolygonizeVerb final : public FileVerb {
     line.Add("--mask", mask_,
              "A raster of the same size: where its first band is 0, pixels do not count")
         .IsFile();
+    AddAreaTo(line);
     line.Add("--min-size", leastPixels_,
              "Leave out polygons of fewer pixels; their places stay empty")
         .Shows("PIXELS");
@@ -39,28 +40,55 @@ class PolygonizeVerb final : public FileVerb {
   void AddOpening(JobDraft& draft) const override {
     AddOpen(draft, "source", GetSource());
     AddQuery(draft, "source", "$source");
+    if (mask_.empty() || !GetArea().IsGiven()) return;
+    AddOpen(draft, "by", {mask_, ""});
+    AddQuery(draft, "by", "$by");
+    draft.Close("close.by", "$by");
   }
 
-  void Plan(JobSession& /*session*/, const JobResults& opened) override {
+  void Plan(JobSession& session, const JobResults& opened) override {
     const RasterInfo info = ReadInfo(opened, "source");
-    if (band_ < info.bands) return;
-    throw HostError(kExitUsage, fmt::format("--band: the raster has {} bands", info.bands));
+    if (band_ >= info.bands) {
+      throw HostError(kExitUsage, fmt::format("--band: the raster has {} bands", info.bands));
+    }
+    if (GetArea().IsGiven()) {
+      CheckMask(opened, info);
+      PlanArea(session, {URIOf(opened, "$source"), info});
+    }
+  }
+
+  /// Refuses a mask of another size, which a part would not show.
+  void CheckMask(const JobResults& opened, const RasterInfo& info) const {
+    if (mask_.empty()) return;
+    const RasterInfo mask = ReadInfo(opened, "by");
+    if (mask.samples == info.samples && mask.lines == info.lines) return;
+    throw HostError(kExitFailed, mask_ + ": --mask: the mask has another size than the raster");
   }
 
   JobDraft MakeDraft(const std::string& file) const {
     JobDraft draft;
+    RasterChain chain(draft), masks(draft);
     AddOpen(draft, "source", GetSource());
-    if (!mask_.empty()) AddOpen(draft, "mask", {mask_, ""});
+    chain.Take("source");
+    GetArea().AddViews(chain);
+    if (!mask_.empty()) {
+      AddOpen(draft, "by", {mask_, ""});
+      masks.Take("by");
+      if (GetArea().IsPart()) {
+        masks.AddView("bypart", "CreateSpatialSubsetRasterCommand")
+            .AddInput("SubRect", GetArea().GetRect());
+      }
+    }
     JobWriterCommand& make = draft.Step(kMakeStep, "PolygonizeCommand");
-    make.AddVariableInput("URI", "$source");
+    make.AddVariableInput("URI", chain.GetTop());
     make.AddInput("Vectors", String(file));
     if (band_ != 0) make.AddInput("Band", band_);
-    if (!mask_.empty()) make.AddVariableInput("MaskURI", "$mask");
+    if (!mask_.empty()) make.AddVariableInput("MaskURI", masks.GetTop());
     if (leastPixels_ > 0) make.AddInput("MinSize", leastPixels_);
     if (!layer_.empty()) make.AddInput("Layer", String(layer_));
     if (!field_.empty()) make.AddInput("Field", String(field_));
-    if (!mask_.empty()) draft.Close("close.mask", "$mask");
-    draft.Close("close", "$source");
+    masks.Close();
+    chain.Close();
     return draft;
   }
 

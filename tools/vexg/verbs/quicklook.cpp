@@ -64,6 +64,7 @@ class QuicklookVerb final : public FileVerb {
              "One band, or red,green,blue; by default 2,1,0 of four bands or more, 0,1,2 of "
              "three, else 0")
         .Shows("B[,B,B]");
+    AddAreaTo(line);
     line.Add("--stretch", stretchText_,
              "Percentiles of each band that become black and white, 2,98 by default; or "
              "none, to cut values to 0 and 255")
@@ -87,8 +88,10 @@ class QuicklookVerb final : public FileVerb {
   }
 
   void Plan(JobSession& session, const JobResults& opened) override {
-    raster_ = opened.Find("raster").returns.Find("URI");
-    info_ = ReadInfo(opened, "raster");
+    const OpenRaster shown =
+        ShowArea(session, {URIOf(opened, "$raster"), ReadInfo(opened, "raster")});
+    raster_ = shown.uri;
+    info_ = shown.info;
     bands_ = ChooseBands(bandsText_, info_);
     hasPalette_ = bands_.GetCount() == 1 && info_.hasPalette[bands_[0]] && stretchText_.empty();
     shown_ = raster_;
@@ -110,12 +113,16 @@ class QuicklookVerb final : public FileVerb {
   /// Each block has memory of its own there.
   JobDraft GetJob(const Outputs& /*outputs*/) const override {
     JobDraft draft;
-    AddOpening(draft);
-    if (level_ != 0) AddLevel(draft, "level", "$raster", level_);
-    AddBlockSteps(draft, level_ != 0 ? "$level" : "$raster", info_, bands_, Interleave::BIP,
-                  picture_->GetBlocks());
-    if (level_ != 0) draft.Close("close.level", "$level");
-    draft.Close("close", "$raster");
+    RasterChain chain(draft);
+    AddOpenWithPyramid(draft, "raster", GetSource());
+    chain.Take("raster");
+    GetArea().AddViews(chain);
+    if (level_ != 0) {
+      AddLevel(draft, "level", chain.GetTop(), level_);
+      chain.Take("level");
+    }
+    AddBlockSteps(draft, chain.GetTop(), info_, bands_, Interleave::BIP, picture_->GetBlocks());
+    chain.Close();
     return draft;
   }
 

@@ -82,9 +82,7 @@ class ReadVerb final : public FileVerb {
         "bands as they are.");
     line.AddExample("vexg read scene.tif --rect 0,0,99,49 --bands 2,1,0 -o part.npy");
     line.Add("--output,-o", output_, "The .npy or .png file").IsFile("OUT").Required();
-    line.Add("--rect", rect_, "Pixels: left,top,right,bottom, from 0, inclusive; all by default")
-        .Shows("L,T,R,B")
-        .Example("0,0,511,511");
+    AddAreaTo(line);
     line.Add("--bands", bands_, "Bands in the order wanted, from 0; all by default")
         .Shows("B,B...")
         .Example("3,2,1");
@@ -115,24 +113,30 @@ class ReadVerb final : public FileVerb {
   }
 
   void AddOpening(JobDraft& draft) const override {
-    if (level_ == 0) {
-      AddOpen(draft, "raster", GetSource());
-    } else {
-      AddOpenWithPyramid(draft, "raster", GetSource());
-      AddLevel(draft, "level", "$raster", level_);
-    }
-    AddQuery(draft, GetShown(), GetVariable());
+    RasterChain chain(draft);
+    AddSource(chain);
+    AddQuery(draft, "shown", chain.GetTop());
   }
 
-  /// The name of the raster, or level of one, that is read.
-  std::string GetShown() const { return level_ == 0 ? "raster" : "level"; }
-  std::string GetVariable() const { return level_ == 0 ? "$raster" : "$level"; }
+  /// Opens the raster, or a level of it.
+  void AddSource(RasterChain& chain) const {
+    if (level_ == 0) {
+      AddOpen(chain.GetDraft(), "raster", GetSource());
+      chain.Take("raster");
+      return;
+    }
+    AddOpenWithPyramid(chain.GetDraft(), "raster", GetSource());
+    chain.Take("raster");
+    AddLevel(chain.GetDraft(), "level", "$raster", level_);
+    chain.Take("level");
+  }
 
-  void Plan(JobSession& /*session*/, const JobResults& opened) override {
-    raster_ = level_ == 0 ? opened.Find("raster").returns.Find("URI")
-                          : opened.Find("level").returns.Find("PyramidURI");
-    request_.info = ReadInfo(opened, GetShown());
-    request_.rect = ParseRect(rect_, request_.info);
+  void Plan(JobSession& session, const JobResults& opened) override {
+    const String source = URIOf(opened, level_ == 0 ? "$raster" : "$level");
+    const OpenRaster shown = ShowArea(session, {source, ReadInfo(opened, "shown")});
+    raster_ = shown.uri;
+    request_.info = shown.info;
+    request_.rect = shown.info.GetRect();
     request_.bands = ParseBands(bands_, request_.info);
     request_.interleave = IsPng() ? Interleave::BIP : ParseInterleave(interleave_);
     if (IsPng()) CheckPng();
@@ -152,11 +156,12 @@ class ReadVerb final : public FileVerb {
   /// Each block has memory of its own there, which whoever runs it makes.
   JobDraft GetJob(const Outputs& /*outputs*/) const override {
     JobDraft draft;
-    AddOpening(draft);
-    AddBlockSteps(draft, GetVariable(), request_.info, request_.bands, request_.interleave,
+    RasterChain chain(draft);
+    AddSource(chain);
+    GetArea().AddViews(chain);
+    AddBlockSteps(draft, chain.GetTop(), request_.info, request_.bands, request_.interleave,
                   blocks_);
-    if (level_ != 0) draft.Close("close.level", "$level");
-    draft.Close("close", "$raster");
+    chain.Close();
     return draft;
   }
 
@@ -192,10 +197,11 @@ class ReadVerb final : public FileVerb {
 
   std::string Remark() const override {
     if (!isExcluded_ || !mask_.empty()) return {};
-    return output_ + ": note: a mask excludes some of these pixels; --mask OUT.npy tells which";
+    return output_ +
+           ": note: some of these pixels are masked or outside; --mask OUT.npy tells which";
   }
 
-  std::string output_, mask_, rect_, bands_;
+  std::string output_, mask_, bands_;
   std::string interleave_ = "bip";
   unsigned level_ = 0;
 

@@ -174,6 +174,7 @@ class StatsVerb final : public FileVerb {
     line.Add("--bands", bandsText_, "Bands, from 0; all by default")
         .Shows("B,B...")
         .Example("3,2,1");
+    AddAreaTo(line);
     line.Add("--extended", isExtended_, "With covariances and sums of products");
     line.Add("--save", saves_, "Store them with the raster, so that they are known from now on");
     line.Add("--json", isJson_, "As JSON");
@@ -181,9 +182,13 @@ class StatsVerb final : public FileVerb {
 
  private:
   void CheckOptions() override {
-    if (!saves_ || bandsText_.empty()) return;
-    throw HostError(kExitUsage,
-                    "--save: the statistics of all bands are saved together; leave --bands out");
+    if (saves_ && !bandsText_.empty()) {
+      throw HostError(kExitUsage,
+                      "--save: the statistics of all bands are saved together; leave --bands out");
+    }
+    if (saves_ && GetArea().IsGiven()) {
+      throw HostError(kExitUsage, "--save: the statistics of some pixels are not the raster's");
+    }
   }
 
   std::vector<std::string> GetChangedFiles() const override {
@@ -195,9 +200,11 @@ class StatsVerb final : public FileVerb {
     AddQuery(draft, "raster", "$raster");
   }
 
-  void Plan(JobSession& /*session*/, const JobResults& opened) override {
-    raster_ = opened.Find("raster").returns.Find("URI");
-    info_ = ReadInfo(opened, "raster");
+  void Plan(JobSession& session, const JobResults& opened) override {
+    const OpenRaster shown =
+        ShowArea(session, {URIOf(opened, "$raster"), ReadInfo(opened, "raster")});
+    raster_ = shown.uri;
+    info_ = shown.info;
     bands_ = ParseBands(bandsText_, info_);
   }
 
@@ -213,10 +220,13 @@ class StatsVerb final : public FileVerb {
 
   JobDraft GetJob(const Outputs& /*outputs*/) const override {
     JobDraft draft;
+    RasterChain chain(draft);
     AddOpenWithPyramid(draft, "raster", GetSource());
-    AddStats(draft, "$raster");
+    chain.Take("raster");
+    GetArea().AddViews(chain);
+    AddStats(draft, chain.GetTop());
     if (saves_) AddSave(draft, kSaveCommand, "$raster");
-    draft.Close("close.raster", "$raster");
+    chain.Close();
     return draft;
   }
 

@@ -10,9 +10,8 @@
 
 #include <fmt/format.h>
 
-#include "georef/affine_link.h"
-#include "georef/std_georef.h"
 #include "options/option_values.h"
+#include "rasters/map_points.h"
 #include "rasters/raster_source.h"
 #include "verb.h"
 
@@ -26,16 +25,6 @@ struct TransformOptions {
   RasterJobOptions job;
   bool inverse = false;
 };
-
-CoordSys ReadSystem(const std::string& option, const std::string& text) {
-  CoordSys system;
-  if (!system.SetFromString(String(text)) || system.Type() == 0) {
-    throw HostError(kExitUsage, option + ": \"" + text +
-                                    "\" is no coordinate system that can be used here; give WKT, "
-                                    "\"EPSG:n\" or a PROJ string");
-  }
-  return system;
-}
 
 /// One line of input: two numbers, and a third that is passed on as it stands.
 struct Line {
@@ -78,53 +67,45 @@ class Carrier {
 /// From one coordinate system to another.
 class SystemCarrier final : public Carrier {
  public:
-  SystemCarrier(const CoordSys& from, const CoordSys& to) {
-    from_.SetCoordinateSystem(from);
-    to_.SetCoordinateSystem(to);
-  }
+  SystemCarrier(const CoordSys& from, const CoordSys& to) : from_(from), to_(to) {}
   bool UsesHeights() const override { return false; }
-  void Carry(Array<double>& points) const override { from_.MapToMap(points, to_); }
+  void Carry(Array<double>& points) const override { MapToMap(from_, to_, points); }
 
  private:
-  StdGeoRef from_;
-  StdGeoRef to_;
+  CoordSys from_;
+  CoordSys to_;
 };
 
-/// From pixels of a raster to its map, or back. Pixels count from the corner of the first one,
-/// whatever the model.
-class RasterCarrier final : public Carrier {
+/// From pixels of a raster to its map, or to another one. Pixels count from the corner of the first
+/// one, whatever the model.
+class PixelCarrier final : public Carrier {
  public:
-  RasterCarrier(const GeoRefPtr& geoRef, bool inverse)
-      : geoRef_(geoRef),
-        inverse_(inverse),
-        isCamera_(geoRef->GetType() == GeoRef::kRpc),
-        firstPixel_(isCamera_ ? -0.5 : 0.0) {}
+  /// @param to  the system of the map; an empty one for the raster's own.
+  PixelCarrier(const GeoRefPtr& geoRef, const CoordSys& to) : geoRef_(geoRef), to_(to) {}
 
-  bool UsesHeights() const override { return isCamera_; }
-
+  bool UsesHeights() const override { return geoRef_->GetType() == GeoRef::kRpc; }
   void Carry(Array<double>& points) const override {
-    if (inverse_) {
-      InvertPixelToMap(*geoRef_, points);
-      Shift(points, -firstPixel_);
-    } else {
-      Shift(points, firstPixel_);
-      geoRef_->PixelToMap(points);
-    }
+    ShiftPixels(points, FirstPixel(*geoRef_));
+    geoRef_->PixelToMap(points);
+    if (!to_.IsEmpty()) MapToMap(geoRef_->CoordinateSystem(), to_, points);
   }
 
  private:
-  static void Shift(Array<double>& points, double by) {
-    const unsigned width = points.GetExtent(1);
-    for (unsigned i = 0; i + 1 < points.GetCount(); i += width) {
-      points[i] += by;
-      points[i + 1] += by;
-    }
-  }
-
   GeoRefPtr geoRef_;
-  bool inverse_;
-  bool isCamera_;
-  double firstPixel_;  // what the model calls the corner of the first pixel
+  CoordSys to_;
+};
+
+/// From the map of a raster, or another one, to its pixels.
+class MapCarrier final : public Carrier {
+ public:
+  MapCarrier(const GeoRefPtr& geoRef, const CoordSys& from) : geoRef_(geoRef), from_(from) {}
+
+  bool UsesHeights() const override { return geoRef_->GetType() == GeoRef::kRpc; }
+  void Carry(Array<double>& points) const override { MapToPixels(*geoRef_, from_, points); }
+
+ private:
+  GeoRefPtr geoRef_;
+  CoordSys from_;
 };
 
 /// Lines that are carried together; small enough that a user at a terminal sees each answer.
@@ -187,31 +168,33 @@ GeoRefPtr ReadGeoRef(const TransformOptions& options) {
   throw HostError(kExitFailed, options.source.file + ": has no geo-reference");
 }
 
-/// True for a model whose way from the map to pixels is exact for square pixels only.
-bool IsRotatedOblong(const GeoRef& geoRef) {
-  return geoRef.GetType() == GeoRef::kStd && geoRef.Rotation() != 0 &&
-         std::abs(geoRef.PixelSizeX() - geoRef.PixelSizeY()) > 1e-9 * std::abs(geoRef.PixelSizeX());
-}
-
 std::unique_ptr<Carrier> MakeCarrier(const TransformOptions& options) {
   if (options.source.file.empty()) {
     return std::make_unique<SystemCarrier>(ReadSystem("--from", options.from),
                                            ReadSystem("--to", options.to));
   }
+  const std::string& named = options.inverse ? options.from : options.to;
+  const char* const option = options.inverse ? "--from" : "--to";
+  const CoordSys system = named.empty() ? CoordSys() : ReadSystem(option, named);
   const GeoRefPtr geoRef = ReadGeoRef(options);
-  if (options.inverse && IsRotatedOblong(*geoRef)) {
-    throw HostError(kExitFailed, options.source.file +
-                                     ": --inverse: the grid is rotated and its pixels are not "
-                                     "square; the model has no exact way back to pixels");
+  if (options.inverse) {
+    CheckMapToPixels(*geoRef, system, options.source.file, "--inverse");
+    return std::make_unique<MapCarrier>(geoRef, system);
   }
-  return std::make_unique<RasterCarrier>(geoRef, options.inverse);
+  if (!named.empty() && geoRef->CoordinateSystem().IsEmpty()) {
+    throw HostError(kExitFailed,
+                    options.source.file + ": --to: the raster has no coordinate system");
+  }
+  return std::make_unique<PixelCarrier>(geoRef, system);
 }
 
 /// Throws for options that don't go together.
 void CheckOptions(const TransformOptions& options) {
   const bool hasFile = !options.source.file.empty();
-  if (hasFile && !(options.from.empty() && options.to.empty())) {
-    throw HostError(kExitUsage, "a file's own geo-reference goes without --from and --to");
+  if (hasFile && !(options.inverse ? options.to : options.from).empty()) {
+    throw HostError(kExitUsage, options.inverse
+                                    ? "--to: with --inverse the output is pixels of the file"
+                                    : "--from: without --inverse the input is pixels of the file");
   }
   if (hasFile) return;
   if (options.from.empty()) throw HostError(kExitUsage, "--from is required without a file");
@@ -267,11 +250,15 @@ const VerbRegistration registration(
           "z is a height in metres, for files with a camera model.");
       line.AddExample("echo \"-75 40\" | vexg transform --from EPSG:4326 --to EPSG:32618");
       line.AddExample("echo \"0.5 0.5\" | vexg transform scene.tif");
+      line.AddExample("echo \"-34.9 -8.0\" | vexg transform scene.tif --inverse --from EPSG:4326");
       line.Add("file", options->source.file, "A raster: from its pixels to its map").IsFile();
       line.Add("--inverse", options->inverse, "From the map of the file to its pixels");
-      line.Add("--from", options->from, "The system of the input: WKT, EPSG:n or PROJ")
+      line.Add("--from", options->from,
+               "The system of the input: WKT, EPSG:n or PROJ; with --inverse the file's own by "
+               "default")
           .Takes(CoordSysName());
-      line.Add("--to", options->to, "The system of the output").Takes(CoordSysName());
+      line.Add("--to", options->to, "The system of the output; the file's own by default")
+          .Takes(CoordSysName());
       options->source.AddFormatTo(line);
       options->job.AddTo(line);
       return VerbRegistration::Work([options] { return Transform(*options); });

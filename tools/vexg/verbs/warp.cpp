@@ -146,6 +146,7 @@ class WarpVerb final : public RasterVerb {
     line.Add("--bands", bandsText_, "Bands in the order wanted, from 0; all by default")
         .Shows("B,B...")
         .Example("3,2,1");
+    AddAreaTo(line, "--source-no-data");
     line.Add("--no-data", noData_, "No-data value of the result; by default the source's")
         .Shows("VALUE");
   }

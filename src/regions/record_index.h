@@ -1,0 +1,36 @@
+#pragma once
+
+#include <cstdint>
+#include <memory>
+#include <vector>
+
+#include "georef/georef.h"
+#include "regions/region_window.h"
+
+namespace lumo {
+
+/// Where a record lies, in pixels.
+struct RecordBox {
+  std::int32_t record = 0;
+  MapRect bounds;
+};
+
+/// Finds the records whose boxes a window touches, without looking at the others.
+///
+/// Cost: 40 bytes a record; a look-up goes with the records that are found. Threads: any number.
+class VEXG_EXPORT RecordIndex {
+ public:
+  explicit RecordIndex(const std::vector<RecordBox>& boxes);
+  ~RecordIndex();
+  RecordIndex(const RecordIndex&) = delete;
+  RecordIndex& operator=(const RecordIndex&) = delete;
+
+  /// The records that the pixels of a window may touch, ascending.
+  std::vector<std::int32_t> Find(const RegionWindow& window) const;
+
+ private:
+  struct Tree;
+  std::unique_ptr<Tree> tree_;
+};
+
+}  // namespace lumo

@@ -1,0 +1,68 @@
+#pragma once
+
+#include <memory>
+#include <mutex>
+
+#include "raster/raster_iterator.h"
+#include "raster/tile.h"
+#include "regions/rasterized_geometry.h"
+#include "regions/zone_values.h"
+
+namespace lumo {
+
+/// Which figures of which zones are wanted.
+struct ZonalPlan {
+  GeometryPtr geometry;  ///< a zone for each record, whose ids count from 0
+  ScanOptions options;
+  ZonalWeights weights = ZonalWeights::kNone;
+  std::vector<ZonalRequest> requests;
+  Array<unsigned> bands;  ///< of the raster
+};
+
+/// Gives the figures of zones of a raster: for each zone, for each band, for each request. NaN
+/// stands for none.
+///
+/// The raster is read once, block after block in its own order; the zones of a block are gathered
+/// at the same time, each by one thread, so the result doesn't depend on their number. What is
+/// gathered for a zone goes with the last block that it touches. Exists for EightTypes.
+///
+/// Failure: false, with the fault told, when a shape can't be carried to the raster, or the raster
+///          fails; and at an abort.
+template <typename T>
+class VEXG_EXPORT ZonalPass {
+ public:
+  ZonalPass(const RasterPtr<T>& raster, const ZonalPlan& plan);
+
+  bool Run(const IPC& ipc);
+  const std::vector<double>& GetFigures() const { return figures_; }
+
+ private:
+  struct Zone {
+    std::vector<ZoneValues<T>> bands;
+  };
+  class ZonesOfBlock;
+
+  void CountBlocks(const RasterIterator<T>& iterator);
+  bool TakeBlock(const Tile<T>& block);
+  bool TakeZone(std::int32_t zone, const Tile<T>& block, const RegionWindow& window);
+  bool AddPixels(std::int32_t zone, const Tile<T>& block, const RegionWindow& window);
+  bool AddShares(std::int32_t zone, const Tile<T>& block, const RegionWindow& window);
+  void AddRun(Zone& zone, const Tile<T>& block, std::size_t line, std::size_t first,
+              std::size_t count, const double* weights);
+  Zone& ZoneOf(std::int32_t zone);
+  void Finish(std::int32_t zone);
+
+  RasterPtr<T> raster_;
+  const ZonalPlan& plan_;
+  GeoRefPtr geoRef_;
+  RasterizedGeometry shapes_;
+  GeometryPtr onGrid_;
+  bool withValues_ = false;
+  std::vector<std::unique_ptr<Zone>> zones_;  // those that blocks are still added to
+  std::vector<std::uint32_t> blocksLeft_;     // for each zone
+  std::vector<double> figures_;
+};
+
+VEXG_EXTERN(EIGHT, ZonalPass);
+
+}  // namespace lumo
