@@ -10,16 +10,22 @@ namespace lumo {
 /// Shapes that don't change, as a file of many holds them: in a few pieces of memory, 16 bytes a
 /// vertex and some 20 a record. The ids of records and parts count from 0.
 ///
-/// Threads: any number once it is filled. Failure: std::bad_alloc while it is filled.
+/// Threads: any number once it is filled.
+/// Failure: std::bad_alloc while it is filled.
+///
+///     PackedGeometry shapes(layer.coordSys);
+///     for (VectorRecord record; file->Next(record);) shapes.Add(kPolygonRecord, record);
 class VEXG_EXPORT PackedGeometry final : public Geometry {
  public:
   static const unsigned TypeCode;
+  /// @param coordSys  the system of all coordinates.
   explicit PackedGeometry(const lumo::CoordSys& coordSys);
   bool IsA(unsigned typeCode) const override;
 
   /// Adds a record behind all others.
   void Add(GeometryKind kind, const VectorRecord& record);
 
+  /// A copy that shares nothing; null when there is no memory.
   GeometryPtr Clone() const override;
   std::uint32_t RecordRevision(std::uint32_t record) const override;
   std::uint32_t PartRevision(std::uint32_t record, std::uint32_t part) const override;

@@ -28,7 +28,7 @@ VEXG_VECTOR_CLONES void PutByMask(unsigned char* __restrict states, std::size_t 
 
 constexpr std::size_t kGroup = 64;  // pixels that are looked at together
 
-/// Tells that all bytes of a group are the same, 0 or 1; `value` is that of the first.
+/// True when all bytes of a group are the same, 0 or 1; `value` is that of the first.
 bool IsUniform(const unsigned char* mask, std::size_t count, unsigned char& value) {
   value = mask[0];
   if (count != kGroup) {

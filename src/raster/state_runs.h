@@ -11,6 +11,11 @@ namespace lumo {
 /// of one line in all bands, or a line as the bytes of a mask say. Other bits stay.
 ///
 /// The states are the caller's. Threads: one at a time.
+///
+///     StateRuns runs(PixelValueState::Masked, states, interleave, width, height, bands);
+///     if (!runs.Fits()) return false;
+///     runs.PutAll(false);
+///     runs.PutRun(line, first, count, true);
 class VEXG_EXPORT StateRuns {
  public:
   /// @param states  of the block that GetSubRect has given, whose axes `interleave` orders.

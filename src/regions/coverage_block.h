@@ -4,16 +4,26 @@
 
 namespace lumo {
 
-/// Which share of each pixel of a block lies inside a polygon: exact areas, summed up from what
-/// each edge cuts off, as font renderers do (R. Levien, font-rs, "accumulation buffer").
+/// Computes the share of each pixel of a block that lies inside a polygon: exact areas, summed up
+/// from the part that each edge cuts off, as font renderers do (R. Levien, font-rs, "accumulation
+/// buffer").
 ///
 /// Rings that cross themselves count by their turns; where parts overlap a pixel counts once.
-/// Cost: 8 bytes a pixel of the block. Threads: one at a time.
+/// Cost: 8 bytes a pixel of the block.
+/// Threads: one at a time.
+///
+///     CoverageBlock block(WindowOf(rect));
+///     block.AddRing(outer, false);
+///     block.AddRing(hole, true);
+///     std::vector<double> shares;
+///     for (unsigned line = 0; line < rect.Height(); ++line) block.GetLine(line, shares);
 class VEXG_EXPORT CoverageBlock {
  public:
   /// @param window  at full resolution.
   explicit CoverageBlock(const RegionWindow& window);
 
+  /// Adds a ring, in pixels of the grid. It closes by itself; its direction doesn't matter for a
+  /// ring that doesn't cross itself.
   void AddRing(const ScanVertices& ring, bool isHole);
   /// The shares of a line of the block, 0 to 1, `width` of them.
   void GetLine(unsigned line, std::vector<double>& shares) const;

@@ -24,12 +24,16 @@ class VEXG_EXPORT PixelAddressTile final : public Object {
   /// Drops the addresses.
   void Clear();
 
+  /// True when the pixel is in the tile's part of the region.
   bool Contains(const Point2D<unsigned>& point) const;
+  /// Marks the addresses that lie in a window.
   void Mark(RegionMarks& marks) const;
 
+  /// The square, in pixels of the definition's grid.
   SubRect Rect() const { return {left_, top_, left_ + width_ - 1, top_ + height_ - 1}; }
   /// The bounds of the addresses; means nothing without any.
   SubRect Bounds() const;
+  /// Number of addresses, each counted once.
   std::size_t PointCount() const;
   /// How often the addresses have changed.
   std::uint32_t Revision() const;
@@ -54,12 +58,16 @@ using PixelAddressTilePtr = Pointer<PixelAddressTile>;
 
 /// A region of single pixels, kept in tiles of 256 by 256.
 ///
+///     const PixelAddressROIDefPtr region(new PixelAddressROIDef(samples, lines));
+///     if (!region->SetAddresses(points)) return false;  // column, row
+///     const RasterizedROIPtr onRaster = RasterizeOn(region, samples, lines, geoRef);
+///
 /// Threads: any number; each operation holds the definition's lock, then those of its tiles.
 /// Failure: ObjectErrorOutOfMemory where the tiles can't be made.
 class VEXG_EXPORT PixelAddressROIDef final : public PixelBasedROIDef {
  public:
   static const unsigned TypeCode;
-  static constexpr unsigned kTileSize = 256;
+  static constexpr unsigned kTileSize = 256;  ///< pixels of a side
 
   /// An empty region, whose grid grows with the addresses.
   PixelAddressROIDef() = default;
@@ -91,7 +99,9 @@ class VEXG_EXPORT PixelAddressROIDef final : public PixelBasedROIDef {
   /// Says where the grid lies; no region made from the definition may be in use.
   void SetGeoRef(const GeoRefPtr& geoRef);
 
+  /// Tiles in a row of the grid.
   unsigned TileColumns() const;
+  /// Tiles in a column of the grid.
   unsigned TileRows() const;
   /// A tile; empty for one that isn't there.
   PixelAddressTilePtr Tile(unsigned row, unsigned column) const;

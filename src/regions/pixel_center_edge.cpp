@@ -8,7 +8,7 @@ namespace {
 constexpr double kSteadyOrder = 1e-6;  // in the order of edges
 constexpr double kSteadyRules = 1e-9;  // in the rules of columns
 
-/// Compares the fractions of a row with a tolerance, which is 0 for told rules.
+/// Compares the fractions of a row with a tolerance, which is 0 for the rules of the told form.
 struct Comparison {
   explicit Comparison(ScanRules rules)
       : tolerance(rules == ScanRules::kSteady ? kSteadyRules : 0) {}

@@ -10,8 +10,8 @@
 namespace lumo {
 
 /// The tolerances of the scan, in pixels.
-constexpr double kPolygonTolerance = 0.0001;
-constexpr double kLineTolerance = 0.01;
+constexpr double kPolygonTolerance = 0.0001;  ///< of polygons
+constexpr double kLineTolerance = 0.01;       ///< of lines and points
 
 /// The column or row that a coordinate of a polygon lies in.
 inline std::int64_t CellOf(double coordinate, ScanRules rules) {
@@ -54,30 +54,31 @@ class PixelCenterEdge {
   std::int64_t LeftColumn(std::int64_t row) const;
   /// The last column of a span that ends at this edge.
   std::int64_t RightColumn(std::int64_t row) const;
-  /// Whether the edge is done after `row`.
+  /// True when the edge is done after `row`.
   bool EndsAfter(std::int64_t row) const;
 
+  /// The column or row of a coordinate, by the rules of this edge.
   std::int64_t Cell(double coordinate) const { return CellOf(coordinate, rules); }
   /// The column of a running x, which rounding may have moved.
   std::int64_t RunningCell(double running) const;
 
   double slope = 0;  ///< change of x for each row
   double x0 = 0;     ///< the ends, as they were moved
-  double y0 = 0;
-  double x1 = 0;
+  double y0 = 0;     ///< of the upper end
+  double x1 = 0;     ///< of the lower end
   double y1 = 0;
-  double x = 0;  ///< running column, by which the edges of a row are ordered
-  std::int64_t firstRow = 0;
-  std::int64_t lastRow = 0;
-  bool atEnd = false;  ///< the row is the last one of an edge with a kBottomEnd
-  unsigned char startFlags = 0;
-  unsigned char endFlags = 0;
-  double xTop = 0;  ///< x at the upper and the lower border of the row
+  double x = 0;                  ///< running column, by which the edges of a row are ordered
+  std::int64_t firstRow = 0;     ///< row of the upper end
+  std::int64_t lastRow = 0;      ///< row of the lower end
+  bool atEnd = false;            ///< the row is the last one of an edge with a kBottomEnd
+  unsigned char startFlags = 0;  ///< bits of Flag, of the upper end
+  unsigned char endFlags = 0;    ///< of the lower end
+  double xTop = 0;               ///< x at the upper and the lower border of the row
   double xBottom = 0;
   ScanRules rules;
 };
 
-/// Whether `a` stands left of `b` in their row.
+/// True when `a` stands left of `b` in their row.
 bool IsLeftOf(const PixelCenterEdge& a, const PixelCenterEdge& b);
 
 /// Puts the edges of a row in order.

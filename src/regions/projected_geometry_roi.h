@@ -14,7 +14,7 @@ class VEXG_EXPORT ProjectedROI : public RasterizedROI {
   explicit ProjectedROI(const GeoRefPtr& geoRef) : RasterizedROI(0, 0, geoRef) {}
 };
 
-/// Shapes of another coordinate system than the raster's. Their vertices are carried; what lies
+/// Shapes of another coordinate system than the raster's. Their vertices are carried; the edge
 /// between two of them stays a straight line on the raster.
 class VEXG_EXPORT ProjectedGeometryROI final : public ProjectedROI {
  public:

@@ -22,7 +22,7 @@ class VEXG_EXPORT ProjectedPixelBasedTile : public Object {
 
   /// The tile on the grid of a raster, made when it is first asked for.
   /// @param region  [out] empty for a tile without pixels.
-  /// @return false, with the fault told, when it can't be carried.
+  /// @return false, with the fault set, when it can't be carried.
   bool Region(const PixelBasedROIDef& definition, const GeoRefPtr& geoRef,
               RasterizedGeometryROIPtr& region);
 
@@ -67,8 +67,11 @@ class VEXG_EXPORT ProjectedPixelBasedROI : public ProjectedROI {
   static const unsigned TypeCode;
   bool IsA(unsigned typeCode) const override;
 
+  /// Tiles in a row of the definition's grid.
   virtual unsigned TileColumns() const = 0;
+  /// Tiles in a column of it.
   virtual unsigned TileRows() const = 0;
+  /// The carried form of a tile; empty for one that isn't there.
   virtual ProjectedPixelBasedTilePtr Tile(unsigned column, unsigned row) const = 0;
   /// Makes a tile for each of the definition's.
   virtual void BuildTiles() = 0;

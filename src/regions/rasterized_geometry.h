@@ -24,7 +24,7 @@ class VEXG_EXPORT RasterizedGeometryRecord final : public Object {
                std::int64_t rowLimit, std::uint32_t& part);
   /// The pixels of all parts, holes taken out.
   /// @param rowLimit  the rows wanted end below it.
-  /// @return null, with the fault told, when a part can't be carried to the grid.
+  /// @return null, with the fault set, when a part can't be carried to the grid.
   std::shared_ptr<const SpanRows> Rows(const GeoRefPtr& geoRef, std::uint64_t generation,
                                        std::int64_t rowLimit);
 
@@ -52,12 +52,19 @@ using RasterizedGeometryRecordPtr = Pointer<RasterizedGeometryRecord>;
 ///
 /// Cost: an index over the boxes of all records is made at the first call, and after a change.
 /// Threads: any number; the caches guard themselves.
+///
+///     RasterizedGeometry shapes(geometry, geoRef, samples, lines);
+///     Array<unsigned char> mask;
+///     std::uint64_t count = 0;
+///     if (!shapes.Mask(rect, mask, count)) return false;  // TakeFault() says why
 class VEXG_EXPORT RasterizedGeometry final : public Object {
  public:
   static const unsigned TypeCode;
-  static constexpr unsigned kCacheLimit = 10000;
+  static constexpr unsigned kCacheLimit = 10000;  ///< records
 
-  /// On the grid of a geo-reference; or, where it is null, on one of that size.
+  /// @param geoRef  of the grid, with its size; null for a grid of `samples` by `lines` pixels, on
+  /// which
+  ///                coordinates are pixels.
   RasterizedGeometry(const GeometryPtr& geometry, const GeoRefPtr& geoRef, unsigned samples,
                      unsigned lines, const ScanOptions& options = {});
   bool IsA(unsigned typeCode) const override;
@@ -72,13 +79,16 @@ class VEXG_EXPORT RasterizedGeometry final : public Object {
   /// The records that may have pixels in a window, ascending by id.
   std::vector<std::int32_t> FindRecords(const RegionWindow& window);
   /// The pixels of a record, of all rows down to those of a window at least.
-  /// @return null, with the fault told, when the record can't be carried to the grid.
+  /// @return null, with the fault set, when the record can't be carried to the grid.
   std::shared_ptr<const SpanRows> RowsOf(std::int32_t record, const RegionWindow& window);
   /// Calls `take` with the records that may have pixels in a window, ascending by id, each with its
-  /// rows. @return false, with the fault told, when a record can't be carried to the grid.
+  /// rows. @return false, with the fault set, when a record can't be carried to the grid.
   bool ForEachRecord(const RegionWindow& window,
                      const std::function<void(std::int32_t, const SpanRows&)>& take);
+  /// Marks the pixels of all records in a window. False, with the fault set, when one can't be
+  /// carried.
   bool Mark(RegionMarks& marks);
+  /// Says whether a window lies wholly inside one record or outside of all.
   RegionCover Cover(const RegionWindow& window);
   /// HitTest of the only pixel of a window.
   bool HitTest(const RegionWindow& pixel, std::uint32_t& record, std::uint32_t& part);
@@ -109,7 +119,7 @@ class VEXG_EXPORT RasterizedGeometry final : public Object {
 
 using RasterizedGeometryPtr = Pointer<RasterizedGeometry>;
 
-/// Whether shapes have to be carried to the coordinate system of a grid.
+/// True when shapes have to be carried to the coordinate system of a grid.
 VEXG_EXPORT bool AreProjected(const Geometry& geometry, const GeoRefPtr& geoRef,
                               const ScanOptions& options);
 

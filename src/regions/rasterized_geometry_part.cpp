@@ -10,7 +10,7 @@
 namespace lumo {
 namespace {
 
-/// Tells a fault of a part.
+/// Sets the fault of a part.
 void SetPartFault(std::uint32_t record, std::uint32_t part, const char* text) {
   SetFault(String("record " + std::to_string(record) + ", part " + std::to_string(part) +
                   " of the shapes: " + text));

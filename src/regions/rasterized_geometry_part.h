@@ -11,7 +11,7 @@ namespace lumo {
 /// Carries the vertices of a part to the pixels of a grid.
 /// @param geoRef    of the grid; may be null.
 /// @param vertices  [out] none for a part that isn't there.
-/// @return false, with the fault told, when a vertex can't be carried, is not a number, or lies too
+/// @return false, with the fault set, when a vertex can't be carried, is not a number, or lies too
 ///         far away.
 VEXG_EXPORT bool CarryPart(const Geometry& geometry, std::uint32_t record, std::uint32_t part,
                            const GeoRefPtr& geoRef, ShapeCoordinates coordinates,
@@ -44,8 +44,9 @@ class VEXG_EXPORT RasterizedGeometryPart : public Object {
 
   /// Asks for the rows down to below `rowLimit` at the next Prepare.
   void WantRows(std::int64_t rowLimit);
-  /// What Prepare has made.
+  /// The rows that Prepare has made; null before.
   const std::shared_ptr<const SpanRows>& Rows() const { return rows_; }
+  /// The id of the part within its record.
   std::uint32_t PartId() const { return part_; }
 
  protected:

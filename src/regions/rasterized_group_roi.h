@@ -8,10 +8,13 @@
 
 namespace lumo {
 
-/// Several regions on the grid of a raster. A pixel that is in two of them counts once.
+/// Several regions on the grid of a raster: a pixel is inside when it is in one of them, and counts
+/// once where it is in two. Children are put on the grid when they are first asked for, and again
+/// after a change of the definition's list.
 class VEXG_EXPORT RasterizedGroupROI final : public RasterizedROI {
  public:
   static const unsigned TypeCode;
+  /// @param geoRef  of the raster; where it is null, `samples` and `lines` count.
   RasterizedGroupROI(const GroupROIDefPtr& definition, unsigned samples, unsigned lines,
                      const GeoRefPtr& geoRef);
   bool IsA(unsigned typeCode) const override;
@@ -21,6 +24,7 @@ class VEXG_EXPORT RasterizedGroupROI final : public RasterizedROI {
   bool Mask(const SubRect& rect, Array<unsigned char>& mask, std::uint64_t& count) override;
   ROIDefPtr ROIDef() const override { return definition_; }
 
+  /// Marks the pixels of each child. False, with the fault set, when one can't be carried.
   bool Mark(RegionMarks& marks) override;
   RegionCover Cover(const RegionWindow& window) override;
 

@@ -22,9 +22,9 @@ class VEXG_EXPORT RasterizedPixelAddressROI final : public RasterizedROI {
   bool Mark(RegionMarks& marks) override;
   RegionCover Cover(const RegionWindow& window) override;
 
-  /// Whether the grids differ by their origin alone.
+  /// True when the grids differ by their origin alone.
   bool IsShifted() const { return shifted_; }
-  /// Whether the addresses are carried by a projected form.
+  /// True when the addresses are carried by a projected form.
   bool IsProjected() const { return projected_; }
 
  private:

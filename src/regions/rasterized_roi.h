@@ -10,7 +10,7 @@ namespace lumo {
 /// Kinds of hits.
 enum ROIHitKind : std::int32_t { kNoHit = -1, kPixelHit = 0, kGeometryHit = 2 };
 
-/// Tells which region a pixel lies in.
+/// Names the region that a pixel lies in.
 class VEXG_EXPORT ROIHitInfo : public Object {
  public:
   static const unsigned TypeCode;
@@ -19,6 +19,7 @@ class VEXG_EXPORT ROIHitInfo : public Object {
       : definition_(definition), kind_(kind) {}
   bool IsA(unsigned typeCode) const override;
 
+  /// The region that was hit; of a group the child.
   const ROIDefPtr& ROIDef() const { return definition_; }
   void SetROIDef(const ROIDefPtr& definition) { definition_ = definition; }
   std::int32_t Kind() const { return kind_; }  ///< an ROIHitKind
@@ -30,7 +31,7 @@ class VEXG_EXPORT ROIHitInfo : public Object {
 
 using ROIHitInfoPtr = Pointer<ROIHitInfo>;
 
-/// Tells which shape of a region a pixel lies in.
+/// Names the shape of a region that a pixel lies in.
 class VEXG_EXPORT GeometryROIHitInfo final : public ROIHitInfo {
  public:
   static const unsigned TypeCode;
@@ -52,15 +53,21 @@ class VEXG_EXPORT RegionPainter {
   virtual ~RegionPainter() = default;
 
   /// Marks the pixels of the window of `marks` that lie in the region.
-  /// @return false, with the fault told, when the region can't be carried to the grid.
+  /// @return false, with the fault set, when the region can't be carried to the grid.
   virtual bool Mark(RegionMarks& marks) = 0;
 
-  /// Tells, in a small part of the time of Mark, whether a window lies wholly inside or outside.
+  /// Says, in a small part of the time of Mark, whether a window lies wholly inside or outside.
   virtual RegionCover Cover(const RegionWindow& window) = 0;
 };
 
-/// A region on the grid of one raster. It tells whether a pixel is inside, and which pixels of a
-/// rectangle are.
+/// A region on the grid of one raster. It says whether a pixel is inside, and marks the pixels of a
+/// rectangle that are.
+///
+///     const RasterizedROIPtr region = RasterizeOn(definition, samples, lines, geoRef);
+///     Array<unsigned char> mask;
+///     std::uint64_t count = 0;
+///     if (!region->Mask({0, 0, 511, 511}, mask, count)) return false;
+///     const bool inside = mask[y * 512 + x] != 0;
 ///
 /// A change of the definition shows at the next call.
 ///
@@ -71,7 +78,7 @@ class VEXG_EXPORT RasterizedROI : public Object, public RegionPainter {
   static const unsigned TypeCode;
   bool IsA(unsigned typeCode) const override;
 
-  /// Whether a pixel of the grid is in the region.
+  /// True when a pixel of the grid is in the region.
   /// @param info  [out] the hit; empty when there is none.
   virtual bool HitTest(const Point2D<unsigned>& point, ROIHitInfoPtr& info) = 0;
   /// Gives the region in a rectangle.
@@ -81,19 +88,19 @@ class VEXG_EXPORT RasterizedROI : public Object, public RegionPainter {
   /// The definition.
   virtual ROIDefPtr ROIDef() const = 0;
 
-  unsigned Samples() const { return samples_; }
-  unsigned Lines() const { return lines_; }
-  const GeoRefPtr& GridGeoRef() const { return geoRef_; }
+  unsigned Samples() const { return samples_; }            ///< of the grid
+  unsigned Lines() const { return lines_; }                ///< of the grid
+  const GeoRefPtr& GridGeoRef() const { return geoRef_; }  ///< null for a grid of pixels
 
   /// Says that pixel (0, 0) of the raster is pixel (x, y) of the region's grid, as for a raster
   /// that is a spatial subset. Only for a region without a geo-reference, which needs no other way.
   void SetOffset(std::int32_t x, std::int32_t y);
-  bool HasOffset() const { return hasOffset_; }
-  std::int32_t OffsetX() const { return offsetX_; }
+  bool HasOffset() const { return hasOffset_; }      ///< SetOffset was called
+  std::int32_t OffsetX() const { return offsetX_; }  ///< pixels; 0 without one
   std::int32_t OffsetY() const { return offsetY_; }
 
  protected:
-  /// @param geoRef  where it isn't null the size is that which it was told.
+  /// @param geoRef  where it isn't null the size is the one that it has.
   RasterizedROI(unsigned samples, unsigned lines, const GeoRefPtr& geoRef);
 
   /// A mask of zeros for a rectangle, then Mark.

@@ -9,7 +9,7 @@
 
 namespace lumo {
 
-/// Where a record lies, in pixels.
+/// The box of a record, in pixels.
 struct RecordBox {
   std::int32_t record = 0;
   MapRect bounds;
@@ -20,6 +20,7 @@ struct RecordBox {
 /// Cost: 40 bytes a record; a look-up goes with the records that are found. Threads: any number.
 class VEXG_EXPORT RecordIndex {
  public:
+  /// @param boxes  of all records, in any order; they are copied.
   explicit RecordIndex(const std::vector<RecordBox>& boxes);
   ~RecordIndex();
   RecordIndex(const RecordIndex&) = delete;

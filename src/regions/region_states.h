@@ -26,7 +26,7 @@ namespace lumo {
 /// @param interleave  the order of the states' axes.
 /// @param bands       how many bands the block has.
 /// @param states      one for each pixel and band.
-/// @return false, with the fault told, when the region can't be carried to the grid; the states
+/// @return false, with the fault set, when the region can't be carried to the grid; the states
 ///         then mean nothing.
 VEXG_EXPORT bool FillRegionStates(RasterizedROI& region, unsigned level, const SubRect& rect,
                                   Interleave interleave, unsigned bands,
@@ -38,14 +38,14 @@ VEXG_EXPORT bool FillRegionStates(RasterizedROI& region, unsigned level, const S
 VEXG_EXPORT bool MaskAtLevel(RasterizedROI& region, unsigned level, const SubRect& rect,
                              Array<unsigned char>& mask, std::uint64_t& count);
 
-/// Which part of a raster a region covers.
+/// The part of a raster that a region covers.
 struct RegionExtent {
   std::uint64_t pixels = 0;  ///< in the region
   SubRect bounds;            ///< the smallest rectangle with all of them; means nothing without any
 };
 
 /// Counts the pixels of a rectangle that lie in a region.
-/// @return false, with the fault told, when the region can't be carried, or at an abort.
+/// @return false, with the fault set, when the region can't be carried, or at an abort.
 VEXG_EXPORT bool MeasureRegion(RasterizedROI& region, const SubRect& rect, const IPC& ipc,
                                RegionExtent& extent);
 

@@ -16,13 +16,14 @@ struct RegionWindow {
   std::int64_t top = 0;
   unsigned width = 0;  ///< of the block, as `height`
   unsigned height = 0;
-  unsigned level = 0;
-
+  unsigned level = 0;  ///< pyramid level, 0 for full resolution
   /// The last column and row of the grid that the block covers.
   std::int64_t Right() const { return left + (std::int64_t{width} << level) - 1; }
   std::int64_t Bottom() const { return top + (std::int64_t{height} << level) - 1; }
+  /// Pixels of the block.
   std::uint64_t PixelCount() const { return std::uint64_t{width} * height; }
 
+  /// The window moved by pixels of the grid.
   RegionWindow Moved(std::int64_t x, std::int64_t y) const {
     return {left + x, top + y, width, height, level};
   }
@@ -41,6 +42,7 @@ inline RegionWindow WindowOf(const SubRect& rect, unsigned level = 0) {
 /// again. Threads: one at a time.
 class VEXG_EXPORT RegionMarks {
  public:
+  /// @param bytes  window.PixelCount() of them; they outlive the marks.
   RegionMarks(const RegionWindow& window, unsigned char* bytes) : window_(window), bytes_(bytes) {}
 
   /// Marks the pixels of one row of the grid from column `first` to `last`, inclusive; what lies
@@ -60,6 +62,7 @@ class VEXG_EXPORT RegionMarks {
 
   /// The number of bytes that were set.
   std::uint64_t Count() const { return count_; }
+  /// The window that the bytes belong to.
   const RegionWindow& Window() const { return window_; }
 
  private:
@@ -71,7 +74,7 @@ class VEXG_EXPORT RegionMarks {
 /// The sum of bytes that are 0 or 1.
 VEXG_EXPORT std::uint64_t CountMarks(const unsigned char* bytes, std::size_t count);
 
-/// How much of a window a region covers, as far as it can be told without marking it.
+/// How much of a window a region covers, as far as that is known without marking it.
 enum class RegionCover {
   kOutside,  ///< none of it
   kPartly,   ///< some of it, or that isn't known

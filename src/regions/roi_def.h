@@ -20,6 +20,9 @@ using ROIDefPtr = Pointer<ROIDef>;
 /// Describes a region of interest once, for many rasters: addresses of pixels, shapes, or a group
 /// of both. Rasterize makes it usable on the grid of one raster.
 ///
+///     const ROIDefPtr fields(new GeometryROIDef(shapes));
+///     const RasterPtr<float> masked(new ROIRaster<float>(raster, fields));
+///
 /// Threads: any number of readers, as the derived class says.
 class VEXG_EXPORT ROIDef : public Object {
  public:
@@ -44,7 +47,7 @@ class VEXG_EXPORT PixelBasedROIDef : public ROIDef {
   static const unsigned TypeCode;
   bool IsA(unsigned typeCode) const override;
 
-  /// Whether a pixel of the definition's grid is in the region.
+  /// True when a pixel of the definition's grid is in the region.
   virtual bool Contains(const Point2D<unsigned>& point) const = 0;
   /// Gives the region in a rectangle of the definition's grid.
   /// @param mask   [out] height by width; 1 inside, 0 outside.
@@ -54,8 +57,8 @@ class VEXG_EXPORT PixelBasedROIDef : public ROIDef {
                     std::uint64_t& count) const = 0;
   /// Where the definition's grid lies; null where it is that of any raster.
   virtual GeoRefPtr GeoRef() const = 0;
-  virtual unsigned Lines() const = 0;
-  virtual unsigned Samples() const = 0;
+  virtual unsigned Lines() const = 0;    ///< of the definition's grid
+  virtual unsigned Samples() const = 0;  ///< of the definition's grid
 };
 
 using PixelBasedROIDefPtr = Pointer<PixelBasedROIDef>;
@@ -64,6 +67,7 @@ using PixelBasedROIDefPtr = Pointer<PixelBasedROIDef>;
 class VEXG_EXPORT GeometryROIDef final : public ROIDef {
  public:
   static const unsigned TypeCode;
+  /// @param options  how the shapes become pixels.
   explicit GeometryROIDef(const GeometryPtr& geometry, const ScanOptions& options = {})
       : geometry_(geometry), options_(options) {}
   bool IsA(unsigned typeCode) const override;
@@ -71,6 +75,7 @@ class VEXG_EXPORT GeometryROIDef final : public ROIDef {
   RasterizedROIPtr Rasterize(const ROIDefPtr& self, unsigned samples, unsigned lines,
                              const GeoRefPtr& geoRef) const override;
 
+  /// The shapes, which the definition shares.
   const GeometryPtr& Geometry() const { return geometry_; }
   const ScanOptions& Options() const { return options_; }
 

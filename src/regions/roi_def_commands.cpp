@@ -6,7 +6,7 @@
 #include "regions/region_states.h"
 #include "regions/shape_file.h"
 
-// The commands that make regions of interest, and tell of them.
+// The commands that make regions of interest, and describe them.
 
 namespace lumo {
 namespace {

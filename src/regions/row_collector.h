@@ -11,7 +11,9 @@ class RowCollector {
  public:
   explicit RowCollector(std::int64_t rowLimit) : rowLimit_(rowLimit) {}
 
+  /// Rows from here on are dropped.
   std::int64_t RowLimit() const { return rowLimit_; }
+  /// Adds the columns from `first` to `last`, inclusive, of a row.
   void Put(std::int64_t row, std::int64_t first, std::int64_t last) {
     if (row < 0 || row >= rowLimit_) return;
     pieces_.push_back({row, {ClampColumn(first), ClampColumn(last)}});

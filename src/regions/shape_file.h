@@ -12,13 +12,13 @@ namespace lumo {
 
 // Records of vector files, chosen by layer and by the value of a field.
 //
-// Failure: false or empty, with the fault told: the file, and what is wrong with it.
+// Failure: false or empty, with the fault set: the file, and what is wrong with it.
 
 /// Opens a file of records.
 VEXG_EXPORT VectorRecordSourcePtr OpenShapes(const std::string& path);
 
 /// The layers that a text names: one, by its name or else its number from 0; all for no text.
-/// @return none, with the fault told, when there is no such layer.
+/// @return none, with the fault set, when there is no such layer.
 VEXG_EXPORT std::vector<std::uint32_t> FindLayers(VectorRecordSource& source,
                                                   const std::string& text);
 
@@ -28,6 +28,7 @@ class VEXG_EXPORT RecordFilter {
   /// Reads "FIELD=VALUE"; no text chooses all records. Numbers are equal by value.
   /// @return false when the layer has no such field, or the field can't have such a value.
   bool Set(const VectorLayer& layer, const std::string& text);
+  /// True for a record that is chosen.
   bool Accepts(const VectorRecord& record) const;
 
  private:
@@ -35,23 +36,23 @@ class VEXG_EXPORT RecordFilter {
   VectorValue value_;
 };
 
-/// Whether two names of fields are the same but for the case of their letters.
+/// True when two names of fields are the same but for the case of their letters.
 VEXG_EXPORT bool AreSameName(const std::string& a, const std::string& b);
 
 /// The place of a field of a layer by its name, else by its name in letters of another case.
-/// @return none, with the fault told, when there is no such field.
+/// @return none, with the fault set, when there is no such field.
 VEXG_EXPORT std::optional<std::size_t> FindField(const VectorLayer& layer, const std::string& name);
 
 /// The kind of geometry of a record.
-/// @return none, with the fault told, for a record whose shapes are of several kinds, and for one
+/// @return none, with the fault set, for a record whose shapes are of several kinds, and for one
 ///         with a coordinate that is not a number.
 VEXG_EXPORT std::optional<GeometryKind> KindOf(const VectorRecord& record);
 
-/// Which records of a file are read.
+/// Says which records of a file are read.
 struct ShapeSelection {
-  std::uint32_t layer = 0;
-  std::string where;  ///< see RecordFilter
-  std::string field;  ///< whose numbers are read too; records without one are left out
+  std::uint32_t layer = 0;  ///< from 0
+  std::string where;        ///< see RecordFilter
+  std::string field;        ///< whose numbers are read too; records without one are left out
 };
 
 /// Reads all shapes that are selected; records without a shape are left out.
@@ -60,7 +61,7 @@ struct ShapeSelection {
 VEXG_EXPORT GeometryPtr ReadShapes(VectorRecordSource& source, const ShapeSelection& selection,
                                    const IPC& ipc, std::vector<double>* values = nullptr);
 
-/// The fault of a file of shapes, with its name in front where it isn't told.
+/// The fault of a file of shapes, with its name in front where that is missing.
 VEXG_EXPORT std::string FaultOfShapes(const std::string& path);
 
 }  // namespace lumo

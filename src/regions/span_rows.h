@@ -20,8 +20,13 @@ inline std::int32_t ClampColumn(std::int64_t column) {
   return static_cast<std::int32_t>(column < -kMost ? -kMost : column > kMost ? kMost : column);
 }
 
-/// Rows of column spans, one row after the other: what a scanned shape is made of. Memory is 4
+/// Rows of column spans, one row after the other, as the scan of a shape makes them. Memory is 4
 /// bytes a row and 8 a span.
+///
+///     SpanRows rows;
+///     rows.Start(10);
+///     rows.Add(3, 7);  // columns 3 to 7 of row 10
+///     rows.EndRow();
 class VEXG_EXPORT SpanRows {
  public:
   /// Begins at a row; rows are then added in order.
@@ -33,17 +38,22 @@ class VEXG_EXPORT SpanRows {
   /// Ends the row that is being filled.
   void EndRow() { ends_.push_back(static_cast<std::uint32_t>(spans_.size())); }
 
+  /// True without a pixel.
   bool IsEmpty() const { return spans_.empty(); }
   std::int64_t FirstRow() const { return firstRow_; }
+  /// The last row that was ended; FirstRow() - 1 without any.
   std::int64_t LastRow() const { return firstRow_ + static_cast<std::int64_t>(ends_.size()) - 1; }
   /// The spans of a row, none for one outside of the first and the last.
   const ColumnSpan* Begin(std::int64_t row) const;
   const ColumnSpan* End(std::int64_t row) const;
 
+  /// Marks the pixels that lie in a window.
   void Mark(RegionMarks& marks) const;
+  /// Says whether a window lies wholly inside or outside.
   RegionCover Cover(const RegionWindow& window) const;
+  /// True when a span of the row holds the column.
   bool Contains(std::int64_t column, std::int64_t row) const;
-  /// Whether the spans of each row are in order and apart.
+  /// True when the spans of each row are in order and apart.
   bool AreApart() const;
 
  private:

@@ -18,6 +18,10 @@ namespace lumo {
 /// Cost: 16 bytes for each different value, and for some that were added last; integers of up to 16
 /// bits are counted in a table once they are many.
 /// Threads: one at a time.
+///
+///     ValueCounter<float> counter;
+///     for (const float value : values) counter.Add(value, 1);
+///     const std::size_t variety = counter.GetEntries().size();
 template <typename T>
 class ValueCounter {
  public:
@@ -26,8 +30,10 @@ class ValueCounter {
     T value;
     double weight;
   };
+  /// Different values up to which floats stay exact.
   static constexpr std::size_t kMostValues = std::size_t{1} << 18;
 
+  /// Counts a value, which is not NaN, with a weight above 0.
   void Add(T value, double weight) {
     if (!table_.empty()) {
       table_[IndexOf(value)] += weight;

@@ -15,13 +15,13 @@ enum class ZonalFigure {
   kMin,
   kMax,
   kMean,
-  kStd,
+  kStd,  ///< of a sample: divided by n - 1
   kSum,
   kMedian,
-  kMajority,
-  kMinority,
-  kVariety,
-  kPercentile
+  kMajority,   ///< the most frequent value
+  kMinority,   ///< the least frequent value
+  kVariety,    ///< the number of different values
+  kPercentile  ///< the value below which a percentage of the pixels lies
 };
 
 /// A figure that is asked for.
@@ -32,13 +32,14 @@ struct ZonalRequest {
 };
 
 /// Reads "count", "min", "max", "mean", "std", "sum", "median", "majority", "minority", "variety"
-/// or "p" and a percentage from 0 to 100. @return false, with the fault told, for anything else.
+/// or "p" and a percentage from 0 to 100. @return false, with the fault set, for anything else.
 VEXG_EXPORT bool ParseZonalRequest(const std::string& text, ZonalRequest& request);
 
-/// Whether a figure needs to know the values, beside their sums.
+/// True for a figure that needs the values, beside their sums.
 VEXG_EXPORT bool NeedsValues(ZonalFigure figure);
 
-/// How much a pixel of a zone weighs. None: each 1. Coverage: the share of it inside the polygon.
+/// Says how much a pixel of a zone weighs. None: each 1. Coverage: the share of it inside the
+/// polygon.
 enum class ZonalWeights : std::int32_t { kNone = 0, kCoverage = 1 };
 
 /// "None", "Coverage".

@@ -10,7 +10,7 @@
 
 namespace lumo {
 
-/// Which figures of which zones are wanted.
+/// Says which figures of which zones are wanted.
 struct ZonalPlan {
   GeometryPtr geometry;  ///< a zone for each record, whose ids count from 0
   ScanOptions options;
@@ -22,18 +22,25 @@ struct ZonalPlan {
 /// Gives the figures of zones of a raster: for each zone, for each band, for each request. NaN
 /// stands for none.
 ///
-/// The raster is read once, block after block in its own order; the zones of a block are gathered
-/// at the same time, each by one thread, so the result doesn't depend on their number. What is
-/// gathered for a zone goes with the last block that it touches. Exists for EightTypes.
+///     ZonalPass<float> pass(raster, plan);
+///     if (!pass.Run(ipc)) return false;  // TakeFault() says why
+///     const double first = pass.GetFigures()[0];
 ///
-/// Failure: false, with the fault told, when a shape can't be carried to the raster, or the raster
+/// The raster is read once, block after block in its own order; the zones of a block are gathered
+/// at the same time, each by one thread, so the result doesn't depend on their number. The values
+/// of a zone are freed with the last block that it touches. Exists for EightTypes.
+///
+/// Failure: false, with the fault set, when a shape can't be carried to the raster, or the raster
 ///          fails; and at an abort.
 template <typename T>
 class VEXG_EXPORT ZonalPass {
  public:
+  /// @param plan  outlives the pass.
   ZonalPass(const RasterPtr<T>& raster, const ZonalPlan& plan);
 
+  /// Reads the raster and computes the figures.
   bool Run(const IPC& ipc);
+  /// The figures, zones by bands by requests, after Run.
   const std::vector<double>& GetFigures() const { return figures_; }
 
  private:

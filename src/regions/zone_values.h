@@ -9,27 +9,37 @@ namespace lumo {
 /// Pixels of one line and band that lie side by side in a zone.
 template <typename T>
 struct ZoneRun {
-  const T* pixels;
-  const unsigned char* states;
-  std::size_t step;  ///< between neighbours
-  std::size_t count;
+  const T* pixels;              ///< the first one
+  const unsigned char* states;  ///< its state
+  std::size_t step;             ///< elements between neighbours
+  std::size_t count;            ///< pixels
 };
 
 /// Gathers the values of one band in one zone. Pixels that are not valid, and NaN, do not count.
+///
+///     ZoneValues<float> zone;
+///     zone.Add({pixels, states, 1, count}, false);
+///     const double mean = zone.Get({ZonalFigure::kMean, 0, "mean"}, false);
+///
+/// Cost: a few numbers, beside a ValueCounter where the values themselves are wanted.
 /// Threads: one at a time.
 template <typename T>
 class ZoneValues {
  public:
   /// Adds pixels of weight 1.
+  /// @param withValues  keep the values too, which median, percentiles, majority, minority and
+  /// variety
+  ///                    need.
   void Add(const ZoneRun<T>& run, bool withValues);
   /// Adds pixels with their weights, `run.count` of them.
   void AddWeighted(const ZoneRun<T>& run, const double* weights, bool withValues);
 
-  /// A figure of what was added; NaN where there is none. The median and percentiles of pixels of
-  /// weight 1 lie between the values at the two ranks next to (n - 1) p / 100 (Hyndman and Fan,
-  /// Sample quantiles in statistical packages, 1996, definition 7). With other weights they are the
-  /// least value up to which p / 100 of all weight lies. The deviation has the divisor n - 1, and
-  /// with other weights their sum. Of values as frequent as one another the least is given.
+  /// A figure of the values that were added; NaN where there is none. The median and percentiles of
+  /// pixels of weight 1 lie between the values at the two ranks next to (n - 1) p / 100 (Hyndman
+  /// and Fan, Sample quantiles in statistical packages, 1996, definition 7). With other weights
+  /// they are the least value up to which p / 100 of all weight lies. The deviation has the divisor
+  /// n - 1, and with other weights their sum. Of values as frequent as one another the least is
+  /// given.
   double Get(const ZonalRequest& request, bool isWeighted);
 
  private:

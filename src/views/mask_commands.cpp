@@ -7,8 +7,8 @@
 #include "views/spectral_subset_raster.h"
 #include "views/view_command.h"
 
-// The commands that say which pixels of a raster count: by a mask, a region, or no-data values.
-// What they make stays in the catalog with count 1.
+// The commands that say which pixels of a raster count: by a mask, a region, or no-data values. The
+// rasters and masks that they make stay in the catalog with count 1.
 
 namespace lumo {
 namespace {

@@ -14,6 +14,14 @@ namespace lumo {
 /// Threads:   every operation may run on many threads at once.
 /// Failure:   over an empty parent IsValid() is false and operations give false, 0 or empty. Bands
 ///            without a mask have no pixel masked.
+///
+///     RasterMaskDef<float> clouds;
+///     clouds.values = Array<float>(ArrayDims(1));
+///     clouds.values[0] = 255;
+///     Array<RasterMaskDef<float>> defs(ArrayDims(1));
+///     defs[0] = clouds;
+///     const RasterMaskPtr mask(new RasterMask(quality, defs));
+///     const RasterPtr<float> clear(new MaskedRaster<float>(raster, mask));
 template <typename T>
 class MaskedRaster final : public ComputedRaster<T> {
  public:

@@ -23,7 +23,7 @@ class NoDataRaster final : public ComputedRaster<T> {
   NoDataRaster(const RasterPtr<T>& parent, bool removeAll, Form description = Form::kTold)
       : NoDataRaster(parent, {}, false, removeAll, description) {}
   /// @param values       compared exactly; NaN is equal to every NaN.
-  /// @param replace      whether only they are no data; else what the parent says is as well.
+  /// @param replace      whether only they are no data; else the parent's no data is as well.
   /// @param description  kTold: the parent's definition as it is; kExact: with the first of the
   ///                     values, which copies and warps take over.
   NoDataRaster(const RasterPtr<T>& parent, const Array<T>& values, bool replace,

@@ -8,7 +8,7 @@
 
 namespace lumo {
 
-/// Which values of which band a mask marks.
+/// Says which values of which band a mask marks.
 template <typename T>
 struct RasterMaskDef {
   unsigned band = 0;
@@ -23,7 +23,7 @@ struct RasterMaskDef {
 /// Threads: the bits do not change once the mask is made, and any number of threads may ask;
 ///          SetInversed may come between their questions.
 /// Failure: a mask whose planes could not be had, or whose raster could not be read, has none and
-///          marks nothing; IsValid() is false, and the fault told.
+///          marks nothing; IsValid() is false, and the fault set.
 class VEXG_EXPORT RasterMask final : public Object {
  public:
   static const unsigned TypeCode;
@@ -42,10 +42,10 @@ class VEXG_EXPORT RasterMask final : public Object {
   ~RasterMask() override;
   bool IsA(unsigned typeCode) const override;
 
-  unsigned Width() const { return width_; }
-  unsigned Height() const { return height_; }
-  unsigned Planes() const { return planeBits_.GetCount(); }
-  unsigned BytesPerPlane() const { return bytesPerPlane_; }
+  unsigned Width() const { return width_; }                  ///< pixels of a line
+  unsigned Height() const { return height_; }                ///< lines
+  unsigned Planes() const { return planeBits_.GetCount(); }  ///< bands that are marked
+  unsigned BytesPerPlane() const { return bytesPerPlane_; }  ///< bits of all pixels, rounded up
   /// The bytes of a plane that is there.
   const unsigned char* PlaneBits(unsigned plane) const { return planeBits_[plane]; }
 
@@ -56,12 +56,12 @@ class VEXG_EXPORT RasterMask final : public Object {
   /// How often the sense has changed since the mask was made.
   std::uint64_t ChangeCount() const { return changes_.load(std::memory_order_relaxed); }
 
-  /// Whether some plane marks the pixel; false outside the mask.
+  /// True when some plane marks the pixel; false outside the mask.
   bool IsMarked(unsigned x, unsigned y) const;
-  /// Whether one plane does; false for one that isn't there.
+  /// True when one plane does; false for one that isn't there.
   bool IsMarked(unsigned x, unsigned y, unsigned plane) const;
 
-  /// Tells of pixels of a line, from (x, y) on, whether some plane marks them, 64 at a time.
+  /// Finds the pixels of a line, from (x, y) on, that some plane marks, 64 at a time.
   /// @param marks  [out] a byte for each, 1 where it is marked, else 0.
   void GetMarks(unsigned x, unsigned y, std::size_t count, unsigned char* marks) const;
 

@@ -5,8 +5,8 @@
 
 namespace lumo {
 
-/// Shows its parent with what lies outside a region of interest marked: state bit OutsideROI is set
-/// there, and cleared inside, whatever the parent says. Pixels stay as they are, and can't be
+/// Shows its parent with the pixels outside a region of interest marked: state bit OutsideROI is
+/// set there, and cleared inside, whatever the parent says. Pixels stay as they are, and can't be
 /// written. Its statistics and histograms are its own. Exists for EightTypes.
 ///
 /// At a pyramid level a pixel is inside as soon as one of those that it stands for is.
@@ -14,7 +14,7 @@ namespace lumo {
 /// Ownership: shares the parent and the definition, whose changes show at the next read.
 /// Threads:   every operation may run on many threads at once.
 /// Failure:   over an empty parent IsValid() is false and operations give false, 0 or empty. A
-///            region that can't be carried to the raster fails a read, with the fault told.
+///            region that can't be carried to the raster fails a read, with the fault set.
 template <typename T>
 class ROIRaster final : public ComputedRaster<T> {
  public:
@@ -33,6 +33,7 @@ class ROIRaster final : public ComputedRaster<T> {
   /// With the changes of the region, so that statistics at hand go when it becomes another one.
   std::uint64_t WriteCount() const override;
 
+  /// The region on the grid of the raster at full resolution.
   const RasterizedROIPtr& Rasterized() const { return rasterized_; }
 
  private:

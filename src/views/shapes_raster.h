@@ -13,10 +13,10 @@ struct ValuedShapes {
   GeometryPtr geometry;
   std::vector<double> values;  ///< for each record, in the order of their ids
   GeoRefPtr geoRef;            ///< of the grid; null for one of pixels
-  unsigned samples = 0;
-  unsigned lines = 0;
-  ScanOptions options;
-  double background = 0;  ///< of the pixels outside
+  unsigned samples = 0;        ///< of the grid
+  unsigned lines = 0;          ///< of the grid
+  ScanOptions options;         ///< how the shapes become pixels
+  double background = 0;       ///< of the pixels outside
   bool isNoData = false;  ///< whether these are not valid, and `background` is their no-data value
 };
 
@@ -29,6 +29,7 @@ struct ValuedShapes {
 template <typename T>
 class ShapesRaster final : public ComputedRaster<T> {
  public:
+  /// @param shapes  are copied, but for the geometry, which is shared.
   explicit ShapesRaster(const ValuedShapes& shapes);
   ~ShapesRaster() override { this->StopComputing(); }
 

@@ -25,7 +25,7 @@ Ring RingAround(std::mt19937& random, double x, double y, double radius) {
   return ring;
 }
 
-/// What is left of a polygon inside a square, by Sutherland and Hodgman; its area.
+/// The area of a polygon's part inside a square, by Sutherland and Hodgman.
 double AreaInSquare(Ring ring, double left, double top) {
   const auto cut = [&](auto inside, auto meet) {
     Ring kept;

@@ -26,14 +26,14 @@ class AreaOptions {
   std::vector<std::string> GetFiles() const;
 
   /// Finds the pixels. Throws HostError when there are none of the raster's.
-  /// @param raster  URI of the open raster, of which `info` tells.
+  /// @param raster  URI of the open raster, which `info` describes.
   /// @param shown   what the user calls it.
   /// @return what AddViews shows.
   RasterInfo Plan(JobSession& session, const String& raster, const RasterInfo& info,
                   const std::string& shown);
 
-  /// Tells where the pixels lie and how many they are, after Plan; empty where all of the raster
-  /// was asked for.
+  /// Says where the pixels lie and how many they are, after Plan; empty where all of the raster was
+  /// asked for.
   /// @param info  of the raster of Plan.
   std::string Describe(const RasterInfo& info) const;
 

@@ -26,7 +26,7 @@ void MapToPixels(const GeoRef& geoRef, const CoordSys& from, Array<double>& poin
 void CheckMapToPixels(const GeoRef& geoRef, const CoordSys& from, const std::string& file,
                       const std::string& option);
 
-/// What the model calls the corner of the first pixel.
+/// The coordinates that the model has for the corner of the first pixel.
 double FirstPixel(const GeoRef& geoRef);
 
 /// Adds a number to the first two coordinates of all points.
