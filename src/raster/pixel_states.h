@@ -21,6 +21,11 @@ VEXG_EXPORT bool AllHaveState(const unsigned char* states, std::size_t count,
 /// True when some state has one of the bits.
 VEXG_EXPORT bool AnyHasState(const unsigned char* states, std::size_t count, unsigned char bits);
 
+/// How many states there are before the first of a valid pixel, and behind the last one; as many as
+/// `count` where none is valid.
+VEXG_EXPORT std::size_t CountLeadingInvalid(const unsigned char* states, std::size_t count);
+VEXG_EXPORT std::size_t CountTrailingInvalid(const unsigned char* states, std::size_t count);
+
 /// True when none of the states has a bit of PixelValueState::NotValid.
 inline bool AllValid(const unsigned char* states, std::size_t count) {
   return !AnyHasState(states, count, PixelValueState::NotValid);

@@ -5,6 +5,7 @@
 #include <cstring>
 
 #include "platform/vector_clones.h"
+#include "raster/pixel_states.h"
 
 namespace lumo {
 namespace {
@@ -58,8 +59,11 @@ StateRuns::StateRuns(PixelValueState::Code bit, Array<unsigned char>& states, In
       fits_(states.GetCount() == width_ * height_ * bands_) {}
 
 void StateRuns::Put(unsigned char* states, std::size_t count, bool on) const {
-  on ? SetBits(states, count, bit_)
-     : KeepBits(states, count, static_cast<unsigned char>(0xFF & ~bit_));
+  if (on) {
+    SetBits(states, count, bit_);
+  } else if (AnyHasState(states, count, bit_)) {  // seldom, and looking costs less than writing
+    KeepBits(states, count, static_cast<unsigned char>(0xFF & ~bit_));
+  }
 }
 
 void StateRuns::PutRun(std::size_t line, std::size_t first, std::size_t count, bool on) {

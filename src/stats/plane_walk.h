@@ -81,13 +81,56 @@ class PlaneWalk {
     const bool parted = tile_.Order() == Interleave::BIP && bands_ > 1;
     for (std::size_t done = 0; done < pixels; done += groupPixels_) {
       const std::size_t count = std::min(groupPixels_, pixels - done);
-      visit(parted ? Parted(first + done * bands_, count) : InPlace(first + done, count));
+      const Stretch valid = parted ? ValidOf(first + done * bands_, count * bands_, bands_)
+                                   : ValidInPlace(first + done, count);
+      if (valid.count == 0) continue;
+      const std::size_t from = done + valid.first;
+      visit(parted ? Parted(first + from * bands_, valid.count)
+                   : InPlace(first + from, valid.count));
     }
   }
 
-  PlaneGroup<T> InPlace(std::size_t first, std::size_t count) const {
+  /// Pixels of a group.
+  struct Stretch {
+    std::size_t first;
+    std::size_t count;
+  };
+
+  /// Leaves the pixels at both ends of a group out that are valid in no band, in steps of whole
+  /// vectors: as outside of a region, where often all those between are valid.
+  /// @param elements  of the group, `step` for each pixel.
+  Stretch ValidOf(std::size_t first, std::size_t elements, std::size_t step) const {
+    constexpr std::size_t kStep = 64;  // pixels
+    const unsigned char* const states = states_ + first;
+    const std::size_t pixels = elements / step;
+    if (IsValidState(states[0]) && IsValidState(states[elements - 1])) return {0, pixels};
+    const std::size_t from = CountLeadingInvalid(states, elements) / step;
+    if (from == pixels) return {0, 0};
+    const std::size_t begin = from / kStep * kStep;
+    const std::size_t end = pixels - CountTrailingInvalid(states, elements) / step;
+    return {begin, std::min(pixels, (end + kStep - 1) / kStep * kStep) - begin};
+  }
+
+  Stretch ValidInPlace(std::size_t first, std::size_t count) const {
+    const std::size_t stride = InPlaceStride();
+    std::size_t begin = count, end = 0;
+    for (std::size_t band = 0; band < bands_; ++band) {
+      const Stretch valid = ValidOf(first + band * stride, count, 1);
+      if (valid.count == 0) continue;
+      begin = std::min(begin, valid.first);
+      end = std::max(end, valid.first + valid.count);
+    }
+    return {std::min(begin, end), end - std::min(begin, end)};
+  }
+
+  /// From one band's plane to the next one's, of a tile whose planes lie in it.
+  std::size_t InPlaceStride() const {
     const std::size_t width = tile_.Width();
-    const std::size_t stride = tile_.Order() == Interleave::BSQ ? width * tile_.Height() : width;
+    return tile_.Order() == Interleave::BSQ ? width * tile_.Height() : width;
+  }
+
+  PlaneGroup<T> InPlace(std::size_t first, std::size_t count) const {
+    const std::size_t stride = InPlaceStride();
     PlaneGroup<T> group{values_ + first, nullptr, stride, count};
     for (std::size_t band = 0; band < bands_; ++band) {
       if (AllValid(states_ + first + band * stride, count)) continue;

@@ -50,9 +50,17 @@ void UnpackBits(std::uint64_t bits, std::size_t count, unsigned char* bytes) {
     std::memset(bytes, static_cast<int>(bits & 1), count);
     return;
   }
-  for (std::size_t i = 0; i < count; ++i) {
-    bytes[i] = static_cast<unsigned char>((bits << i) >> 63);
+  std::size_t i = 0;
+  if constexpr (std::endian::native == std::endian::little) {
+    constexpr std::uint64_t kOnes = 0x0101010101010101, kOwnBit = 0x0102040810204080;
+    for (; i + 8 <= count; i += 8) {
+      // Every byte keeps its own bit of the eight, which then moves to its lowest place.
+      const std::uint64_t eight = (bits << i) >> 56;
+      const std::uint64_t spread = ((((eight * kOnes) & kOwnBit) + 0x7F * kOnes) >> 7) & kOnes;
+      std::memcpy(bytes + i, &spread, 8);
+    }
   }
+  for (; i < count; ++i) bytes[i] = static_cast<unsigned char>((bits << i) >> 63);
 }
 
 template <typename T>

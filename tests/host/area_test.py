@@ -4,7 +4,7 @@ import json
 import sqlite3
 import unittest
 
-from support import DATA, FolderTest, gdal_pixels, needs_data, needs_gdal, read_npy, read_png, run
+from support import DATA, FolderTest, PipeTest, gdal_pixels, needs_data, needs_gdal, read_npy, read_png, run
 
 SCENE = DATA / "landsat7_olinda.tif"
 LEFT, TOP, SIZE, WIDTH, HEIGHT, BANDS = 288776.25, 9120760.75, 28.5, 349, 352, 6
@@ -36,7 +36,7 @@ def feature(number, rect):
 
 @needs_data
 @needs_gdal
-class Areas(FolderTest):
+class Areas(PipeTest, FolderTest):
     @classmethod
     def setUpClass(cls):
         super().setUpClass()
@@ -160,6 +160,19 @@ class Areas(FolderTest):
             for x in range(70):
                 self.assertEqual(part[y * 70 + x], pixels[(y + 20) * samples + x + 30])
                 self.assertEqual(states[y * 70 + x], 0 if inside(2 * (x + 30), 2 * (y + 20)) else 4)
+        # A picture is made of a level of the views, and shows the same.
+        picture = self.folder / "q.png"
+        self.fine("quicklook", copy, picture, "--size", "70", "--region", self.region, "--bands", "0", "--stretch",
+                  "none", "-q")
+        width, height, channels, shown = read_png(picture)
+        self.assertEqual((width, height), (70, 60))
+        for y in range(60):
+            for x in range(70):
+                if inside(2 * (x + 30), 2 * (y + 20)):
+                    self.assertEqual(shown[(y * 70 + x) * channels], part[y * 70 + x])
+                    self.assertEqual(shown[(y * 70 + x + 1) * channels - 1], 255)
+                else:
+                    self.assertEqual(shown[(y * 70 + x + 1) * channels - 1], 0)
 
     def test_polygons_are_those_of_the_area(self):
         made = self.folder / "made.gpkg"
@@ -208,6 +221,14 @@ class Areas(FolderTest):
             values = [v for v in (self.value(x, y, band) for y in range(HEIGHT) for x in range(WIDTH)
                                   if inside(x, y) and self.value(x, y, 5) not in (20, 21)) if v != 66]
             self.assertEqual(told["sum"], sum(values))
+
+    def test_a_server_gives_the_same_and_keeps_nothing_open(self):
+        options = ("--region", self.region, "--no-data", "66", "--mask-band", "5", "--mask-values", "20,21")
+        here = self.stats(*options)
+        self.serve()
+        self.assertEqual(self.stats(*options, "--server", "test"), here)
+        self.fine("copy", SCENE, self.folder / "made.tif", *options, "-q", "--server", "test")
+        self.assertEqual(json.loads(self.fine("open", "test", "--json")), [])
 
     def test_map_points_become_pixels(self):
         point = "-34.9 -8.0\n"
