@@ -38,6 +38,6 @@ if(VEXG_MOLD)
   add_link_options(-fuse-ld=mold)
 endif()
 
-# What nearly every source outside of the library includes, for precompiled headers. The library has
+# Nearly every source outside of the library includes these: precompiled headers. The library has
 # none: its sources prove that each of its headers compiles alone.
 set(VEXG_STANDARD_HEADERS <algorithm> <functional> <map> <memory> <mutex> <string> <vector>)
