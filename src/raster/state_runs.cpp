@@ -27,6 +27,18 @@ VEXG_VECTOR_CLONES void PutByMask(unsigned char* __restrict states, std::size_t 
   }
 }
 
+/// The same for kBands states of each pixel, which lie together.
+template <std::size_t kBands>
+void PutPixelsByMask(unsigned char* __restrict states, std::size_t count,
+                     const unsigned char* __restrict mask, unsigned char set, unsigned char bit) {
+  for (std::size_t i = 0; i < count; ++i, states += kBands) {
+    const auto bits = static_cast<unsigned char>(mask[i] == set ? bit : 0);
+    for (std::size_t band = 0; band < kBands; ++band) {
+      states[band] = static_cast<unsigned char>((states[band] & ~bit) | bits);
+    }
+  }
+}
+
 constexpr std::size_t kGroup = 64;  // pixels that are looked at together
 
 /// True when all bytes of a group are the same, 0 or 1; `value` is that of the first.
@@ -106,11 +118,17 @@ void StateRuns::PutPixels(std::size_t line, std::size_t first, std::size_t count
     }
     return;
   }
-  for (std::size_t i = 0; i < count; ++i, states += bands_) {
-    const auto bits = static_cast<unsigned char>(mask[first + i] == set ? bit_ : 0);
-    for (std::size_t band = 0; band < bands_; ++band) {
-      states[band] = static_cast<unsigned char>((states[band] & ~bit_) | bits);
-    }
+  switch (bands_) {
+    case 2:
+      return PutPixelsByMask<2>(states, count, mask + first, set, bit_);
+    case 3:
+      return PutPixelsByMask<3>(states, count, mask + first, set, bit_);
+    case 4:
+      return PutPixelsByMask<4>(states, count, mask + first, set, bit_);
+    default:
+      for (std::size_t i = first; i < first + count; ++i, states += bands_) {
+        Put(states, bands_, mask[i] == set);
+      }
   }
 }
 

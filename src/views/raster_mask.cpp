@@ -87,10 +87,12 @@ void MarkValues(const T* pixels, std::size_t count, std::size_t step, const Arra
 /// The pixel of a source of `from` pixels for each of `to`.
 std::vector<unsigned> NearestPlaces(unsigned from, unsigned to) {
   std::vector<unsigned> places(to, 0);
-  if (to < 2) return places;
+  if (to < 2 || from == 0) return places;
+  constexpr float kEnd = 4294967296.0F;  // a rounded place may lie there
   for (unsigned i = 0; i < to; ++i) {
     const float share = static_cast<float>(i) / static_cast<float>(to - 1);
-    places[i] = static_cast<unsigned>(static_cast<float>(from - 1) * share);
+    const float place = static_cast<float>(from - 1) * share;
+    places[i] = place < kEnd ? static_cast<unsigned>(place) : from - 1;
   }
   return places;
 }

@@ -28,8 +28,8 @@ constexpr unsigned char StateAt(unsigned x, unsigned y, unsigned band) {
   return static_cast<unsigned char>((x * 5 + y * 3 + band * 2) % 8);
 }
 
-Source MakeSource(bool withStates = true) {
-  Source source(new OrderedTestRaster<Pixel>(kWidth, kHeight, kBands, Interleave::BIL));
+Source MakeSource(bool withStates = true, Interleave order = Interleave::BIL) {
+  Source source(new OrderedTestRaster<Pixel>(kWidth, kHeight, kBands, order));
   for (unsigned y = 0; y < kHeight; ++y)
     for (unsigned x = 0; x < kWidth; ++x)
       for (unsigned b = 0; b < kBands; ++b) {
@@ -315,6 +315,10 @@ TEST(ROIRaster, SetsAndClearsItsBitAlone) {
   EXPECT_FALSE(
       view.PutSubRect({0, 0, 0, 0}, MakeArray<unsigned>({0}), Interleave::BIP, pixels, states));
 
+  for (const Interleave order : {Interleave::BIP, Interleave::BSQ}) {
+    ROIRaster<Pixel> ordered(MakeSource(false, order), region);
+    ExpectNumbers(ordered, [&](unsigned x, unsigned y, unsigned) { return isIn(x, y) ? 0 : 4; });
+  }
   ROIRaster<Pixel> plain(MakeSource(false), region);
   ExpectNumbers(plain, [&](unsigned x, unsigned y, unsigned) { return isIn(x, y) ? 0 : 4; });
   region->SetAddresses(MakeArray<Point2D<unsigned>>({{1, 1}, {8, 8}}));  // the next numbers show it
