@@ -93,12 +93,14 @@ class CreateGeometryROIDefCommand final : public Command {
     where_ = Read<String>("Where").ToUTF8();
     if (HasInput("ScanRules")) options_.rules = Read<ScanRules>("ScanRules");
     if (HasInput("Coordinates")) options_.coordinates = Read<ShapeCoordinates>("Coordinates");
+    std::string files;
     for (const String& path : Read<Array<String>>("Vectors")) {
+      files += (files.empty() ? "" : ", ") + path.ToUTF8();
       if (!AddFile(path.ToUTF8())) return Fail(FaultOfShapes(path.ToUTF8()));
     }
     if (shapes_ == 0) {
-      return Fail(where_.empty() ? "Vectors: there is no shape in it"
-                                 : "Vectors: no shape has " + where_);
+      return Fail(files +
+                  (where_.empty() ? ": there is no shape in it" : ": no shape has " + where_));
     }
     const ROIDefPtr region = MakeRegion();
     CatalogAdd(region);
