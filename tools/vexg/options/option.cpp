@@ -114,15 +114,15 @@ Option Option::Required() {
   return *this;
 }
 
-Option Option::Shows(const char* placeholder) {
-  spec_.shown = placeholder;
+Option Option::Shows(const char* shown) {
+  spec_.shown = shown;
   spec_.isList = spec_.shown.find(',') != std::string::npos;
   return *this;
 }
 
-Option Option::IsFile(const char* placeholder) {
+Option Option::IsFile(const char* shown) {
   spec_.type = OptionType::kFile;
-  return Shows(placeholder);
+  return Shows(shown);
 }
 
 Option Option::Within(std::uint64_t least, std::uint64_t most) {

@@ -66,11 +66,11 @@ class Option {
       : spec_(spec), default_(std::move(defaultText)) {}
 
   Option Required();
-  /// @param placeholder  stands for the value in the help, as FILE. With a comma in it the value is
-  ///                     a list, whose elements may also be typed with blanks between them.
-  Option Shows(const char* placeholder);
+  /// @param shown  stands for the value in the help, as FILE. With a comma in it the value is a
+  ///               list, whose elements may also be typed with blanks between them.
+  Option Shows(const char* shown);
   /// Shows FILE, and lets a shell complete names of files.
-  Option IsFile(const char* placeholder = "FILE");
+  Option IsFile(const char* shown = "FILE");
   /// Refuses whole numbers outside of both bounds, which count.
   Option Within(std::uint64_t least, std::uint64_t most);
   /// Gives a value that a user may type.

@@ -13,30 +13,33 @@ namespace lumo::host {
 ///
 /// The verb says what stands on the source, as commands; making the file, keeping what is known of
 /// the pixels, comparing the file with what was put in, and all that FileVerb does, is done here.
-/// The whole of a verb that masks a raster by another one:
+/// The whole of a verb that leaves out what lies outside the shapes of a file:
 ///
 /// ```
-/// class MaskVerb final : public RasterVerb {
+/// class ClipVerb final : public RasterVerb {
 ///  public:
-///   explicit MaskVerb(OptionSet& line) : RasterVerb(line, "The masked raster") {
-///     line.Add("--by", mask_, "The mask").IsFile().Required();
+///   explicit ClipVerb(OptionSet& line) : RasterVerb(line, "The clipped raster") {
+///     line.Add("--by", shapes_, "The shapes").IsFile().Required();
 ///   }
 ///
 ///  private:
-///   std::vector<std::string> GetFurtherInputs() const override { return {mask_}; }
+///   std::vector<std::string> GetFurtherInputs() const override { return {shapes_}; }
 ///   RasterInfo PlanRaster(JobSession&, const JobResults&, const RasterInfo& source) override {
 ///     return source;  // of the same size, bands and pixel type
 ///   }
 ///   void AddViews(RasterChain& chain) const override {
-///     AddOpen(chain.GetDraft(), "mask", {mask_, ""});
-///     chain.AddView("masked", "CreateMaskRasterCommand").AddVariableInput("MaskURI", "$mask");
-///     chain.GetDraft().Close("close.mask", "$mask");
+///     JobWriterCommand& region =
+///         chain.GetDraft().Open("region", "CreateGeometryROIDefCommand");
+///     region.AddInput("Vectors", ConnStrings({String(AbsoluteName(shapes_))}));
+///     chain.AddView("clipped", "CreateROIRasterCommand").AddVariableInput("ROIDefURI", "$region");
+///     chain.GetDraft().Close("close.region", "$region");
 ///   }
 ///
-///   std::string mask_;
+///   std::string shapes_;
 /// };
 ///
-/// const VerbRegistration registration("mask", "Leaves out what a mask tells", &SetUp<MaskVerb>);
+/// const VerbRegistration registration("clip", "Leaves out what is not in shapes",
+///                                     &SetUp<ClipVerb>);
 /// ```
 class RasterVerb : public FileVerb {
  protected:

@@ -311,7 +311,7 @@ class CalibrateVerb final : public RasterVerb {
     calibrate.AddInput("ScaleFactor", options_.scale);
   }
 
-  /// Of a floating-point type NaN, which no result can be; of others that of the source, unless
+  /// The value is NaN for a floating-point type, which no result can be, else the source's unless
   /// another one is chosen.
   FillValues GetNoData(const FillValues& chosen) const override {
     if (!IsReal(TypeCode(options_))) return chosen;
