@@ -39,8 +39,7 @@ class VEXG_EXPORT MtDataConnectionFactory final : public DataConnectionFactory {
 /// source.
 ///
 /// Threads: any number may open sources at the same time. No lock is held while a plug-in is
-/// called,
-///          so that a source whose opening takes long, or never ends, holds up nobody else.
+///          called, so that a source whose opening takes long, or never ends, holds up nobody else.
 class VEXG_EXPORT DataManager : public ErrorState, public Lockable {
  public:
   // Each does what the factory's operation of the same name does.

@@ -66,9 +66,8 @@ using PointerRoot = typename decltype(FindPointerRoot<T>())::type;
 ///     if (floats.IsNull()) return false;      // they are of another type
 ///     const ColorPtr wrapped(&color, true);   // `color` stays its owner's
 ///
-/// Cost:      a Pointer has the size of a pointer and a table of virtual functions; its block is
-/// one
-///            allocation more, which an empty Pointer makes too. A copy is one atomic addition.
+/// Cost:      a Pointer is two addresses wide, as it has a virtual destructor; its block is
+///            one allocation more, which an empty Pointer makes too. A copy is one atomic addition.
 /// Ownership: a raw pointer given to the constructor changes hands, unless `noDelete` is set, which
 ///            wraps an object that belongs to somebody else and outlives the Pointer.
 /// Threads:   only the count is protected. Copies may live on different threads; one Pointer may

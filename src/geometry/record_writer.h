@@ -18,8 +18,7 @@ struct PolygonRecordOptions {
 /// they touch themselves, see SplitAtTouches. Exists for EightTypes.
 ///
 /// Failure: a polygon that the sink refuses, or whose points can't be carried, gives false;
-/// TakeFault
-///          says why.
+///          TakeFault says why.
 template <typename T>
 class VEXG_EXPORT RecordPolygonWriter final : public PolygonWriter<T, std::uint32_t>,
                                               public FlatPolygonWriter<T, std::uint32_t> {

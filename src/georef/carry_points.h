@@ -11,8 +11,7 @@ namespace lumo {
 /// is missing is left out.
 /// @param points  (points, 2), or pairs in an array of rank 1.
 /// @param extent  gives the map rectangle of the work in `from`, rank 1: min x, min y, max x, max
-/// y;
-///                only called when the datums differ.
+///                y; only called when the datums differ.
 /// @return false when a point is not finite afterwards.
 bool CarryPoints(Array<double>& points, const CoordSys& from, const CoordSys& to,
                  const std::function<Array<double>()>& extent);

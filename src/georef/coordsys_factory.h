@@ -17,8 +17,7 @@ class VEXG_EXPORT CoordSysFuncPtrs {
  public:
   /// Loads the plug-in from `directory`. The globals are set only when all four are there.
   /// @return false, with a line in the log, when the directory is empty, the plug-in can't be
-  /// loaded
-  ///         or a function is missing.
+  ///         loaded or a function is missing.
   bool LoadFuncPtrs(const String& directory);
 
  private:

@@ -16,9 +16,8 @@ VEXG_EXPORT GeoRefPtr ReducedGeoRef(const GeoRef& model, double factorX, double 
 
 /// The model of a part of a raster.
 /// @param form  kTold: the grid as StdGeoRef::SubRectGeoRef gives it, which leaves the tie pixel
-/// where
-///              it was, so that the part lies beside its place unless that is (0, 0). kExact: the
-///              grid tied at the part's first pixel.
+///              where it was, so that the part lies beside its place unless that is (0, 0). kExact:
+///              the grid tied at the part's first pixel.
 VEXG_EXPORT GeoRefPtr PartGeoRef(const GeoRef& model, const SubRect& rect, Form form);
 
 /// Has the camera of a model, if it has one, count from another pixel.

@@ -63,8 +63,7 @@ class VEXG_EXPORT RasterizedGeometry final : public Object {
   static constexpr unsigned kCacheLimit = 10000;  ///< records
 
   /// @param geoRef  of the grid, with its size; null for a grid of `samples` by `lines` pixels, on
-  /// which
-  ///                coordinates are pixels.
+  ///                which coordinates are pixels.
   RasterizedGeometry(const GeometryPtr& geometry, const GeoRefPtr& geoRef, unsigned samples,
                      unsigned lines, const ScanOptions& options = {});
   bool IsA(unsigned typeCode) const override;

@@ -28,8 +28,7 @@ class ZoneValues {
  public:
   /// Adds pixels of weight 1.
   /// @param withValues  keep the values too, which median, percentiles, majority, minority and
-  /// variety
-  ///                    need.
+  ///                    variety need.
   void Add(const ZoneRun<T>& run, bool withValues);
   /// Adds pixels with their weights, `run.count` of them.
   void AddWeighted(const ZoneRun<T>& run, const double* weights, bool withValues);

@@ -26,8 +26,7 @@ namespace lumo {
 /// In both, a band with neither has no bins and counts nothing.
 ///
 /// Failure: bins for which there is no memory, or 2^31 and more of them, leave an object that is
-/// not
-///          valid.
+///          not valid.
 template <typename T>
 class RasterHistogram : public Object {
  public:

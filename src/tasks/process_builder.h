@@ -28,9 +28,8 @@ class ProcessBuilder : public Async, public SelfPointing {
   /// Runs the process once.
   /// @param mode  kHere or kInBackground.
   /// @return with kHere, whether it ran well; with kInBackground, whether it could be started.
-  /// False,
-  ///         with nothing run, when it isn't built, or is to run in the background and no Pointer
-  ///         owns it.
+  ///         False, with nothing run, when it isn't built, or is to run in the background and no
+  ///         Pointer owns it.
   bool RunProcess(unsigned mode);
 
   /// The mode of the last RunProcess; kHere before.

@@ -18,8 +18,7 @@ template <typename T>
 class NoDataRaster final : public ComputedRaster<T> {
  public:
   /// @param removeAll  whether no pixel is no data, whatever the parent says; else the parent's
-  /// bits
-  ///                   stay.
+  ///                   bits stay.
   NoDataRaster(const RasterPtr<T>& parent, bool removeAll, Form description = Form::kTold)
       : NoDataRaster(parent, {}, false, removeAll, description) {}
   /// @param values       compared exactly; NaN is equal to every NaN.

@@ -24,8 +24,7 @@ template <typename T>
 class PyramidRasterImpl final : public ComputedRaster<T> {
  public:
   /// @param raster  the one that the level belongs to: its size and geo-reference are taken over,
-  /// adapted,
-  ///                in the told form unless ExactLevels are wanted.
+  ///                adapted, in the told form unless ExactLevels are wanted.
   PyramidRasterImpl(const Raster<T>& raster, const RasterReaderPtr<T>& reader,
                     const RasterDataConnectionPtr& connection, unsigned level);
   ~PyramidRasterImpl() override { this->StopComputing(); }
