@@ -79,7 +79,7 @@ void LambdaSchedule::FindNearest(std::uint32_t region) {
   double bestCost = kCostLimit;
   ForEachPair(region, [&](std::uint32_t pair) {
     const double cost = pairs_[pair].cost;
-    if (cost > bestCost) return;
+    if (!(cost <= bestCost)) return;  // nor is a cost that is no number ever the least
     const std::uint32_t label = pairs_[pair].Other(region);
     if (cost == bestCost && (best == kNone || label > bestLabel)) return;
     best = pair;

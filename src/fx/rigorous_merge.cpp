@@ -56,21 +56,28 @@ class Groups {
 
 }  // namespace
 
-void RigorousMerge::Begin(std::uint32_t labelCount, std::uint32_t bands, RegionSums sums) {
+void RigorousMerge::Begin(std::uint32_t labelCount, std::uint32_t bands, Form sums) {
   bands_ = bands;
   sums_ = sums;
   const std::size_t labels = std::size_t{labelCount} + 1;
-  counts_.assign(labels, 0.0F);
-  toldSums_.assign(sums == RegionSums::kTold ? labels * bands : 0, 0.0F);
-  exactSums_.assign(sums == RegionSums::kExact ? labels * bands : 0, 0.0);
+  counts_.assign(labels, 0);
+  toldSums_.assign(sums == Form::kTold ? labels * bands : 0, 0.0F);
+  exactSums_.assign(sums == Form::kExact ? labels * bands : 0, 0.0);
+}
+
+/// Gives the pixels of a segment; told sums of ones stop where a float holds no next integer.
+double RigorousMerge::CountOf(std::uint32_t label) const {
+  constexpr std::uint32_t kMostTold = 1U << 24U;
+  const std::uint32_t count = counts_[label];
+  return sums_ == Form::kTold ? std::min(count, kMostTold) : count;
 }
 
 double RigorousMerge::MeanOf(std::uint32_t label, std::uint32_t band) const {
-  const float count = counts_[label];
+  const double count = CountOf(label);
   if (count == 0) return 0;
   const std::size_t at = std::size_t{label} * bands_ + band;
-  if (sums_ == RegionSums::kExact) return exactSums_[at] / static_cast<double>(count);
-  return static_cast<double>(toldSums_[at] / count);
+  if (sums_ == Form::kExact) return exactSums_[at] / count;
+  return static_cast<double>(toldSums_[at] / static_cast<float>(count));
 }
 
 float RigorousMerge::CostOf(const LabelPair& pair) const {
@@ -79,8 +86,7 @@ float RigorousMerge::CostOf(const LabelPair& pair) const {
     const double difference = MeanOf(pair.low, band) - MeanOf(pair.high, band);
     sum += difference * difference;
   }
-  const auto a = static_cast<double>(counts_[pair.low]),
-             b = static_cast<double>(counts_[pair.high]);
+  const double a = CountOf(pair.low), b = CountOf(pair.high);
   // Of two segments without a pixel that counts it is no number, and not below any threshold.
   return static_cast<float>(b * a / (b + a) * sum / static_cast<double>(pair.length));
 }
@@ -89,10 +95,11 @@ std::vector<std::uint32_t> RigorousMerge::Join(const std::vector<LabelPair>& pai
                                                double threshold) {
   Groups groups(counts_.size());
   if (threshold > 0) {
-    std::vector<std::uint32_t> order(pairs.size());
-    std::iota(order.begin(), order.end(), 0U);
-    std::stable_sort(order.begin(), order.end(),
-                     [&](std::uint32_t a, std::uint32_t b) { return pairs[a].low < pairs[b].low; });
+    // By the lower label, and where it is the same as they came.
+    std::vector<std::uint32_t> ends(counts_.size() + 1), order(pairs.size());
+    for (const LabelPair& pair : pairs) ++ends[pair.low + 1];
+    std::partial_sum(ends.begin(), ends.end(), ends.begin());
+    for (std::uint32_t at = 0; at < pairs.size(); ++at) order[ends[pairs[at].low]++] = at;
     for (const std::uint32_t at : order) {
       if (threshold > static_cast<double>(CostOf(pairs[at]))) {
         groups.Join(pairs[at].low, pairs[at].high);

@@ -32,11 +32,15 @@ void Watershed::ForEachNeighbour(std::uint32_t pixel, Visit&& visit) const {
   if (pixel + width_ < drains_.size()) visit(pixel + width_, kDown);
 }
 
+bool Watershed::IsAborted() const {
+  return abort_ != nullptr && abort_->IsSet();
+}
+
 void Watershed::DrainToLower(const std::int32_t* gradient, const std::uint8_t* excluded) {
   const auto isLower = [&](std::size_t neighbour, std::int32_t than) {
     return gradient[neighbour] < than && (excluded == nullptr || excluded[neighbour] == 0);
   };
-  for (std::uint32_t y = 0; y < height_; ++y) {
+  for (std::uint32_t y = 0; y < height_ && !IsAborted(); ++y) {
     for (std::uint32_t x = 0; x < width_; ++x) {
       const std::size_t at = std::size_t{y} * width_ + x;
       const std::int32_t value = gradient[at];
@@ -61,7 +65,7 @@ void Watershed::DrainPlateaus(const std::int32_t* gradient) {
     });
     if (isAtPlateau) front_.push_back(pixel);
   }
-  while (!front_.empty()) {
+  while (!front_.empty() && !IsAborted()) {
     next_.clear();
     for (const std::uint32_t pixel : front_) {
       ForEachNeighbour(pixel, [&](std::uint32_t neighbour, std::uint8_t direction) {
@@ -140,13 +144,16 @@ void Watershed::FollowDrains(std::int32_t* labels) {
 }
 
 std::uint32_t Watershed::Label(const std::int32_t* gradient, const std::uint8_t* excluded,
-                               std::uint32_t width, std::uint32_t height, std::int32_t* labels) {
+                               std::uint32_t width, std::uint32_t height, std::int32_t* labels,
+                               const AbortFlag* abort) {
+  abort_ = abort;
   width_ = width;
   height_ = height;
   drains_.resize(std::size_t{width} * height);
   std::fill_n(labels, drains_.size(), 0);
   DrainToLower(gradient, excluded);
   DrainPlateaus(gradient);
+  if (IsAborted()) return 0;  // not all drains are known
   const std::uint32_t count = NumberMinima(gradient, labels);
   FollowDrains(labels);
   return count;

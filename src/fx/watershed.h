@@ -4,6 +4,7 @@
 #include <cstdint>
 #include <vector>
 
+#include "foundation/run_controls.h"
 #include "platform/export.h"
 
 namespace lumo {
@@ -33,11 +34,15 @@ class VEXG_EXPORT Watershed {
   /// @param excluded  not 0 for each pixel that takes no part; null when all do.
   /// @param labels    [out] 1, 2, ... in the order of the minima's gradients, and of their first
   ///                  pixels in the rows where these are equal; 0 for excluded pixels.
+  /// @param abort     looked at now and then; null for none. Once it is set the labels mean
+  /// nothing.
   /// @return the number of labels.
   std::uint32_t Label(const std::int32_t* gradient, const std::uint8_t* excluded,
-                      std::uint32_t width, std::uint32_t height, std::int32_t* labels);
+                      std::uint32_t width, std::uint32_t height, std::int32_t* labels,
+                      const AbortFlag* abort = nullptr);
 
  private:
+  bool IsAborted() const;
   void DrainToLower(const std::int32_t* gradient, const std::uint8_t* excluded);
   void DrainPlateaus(const std::int32_t* gradient);
   std::uint32_t NumberMinima(const std::int32_t* gradient, std::int32_t* labels);
@@ -47,6 +52,7 @@ class VEXG_EXPORT Watershed {
   template <typename Visit>
   void ForEachNeighbour(std::uint32_t pixel, Visit&& visit) const;
 
+  const AbortFlag* abort_ = nullptr;
   std::uint32_t width_ = 0;
   std::uint32_t height_ = 0;
   std::vector<std::uint8_t> drains_;  // of each pixel

@@ -4,6 +4,8 @@
 #include <charconv>
 #include <string>
 
+#include "foundation/scientific_notation.h"
+
 namespace lumo {
 namespace {
 
@@ -62,26 +64,6 @@ bool ReadBound(std::istream& in, T& value) {
     return true;
   }
 }
-
-/// Sets the notation of a stream and puts it back.
-class ScientificNotation {
- public:
-  explicit ScientificNotation(std::ostream& out)
-      : out_(out), flags_(out.flags()), precision_(out.precision(16)) {
-    out.setf(std::ios::scientific, std::ios::floatfield);
-  }
-  ~ScientificNotation() {
-    out_.flags(flags_);
-    out_.precision(precision_);
-  }
-  ScientificNotation(const ScientificNotation&) = delete;
-  ScientificNotation& operator=(const ScientificNotation&) = delete;
-
- private:
-  std::ostream& out_;
-  std::ios::fmtflags flags_;
-  std::streamsize precision_;
-};
 
 }  // namespace
 

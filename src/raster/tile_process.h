@@ -67,10 +67,10 @@ class TileProcess : public Base {
     return Slot{this->GetPipeline().TakeTokenArg()};
   }
 
-  /// Places a stage of its own class, which sees `slots` and is made from `setup`.
-  template <typename TaskClass>
-  void AddTask(const Array<ArgID>& slots, const ObjectPtr& setup) {
-    Place(std::make_unique<ManagedTask<TaskClass>>(), slots, setup);
+  /// Places a stage of its own class, which sees `slots` and is made from the objects of `setup`.
+  template <typename TaskClass, typename... Setup>
+  void AddTask(const Array<ArgID>& slots, const Setup&... setup) {
+    Place(std::make_unique<ManagedTask<TaskClass>>(), slots, {ObjectPtr(setup)...});
   }
 
   /// Places a stage that reads the tiles of an iterator row by row. The first one sets the number
@@ -106,12 +106,13 @@ class TileProcess : public Base {
 
  private:
   void Place(std::unique_ptr<TaskFactory> stage, const Array<ArgID>& slots,
-             const ObjectPtr& setup) {
+             std::initializer_list<ObjectPtr> setup) {
     Process& process = this->GetPipeline();
-    Array<ArgID> setupArgs;
-    if (!setup.IsNull()) {
-      setupArgs = ArgIDs({process.TakeSetupArg()});
-      this->SetArg(setupArgs[0], setup);
+    Array<ArgID> setupArgs{ArrayDims(static_cast<unsigned>(setup.size()))};
+    unsigned at = 0;
+    for (const ObjectPtr& object : setup) {
+      setupArgs[at] = process.TakeSetupArg();
+      this->SetArg(setupArgs[at++], object);
     }
     placed_ = placed_ && process.AddTask(process.GetTaskCount(),
                                          TaskDescriptor(stage.get(), slots, setupArgs));

@@ -124,6 +124,7 @@ bool CustomProcess<Initializer, Stage, Terminator>::Run(ArgList& args) {
     BeginRun();
     unsigned tokens = 0;
     for (const auto& stage : stages) tokens += stage->IsParallel() ? ThreadLimit::GetCurrent() : 1;
+    if (GetTokenLimit() != 0) tokens = std::min(tokens, GetTokenLimit());
     const bool ran = RunPipeline<TaskToken>(initializer, chain, terminator, tokens);
     if (ran && !HasFailed()) return true;
     const String fault = GetFault();

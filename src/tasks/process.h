@@ -93,6 +93,11 @@ class VEXG_EXPORT BasicProcess : public ErrorState, public Lockable {
   void SetTotalTokens(std::uint64_t tokens) { totalTokens_ = tokens; }
   std::uint64_t GetTotalTokens() const { return totalTokens_; }
 
+  /// Bounds the tokens in flight, for stages whose tokens take much memory; 0 for as many as the
+  /// stages can work on at once.
+  void SetTokenLimit(unsigned tokens) { tokenLimit_ = tokens; }
+  unsigned GetTokenLimit() const { return tokenLimit_; }
+
   /// True when no more tokens are to be made and no stage is to do more work: at the end of the
   /// data, after a failure, or when the abort flag is set.
   bool ShouldStop() const;
@@ -121,6 +126,7 @@ class VEXG_EXPORT BasicProcess : public ErrorState, public Lockable {
   ArgID nextSetupArg_ = 0;
   ArgID nextTokenArg_ = 0;
   std::uint64_t totalTokens_ = 0;
+  unsigned tokenLimit_ = 0;
   IPC ipc_;
 
   // The state of a run, under the lock.

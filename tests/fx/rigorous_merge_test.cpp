@@ -79,14 +79,14 @@ TEST(RigorousMerge, GivesTheComponentsOfTheGraphBelowTheThreshold) {
 }
 
 TEST(RigorousMerge, ToldSumsLoseWhatAFloatCantHold) {
-  for (const RegionSums sums : {RegionSums::kTold, RegionSums::kExact}) {
+  for (const Form sums : {Form::kTold, Form::kExact}) {
     RigorousMerge merge;
     merge.Begin(2, 1, sums);
     Add(merge, 1, 1, 16'777'216.0);  // 2^24
     Add(merge, 1, 3, 1.0);           // told: each is lost
     Add(merge, 2, 1, 4'194'304.75);  // the exact mean of 1
     const std::vector<std::uint32_t> numbers = merge.Join({{1, 2, 1}}, 0.1);
-    EXPECT_EQ(numbers[1] == numbers[2], sums == RegionSums::kExact);
+    EXPECT_EQ(numbers[1] == numbers[2], sums == Form::kExact);
   }
 }
 

@@ -1,0 +1,268 @@
+#include <algorithm>
+#include <numeric>
+
+#include "foundation/fault.h"
+#include "foundation/scientific_notation.h"
+#include "fx/segment_command.h"
+#include "fx/variance_process.h"
+#include "raster/pixel_types.h"
+#include "stats/raster_histogram.h"
+
+namespace lumo {
+
+std::span<const EnumWord<SegmentAlgorithm>> WordsOf(SegmentAlgorithm) {
+  static constexpr EnumWord<SegmentAlgorithm> kWords[] = {
+      {"Sobel", SegmentAlgorithm::kSobel}, {"Intensity", SegmentAlgorithm::kIntensity}};
+  return kWords;
+}
+
+SegmentAlgorithm SegmentCommand::ReadAlgorithm() const {
+  return Read<int>("SegmentAlgorithm") == 1 ? SegmentAlgorithm::kSobel
+                                            : SegmentAlgorithm::kIntensity;
+}
+
+bool SegmentCommand::CheckAlike(const BasicRaster& segment, const BasicRaster& merge) {
+  if (segment.DataType() != merge.DataType()) {
+    SetFault("MergeURI: the raster has another pixel type than that of SegmentURI");
+    return false;
+  }
+  if (segment.Samples() != merge.Samples() || segment.Lines() != merge.Lines()) {
+    SetFault("MergeURI: the raster has another size than that of SegmentURI");
+    return false;
+  }
+  return true;
+}
+
+namespace {
+
+template <typename T>
+String ScientificText(const T& value) {
+  std::ostringstream out = MakeTextWriter();
+  const ScientificNotation notation(out);
+  out << value;
+  return String(out.str());
+}
+
+constexpr unsigned kLambdaBins = 10000;
+
+const CommandDeclaration kSegmentMerge{
+    "FxTileSegmentMergeCommand",
+    "Feature extraction",
+    "Segments a raster into labels, or counts what merging its segments costs.",
+    {{"SegmentURI", Presence::kRequired, ValueKind::kURI,
+      "the raster from which the gradients are computed"},
+     {"SegmentAlgorithm", Presence::kRequired, ValueKind::kInteger,
+      "1: the largest Sobel gradient of the bands; else the mean of the bands"},
+     {"SegmentValue", Presence::kRequired, ValueKind::kNumber,
+      "gradients up to this one are one flat level"},
+     {"MinGradient", Presence::kRequired, ValueKind::kNumber, "the gradient that becomes level 0"},
+     {"MaxGradient", Presence::kRequired, ValueKind::kNumber,
+      "the gradient that becomes the highest level"},
+     {"MergeURI", Presence::kRequired, ValueKind::kURI,
+      "the raster whose bands drive merging, of the same size and pixel type"},
+     {"MergeAlgorithm", Presence::kOptional, ValueKind::kInteger,
+      "1: full lambda schedule; 2: rigorous; others: no merging; 1 when absent"},
+     {"MergeValue", Presence::kOptional, ValueKind::kNumber,
+      "cost up to which segments are merged; none unless above 0, as when absent"},
+     {"StretchValue", Presence::kRequired, ValueKind::kNumber, "the highest level"},
+     {"LambdaEstimate", Presence::kRequired, ValueKind::kBoolean,
+      "count the costs of merging, and write no raster"},
+     {"LabelURI", Presence::kOptional, ValueKind::kURI,
+      "the raster of one band and type Int32 that receives the labels; needed without an estimate"},
+     {"TileMemorySize", Presence::kOptional, ValueKind::kInteger,
+      "bytes of the pixels of a tile; 8388608 when absent"},
+     {"TileBorderSize", Presence::kOptional, ValueKind::kInteger,
+      "overlap of the tiles on each side, in pixels; 1 when absent"},
+     {"SegmentBorder", Presence::kOptional, ValueKind::kInteger,
+      "1: an image of the borders between segments, of 0 and 1, instead of labels"},
+     {"Sums", Presence::kOptional, ValueKind::kWord,
+      "how the rigorous merge adds up. Told: in single precision; Exact: in double precision", "",
+      &WordsIn<Form>}},
+    {{"LambdaHistogram", ValueKind::kIntegerArray,
+      "cumulative counts of the costs of all merges, in 10000 bins from 0 on"},
+     {"LambdaBinSize", ValueKind::kNumber, "width of these bins"}}};
+
+class FxTileSegmentMergeCommand final : public SegmentCommand {
+  CommandResult Execute() override {
+    if (!CheckInputs()) return Fail();
+    const BasicRasterPtr segment = FindRaster("SegmentURI");
+    const BasicRasterPtr merge = segment ? FindRaster("MergeURI") : BasicRasterPtr();
+    if (!merge || !CheckAlike(*segment, *merge)) return Fail();
+    const bool isEstimate = Read<bool>("LambdaEstimate");
+    BasicRasterPtr labels;
+    if (!isEstimate) {
+      labels = FindRaster("LabelURI");
+      if (!labels || !CheckLabels(*segment, *labels)) return Fail();
+    }
+    SegmentRequest request;
+    if (!ReadRequest(*segment, request)) return Fail();
+    const Pointer<Array<unsigned>> histogram(new Array<unsigned>(ArrayDims(kLambdaBins)));
+    const ScalarPtr<double> binSize(new Scalar<double>(0.0));
+    std::fill(histogram->begin(), histogram->end(), 0U);
+    bool well = false;
+    const bool isReal = DispatchType(EightTypes{}, segment->DataType(), [&]<typename T>() {
+      const RasterPtr<T> from(segment), by(merge);
+      well = isEstimate ? Run<RasterTileWatershedSegmentFLSEstimateProcess<T>>(from, by, request,
+                                                                               histogram, binSize)
+                        : Segment<T>(from, by, RasterPtr<std::int32_t>(labels), request);
+      return true;
+    });
+    if (!isReal) return Fail("SegmentURI: the raster has no real pixels of at most 64 bits");
+    if (!well) return Fail(TakeFaultOr("the raster could not be segmented"));
+    Write("LambdaHistogram", *histogram);
+    Result("LambdaBinSize") = MakeText(ScientificText(binSize->value));
+    return Succeed();
+  }
+
+  static bool CheckLabels(const BasicRaster& segment, const BasicRaster& labels) {
+    constexpr auto kLabelType = kDataTypeOf<std::int32_t>;
+    const char* const fault =
+        labels.DataType() != kLabelType ? "LabelURI: the raster is not of type Int32"
+        : labels.Bands() != 1           ? "LabelURI: the raster has more than one band"
+        : labels.Samples() != segment.Samples() || labels.Lines() != segment.Lines()
+            ? "LabelURI: the raster has another size than that of SegmentURI"
+        : !labels.CanWrite() ? "LabelURI: the raster can't be written"
+                             : nullptr;
+    if (fault != nullptr) SetFault(fault);
+    return fault == nullptr;
+  }
+
+  bool ReadRequest(const BasicRaster& segment, SegmentRequest& request) {
+    const auto low = Read<double>("MinGradient"), high = Read<double>("MaxGradient");
+    const auto stretch = Read<double>("StretchValue");
+    request.algorithm = ReadAlgorithm();
+    request.stretch = {low, high, 0.0, stretch};
+    request.limits = ClipLimits::Of(low, high, Read<double>("SegmentValue"), stretch);
+    const int mergeAlgorithm = HasInput("MergeAlgorithm") ? Read<int>("MergeAlgorithm") : 1;
+    isRigorous_ = mergeAlgorithm == 2;
+    request.mergeValue =
+        mergeAlgorithm == 1 || mergeAlgorithm == 2 ? Read<double>("MergeValue") : 0.0;
+    request.sums = Read<Form>("Sums");
+    request.bordersOnly = Read<int>("SegmentBorder") == 1;
+    return ReadTiles(segment, request);
+  }
+
+  bool ReadTiles(const BasicRaster& segment, SegmentRequest& request) {
+    constexpr std::int64_t kMost = 0xFFFFFFFF;
+    const auto bytes = HasInput("TileMemorySize") ? Read<std::int64_t>("TileMemorySize")
+                                                  : std::int64_t{kTileBudget};
+    const auto border =
+        HasInput("TileBorderSize") ? Read<std::int64_t>("TileBorderSize") : std::int64_t{1};
+    if (bytes < 0 || bytes > kMost) {
+      SetFault("TileMemorySize: a tile has 0 to 4294967295 bytes");
+      return false;
+    }
+    request.tileBytes = static_cast<unsigned>(bytes);
+    const SegmentGrid grid(segment, DataTypeBytes(segment.DataType()), request.tileBytes, 1);
+    if (border < 0 || (!grid.IsOneTile() && border > std::int64_t{grid.side})) {
+      SetFault("TileBorderSize: a border has 0 to " + std::to_string(grid.side) +
+               " pixels, the side of a tile");
+      return false;
+    }
+    request.tileBorder = static_cast<unsigned>(std::min(border, kMost));
+    return true;
+  }
+
+  template <typename Process, typename... Args>
+  bool Run(const Args&... args) {
+    Process process(args..., GetIPC());
+    return process.RunProcess(process.kHere);
+  }
+
+  template <typename T>
+  bool Segment(const RasterPtr<T>& segment, const RasterPtr<T>& merge,
+               const RasterPtr<std::int32_t>& labels, const SegmentRequest& request) {
+    return isRigorous_
+               ? Run<RasterTileWatershedSegmentLambdaMergeProcess<T>>(segment, merge, labels,
+                                                                      request)
+               : Run<RasterTileWatershedSegmentFLSMergeProcess<T>>(segment, merge, labels, request);
+  }
+
+  bool isRigorous_ = false;
+};
+
+const CommandFactoryT<FxTileSegmentMergeCommand> segmentMergeFactory(kSegmentMerge);
+
+const CommandDeclaration kHistogram{
+    "FxTileSegmentHistogramCommand",
+    "Feature extraction",
+    "Counts the gradients of a raster.",
+    {{"SegmentURI", Presence::kRequired, ValueKind::kURI, "the raster"},
+     {"HistogramMin", Presence::kRequired, ValueKind::kNumber, "smallest gradient that counts"},
+     {"HistogramMax", Presence::kRequired, ValueKind::kNumber, "largest gradient that counts"},
+     {"SegmentAlgorithm", Presence::kRequired, ValueKind::kInteger,
+      "1: the largest Sobel gradient of the bands; else the mean of the bands"},
+     {"HistogramBins", Presence::kOptional, ValueKind::kInteger,
+      "how many bins between the two; when absent, bins of width 1, or 65000 where these were more "
+      "than 65001"}},
+    {{"SegmentHistogram", ValueKind::kNumberArray,
+      "cumulative counts of the bins, divided by the last"},
+     {"SegmentBinSize", ValueKind::kNumber, "width of the bins"},
+     {"SegmentMin", ValueKind::kNumber, "always 0"}}};
+
+class FxTileSegmentHistogramCommand final : public SegmentCommand {
+  CommandResult Execute() override {
+    if (!CheckInputs()) return Fail();
+    const BasicRasterPtr raster = FindRaster("SegmentURI");
+    if (!raster) return Fail();
+    const auto min = Read<double>("HistogramMin"), max = Read<double>("HistogramMax");
+    if (!(max >= min)) return Fail("HistogramMax is below HistogramMin");
+    std::optional<unsigned> bins;
+    if (HasInput("HistogramBins")) {
+      const auto given = Read<std::int64_t>("HistogramBins");
+      constexpr std::int64_t kMost = 1 << 24;
+      if (given < 1 || given > kMost) return Fail("HistogramBins: there are 1 to 16777216 bins");
+      bins = static_cast<unsigned>(given);
+    }
+    GradientHistogram histogram;
+    if (!CountGradients(raster, ReadAlgorithm(), {min, max, bins}, GetIPC(), histogram)) {
+      return Fail(TakeFaultOr("the gradients could not be counted"));
+    }
+    Result("SegmentHistogram") = MakeText(ScientificText(histogram.shares));
+    Result("SegmentBinSize") = MakeText(ScientificText(histogram.binSize));
+    Result("SegmentMin") = MakeText(ScientificText(0.0));
+    return Succeed();
+  }
+};
+
+const CommandFactoryT<FxTileSegmentHistogramCommand> histogramFactory(kHistogram);
+
+const CommandDeclaration kVariance{
+    "FxTileVarianceCommand",
+    "Feature extraction",
+    "Computes the variance of each tile of 512 by 512 pixels.",
+    {{"MergeURI", Presence::kRequired, ValueKind::kURI, "the raster"}},
+    {{"TileVariances", ValueKind::kNumberArray,
+      "mean of the sample variances of the bands, by tile column and tile row"},
+     {"PixelCounts", ValueKind::kIntegerArray,
+      "pixels that count, of the last band that has more than one"},
+     {"TileSubrects", ValueKind::kIntegerArray,
+      "first and last sample, first and last line of each tile"}}};
+
+class FxTileVarianceCommand final : public RasterCommand {
+  CommandResult Execute() override {
+    if (!CheckInputs()) return Fail();
+    const BasicRasterPtr raster = FindRaster("MergeURI");
+    if (!raster) return Fail();
+    TileVariances result;
+    bool well = false;
+    const bool isReal = DispatchType(EightTypes{}, raster->DataType(), [&]<typename T>() {
+      const RasterIteratorPtr<T> tiles(new RasterIteratorTile<T>(RasterPtr<T>(raster)));
+      if (!result.Resize(tiles->Columns(), tiles->Rows())) return true;
+      RasterVarianceSubrectProcess<T> process(tiles, result, GetIPC());
+      well = process.RunProcess(process.kHere);
+      return true;
+    });
+    if (!isReal) return Fail("MergeURI: the raster has no real pixels of at most 64 bits");
+    if (!well) return Fail(TakeFaultOr("the variances could not be computed"));
+    Result("TileVariances") = MakeText(ScientificText(result.variances));
+    Write("PixelCounts", result.pixelCounts);
+    Write("TileSubrects", result.subrects);
+    return Succeed();
+  }
+};
+
+const CommandFactoryT<FxTileVarianceCommand> varianceFactory(kVariance);
+
+}  // namespace
+}  // namespace lumo
