@@ -14,40 +14,35 @@ std::size_t HashOf(std::uint64_t key) {
 
 void LabelPairs::Begin(std::size_t labelCount) {
   pairs_.clear();
+  pairs_.reserve(3 * labelCount);  // more pairs of areas touch in no plane
   std::size_t size = kLeastTable;
-  while (size < labelCount * 8) size *= 2;  // areas have six neighbours at most on the average
-  keys_.assign(size, 0);
-  numbers_.resize(size);
+  while (size < labelCount * 6) size *= 2;
+  table_.assign(size, 0);
   lastKey_ = 0;
 }
 
 std::size_t LabelPairs::PlaceOf(std::uint64_t key) const {
-  const std::size_t mask = keys_.size() - 1;
+  const std::size_t mask = table_.size() - 1;
   std::size_t at = HashOf(key) & mask;
-  while (keys_[at] != key && keys_[at] != 0) at = (at + 1) & mask;
+  while (table_[at] != 0 && KeyOf(pairs_[table_[at] - 1]) != key) at = (at + 1) & mask;
   return at;
 }
 
 void LabelPairs::Grow() {
-  keys_.assign(keys_.size() * 2, 0);
-  numbers_.resize(keys_.size());
+  table_.assign(table_.size() * 2, 0);
   for (std::uint32_t number = 0; number < pairs_.size(); ++number) {
-    const std::uint64_t key = KeyOf(pairs_[number].low, pairs_[number].high);
-    const std::size_t at = PlaceOf(key);
-    keys_[at] = key;
-    numbers_[at] = number;
+    table_[PlaceOf(KeyOf(pairs_[number]))] = number + 1;
   }
 }
 
 std::uint32_t LabelPairs::FindOrAdd(std::uint64_t key) {
   const std::size_t at = PlaceOf(key);
-  if (keys_[at] == key) return numbers_[at];
+  if (table_[at] != 0) return table_[at] - 1;
   const auto number = static_cast<std::uint32_t>(pairs_.size());
-  keys_[at] = key;
-  numbers_[at] = number;
   pairs_.push_back(
       {static_cast<std::uint32_t>(key >> 32), static_cast<std::uint32_t>(key & 0xFFFFFFFF), 0});
-  if (pairs_.size() * 2 > keys_.size()) Grow();
+  table_[at] = number + 1;
+  if (pairs_.size() * 4 > table_.size() * 3) Grow();
   return number;
 }
 

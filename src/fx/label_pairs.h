@@ -45,13 +45,13 @@ class VEXG_EXPORT LabelPairs {
   static std::uint64_t KeyOf(std::uint32_t low, std::uint32_t high) {
     return (std::uint64_t{low} << 32) | high;
   }
+  static std::uint64_t KeyOf(const LabelPair& pair) { return KeyOf(pair.low, pair.high); }
   std::uint32_t FindOrAdd(std::uint64_t key);
   std::size_t PlaceOf(std::uint64_t key) const;
   void Grow();
 
   std::vector<LabelPair> pairs_;
-  std::vector<std::uint64_t> keys_;  // open addressing; 0 for a free place, as no pair is (0, 0)
-  std::vector<std::uint32_t> numbers_;
+  std::vector<std::uint32_t> table_;  // open addressing: the number of a pair and 1; 0 is free
   std::uint64_t lastKey_ = 0;
   std::uint32_t lastPair_ = 0;
 };

@@ -52,8 +52,8 @@ WatershedProcess<T>::WatershedProcess(const char* name, const RasterPtr<T>& segm
       labelCounts_(new Array<unsigned>(ArrayDims(grid_.columns * grid_.rows))) {
   std::fill(labelCounts_->begin(), labelCounts_->end(), 0U);
   if (merge.Get() != segment.Get()) mergeTiles_ = detail::SquaresOf(merge, grid_, grid_.border);
-  // One tile is read and one written while each thread works on one.
-  this->GetPipeline().SetTokenLimit(ThreadLimit::GetCurrent() + 2);
+  // While each thread works on a tile, one is read or written.
+  this->GetPipeline().SetTokenLimit(ThreadLimit::GetCurrent() + 1);
 }
 
 template <typename T>

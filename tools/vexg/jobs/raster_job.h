@@ -122,19 +122,25 @@ void CheckReturn(const JobResults& results, const char* step, const std::string&
 /// Has a server run a job of one verb. Throws HostError as a JobSession does.
 JobResults RunOnServer(const ServerOptions& server, const JobDraft& draft);
 
-/// How far one command of a job has come, where the commands run one after the other.
+/// How far some commands of a job have come, where the commands run one after the other.
 class StepProgress final : public ProgressReport {
  public:
-  /// @param step  position of the command, of `steps`.
-  StepProgress(const ProgressReportPtr& job, std::size_t step, std::size_t steps)
-      : job_(job), step_(static_cast<double>(step)), steps_(static_cast<double>(steps)) {
+  /// @param first  position of the first of the commands.
+  /// @param last   position of the last of them.
+  /// @param steps  how many commands the job has.
+  StepProgress(const ProgressReportPtr& job, std::size_t first, std::size_t last, std::size_t steps)
+      : job_(job),
+        first_(static_cast<double>(first)),
+        count_(static_cast<double>(last - first + 1)),
+        steps_(static_cast<double>(steps)) {
     job_->Update(0.0);  // what it shows is of the job before
   }
-  double GetProgress() const override { return job_->GetProgress() * steps_ - step_; }
+  double GetProgress() const override { return (job_->GetProgress() * steps_ - first_) / count_; }
 
  private:
   ProgressReportPtr job_;
-  double step_;
+  double first_;
+  double count_;
   double steps_;
 };
 

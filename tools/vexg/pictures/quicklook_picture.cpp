@@ -202,4 +202,29 @@ QuicklookPicture::Bytes QuicklookPicture::Draw(const Palette& palette) const {
   return bytes;
 }
 
+void QuicklookPicture::DrawOutlines(Bytes& picture) const {
+  const bool isGrey = picture.channels < 3;
+  const bool hasAlpha = picture.channels % 2 == 0;
+  const std::size_t width = columns_.size(), height = lines_.size();
+  Bytes drawn;
+  drawn.channels = hasAlpha ? 4 : 3;
+  drawn.pixels.resize(width * height * drawn.channels);
+  const std::vector<double>& labels = values_.front();
+  const auto differs = [&](std::size_t a, std::size_t b) {
+    return labels[a] != labels[b] && !(std::isnan(labels[a]) && std::isnan(labels[b]));
+  };
+  for (std::size_t y = 0, at = 0; y < height; ++y) {
+    for (std::size_t x = 0; x < width; ++x, ++at) {
+      const unsigned char* const from = &picture.pixels[at * picture.channels];
+      unsigned char* const to = &drawn.pixels[at * drawn.channels];
+      const bool isLine =
+          (x + 1 < width && differs(at, at + 1)) || (y + 1 < height && differs(at, at + width));
+      constexpr unsigned char kYellow[] = {255, 255, 0};
+      for (unsigned i = 0; i < 3; ++i) to[i] = isLine ? kYellow[i] : from[isGrey ? 0 : i];
+      if (hasAlpha) to[3] = isLine ? 255 : from[picture.channels - 1];
+    }
+  }
+  picture = std::move(drawn);
+}
+
 }  // namespace lumo::host

@@ -42,6 +42,10 @@ class QuicklookPicture {
   /// The picture in the colours of a table.
   Bytes Draw(const Palette& palette) const;
 
+  /// Draws lines, in yellow, over a picture of the same size: where the value of the first band
+  /// differs from that of the pixel on the right or below.
+  void DrawOutlines(Bytes& picture) const;
+
  private:
   bool IsShown(std::size_t pixel) const;
   Bytes MakeBytes(unsigned colors) const;

@@ -34,7 +34,8 @@ bool HoldsAllPixels(const std::string& format) {
 }  // namespace
 
 void TargetOptions::AddTo(OptionSet& line, const std::string& meaning) {
-  line.Add("output", output, meaning).IsFile("OUT").Required();
+  Option option = line.Add("output", output, meaning).IsFile("OUT");
+  if (isRequired) option.Required();
   line.Add("--format", format,
            "Key of its format, see vexg formats; by default from its name's ending")
       .Shows("KEY");
@@ -91,11 +92,21 @@ void CheckSame(const RasterInfo& made, const RasterInfo& wanted, const std::stri
   }
 }
 
+ProgressReportPtr ProgressOfSteps(const JobSession& session, const JobDraft& draft,
+                                  const std::string& first, const std::string& last) {
+  const auto& steps = draft.GetSteps();
+  const auto find = [&](const std::string& name) {
+    std::size_t step = 0;
+    while (steps[step].name != String(name)) ++step;
+    return step;
+  };
+  return ProgressReportPtr(
+      new StepProgress(session.GetProgress(), find(first), find(last), steps.size()));
+}
+
 ProgressReportPtr ProgressOfStep(const JobSession& session, const JobDraft& draft,
                                  const std::string& name) {
-  std::size_t step = 0;
-  while (draft.GetSteps()[step].name != String(name)) ++step;
-  return ProgressReportPtr(new StepProgress(session.GetProgress(), step, draft.GetSteps().size()));
+  return ProgressOfSteps(session, draft, name, name);
 }
 
 }  // namespace lumo::host

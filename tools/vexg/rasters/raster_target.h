@@ -12,8 +12,9 @@ namespace lumo::host {
 /// A raster file to make, as the command line names it.
 struct TargetOptions {
   std::string output;
-  std::string format;   ///< key; empty: the one of the name's ending
-  bool strict = false;  ///< what the format does not keep is a failure
+  bool isRequired = true;  ///< else the verb may make something else
+  std::string format;      ///< key; empty: the one of the name's ending
+  bool strict = false;     ///< what the format does not keep is a failure
 
   /// @param meaning  what the file is, for the help.
   void AddTo(OptionSet& line, const std::string& meaning);
@@ -58,5 +59,8 @@ void CheckSame(const RasterInfo& made, const RasterInfo& wanted, const std::stri
 /// Progress of the step of this name, of a draft whose steps run one after the other.
 ProgressReportPtr ProgressOfStep(const JobSession& session, const JobDraft& draft,
                                  const std::string& name);
+/// Progress of the steps from one to another.
+ProgressReportPtr ProgressOfSteps(const JobSession& session, const JobDraft& draft,
+                                  const std::string& first, const std::string& last);
 
 }  // namespace lumo::host

@@ -4,8 +4,9 @@
 
 namespace lumo::host {
 
-void RasterVerb::AddFilesTo(OptionSet& line, const std::string& meaning) {
+void RasterVerb::AddFilesTo(OptionSet& line, const std::string& meaning, bool isRequired) {
   GetSource().AddTo(line);
+  target_.isRequired = isRequired;
   AddOutputTo(line, meaning);
 }
 
@@ -54,8 +55,14 @@ void RasterVerb::Plan(JobSession& session, const JobResults& opened) {
   planned_ = PlanRaster(session, opened, source);
 }
 
-std::uint64_t RasterVerb::GetBytes(std::size_t /*output*/) const {
-  return BytesInFile(format_, planned_);
+std::vector<std::string> RasterVerb::GetOutputs() const {
+  std::vector<std::string> outputs{target_.output};
+  for (const std::string& file : GetFurtherOutputs()) outputs.push_back(file);
+  return outputs;
+}
+
+std::uint64_t RasterVerb::GetBytes(std::size_t output) const {
+  return output == 0 ? BytesInFile(format_, planned_) : 0;
 }
 
 /// The making as a whole: opens the source, stands views on it, makes the file and closes all.
@@ -77,27 +84,49 @@ JobDraft RasterVerb::MakeDraft(const std::string& file, const FillValues& noData
 }
 
 JobDraft RasterVerb::GetJob(const Outputs& outputs) const {
-  return MakeDraft(outputs.Get(0).GetName(), {});
+  const std::string made = outputs.Get(0).GetName();
+  JobDraft draft = MakeDraft(made, {});
+  std::vector<std::string> further;
+  for (std::size_t i = 0; i < GetFurtherOutputs().size(); ++i) {
+    further.push_back(outputs.Get(i + 1).GetName());
+  }
+  if (!further.empty()) AddFurther(draft, {made, format_}, further);
+  return draft;
+}
+
+void RasterVerb::MakeFurther(JobSession& session, const Outputs& outputs) {
+  std::vector<std::string> further;
+  for (std::size_t i = 0; i < GetFurtherOutputs().size(); ++i) {
+    further.push_back(outputs.Get(i + 1).GetWorkName());
+  }
+  if (further.empty()) return;
+  JobDraft draft;
+  AddFurther(draft, {outputs.Get(0).GetWorkName(), format_}, further);
+  if (draft.GetSteps().empty()) return;
+  const ProgressView view(session.GetProgress(), GetProgressStyle());
+  session.Run(draft);
 }
 
 void RasterVerb::Make(JobSession& session, const Outputs& outputs) {
   const OutputFile& output = outputs.Get(0);
   Losses losses(output.GetShownName(), format_, target_.strict);
-  MadeRaster raster = MakeKept(
-      session, {output.GetWorkName(), format_}, losses, MayChooseNoData(),
-      [&](const FillValues& noData) {
-        const JobDraft draft = MakeDraft(output.GetWorkName(), noData);
-        JobResults results;
-        {
-          const ProgressView view(ProgressOfStep(session, draft, kMakeStep), GetProgressStyle());
-          results = session.Run(draft);
-        }
-        CheckClosed(results);
-        return ReadWanted(results);
-      });
+  MadeRaster raster = MakeKept(session, {output.GetWorkName(), format_}, losses, MayChooseNoData(),
+                               [&](const FillValues& noData) {
+                                 const JobDraft draft = MakeDraft(output.GetWorkName(), noData);
+                                 JobResults results;
+                                 {
+                                   const ProgressView view(
+                                       ProgressOfSteps(session, draft, GetFirstStep(), kMakeStep),
+                                       GetProgressStyle());
+                                   results = session.Run(draft);
+                                 }
+                                 CheckClosed(results);
+                                 return ReadWanted(results);
+                               });
   Compare(raster, losses);
   session.CheckInterrupt();
   losses.Settle();
+  MakeFurther(session, outputs);
 }
 
 }  // namespace lumo::host

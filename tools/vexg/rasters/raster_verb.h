@@ -48,7 +48,8 @@ class RasterVerb : public FileVerb {
   RasterVerb(OptionSet& line, const std::string& meaning) { AddFilesTo(line, meaning); }
   /// Leaves that to a verb that has something in front of them.
   RasterVerb() = default;
-  void AddFilesTo(OptionSet& line, const std::string& meaning);
+  /// @param isRequired  false for a verb that may make something else.
+  void AddFilesTo(OptionSet& line, const std::string& meaning, bool isRequired = true);
   /// Adds the output alone.
   void AddOutputTo(OptionSet& line, const std::string& meaning);
 
@@ -88,21 +89,34 @@ class RasterVerb : public FileVerb {
   /// Adds what the format did not keep to the losses.
   virtual void Compare(MadeRaster& raster, Losses& losses) const { CompareKept(raster, losses); }
 
+  /// Further files that are made of the raster, behind it among the outputs.
+  virtual std::vector<std::string> GetFurtherOutputs() const { return {}; }
+  /// Adds commands that make further outputs, in a job behind the one that makes the raster.
+  /// @param made   the raster file.
+  /// @param files  the further outputs.
+  virtual void AddFurther(JobDraft& /*draft*/, const TargetPlace& /*made*/,
+                          const std::vector<std::string>& /*files*/) const {}
+
   static constexpr const char* kMakeStep = "make";
+  /// The first of the steps whose progress is shown; kMakeStep is the last.
+  virtual const char* GetFirstStep() const { return kMakeStep; }
   /// Name of what is shown in queries.
   static constexpr const char* kShown = "shown";
 
   const std::string& GetFormat() const { return format_; }
+  /// The name of the raster file; empty where the command line has none.
+  const std::string& GetTargetName() const { return target_.output; }
 
   void CheckOptions() override;
+  std::vector<std::string> GetOutputs() const override;
+  JobDraft GetJob(const Outputs& outputs) const override;
+  std::uint64_t GetBytes(std::size_t output) const override;
+  void Make(JobSession& session, const Outputs& outputs) override;
 
  private:
-  std::vector<std::string> GetOutputs() const final { return {target_.output}; }
   void AddOpening(JobDraft& draft) const final;
   void Plan(JobSession& session, const JobResults& opened) final;
-  JobDraft GetJob(const Outputs& outputs) const final;
-  std::uint64_t GetBytes(std::size_t output) const final;
-  void Make(JobSession& session, const Outputs& outputs) final;
+  void MakeFurther(JobSession& session, const Outputs& outputs);
   JobDraft MakeDraft(const std::string& file, const FillValues& noData) const;
 
   TargetOptions target_;

@@ -2,10 +2,9 @@
 #include <charconv>
 #include <cstdlib>
 
-#include "pictures/block_reader.h"
 #include "pictures/palette_reading.h"
 #include "pictures/picture_writer.h"
-#include "pictures/quicklook_picture.h"
+#include "pictures/quicklook_maker.h"
 #include "rasters/file_verb.h"
 
 namespace lumo::host {
@@ -29,15 +28,6 @@ QuicklookPicture::Stretch ParseStretch(const std::string& text) {
   if (isGood) return stretch;
   throw HostError(kExitUsage,
                   "--stretch: \"" + text + "\" is neither none nor two percentiles such as 2,98");
-}
-
-/// The bands shown: those asked for, else red, green and blue where there are three or more.
-Array<unsigned> ChooseBands(const std::string& text, const RasterInfo& info) {
-  std::string chosen = text;
-  if (chosen.empty()) chosen = info.bands > 3 ? "2,1,0" : info.bands == 3 ? "0,1,2" : "0";
-  const Array<unsigned> bands = ParseBands(chosen, info);
-  if (bands.GetCount() == 1 || bands.GetCount() == 3) return bands;
-  throw HostError(kExitUsage, "--bands: a picture shows one band or three");
 }
 
 /// The smallest level of the pyramid that is as large as the picture; 0 for the raster itself.
@@ -70,6 +60,9 @@ class QuicklookVerb final : public FileVerb {
              "none, to cut values to 0 and 255")
         .Shows("LO,HI")
         .Example("0,3000");
+    line.Add("--outlines", outlines_,
+             "A raster of labels of the same size, whose borders are drawn over the picture")
+        .IsFile("LABELS");
     line.Add("--size", size_, "Pixels of the longer side at most").Within(1, 16384).ShowsDefault();
     AddOverwriteTo(line, "a file that is there");
   }
@@ -81,6 +74,9 @@ class QuicklookVerb final : public FileVerb {
   }
 
   std::vector<std::string> GetOutputs() const override { return {output_}; }
+  std::vector<std::string> GetFurtherInputs() const override {
+    return outlines_.empty() ? std::vector<std::string>() : std::vector{outlines_};
+  }
 
   void AddOpening(JobDraft& draft) const override {
     AddOpenWithPyramid(draft, "raster", GetSource());
@@ -88,16 +84,15 @@ class QuicklookVerb final : public FileVerb {
   }
 
   void Plan(JobSession& session, const JobResults& opened) override {
-    const OpenRaster shown =
-        ShowArea(session, {URIOf(opened, "$raster"), ReadInfo(opened, "raster")});
+    whole_ = ReadInfo(opened, "raster");
+    const OpenRaster shown = ShowArea(session, {URIOf(opened, "$raster"), whole_});
     raster_ = shown.uri;
     info_ = shown.info;
-    bands_ = ChooseBands(bandsText_, info_);
+    bands_ = ChoosePictureBands(bandsText_, info_);
     hasPalette_ = bands_.GetCount() == 1 && info_.hasPalette[bands_[0]] && stretchText_.empty();
     shown_ = raster_;
-    level_ = ChooseLevel(info_, size_);
+    if (outlines_.empty()) level_ = ChooseLevel(info_, size_);  // labels have no levels
     if (level_ != 0) ShowLevel(session);
-    picture_ = std::make_unique<QuicklookPicture>(info_, size_, bands_);
   }
 
   /// Shows a level as a raster of its own.
@@ -121,31 +116,40 @@ class QuicklookVerb final : public FileVerb {
       AddLevel(draft, "level", chain.GetTop(), level_);
       chain.Take("level");
     }
-    AddBlockSteps(draft, chain.GetTop(), info_, bands_, Interleave::BIP, picture_->GetBlocks());
+    const QuicklookPicture picture(info_, size_, bands_);
+    AddBlockSteps(draft, chain.GetTop(), info_, bands_, Interleave::BIP, picture.GetBlocks());
     chain.Close();
     return draft;
   }
 
   void Make(JobSession& session, const Outputs& outputs) override {
-    BlockReader reader(session, shown_, info_, GetSource().file);
-    reader.ReadAll(picture_->GetBlocks(), bands_, Interleave::BIP, GetProgressStyle(),
-                   [&](const SubRect& block) {
-                     picture_->Take(block, reader.GetPixels(), reader.GetStates());
-                   });
-    const QuicklookPicture::Bytes bytes =
-        hasPalette_ ? picture_->Draw(ReadPalette(session, raster_, bands_[0]))
-                    : picture_->Draw(stretch_);
-    const auto writer = MakePictureWriter(outputs.Get(0), picture_->GetWidth(),
-                                          picture_->GetHeight(), bytes.channels);
-    const std::size_t lineBytes = std::size_t{picture_->GetWidth()} * bytes.channels;
-    for (std::size_t y = 0; y < picture_->GetHeight(); ++y) {
-      session.CheckInterrupt();
-      writer->WriteLine(&bytes.pixels[y * lineBytes]);
-    }
-    writer->Close();
+    QuicklookRequest request{{shown_, info_, GetSource().file}, bands_, size_, stretch_, {}, {}};
+    if (hasPalette_) request.palette = ReadPalette(session, raster_, bands_[0]);
+    if (!outlines_.empty()) request.outlines = OpenOutlines(session);
+    MakeQuicklook(session, request, outputs.Get(0), GetProgressStyle());
   }
 
-  std::string output_, bandsText_, stretchText_;
+  /// The labels, in the area that is shown.
+  ShownRaster OpenOutlines(JobSession& session) const {
+    JobDraft draft;
+    RasterChain chain(draft);
+    AddOpen(draft, "labels", {outlines_, ""});
+    chain.Take("labels");
+    AddQuery(draft, "whole", "$labels");
+    if (GetArea().IsPart()) {
+      chain.AddView("part", "CreateSpatialSubsetRasterCommand")
+          .AddInput("SubRect", GetArea().GetRect());
+    }
+    AddQuery(draft, "shown", chain.GetTop());
+    const JobResults opened = session.Run(draft);
+    const RasterInfo whole = ReadInfo(opened, "whole");
+    if (whole.samples == whole_.samples && whole.lines == whole_.lines) {
+      return {URIOf(opened, chain.GetTop()), ReadInfo(opened, "shown"), outlines_};
+    }
+    throw HostError(kExitFailed, outlines_ + ": --outlines: the labels have another size");
+  }
+
+  std::string output_, bandsText_, stretchText_, outlines_;
   unsigned size_ = 1024;
 
   QuicklookPicture::Stretch stretch_;
@@ -153,9 +157,9 @@ class QuicklookVerb final : public FileVerb {
   unsigned level_ = 0;  // of the pyramid that the picture is made from
   String shown_;        // URI of the level, or of the raster
   RasterInfo info_;     // of that
+  RasterInfo whole_;    // of the raster without an area
   Array<unsigned> bands_;
   bool hasPalette_ = false;  // the picture is in the colours of the band
-  std::unique_ptr<QuicklookPicture> picture_;
 };
 
 const VerbRegistration registration("quicklook",

@@ -1,0 +1,34 @@
+#pragma once
+
+#include <optional>
+
+#include "pictures/quicklook_picture.h"
+
+namespace lumo::host {
+
+/// A raster that a picture shows.
+struct ShownRaster {
+  String uri;  ///< it is open
+  RasterInfo info;
+  std::string file;  ///< what the user calls it
+};
+
+/// The picture that QuicklookMaker makes of a raster.
+struct QuicklookRequest {
+  ShownRaster raster;
+  Array<unsigned> bands;  ///< one, or red, green and blue
+  unsigned size = 1024;   ///< pixels of the longer side at most
+  QuicklookPicture::Stretch stretch;
+  std::optional<Palette> palette;       ///< its colours, instead of the stretch, of one band
+  std::optional<ShownRaster> outlines;  ///< labels of the same size whose borders are drawn over it
+};
+
+/// The bands shown: those that a text asks for, else red, green and blue where there are three or
+/// more. Throws HostError for other bands than one or three.
+Array<unsigned> ChoosePictureBands(const std::string& text, const RasterInfo& info);
+
+/// Reads a raster, draws the picture and writes it. Throws HostError.
+void MakeQuicklook(JobSession& session, const QuicklookRequest& request, const OutputFile& output,
+                   ProgressStyle progress);
+
+}  // namespace lumo::host

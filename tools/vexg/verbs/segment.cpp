@@ -1,0 +1,406 @@
+#include <cmath>
+#include <optional>
+
+#include <fmt/format.h>
+
+#include "options/option_values.h"
+#include "output/json_number.h"
+#include "pictures/histogram_plot.h"
+#include "pictures/picture_writer.h"
+#include "pictures/quicklook_maker.h"
+#include "raster/pixel_types.h"
+#include "rasters/raster_target.h"
+#include "rasters/raster_verb.h"
+
+namespace lumo::host {
+namespace {
+
+constexpr const char* kFitStep = "fit";
+constexpr const char* kGradientStep = "gradients";
+constexpr const char* kCostStep = "costs";
+
+/// A cumulative curve of gradients, or of what merging costs.
+struct Curve {
+  double low = 0;
+  double binSize = 0;
+  std::vector<double> shares;  // of all, up to the end of each bin
+
+  /// Where a share is reached.
+  double At(double share) const {
+    if (shares.empty() || shares.back() == 0) return 0;  // nothing counts
+    const auto bin = std::lower_bound(shares.begin(), shares.end(), share);
+    const double before = bin == shares.begin() ? 0.0 : *(bin - 1);
+    const double within =
+        bin == shares.end() || *bin <= before ? 0 : (share - before) / (*bin - before);
+    return low + (static_cast<double>(bin - shares.begin()) + within) * binSize;
+  }
+};
+
+class SegmentVerb final : public RasterVerb {
+ public:
+  explicit SegmentVerb(OptionSet& line) {
+    line.AddNote(
+        "The gradients of the bands are flooded from their minima: each minimum becomes a segment. "
+        "Neighbours whose merging costs little, by the difference of their mean values, their "
+        "sizes "
+        "and the length of their common border, become one. LABELS holds the number of the segment "
+        "of each pixel, 0 where there is none, as 32-bit integers.");
+    line.AddNote(
+        "The raster is worked on in tiles that overlap by --tile-border; a segment that reaches "
+        "into "
+        "the next tile keeps its number there, and two that met in an earlier tile stay two.");
+    line.AddNote(
+        "--estimate makes no labels. It says which gradient and which cost a percentage stands "
+        "for, "
+        "-o draws both curves, --json prints them.");
+    line.AddExample("vexg segment scene.tif segments.tif --tiled --merge-percent 90");
+    line.AddExample("vexg segment --estimate scene.tif -o curves.png");
+    AddFilesTo(line, "The labels", false);
+    line.Add("--tiled", isTiled_, "Segment tile by tile");
+    line.Add("--estimate", isEstimate_, "Say what percentages stand for, and make no labels");
+    line.Add("--output,-o", picture_, "With --estimate: a picture of both curves, a PNG or JPEG")
+        .IsFile("OUT.png|jpg");
+    line.Add("--json", isJson_, "With --estimate: both curves as JSON");
+    AddAreaTo(line);
+    line.Add("--bands", bandsText_, "Bands, from 0; all by default")
+        .Shows("B,B...")
+        .Example("3,2,1");
+    line.Add("--algorithm", algorithm_,
+             "What is flooded: sobel, the largest gradient of the bands; intensity, their mean")
+        .Takes(OneOf({"sobel", "intensity"}))
+        .ShowsDefault();
+    line.Add("--segment-value", segmentValue_, "Gradients up to this one are one flat level")
+        .Shows("GRADIENT");
+    line.Add("--segment-percent", segmentPercent_,
+             "Percentage of the pixels whose gradients are one flat level")
+        .Shows("P")
+        .Example("20");
+    line.Add("--merge-value", mergeValue_, "Merge up to this cost; no merging by default")
+        .Shows("COST");
+    line.Add("--merge-percent", mergePercent_, "Percentage of all merges to do")
+        .Shows("P")
+        .Example("90");
+    line.Add("--merge-algorithm", mergeAlgorithm_,
+             "schedule: the cheapest pair first, with new costs after each; rigorous: all pairs "
+             "below "
+             "--merge-value at once")
+        .Takes(OneOf({"schedule", "rigorous"}))
+        .ShowsDefault();
+    line.Add("--merge-raster", mergeRaster_,
+             "A raster of the same size and pixel type whose bands drive merging, instead of "
+             "INPUT's")
+        .IsFile();
+    line.Add("--tile-memory", tileMemory_, "Bytes of the pixels of a tile; 8388608 by default")
+        .Shows("BYTES");
+    line.Add("--tile-border", tileBorder_, "Overlap of tiles on each side, in pixels")
+        .Within(0, 65535)
+        .ShowsDefault();
+    line.Add("--borders", isBorders_, "Make an image of the borders of segments, of 0 and 1");
+    line.Add("--polygons", polygons_, "Make polygons of the segments as well, in this vector file")
+        .IsFile("OUT");
+    line.Add("--quicklook", quicklook_, "Draw the borders over the scene as well, in this picture")
+        .IsFile("OUT.png|jpg");
+  }
+
+ private:
+  void CheckOptions() override {
+    const auto refuse = [](const std::string& line) { throw HostError(kExitUsage, line); };
+    if (segmentValue_ && segmentPercent_) {
+      refuse("--segment-value and --segment-percent exclude each other");
+    }
+    if (mergeValue_ && mergePercent_)
+      refuse("--merge-value and --merge-percent exclude each other");
+    for (const auto& [name, percent] :
+         {std::pair("--segment-percent", segmentPercent_), {"--merge-percent", mergePercent_}}) {
+      if (percent && !(*percent >= 0 && *percent <= 100)) {
+        refuse(std::string(name) + ": 0 to 100 percent");
+      }
+    }
+    if (!mergeRaster_.empty() && GetArea().IsGiven()) {
+      refuse("--merge-raster goes with no area");
+    }
+    if (isEstimate_) {
+      if (!GetTargetName().empty()) refuse("--estimate makes no labels");
+      if (!polygons_.empty() || !quicklook_.empty()) refuse("--estimate makes one picture at most");
+      if (!picture_.empty()) CheckPictureName(picture_);
+      return;
+    }
+    if (GetTargetName().empty()) refuse("LABELS, the file to make, is missing");
+    if (!isTiled_) refuse("--tiled is missing: segments are made tile by tile");
+    if (!picture_.empty() || isJson_) refuse("-o and --json go with --estimate");
+    if (isBorders_ && !polygons_.empty()) refuse("--borders makes no segments for --polygons");
+    if (!quicklook_.empty()) CheckPictureName(quicklook_);
+    RasterVerb::CheckOptions();
+  }
+
+  std::vector<std::string> GetFurtherInputs() const override {
+    return mergeRaster_.empty() ? std::vector<std::string>() : std::vector{mergeRaster_};
+  }
+  std::vector<std::string> GetOutputs() const override {
+    if (!isEstimate_) return RasterVerb::GetOutputs();
+    return picture_.empty() ? std::vector<std::string>() : std::vector{picture_};
+  }
+  std::uint64_t GetBytes(std::size_t output) const override {
+    return isEstimate_ ? 0 : RasterVerb::GetBytes(output);
+  }
+  std::vector<std::string> GetFurtherOutputs() const override {
+    std::vector<std::string> files;
+    if (!polygons_.empty()) files.push_back(polygons_);
+    if (!quicklook_.empty()) files.push_back(quicklook_);
+    return files;
+  }
+
+  RasterInfo PlanRaster(JobSession& /*session*/, const JobResults& /*opened*/,
+                        const RasterInfo& source) override {
+    bands_ = ParseBands(bandsText_, source);
+    scene_ = source;
+    if (!DispatchType(EightTypes{}, source.dataType, []<typename T>() { return true; })) {
+      throw HostError(kExitFailed, GetSource().file +
+                                       ": its pixels are not real numbers of at most "
+                                       "32 bits, or floating-point");
+    }
+    RasterInfo planned = source;
+    planned.bands = 1;
+    planned.dataType = kDataTypeOf<std::int32_t>;
+    return planned;
+  }
+
+  void AddViews(RasterChain& chain) const override {
+    if (bandsText_.empty()) return;
+    AddBandView(chain.GetDraft(), "bands", chain.GetTop(), bands_);
+    chain.Take("bands");
+  }
+
+  const char* GetKeptDetails() const override { return "Told"; }
+  FillValues GetNoData(const FillValues& /*chosen*/) const override {
+    return isBorders_ ? FillValues() : FillValues{0.0};
+  }
+  bool MayChooseNoData() const override { return false; }
+  const char* GetFirstStep() const override { return kFitStep; }
+
+  void AddToCreate(JobDraft& /*draft*/, JobWriterCommand& create) const override {
+    create.AddInput("DataType", DataTypeName(kDataTypeOf<std::int32_t>));
+    create.AddInput("Bands", 1U);
+    if (!isBorders_) return;
+    Array<bool> none{ArrayDims(1)};  // 0 is as good a pixel as 1
+    none[0] = false;
+    create.AddInput("HasNoDataValue", none);
+  }
+
+  String MergeRaster(const String& shown) const {
+    return mergeRaster_.empty() ? shown : String("$merge");
+  }
+
+  /// Adds the command that finds limits, and what percentages stand for, into variables.
+  void AddFit(JobDraft& draft, const String& shown) const {
+    if (!mergeRaster_.empty()) AddOpen(draft, "merge", {mergeRaster_, ""});
+    JobWriterCommand& fit = draft.Step(kFitStep, "FitSegmentationCommand");
+    fit.AddVariableInput("SegmentURI", shown);
+    fit.AddInput("SegmentAlgorithm", Algorithm());
+    if (segmentValue_) fit.AddInput("SegmentValue", *segmentValue_);
+    if (segmentPercent_) fit.AddInput("SegmentPercent", *segmentPercent_);
+    fit.AddVariableInput("MergeURI", MergeRaster(shown));
+    if (mergePercent_ && !isEstimate_) fit.AddInput("MergePercent", *mergePercent_);
+    fit.AddOutput("MinGradient", "$least");
+    fit.AddOutput("MaxGradient", "$most");
+    fit.AddOutput("StretchValue", "$levels");
+    fit.AddOutput("SegmentValue", "$flat");
+    fit.AddOutput("MergeValue", "$cost");
+  }
+
+  /// Adds the command that segments, or estimates; its further inputs are the caller's.
+  JobWriterCommand& AddSegment(JobDraft& draft, const char* step, const String& shown) const {
+    JobWriterCommand& segment = draft.Step(step, "FxTileSegmentMergeCommand");
+    segment.AddVariableInput("SegmentURI", shown);
+    segment.AddInput("SegmentAlgorithm", Algorithm());
+    segment.AddVariableInput("SegmentValue", "$flat");
+    segment.AddVariableInput("MinGradient", "$least");
+    segment.AddVariableInput("MaxGradient", "$most");
+    segment.AddVariableInput("MergeURI", MergeRaster(shown));
+    segment.AddVariableInput("StretchValue", "$levels");
+    segment.AddInput("LambdaEstimate", isEstimate_);
+    return segment;
+  }
+
+  void CloseMerge(JobDraft& draft) const {
+    if (!mergeRaster_.empty()) draft.Close("close.merge", "$merge");
+  }
+
+  void AddMaking(JobDraft& draft, const String& shown,
+                 const FillValues& /*noData*/) const override {
+    AddFit(draft, shown);
+    JobWriterCommand& segment = AddSegment(draft, kMakeStep, shown);
+    segment.AddVariableInput("LabelURI", "$target");
+    segment.AddInput("MergeAlgorithm", mergeAlgorithm_ == "rigorous" ? 2 : 1);
+    if (mergeValue_) {
+      segment.AddInput("MergeValue", *mergeValue_);
+    } else {
+      segment.AddVariableInput("MergeValue", "$cost");
+    }
+    if (tileMemory_) segment.AddInput("TileMemorySize", *tileMemory_);
+    segment.AddInput("TileBorderSize", tileBorder_);
+    if (isBorders_) segment.AddInput("SegmentBorder", 1);
+    segment.AddInput("Sums", Form::kExact);
+    CloseMerge(draft);
+  }
+
+  RasterContents ReadWanted(const JobResults& results) const override {
+    RasterContents wanted = ReadContents(results, kShown);
+    wanted.info.dataType = kDataTypeOf<std::int32_t>;
+    wanted.info.bands = 1;
+    wanted.details.clear();
+    return wanted;
+  }
+
+  void Compare(MadeRaster& raster, Losses& losses) const override {
+    raster.put.info.hasNoData = raster.made.info.hasNoData;
+    raster.put.info.hasPalette = raster.made.info.hasPalette;
+    raster.isFilled = true;
+    CompareKept(raster, losses);
+  }
+
+  void AddFurther(JobDraft& draft, const TargetPlace& made,
+                  const std::vector<std::string>& files) const override {
+    if (polygons_.empty()) return;
+    AddOpen(draft, "labels", {made.file, made.format});
+    JobWriterCommand& polygons = draft.Step("polygons", "PolygonizeCommand");
+    polygons.AddVariableInput("URI", "$labels");
+    polygons.AddInput("Vectors", String(files.front()));
+    draft.Close("close.labels", "$labels");
+  }
+
+  JobDraft GetJob(const Outputs& outputs) const override {
+    return isEstimate_ ? MakeEstimate() : RasterVerb::GetJob(outputs);
+  }
+
+  void Make(JobSession& session, const Outputs& outputs) override {
+    if (isEstimate_) return Estimate(session, outputs);
+    RasterVerb::Make(session, outputs);
+    if (!quicklook_.empty()) DrawQuicklook(session, outputs);
+  }
+
+  void DrawQuicklook(JobSession& session, const Outputs& outputs) const {
+    JobDraft draft;
+    RasterChain chain(draft);
+    AddSource(chain);
+    GetArea().AddViews(chain);
+    AddOpen(draft, "labels", {outputs.Get(0).GetWorkName(), GetFormat()});
+    AddQuery(draft, "scene", chain.GetTop());
+    AddQuery(draft, "labels", "$labels");
+    const JobResults opened = session.Run(draft);
+    QuicklookRequest request;
+    request.raster = {URIOf(opened, chain.GetTop()), ReadInfo(opened, "scene"), GetSource().file};
+    request.bands = ChoosePictureBands(
+        bands_.GetCount() == 1 || bands_.GetCount() == 3 ? bandsText_ : std::string(),
+        request.raster.info);
+    request.size = kQuicklookSize;
+    request.outlines = {URIOf(opened, "$labels"), ReadInfo(opened, "labels"), GetTargetName()};
+    const std::size_t last = GetOutputs().size() - 1;
+    MakeQuicklook(session, request, outputs.Get(last), ProgressStyle::kNone);
+  }
+
+  /// The gradients in bins that suit the pixel type, and the costs of all merges.
+  JobDraft MakeEstimate() const {
+    JobDraft draft;
+    RasterChain chain(draft);
+    AddSource(chain);
+    GetArea().AddViews(chain);
+    AddViews(chain);
+    const String shown = chain.GetTop();
+    AddFit(draft, shown);
+    JobWriterCommand& gradients = draft.Step(kGradientStep, "FxTileSegmentHistogramCommand");
+    gradients.AddVariableInput("SegmentURI", shown);
+    gradients.AddVariableInput("HistogramMin", "$least");
+    gradients.AddVariableInput("HistogramMax", "$most");
+    gradients.AddInput("SegmentAlgorithm", Algorithm());
+    const bool isWhole = DispatchType(EightTypes{}, scene_.dataType,
+                                      []<typename T>() { return std::is_integral_v<T>; });
+    if (!isWhole) gradients.AddInput("HistogramBins", kFloatBins);
+    AddSegment(draft, kCostStep, shown);
+    CloseMerge(draft);
+    chain.Close();
+    return draft;
+  }
+
+  void Estimate(JobSession& session, const Outputs& outputs) {
+    const JobDraft draft = MakeEstimate();
+    JobResults results;
+    {
+      const ProgressView view(ProgressOfSteps(session, draft, kFitStep, kCostStep),
+                              GetProgressStyle());
+      results = session.Run(draft);
+    }
+    const auto& fit = results.Find(kFitStep).returns;
+    const auto& gradients = results.Find(kGradientStep).returns;
+    const auto& costs = results.Find(kCostStep).returns;
+    gradients_.low = ParseValue<double>(fit.Find("MinGradient"));
+    gradients_.binSize = ParseValue<double>(gradients.Find("SegmentBinSize"));
+    for (const double share : ParseValue<Array<double>>(gradients.Find("SegmentHistogram"))) {
+      gradients_.shares.push_back(share);
+    }
+    costs_.binSize = ParseValue<double>(costs.Find("LambdaBinSize"));
+    const auto counts = ParseValue<Array<unsigned>>(costs.Find("LambdaHistogram"));
+    const double all = counts.GetCount() == 0 ? 0 : counts[counts.GetCount() - 1];
+    for (const unsigned count : counts) costs_.shares.push_back(all == 0 ? 0 : count / all);
+    if (!picture_.empty()) {
+      HistogramPlot({Plot("gradients", gradients_), Plot("costs", costs_)}).Write(outputs.Get(0));
+    }
+  }
+
+  /// Leaves out the last hundredth, which takes most of the width.
+  static PlottedHistogram Plot(const char* title, const Curve& curve) {
+    PlottedHistogram plot{title, curve.low, curve.binSize > 0 ? curve.binSize : 1, {}};
+    constexpr double kEnd = 0.99, kHeight = 100;  // percent
+    for (const double share : curve.shares) {
+      plot.counts.push_back(static_cast<std::uint64_t>(std::lround(share * kHeight)));
+      if (share >= kEnd) break;
+    }
+    if (plot.counts.empty()) plot.counts.push_back(0);
+    return plot;
+  }
+
+  static Json AsJson(const Curve& curve) {
+    return {{"low", curve.low}, {"binSize", curve.binSize}, {"shares", curve.shares}};
+  }
+
+  std::string Describe() const override {
+    if (!isEstimate_) return {};
+    if (isJson_) {
+      return Json{{"file", GetSource().file},
+                  {"gradients", AsJson(gradients_)},
+                  {"costs", AsJson(costs_)}}
+                 .dump(2) +
+             "\n";
+    }
+    if (!picture_.empty()) return {};
+    std::string text = "percent       gradient     merge cost\n";
+    for (const double percent :
+         {5.0, 10.0, 20.0, 30.0, 40.0, 50.0, 60.0, 70.0, 80.0, 90.0, 95.0, 99.0}) {
+      text += fmt::format("{:>7g} {:>14.6g} {:>14.6g}\n", percent, gradients_.At(percent / 100),
+                          costs_.At(percent / 100));
+    }
+    return text;
+  }
+
+  int Algorithm() const { return algorithm_ == "sobel" ? 1 : 2; }
+
+  static constexpr unsigned kFloatBins = 65000;
+  static constexpr unsigned kQuicklookSize = 2048;
+
+  bool isTiled_ = false, isEstimate_ = false, isJson_ = false, isBorders_ = false;
+  std::string picture_, bandsText_, mergeRaster_, polygons_, quicklook_;
+  std::string algorithm_ = "sobel", mergeAlgorithm_ = "schedule";
+  std::optional<double> segmentValue_, segmentPercent_, mergeValue_, mergePercent_;
+  std::optional<unsigned> tileMemory_;
+  unsigned tileBorder_ = 10;
+
+  RasterInfo scene_;
+  Array<unsigned> bands_;
+  Curve gradients_, costs_;
+};
+
+const VerbRegistration registration("segment", "Divides a raster into segments of alike pixels",
+                                    &SetUp<SegmentVerb>);
+
+}  // namespace
+}  // namespace lumo::host
