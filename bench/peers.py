@@ -10,6 +10,8 @@ import subprocess
 import sys
 import time
 
+import segment_peers
+
 BANDS = 6
 TYPES = ("Byte", "UInt16", "Float32")
 LAYOUTS = {
@@ -372,7 +374,8 @@ def grass_zones(bench, shapes, scene):
 
 
 SECTIONS = {"stats": stats, "hist": hist, "calibrate": calibrate, "pyramid": pyramid, "warp": warp,
-            "polygons": polygons, "zones": zones, "memory": memory}
+            "polygons": polygons, "zones": zones, "segments": segment_peers.speed,
+            "segment-quality": segment_peers.quality, "memory": memory}
 
 
 def main():
