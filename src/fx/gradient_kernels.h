@@ -3,6 +3,7 @@
 #include <cstddef>
 #include <cstdint>
 
+#include "platform/export.h"
 #include "raster/pixel_types.h"
 
 namespace lumo {
@@ -18,13 +19,13 @@ namespace lumo {
 ///                        with a pixel in front and one behind the row.
 /// @param gradients       [out] one for each pixel.
 template <typename T>
-void ComputeSobelRow(const T* up, const T* middle, const T* down, std::size_t bands,
-                     std::size_t pixels, double* gradients);
+VEXG_EXPORT void ComputeSobelRow(const T* up, const T* middle, const T* down, std::size_t bands,
+                                 std::size_t pixels, double* gradients);
 
 /// Computes a row of mean band values: the sum of value * weight over the bands.
 /// @param weights  one for each band.
 template <typename T>
-void ComputeIntensityRow(const T* row, const double* weights, std::size_t bands, std::size_t pixels,
-                         double* intensities);
+VEXG_EXPORT void ComputeIntensityRow(const T* row, const double* weights, std::size_t bands,
+                                     std::size_t pixels, double* intensities);
 
 }  // namespace lumo

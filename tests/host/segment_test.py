@@ -209,6 +209,56 @@ class SegmentTest(FolderTest):
         values = got["LambdaHistogram"]["values"] if isinstance(got["LambdaHistogram"], dict) else got["LambdaHistogram"]
         self.assertEqual(values, list(itertools.accumulate(counts)))
 
+    def ask(self, command, inputs, image):
+        """What a command returns of a file."""
+        job = Job()
+        job.add("OpenRasterCommand", {"ConnStr": image}, "$in")
+        job.add(command, inputs)
+        return json.loads(self.fine("run", "--json", "-", stdin=job.text()))["commands"][-1]["return"]
+
+    def test_histogram_of_gradients(self):
+        chance = random.Random(11)
+        for kind, most, bins in (("Byte", 255, None), ("Single", 1, 50)):
+            rows = [[chance.randint(0, 255) / (255 if kind == "Single" else 1) for _ in range(30)] for _ in range(20)]
+            flat = [value for row in rows for value in row]
+            path = write_orva(self.folder / f"{kind}.dat", 30, 20, 1, struct.pack(f"<600{TYPES[kind]}", *map(
+                int if kind == "Byte" else float, flat)), kind)
+            rows = [[peer.as_float(value) for value in row] for row in rows]
+            gradients = [g for row in peer.Image([rows], [[False] * 30] * 20).sobel()[0] for g in row]
+            top = 8 * most
+            got = self.ask("FxTileSegmentHistogramCommand", {
+                "SegmentURI": "$in", "HistogramMin": 0, "HistogramMax": top, "SegmentAlgorithm": 1,
+                **({"HistogramBins": bins} if bins else {})}, path)
+            size = top / bins if bins else 1
+            self.assertAlmostEqual(float(got["SegmentBinSize"]), size, 12)
+            self.assertEqual(float(got["SegmentMin"]), 0)
+            shares = got["SegmentHistogram"]
+            self.assertEqual(len(shares), bins or top + 1)
+            for i in range(0, len(shares), 7):
+                below = sum(int(g / size) <= i for g in gradients) / 600
+                self.assertAlmostEqual(shares[i], below, 9, (kind, i))
+
+    def test_variances_of_tiles(self):
+        chance, width, height = random.Random(12), 600, 520
+        data = bytearray(chance.getrandbits(8) for _ in range(width * height * 2))
+        for y in range(height):
+            for x in range(512, width):
+                data[2 * (y * width + x)] = 0 if x % 2 else 9  # every second pixel of band 0 has no data there
+        path = write_orva(self.folder / "two.dat", width, height, 2, bytes(data), more="no data values = {0,0}\n")
+        got = self.ask("FxTileVarianceCommand", {"MergeURI": "$in"}, path)
+        for column, row in itertools.product(range(2), range(2)):
+            left, right = column * 512, min(width, column * 512 + 512) - 1
+            over, under = row * 512, min(height, row * 512 + 512) - 1
+            self.assertEqual(got["TileSubrects"][column][row], [left, right, over, under])
+            total = 0
+            for band in range(2):
+                values = [v for y in range(over, under + 1) for v in data[2 * (y * width + left) + band:2 * (y * width + right) + 2:2]
+                          if v]
+                mean = sum(values) / len(values)
+                total += sum((v - mean) ** 2 for v in values) / (len(values) - 1) / 2
+            self.assertAlmostEqual(got["TileVariances"][column][row] / total, 1, 9)
+            self.assertEqual(got["PixelCounts"][column][row], len(values))
+
     def test_odd_rasters_have_a_stated_result(self):
         nan, inf = float("nan"), float("inf")
         rasters = {
