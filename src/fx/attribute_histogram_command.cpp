@@ -88,9 +88,10 @@ class FxComputeAttributesHistogramCommand final : public RegionCommand {
   static void CountValue(float value, unsigned band, unsigned attribute, Histograms& to) {
     const float lower = to.LowerLimit(band, attribute);
     if (!std::isfinite(value) || value < lower || value > to.UpperLimit(band, attribute)) return;
-    const double size = to.BinSize(band, attribute);
-    const double bin = size > 0 ? std::floor((static_cast<double>(value) - lower) / size) : 0;
     const double last = to.Bins() - 1;
+    const double size =
+        (static_cast<double>(to.UpperLimit(band, attribute)) - static_cast<double>(lower)) / last;
+    const double bin = size > 0 ? std::floor((static_cast<double>(value) - lower) / size) : 0;
     ++to.Count(band, attribute, static_cast<unsigned>(std::clamp(bin, 0.0, last)));
   }
 
