@@ -90,7 +90,7 @@ const unsigned char* FindUsable(const unsigned char* states, std::size_t width, 
 /// The buffers of a thread.
 template <typename T>
 struct Scratch {
-  explicit Scratch(unsigned reach) : windows(reach) {}
+  Scratch(unsigned reach, bool findsOverN) : windows(reach, findsOverN) {}
 
   StripRegions regions;
   std::vector<unsigned char> usable;
@@ -311,10 +311,11 @@ class StripJoin {
 /// Sums up the strips of a tile, several at the same time.
 template <typename T, typename L>
 std::vector<StripValues<T>> SumTile(const StripWork<T, L>& work, unsigned lines,
-                                    ScratchPool<Scratch<T>>& pool, unsigned reach) {
+                                    ScratchPool<Scratch<T>>& pool, unsigned reach,
+                                    bool findsOverN) {
   std::vector<StripValues<T>> strips((lines + kStripLines - 1) / kStripLines);
   ParallelFor(static_cast<unsigned>(strips.size()), nullptr, [&](unsigned i) {
-    const auto scratch = pool.Borrow(reach);
+    const auto scratch = pool.Borrow(reach, findsOverN);
     strips[i] = work.Sum(i * kStripLines, *scratch);
   });
   return strips;
@@ -359,7 +360,7 @@ bool RegionPass<T>::RunTyped(const RasterPtr<L>& labels, const IPC& ipc) {
     const TilePtr<L> label = labelSlot.In(token);
     if (!image || !image->IsValid() || !label || !label->IsValid()) return false;
     const StripWork<T, L> work(*image, *label, wanted, census_);
-    return sums.Put(token, SumTile<T, L>(work, image->Height(), pool, reach));
+    return sums.Put(token, SumTile<T, L>(work, image->Height(), pool, reach, wanted.entropy));
   });
   process.Add("RegionPass", StageOrder::kOneByOne, [&](ArgList& token, const AbortFlag*) {
     auto* const strips = sums.In(token);

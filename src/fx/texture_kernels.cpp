@@ -138,6 +138,26 @@ VEXG_INLINE void CountAny(const P* const* lines, std::size_t count, std::size_t 
   }
 }
 
+template <typename P>
+VEXG_INLINE void Figures(const std::int32_t* counts, const double* sums, const double* squares,
+                         const P* min, const P* max, double shift, std::size_t count,
+                         const WindowFigures& to) {
+  double* const range = to.range;
+  double* const mean = to.mean;
+  double* const variance = to.variance;
+  for (std::size_t x = 0; x < count; ++x) {
+    const auto n = static_cast<double>(counts[x]);
+    const double extent = static_cast<double>(max[x]) - static_cast<double>(min[x]);
+    const double middle = sums[x] / n + shift;
+    // Of integers both products are exact, and so a window of equal values has no variance.
+    const double spread = n * squares[x] - sums[x] * sums[x];
+    const double part = spread / (n * (n - 1));
+    range[x] = n > 0 ? extent : 0;
+    mean[x] = n > 0 ? middle : 0;
+    variance[x] = (n > 1) & (spread > 0) ? part : 0;
+  }
+}
+
 }  // namespace
 
 VEXG_VECTOR_CLONES void AddLine(const std::int32_t* line, std::size_t columns,
@@ -192,6 +212,43 @@ VEXG_CHOOSING_VECTOR_CLONES void CountBins(const double* const* lines, std::size
                                            std::size_t side, const double* min, const double* max,
                                            std::int32_t* first, std::int32_t* third) {
   CountAny(lines, count, side, min, max, first, third);
+}
+
+VEXG_CHOOSING_VECTOR_CLONES void FindFigures(const std::int32_t* counts, const double* sums,
+                                             const double* squares, const std::int32_t* min,
+                                             const std::int32_t* max, double shift,
+                                             std::size_t count, const WindowFigures& to) {
+  Figures(counts, sums, squares, min, max, shift, count, to);
+}
+VEXG_CHOOSING_VECTOR_CLONES void FindFigures(const std::int32_t* counts, const double* sums,
+                                             const double* squares, const double* min,
+                                             const double* max, double shift, std::size_t count,
+                                             const WindowFigures& to) {
+  Figures(counts, sums, squares, min, max, shift, count, to);
+}
+
+VEXG_CHOOSING_VECTOR_CLONES void FindEntropy(const WindowCounts& counts, const double* range,
+                                             double even, const double* terms, std::size_t count,
+                                             double* entropy) {
+  const std::int32_t *const all = counts.all, *const first = counts.first,
+                            *const third = counts.third;
+  for (std::size_t x = 0; x < count; ++x) {
+    const std::int32_t second = all[x] - first[x] - third[x];
+    const double sum = 0 - terms[first[x]] - terms[second] - terms[third[x]];
+    entropy[x] = range[x] > even ? sum : 0;
+  }
+}
+
+VEXG_CHOOSING_VECTOR_CLONES void FindEntropyOverN(const WindowCounts& counts, const double* range,
+                                                  double even, const double* logs,
+                                                  std::size_t count, double* entropy) {
+  const std::int32_t *const all = counts.all, *const first = counts.first,
+                            *const third = counts.third;
+  for (std::size_t x = 0; x < count; ++x) {
+    const std::int32_t second = all[x] - first[x] - third[x];
+    const double sum = (logs[all[x]] - logs[first[x]] - logs[second] - logs[third[x]]) / all[x];
+    entropy[x] = (range[x] > even) & (sum > 0) ? sum : 0;
+  }
 }
 
 }  // namespace lumo

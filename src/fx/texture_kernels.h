@@ -52,4 +52,36 @@ void CountBins(const std::int32_t* const* lines, std::size_t count, std::size_t 
 void CountBins(const double* const* lines, std::size_t count, std::size_t side, const double* min,
                const double* max, std::int32_t* first, std::int32_t* third);
 
+/// The figures of windows, of which a window without a value has 0.
+/// @param shift  is added to the means.
+struct WindowFigures {
+  double* range;
+  double* mean;
+  double* variance;
+};
+void FindFigures(const std::int32_t* counts, const double* sums, const double* squares,
+                 const std::int32_t* min, const std::int32_t* max, double shift, std::size_t count,
+                 const WindowFigures& to);
+void FindFigures(const std::int32_t* counts, const double* sums, const double* squares,
+                 const double* min, const double* max, double shift, std::size_t count,
+                 const WindowFigures& to);
+
+/// Counts of the values of windows, and of those in the first and in the third of three bins.
+struct WindowCounts {
+  const std::int32_t* all;
+  const std::int32_t* first;
+  const std::int32_t* third;
+};
+
+/// Finds -(t[a] + t[b] + t[c]) for the counts of the bins of windows, 0 where the range is no
+/// greater than `even`.
+/// @param terms  t, for every count that comes.
+void FindEntropy(const WindowCounts& counts, const double* range, double even, const double* terms,
+                 std::size_t count, double* entropy);
+
+/// Finds (l[n] - l[a] - l[b] - l[c]) / n in the same way, and no less than 0.
+/// @param logs  l, the products of counts and their logarithms.
+void FindEntropyOverN(const WindowCounts& counts, const double* range, double even,
+                      const double* logs, std::size_t count, double* entropy);
+
 }  // namespace lumo

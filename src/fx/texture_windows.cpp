@@ -6,7 +6,6 @@
 namespace lumo {
 namespace {
 
-constexpr std::size_t kMostTerms = 1U << 16;  // that are kept in tables
 constexpr double kBins = 3;
 
 double TimesLog(double count) {
@@ -16,12 +15,11 @@ double TimesLog(double count) {
 }  // namespace
 
 template <typename T>
-TextureWindows<T>::TextureWindows(unsigned reach)
-    : reach_(reach), side_(2 * std::size_t{reach} + 1), lines_(side_) {
-  const std::size_t terms = side_ < 256 ? side_ * side_ + 1 : kMostTerms;
-  for (std::size_t count = 0; count < terms; ++count) {
-    overBins_.push_back(EntropyTerm(static_cast<double>(count), kBins));
-    logs_.push_back(TimesLog(static_cast<double>(count)));
+TextureWindows<T>::TextureWindows(unsigned reach, bool findsOverN)
+    : reach_(reach), side_(2 * std::size_t{reach} + 1), findsOverN_(findsOverN), lines_(side_) {
+  for (std::size_t count = 0; count <= side_ * side_; ++count) {
+    terms_.push_back(EntropyTerm(static_cast<double>(count), kBins));
+    if (findsOverN) logs_.push_back(TimesLog(static_cast<double>(count)));
   }
 }
 
@@ -111,14 +109,18 @@ void TextureWindows<T>::ComputeLine() {
 template <typename T>
 void TextureWindows<T>::IncludeMiddle() {
   const T* const values = tile_->PixelArray().GetData() + tile_->Offset(0, row_) + band_;
-  raw_.resize(width_);
-  for (std::size_t x = 0; x < width_; ++x) raw_[x] = values[x * tile_->Bands()];
+  const std::size_t bands = tile_->Bands();
+  if constexpr (std::is_floating_point_v<T>) {
+    raw_.resize(width_);
+    for (std::size_t x = 0; x < width_; ++x) raw_[x] = values[x * bands];
+  }
   const Plane* const middle = lines_[reach_] + reach_;
   for (std::size_t x = 0; x < width_; ++x) {
     const bool has = kSlides ? middle[x] != kNoValue<Plane> : middle[x] == middle[x];
     if (has || !IsCounted(x)) continue;
-    const auto value = kSlides ? static_cast<Plane>(raw_[x])
-                               : static_cast<Plane>(static_cast<double>(raw_[x]) - shift_);
+    const T raw = values[x * bands];
+    const auto value =
+        kSlides ? static_cast<Plane>(raw) : static_cast<Plane>(static_cast<double>(raw) - shift_);
     min_[x] = std::min(min_[x], value);
     max_[x] = std::max(max_[x], value);
   }
@@ -126,34 +128,17 @@ void TextureWindows<T>::IncludeMiddle() {
 
 template <typename T>
 void TextureWindows<T>::ComputeFigures() {
-  for (auto& figure : figures_) figure.assign(width_, 0);
+  for (auto& figure : figures_) figure.resize(width_);
   double* const range = figures_[TextureSums::kRange].data();
-  double* const mean = figures_[TextureSums::kMean].data();
-  double* const variance = figures_[TextureSums::kVariance].data();
-  for (std::size_t x = 0; x < width_; ++x) {
-    const auto n = static_cast<double>(count_[x]);
-    if (count_[x] == 0) continue;
-    range[x] = static_cast<double>(max_[x]) - static_cast<double>(min_[x]);
-    mean[x] = sum_[x] / n + shift_;
-    // Of integers both products are exact, and so a window of equal values has no variance.
-    const double spread = n * squares_[x] - sum_[x] * sum_[x];
-    if (count_[x] > 1 && spread > 0) variance[x] = spread / (n * (n - 1));
-  }
-  double* const entropy = figures_[TextureSums::kEntropy].data();
-  double* const overN = figures_[TextureSums::kEntropyOverN].data();
-  for (std::size_t x = 0; x < width_; ++x) {
-    if (!(range[x] > kEvenRange)) continue;
-    const std::int32_t counts[] = {first_[x], count_[x] - first_[x] - third_[x], third_[x]};
-    double terms = 0, logs = 0;
-    for (const std::int32_t count : counts) {
-      const bool isKept = static_cast<std::size_t>(count) < overBins_.size();
-      terms -= isKept ? overBins_[static_cast<std::size_t>(count)] : EntropyTerm(count, kBins);
-      logs += isKept ? logs_[static_cast<std::size_t>(count)] : TimesLog(count);
-    }
-    const auto n = static_cast<double>(count_[x]);
-    entropy[x] = terms;
-    overN[x] = std::max((TimesLog(n) - logs) / n, 0.0);
-  }
+  FindFigures(
+      count_.data(), sum_.data(), squares_.data(), min_.data(), max_.data(), shift_, width_,
+      {range, figures_[TextureSums::kMean].data(), figures_[TextureSums::kVariance].data()});
+  const WindowCounts counts{count_.data(), first_.data(), third_.data()};
+  FindEntropy(counts, range, kEvenRange, terms_.data(), width_,
+              figures_[TextureSums::kEntropy].data());
+  if (!findsOverN_) return;
+  FindEntropyOverN(counts, range, kEvenRange, logs_.data(), width_,
+                   figures_[TextureSums::kEntropyOverN].data());
 }
 
 VEXG_INSTANCES(EIGHT, TextureWindows);

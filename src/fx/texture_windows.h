@@ -27,8 +27,9 @@ namespace lumo {
 template <typename T>
 class TextureWindows {
  public:
-  /// @param reach  pixels on each side of the middle one.
-  explicit TextureWindows(unsigned reach);
+  /// @param reach       pixels on each side of the middle one.
+  /// @param findsOverN  gives the entropy over the number of values too, which else is 0.
+  explicit TextureWindows(unsigned reach, bool findsOverN = true);
 
   /// Takes lines of a band, with those round them. @param tile  with borders of the reach.
   void Load(const Tile<T>& tile, unsigned band, unsigned rowFrom, unsigned rowTo);
@@ -53,6 +54,7 @@ class TextureWindows {
 
   std::size_t reach_;
   std::size_t side_;
+  bool findsOverN_;
   std::size_t width_ = 0;
   std::size_t columns_ = 0;
   std::size_t line_ = 0;  // the first of the window's lines
@@ -62,13 +64,14 @@ class TextureWindows {
   double shift_ = 0;
   std::vector<Plane> plane_;
   std::vector<const Plane*> lines_;
-  std::vector<T> raw_;  // the middle line
+  std::vector<T> raw_;  // the middle line, of floating-point numbers
   std::vector<double> columnSum_, columnSquares_, sum_, squares_, scratch_;
   std::vector<std::int32_t> columnCount_, count_, countScratch_, first_, third_;
   std::vector<Plane> min_, max_;
   std::vector<double> figures_[TextureSums::kFigures];
-  std::vector<double> overBins_;  // EntropyTerm of a count, divided by the bins
-  std::vector<double> logs_;      // c * ln(c)
+  // For each count c of values, as far as windows have them:
+  std::vector<double> terms_;  // EntropyTerm of c over the bins
+  std::vector<double> logs_;   // c * ln(c)
 };
 
 VEXG_EXTERN_HIDDEN(EIGHT, TextureWindows);
