@@ -1,11 +1,7 @@
-#include <algorithm>
-#include <cmath>
-
 #include "foundation/fault.h"
 #include "fx/attribute_inputs.h"
-#include "fx/region_attribute_histogram.h"
+#include "fx/attribute_statistics.h"
 #include "fx/region_attribute_stats.h"
-#include "fx/region_attributes.h"
 
 namespace lumo {
 namespace {
@@ -32,11 +28,11 @@ class FxComputeAttributesHistogramCommand final : public RegionCommand {
     }
     RegionAttributesFile<float> regions(from, false);
     if (!regions.IsValid()) {
-      return Fail("AttributeFXA: " + from.ToUTF8() + " is no file of regions");
+      return Fail(String("AttributeFXA: " + from.ToUTF8() + " is no file of regions"));
     }
     const RegionAttributeStatsFile<float> stats(statsFrom);
     if (!stats.IsValid()) {
-      return Fail("StatsFXAS: " + statsFrom.ToUTF8() + " is no file of statistics");
+      return Fail(String("StatsFXAS: " + statsFrom.ToUTF8() + " is no file of statistics"));
     }
     const unsigned bands = regions.Bands(), attributes = regions.Attributes();
     if (stats.Bands() < bands || stats.Attributes() < attributes) {
@@ -47,52 +43,24 @@ class FxComputeAttributesHistogramCommand final : public RegionCommand {
     RegionAttributeHistogramMap<float> counts(bands, attributes,
                                               RegionAttributeHistogramFile<float>::kBins);
     if (!counts.IsValid()) return Fail("there is no memory for the histograms");
-    SetLimits(stats, counts);
+    SetLimits(FiguresOf(stats, counts), counts);
     RegionAttributeHistogramFile<float> file(to, bands, attributes);
-    const bool isDone =
-        file.IsValid() && Count(regions, counts) && Copy(counts, file) && file.Close();
+    const bool isDone = file.IsValid() && CountAttributes(regions, counts, GetIPC()) &&
+                        Copy(counts, file) && file.Close();
     return isDone ? Succeed() : FailWithout("the histograms can't be written", RegionSums::kExact);
   }
 
-  static void SetLimits(const RegionAttributeStatsFile<float>& stats, Histograms& to) {
-    for (unsigned band = 0; band < to.Bands(); ++band) {
-      for (unsigned i = 0; i < to.Attributes(); ++i) {
-        const double mean = stats.Mean(band, i), deviation = stats.StdDev(band, i);
-        const double min = stats.Min(band, i), max = stats.Max(band, i);
-        to.LowerLimit(band, i) = static_cast<float>(std::max(mean - 2 * deviation, min));
-        to.UpperLimit(band, i) = static_cast<float>(std::min(mean + 2 * deviation, max));
+  /// The statistics of the pairs that the histograms have.
+  static std::vector<AttributeFigures> FiguresOf(const RegionAttributeStatsFile<float>& stats,
+                                                 const Histograms& histograms) {
+    std::vector<AttributeFigures> figures;
+    for (unsigned band = 0; band < histograms.Bands(); ++band) {
+      for (unsigned i = 0; i < histograms.Attributes(); ++i) {
+        figures.push_back({stats.Mean(band, i), stats.StdDev(band, i), stats.Min(band, i),
+                           stats.Max(band, i), stats.Count(band, i)});
       }
     }
-  }
-
-  bool Count(RegionAttributesFile<float>& regions, Histograms& to) {
-    const unsigned count = regions.RegionCount();
-    for (unsigned region = 0; region < count; ++region) {
-      if (region % 1024 == 0) {
-        if (GetIPC().abort->IsSet()) {
-          SetFault("the histograms were aborted");
-          return false;
-        }
-        GetIPC().progress->Update(static_cast<double>(region) / count);
-      }
-      for (unsigned band = 0; band < regions.Bands(); ++band) {
-        if (!regions.RegionExists(region, band)) continue;
-        for (unsigned i = 0; i < regions.Attributes(); ++i) {
-          CountValue(std::as_const(regions).Value(region, band, i), band, i, to);
-        }
-      }
-    }
-    return regions.IsValid();
-  }
-
-  static void CountValue(float value, unsigned band, unsigned attribute, Histograms& to) {
-    const float lower = to.LowerLimit(band, attribute);
-    if (!std::isfinite(value) || value < lower || value > to.UpperLimit(band, attribute)) return;
-    const double last = to.Bins() - 1;
-    const double size =
-        (static_cast<double>(to.UpperLimit(band, attribute)) - static_cast<double>(lower)) / last;
-    const double bin = size > 0 ? std::floor((static_cast<double>(value) - lower) / size) : 0;
-    ++to.Count(band, attribute, static_cast<unsigned>(std::clamp(bin, 0.0, last)));
+    return figures;
   }
 
   static bool Copy(const Histograms& from, RegionAttributeHistogramFile<float>& to) {
