@@ -45,8 +45,10 @@ class FxComputeAttributesHistogramCommand final : public RegionCommand {
     if (!counts.IsValid()) return Fail("there is no memory for the histograms");
     SetLimits(FiguresOf(stats, counts), counts);
     RegionAttributeHistogramFile<float> file(to, bands, attributes);
-    const bool isDone = file.IsValid() && CountAttributes(regions, counts, GetIPC()) &&
-                        Copy(counts, file) && file.Close();
+    if (!file.IsValid()) return Fail();
+    NoteCreated(to);
+    const bool isDone =
+        CountAttributes(regions, counts, GetIPC()) && Copy(counts, file) && file.Close();
     return isDone ? Succeed() : FailWithout("the histograms can't be written", RegionSums::kExact);
   }
 

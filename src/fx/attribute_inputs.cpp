@@ -3,6 +3,7 @@
 #include <filesystem>
 #include <system_error>
 
+#include "data/access_policy.h"
 #include "foundation/fault.h"
 
 namespace lumo {
@@ -77,6 +78,7 @@ bool RegionCommand::TakeOutput(const char* name, URI& uri) {
 bool RegionCommand::TakeExisting(const char* name, URI& uri) {
   uri = URI(Read<String>(name));
   if (!IsNew(name, uri)) return false;
+  if (!MayReachFile(uri.ToUTF8(), false)) return false;
   std::error_code none;
   if (std::filesystem::exists(uri.ToUTF8(), none)) return true;
   return Refuse(std::string(name) + ": there is no file " + uri.ToUTF8());
@@ -94,7 +96,7 @@ CommandResult RegionCommand::FailWithout(const char* otherwise, RegionSums form)
   const String fault = TakeFaultOr(otherwise);
   if (form != RegionSums::kTold) {
     std::error_code none;
-    for (const auto& [name, path] : outputs_) std::filesystem::remove(path, none);
+    for (const std::string& path : created_) std::filesystem::remove(path, none);
   }
   return Fail(fault);
 }

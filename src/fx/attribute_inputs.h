@@ -2,6 +2,8 @@
 
 #include <initializer_list>
 #include <string>
+#include <utility>
+#include <vector>
 
 #include "fx/attribute_forms.h"
 #include "fx/label_census.h"
@@ -37,14 +39,17 @@ class RegionCommand : public RasterCommand {
   /// Runs a process here. False, with its fault set, after a failure or an abort.
   bool HasRun(ProcessBuilder<Process>& process);
 
-  /// Fails with the fault of this thread, at an abort too; and removes the outputs, unless sums
-  /// that were told to stay are in them.
+  /// Notes that an output was created, and is to be removed where the command fails.
+  void NoteCreated(const URI& uri) { created_.push_back(uri.ToUTF8()); }
+  /// Fails with the fault of this thread; and removes what was created, unless sums that were told
+  /// to stay are in there.
   CommandResult FailWithout(const char* otherwise, RegionSums form);
 
  private:
   bool IsNew(const char* name, const URI& uri) const;
 
   std::vector<std::pair<std::string, std::string>> outputs_;  // names of inputs, and paths
+  std::vector<std::string> created_;
 };
 
 /// The input "Sums".

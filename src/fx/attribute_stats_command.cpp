@@ -25,7 +25,9 @@ class FxComputeAttributesStatsCommand final : public RegionCommand {
       return Fail(String("AttributeFXA: " + from.ToUTF8() + " is no file of regions"));
     }
     RegionAttributeStatsFile<float> stats(to, regions.Bands(), regions.Attributes());
-    const bool isDone = stats.IsValid() && Fill(regions, stats) && stats.Close();
+    if (!stats.IsValid()) return Fail();
+    NoteCreated(to);
+    const bool isDone = Fill(regions, stats) && stats.Close();
     return isDone ? Succeed() : FailWithout("the statistics can't be written", RegionSums::kExact);
   }
 

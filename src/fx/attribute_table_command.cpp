@@ -1,10 +1,12 @@
 #include <algorithm>
 #include <charconv>
+#include <cmath>
 #include <filesystem>
 
 #include "data/vector_records.h"
 #include "foundation/fault.h"
 #include "foundation/progress.h"
+#include "fx/attribute_csv.h"
 #include "fx/attribute_inputs.h"
 #include "fx/attribute_names.h"
 #include "fx/region_kinds.h"
@@ -54,19 +56,18 @@ class CreateAttributeTableCommand final : public RegionCommand {
     URI table;
     if (!CheckInputs() || !TakeOutput("Table", table) || !OpenStores()) return Fail();
     path_ = table.ToUTF8();
-    const bool hasShapes =
-        HasInput("LabelURI") && std::filesystem::path(path_).extension() != ".csv";
+    const bool hasShapes = HasInput("LabelURI") && !IsCsv(path_);
     const BasicRasterPtr labels = hasShapes ? FindLabels(nullptr) : BasicRasterPtr();
     if (hasShapes && !labels) return Fail();
     if (labels) geoRef_ = labels->GetRasterDef().geoRef;
-    VectorRecordFactory* const factory = GetVectorRecordFactory();
-    if (factory == nullptr) return Fail();
-    sink_ = factory->Create(path_, Describe(hasShapes));
-    if (!sink_) return Fail(TakeFaultOr("the table can't be made"));
     const bool isDone = hasShapes ? WriteShapes(labels) : WriteRows();
-    if (!isDone || !sink_->Close()) return Fail(TakeFaultOr("the table can't be written"));
+    if (!isDone) return Fail(TakeFaultOr("the table can't be written"));
     Write("Regions", rows_);
     return Succeed();
+  }
+
+  static bool IsCsv(const std::string& path) {
+    return std::filesystem::path(path).extension() == ".csv";
   }
 
   bool OpenStores() {
@@ -123,6 +124,7 @@ class CreateAttributeTableCommand final : public RegionCommand {
     layer.name = std::filesystem::path(path_).stem().string();
     layer.hasShapes = hasShapes;
     if (hasShapes) layer.geometry = VectorGeometry::kPolygon;
+    layer.isMulti = hasShapes;
     if (geoRef_) layer.coordSys = geoRef_->CoordinateSystem();
     layer.fields = {{"label", VectorFieldType::kInteger}};
     for (const TableStore& store : stores_) {
@@ -144,30 +146,36 @@ class CreateAttributeTableCommand final : public RegionCommand {
     return kind == AttributeKind::kEntropy ? names.first(1) : names;
   }
 
-  /// Fills the values of a region. @return false when no store has it.
+  /// Fills the values of a region, NaN for those that it lacks. @return false when no store has it.
   bool FillValues(std::uint32_t label) {
     bool isThere = false;
-    record_.values.assign(1, static_cast<std::int64_t>(label));
+    values_.clear();
     for (const TableStore& store : stores_) {
       const RegionAttributesFile<float>& file = *store.file;
-      const std::span<const AttributeName> columns = ColumnsOf(store.kind);
+      const auto columns = static_cast<unsigned>(ColumnsOf(store.kind).size());
       for (unsigned band = 0; band < file.Bands(); ++band) {
-        if (!file.RegionExists(label, band)) {
-          record_.values.resize(record_.values.size() + columns.size());
-          continue;
-        }
-        isThere = true;
-        for (unsigned i = 0; i < columns.size(); ++i) {
-          const float value = file.Value(label, band, i);
-          if (columns[i].isWhole) {
-            record_.values.emplace_back(static_cast<std::int64_t>(value));
-          } else {
-            record_.values.emplace_back(Shortest(value));
-          }
+        const bool isInBand = file.RegionExists(label, band);
+        isThere = isThere || isInBand;
+        for (unsigned i = 0; i < columns; ++i) {
+          values_.push_back(isInBand ? file.Value(label, band, i) : NAN);
         }
       }
     }
     return isThere;
+  }
+
+  /// Puts the values of a region into its record.
+  void FillRecord(std::uint32_t label) {
+    record_.values.assign(1, static_cast<std::int64_t>(label));
+    for (std::size_t i = 0; i < values_.size(); ++i) {
+      if (!std::isfinite(values_[i])) {
+        record_.values.emplace_back();
+      } else if (fields_[i + 1].type == VectorFieldType::kInteger) {
+        record_.values.emplace_back(static_cast<std::int64_t>(values_[i]));
+      } else {
+        record_.values.emplace_back(Shortest(values_[i]));
+      }
+    }
   }
 
   bool AreSound() const {
@@ -175,7 +183,34 @@ class CreateAttributeTableCommand final : public RegionCommand {
                        [](const TableStore& store) { return store.file->IsValid(); });
   }
 
+  bool CreateSink(bool hasShapes) {
+    VectorRecordFactory* const factory = GetVectorRecordFactory();
+    if (factory == nullptr) return false;
+    const VectorLayer layer = Describe(hasShapes);
+    fields_ = layer.fields;
+    sink_ = factory->Create(path_, layer);
+    return bool(sink_);
+  }
+
+  /// Writes a row for each region, by ascending label.
   bool WriteRows() {
+    if (!IsCsv(path_)) {
+      return CreateSink(false) && ForEachRow([this](std::uint32_t label) {
+               FillRecord(label);
+               return sink_->Write(record_);
+             }) &&
+             sink_->Close();
+    }
+    std::vector<std::string> names;
+    for (const VectorField& field : Describe(false).fields) names.push_back(field.name);
+    AttributeCsv table;
+    return table.Begin(path_, names) &&
+           ForEachRow([&](std::uint32_t label) { return table.Write(label, values_); }) &&
+           table.Close();
+  }
+
+  template <typename WriteRow>
+  bool ForEachRow(const WriteRow& write) {
     unsigned records = 0;
     for (const TableStore& store : stores_) records = std::max(records, store.file->RegionCount());
     for (unsigned label = 0; label < records; ++label) {
@@ -187,7 +222,7 @@ class CreateAttributeTableCommand final : public RegionCommand {
         GetIPC().progress->Update(static_cast<double>(label) / records);
       }
       if (!FillValues(label)) continue;
-      if (!sink_->Write(record_)) return false;
+      if (!write(label)) return false;
       ++rows_;
     }
     return AreSound();
@@ -197,7 +232,7 @@ class CreateAttributeTableCommand final : public RegionCommand {
     const IPC first(GetIPC().abort,
                     ProgressReportPtr(new ScaledProgressReport(GetIPC().progress, 8)));
     LabelCensus census;
-    if (!census.Run(labels, first)) return false;
+    if (!census.Run(labels, first) || !CreateSink(true)) return false;
     const IPC second(GetIPC().abort,
                      ProgressReportPtr(new ScaledProgressReport(GetIPC().progress, 8, 7)));
     record_.geometry = VectorGeometry::kPolygon;
@@ -209,7 +244,7 @@ class CreateAttributeTableCommand final : public RegionCommand {
           },
           second);
     });
-    return isDone && AreSound();
+    return isDone && AreSound() && sink_->Close();
   }
 
   /// Takes a polygon, its rings split where they touch themselves.
@@ -227,6 +262,7 @@ class CreateAttributeTableCommand final : public RegionCommand {
 
   bool WriteRegion(std::uint32_t label, const TracedPolygon& polygon) {
     if (!FillValues(label)) return true;
+    FillRecord(label);
     record_.partEnds.assign(polygon.starts.begin() + 1, polygon.starts.end());
     record_.partEnds.push_back(static_cast<std::uint32_t>(polygon.coordinates.size() / 2));
     record_.holes = polygon.holes;
@@ -249,6 +285,8 @@ class CreateAttributeTableCommand final : public RegionCommand {
   Array<unsigned> bands_;
   GeoRefPtr geoRef_;
   VectorRecordSinkPtr sink_;
+  std::vector<VectorField> fields_;
+  std::vector<float> values_;  // of a region, for each field behind the label
   VectorRecord record_;
   std::uint64_t rows_ = 0;
 };

@@ -111,11 +111,13 @@ class FxComputePixelAttributesCommand final : public RegionCommand {
   }
 
   bool CreateFiles(unsigned bands) {
-    const auto create = [bands](const URI& uri, auto& file) {
+    const auto create = [&](const URI& uri, auto& file) {
       using File = std::remove_pointer_t<decltype(file.Get())>;
       if (uri.GetLength() == 0) return true;
       file.Reset(new File(uri, bands));
-      return file->IsValid();
+      if (!file->IsValid()) return false;
+      NoteCreated(uri);
+      return true;
     };
     return create(spectral_, plan_.spectral) && create(texture_, plan_.texture) &&
            create(means_, plan_.means) && create(entropy_, plan_.entropy);

@@ -40,8 +40,7 @@ class FxComputeVectorAttributesCommand final : public RegionCommand {
     if (HasInput("Parts")) setup_->parts = Read<RegionParts>("Parts");
     const bool isDone = HasInput("LabelURI") ? FromLabels() : FromFile();
     if (isDone) return Succeed();
-    return setup_->file ? FailWithout("the shapes could not be computed", RegionSums::kExact)
-                        : Fail();
+    return FailWithout("the shapes could not be computed", RegionSums::kExact);
   }
 
   bool ReadSize() {
@@ -63,7 +62,9 @@ class FxComputeVectorAttributesCommand final : public RegionCommand {
 
   bool CreateFileAt(const URI& uri) {
     setup_->file.Reset(new SpatialRegionAttributesFile(uri));
-    return setup_->file->IsValid();
+    if (!setup_->file->IsValid()) return false;
+    NoteCreated(uri);
+    return true;
   }
 
   IPC Share(double parts) const {
