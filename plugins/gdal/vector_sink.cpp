@@ -82,7 +82,8 @@ class Settings {
 /// The shape of a record in the well-known binary form.
 class ShapeBytes {
  public:
-  const std::vector<unsigned char>& Make(const VectorRecord& record) {
+  /// @param isMulti  all polygons become multipolygons, as a layer of these needs.
+  const std::vector<unsigned char>& Make(const VectorRecord& record, bool isMulti) {
     bytes_.clear();
     switch (record.geometry) {
       case VectorGeometry::kPoint:
@@ -95,7 +96,7 @@ class ShapeBytes {
         PutVertices(record, 0, record.coordinates.size() / 2);
         break;
       default:
-        PutPolygons(record);
+        PutPolygons(record, isMulti);
     }
     return bytes_;
   }
@@ -119,11 +120,11 @@ class ShapeBytes {
     if (size != 0) std::memcpy(bytes_.data() + at, record.coordinates.data() + 2 * begin, size);
   }
 
-  void PutPolygons(const VectorRecord& record) {
+  void PutPolygons(const VectorRecord& record, bool isMulti) {
     const std::size_t parts = record.partEnds.size();
     const auto outer =
         static_cast<std::uint32_t>(std::count(record.holes.begin(), record.holes.end(), 0));
-    if (outer > 1) {
+    if (outer > 1 || isMulti) {
       PutHead(wkbMultiPolygon);
       Put(outer);
     }
@@ -186,6 +187,7 @@ class GdalVectorSink final : public VectorRecordSink {
   gdal::FeaturePtr feature_;
   ShapeBytes shape_;
   bool hasShapes_ = true;
+  bool isMulti_ = false;
   bool isFailed_ = false;
 };
 
@@ -209,6 +211,7 @@ bool GdalVectorSink::Begin(const VectorLayer& layer) {
 bool GdalVectorSink::MakeLayer(const VectorLayer& layer) {
   CPLStringList options;
   hasShapes_ = layer.hasShapes;
+  isMulti_ = layer.isMulti && layer.geometry == VectorGeometry::kPolygon;
   if (hasShapes_) {
     for (const char* const option : format_.options) options.AddString(option);
   } else {
@@ -216,7 +219,9 @@ bool GdalVectorSink::MakeLayer(const VectorLayer& layer) {
   }
   OGRSpatialReferenceH const system = gdal::MakeSpatialReference(layer.coordSys);
   layer_ = GDALDatasetCreateLayer(dataset_.get(), layer.name.c_str(), system,
-                                  hasShapes_ ? gdal::LayerTypeOf(layer.geometry) : wkbNone,
+                                  !hasShapes_ ? wkbNone
+                                  : isMulti_  ? wkbMultiPolygon
+                                              : gdal::LayerTypeOf(layer.geometry),
                                   options.List());
   if (system != nullptr) OSRRelease(system);
   if (layer_ == nullptr) return false;
@@ -251,7 +256,7 @@ bool GdalVectorSink::SetShape(const VectorRecord& record) {
   if (!hasShapes_) return true;
   OGRGeometryH shape = nullptr;
   if (!record.partEnds.empty()) {
-    const std::vector<unsigned char>& bytes = shape_.Make(record);
+    const std::vector<unsigned char>& bytes = shape_.Make(record, isMulti_);
     if (OGR_G_CreateFromWkb(bytes.data(), nullptr, &shape, static_cast<int>(bytes.size())) !=
         OGRERR_NONE) {
       return false;

@@ -43,6 +43,7 @@ struct VectorLayer {
   std::int64_t records = -1;  ///< how many there are; below 0 when it isn't known
   MapRect bounds;             ///< of all records, zeros when it isn't known
   bool hasShapes = true;      ///< a new file gets the shapes, not only the fields
+  bool isMulti = false;       ///< polygons of a new file may have several outer rings
 };
 
 /// One record. Polygons are lists of rings, each closed; an outer ring begins a polygon, whose

@@ -1,0 +1,17 @@
+#include "fx/attribute_forms.h"
+
+namespace lumo {
+
+std::span<const EnumWord<RegionSums>> WordsOf(RegionSums) {
+  static constexpr EnumWord<RegionSums> kWords[] = {{"Told", RegionSums::kTold},
+                                                    {"Exact", RegionSums::kExact}};
+  return kWords;
+}
+
+std::span<const EnumWord<RegionParts>> WordsOf(RegionParts) {
+  static constexpr EnumWord<RegionParts> kWords[] = {{"Told", RegionParts::kTold},
+                                                     {"Together", RegionParts::kTogether}};
+  return kWords;
+}
+
+}  // namespace lumo
