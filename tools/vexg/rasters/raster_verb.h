@@ -77,6 +77,8 @@ class RasterVerb : public FileVerb {
   virtual void AddMaking(JobDraft& draft, const String& shown, const FillValues& noData) const;
   /// Whether a copy has the no-data value of the file in the place of pixels that are not valid.
   virtual bool FillsNoData(const FillValues& noData) const { return !noData.empty(); }
+  /// Whether a copy goes through the blocks of the source's storage, and not through large squares.
+  virtual bool CopiesBlocksOfSource() const { return true; }
   /// Whether pixels that are not valid may get a no-data value where the format has nothing else.
   virtual bool MayChooseNoData() const { return true; }
   /// The no-data values of the file, where these were chosen; none for those of what is shown.
