@@ -40,7 +40,7 @@ namespace lumo {
 ///     const double* bands[] = {first, second};  // in the order of ratio->Inputs()
 ///     ratio->Evaluate(bands, count, scratch, result);
 ///
-/// Cost: a step takes about 0.3 ns a pixel, a function of the mathematical library 5 to 20.
+/// Cost: a step takes about 0.2 ns a pixel, a function of the mathematical library 3 to 10.
 /// Threads: any may use one, each with a Scratch of its own.
 class VEXG_EXPORT Expression {
  public:

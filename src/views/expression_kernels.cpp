@@ -10,11 +10,8 @@ namespace {
 
 constexpr double kNaN = std::numeric_limits<double>::quiet_NaN();
 
-bool IsNaN(double value) {
-  return value != value;
-}
-
-/// Computes the steps that take one rounding or none, whose loops become vector code. False for
+/// Computes the steps that take one rounding or none, whose loops become vector code: they
+/// have no branches, and no calls, not even of inline functions. a == a is false for NaN. False for
 /// another step.
 VEXG_CHOOSING_VECTOR_CLONES
 bool ComputeSimple(ExpressionOp op, const double* __restrict a, const double* __restrict b,
@@ -38,52 +35,53 @@ bool ComputeSimple(ExpressionOp op, const double* __restrict a, const double* __
       return true;
     case kLess:
       for (std::size_t i = 0; i < count; ++i) {
-        r[i] = IsNaN(a[i]) || IsNaN(b[i]) ? kNaN : a[i] < b[i] ? 1.0 : 0.0;
+        r[i] = (a[i] == a[i]) & (b[i] == b[i]) ? (a[i] < b[i] ? 1.0 : 0.0) : kNaN;
       }
       return true;
     case kLessEqual:
       for (std::size_t i = 0; i < count; ++i) {
-        r[i] = IsNaN(a[i]) || IsNaN(b[i]) ? kNaN : a[i] <= b[i] ? 1.0 : 0.0;
+        r[i] = (a[i] == a[i]) & (b[i] == b[i]) ? (a[i] <= b[i] ? 1.0 : 0.0) : kNaN;
       }
       return true;
     case kEqual:
       for (std::size_t i = 0; i < count; ++i) {
-        r[i] = IsNaN(a[i]) || IsNaN(b[i]) ? kNaN : a[i] == b[i] ? 1.0 : 0.0;
+        r[i] = (a[i] == a[i]) & (b[i] == b[i]) ? (a[i] == b[i] ? 1.0 : 0.0) : kNaN;
       }
       return true;
     case kNotEqual:
       for (std::size_t i = 0; i < count; ++i) {
-        r[i] = IsNaN(a[i]) || IsNaN(b[i]) ? kNaN : a[i] != b[i] ? 1.0 : 0.0;
+        r[i] = (a[i] == a[i]) & (b[i] == b[i]) ? (a[i] != b[i] ? 1.0 : 0.0) : kNaN;
       }
       return true;
     case kAnd:
       for (std::size_t i = 0; i < count; ++i) {
-        r[i] = IsNaN(a[i]) || IsNaN(b[i]) ? kNaN : a[i] != 0 && b[i] != 0 ? 1.0 : 0.0;
+        r[i] = (a[i] == a[i]) & (b[i] == b[i]) ? ((a[i] != 0) & (b[i] != 0) ? 1.0 : 0.0) : kNaN;
       }
       return true;
     case kOr:
       for (std::size_t i = 0; i < count; ++i) {
-        r[i] = IsNaN(a[i]) || IsNaN(b[i]) ? kNaN : a[i] != 0 || b[i] != 0 ? 1.0 : 0.0;
+        r[i] = (a[i] == a[i]) & (b[i] == b[i]) ? ((a[i] != 0) | (b[i] != 0) ? 1.0 : 0.0) : kNaN;
       }
       return true;
     case kNot:
       for (std::size_t i = 0; i < count; ++i) {
-        r[i] = IsNaN(a[i]) ? kNaN : a[i] == 0 ? 1.0 : 0.0;
+        r[i] = a[i] == a[i] ? (a[i] == 0 ? 1.0 : 0.0) : kNaN;
       }
       return true;
     case kMin:
       for (std::size_t i = 0; i < count; ++i) {
-        r[i] = IsNaN(a[i]) || a[i] < b[i] ? a[i] : b[i];  // b where that is NaN
+        r[i] = (a[i] == a[i]) & (b[i] == b[i]) ? (a[i] < b[i] ? a[i] : b[i]) : kNaN;
       }
       return true;
     case kMax:
       for (std::size_t i = 0; i < count; ++i) {
-        r[i] = IsNaN(a[i]) || a[i] > b[i] ? a[i] : b[i];
+        r[i] = (a[i] == a[i]) & (b[i] == b[i]) ? (a[i] > b[i] ? a[i] : b[i]) : kNaN;
       }
       return true;
     case kWhere:
       for (std::size_t i = 0; i < count; ++i) {
-        r[i] = IsNaN(a[i]) ? kNaN : a[i] != 0 ? b[i] : c[i];
+        const double then = b[i], otherwise = c[i];
+        r[i] = a[i] == a[i] ? (a[i] != 0 ? then : otherwise) : kNaN;
       }
       return true;
     case kAbs:
