@@ -181,6 +181,51 @@ def calibrate(bench):
                    "--offset", "-3"], {}, None, [bench.work / "calibrated.dat", bench.work / "calibrated.dat.hdr"])
 
 
+NDVI_SCRIPT = """
+import sys, numpy, rasterio
+source, target = sys.argv[1:]
+with rasterio.open(source) as src:
+    profile = src.profile
+    profile.update(dtype="float32", count=1)
+    with rasterio.open(target, "w", **profile) as out:
+        height = profile.get("blockysize", 256)
+        height = max(height, 256) // height * height
+        for y in range(0, src.height, height):
+            window = rasterio.windows.Window(0, y, src.width, min(height, src.height - y))
+            red, nir = src.read((3, 4), window=window).astype(numpy.float32)
+            out.write((nir - red) / (nir + red), 1, window=window)
+"""
+
+
+def calc(bench):
+    """NDVI of two of six bands."""
+    script = bench.work / "ndvi_rasterio.py"
+    script.write_text(NDVI_SCRIPT)
+    target, theirs = bench.work / "ndvi.tif", bench.work / "peer-ndvi.tif"
+    for type_name in TYPES:
+        for layout in ("tiled", "strips", "by band"):
+            scene = bench.scene(type_name, layout)
+            ours = [bench.vexg, "calc", target, "(b3 - b2) / (b3 + b2)", scene, "-q"]
+            peer = [sys.executable, script, scene, theirs]
+            bench.once(ours)
+            bench.once(peer)
+            subprocess.run(["gdal_calc.py", "--quiet", "-A", target, "-B", theirs, "--type=Float32",
+                            f"--outfile={bench.work / 'difference.tif'}", "--calc=abs(A-B)", "--overwrite"], check=True)
+            out = subprocess.run(["gdalinfo", "-mm", bench.work / "difference.tif"], capture_output=True, text=True,
+                                 check=True).stdout
+            if float(out.split("Computed Min/Max=")[1].split()[0].split(",")[1]) > 1e-6:
+                raise SystemExit(f"{target} and {theirs} differ")
+            bench.compare(
+                f"NDVI {type_name} {layout}", ours,
+                {"gdal_calc": ["gdal_calc.py", "--quiet", "-A", scene, "--A_band=4", "-B", scene, "--B_band=3",
+                               f"--outfile={theirs}", "--type=Float32",
+                               "--calc=(A.astype('f4')-B)/(A.astype('f4')+B)",
+                               *(f"--co={option}" for option in LAYOUTS[layout])],
+                 "rasterio": peer},
+                {"gdal_calc": 0.4, "rasterio": 0.8}, [target, theirs])
+    (bench.work / "difference.tif").unlink()
+
+
 def memory(bench):
     """Peak memory of one scene and of one four times as large."""
     target = bench.work / "calibrated.tif"
@@ -373,7 +418,7 @@ def grass_zones(bench, shapes, scene):
     return ["sh", "-c", f"grass {place / 'PERMANENT'} --exec sh -c '{' && '.join(steps)}' 2>/dev/null"]
 
 
-SECTIONS = {"stats": stats, "hist": hist, "calibrate": calibrate, "pyramid": pyramid, "warp": warp,
+SECTIONS = {"stats": stats, "hist": hist, "calibrate": calibrate, "calc": calc, "pyramid": pyramid, "warp": warp,
             "polygons": polygons, "zones": zones, "segments": segment_peers.speed,
             "segment-quality": segment_peers.quality, "memory": memory}
 

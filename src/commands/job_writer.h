@@ -21,6 +21,13 @@ class VEXG_EXPORT JobWriterCommand : public XMLElement {
     AddInput(inputName, variable);
   }
 
+  /// Has an input read the variables in a text: "$a $b" is an array of two.
+  void AddExpandedInput(const String& inputName, const String& variables) {
+    XMLElement* const input = AddChild("Input");
+    input->attributes["expand"] = "1";
+    input->attributes[inputName] = variables;
+  }
+
   /// Stores an output in a variable, which is named with its leading $.
   void AddOutput(const String& outputName, const String& variable) {
     AddChild("Output")->attributes[outputName] = variable;

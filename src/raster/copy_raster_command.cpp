@@ -22,6 +22,18 @@ std::span<const EnumWord<InvalidPixels>> WordsOf(InvalidPixels) {
   return kWords;
 }
 
+/// The blocks in which pixels are copied.
+enum class CopyBlocks : unsigned {
+  kTold = 0,   ///< squares, or lines, of 8 MiB
+  kStream = 1  ///< those of the source's storage
+};
+
+std::span<const EnumWord<CopyBlocks>> WordsOf(CopyBlocks) {
+  static constexpr EnumWord<CopyBlocks> kWords[] = {{"Told", CopyBlocks::kTold},
+                                                    {"Stream", CopyBlocks::kStream}};
+  return kWords;
+}
+
 /// Puts the values of `fill` where the pixels of a band, which has one, are not valid.
 template <typename T>
 void Fill(Tile<T>& tile, const std::vector<std::optional<T>>& fill) {
@@ -49,7 +61,10 @@ const CommandDeclaration kCopy{
      {"Invalid", Presence::kOptional, ValueKind::kWord,
       "Told: the values of pixels that aren't valid are copied; NoData: the target's no-data value "
       "takes their place, where a band has one",
-      "", &WordsIn<InvalidPixels>}},
+      "", &WordsIn<InvalidPixels>},
+     {"Blocks", Presence::kOptional, ValueKind::kWord,
+      "Told: squares or lines of 8 MiB; Stream: blocks as the source stores them, which costs less",
+      "", &WordsIn<CopyBlocks>}},
     {{"ValidPixels", ValueKind::kIntegerArray, "of each band that was copied"}}};
 
 class CopyRasterCommand final : public RasterCommand {
@@ -88,7 +103,12 @@ class CopyRasterCommand final : public RasterCommand {
     for (unsigned band = 0; fills && band < bands.GetCount(); ++band) {
       if (target->HasNoDataValue(band)) fill[band] = target->NoDataValue(band);
     }
-    const RasterIteratorPtr<T> from(new RasterIteratorSmart<T>(source, bands));
+    RasterIteratorPtr<T> from;
+    if (HasInput("Blocks") && Read<CopyBlocks>("Blocks") == CopyBlocks::kStream) {
+      from.Reset(new RasterIteratorStream<T>(source, bands));
+    } else {
+      from.Reset(new RasterIteratorSmart<T>(source, bands));
+    }
     const auto check = [&](Tile<T>& tile) {
       valid.Add(tile);
       Fill(tile, fill);

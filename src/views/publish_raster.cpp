@@ -1,6 +1,7 @@
 #include "views/publish_raster.h"
 
 #include "commands/catalog.h"
+#include "foundation/fault.h"
 
 namespace lumo {
 
@@ -13,6 +14,22 @@ CommandResult PublishCommand::Publish(const CatalogRasterRef& entered) {
   Write("URI", raster->GetURI());
   Write("DataType", DataTypeName(entered.DataType()));
   return Succeed();
+}
+
+std::vector<BasicRasterPtr> PublishCommand::FindRasters(const char* name) const {
+  std::vector<BasicRasterPtr> rasters;
+  for (const URI& uri : Read<Array<URI>>(name)) {
+    rasters.emplace_back(CatalogFind(uri));
+    if (rasters.back() && rasters.back()->IsValid()) continue;
+    SetFault(std::string(name) + ": no open raster [" + uri.ToUTF8() + "]");
+    return {};
+  }
+  if (rasters.empty()) SetFault(std::string(name) + " names no raster");
+  return rasters;
+}
+
+std::vector<const char*> EightTypeWords() {
+  return {"Byte", "Char", "UInt16", "Int16", "UInt32", "Int32", "Single", "Double"};
 }
 
 std::vector<OutputDeclaration> PublishedOutputs() {

@@ -15,6 +15,10 @@ namespace lumo {
 ///     }
 class VEXG_EXPORT PublishCommand : public RasterCommand {
  protected:
+  /// The valid rasters whose URIs the input `name` holds, in order; none, with the fault text set,
+  /// where it names none, or one is not open.
+  std::vector<BasicRasterPtr> FindRasters(const char* name) const;
+
   /// Gives the raster that was entered, when there is a valid one; else takes it out again and
   /// fails with the fault text.
   CommandResult Publish(const CatalogRasterRef& entered);
@@ -24,6 +28,9 @@ class VEXG_EXPORT PublishCommand : public RasterCommand {
     return Publish(CatalogRasterRef(raster, false));
   }
 };
+
+/// The words of the types of EightTypes, for an input that chooses one.
+VEXG_EXPORT std::vector<const char*> EightTypeWords();
 
 /// The outputs of a PublishCommand.
 VEXG_EXPORT std::vector<OutputDeclaration> PublishedOutputs();

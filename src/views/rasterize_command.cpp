@@ -11,11 +11,6 @@
 namespace lumo {
 namespace {
 
-/// The pixel types of such a raster.
-std::vector<const char*> TypeWords() {
-  return {"Byte", "Char", "UInt16", "Int16", "UInt32", "Int32", "Single", "Double"};
-}
-
 std::vector<InputDeclaration> Inputs() {
   return {{"Vectors", Presence::kRequired, ValueKind::kText, "the file of shapes"},
           {"LikeURI", Presence::kRequired, ValueKind::kURI, "the raster whose grid it gets"},
@@ -32,7 +27,7 @@ std::vector<InputDeclaration> Inputs() {
           {"NoData", Presence::kOptional, ValueKind::kNumber,
            "in place of Background: the no-data value of the pixels outside"},
           {"DataType", Presence::kOptional, ValueKind::kWord,
-           "pixel type; the smallest that holds all values when absent", "", &TypeWords},
+           "pixel type; the smallest that holds all values when absent", "", &EightTypeWords},
           {"Pixels", Presence::kOptional, ValueKind::kWord,
            "Told: the pixels of the inclusive scan of regions; Center: those whose centre lies "
            "inside; Touched: those whose area is touched",

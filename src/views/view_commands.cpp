@@ -86,22 +86,16 @@ const CommandDeclaration kStack{
 class CreateBandStackRasterCommand final : public PublishCommand {
   CommandResult Execute() override {
     if (!CheckInputs()) return Fail();
-    const auto uris = Read<Array<URI>>("SrcURI");
-    Array<BasicRasterPtr> sources(uris.GetDims());
-    for (unsigned i = 0; i < uris.GetCount(); ++i) {
-      sources[i] = BasicRasterPtr(CatalogFind(uris[i]));
-      if (!sources[i] || !sources[i]->IsValid()) {
-        return Fail(
-            String(std::string("SrcURI: no open raster [").append(uris[i].ToUTF8()).append("]")));
-      }
-      if (sources[i]->DataType() != sources[0]->DataType()) {
+    const std::vector<BasicRasterPtr> sources = FindRasters("SrcURI");
+    if (sources.empty()) return Fail();
+    for (const BasicRasterPtr& source : sources) {
+      if (source->DataType() != sources[0]->DataType()) {
         return Fail("SrcURI: the pixel types differ");
       }
     }
-    if (sources.GetCount() == 0) return Fail("SrcURI names no raster");
     BasicRasterPtr stack;
     const bool typed = DispatchType(EightTypes{}, sources[0]->DataType(), [&]<typename T>() {
-      Array<RasterPtr<T>> members(sources.GetDims());
+      Array<RasterPtr<T>> members{ArrayDims(static_cast<unsigned>(sources.size()))};
       for (unsigned i = 0; i < members.GetCount(); ++i) members[i] = RasterPtr<T>(sources[i]);
       stack.Reset(new BandStackRaster<T>(members));
       return true;

@@ -51,8 +51,8 @@ class Documents(PipeTest):
             self.assertEqual(shell.returncode, 0, shell.stderr)
             self.assertEqual(sorted(path.name for path in pathlib.Path(folder).iterdir()),
                              ["areas.csv", "areas.gpkg", "geographic.tif", "histogram.png", "labels.tif", "part.npy",
-                              "part.tif", "reflectance.tif", "scene.dat", "scene.dat.hdr", "scene.png", "scene.tif",
-                              "scene.tif.pyr", "segments.tif"])
+                              "part.tif", "ratio.tif", "reflectance.tif", "scene.dat", "scene.dat.hdr", "scene.png",
+                              "scene.tif", "scene.tif.pyr", "segments.tif"])
 
     def test_programs_compile(self):
         compiler = os.environ["VEXG_CXX"]

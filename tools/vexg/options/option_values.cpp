@@ -128,6 +128,16 @@ ValueRule PixelTypeName() {
   return WordRule(std::move(words), &TranslateType);
 }
 
+ValueRule EightTypeName() {
+  Strings words;
+  for (unsigned code = 0; code < 100; ++code) {
+    if (DispatchType(EightTypes{}, code, []<typename T>() { return true; })) {
+      words.push_back(DataTypeName(code).ToUTF8());
+    }
+  }
+  return WordRule(std::move(words), &TranslateType);
+}
+
 ValueRule CoordSysName() {
   return {[](std::string& text) {
             std::error_code ignored;

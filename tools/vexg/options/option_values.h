@@ -21,6 +21,9 @@ ValueRule NumberWithUnit(const std::vector<std::string>& units);
 /// Takes the name of a pixel type, whatever its case, and what other programs call it ("Float32").
 ValueRule PixelTypeName();
 
+/// The same, of the types that rasters are computed in: EightTypes.
+ValueRule EightTypeName();
+
 /// Takes a coordinate system; a bare number is a code of the EPSG registry.
 ValueRule CoordSysName();
 

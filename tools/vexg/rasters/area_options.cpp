@@ -207,34 +207,48 @@ void AreaOptions::AddViews(RasterChain& chain) const {
 /// Stands the views on one another. A mask is made of the cut raster, so that no more is read than
 /// the area.
 void AreaOptions::AddViews(RasterChain& chain, Masks masks) const {
-  JobDraft& draft = chain.GetDraft();
-  if (!noData_.empty()) AddNoData(chain);
-  if (!region_.empty() && masks == Masks::kAll) {
-    AddRegion(draft);
-    chain.AddView("inside", "CreateROIRasterCommand").AddVariableInput("ROIDefURI", "$region");
-    draft.Close("close.region", "$region");
-  }
-  if (isPart_) {
-    JobWriterCommand& view = chain.AddView("area", "CreateSpatialSubsetRasterCommand");
-    view.AddInput("SubRect", rect_);
-    view.AddInput("Placing", Form::kExact);
-  }
+  if (!noData_.empty()) AddNoData(chain, "nodata", noDataArray_);
+  AddPlace(chain, masks, {});
   if (maskBand_ && masks == Masks::kAll) AddMask(chain);
 }
 
-void AreaOptions::AddRegion(JobDraft& draft) const {
-  const RegionName name = SplitRegion(region_);
-  JobWriterCommand& region = draft.Open("region", "CreateGeometryROIDefCommand");
-  region.AddInput("Vectors", String(AbsoluteName(name.file)));
-  if (!name.layer.empty()) region.AddInput("Layer", String(name.layer));
+void AreaOptions::AddViewsOfFurther(RasterChain& chain, const std::string& name,
+                                    unsigned dataType) const {
+  if (!noData_.empty()) AddNoData(chain, name + "_nodata", ReadNoData(dataType));
+  AddPlace(chain, Masks::kAll, name + "_");
+}
+
+/// Adds the views of the region and of the rectangle, their names behind `name`.
+void AreaOptions::AddPlace(RasterChain& chain, Masks masks, const std::string& name) const {
+  JobDraft& draft = chain.GetDraft();
+  if (!region_.empty() && masks == Masks::kAll) {
+    const std::string region = name + "region";
+    AddRegion(draft, region);
+    chain.AddView(name + "inside", "CreateROIRasterCommand")
+        .AddVariableInput("ROIDefURI", String("$" + region));
+    draft.Close("close." + region, String("$" + region));
+  }
+  if (isPart_) {
+    JobWriterCommand& view = chain.AddView(name + "area", "CreateSpatialSubsetRasterCommand");
+    view.AddInput("SubRect", rect_);
+    view.AddInput("Placing", Form::kExact);
+  }
+}
+
+void AreaOptions::AddRegion(JobDraft& draft, const std::string& name) const {
+  const RegionName from = SplitRegion(region_);
+  JobWriterCommand& region = draft.Open(name, "CreateGeometryROIDefCommand");
+  region.AddInput("Vectors", String(AbsoluteName(from.file)));
+  if (!from.layer.empty()) region.AddInput("Layer", String(from.layer));
   if (!where_.empty()) region.AddInput("Where", String(where_));
   region.AddInput("ScanRules", String("Steady"));
   region.AddInput("Coordinates", String("Map"));
 }
 
-void AreaOptions::AddNoData(RasterChain& chain) const {
-  JobWriterCommand& view = chain.AddView("nodata", "CreateNoDataRasterCommand");
-  view.AddInput("NoDataValues", noDataArray_);
+void AreaOptions::AddNoData(RasterChain& chain, const std::string& name,
+                            const String& values) const {
+  JobWriterCommand& view = chain.AddView(name, "CreateNoDataRasterCommand");
+  view.AddInput("NoDataValues", values);
   view.AddInput(noData_ == "none" ? "RemoveAll" : "Replace", true);
   view.AddInput("Description", Form::kExact);
 }
@@ -332,12 +346,14 @@ void AreaOptions::CheckValues(const RasterInfo& info) {
                             return FormatValue(arrays);
                           });
   }
-  if (noData_ == "none") {
-    noDataArray_ = FormatValue(Array<double>());
-  } else if (!noData_.empty()) {
-    noDataArray_ = ValuesOf(noDataOption_, noData_, info.dataType,
-                            [](const auto& values) { return FormatValue(values); });
-  }
+  noDataArray_ = ReadNoData(info.dataType);
+}
+
+/// The no-data values as text of an array of pixels. Throws HostError for one that can't be.
+String AreaOptions::ReadNoData(unsigned dataType) const {
+  if (noData_.empty() || noData_ == "none") return FormatValue(Array<double>());
+  return ValuesOf(noDataOption_, noData_, dataType,
+                  [](const auto& values) { return FormatValue(values); });
 }
 
 }  // namespace lumo::host

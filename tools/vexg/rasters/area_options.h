@@ -39,6 +39,12 @@ class AreaOptions {
 
   /// Stands what shows the area on the raster of Plan, as the uppermost of a chain.
   void AddViews(RasterChain& chain) const;
+  /// Stands them on a further raster of the size of that of Plan. No mask band is looked at.
+  /// @param name  of the raster, which is the uppermost of the chain; stands in front of those of
+  ///              the views.
+  void AddViewsOfFurther(RasterChain& chain, const std::string& name, unsigned dataType) const;
+  /// Whether a band tells which pixels do not count.
+  bool HasMaskBand() const { return maskBand_.has_value(); }
 
   /// The rectangle of the raster around the area, after Plan.
   const SubRect& GetRect() const { return rect_; }
@@ -48,13 +54,15 @@ class AreaOptions {
  private:
   enum class Masks { kAll, kNone };
   void AddViews(RasterChain& chain, Masks masks) const;
-  void AddRegion(JobDraft& draft) const;
-  void AddNoData(RasterChain& chain) const;
+  void AddPlace(RasterChain& chain, Masks masks, const std::string& name) const;
+  void AddRegion(JobDraft& draft, const std::string& name = "region") const;
+  void AddNoData(RasterChain& chain, const std::string& name, const String& values) const;
   void AddMask(RasterChain& chain) const;
   SubRect FindRect(const RasterInfo& info, const std::string& shown) const;
   SubRect FindBox(const RasterInfo& info, const std::string& shown) const;
   void Measure(JobSession& session, const String& raster);
   void CheckValues(const RasterInfo& info);
+  String ReadNoData(unsigned dataType) const;
 
   std::string rectText_;
   std::string box_;

@@ -25,6 +25,7 @@ void RasterVerb::AddMaking(JobDraft& draft, const String& shown, const FillValue
   copy.AddVariableInput("SrcURI", shown);
   copy.AddVariableInput("DstURI", "$target");
   copy.AddInput("Invalid", String(FillsNoData(noData) ? "NoData" : "Told"));
+  if (CopiesBlocksOfSource()) copy.AddInput("Blocks", String("Stream"));
 }
 
 RasterContents RasterVerb::ReadWanted(const JobResults& results) const {

@@ -13,34 +13,7 @@ namespace lumo::host {
 ///
 /// The verb says what stands on the source, as commands; making the file, keeping what is known of
 /// the pixels, comparing the file with what was put in, and all that FileVerb does, is done here.
-/// The whole of a verb that leaves out what lies outside the shapes of a file:
-///
-/// ```
-/// class ClipVerb final : public RasterVerb {
-///  public:
-///   explicit ClipVerb(OptionSet& line) : RasterVerb(line, "The clipped raster") {
-///     line.Add("--by", shapes_, "The shapes").IsFile().Required();
-///   }
-///
-///  private:
-///   std::vector<std::string> GetFurtherInputs() const override { return {shapes_}; }
-///   RasterInfo PlanRaster(JobSession&, const JobResults&, const RasterInfo& source) override {
-///     return source;  // of the same size, bands and pixel type
-///   }
-///   void AddViews(RasterChain& chain) const override {
-///     JobWriterCommand& region =
-///         chain.GetDraft().Open("region", "CreateGeometryROIDefCommand");
-///     region.AddInput("Vectors", ConnStrings({String(AbsoluteName(shapes_))}));
-///     chain.AddView("clipped", "CreateROIRasterCommand").AddVariableInput("ROIDefURI", "$region");
-///     chain.GetDraft().Close("close.region", "$region");
-///   }
-///
-///   std::string shapes_;
-/// };
-///
-/// const VerbRegistration registration("clip", "Leaves out what is not in shapes",
-///                                     &SetUp<ClipVerb>);
-/// ```
+/// `examples/clip_verb.cpp` is the whole of a verb.
 class RasterVerb : public FileVerb {
  protected:
   /// Adds the raster and the output to the command line.
@@ -78,6 +51,8 @@ class RasterVerb : public FileVerb {
   virtual void AddMaking(JobDraft& draft, const String& shown, const FillValues& noData) const;
   /// Whether a copy has the no-data value of the file in the place of pixels that are not valid.
   virtual bool FillsNoData(const FillValues& noData) const { return !noData.empty(); }
+  /// Whether a copy goes through the blocks of the source's storage, and not through large squares.
+  virtual bool CopiesBlocksOfSource() const { return true; }
   /// Whether pixels that are not valid may get a no-data value where the format has nothing else.
   virtual bool MayChooseNoData() const { return true; }
   /// The no-data values of the file, where these were chosen; none for those of what is shown.

@@ -24,7 +24,7 @@ class RasterizeVerb final : public RasterVerb {
     line.Add("--no-data", noData_, "Value of the pixels outside, which are not valid").Shows("N");
     line.Add("--type", type_, "Pixel type; the smallest that holds all values by default")
         .Shows("TYPE")
-        .Takes(PixelTypeName());
+        .Takes(EightTypeName());
   }
 
  private:

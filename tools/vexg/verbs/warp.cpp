@@ -226,6 +226,9 @@ class WarpVerb final : public RasterVerb {
     return noData_.has_value() || RasterVerb::FillsNoData(noData);
   }
 
+  /// Squares cover least of a source that lies turned in the grid.
+  bool CopiesBlocksOfSource() const override { return false; }
+
   std::string to_;
   std::string pixelSize_;  // with or without a unit
   std::string method_ = "polynomial";
