@@ -106,8 +106,7 @@ class FitSegmentationCommand final : public SegmentCommand {
     GradientHistogram histogram;
     if (!CountGradients(segment_, ReadAlgorithm(), bins, NextPass(), histogram)) return false;
     const double share = Read<double>("SegmentPercent") / 100;
-    segmentValue_ =
-        std::min(low_ + BinAt(histogram.shares, share) * histogram.binSize, high_);
+    segmentValue_ = std::min(low_ + BinAt(histogram.shares, share) * histogram.binSize, high_);
     return true;
   }
 

@@ -1,0 +1,120 @@
+#include "fx/class_scores.h"
+
+#include <algorithm>
+
+#include "foundation/fault.h"
+#include "tasks/parallel.h"
+
+namespace lumo {
+namespace {
+
+bool Refuse(const std::string& why) {
+  SetFault(String(why));
+  return false;
+}
+
+}  // namespace
+
+bool ClassScoresCommand::OpenFiles(bool withStatistics) {
+  if (!columns_.Open(Read<Array<String>>("AttributesFXA"))) return false;
+  return !withStatistics || columns_.OpenStatistics(Read<Array<String>>("StatsFXAS"));
+}
+
+bool ClassScoresCommand::ChooseAttributes() {
+  const auto rows = Read<Array<unsigned>>("AttributeDefinition");
+  constexpr unsigned kColumns = 3;
+  if (!rows.IsValid() || rows.GetCount() == 0 || rows.GetCount() % kColumns != 0) {
+    return Refuse("AttributeDefinition: the numbers are no rows of 3");
+  }
+  std::vector<AttributeChoice> choices;
+  for (unsigned i = 0; i < rows.GetCount(); i += kColumns) {
+    choices.push_back({rows[i], rows[i + 1], rows[i + 2]});
+  }
+  return columns_.Choose(std::move(choices), "AttributeDefinition");
+}
+
+bool ClassScoresCommand::ReadExamples() {
+  const auto rows = Read<Array<unsigned>>("ExampleDefinition");
+  const unsigned width = rows.GetRank() >= 2 ? rows.GetExtent(rows.GetRank() - 1) : 2;
+  if (!rows.IsValid() || rows.GetCount() == 0 || width < 2 || rows.GetCount() % width != 0) {
+    return Refuse("ExampleDefinition: the numbers are no rows of class and region");
+  }
+  constexpr unsigned kMostClasses = 65535;  // attributes of a file
+  const unsigned regions = columns_.RegionCount();
+  for (unsigned i = 0; i < rows.GetCount(); i += width) {
+    const ClassExample example{rows[i], rows[i + 1]};
+    const std::string row = "ExampleDefinition: row " + std::to_string(i / width) + ": ";
+    if (example.classIndex >= kMostClasses) {
+      return Refuse(row + "class " + std::to_string(example.classIndex) + " is above 65534");
+    }
+    if (example.region >= regions) {
+      return Refuse(row + "there is no region " + std::to_string(example.region) + ", only " +
+                    std::to_string(regions));
+    }
+    examples_.push_back(example);
+    classCount_ = std::max(classCount_, example.classIndex + 1);
+  }
+  return true;
+}
+
+bool ClassScoresCommand::CreateScores(unsigned classes) {
+  URI uri;
+  if (!TakeOutput("ClassFXC", uri)) return false;
+  classCount_ = classes;
+  scores_ = std::make_unique<RegionClassificationProbabilityFile>(uri, classes);
+  return scores_->IsValid();
+}
+
+bool ClassScoresCommand::ScoreRegions(const std::vector<unsigned>& regions,
+                                      const ScoreBlock& score) {
+  constexpr std::size_t kBlock = 8192;
+  constexpr unsigned kPart = 256;
+  std::vector<double> values(kBlock * columns_.Count()), scores(kBlock * classCount_);
+  for (std::size_t begin = 0; begin < regions.size(); begin += kBlock) {
+    const auto count = static_cast<unsigned>(std::min(kBlock, regions.size() - begin));
+    const unsigned parts = (count + kPart - 1) / kPart;
+    for (unsigned part = 0; part < parts; ++part) {
+      const unsigned first = part * kPart, length = std::min(kPart, count - first);
+      double* const to = values.data() + std::size_t{first} * columns_.Count();
+      columns_.Read(regions.data() + begin + first, length, to);
+    }
+    std::fill(scores.begin(), scores.end(), 0.0);
+    ParallelFor(parts, nullptr, [&](unsigned part) {
+      const unsigned first = part * kPart, length = std::min(kPart, count - first);
+      score(regions.data() + begin + first, length,
+            values.data() + std::size_t{first} * columns_.Count(),
+            scores.data() + std::size_t{first} * classCount_);
+    });
+    for (unsigned i = 0; i < count; ++i) {
+      for (unsigned c = 0; c < classCount_; ++c) {
+        scores_->Value(regions[begin + i], 0, c) =
+            static_cast<float>(scores[std::size_t{i} * classCount_ + c]);
+      }
+    }
+    GetIPC().progress->Update(static_cast<double>(begin + count) /
+                              static_cast<double>(regions.size()));
+    if (GetIPC().abort->IsSet()) return Refuse("the work was aborted");
+  }
+  return scores_->IsValid();
+}
+
+CommandResult ClassScoresCommand::Finish(bool isDone) {
+  if (isDone && scores_->Close()) return Succeed();
+  return Fail(TakeFaultOr("the scores can't be written"));
+}
+
+InputDeclaration AttributesInput() {
+  return {"AttributesFXA", Presence::kRequired, ValueKind::kTextList, "the files of regions"};
+}
+
+InputDeclaration StatisticsInput() {
+  return {"StatsFXAS", Presence::kRequired, ValueKind::kTextList,
+          "the files of their statistics, in the same order"};
+}
+
+InputDeclaration ScoresInput() {
+  return {"ClassFXC", Presence::kRequired, ValueKind::kText,
+          "the file to create, with a score of each region for each class"};
+}
+
+}  // namespace lumo

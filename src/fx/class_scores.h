@@ -1,0 +1,54 @@
+#pragma once
+
+#include <functional>
+
+#include "commands/value_text.h"
+#include "fx/attribute_columns.h"
+#include "fx/attribute_inputs.h"
+#include "fx/region_kinds.h"
+
+namespace lumo {
+
+/// An example of a class: a region.
+struct ClassExample {
+  unsigned classIndex = 0;
+  unsigned region = 0;
+};
+
+/// Helps the commands that score regions for classes.
+class ClassScoresCommand : public RegionCommand {
+ protected:
+  /// Opens the files of the inputs "AttributesFXA" and, where they are asked for, "StatsFXAS".
+  bool OpenFiles(bool withStatistics);
+  /// Chooses the attributes of the input "AttributeDefinition", in rows of file, attribute, band.
+  bool ChooseAttributes();
+  /// Reads the input "ExampleDefinition": rows of class and region. There are as many classes as
+  /// the largest index and 1.
+  bool ReadExamples();
+
+  /// Makes the file of the input "ClassFXC", for so many classes.
+  bool CreateScores(unsigned classes);
+
+  /// Computes scores of regions, many at once: `count` regions from `first` of `regions` on, or of
+  /// all where that is null. `values` are those of their attributes, as AttributeColumns::Read
+  /// gives them; `scores` are for each region one for each class, zeros at first.
+  using ScoreBlock = std::function<void(const unsigned* regions, unsigned count,
+                                        const double* values, double* scores)>;
+  /// Scores regions in blocks and stores what comes out. False at an abort, or a failure.
+  bool ScoreRegions(const std::vector<unsigned>& regions, const ScoreBlock& score);
+
+  /// Ends a command whose scores are all there, or which failed.
+  CommandResult Finish(bool isDone);
+
+  AttributeColumns columns_;
+  std::vector<ClassExample> examples_;
+  unsigned classCount_ = 0;
+  std::unique_ptr<RegionClassificationProbabilityFile> scores_;
+};
+
+/// The inputs that the commands share.
+InputDeclaration AttributesInput();
+InputDeclaration StatisticsInput();
+InputDeclaration ScoresInput();
+
+}  // namespace lumo
