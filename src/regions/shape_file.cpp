@@ -4,6 +4,7 @@
 #include <charconv>
 #include <cmath>
 
+#include "commands/value_text.h"
 #include "foundation/fault.h"
 #include "foundation/near_name.h"
 #include "geometry/packed_geometry.h"
@@ -150,18 +151,24 @@ std::optional<GeometryKind> KindOf(const VectorRecord& record) {
   return refuse(" isn't made of points, lines or polygons alone");
 }
 
-GeometryPtr ReadShapes(VectorRecordSource& source, const ShapeSelection& selection, const IPC& ipc,
-                       std::vector<double>* values) {
+std::string TextOf(const VectorValue& value) {
+  if (const auto* text = std::get_if<std::string>(&value)) return *text;
+  const double number = NumberOf(value);
+  if (std::isnan(number)) return {};
+  return FormatValue(number).ToUTF8();
+}
+
+namespace {
+
+/// Reads the shapes that are selected, of those whose values `take(record)` takes.
+template <typename Take>
+GeometryPtr ReadTaken(VectorRecordSource& source, const ShapeSelection& selection,
+                      const VectorLayer& description, const IPC& ipc, const Take& take) {
   constexpr unsigned kLookEvery = 1024;
-  const VectorLayer description = source.Layer(selection.layer);
   RecordFilter filter;
-  if (!filter.Set(description, selection.where)) return {};
-  std::optional<std::size_t> field;
-  if (!selection.field.empty()) {
-    field = FindNumberField(description, selection.field);
-    if (!field) return {};
+  if (!filter.Set(description, selection.where) || !source.Begin(selection.layer, nullptr)) {
+    return {};
   }
-  if (!source.Begin(selection.layer, nullptr)) return {};
   auto* const shapes = new PackedGeometry(description.coordSys);
   GeometryPtr geometry(shapes);
   VectorRecord record;
@@ -171,17 +178,47 @@ GeometryPtr ReadShapes(VectorRecordSource& source, const ShapeSelection& selecti
       SetFault("the reading was aborted");
       return {};
     }
-    const double value = field ? NumberOf(record.values[*field]) : 0;
-    if (record.partEnds.empty() || !filter.Accepts(record) || std::isnan(value)) continue;
+    if (record.partEnds.empty() || !filter.Accepts(record) || !take(record)) continue;
     const std::optional<GeometryKind> kind = KindOf(record);
     if (!kind) return {};
     shapes->Add(*kind, record);
-    if (field && values != nullptr) values->push_back(value);
   }
   const String fault = TakeFault();
   if (fault.GetLength() == 0) return geometry;
   SetFault(fault);
   return {};
+}
+
+}  // namespace
+
+GeometryPtr ReadShapes(VectorRecordSource& source, const ShapeSelection& selection, const IPC& ipc,
+                       std::vector<double>* values) {
+  const VectorLayer description = source.Layer(selection.layer);
+  std::optional<std::size_t> field;
+  if (!selection.field.empty()) {
+    field = FindNumberField(description, selection.field);
+    if (!field) return {};
+  }
+  return ReadTaken(source, selection, description, ipc, [&](const VectorRecord& record) {
+    if (!field) return true;
+    const double value = NumberOf(record.values[*field]);
+    if (std::isnan(value)) return false;
+    if (values != nullptr) values->push_back(value);
+    return true;
+  });
+}
+
+GeometryPtr ReadNamedShapes(VectorRecordSource& source, const ShapeSelection& selection,
+                            const IPC& ipc, std::vector<std::string>& texts) {
+  const VectorLayer description = source.Layer(selection.layer);
+  const std::optional<std::size_t> field = FindField(description, selection.field);
+  if (!field) return {};
+  return ReadTaken(source, selection, description, ipc, [&](const VectorRecord& record) {
+    texts.push_back(TextOf(record.values[*field]));
+    if (!texts.back().empty()) return true;
+    texts.pop_back();
+    return false;
+  });
 }
 
 std::string FaultOfShapes(const std::string& path) {

@@ -55,6 +55,15 @@ struct ShapeSelection {
   std::string field;        ///< whose numbers are read too; records without one are left out
 };
 
+/// The text of the value of a field; empty for none. Whole numbers have no point.
+VEXG_EXPORT std::string TextOf(const VectorValue& value);
+
+/// Reads all shapes that are selected, with the texts of one of their fields; records without a
+/// shape, or a value there, are left out.
+/// @param texts  [out] for each record.
+VEXG_EXPORT GeometryPtr ReadNamedShapes(VectorRecordSource& source, const ShapeSelection& selection,
+                                        const IPC& ipc, std::vector<std::string>& texts);
+
 /// Reads all shapes that are selected; records without a shape are left out.
 /// @param ipc     its abort flag ends the reading.
 /// @param values  [out] for each record, the number in the selected field, when there is one.

@@ -1,0 +1,196 @@
+#include <algorithm>
+#include <charconv>
+#include <cmath>
+#include <optional>
+
+#include "foundation/fault.h"
+#include "fx/accuracy.h"
+#include "raster/raster_command.h"
+#include "regions/shape_file.h"
+#include "regions/zonal_pass.h"
+
+namespace lumo {
+namespace {
+
+const CommandDeclaration kAccuracy{
+    "AccuracyCommand",
+    "Feature extraction",
+    "Compares a map of classes with samples of known classes. A command of this library's own.",
+    {{"MapURI", Presence::kRequired, ValueKind::kURI, "the map; its first band counts"},
+     {"Vectors", Presence::kRequired, ValueKind::kText,
+      "the file of samples: points, or shapes, which are of the class of most of their pixels"},
+     {"ClassField", Presence::kRequired, ValueKind::kText, "the field with the class of a sample"},
+     {"Layer", Presence::kOptional, ValueKind::kText,
+      "a layer of the file, by its name or its number from 0; the first when absent"},
+     {"Where", Presence::kOptional, ValueKind::kText,
+      "FIELD=VALUE: only records with that value; all when absent"},
+     {"Classes", Presence::kOptional, ValueKind::kTextList,
+      "the names of the map's values from 1 on; when absent the field holds values"}},
+    {{"Classes", ValueKind::kTextList, "the classes, in the order of the matrix"},
+     {"Matrix", ValueKind::kIntegerArray,
+      "samples: a row for each class that is known, a column for each class of the map"},
+     {"Overall", ValueKind::kNumberArray,
+      "share of the samples whose class the map has, and the bounds of its 95 % interval"},
+     {"Kappa", ValueKind::kNumber, "agreement beyond chance"},
+     {"Producer", ValueKind::kNumberArray,
+      "for each class: of its samples the share that the map has, and the bounds"},
+     {"User", ValueKind::kNumberArray,
+      "for each class: of the samples that it has in the map the share that is right, and the "
+      "bounds"},
+     {"F1", ValueKind::kNumberArray, "for each class the harmonic mean of both"},
+     {"Outside", ValueKind::kInteger, "samples without a pixel that counts"},
+     {"NoClass", ValueKind::kInteger, "samples on pixels of no class"}}};
+
+/// The order of names: numbers by value, in front of texts.
+bool IsInFront(const std::string& a, const std::string& b) {
+  double x = 0, y = 0;
+  const auto isNumber = [](const std::string& text, double& value) {
+    const char* const end = text.data() + text.size();
+    return std::from_chars(text.data(), end, value).ptr == end;
+  };
+  const bool first = isNumber(a, x), second = isNumber(b, y);
+  if (first && second) return x < y;
+  return first != second ? first : a < b;
+}
+
+class AccuracyCommand final : public RasterCommand {
+  CommandResult Execute() override {
+    if (!CheckInputs()) return Fail();
+    const BasicRasterPtr map = FindRaster("MapURI");
+    if (!map) return Fail();
+    const std::string path = Read<String>("Vectors").ToUTF8();
+    if (!ReadSamples(path)) return Fail(FaultOfShapes(path));
+    std::vector<double> figures;
+    bool isDone = false;
+    const bool isKnown = DispatchType(EightTypes{}, map->DataType(), [&]<typename T>() {
+      ZonalPass<T> pass(RasterPtr<T>(map), plan_);
+      isDone = pass.Run(GetIPC());
+      figures = pass.GetFigures();
+      return true;
+    });
+    if (!isKnown) return Fail("MapURI: a map of classes has no pixels of this type");
+    if (!isDone) return Fail(TakeFaultOr("the map can't be read"));
+    if (!NameClasses(figures)) return Fail();
+    WriteResults(figures);
+    return Succeed();
+  }
+
+  bool ReadSamples(const std::string& path) {
+    const VectorRecordSourcePtr source = OpenShapes(path);
+    if (!source) return false;
+    const std::vector<std::uint32_t> layers = FindLayers(*source, Read<String>("Layer").ToUTF8());
+    if (layers.empty()) return false;
+    const ShapeSelection selection{layers.front(), Read<String>("Where").ToUTF8(),
+                                   Read<String>("ClassField").ToUTF8()};
+    plan_.geometry = ReadNamedShapes(*source, selection, GetIPC(), known_);
+    if (!plan_.geometry) return false;
+    if (known_.empty()) {
+      SetFault("there is no sample");
+      return false;
+    }
+    plan_.options.pixels = PixelRule::kCenter;
+    plan_.options.rules = ScanRules::kSteady;
+    plan_.options.coordinates = ShapeCoordinates::kMap;
+    for (const char* const figure : {"count", "majority"}) {
+      plan_.requests.emplace_back();
+      ParseZonalRequest(figure, plan_.requests.back());
+    }
+    plan_.bands.Resize(ArrayDims(1));
+    plan_.bands[0] = 0;
+    return true;
+  }
+
+  /// Finds the classes of the map and of the samples.
+  bool NameClasses(const std::vector<double>& figures) {
+    if (HasInput("Classes")) {
+      for (const String& name : Read<Array<String>>("Classes")) names_.push_back(name.ToUTF8());
+      for (const std::string& known : known_) {
+        if (std::find(names_.begin(), names_.end(), known) != names_.end()) continue;
+        SetFault(String("ClassField: a sample is of class \"" + known + "\", which the map lacks"));
+        return false;
+      }
+      return true;
+    }
+    names_ = known_;
+    for (std::size_t i = 0; i < known_.size(); ++i) {
+      if (figures[2 * i] > 0) names_.push_back(FormatValue(figures[2 * i + 1]).ToUTF8());
+    }
+    std::sort(names_.begin(), names_.end(), IsInFront);
+    names_.erase(std::unique(names_.begin(), names_.end()), names_.end());
+    return true;
+  }
+
+  /// The place of a value of the map among the classes.
+  std::optional<std::size_t> FindClass(double value) const {
+    if (HasInput("Classes")) {
+      const bool isClass = value >= 1 && value <= static_cast<double>(names_.size());
+      return isClass ? std::optional(static_cast<std::size_t>(value) - 1) : std::nullopt;
+    }
+    return PlaceOf(FormatValue(value).ToUTF8());
+  }
+
+  std::optional<std::size_t> PlaceOf(const std::string& name) const {
+    const auto found = std::find(names_.begin(), names_.end(), name);
+    if (found == names_.end()) return {};
+    return static_cast<std::size_t>(found - names_.begin());
+  }
+
+  void WriteResults(const std::vector<double>& figures) {
+    const std::size_t classes = names_.size();
+    std::vector<std::uint64_t> matrix(classes * classes);
+    unsigned outside = 0, noClass = 0;
+    for (std::size_t sample = 0; sample < known_.size(); ++sample) {
+      if (!(figures[2 * sample] > 0)) {
+        ++outside;
+        continue;
+      }
+      const std::optional<std::size_t> mapped = FindClass(figures[2 * sample + 1]);
+      if (mapped) {
+        ++matrix[*PlaceOf(known_[sample]) * classes + *mapped];
+      } else {
+        ++noClass;
+      }
+    }
+    const Accuracy accuracy = Accuracy::Of(matrix, classes);
+    Array<String> names{ArrayDims(static_cast<unsigned>(classes))};
+    for (unsigned i = 0; i < classes; ++i) names[i] = String(names_[i]);
+    Write("Classes", names);
+    Write("Matrix", TableOf(matrix, classes));
+    Write("Overall", TableOf({accuracy.overall}));
+    Write("Kappa", accuracy.kappa);
+    Write("Producer", TableOf(accuracy.producer));
+    Write("User", TableOf(accuracy.user));
+    Array<double> f1{ArrayDims(static_cast<unsigned>(classes))};
+    std::copy(accuracy.f1.begin(), accuracy.f1.end(), f1.begin());
+    Write("F1", f1);
+    Write("Outside", outside);
+    Write("NoClass", noClass);
+  }
+
+  static Array<unsigned> TableOf(const std::vector<std::uint64_t>& counts, std::size_t columns) {
+    const auto side = static_cast<unsigned>(columns);
+    Array<unsigned> table{ArrayDims(side, side)};
+    std::transform(counts.begin(), counts.end(), table.begin(),
+                   [](std::uint64_t count) { return static_cast<unsigned>(count); });
+    return table;
+  }
+  static Array<double> TableOf(const std::vector<ShareEstimate>& shares) {
+    Array<double> table{ArrayDims(static_cast<unsigned>(shares.size()), 3)};
+    double* to = table.GetData();
+    for (const ShareEstimate& estimate : shares) {
+      *to++ = estimate.share;
+      *to++ = estimate.low;
+      *to++ = estimate.high;
+    }
+    return table;
+  }
+
+  ZonalPlan plan_;
+  std::vector<std::string> known_;  // class of each sample
+  std::vector<std::string> names_;  // of the classes
+};
+
+const CommandFactoryT<AccuracyCommand> factory(kAccuracy);
+
+}  // namespace
+}  // namespace lumo
