@@ -26,14 +26,14 @@ class Job:
         output = f'<Output URI="{output}"/>' if output else ""
         self.steps.append(f'<Command ID="{command}" Name="s{len(self.steps)}">{behind}{output}{texts}</Command>')
 
-    def segment(self, image, labels, arguments, merge=None):
+    def segment(self, image, labels, arguments, merge=None, **target):
         self.add("OpenRasterCommand", {"ConnStr": image}, "$in")
         if merge:
             self.add("OpenRasterCommand", {"ConnStr": merge}, "$by")
         inputs = {"SegmentURI": "$in", "MergeURI": "$by" if merge else "$in", **arguments}
         if not arguments["LambdaEstimate"]:
             self.add("CreateRasterCommand", {"ConnStr": labels, "SrcURI": "$in", "Format": "ORVA", "Bands": 1,
-                                             "DataType": "Int32", "HasNoDataValue": "1:1 [0] "}, "$target")
+                                             "DataType": "Int32", "HasNoDataValue": "1:1 [0] ", **target}, "$target")
             inputs["LabelURI"] = "$target"
         self.add("FxTileSegmentMergeCommand", inputs)
         if "LabelURI" in inputs:
@@ -263,13 +263,13 @@ class SegmentTest(FolderTest):
         nan, inf = float("nan"), float("inf")
         rasters = {
             "one pixel": (1, 1, [5.0]), "one line": (6, 1, [1, 2, 9, 9, 2, 1]), "two lines": (4, 2, [1.0] * 8),
-            "constant": (6, 5, [3.0] * 30), "not finite": (4, 4, [nan, inf, -inf, 1.0] * 4)}
+            "constant": (6, 5, [3.0] * 30), "no data": (5, 5, [0.0] * 25), "not finite": (4, 4, [nan, inf, -inf, 1.0] * 4)}
         names, runs = [], []
         for name, (width, height, values) in rasters.items():
             path = write_orva(self.folder / f"{name}.dat", width, height, 1, struct.pack(f"<{len(values)}f", *values),
-                              "Single")
+                              "Single", "no data values = {0}\n")
             for algorithm, merge in itertools.product((1, 2), (0, 10)):
-                names.append((name, width * height, algorithm == 1 and min(width, height) < 3))
+                names.append((name, width * height, name == "no data" or algorithm == 1 and min(width, height) < 3))
                 runs.append((path, {"SegmentAlgorithm": algorithm, "SegmentValue": 0, "MinGradient": 0, "MaxGradient": 10,
                                     "StretchValue": 10, "MergeValue": merge, "LambdaEstimate": False}))
         for (name, pixels, has_no_gradient), labels in zip(names, self.segment_all(runs)):
@@ -293,10 +293,14 @@ class SegmentTest(FolderTest):
                 ("MergeURI: the raster has another pixel type", good, wide),
                 ("TileBorderSize", {**good, "TileBorderSize": -1}, None),
                 ("TileBorderSize", {**good, "TileMemorySize": 16, "TileBorderSize": 5}, None),
-                ("TileMemorySize", {**good, "TileMemorySize": -1}, None))):
+                ("TileMemorySize", {**good, "TileMemorySize": -1}, None),
+                ("LabelURI: the raster is not of type Int32", good, {"DataType": "Byte"}),
+                ("LabelURI: the raster has more than one band", good, {"Bands": 2, "HasNoDataValue": "1:2 [0 0] "}),
+                ("LabelURI: the raster has another size", good, {"Lines": 19}))):
             with self.subTest(words):
                 job = Job()
-                job.segment(path, self.folder / f"labels{number}.dat", arguments, merge)
+                target = merge if isinstance(merge, dict) else {}
+                job.segment(path, self.folder / f"labels{number}.dat", arguments, None if target else merge, **target)
                 code, _, err = run("run", "-", stdin=job.text())
                 self.assertEqual(code, 1)
                 self.assertIn(words, err)
