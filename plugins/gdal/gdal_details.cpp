@@ -86,6 +86,24 @@ std::string MeaningOf(GDALRasterBandH band) {
   return isPlain ? std::string() : GDALGetColorInterpretationName(meaning);
 }
 
+/// The names of the values of a band, each on a line.
+std::string CategoriesOf(GDALRasterBandH band) {
+  std::string lines;
+  for (char** name = GDALGetRasterCategoryNames(band); name != nullptr && *name != nullptr;
+       ++name) {
+    lines.append(*name).append("\n");
+  }
+  return lines;
+}
+
+/// The same as a list of GDAL's.
+CPLStringList CategoryList(const std::string& lines) {
+  CPLStringList list;
+  std::istringstream in(lines);
+  for (std::string line; std::getline(in, line);) list.AddString(line.c_str());
+  return list;
+}
+
 /// The details of a band by their names.
 std::map<std::string, std::string> DetailsOf(GDALRasterBandH band) {
   std::map<std::string, std::string> details;
@@ -95,6 +113,7 @@ std::map<std::string, std::string> DetailsOf(GDALRasterBandH band) {
   enter("Description", GDALGetDescription(band));
   enter("Unit", GDALGetRasterUnitType(band));
   enter("Meaning", MeaningOf(band).c_str());
+  enter("Categories", CategoriesOf(band).c_str());
   int has = FALSE;
   const double scale = GDALGetRasterScale(band, &has);
   if (has != FALSE && scale != 1) details["Scale"] = TextOf(scale);
@@ -200,6 +219,8 @@ void SetDetail(GDALRasterBandH band, const std::string& name, const std::string&
     GDALSetRasterOffset(band, CPLAtof(text.c_str()));
   } else if (name == "Meaning") {
     GDALSetRasterColorInterpretation(band, GDALGetColorInterpretationByName(text.c_str()));
+  } else if (name == "Categories") {
+    GDALSetRasterCategoryNames(band, CategoryList(text).List());
   } else if (name.starts_with(items)) {
     GDALSetMetadataItem(band, Decoded(name.substr(items.size())).c_str(), text.c_str(), nullptr);
   }
@@ -220,6 +241,9 @@ bool SetDetailBeside(GDALPamRasterBand& band, const std::string& name, const std
   if (name == "Meaning") {
     const GDALColorInterp meaning = GDALGetColorInterpretationByName(text.c_str());
     return band.Base::SetColorInterpretation(meaning) == CE_None;
+  }
+  if (name == "Categories") {
+    return band.Base::SetCategoryNames(CategoryList(text).List()) == CE_None;
   }
   if (!name.starts_with(items)) return true;
   const std::string item = Decoded(name.substr(items.size()));

@@ -1,11 +1,13 @@
 #include <algorithm>
-#include <charconv>
 #include <cmath>
 #include <optional>
 
 #include "foundation/fault.h"
 #include "fx/accuracy.h"
+#include "fx/class_names.h"
 #include "raster/raster_command.h"
+#include "raster/raster_def.h"
+#include "raster/raster_details.h"
 #include "regions/shape_file.h"
 #include "regions/zonal_pass.h"
 
@@ -25,7 +27,9 @@ const CommandDeclaration kAccuracy{
      {"Where", Presence::kOptional, ValueKind::kText,
       "FIELD=VALUE: only records with that value; all when absent"},
      {"Classes", Presence::kOptional, ValueKind::kTextList,
-      "the names of the map's values from 1 on; when absent the field holds values"}},
+      "the names of the map's values from 1 on; when absent those that the map has, and where it "
+      "has "
+      "none the field holds values"}},
     {{"Classes", ValueKind::kTextList, "the classes, in the order of the matrix"},
      {"Matrix", ValueKind::kIntegerArray,
       "samples: a row for each class that is known, a column for each class of the map"},
@@ -41,23 +45,12 @@ const CommandDeclaration kAccuracy{
      {"Outside", ValueKind::kInteger, "samples without a pixel that counts"},
      {"NoClass", ValueKind::kInteger, "samples on pixels of no class"}}};
 
-/// The order of names: numbers by value, in front of texts.
-bool IsInFront(const std::string& a, const std::string& b) {
-  double x = 0, y = 0;
-  const auto isNumber = [](const std::string& text, double& value) {
-    const char* const end = text.data() + text.size();
-    return std::from_chars(text.data(), end, value).ptr == end;
-  };
-  const bool first = isNumber(a, x), second = isNumber(b, y);
-  if (first && second) return x < y;
-  return first != second ? first : a < b;
-}
-
 class AccuracyCommand final : public RasterCommand {
   CommandResult Execute() override {
     if (!CheckInputs()) return Fail();
     const BasicRasterPtr map = FindRaster("MapURI");
     if (!map) return Fail();
+    ReadNames(*map);
     const std::string path = Read<String>("Vectors").ToUTF8();
     if (!ReadSamples(path)) return Fail(FaultOfShapes(path));
     std::vector<double> figures;
@@ -73,6 +66,18 @@ class AccuracyCommand final : public RasterCommand {
     if (!NameClasses(figures)) return Fail();
     WriteResults(figures);
     return Succeed();
+  }
+
+  /// The names of the map's values from 1 on: those given, else its own.
+  void ReadNames(const BasicRaster& map) {
+    if (HasInput("Classes")) {
+      for (const String& name : Read<Array<String>>("Classes")) names_.push_back(name.ToUTF8());
+    } else {
+      names_ = FindCategories(map.GetRasterDef().metadata, 0);
+      if (!names_.empty()) names_.erase(names_.begin());
+      while (!names_.empty() && names_.back().empty()) names_.pop_back();
+    }
+    isNamed_ = !names_.empty();
   }
 
   bool ReadSamples(const std::string& path) {
@@ -102,8 +107,7 @@ class AccuracyCommand final : public RasterCommand {
 
   /// Finds the classes of the map and of the samples.
   bool NameClasses(const std::vector<double>& figures) {
-    if (HasInput("Classes")) {
-      for (const String& name : Read<Array<String>>("Classes")) names_.push_back(name.ToUTF8());
+    if (isNamed_) {
       for (const std::string& known : known_) {
         if (std::find(names_.begin(), names_.end(), known) != names_.end()) continue;
         SetFault(String("ClassField: a sample is of class \"" + known + "\", which the map lacks"));
@@ -115,14 +119,13 @@ class AccuracyCommand final : public RasterCommand {
     for (std::size_t i = 0; i < known_.size(); ++i) {
       if (figures[2 * i] > 0) names_.push_back(FormatValue(figures[2 * i + 1]).ToUTF8());
     }
-    std::sort(names_.begin(), names_.end(), IsInFront);
-    names_.erase(std::unique(names_.begin(), names_.end()), names_.end());
+    names_ = OrderClassNames(std::move(names_));
     return true;
   }
 
   /// The place of a value of the map among the classes.
   std::optional<std::size_t> FindClass(double value) const {
-    if (HasInput("Classes")) {
+    if (isNamed_) {
       const bool isClass = value >= 1 && value <= static_cast<double>(names_.size());
       return isClass ? std::optional(static_cast<std::size_t>(value) - 1) : std::nullopt;
     }
@@ -188,6 +191,7 @@ class AccuracyCommand final : public RasterCommand {
   ZonalPlan plan_;
   std::vector<std::string> known_;  // class of each sample
   std::vector<std::string> names_;  // of the classes
+  bool isNamed_ = false;            // they are names of the values from 1 on
 };
 
 const CommandFactoryT<AccuracyCommand> factory(kAccuracy);

@@ -1,5 +1,6 @@
 #include "raster/raster_details.h"
 
+#include <algorithm>
 #include <charconv>
 #include <map>
 
@@ -94,6 +95,23 @@ std::vector<std::string> DetailNames(const Metadata& metadata) {
     while (name.ends_with('/')) name.pop_back();
     names.push_back(name);
   }
+  return names;
+}
+
+void SetCategories(Metadata& metadata, unsigned band, const Array<String>& names) {
+  std::string text;
+  for (const String& name : names) {
+    std::string line = name.ToUTF8();
+    std::replace(line.begin(), line.end(), '\n', ' ');
+    text += line + '\n';
+  }
+  if (!text.empty()) metadata.Set(BandDetailPath(band, "Categories"), String(text));
+}
+
+std::vector<std::string> FindCategories(const Metadata& metadata, unsigned band) {
+  std::istringstream lines(FindDetail(metadata, BandDetailPath(band, "Categories")));
+  std::vector<std::string> names;
+  for (std::string line; std::getline(lines, line);) names.push_back(line);
   return names;
 }
 

@@ -15,6 +15,7 @@
 //   Bands/<n>/Unit           of its values
 //   Bands/<n>/Scale, Offset  value = pixel * Scale + Offset
 //   Bands/<n>/Meaning        "Alpha", "Red", ...: the name of a colour interpretation
+//   Bands/<n>/Categories     the names of its values from 0 on, each on a line
 //   Bands/<n>/Items/<name>   further items
 //   Items/<name>             further items of the raster
 //   Grid                     the six numbers of a grid that no geo-reference can express
@@ -53,6 +54,11 @@ VEXG_EXPORT std::string FindDetail(const Metadata& metadata, const String& path)
 
 /// The names of all details that are there, in order.
 VEXG_EXPORT std::vector<std::string> DetailNames(const Metadata& metadata);
+
+/// Names the values of a band from 0 on. A name that breaks lines has blanks there.
+VEXG_EXPORT void SetCategories(Metadata& metadata, unsigned band, const Array<String>& names);
+/// The names of the values of a band from 0 on; none where it has none.
+VEXG_EXPORT std::vector<std::string> FindCategories(const Metadata& metadata, unsigned band);
 
 /// Gives the details of bands another order.
 /// @param bands  which one each band was before; one may come twice.

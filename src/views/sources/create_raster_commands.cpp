@@ -19,7 +19,9 @@ const CommandDeclaration kCreate{
                       "none; Names: the names of bands; Bands: all of the bands and the raster, "
                       "such as units, scales and further items; All: also the place, as control "
                       "points",
-                      "", &WordsIn<KeptDetails>}}),
+                      "", &WordsIn<KeptDetails>},
+                     {"Categories", Presence::kOptional, ValueKind::kTextList,
+                      "names of the values of the first band, from 0 on"}}),
     PublishedOutputs()};
 
 class CreateRasterCommand final : public RasterDefCommand {
@@ -27,6 +29,7 @@ class CreateRasterCommand final : public RasterDefCommand {
     RasterDef def;
     if (!CheckInputs() || !ReadRasterDef(def)) return Fail();
     KeepDetails(def.metadata, Read<KeptDetails>("Details"));
+    if (HasInput("Categories")) SetCategories(def.metadata, 0, Read<Array<String>>("Categories"));
     const auto connStrings = Read<Array<String>>("ConnStr");
     const SourceClaim claim(connStrings);
     if (!claim.IsGranted()) {

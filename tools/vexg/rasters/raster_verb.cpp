@@ -1,5 +1,7 @@
 #include "rasters/raster_verb.h"
 
+#include <filesystem>
+
 #include "rasters/raster_target.h"
 
 namespace lumo::host {
@@ -20,12 +22,11 @@ void RasterVerb::AddSource(RasterChain& chain) const {
   chain.Take("source");
 }
 
-void RasterVerb::AddMaking(JobDraft& draft, const String& shown, const FillValues& noData) const {
+void RasterVerb::AddMaking(JobDraft& draft, const Making& making) const {
   JobWriterCommand& copy = draft.Step(kMakeStep, "CopyRasterCommand");
-  copy.AddVariableInput("SrcURI", shown);
+  copy.AddVariableInput("SrcURI", making.shown);
   copy.AddVariableInput("DstURI", "$target");
-  copy.AddInput("Invalid", String(FillsNoData(noData) ? "NoData" : "Told"));
-  if (CopiesBlocksOfSource()) copy.AddInput("Blocks", String("Stream"));
+  copy.AddInput("Invalid", String(FillsNoData(making.noData) ? "NoData" : "Told"));
 }
 
 RasterContents RasterVerb::ReadWanted(const JobResults& results) const {
@@ -77,7 +78,7 @@ JobDraft RasterVerb::MakeDraft(const std::string& file, const FillValues& noData
   AddQuery(draft, kShown, shown);
   AddDetailsQuery(draft, kShown, shown);
   AddToCreate(draft, AddCreate(draft, {file, format_}, shown, GetKeptDetails(), GetNoData(noData)));
-  AddMaking(draft, shown, noData);
+  AddMaking(draft, {shown, file, noData});
   AddCloseTarget(draft);
   AddLastQuestions(draft, shown);
   chain.Close();
@@ -128,6 +129,10 @@ void RasterVerb::Make(JobSession& session, const Outputs& outputs) {
   session.CheckInterrupt();
   losses.Settle();
   MakeFurther(session, outputs);
+  for (const std::string& ending : GetLeftovers()) {
+    std::error_code isGone;
+    std::filesystem::remove(output.GetWorkName() + ending, isGone);
+  }
 }
 
 }  // namespace lumo::host

@@ -46,9 +46,16 @@ class RasterVerb : public FileVerb {
   virtual const char* GetKeptDetails() const { return "All"; }
   /// Adds inputs to the command that makes the file, and commands behind it.
   virtual void AddToCreate(JobDraft& /*draft*/, JobWriterCommand& /*create*/) const {}
+  /// What the step kMakeStep works on.
+  struct Making {
+    const String& shown;       ///< variable of the raster that is shown
+    const std::string& file;   ///< that is made; other files beside it, under its name and a
+                               ///< further ending, are in nobody's way
+    const FillValues& noData;  ///< as they were chosen for bands, in the place of pixels that are
+                               ///< not valid
+  };
   /// Adds the step kMakeStep, which fills "$target"; by default a copy of what is shown.
-  /// @param noData  as they were chosen for bands, in the place of pixels that are not valid.
-  virtual void AddMaking(JobDraft& draft, const String& shown, const FillValues& noData) const;
+  virtual void AddMaking(JobDraft& draft, const Making& making) const;
   /// Whether a copy has the no-data value of the file in the place of pixels that are not valid.
   virtual bool FillsNoData(const FillValues& noData) const { return !noData.empty(); }
   /// Whether a copy goes through the blocks of the source's storage, and not through large squares.
@@ -66,6 +73,8 @@ class RasterVerb : public FileVerb {
 
   /// Further files that are made of the raster, behind it among the outputs.
   virtual std::vector<std::string> GetFurtherOutputs() const { return {}; }
+  /// The endings of the files that the making leaves beside the raster, which nobody wants.
+  virtual std::vector<std::string> GetLeftovers() const { return {}; }
   /// Adds commands that make further outputs, in a job behind the one that makes the raster.
   /// @param made   the raster file.
   /// @param files  the further outputs.

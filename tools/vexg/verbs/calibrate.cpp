@@ -291,10 +291,9 @@ class CalibrateVerb final : public RasterVerb {
     create.AddInput("DataType", DataTypeName(TypeCode(options_)));
   }
 
-  void AddMaking(JobDraft& draft, const String& shown,
-                 const FillValues& /*noData*/) const override {
+  void AddMaking(JobDraft& draft, const Making& making) const override {
     JobWriterCommand& calibrate = draft.Step(kMakeStep, CommandOf(options_.quantity));
-    calibrate.AddInput("SourceURI", shown);
+    calibrate.AddInput("SourceURI", making.shown);
     calibrate.AddInput("CalibratedURI", String("$target"));
     for (const BandConstant& constant : BandConstants(options_.quantity)) {
       calibrate.AddInput(constant.input, ForBands(options_, constant, bands_));

@@ -226,10 +226,9 @@ class SegmentVerb final : public RasterVerb {
     if (!mergeRaster_.empty()) draft.Close("close.merge", "$merge");
   }
 
-  void AddMaking(JobDraft& draft, const String& shown,
-                 const FillValues& /*noData*/) const override {
-    AddFit(draft, shown);
-    JobWriterCommand& segment = AddSegment(draft, kMakeStep, shown);
+  void AddMaking(JobDraft& draft, const Making& making) const override {
+    AddFit(draft, making.shown);
+    JobWriterCommand& segment = AddSegment(draft, kMakeStep, making.shown);
     segment.AddVariableInput("LabelURI", "$target");
     segment.AddInput("MergeAlgorithm", mergeAlgorithm_ == "rigorous" ? 2 : 1);
     if (mergeValue_) {

@@ -1,0 +1,119 @@
+"""The chain from a scene to a map of classes with a known accuracy, on made fields of known classes."""
+
+import json
+import random
+import subprocess
+import unittest
+
+from support import FolderTest, needs_gdal
+
+SIDE, FIELD, TOP = 120, 15, 50
+# Reflectance of three bands, and the noise on it.
+CLASSES = {"water": (30, 20, 10), "forest": (40, 70, 120), "town": (120, 110, 90)}
+
+
+@needs_gdal
+class ClassifyVerbTest(FolderTest):
+    def setUp(self):
+        super().setUp()
+        chance = random.Random(9)
+        fields = {(r, c): chance.choice(list(CLASSES)) for r in range(SIDE // FIELD) for c in range(SIDE // FIELD)}
+        self.known = [[fields[y // FIELD, x // FIELD] for x in range(SIDE)] for y in range(SIDE)]
+        bands = []
+        for band in range(3):
+            rows = [" ".join(str(max(0, CLASSES[self.known[y][x]][band] + round(chance.gauss(0, 4)))) for x in range(SIDE))
+                    for y in range(SIDE)]
+            path = self.folder / f"b{band}.asc"
+            path.write_text(f"ncols {SIDE}\nnrows {SIDE}\nxllcorner 0\nyllcorner {TOP - SIDE / 2}\ncellsize 0.5\n" + "\n".join(rows))
+            bands.append(path)
+        subprocess.run(["gdalbuildvrt", "-q", "-separate", self.folder / "scene.vrt", *bands], check=True)
+        subprocess.run(["gdal_translate", "-q", "-ot", "Byte", "-a_srs", "EPSG:4326", self.folder / "scene.vrt",
+                        self.folder / "scene.tif"], check=True)
+        self.write_samples("train.geojson", [(r, c) for r, c in fields if (r + c) % 2 == 0], chance)
+        self.write_samples("check.geojson", [(r, c) for r, c in fields if (r + c) % 2 == 1], chance)
+        self.fine("segment", self.folder / "scene.tif", self.folder / "segments.tif", "--tiled", "--merge-percent", 90, "-q")
+        self.fine("attributes", self.folder / "scene.tif", self.folder / "segments.tif", "-o", self.folder / "fields",
+                  "--spectral", "--shape", "-q")
+
+    def write_samples(self, name, fields, chance):
+        features = []
+        for r, c in fields:
+            x, y = c * FIELD + chance.randint(4, 10), r * FIELD + chance.randint(4, 10)
+            features.append({"type": "Feature", "properties": {"cover": self.known[y][x]},
+                             "geometry": {"type": "Point", "coordinates": [(x + 0.5) / 2, TOP - (y + 0.5) / 2]}})
+        (self.folder / name).write_text(json.dumps({"type": "FeatureCollection", "features": features}))
+
+    def classify(self, *more):
+        return ("classify", self.folder / "segments.tif", self.folder / "map.tif", "--attributes", self.folder / "fields", *more)
+
+    def training(self):
+        return ("--training", self.folder / "train.geojson", "--class-field", "cover")
+
+    def accuracy(self):
+        return json.loads(self.fine("accuracy", self.folder / "map.tif", "--reference", self.folder / "check.geojson",
+                                    "--class-field", "cover", "--json"))
+
+    def test_nearest_examples_find_the_fields(self):
+        self.fine(*self.classify(*self.training(), "--neighbors", 3, "--use", "mean_b0,mean_b1,mean_b2", "--polygons",
+                                 self.folder / "map.geojson", "--scores", self.folder / "scores.fxa", "-q"))
+        report = self.accuracy()
+        self.assertEqual([c["class"] for c in report["classes"]], sorted(CLASSES))  # from the map itself
+        self.assertGreater(report["overall"]["share"], 0.95)
+        info = json.loads(subprocess.run(["gdalinfo", "-json", self.folder / "map.tif"], check=True, capture_output=True,
+                                         text=True).stdout)["bands"][0]
+        self.assertEqual(info["noDataValue"], 4)
+        self.assertEqual(info["colorTable"]["count"] >= 4, True)
+        text = subprocess.run(["gdalinfo", self.folder / "map.tif"], check=True, capture_output=True, text=True).stdout
+        for number, name in enumerate(["unclassified", *sorted(CLASSES)]):
+            self.assertIn(f"{number}: {name}", text)
+        values = {f["properties"]["class"] for f in json.loads((self.folder / "map.geojson").read_text())["features"]}
+        self.assertLessEqual(values, {0, 1, 2, 3})
+        self.assertEqual((self.folder / "scores.fxa").read_bytes()[:9], b"FXA50\x01\x00\x03\x00")
+        self.assertEqual({p.name for p in self.folder.iterdir() if p.name.startswith("map.tif")} - {"map.tif.aux.xml"}, {"map.tif"})
+        # A copy keeps the names.
+        self.fine("copy", self.folder / "map.tif", self.folder / "copy.tif", "-q")
+        self.assertIn("1: forest", subprocess.run(["gdalinfo", self.folder / "copy.tif"], check=True, capture_output=True,
+                                                  text=True).stdout)
+
+    def test_rules_find_the_fields(self):
+        rules = {"classes": [{"name": "water", "color": "#0000ff"}, {"name": "forest", "color": "green"}, {"name": "town"}],
+                 "rules": [
+                     {"class": "water", "tests": [{"attribute": "mean_b2", "atMost": 50, "membership": "linear", "tolerance": 10}]},
+                     {"class": "forest", "tests": [{"attribute": "mean_b2", "atLeast": 105}]},
+                     {"class": "town", "tests": [{"attribute": "mean_b0", "between": [80, 200]}]}]}
+        (self.folder / "rules.json").write_text(json.dumps(rules))
+        self.fine(*self.classify("--rules", self.folder / "rules.json", "-q"))
+        report = self.accuracy()
+        self.assertEqual([c["class"] for c in report["classes"]], ["water", "forest", "town"])
+        self.assertGreater(report["overall"]["share"], 0.95)
+        table = json.loads(subprocess.run(["gdalinfo", "-json", self.folder / "map.tif"], check=True, capture_output=True,
+                                          text=True).stdout)["bands"][0]["colorTable"]["entries"]
+        self.assertEqual((table[1][:3], table[2][:3]), ([0, 0, 255], [0, 128, 0]))
+
+    def test_what_is_wrong_has_one_line(self):
+        rules = self.folder / "wrong.json"
+        good = {"classes": [{"name": "a"}], "rules": [{"class": "a", "tests": [{"attribute": "area", "atLeast": 1}]}]}
+        for words, text in (
+                ("wrong.json: line 2 is no JSON", '{"classes": [],\n "rules": [}'),
+                ("wrong.json: \"rules\" is missing", json.dumps({"classes": [{"name": "a"}]})),
+                ("wrong.json.classes[0]: \"name\" is missing", json.dumps({**good, "classes": [{"color": "red"}]})),
+                ("wrong.json.rules[0].class: there is no class", json.dumps({**good, "rules": [{"class": "b", "tests": good["rules"][0]["tests"]}]})),
+                ("wrong.json.rules[0].tests[0].attribute: there is no attribute \"aera\"; did you mean",
+                 json.dumps(good).replace('"area"', '"aera"')),
+                ("wrong.json.rules[0].tests[0].atLeast: a number is expected", json.dumps(good).replace("1}", '"x"}')),
+                ("there is no \"wieght\" here", json.dumps(good).replace('"atLeast"', '"wieght": 1, "atLeast"'))):
+            rules.write_text(text)
+            with self.subTest(words):
+                self.fails(2, words, *self.classify("--rules", rules))
+        self.fails(2, "either --rules or --training", *self.classify())
+        self.fails(2, "--use: there is no attribute", *self.classify(*self.training(), "--use", "mean_b9"))
+        self.fails(1, "cove", *self.classify("--training", self.folder / "train.geojson", "--class-field", "cove"))
+        self.fails(1, "there are no attributes of this name", "classify", self.folder / "segments.tif", self.folder / "map.tif",
+                   "--attributes", self.folder / "none", *self.training())
+        self.fails(1, "labels are of type Int32", "classify", self.folder / "scene.tif", self.folder / "map.tif", "--attributes",
+                   self.folder / "fields", *self.training())
+        self.assertFalse((self.folder / "map.tif").exists())
+
+
+if __name__ == "__main__":
+    unittest.main()
