@@ -59,8 +59,8 @@ struct FinishedRegions {
   }
 };
 
-/// What the regions of a strip add up to: of those that lie in it alone the records, of others the
-/// sums of each band.
+/// Holds the regions of a strip: of those that lie in it alone the records, of others the sums of
+/// each band.
 template <typename T>
 struct StripValues {
   std::uint32_t strip = 0;

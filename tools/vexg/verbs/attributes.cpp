@@ -17,7 +17,7 @@ namespace {
 constexpr const char* kQueryStep = "query";
 constexpr const char* kQueries[] = {"info", "stats", "hist"};
 
-/// What QueryAttributesCommand gives of a file of regions.
+/// Holds what QueryAttributesCommand gives of a file of regions.
 struct StoreInfo {
   unsigned bands = 0;
   unsigned attributes = 0;
