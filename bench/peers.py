@@ -439,7 +439,7 @@ def attributes(bench):
 
 def grass_windows(bench, scene):
     """Four runs of r.neighbors for each band of a scene that is linked first."""
-    place = bench.work / "grass-windows"
+    place = bench.work / f"grass-windows-{bench.options.size}"
     quiet = {"stdout": subprocess.DEVNULL, "stderr": subprocess.DEVNULL, "check": True}
     if not place.exists():
         subprocess.run(["grass", "-c", scene, "-e", place], **quiet)
