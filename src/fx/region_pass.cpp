@@ -324,10 +324,7 @@ template <typename L>
 bool RegionPass<T>::RunTyped(const RasterPtr<L>& labels, const IPC& ipc) {
   const Wanted wanted{bool(plan_.spectral), bool(plan_.texture), bool(plan_.means),
                       bool(plan_.entropy)};
-  // No window reaches further than to the far side of the raster.
-  const unsigned reach =
-      wanted.Windows() ? std::min(plan_.kernel / 2, std::max(image_->Samples(), image_->Lines()))
-                       : 0;
+  const unsigned reach = wanted.Windows() ? plan_.kernel / 2 : 0;
   TileDimensions tiles =
       StripTiles(*image_, std::size_t{image_->Samples()} * image_->Bands() * sizeof(T));
   const RasterIteratorPtr<L> labelTiles = LabelTiles(labels, tiles);
