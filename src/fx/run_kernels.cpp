@@ -61,19 +61,19 @@ VEXG_INLINE void AddAll(std::span<const LabelRun> runs, const T* line, const T* 
     for (std::size_t band = 0; band < bands; band += kLanes) {
       const std::size_t lanes = std::min(kLanes, bands - band);
       const T* value = first + band;
-      std::uint32_t left = run.count;
-      // The values behind the last pixel's may lie outside of the memory.
-      const bool isAtEnd = value + (std::size_t{run.count} - 1) * bands + kLanes > end;
-      if (isAtEnd) {
-        const T* const last = value + (std::size_t{run.count} - 1) * bands;
-        for (std::size_t i = 0; i < lanes; ++i) to[band + i].Add(last[i]);
-        --left;
-      }
+      // Behind the last pixels four values may not lie in the memory; of one band, one is enough.
+      const auto room = static_cast<std::size_t>(end - value);
+      const std::size_t safe = room < kLanes || bands == 1 ? 0 : (room - kLanes) / bands + 1;
+      auto left = static_cast<std::uint32_t>(std::min<std::size_t>(run.count, safe));
+      const std::uint32_t rest = run.count - left;
       while (left != 0) {
         const std::uint32_t count = std::min(left, kPiece);
         AddPiece(value, count, bands, lanes, to + band);
         value += std::size_t{count} * bands;
         left -= count;
+      }
+      for (std::uint32_t pixel = 0; pixel < rest; ++pixel, value += bands) {
+        for (std::size_t i = 0; i < lanes; ++i) to[band + i].Add(value[i]);
       }
       for (std::size_t i = 0; i < lanes; ++i) to[band + i].AddCount(run.count);
     }

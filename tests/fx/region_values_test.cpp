@@ -249,17 +249,17 @@ class RegionValues : public testing::Test {
       const RegionMeansFile entropy(URI(File("entropy")), false);
       EXPECT_TRUE(near(entropy.Value(label, band, 0), want.Texture(4)));
     }
-    EXPECT_GT(count, 100U);
+    EXPECT_GT(count, 40U);
   }
 
   test::TemporaryDirectory directory_;
 };
 
 TEST_F(RegionValues, AreThoseOfTheFormulas) {
-  ExpectFormulas(Scene<std::uint8_t, std::int32_t>(61, 45, 3, 255, 1), "Exact", 4, 1e-6);
-  ExpectFormulas(Scene<std::int8_t, std::uint32_t>(61, 45, 3, 127, 2), "Exact", 3, 1e-6);
-  ExpectFormulas(Scene<std::uint16_t, std::int32_t>(61, 45, 3, 65535, 3), "Exact", 5, 1e-6);
-  ExpectFormulas(Scene<std::int16_t, std::int32_t>(61, 45, 3, 32767, 4), "Exact", 9, 1e-6);
+  ExpectFormulas(Scene<std::uint8_t, std::int32_t>(61, 45, 6, 255, 1), "Exact", 4, 1e-6);
+  ExpectFormulas(Scene<std::int8_t, std::uint32_t>(61, 45, 5, 127, 2), "Exact", 3, 1e-6);
+  ExpectFormulas(Scene<std::uint16_t, std::int32_t>(61, 45, 4, 65535, 3), "Exact", 5, 1e-6);
+  ExpectFormulas(Scene<std::int16_t, std::int32_t>(61, 45, 1, 32767, 4), "Exact", 9, 1e-6);
   ExpectFormulas(Scene<std::uint32_t, std::int32_t>(61, 45, 3, 4294967295.0, 5), "Exact", 3, 1e-6);
   ExpectFormulas(Scene<std::int32_t, std::uint32_t>(61, 45, 3, 2147483647.0, 6), "Exact", 7, 1e-6);
   ExpectFormulas(Scene<float, std::int32_t>(61, 45, 3, 1, 7), "Exact", 5, 1e-6);
