@@ -153,6 +153,16 @@ class Attributes(FolderTest):
             self.assertEqual(run("run", str(job))[0], 0)
             np.testing.assert_allclose(read_fxa(self.folder / "v.fxa"), np.load(case / "expected_spatial.npy"), 1e-6)
 
+    def test_narrow_labels_are_labels(self):
+        self.attributes("--spectral", "--shape")
+        kinds = [self.folder / f"f.{kind}.fxa" for kind in ("spectral", "shape")]
+        want = [kind.read_bytes() for kind in kinds]
+        for name in ("Byte", "Int16", "UInt16", "UInt32"):
+            labels = self.folder / f"{name}.tif"
+            subprocess.run(["gdal_translate", "-q", "-ot", name, self.labels, labels], check=True)
+            self.attributes("--spectral", "--shape", "--overwrite", labels=labels)
+            self.assertEqual([kind.read_bytes() for kind in kinds], want, name)
+
     def test_files_tell_what_they_hold(self):
         self.attributes("--spectral", "--shape")
         file = self.folder / "f.shape.fxa"
