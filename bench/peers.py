@@ -418,9 +418,89 @@ def grass_zones(bench, shapes, scene):
     return ["sh", "-c", f"grass {place / 'PERMANENT'} --exec sh -c '{' && '.join(steps)}' 2>/dev/null"]
 
 
+def make_regions(path, size, side):
+    """Labels from 1 of ragged cells of about `side` pixels."""
+    import numpy
+    from osgeo import gdal
+    gdal.UseExceptions()
+    random = numpy.random.default_rng(3)
+    y, x = numpy.mgrid[0:size, 0:size].astype(numpy.float32)
+    shift = random.normal(size=(2, 2 * size // side + 3, 2 * size // side + 3)).astype(numpy.float32) * side / 4
+    rows, columns = (2 * y / side).astype(int), (2 * x / side).astype(int)
+    cells = size // side + 3
+    label = (numpy.clip((y + shift[0][rows, columns]) / side + 1, 0, cells).astype(int) * cells
+             + numpy.clip((x + shift[1][rows, columns]) / side + 1, 0, cells - 1).astype(int))
+    label = numpy.unique(label, return_inverse=True)[1].reshape(size, size).astype(numpy.int32) + 1
+    out = gdal.GetDriverByName("GTiff").Create(str(path), size, size, 1, gdal.GDT_Int32, ["TILED=YES"])
+    out.SetGeoTransform((600000, 30, 0, 5000000, 0, -30))
+    out.WriteArray(label)
+
+
+REGIONPROPS = """
+import sys, skimage.measure
+from osgeo import gdal
+labels = gdal.Open(sys.argv[1]).ReadAsArray()
+skimage.measure.regionprops_table(labels, properties=("label", "area", "perimeter", "convex_area", "solidity",
+    "axis_major_length", "axis_minor_length", "orientation", "euler_number"))
+"""
+
+MEANS = """
+import sys, numpy, scipy.ndimage
+from osgeo import gdal
+labels = gdal.Open(sys.argv[2]).ReadAsArray()
+index = numpy.unique(labels)
+for band in gdal.Open(sys.argv[1]).ReadAsArray():
+    for value in (scipy.ndimage.mean, scipy.ndimage.standard_deviation, scipy.ndimage.minimum, scipy.ndimage.maximum):
+        value(band.astype(float), labels, index)
+"""
+
+
+def attributes(bench):
+    """Values and shapes of the regions of a label raster."""
+    size = bench.options.size
+    scene = bench.scene("Byte", "tiled")
+    out, xml = bench.work / "regions", bench.work / "otb-regions.xml"
+    made = [f"{out}.{kind}.fxa" for kind in ("spectral", "texture", "entropy", "shape")]
+    for side in (36, 4):
+        labels = bench.work / f"regions-{size}-{side}.tif"
+        if not labels.exists():
+            maker = multiprocessing.get_context("spawn").Process(target=make_regions, args=(labels, size, side))
+            maker.start()
+            maker.join()
+        ours = [bench.vexg, "attributes", scene, labels, "-o", out, "-q"]
+        name = f"cells of {side} pixels"
+        peers = {"scipy.ndimage": ["/usr/bin/python3", "-c", MEANS, scene, labels]}
+        if shutil.which("otbcli_ZonalStatistics"):
+            peers["otbcli_ZonalStatistics"] = [
+                "otbcli_ZonalStatistics", "-in", scene, "-inzone", "labelimage", "-inzone.labelimage.in", labels,
+                "-out", "xml", "-out.xml.filename", xml]
+        bench.compare(f"spectral, {name}", [*ours, "--spectral"], peers, {"otbcli_ZonalStatistics": 0.3}, [*made, xml])
+        peers = {}
+        if side == 36:
+            peers["regionprops"] = ["/usr/bin/python3", "-c", REGIONPROPS, labels]
+        bench.compare(f"shape, {name}", [*ours, "--shape"], peers, 0.05, made)
+        if side == 36:
+            peers = {"r.neighbors": grass_windows(bench, scene)} if shutil.which("grass") else {}
+            bench.compare("texture 5 x 5", [*ours, "--texture", "--kernel", "5"], peers, 0.3, made)
+
+
+def grass_windows(bench, scene):
+    """Four runs of r.neighbors for each band of a scene that is linked first."""
+    place = bench.work / f"grass-windows-{bench.options.size}"
+    quiet = {"stdout": subprocess.DEVNULL, "stderr": subprocess.DEVNULL, "check": True}
+    if not place.exists():
+        subprocess.run(["grass", "-c", scene, "-e", place], **quiet)
+        subprocess.run(["grass", place / "PERMANENT", "--exec", "r.external", f"input={scene.resolve()}",
+                        "output=scene"], **quiet)
+    steps = ["g.region raster=scene.1"]
+    steps += [f"r.neighbors input=scene.{band + 1} output=w{band}{method} method={method} size=5 --overwrite"
+              for band in range(BANDS) for method in ("range", "average", "variance", "diversity")]
+    return ["sh", "-c", f"grass {place / 'PERMANENT'} --exec sh -c '{' && '.join(steps)}' 2>/dev/null"]
+
+
 SECTIONS = {"stats": stats, "hist": hist, "calibrate": calibrate, "calc": calc, "pyramid": pyramid, "warp": warp,
             "polygons": polygons, "zones": zones, "segments": segment_peers.speed,
-            "segment-quality": segment_peers.quality, "memory": memory}
+            "segment-quality": segment_peers.quality, "attributes": attributes, "memory": memory}
 
 
 def main():

@@ -1,66 +1,41 @@
 #pragma once
 
+#include <cstdint>
 #include <memory>
 #include <vector>
 
-#include "fx/region_attribute_stats.h"
-#include "fx/region_attributes.h"
+#include "foundation/string.h"
+#include "platform/random_access_file.h"
 
 namespace lumo {
 
-/// Names one attribute of one of several files.
-struct AttributeChoice {
-  unsigned file = 0;       ///< among the files, from 0
-  unsigned attribute = 0;  ///< of a band
-  unsigned band = 0;
-};
-
-/// Reads chosen attributes of regions from several files, a block of regions at a time.
+/// Reads columns of a file of regions: one attribute of one band of all of them, by label.
 ///
-///     AttributeColumns columns;
-///     if (!columns.Open(files) || !columns.Choose(choices, "AttributeDefinition")) return Fail();
-///     std::vector<double> values(columns.Count() * regions.size());
-///     columns.Read(regions.data(), regions.size(), values.data());
+///     const AttributeColumns columns(URI("fields.shape.fxa"));
+///     std::vector<float> areas;
+///     if (!columns.IsValid() || !columns.Read(0, 0, areas)) return false;  // TakeFault() says why
 ///
-/// Threads: one at a time. Failure: false, with the fault set, which names the file or the row.
+/// Cost: reads the whole file for a column, and holds a megabyte of it.
+/// Threads: any number at once.
+/// Failure: false, with the fault set, for a file that isn't one of whole records of regions.
 class VEXG_EXPORT AttributeColumns {
  public:
-  /// Opens the files. @param names  in the form of URIs.
-  bool Open(const Array<String>& names);
-  /// Opens the files of statistics, one for each file of regions.
-  bool OpenStatistics(const Array<String>& names);
+  explicit AttributeColumns(const URI& uri);
 
-  /// Chooses what is read. @param input  the name that a fault has for the rows.
-  bool Choose(std::vector<AttributeChoice> choices, const char* input);
+  bool IsValid() const { return file_ != nullptr; }
+  unsigned Bands() const { return bands_; }
+  unsigned Attributes() const { return attributes_; }
+  /// One above the largest label.
+  std::uint64_t Records() const { return records_; }
 
-  unsigned FileCount() const { return static_cast<unsigned>(files_.size()); }
-  /// Attributes that are chosen.
-  unsigned Count() const { return static_cast<unsigned>(choices_.size()); }
-  /// The regions that all files have: the smallest of their counts.
-  unsigned RegionCount() const;
-
-  /// Reads the chosen attributes of regions, attribute by attribute.
-  /// @param values  [out] of attribute i and regions[j] at i * count + j.
-  void Read(const unsigned* regions, unsigned count, double* values) const;
-
-  /// True when the file of the first chosen attribute has no such region.
-  bool IsAbsent(unsigned region) const;
-
-  /// Takes the mean of each chosen attribute off its values, and divides them by its standard
-  /// deviation; 0 where that is 0. Statistics are open.
-  /// @param values  as Read gives them.
-  void Standardize(unsigned count, double* values) const;
+  /// Reads a column. @param values  [out] one for each record.
+  bool Read(unsigned band, unsigned attribute, std::vector<float>& values) const;
 
  private:
-  struct Scale {
-    double mean = 0;
-    double deviation = 0;
-  };
-
-  std::vector<std::unique_ptr<RegionAttributesFile<float>>> files_;
-  std::vector<std::unique_ptr<RegionAttributeStatsFile<float>>> statistics_;
-  std::vector<AttributeChoice> choices_;
-  std::vector<Scale> scales_;  // of the chosen attributes
+  std::unique_ptr<platform::RandomAccessFile> file_;
+  unsigned bands_ = 0;
+  unsigned attributes_ = 0;
+  std::uint64_t records_ = 0;
 };
 
 }  // namespace lumo

@@ -31,6 +31,7 @@ bool RegionCommand::CheckAll(std::initializer_list<const char*> names) {
 BasicRasterPtr RegionCommand::FindImage() {
   BasicRasterPtr image = FindRaster("SrcURI");
   if (!image) return {};
+  rasters_.emplace_back("SrcURI", image->GetURI().ToUTF8());
   if (DispatchType(EightTypes{}, image->DataType(), [&]<typename T>() { return true; })) {
     return image;
   }
@@ -41,6 +42,7 @@ BasicRasterPtr RegionCommand::FindImage() {
 BasicRasterPtr RegionCommand::FindLabels(const BasicRaster* image, bool mayBeNatural) {
   BasicRasterPtr labels = FindRaster("LabelURI");
   if (!labels) return {};
+  rasters_.emplace_back("LabelURI", labels->GetURI().ToUTF8());
   const unsigned type = labels->DataType();
   if (type != kDataTypeOf<std::int32_t> && (!mayBeNatural || type != kDataTypeOf<std::uint32_t>)) {
     SetFault(mayBeNatural ? "LabelURI: labels are whole numbers of type Int or UInt"
@@ -60,8 +62,9 @@ BasicRasterPtr RegionCommand::FindLabels(const BasicRaster* image, bool mayBeNat
 bool RegionCommand::IsNew(const char* name, const URI& uri) const {
   const std::string path = uri.ToUTF8();
   if (path.empty()) return Refuse(std::string(name) + ": there is no name of a file");
-  for (const auto& [other, otherPath] : outputs_) {
-    if (AreSameFile(path, otherPath)) {
+  for (const auto* const files : {&outputs_, &rasters_}) {
+    for (const auto& [other, otherPath] : *files) {
+      if (!AreSameFile(path, otherPath)) continue;
       return Refuse(std::string(name) + ": the file is that of " + other + " too");
     }
   }

@@ -26,7 +26,7 @@ class RegionCommand : public RasterCommand {
   /// @param image  null for none.
   BasicRasterPtr FindLabels(const BasicRaster* image, bool mayBeNatural = true);
 
-  /// A file to make, which no other one of the same command is.
+  /// A file to make, which no other one of the same command is, nor that of a raster.
   bool TakeOutput(const char* name, URI& uri);
   /// A file to read, which is there and none of the outputs.
   bool TakeExisting(const char* name, URI& uri);
@@ -49,6 +49,7 @@ class RegionCommand : public RasterCommand {
   bool IsNew(const char* name, const URI& uri) const;
 
   std::vector<std::pair<std::string, std::string>> outputs_;  // names of inputs, and paths
+  std::vector<std::pair<std::string, std::string>> rasters_;  // the same of the rasters
   std::vector<std::string> created_;
 };
 

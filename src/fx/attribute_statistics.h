@@ -11,7 +11,7 @@
 
 namespace lumo {
 
-/// What an attribute adds up to over the regions that are there.
+/// Sums up an attribute over the regions that are there.
 struct AttributeFigures {
   double mean = 0;
   double deviation = 0;  ///< of a sample: divided by n - 1

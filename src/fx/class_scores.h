@@ -3,7 +3,7 @@
 #include <functional>
 
 #include "commands/value_text.h"
-#include "fx/attribute_columns.h"
+#include "fx/chosen_attributes.h"
 #include "fx/attribute_inputs.h"
 #include "fx/region_kinds.h"
 
@@ -30,7 +30,7 @@ class ClassScoresCommand : public RegionCommand {
   bool CreateScores(unsigned classes);
 
   /// Computes scores of regions, many at once: `count` regions from `first` of `regions` on, or of
-  /// all where that is null. `values` are those of their attributes, as AttributeColumns::Read
+  /// all where that is null. `values` are those of their attributes, as ChosenAttributes::Read
   /// gives them; `scores` are for each region one for each class, zeros at first.
   using ScoreBlock = std::function<void(const unsigned* regions, unsigned count,
                                         const double* values, double* scores)>;
@@ -40,7 +40,7 @@ class ClassScoresCommand : public RegionCommand {
   /// Ends a command whose scores are all there, or which failed.
   CommandResult Finish(bool isDone);
 
-  AttributeColumns columns_;
+  ChosenAttributes columns_;
   std::vector<ClassExample> examples_;
   unsigned classCount_ = 0;
   std::unique_ptr<RegionClassificationProbabilityFile> scores_;

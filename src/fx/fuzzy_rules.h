@@ -2,7 +2,7 @@
 
 #include <vector>
 
-#include "fx/attribute_columns.h"
+#include "fx/chosen_attributes.h"
 
 namespace lumo {
 

@@ -42,7 +42,7 @@ class FxComputePixelAttributesCommand final : public RegionCommand {
     const BasicRasterPtr image = FindImage();
     if (!image) return Fail();
     const BasicRasterPtr labels = FindLabels(image.Get());
-    if (!labels || !ReadFiles() || !ReadKernel()) return Fail();
+    if (!labels || !ReadFiles() || !ReadKernel(*image)) return Fail();
     const IPC first(GetIPC().abort,
                     ProgressReportPtr(new ScaledProgressReport(GetIPC().progress, 5)));
     LabelCensus census;
@@ -97,7 +97,7 @@ class FxComputePixelAttributesCommand final : public RegionCommand {
     return false;
   }
 
-  bool ReadKernel() {
+  bool ReadKernel(const BasicRaster& image) {
     if (!Wants("texture")) return true;
     if (!CheckRequired("TextureKernelSize")) return false;
     const auto kernel = Read<std::int32_t>("TextureKernelSize");
@@ -106,7 +106,9 @@ class FxComputePixelAttributesCommand final : public RegionCommand {
           String("TextureKernelSize: a window of " + std::to_string(kernel) + " pixels can't be"));
       return false;
     }
-    plan_.kernel = static_cast<unsigned>(kernel);
+    // No window reaches further than to the far side of the raster.
+    const std::uint64_t most = 2 * std::uint64_t{std::max(image.Samples(), image.Lines())} + 1;
+    plan_.kernel = static_cast<unsigned>(std::min(static_cast<std::uint64_t>(kernel), most));
     return true;
   }
 

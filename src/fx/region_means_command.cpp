@@ -46,7 +46,9 @@ class FxComputeRegionMeansRasterCommand final : public RegionCommand {
   BasicRasterPtr FindOutput(const BasicRaster& image) {
     BasicRasterPtr output = FindRaster("MeansURI");
     if (!output) return {};
-    if (output->DataType() != kDataTypeOf<float>) {
+    if (output.Get() == &image) {
+      SetFault("SrcURI and MeansURI are the same raster");
+    } else if (output->DataType() != kDataTypeOf<float>) {
       SetFault("MeansURI: the raster is not of type Single");
     } else if (!output->CanWrite()) {
       SetFault("MeansURI: the raster can't be written");

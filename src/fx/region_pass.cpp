@@ -6,6 +6,7 @@
 #include "foundation/fault.h"
 #include "fx/record_spool.h"
 #include "fx/region_sums.h"
+#include "fx/run_kernels.h"
 #include "fx/strip_regions.h"
 #include "fx/texture_windows.h"
 #include "raster/pixel_states.h"
@@ -59,8 +60,8 @@ struct FinishedRegions {
   }
 };
 
-/// What the regions of a strip add up to: of those that lie in it alone the records, of others the
-/// sums of each band.
+/// Holds the regions of a strip: of those that lie in it alone the records, of others the sums of
+/// each band.
 template <typename T>
 struct StripValues {
   std::uint32_t strip = 0;
@@ -99,23 +100,6 @@ struct Scratch {
   TextureWindows<T> windows;
 };
 
-/// Adds the runs of a line to the sums of their regions.
-template <typename T>
-void AddRuns(std::span<const LabelRun> runs, const T* line, std::size_t bands,
-             std::vector<RegionSums<T>>& sums) {
-  for (const LabelRun& run : runs) {
-    RegionSums<T>* const to = sums.data() + run.region * bands;
-    const T* const first = line + run.first * bands;
-    for (std::size_t band = 0; band < bands; ++band) {
-      RegionSums<T> sum = to[band];
-      const T* value = first + band;
-      for (std::uint32_t i = 0; i < run.count; ++i, value += bands) sum.Add(*value);
-      sum.AddCount(run.count);
-      to[band] = sum;
-    }
-  }
-}
-
 /// Adds the windows of a line to those of a band of their regions.
 template <typename T>
 void AddWindows(std::span<const LabelRun> runs, const TextureWindows<T>& windows, std::size_t band,
@@ -151,7 +135,8 @@ class StripWork {
       scratch.sums.assign(pairs, {});
       for (unsigned y = from; y < to; ++y) {
         AddRuns(scratch.regions.RunsOf(y - from),
-                image_.PixelArray().GetData() + image_.Offset(0, y), bands, scratch.sums);
+                image_.PixelArray().GetData() + image_.Offset(0, y), image_.PixelArray().end(),
+                bands, scratch.sums.data());
       }
     }
     if (wanted_.Windows()) {
@@ -339,10 +324,7 @@ template <typename L>
 bool RegionPass<T>::RunTyped(const RasterPtr<L>& labels, const IPC& ipc) {
   const Wanted wanted{bool(plan_.spectral), bool(plan_.texture), bool(plan_.means),
                       bool(plan_.entropy)};
-  // No window reaches further than to the far side of the raster.
-  const unsigned reach =
-      wanted.Windows() ? std::min(plan_.kernel / 2, std::max(image_->Samples(), image_->Lines()))
-                       : 0;
+  const unsigned reach = wanted.Windows() ? plan_.kernel / 2 : 0;
   TileDimensions tiles =
       StripTiles(*image_, std::size_t{image_->Samples()} * image_->Bands() * sizeof(T));
   const RasterIteratorPtr<L> labelTiles = LabelTiles(labels, tiles);

@@ -71,7 +71,7 @@ class FxCreateRegionAttributesRasterCommand final : public PaintCommand {
   CommandResult Execute() override {
     if (!CheckInputs()) return Fail();
     const BasicRasterPtr labels = FindLabels(nullptr, false);
-    AttributeColumns columns;
+    ChosenAttributes columns;
     if (!labels || !columns.Open(Read<Array<String>>("AttributesFXA"))) return Fail();
     const auto rows = Read<Array<unsigned>>("SelectedAttributes");
     std::vector<AttributeChoice> choices;
@@ -111,7 +111,7 @@ class ScorePaintCommand : public PaintCommand {
   }
 
   BasicRasterPtr labels_;
-  AttributeColumns columns_;
+  ChosenAttributes columns_;
   FuzzyRuleSet rules_;
 };
 

@@ -173,7 +173,7 @@ template class RasterClassifyTask<RegionClassificationProbabilityFile,
                                   BestMatchClassificationAlgorithm>;
 
 CreateRegionAttributesRasterProcess::CreateRegionAttributesRasterProcess(
-    const RasterPtr<std::int32_t>& labels, const AttributeColumns& columns,
+    const RasterPtr<std::int32_t>& labels, const ChosenAttributes& columns,
     const RasterPtr<float>& output, const IPC& ipc)
     : TileProcess("CreateRegionAttributesRasterProcess", ipc) {
   PlacePainting<RasterApplySelectRegionAttributesTask>(*this, labels, columns.Count(), output,
@@ -181,7 +181,7 @@ CreateRegionAttributesRasterProcess::CreateRegionAttributesRasterProcess(
 }
 
 CreateRegionRuleScoresRasterProcess::CreateRegionRuleScoresRasterProcess(
-    const RasterPtr<std::int32_t>& labels, const AttributeColumns& columns,
+    const RasterPtr<std::int32_t>& labels, const ChosenAttributes& columns,
     const FuzzyRuleSet& rules, const RasterPtr<float>& output, const IPC& ipc)
     : TileProcess("CreateRegionRuleScoresRasterProcess", ipc) {
   PlacePainting<RasterApplyRegionRuleScoresTask>(*this, labels,
@@ -190,7 +190,7 @@ CreateRegionRuleScoresRasterProcess::CreateRegionRuleScoresRasterProcess(
 }
 
 CreateRegionClassScoresRasterProcess::CreateRegionClassScoresRasterProcess(
-    const RasterPtr<std::int32_t>& labels, const AttributeColumns& columns,
+    const RasterPtr<std::int32_t>& labels, const ChosenAttributes& columns,
     const FuzzyRuleSet& rules, const RasterPtr<float>& output, const IPC& ipc)
     : TileProcess("CreateRegionClassScoresRasterProcess", ipc) {
   PlacePainting<RasterApplyRegionClassScoresTask>(*this, labels,

@@ -19,7 +19,7 @@ struct VEXG_EXPORT BestMatchClassificationAlgorithm {
 
 /// What a region is painted with: attributes, and what is computed from them.
 struct RegionPaint {
-  const AttributeColumns* columns = nullptr;
+  const ChosenAttributes* columns = nullptr;
   const FuzzyRuleSet* rules = nullptr;  ///< null where attributes are painted as they are
 };
 
@@ -81,21 +81,21 @@ extern template class VEXG_EXPORT
 class VEXG_EXPORT CreateRegionAttributesRasterProcess final : public TileProcess<> {
  public:
   CreateRegionAttributesRasterProcess(const RasterPtr<std::int32_t>& labels,
-                                      const AttributeColumns& columns,
+                                      const ChosenAttributes& columns,
                                       const RasterPtr<float>& output, const IPC& ipc = {});
 };
 
 class VEXG_EXPORT CreateRegionRuleScoresRasterProcess final : public TileProcess<> {
  public:
   CreateRegionRuleScoresRasterProcess(const RasterPtr<std::int32_t>& labels,
-                                      const AttributeColumns& columns, const FuzzyRuleSet& rules,
+                                      const ChosenAttributes& columns, const FuzzyRuleSet& rules,
                                       const RasterPtr<float>& output, const IPC& ipc = {});
 };
 
 class VEXG_EXPORT CreateRegionClassScoresRasterProcess final : public TileProcess<> {
  public:
   CreateRegionClassScoresRasterProcess(const RasterPtr<std::int32_t>& labels,
-                                       const AttributeColumns& columns, const FuzzyRuleSet& rules,
+                                       const ChosenAttributes& columns, const FuzzyRuleSet& rules,
                                        const RasterPtr<float>& output, const IPC& ipc = {});
 };
 

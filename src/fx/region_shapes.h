@@ -31,7 +31,7 @@ class LabelledPolygonSink final : public LabelPolygonSink {
     std::swap(taken_.polygons.back(), polygon);
     return true;
   }
-  /// What was taken since the last call.
+  /// Gives what was taken since the last call.
   LabelledPolygons TakeAll() { return std::exchange(taken_, {}); }
 
  private:

@@ -14,7 +14,7 @@
 
 namespace lumo {
 
-/// What the pixels of a region add up to over several strips.
+/// Sums up the pixels of a region over several strips.
 template <typename T>
 using RegionTotal =
     std::conditional_t<kExactStats<T>, ExactStatsAccumulator<T>, LargeStatsAccumulator<T>>;
@@ -120,7 +120,7 @@ SpectralValues ValuesOf(const RegionTotal<T>& total) {
   return values;
 }
 
-/// What the windows round the pixels of a region add up to in one band.
+/// Sums up the windows round the pixels of a region in one band.
 struct TextureSums {
   enum : unsigned { kRange, kMean, kVariance, kEntropy, kEntropyOverN, kFigures };
   double sums[kFigures] = {};

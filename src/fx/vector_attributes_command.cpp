@@ -38,7 +38,8 @@ class FxComputeVectorAttributesCommand final : public RegionCommand {
   CommandResult Execute() override {
     if (!CheckInputs() || !ReadSize()) return Fail();
     if (HasInput("Parts")) setup_->parts = Read<RegionParts>("Parts");
-    const bool isDone = HasInput("LabelURI") ? FromLabels() : FromFile();
+    const bool isFile = HasInput("VectorFXV") || !HasInput("LabelURI");
+    const bool isDone = isFile ? FromFile() : FromLabels();
     if (isDone) return Succeed();
     return FailWithout("the shapes could not be computed", RegionSums::kExact);
   }

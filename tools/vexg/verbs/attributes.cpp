@@ -17,7 +17,7 @@ namespace {
 constexpr const char* kQueryStep = "query";
 constexpr const char* kQueries[] = {"info", "stats", "hist"};
 
-/// What QueryAttributesCommand gives of a file of regions.
+/// Holds what QueryAttributesCommand gives of a file of regions.
 struct StoreInfo {
   unsigned bands = 0;
   unsigned attributes = 0;
@@ -153,8 +153,9 @@ class AttributesVerb final : public FileVerb {
     line.AddNote(
         "Makes NAME.spectral.fxa, NAME.texture.fxa with NAME.entropy.fxa, and NAME.shape.fxa, "
         "whose records are the regions by label, and a table with a row for each region; without "
-        "--spectral, --texture and --shape the first and the last. Labels are of type Int32 or "
-        "UInt32 and of the scene's size; label 0 is a region too. Sums are exact, and several "
+        "--spectral, --texture and --shape the first and the last. Labels are whole numbers of up "
+        "to 32 bits, in a raster of the scene's size; label 0 is a region too. Sums are exact, and "
+        "several "
         "polygons of one label are one shape. The ending of the table chooses its format: .csv, "
         ".gpkg, .fgb and others, all but the first with polygons. docs/attributes.md has the "
         "formulas.");
@@ -300,11 +301,13 @@ class AttributesVerb final : public FileVerb {
                       fmt::format("{}: the labels have {} x {} pixels, the scene {} x {}", labels_,
                                   labels.samples, labels.lines, scene.samples, scene.lines));
     }
-    if (labels.dataType != kDataTypeOf<std::int32_t> &&
+    isNarrow_ = DispatchType(TypeList<std::uint8_t, std::int8_t, std::uint16_t, std::int16_t>{},
+                             labels.dataType, [&]<typename T>() { return true; });
+    if (!isNarrow_ && labels.dataType != kDataTypeOf<std::int32_t> &&
         labels.dataType != kDataTypeOf<std::uint32_t>) {
       throw HostError(kExitFailed,
-                      fmt::format("{}: labels are whole numbers of type Int32 or UInt32, not {}",
-                                  labels_, DataTypeName(labels.dataType).ToUTF8()));
+                      fmt::format("{}: labels are whole numbers of up to 32 bits, not {}", labels_,
+                                  DataTypeName(labels.dataType).ToUTF8()));
     }
     const GeoRefPtr geoRef = labels.geoRef.IsNull() ? scene.geoRef : labels.geoRef;
     if (geoRef.IsNull() || geoRef->GetType() == GeoRef::kRpc) return;
@@ -321,6 +324,10 @@ class AttributesVerb final : public FileVerb {
     JobDraft draft;
     AddOpen(draft, "source", GetSource());
     AddOpen(draft, "labels", {labels_, ""});
+    const String labels = isNarrow_ ? "$whole" : "$labels";
+    if (isNarrow_) {
+      draft.Open("whole", "CreateLabelsRasterCommand").AddVariableInput("SrcURI", "$labels");
+    }
     const std::vector<Made> made = GetMade();
     const auto addFiles = [&](JobWriterCommand& step, bool isShape) {
       for (std::size_t i = 0; i < made.size(); ++i) {
@@ -332,7 +339,7 @@ class AttributesVerb final : public FileVerb {
       if (!bandsText_.empty()) AddBandView(draft, "bands", "$source", bands_);
       JobWriterCommand& pixels = draft.Step("pixels", "FxComputePixelAttributesCommand");
       pixels.AddVariableInput("SrcURI", bandsText_.empty() ? "$source" : "$bands");
-      pixels.AddVariableInput("LabelURI", "$labels");
+      pixels.AddVariableInput("LabelURI", labels);
       pixels.AddInput("Values", String(!wantsTexture_    ? "spectral"
                                        : !wantsSpectral_ ? "texture"
                                                          : "spectral|texture"));
@@ -343,7 +350,7 @@ class AttributesVerb final : public FileVerb {
     }
     if (wantsShape_) {
       JobWriterCommand& shapes = draft.Step("shapes", "FxComputeVectorAttributesCommand");
-      shapes.AddVariableInput("LabelURI", "$labels");
+      shapes.AddVariableInput("LabelURI", labels);
       addFiles(shapes, true);
       shapes.AddInput("PixelXSize", pixelX_);
       shapes.AddInput("PixelYSize", pixelY_);
@@ -354,11 +361,12 @@ class AttributesVerb final : public FileVerb {
       table.AddInput("Table", String(names.back()));
       addFiles(table, false);
       addFiles(table, true);
-      if (!table_.ends_with(".csv")) table.AddVariableInput("LabelURI", "$labels");
+      if (!table_.ends_with(".csv")) table.AddVariableInput("LabelURI", labels);
       if (!bandsText_.empty() && (wantsSpectral_ || wantsTexture_)) {
         table.AddInput("Bands", bands_);
       }
     }
+    if (isNarrow_) draft.Close("close.whole", "$whole");
     draft.Close("close.labels", "$labels");
     draft.Close("close", "$source");
     return draft;
@@ -388,6 +396,7 @@ class AttributesVerb final : public FileVerb {
   bool wantsShape_ = false;
   bool isJson_ = false;
 
+  bool isNarrow_ = false;  // the labels
   Array<unsigned> bands_;
   double pixelX_ = 1;
   double pixelY_ = 1;
