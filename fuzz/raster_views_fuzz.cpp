@@ -430,9 +430,9 @@ class Run {
   /// Blocks that reach out of the raster, have bands that it hasn't, or none. What comes is free,
   /// as long as it stays in its memory.
   void ReadNonsense(const Entry<T>& entry, Interleave order, SubRect rect, Array<unsigned> bands) {
-    constexpr unsigned kFar[] = {1, 30, 1000};
-    rect.right += kFar[choices_.Below(3)];
-    if (choices_.Below(2) == 1) rect.bottom += kFar[choices_.Below(3)];
+    constexpr unsigned kFarX[] = {1, 30, 1000}, kFarY[] = {1, 30, 60};  // far over all rasters
+    rect.right += kFarX[choices_.Below(3)];
+    if (choices_.Below(2) == 1) rect.bottom += kFarY[choices_.Below(3)];
     if (choices_.Below(4) == 1) bands[0] = 0xFFFFFFFF;
     if (choices_.Below(4) == 1) bands.Resize(ArrayDims());
     const unsigned count = rect.Width() * rect.Height() * std::max(bands.GetCount(), 1U);

@@ -6,29 +6,30 @@
 
 namespace lumo::detail {
 
-/// A call into the connection of a source, and its result, which stays as it was made when there is
-/// nothing to call, or when the plug-in throws.
-template <typename Result, typename Body>
+/// A call into the connection of a source: a body, which outlives it.
 class DcSrvCall final : public DcSrvCmd {
  public:
-  DcSrvCall(std::int32_t code, const char* name, Result initial, Body& body)
-      : DcSrvCmd(code, name), result(std::move(initial)), body_(body) {}
-  void Execute(DcSrvContext& context) override { body_(context, result); }
-
-  Result result;
+  template <typename Body>
+  DcSrvCall(std::int32_t code, const char* name, Body& body)
+      : DcSrvCmd(code, name),
+        body_(&body),
+        run_([](void* work, DcSrvContext& context) { (*static_cast<Body*>(work))(context); }) {}
+  void Execute(DcSrvContext& context) override { run_(body_, context); }
 
  private:
-  Body& body_;
+  void* body_;
+  void (*run_)(void* body, DcSrvContext& context);
 };
 
 /// Runs `body(context, result)` on the thread of `server` and gives the result; `initial` at once
-/// when there is no server.
+/// when there is no server, and when the plug-in throws.
 template <typename Result, typename Body>
 Result CallServer(DcSrv* server, std::int32_t code, const char* name, Result initial, Body&& body) {
   if (server == nullptr) return initial;
-  DcSrvCall<Result, std::remove_reference_t<Body>> call(code, name, std::move(initial), body);
+  auto run = [&](DcSrvContext& context) { body(context, initial); };
+  DcSrvCall call(code, name, run);
   server->Execute(call);
-  return std::move(call.result);
+  return initial;
 }
 
 /// Runs `body(connection)` for the plug-in's connection, when there is one. For example, how many

@@ -163,19 +163,33 @@ class MtRasterReader final : public RasterReader<T> {
   }
 
  private:
+  /// A call of the plug-in's reader of type T, where there is one. How it is found is compiled
+  /// once, and not in each of the calls.
+  class ReaderCall final : public DcSrvCmd {
+   public:
+    template <typename Body>
+    ReaderCall(std::int32_t code, const char* name, Body& body)
+        : DcSrvCmd(code, name),
+          body_(&body),
+          run_([](void* work, RasterReader<T>& reader) { (*static_cast<Body*>(work))(reader); }) {}
+    void Execute(DcSrvContext& context) override;
+
+   private:
+    void* body_;
+    void (*run_)(void* body, RasterReader<T>& reader);
+  };
+
   /// Runs `body(reader, result)` with the plug-in's reader of type T on the source's thread; gives
   /// Result() when there is no such reader.
   template <typename Result, typename Body>
   Result CallWith(std::int32_t code, const char* name, Body&& body) {
-    return detail::CallServer(
-        proxy_->Server(), code, name, Result(), [&](DcSrvContext& context, Result& result) {
-          const RasterDataConnectionPtr source(context.conn);
-          if (!source) return;
-          const RasterReaderDispatchPtr dispatch = source->RasterReaderDispatch();
-          if (!dispatch) return;
-          const RasterReaderPtr<T> reader = dispatch->template Get<T>();
-          if (reader) body(*reader, result);
-        });
+    Result result{};
+    DcSrv* const server = proxy_->Server();
+    if (server == nullptr) return result;
+    auto run = [&](RasterReader<T>& reader) { body(reader, result); };
+    ReaderCall call(code, name, run);
+    server->Execute(call);
+    return result;
   }
 
   /// Gives `body(reader)`.
@@ -216,5 +230,15 @@ class MtRasterReader final : public RasterReader<T> {
   BandAnswers<T> noDataValue_;
   BandAnswers<bool> hasPalette_;
 };
+
+template <typename T>
+void MtRasterReader<T>::ReaderCall::Execute(DcSrvContext& context) {
+  const RasterDataConnectionPtr source(context.conn);
+  if (!source) return;
+  const RasterReaderDispatchPtr dispatch = source->RasterReaderDispatch();
+  if (!dispatch) return;
+  const RasterReaderPtr<T> reader = dispatch->template Get<T>();
+  if (reader) run_(body_, *reader);
+}
 
 }  // namespace lumo

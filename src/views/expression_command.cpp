@@ -2,7 +2,6 @@
 
 #include "foundation/fault.h"
 #include "foundation/text_case.h"
-#include "foundation/warnings.h"
 #include "georef/affine_link.h"
 #include "raster/raster_def.h"
 #include "views/expression_raster.h"
@@ -10,6 +9,13 @@
 
 namespace lumo {
 namespace {
+
+std::vector<OutputDeclaration> Outputs() {
+  std::vector<OutputDeclaration> outputs = PublishedOutputs();
+  outputs.push_back({"Warning", ValueKind::kText,
+                     "which rasters lie elsewhere than the first one; absent when none does"});
+  return outputs;
+}
 
 const CommandDeclaration kExpression{
     "CreateExpressionRasterCommand",
@@ -32,7 +38,7 @@ const CommandDeclaration kExpression{
       "pixel type; Single when absent. Results for integers are rounded, and what does not fit is "
       "not valid",
       "", &EightTypeWords}},
-    PublishedOutputs()};
+    Outputs()};
 
 class CreateExpressionRasterCommand final : public PublishCommand {
   CommandResult Execute() override {
@@ -53,7 +59,8 @@ class CreateExpressionRasterCommand final : public PublishCommand {
     });
     if (!isKnown) return Fail("DataType: an expression gives no such pixels");
     if (!view->IsValid()) return Fail();
-    WarnOfPlaces(rasters);
+    const std::string apart = FindApart(rasters);
+    if (!apart.empty()) Write("Warning", String(apart));
     return Publish(view);
   }
 
@@ -99,11 +106,12 @@ class CreateExpressionRasterCommand final : public PublishCommand {
     return index < 26 ? letter : letter + std::to_string(index / 26);
   }
 
-  /// Warns of rasters that lie elsewhere than the first one, as far as grids of one coordinate
-  /// system tell.
-  static void WarnOfPlaces(const std::vector<BasicRasterPtr>& rasters) {
+  /// Names the rasters that lie elsewhere than the first one, as far as grids of one coordinate
+  /// system tell; empty for none.
+  static std::string FindApart(const std::vector<BasicRasterPtr>& rasters) {
     const RasterDef first = rasters.front()->GetRasterDef();
-    for (unsigned i = 1; i < rasters.size(); ++i) {
+    std::string apart;
+    for (std::size_t i = 1; i < rasters.size(); ++i) {
       const RasterDef def = rasters[i]->GetRasterDef();
       if (!first.geoRef || !def.geoRef) continue;
       Array<double> corners{ArrayDims(2, 2)};
@@ -115,10 +123,13 @@ class CreateExpressionRasterCommand final : public PublishCommand {
                                   std::hypot(corners[2] - first.samples, corners[3] - first.lines));
       constexpr double kRounding = 0.01;  // pixels
       if (!(off > kRounding)) continue;
-      AddWarning("raster " + std::to_string(i + 1) + " of the expression lies " +
-                 FormatValue(off).ToUTF8() +
-                 " pixels from the first one; its pixels are taken by their sample and line");
+      apart.append(apart.empty() ? "" : ", ").append(rasters[i]->GetURI().ToUTF8());
     }
+    if (!apart.empty()) {
+      apart += ": not where " + rasters.front()->GetURI().ToUTF8() +
+               " lies; pixels are taken by their sample and line";
+    }
+    return apart;
   }
 };
 

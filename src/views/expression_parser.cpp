@@ -86,7 +86,6 @@ void ExpressionParser::KeepUsedConstants() {
   made_.constants_ = std::move(used);
 }
 
-/// Ends the reading; the first fault stays.
 void ExpressionParser::Fault(Token token, const std::string& why) {
   at_ = text_.size();
   token_ = {Token::Kind::kEnd, at_, {}, 0};
@@ -142,7 +141,6 @@ void ExpressionParser::Next() {
   at_ += length;
 }
 
-/// Goes on behind a sign where the text stands there.
 bool ExpressionParser::Take(const char* sign) {
   if (token_.kind != Token::Kind::kSign || token_.text != sign) return false;
   Next();

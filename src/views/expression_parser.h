@@ -9,30 +9,47 @@
 namespace lumo {
 
 /// Turns the text of an expression into its steps, by recursive descent: one function for each
-/// strength of operators. The first fault ends the text, so that all of them return.
+/// strength of operators, from the weakest. The first fault ends the text, so that all of them
+/// return. Expression::Parse is the way in.
+///
+/// A step writes a row of numbers, which is used again once no later step reads it; so an
+/// expression needs as many rows as it is deep, and not as it is long. What has constants alone is
+/// computed here and becomes one.
+///
+/// Threads: one at a time, for one text.
 class ExpressionParser {
  public:
+  /// @param names  outlives the parser.
   ExpressionParser(const std::string& text, const BandNames& names);
 
-  /// Nothing, with the fault text set, for a text that can't be read.
+  /// Reads the text. Nothing, with the fault text set, for one that can't be read.
   std::optional<Expression> Parse();
 
  private:
   using Operand = Expression::Operand;
+  /// A piece of the text that means something by itself.
   struct Token {
     enum class Kind : unsigned char { kEnd, kNumber, kName, kSign };
     Kind kind = Kind::kEnd;
-    std::size_t at = 0;  // in the text
+    std::size_t at = 0;  ///< in the text, in bytes
     std::string text;
-    double number = 0;
+    double number = 0;  ///< of a kNumber
   };
 
   class Depth;
 
+  // Tokens. `token_` is the one that is to be understood next.
+
+  /// Goes on to the next token.
   void Next();
+  /// Goes on behind a sign where it stands there; else false.
   bool Take(const char* sign);
+  /// Take, or a fault.
   void Expect(const char* sign);
+  /// Ends the reading at a token. The first fault stays.
   void Fault(Token token, const std::string& why);
+
+  // Each gives where the number lies that its part of the text stands for.
 
   Operand ParseOr();
   Operand ParseAnd();
@@ -43,8 +60,11 @@ class ExpressionParser {
   Operand ParsePower();
   Operand ParsePrimary();
   Operand ParseName(const Token& name);
+  /// Reads what stands in parentheses behind a name; another number of values is a fault.
   std::vector<Operand> ParseArguments(const Token& name, std::size_t least, std::size_t most);
   Operand ParseIndex(const Token& name, std::size_t index);
+
+  // Steps. An operand that is given to Emit or Release has been used, once.
 
   Operand Emit(const Token& token, ExpressionOp op, Operand a, Operand b = {}, Operand c = {});
   Operand Fold(const Token& token, ExpressionOp op, Operand a, Operand b, Operand c);

@@ -7,6 +7,7 @@
 // N      the call that goes wrong, counted from 1 among those of its kind on files below DIR
 // FAULT  an errno's name (EIO, ENOSPC, EINTR …), short (half of the bytes are read or written) or
 //        kill (the program dies before the call)
+//        With a KIND only calls of it are watched and counted.
 // --from all calls from the N-th on go wrong, as on a disk that stays full
 //
 // The report is JSON: how often each kind was called, which call went wrong and on which file, how
@@ -49,6 +50,9 @@ constexpr int kExitNotAllowed = 77;
 
 /// How a call names its file.
 enum class Named { kDescriptor, kPath, kPathAt, kMapped };
+
+/// The flag of a mapping without a file.
+constexpr unsigned kAnonymous = 0x20;
 
 /// One system call that is watched.
 struct Watched {
@@ -157,18 +161,29 @@ bool ParseOptions(int count, char** words, Options& options) {
          options.program.size() > 1;
 }
 
-/// Asks the kernel to notify of the watched calls of this process and what it starts.
+/// Asks the kernel to notify of the watched calls of this process and what it starts. Each
+/// notification costs two changes of processes, so memory that no file is behind is left out.
+/// @param kind  of the calls; empty for all of them.
 /// @return the descriptor on which the notifications come, or -1.
-int WatchThisProcess() {
-  std::vector<sock_filter> filter{BPF_STMT(BPF_LD | BPF_W | BPF_ABS, offsetof(seccomp_data, nr))};
-  const auto calls = static_cast<unsigned char>(std::size(kWatched));
-  for (unsigned char i = 0; i < calls; ++i) {
-    const auto past = static_cast<unsigned char>(calls - i);
+int WatchThisProcess(std::string_view kind) {
+  std::vector<Watched> watched;
+  std::copy_if(std::begin(kWatched), std::end(kWatched), std::back_inserter(watched),
+               [&](const Watched& entry) { return kind.empty() || entry.kind == kind; });
+  // For each call: is it this one? Then notify, but not of a mapping without a file.
+  std::vector<sock_filter> filter;
+  for (const Watched& entry : watched) {
+    const bool isMapped = entry.named == Named::kMapped;
+    const std::uint8_t past = isMapped ? 3 : 1;
+    filter.push_back(BPF_STMT(BPF_LD | BPF_W | BPF_ABS, offsetof(seccomp_data, nr)));
     filter.push_back(
-        BPF_JUMP(BPF_JMP | BPF_JEQ | BPF_K, static_cast<unsigned>(kWatched[i].number), past, 0));
+        BPF_JUMP(BPF_JMP | BPF_JEQ | BPF_K, static_cast<unsigned>(entry.number), 0, past));
+    if (isMapped) {
+      filter.push_back(BPF_STMT(BPF_LD | BPF_W | BPF_ABS, offsetof(seccomp_data, args[3])));
+      filter.push_back(BPF_JUMP(BPF_JMP | BPF_JSET | BPF_K, kAnonymous, 1, 0));
+    }
+    filter.push_back(BPF_STMT(BPF_RET | BPF_K, SECCOMP_RET_USER_NOTIF));
   }
   filter.push_back(BPF_STMT(BPF_RET | BPF_K, SECCOMP_RET_ALLOW));
-  filter.push_back(BPF_STMT(BPF_RET | BPF_K, SECCOMP_RET_USER_NOTIF));
   sock_fprog program{static_cast<unsigned short>(filter.size()), filter.data()};
   if (prctl(PR_SET_NO_NEW_PRIVS, 1, 0, 0, 0) != 0) return -1;
   return static_cast<int>(
@@ -238,8 +253,15 @@ class Caller {
 
   std::string TextAt(std::uint64_t address) const {
     std::string text;
-    for (char next = 0; text.size() < 4096 && Read(address + text.size(), &next, 1) && next != 0;) {
-      text += next;
+    constexpr std::size_t kMost = 4096, kPiece = 256;  // pieces do not reach over a page
+    std::array<char, kPiece> piece{};
+    while (text.size() < kMost) {
+      const std::uint64_t next = address + text.size();
+      const std::size_t bytes = kPiece - next % kPiece;
+      if (!Read(next, piece.data(), bytes)) break;
+      const auto end = std::find(piece.begin(), piece.begin() + std::ptrdiff_t(bytes), '\0');
+      text.append(piece.begin(), end);
+      if (end != piece.begin() + std::ptrdiff_t(bytes)) break;
     }
     return text;
   }
@@ -289,7 +311,6 @@ std::string FileOf(const Caller& caller, const Watched& call, const seccomp_data
     case Named::kPathAt:
       return caller.PathAt(static_cast<int>(data.args[0]), data.args[1]);
     case Named::kMapped:
-      if ((data.args[3] & 0x20) != 0) return {};  // anonymous memory
       return caller.PathOfDescriptor(static_cast<int>(data.args[4]));
   }
   return {};
@@ -419,7 +440,7 @@ pid_t Start(const Options& options, int socket) {
   const pid_t child = fork();
   if (child != 0) return child;
   prctl(PR_SET_PDEATHSIG, SIGKILL);  // nobody would answer its calls any more
-  const int listener = WatchThisProcess();
+  const int listener = WatchThisProcess(options.kind);
   SendDescriptor(socket, listener);
   if (listener >= 0) execv(options.program[0], options.program.data());
   _exit(127);

@@ -6,7 +6,7 @@ import struct
 import subprocess
 import unittest
 
-from support import DATA, FolderTest, gdal_pixels, needs_data, needs_gdal
+from support import DATA, FolderTest, gdal_pixels, needs_data, needs_gdal, run
 
 SCENE = DATA / "landsat7_olinda.tif"
 WIDTH, HEIGHT, SIDE = 349, 352, 40
@@ -114,6 +114,14 @@ class Calc(FolderTest):
                 self.assertTrue(math.isnan(result))
             else:
                 self.assertEqual(result, first + fourth)
+
+    def test_rasters_that_lie_elsewhere_are_named(self):
+        moved = self.folder / "moved.tif"
+        subprocess.run(["gdal_translate", "-q", "-a_ullr", "288876.25", "9120760.75", "298822.75", "9110728.75", SCENE,
+                        moved], check=True)
+        code, _, err = run("calc", self.folder / "o.tif", "b0 - a_b0 + b_b0", SCENE, "--a", moved, "--b", SCENE, "-q")
+        self.assertEqual(code, 0, err)
+        self.assertRegex(err, r"\Avexg: warning: [^\n]*moved.tif: not where [^\n]*landsat7_olinda.tif lies;[^\n]*\n\Z")
 
     def test_bad_expressions_make_nothing(self):
         small = self.folder / "small.tif"

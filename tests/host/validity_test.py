@@ -4,8 +4,10 @@ The counts come from GDAL's masks, of files that GDAL's programs made.
 """
 
 import json
+import pathlib
 import struct
 import subprocess
+import tempfile
 import unittest
 
 from support import DATA, FolderTest, gdal_checksums, needs_data, needs_gdal, read_npy, run
@@ -21,70 +23,71 @@ def gdal(program, *arguments):
 @needs_data
 @needs_gdal
 class ValidityTest(FolderTest):
-    def setUp(self):
-        super().setUp()
-        self.sources = {}
-        part = self.folder / "alpha.tif"  # 240 x 173, 13,787 of them not transparent
+    @classmethod
+    def setUpClass(cls):
+        """Sources that tell in each way which pixels are valid, made once."""
+        made = tempfile.TemporaryDirectory()
+        cls.addClassCleanup(made.cleanup)
+        cls.made = pathlib.Path(made.name)
+        cls.sources = {}
+        part = cls.made / "alpha.tif"  # 240 x 173, 13,787 of them not transparent
         gdal("gdal_translate", "-srcwin", 100, 1050, 240, 173, DATA / "alpha.tif", part)
         inside = ["--config", "GDAL_TIFF_INTERNAL_MASK", "YES"]
-        self.add("alpha", part)
-        self.add("mask", self.translate("mask", *inside, "-b", 1, "-b", 2, "-b", 3, "-mask", 4, part))
-        self.add("msk", self.translate("msk", "-b", 1, "-mask", 4, part))
-        self.add("value", self.translate("value", "-b", 1, "-a_nodata", 0, "-srcwin", 0, 0, 200, 150,
-                                         DATA / "RGB.byte.tif"))
-        self.add("both", self.translate("both", *inside, "-b", 1, "-mask", 4, "-a_nodata", 255, part))
-        self.add("none", self.translate("none", "-b", 1, part))
+        cls.sources["alpha"] = part
+        for name, *arguments in (("mask", *inside, "-b", 1, "-b", 2, "-b", 3, "-mask", 4, part),
+                                 ("msk", "-b", 1, "-mask", 4, part),
+                                 ("value", "-b", 1, "-a_nodata", 0, "-srcwin", 0, 0, 200, 150, DATA / "RGB.byte.tif"),
+                                 ("both", *inside, "-b", 1, "-mask", 4, "-a_nodata", 255, part),
+                                 ("none", "-b", 1, part)):
+            cls.sources[name] = cls.made / (name + ".tif")
+            gdal("gdal_translate", *arguments, cls.sources[name])
+        cls.wanted = {name: cls.source_counts(name) for name in cls.sources}
 
     def translate(self, name, *arguments):
         path = self.folder / (name + ".tif")
         gdal("gdal_translate", *arguments, path)
         return path
 
-    def add(self, name, path):
-        self.sources[name] = path
-
-    def bands(self, path):
-        out = subprocess.run(["gdalinfo", path], capture_output=True, text=True, check=True).stdout
-        return sum(line.startswith("Band ") for line in out.splitlines())
-
-    def gdal_count(self, path, band):
-        raw = self.folder / "mask.raw"
-        gdal("gdal_translate", "-of", "ENVI", "-b", f"mask,{band + 1}", path, raw)
+    @classmethod
+    def masks(cls, path, bands):
+        """GDAL's mask of each band, in one go."""
+        raw = cls.made / "masks.raw"
+        chosen = [word for band in range(bands) for word in ("-b", f"mask,{band + 1}")]
+        gdal("gdal_translate", "-of", "ENVI", "-co", "INTERLEAVE=BSQ", *chosen, path, raw)
         data = raw.read_bytes()
-        return len(data) - data.count(0)
+        size = len(data) // bands
+        return [data[band * size:(band + 1) * size] for band in range(bands)]
 
-    def count(self, path, band=0):
-        """The valid pixels of a band: as GDAL counts them, or of a file of our own as we do."""
+    @classmethod
+    def source_counts(cls, name):
+        """The valid pixels of each band but an alpha band. Of "both", GDAL's mask hides the no-data value: pixels that
+        have it are not valid either."""
+        path = cls.sources[name]
+        masks = cls.masks(path, 3 if name in ("alpha", "mask") else 1)
+        if name == "both":
+            bare = cls.made / "bare.tif"
+            gdal("gdal_translate", "-mask", "none", "-a_nodata", 255, path, bare)
+            masks = [bytes(a and b for a, b in zip(masks[0], cls.masks(bare, 1)[0]))]
+        return [len(mask) - mask.count(0) for mask in masks]
+
+    def counts(self, path, bands=1):
+        """The valid pixels of bands: as GDAL counts them, or of a file of our own as we do."""
         if path.suffix != ".dat":
-            return self.gdal_count(path, band)
-        self.fine("read", path, "-o", self.folder / "p.npy", "--mask", self.folder / "m.npy", "--bands", band,
-                  "--overwrite")
-        return read_npy(self.folder / "m.npy")[2].count(0)
+            return [len(mask) - mask.count(0) for mask in self.masks(path, bands)]
+        self.fine("read", path, "-o", self.folder / "p.npy", "--mask", self.folder / "m.npy", "--bands",
+                  ",".join(map(str, range(bands))), "--overwrite")
+        _, shape, data = read_npy(self.folder / "m.npy")
+        self.assertEqual((*shape, 1)[2], bands)  # lines, samples and, of several, bands
+        return [data[band::bands].count(0) for band in range(bands)]
 
-    def source_count(self, name, band=0):
-        """Of "both", GDAL's mask hides the no-data value: pixels that have it are not valid either."""
-        if name != "both":
-            return self.gdal_count(self.sources[name], band)
-        bare = self.translate("bare", "-mask", "none", "-a_nodata", 255, self.sources[name])
-        valid = []
-        for path in (self.sources[name], bare):
-            raw = self.folder / "both.raw"
-            gdal("gdal_translate", "-of", "ENVI", "-b", "mask,1", path, raw)
-            valid.append(raw.read_bytes())
-        return sum(a != 0 and b != 0 for a, b in zip(*valid))
-
-    def check(self, name, target, wanted, said):
-        """The file has as many valid pixels in each band but the alpha band, or says that it has not."""
-        for band, count in enumerate(wanted):
-            self.assertEqual(self.count(target, band), count, said)
-
-    def wanted(self, name):
-        bands = self.bands(self.sources[name])
-        return [self.source_count(name, band) for band in range(3 if bands == 4 else bands)]
+    def check(self, name, target, said):
+        """The file has as many valid pixels in each band but the alpha band."""
+        wanted = self.wanted[name]
+        self.assertEqual(self.counts(target, len(wanted)), wanted, said)
 
     def test_copies_keep_it_in_every_format(self):
         for name in self.sources:
-            wanted = self.wanted(name)
+            wanted = self.wanted[name]
             for ending in FORMATS + ["gif", "jpg"]:
                 if (ending == "bmp" and name == "alpha") or (ending in ("gif", "jpg") and len(wanted) > 1):
                     continue  # formats of one or three bands
@@ -92,7 +95,7 @@ class ValidityTest(FolderTest):
                     target = self.folder / f"copy.{ending}"
                     code, out, err = run("copy", self.sources[name], target, "--overwrite")
                     self.assertEqual(code, 0, err)
-                    self.check(name, target, wanted, err)
+                    self.check(name, target, err)
                     self.assertNotIn("does not keep which pixels", err)
 
     def test_alpha_stays_alpha_where_there_is_such_a_thing(self):
@@ -106,7 +109,7 @@ class ValidityTest(FolderTest):
         plain = self.translate("plain", "-b", 1, "-b", 2, "-b", 3, "-b", 1, "-colorinterp_4", "undefined",
                                "-co", "ALPHA=NO", self.sources["alpha"])
         self.fine("copy", plain, self.folder / "plain2.tif")
-        self.assertEqual(self.count(self.folder / "plain2.tif"), 240 * 173)
+        self.assertEqual(self.counts(self.folder / "plain2.tif"), [240 * 173])
         # PNG takes the fourth band for alpha, as it takes the second of two.
         for bands, last in ((("--bands", "0,1,2,3"), 3), (("--bands", "2,0"), 1)):
             target = self.folder / "plain.png"
@@ -116,7 +119,6 @@ class ValidityTest(FolderTest):
 
     def test_calibrated_pixels_keep_it(self):
         for name in self.sources:
-            wanted = self.wanted(name)
             for ending, kind in (("tif", "Single"), ("tif", "Int16"), ("img", "Byte"), ("img", "Double"),
                                  ("ntf", "Int16"), ("dat", "Single"), ("dat", "Int16"), ("tif", "Byte")):
                 with self.subTest(name=name, ending=ending, kind=kind):
@@ -125,22 +127,23 @@ class ValidityTest(FolderTest):
                                          "--type", kind, "--overwrite")
                     self.assertEqual(code, 0, err)
                     if "does not keep which pixels" not in err:
-                        self.check(name, target, wanted, err)
+                        self.check(name, target, err)
 
     def test_warped_pixels_keep_it_and_those_outside_are_not_valid(self):
         for name in self.sources:
-            peer = self.folder / "peer.tif"
-            gdal("gdalwarp", "-overwrite", "-t_srs", "EPSG:4326", "-dstalpha", "-et", 0, self.sources[name], peer)
             if name == "both":
                 continue  # GDAL's mask hides its no-data value
-            wanted = self.gdal_count(peer, 0)
+            peer = self.folder / "peer.tif"
+            gdal("gdalwarp", "-overwrite", "-t_srs", "EPSG:4326", "-dstalpha", "-et", 0, self.sources[name], peer)
+            mask = self.masks(peer, 1)[0]
+            wanted = len(mask) - mask.count(0)
             for ending in ("tif", "img", "png", "dat", "ntf", "jp2"):
                 with self.subTest(name=name, ending=ending):
                     target = self.folder / f"made.{ending}"
                     code, out, err = run("warp", self.sources[name], target, "--to", peer, "--overwrite",
                                          "--method", "rigorous")
                     self.assertEqual(code, 0, err)
-                    self.assertAlmostEqual(self.count(target), wanted, delta=wanted * 0.002, msg=err)
+                    self.assertAlmostEqual(self.counts(target)[0], wanted, delta=wanted * 0.002, msg=err)
 
     def test_what_is_burnt_in_collides_with_nothing(self):
         code, out, err = run("copy", self.sources["msk"], self.folder / "o.dat")
@@ -184,7 +187,7 @@ class ValidityTest(FolderTest):
         for step in ("a.tif", "b.dat", "c.tif"):
             self.fine("copy", source, self.folder / step, "--strict")
             source = self.folder / step
-        self.assertEqual(self.count(source), 750)
+        self.assertEqual(self.counts(source), [750])
         info = subprocess.run(["gdalinfo", source], capture_output=True, text=True).stdout
         self.assertIn(f"NoData Value={low + 1}", info)
 
