@@ -2,12 +2,6 @@
 
 namespace lumo {
 
-std::span<const EnumWord<RegionSums>> WordsOf(RegionSums) {
-  static constexpr EnumWord<RegionSums> kWords[] = {{"Told", RegionSums::kTold},
-                                                    {"Exact", RegionSums::kExact}};
-  return kWords;
-}
-
 std::span<const EnumWord<RegionParts>> WordsOf(RegionParts) {
   static constexpr EnumWord<RegionParts> kWords[] = {{"Told", RegionParts::kTold},
                                                      {"Together", RegionParts::kTogether}};

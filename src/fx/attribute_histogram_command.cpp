@@ -49,7 +49,7 @@ class FxComputeAttributesHistogramCommand final : public RegionCommand {
     NoteCreated(to);
     const bool isDone =
         CountAttributes(regions, counts, GetIPC()) && Copy(counts, file) && file.Close();
-    return isDone ? Succeed() : FailWithout("the histograms can't be written", RegionSums::kExact);
+    return isDone ? Succeed() : FailWithout("the histograms can't be written", Form::kExact);
   }
 
   /// The statistics of the pairs that the histograms have.

@@ -95,9 +95,9 @@ bool RegionCommand::HasRun(ProcessBuilder<Process>& process) {
   return false;
 }
 
-CommandResult RegionCommand::FailWithout(const char* otherwise, RegionSums form) {
+CommandResult RegionCommand::FailWithout(const char* otherwise, Form form) {
   const String fault = TakeFaultOr(otherwise);
-  if (form != RegionSums::kTold) {
+  if (form != Form::kTold) {
     std::error_code none;
     for (const std::string& path : created_) std::filesystem::remove(path, none);
   }
@@ -111,7 +111,7 @@ InputDeclaration SumsInput() {
           "Told: in float, tile after tile; Exact: in integers or doubles until the end, with the "
           "same bits for any tiles and threads; values that are not finite then count for nothing",
           "",
-          &WordsIn<RegionSums>};
+          &WordsIn<Form>};
 }
 
 }  // namespace lumo

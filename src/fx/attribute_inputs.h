@@ -32,9 +32,7 @@ class RegionCommand : public RasterCommand {
   bool TakeExisting(const char* name, URI& uri);
 
   /// The words of an input with a told form; told when absent.
-  RegionSums SumsForm() const {
-    return HasInput("Sums") ? Read<RegionSums>("Sums") : RegionSums::kTold;
-  }
+  Form SumsForm() const { return HasInput("Sums") ? Read<Form>("Sums") : Form::kTold; }
 
   /// Runs a process here. False, with its fault set, after a failure or an abort.
   bool HasRun(ProcessBuilder<Process>& process);
@@ -43,7 +41,7 @@ class RegionCommand : public RasterCommand {
   void NoteCreated(const URI& uri) { created_.push_back(uri.ToUTF8()); }
   /// Fails with the fault of this thread; and removes what was created, unless sums that were told
   /// to stay are in there.
-  CommandResult FailWithout(const char* otherwise, RegionSums form);
+  CommandResult FailWithout(const char* otherwise, Form form);
 
  private:
   bool IsNew(const char* name, const URI& uri) const;

@@ -28,7 +28,7 @@ class FxComputeAttributesStatsCommand final : public RegionCommand {
     if (!stats.IsValid()) return Fail();
     NoteCreated(to);
     const bool isDone = Fill(regions, stats) && stats.Close();
-    return isDone ? Succeed() : FailWithout("the statistics can't be written", RegionSums::kExact);
+    return isDone ? Succeed() : FailWithout("the statistics can't be written", Form::kExact);
   }
 
   bool Fill(RegionAttributesFile<float>& regions, RegionAttributeStatsFile<float>& stats) const {

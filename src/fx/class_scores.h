@@ -3,8 +3,8 @@
 #include <functional>
 
 #include "commands/value_text.h"
-#include "fx/chosen_attributes.h"
 #include "fx/attribute_inputs.h"
+#include "fx/chosen_attributes.h"
 #include "fx/region_kinds.h"
 
 namespace lumo {

@@ -5,6 +5,7 @@
 
 #include "fx/lambda_tasks.h"
 #include "fx/task_setup.h"
+#include "fx/usable_pixels.h"
 #include "fx/watershed_task.h"
 #include "tasks/task_errors.h"
 
@@ -50,18 +51,6 @@ bool ForEachLabel(const LambdaTiles<T, L>& tiles, const AbortFlag* abort, Visit&
     }
   }
   return true;
-}
-
-/// True when a pixel is excluded in a reading of several bands: without data in one, outside the
-/// region of interest in one, or masked in all.
-inline bool IsExcluded(const unsigned char* states, std::size_t bands) {
-  unsigned char any = 0, all = PixelValueState::NotValid;
-  for (std::size_t band = 0; band < bands; ++band) {
-    any |= states[band];
-    all &= states[band];
-  }
-  return (any & (PixelValueState::NoData | PixelValueState::OutsideROI)) != 0 ||
-         (all & PixelValueState::Masked) != 0;
 }
 
 /// Gathers the pairs of neighbours of a tile. @param withZero  the label 0 counts as a segment.
@@ -224,8 +213,7 @@ bool RasterTileRigorousLambdaMergeTask<T>::Execute(ArgList& args) {
   const bool added =
       detail::ForEachLabel(tiles, GetAbortFlag(),
                            [&](std::uint32_t label, const T* values, const unsigned char* states) {
-                             if (!detail::IsExcluded(states, bands))
-                               work->merge.AddPixel(label, values, 1);
+                             if (IsUsable(states, bands)) work->merge.AddPixel(label, values, 1);
                            });
   if (!added) return false;
   Tile<std::int32_t>& labels = *tiles.labels;

@@ -52,7 +52,7 @@ class FxComputePixelAttributesCommand final : public RegionCommand {
     bool isDone = CreateFiles(image->Bands());
     isDone = isDone && DispatchType(EightTypes{}, image->DataType(), [&]<typename T>() {
                const RasterPtr<T> typed(image);
-               return SumsForm() == RegionSums::kExact
+               return SumsForm() == Form::kExact
                           ? RegionPass<T>(typed, labels, census, plan_).Run(second)
                           : RunTold<T>(typed, labels, second);
              });
@@ -90,7 +90,7 @@ class FxComputePixelAttributesCommand final : public RegionCommand {
       return false;
     }
     if (!HasInput("EntropyFXA")) return true;
-    if (Wants("texture") && SumsForm() == RegionSums::kExact) {
+    if (Wants("texture") && SumsForm() == Form::kExact) {
       return TakeOutput("EntropyFXA", entropy_);
     }
     SetFault("EntropyFXA: the entropy comes with exact sums and the value texture");

@@ -70,7 +70,7 @@ class FxComputeRegionMeansRasterCommand final : public RegionCommand {
   template <typename T>
   bool ComputeMeans(const RasterPtr<T>& image, const BasicRasterPtr& labels,
                     const LabelCensus& census) {
-    if (SumsForm() == RegionSums::kExact) {
+    if (SumsForm() == Form::kExact) {
       RegionPassPlan plan;
       plan.means = means_;
       return RegionPass<T>(image, labels, census, plan).Run(Share(2));

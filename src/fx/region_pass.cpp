@@ -9,6 +9,7 @@
 #include "fx/run_kernels.h"
 #include "fx/strip_regions.h"
 #include "fx/texture_windows.h"
+#include "fx/usable_pixels.h"
 #include "raster/pixel_states.h"
 #include "raster/tile_functions.h"
 #include "tasks/scratch_pool.h"
@@ -74,16 +75,10 @@ struct StripValues {
 /// Marks the pixels of a line that take part. @return null when all of them do.
 const unsigned char* FindUsable(const unsigned char* states, std::size_t width, std::size_t bands,
                                 std::vector<unsigned char>& usable) {
-  constexpr unsigned char kAny = PixelValueState::NoData | PixelValueState::OutsideROI;
   if (AllValid(states, width * bands)) return nullptr;
   usable.resize(width);
   for (std::size_t x = 0; x < width; ++x, states += bands) {
-    unsigned char any = 0, all = PixelValueState::NotValid;
-    for (std::size_t band = 0; band < bands; ++band) {
-      any |= states[band];
-      all &= states[band];
-    }
-    usable[x] = (any & kAny) == 0 && (all & PixelValueState::Masked) == 0 ? 1 : 0;
+    usable[x] = IsUsable(states, bands) ? 1 : 0;
   }
   return usable.data();
 }

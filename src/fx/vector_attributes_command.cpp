@@ -41,7 +41,7 @@ class FxComputeVectorAttributesCommand final : public RegionCommand {
     const bool isFile = HasInput("VectorFXV") || !HasInput("LabelURI");
     const bool isDone = isFile ? FromFile() : FromLabels();
     if (isDone) return Succeed();
-    return FailWithout("the shapes could not be computed", RegionSums::kExact);
+    return FailWithout("the shapes could not be computed", Form::kExact);
   }
 
   bool ReadSize() {
