@@ -29,6 +29,9 @@ const CommandDeclaration kAttributeTable{
       "columns texture_entropy_n_b0 and so on"},
      {"MeansFXA", Presence::kOptional, ValueKind::kText,
       "columns mean_b0 and count_b0; not beside SpectralFXA"},
+     {"IndexFXA", Presence::kOptional, ValueKind::kText,
+      "spectral values of named bands: columns mean_NAME, std_NAME and so on"},
+     {"IndexNames", Presence::kOptional, ValueKind::kTextList, "the names of these bands"},
      {"SpatialFXA", Presence::kOptional, ValueKind::kText, "columns area, perimeter and so on"},
      {"LabelURI", Presence::kOptional, ValueKind::kURI,
       "the labels, from which the regions get their polygons; none when absent"},
@@ -40,6 +43,7 @@ const CommandDeclaration kAttributeTable{
 struct TableStore {
   AttributeKind kind;
   Pointer<RegionAttributesFile<float>> file;
+  Array<String> names;  ///< of its bands; none where they have numbers
 };
 
 /// The double that is written as the float is, with the fewest digits that tell it from others.
@@ -85,13 +89,33 @@ class CreateAttributeTableCommand final : public RegionCommand {
     }
     for (const auto& [input, kind] : kStores) {
       if (HasInput(input) && !OpenStore(input, kind)) return false;
+      const bool isBeforeShapes = kind == AttributeKind::kEntropy;
+      if (isBeforeShapes && HasInput("IndexFXA") && !OpenIndexStore()) return false;
     }
     if (!stores_.empty()) return true;
     SetFault("there is no file of regions");
     return false;
   }
 
+  /// Opens the store of spectral values of bands that have names.
+  bool OpenIndexStore() {
+    if (!OpenFile("IndexFXA", AttributeKind::kSpectral)) return false;
+    stores_.back().names = Read<Array<String>>("IndexNames");
+    if (stores_.back().names.GetCount() == stores_.back().file->Bands()) return true;
+    SetFault("IndexNames: there are other bands in the file");
+    return false;
+  }
+
   bool OpenStore(const char* input, AttributeKind kind) {
+    if (!OpenFile(input, kind)) return false;
+    if (kind == AttributeKind::kShape || !HasInput("Bands")) return true;
+    bands_ = Read<Array<unsigned>>("Bands");
+    if (bands_.GetCount() == stores_.back().file->Bands()) return true;
+    SetFault("Bands: there are other bands in the files");
+    return false;
+  }
+
+  bool OpenFile(const char* input, AttributeKind kind) {
     URI uri;
     if (!TakeExisting(input, uri)) return false;
     const Pointer<RegionAttributesFile<float>> file(new RegionAttributesFile<float>(uri, false));
@@ -102,14 +126,7 @@ class CreateAttributeTableCommand final : public RegionCommand {
       SetFault(String(std::string(input) + ": " + uri.ToUTF8() + " is no such file of regions"));
       return false;
     }
-    if (kind != AttributeKind::kShape) {
-      bands_ = Read<Array<unsigned>>("Bands");
-      if (HasInput("Bands") && bands_.GetCount() != file->Bands()) {
-        SetFault("Bands: there are other bands in the files");
-        return false;
-      }
-    }
-    stores_.push_back({kind, file});
+    stores_.push_back({kind, file, {}});
     return true;
   }
 
@@ -130,14 +147,20 @@ class CreateAttributeTableCommand final : public RegionCommand {
     for (const TableStore& store : stores_) {
       for (unsigned band = 0; band < store.file->Bands(); ++band) {
         for (const AttributeName& attribute : ColumnsOf(store.kind)) {
-          const unsigned number = band < bands_.GetCount() ? bands_[band] : band;
-          layer.fields.push_back(
-              {ColumnName(store.kind, attribute, number),
-               attribute.isWhole ? VectorFieldType::kInteger : VectorFieldType::kReal});
+          layer.fields.push_back({NameOf(store, attribute, band), attribute.isWhole
+                                                                      ? VectorFieldType::kInteger
+                                                                      : VectorFieldType::kReal});
         }
       }
     }
     return layer;
+  }
+
+  std::string NameOf(const TableStore& store, const AttributeName& attribute, unsigned band) const {
+    if (store.names.GetCount() != 0) {
+      return std::string(attribute.name) + "_" + store.names[band].ToUTF8();
+    }
+    return ColumnName(store.kind, attribute, band < bands_.GetCount() ? bands_[band] : band);
   }
 
   /// The attributes that become columns; the entropy goes without a count of its own.

@@ -55,6 +55,24 @@ class Attributes(FolderTest):
     def attributes(self, *more, labels=None):
         return self.fine("attributes", SCENE, labels or self.labels, "-o", self.folder / "f", "-q", *more)
 
+    def test_values_of_expressions_are_columns_by_their_names(self):
+        table = self.folder / "t.csv"
+        self.attributes("--index", "ndvi=(b3-b2)/(b3+b2)", "--index", "twice=b0*2", "--spectral", "--bands", "0", "--table", table)
+        scene, labels = self.arrays()
+        with np.errstate(all="ignore"):
+            ndvi = (scene[..., 3] - scene[..., 2]) / (scene[..., 3] + scene[..., 2])
+        rows = list(csv.DictReader(table.read_text().splitlines()))
+        self.assertEqual([int(row["label"]) for row in rows], list(np.unique(labels)))
+        for row in rows:
+            inside = (labels == int(row["label"])) & np.isfinite(ndvi)
+            for name, value in (("mean", ndvi[inside].mean()), ("std", ndvi[inside].std()), ("min", ndvi[inside].min()),
+                                ("count", inside.sum())):
+                self.assertAlmostEqual(float(row[f"{name}_ndvi"]), value, delta=1e-5 * max(1, abs(value)))
+            self.assertAlmostEqual(float(row["mean_twice"]), 2 * float(row["mean_b0"]), delta=1e-3)
+        for wrong in ("b3+1", "=b3", "a b=b3", "n=b1;m=b2"):
+            self.fails(2, "NAME=EXPRESSION", "attributes", SCENE, self.labels, "-o", self.folder / "g", "--index", wrong)
+        self.fails(1, "there is no such band", "attributes", SCENE, self.labels, "-o", self.folder / "g", "--index", "n=b9")
+
     def test_values_are_numpys(self):
         self.attributes("--spectral", "--texture", "--kernel", "4", "--bands", "3,0")
         scene, labels = self.arrays()

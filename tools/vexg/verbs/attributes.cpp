@@ -153,7 +153,8 @@ class AttributesVerb final : public FileVerb {
     line.AddNote(
         "Makes NAME.spectral.fxa, NAME.texture.fxa with NAME.entropy.fxa, and NAME.shape.fxa, "
         "whose records are the regions by label, and a table with a row for each region; without "
-        "--spectral, --texture and --shape the first and the last. Labels are whole numbers of up "
+        "--spectral, --texture, --index and --shape the first and the last. --index makes "
+        "NAME.index.fxa. Labels are whole numbers of up "
         "to 32 bits, in a raster of the scene's size; label 0 is a region too. Sums are exact, and "
         "several "
         "polygons of one label are one shape. The ending of the table chooses its format: .csv, "
@@ -174,6 +175,11 @@ class AttributesVerb final : public FileVerb {
     line.Add("--texture", wantsTexture_, "Range, mean, variance and entropy of windows");
     line.Add("--kernel", kernel_, "Side of the windows, in pixels").ShowsDefault();
     line.Add("--shape", wantsShape_, "Area, perimeter, compactness and so on");
+    line.Add("--index", indices_,
+             "Spectral values of what an expression makes of the bands, see vexg calc; may come "
+             "again")
+        .Shows("NAME=EXPRESSION")
+        .Example("ndvi=(b3-b2)/(b3+b2)");
     line.Add("--bands", bandsText_, "Bands, from 0; all by default")
         .Shows("B,B...")
         .Example("3,2,1");
@@ -254,7 +260,17 @@ class AttributesVerb final : public FileVerb {
       throw HostError(kExitUsage,
                       "--json, --band and --attribute are for info, stats and hist of a file");
     }
-    if (!wantsSpectral_ && !wantsTexture_ && !wantsShape_) wantsSpectral_ = wantsShape_ = true;
+    for (const std::string& index : indices_) {
+      const std::size_t equals = index.find('=');
+      const bool isNamed = equals != 0 && equals != index.npos && index[equals + 1] != '=' &&
+                           index.find_first_not_of(kNameLetters) == equals;
+      if (!isNamed || index.find(';') != index.npos) {
+        throw HostError(kExitUsage, fmt::format("--index: \"{}\" isn't of the form NAME=EXPRESSION",
+                                                Printable(index)));
+      }
+    }
+    if (!wantsSpectral_ && !wantsTexture_ && !wantsShape_ && indices_.empty())
+      wantsSpectral_ = wantsShape_ = true;
     if (!table_.empty() && (!IsVectorName(table_) || table_.ends_with(".fxv"))) {
       throw HostError(kExitUsage, table_ + ": --table: no vector format has this ending");
     }
@@ -272,6 +288,7 @@ class AttributesVerb final : public FileVerb {
       made.push_back({"TextureFXA", name_ + ".texture.fxa"});
       made.push_back({"EntropyFXA", name_ + ".entropy.fxa"});
     }
+    if (!indices_.empty()) made.push_back({"IndexFXA", name_ + ".index.fxa"});
     if (wantsShape_) made.push_back({"SpatialFXA", name_ + ".shape.fxa"});
     return made;
   }
@@ -329,12 +346,16 @@ class AttributesVerb final : public FileVerb {
       draft.Open("whole", "CreateLabelsRasterCommand").AddVariableInput("SrcURI", "$labels");
     }
     const std::vector<Made> made = GetMade();
-    const auto addFiles = [&](JobWriterCommand& step, bool isShape) {
+    const auto addFiles = [&](JobWriterCommand& step, bool (*belongs)(const std::string&)) {
       for (std::size_t i = 0; i < made.size(); ++i) {
-        const bool belongs = (std::string(made[i].input) == "SpatialFXA") == isShape;
-        if (belongs) step.AddInput(made[i].input, String(names[i]));
+        if (belongs(made[i].input)) step.AddInput(made[i].input, String(names[i]));
       }
     };
+    const auto isShape = [](const std::string& input) { return input == "SpatialFXA"; };
+    const auto isOfBands = [](const std::string& input) {
+      return input != "SpatialFXA" && input != "IndexFXA";
+    };
+    const auto isAny = [](const std::string&) { return true; };
     if (wantsSpectral_ || wantsTexture_) {
       if (!bandsText_.empty()) AddBandView(draft, "bands", "$source", bands_);
       JobWriterCommand& pixels = draft.Step("pixels", "FxComputePixelAttributesCommand");
@@ -343,15 +364,16 @@ class AttributesVerb final : public FileVerb {
       pixels.AddInput("Values", String(!wantsTexture_    ? "spectral"
                                        : !wantsSpectral_ ? "texture"
                                                          : "spectral|texture"));
-      addFiles(pixels, false);
+      addFiles(pixels, isOfBands);
       if (wantsTexture_) pixels.AddInput("TextureKernelSize", kernel_);
       pixels.AddInput("Sums", String("Exact"));
       if (!bandsText_.empty()) draft.Close("close.bands", "$bands");
     }
+    if (!indices_.empty()) AddIndices(draft, labels, names);
     if (wantsShape_) {
       JobWriterCommand& shapes = draft.Step("shapes", "FxComputeVectorAttributesCommand");
       shapes.AddVariableInput("LabelURI", labels);
-      addFiles(shapes, true);
+      addFiles(shapes, isShape);
       shapes.AddInput("PixelXSize", pixelX_);
       shapes.AddInput("PixelYSize", pixelY_);
       shapes.AddInput("Parts", String("Together"));
@@ -359,8 +381,8 @@ class AttributesVerb final : public FileVerb {
     if (!table_.empty()) {
       JobWriterCommand& table = draft.Step("table", "CreateAttributeTableCommand");
       table.AddInput("Table", String(names.back()));
-      addFiles(table, false);
-      addFiles(table, true);
+      addFiles(table, isAny);
+      if (!indices_.empty()) table.AddInput("IndexNames", String(IndexNames()));
       if (!table_.ends_with(".csv")) table.AddVariableInput("LabelURI", labels);
       if (!bandsText_.empty() && (wantsSpectral_ || wantsTexture_)) {
         table.AddInput("Bands", bands_);
@@ -370,6 +392,41 @@ class AttributesVerb final : public FileVerb {
     draft.Close("close.labels", "$labels");
     draft.Close("close", "$source");
     return draft;
+  }
+
+  /// Adds the commands that compute the spectral values of expressions.
+  void AddIndices(JobDraft& draft, const String& labels,
+                  const std::vector<std::string>& names) const {
+    JobWriterCommand& view = draft.Open("index", "CreateExpressionRasterCommand");
+    view.AddExpandedInput("SrcURI", String("$source"));
+    std::string expressions;
+    for (const std::string& index : indices_) {
+      if (!expressions.empty()) expressions += ";";
+      expressions += index;
+    }
+    view.AddInput("Expressions", String(expressions));
+    JobWriterCommand& pixels = draft.Step("indices", "FxComputePixelAttributesCommand");
+    pixels.AddVariableInput("SrcURI", "$index");
+    pixels.AddVariableInput("LabelURI", labels);
+    pixels.AddInput("Values", String("spectral"));
+    const std::vector<Made> made = GetMade();
+    for (std::size_t i = 0; i < made.size(); ++i) {
+      if (std::string(made[i].input) == "IndexFXA") {
+        pixels.AddInput("SpectralFXA", String(names[i]));
+      }
+    }
+    pixels.AddInput("Sums", String("Exact"));
+    draft.Close("close.index", "$index");
+  }
+
+  /// The names in front of the expressions, as a list.
+  std::string IndexNames() const {
+    std::string names;
+    for (const std::string& index : indices_) {
+      if (!names.empty()) names += "|";
+      names += index.substr(0, index.find('='));
+    }
+    return names;
   }
 
   JobDraft GetJob(const Outputs& outputs) const override {
@@ -388,7 +445,11 @@ class AttributesVerb final : public FileVerb {
     session.Run(draft);
   }
 
+  static constexpr const char* kNameLetters =
+      "abcdefghijklmnopqrstuvwxyzABCDEFGHIJKLMNOPQRSTUVWXYZ0123456789_";
+
   std::string labels_, name_, bandsText_, table_, attribute_;
+  std::vector<std::string> indices_;
   std::optional<unsigned> band_;
   unsigned kernel_ = 3;
   bool wantsSpectral_ = false;
