@@ -7,8 +7,8 @@
 
 namespace lumo {
 
-/// Adds the runs of a line of pixels to the sums of their regions: four bands at a time, in vector
-/// registers.
+/// Adds the runs of a line of pixels to the sums of their regions: four or eight bands at a time,
+/// in vector registers.
 /// @param line   pixel-interleaved. @param end  behind the last value that may be read.
 /// @param sums   regions by bands.
 void AddRuns(std::span<const LabelRun> runs, const std::uint8_t* line, const std::uint8_t* end,

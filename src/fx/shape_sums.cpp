@@ -26,20 +26,17 @@ Int128 Turn(const Point2D<std::int64_t>& a, const Point2D<std::int64_t>& b,
 
 /// factorA a b - factorC c d. In double where 128 bits do not hold it, unless it is 0 there.
 double Difference(int factorA, Int128 a, Int128 b, int factorC, Int128 c, Int128 d) {
-  Int128 first = 0, second = 0, difference = 0;
-  bool isShort = !__builtin_mul_overflow(a, b, &first);
-  isShort = isShort && !__builtin_mul_overflow(first, Int128{factorA}, &first);
-  isShort = isShort && !__builtin_mul_overflow(c, d, &second);
-  isShort = isShort && !__builtin_mul_overflow(second, Int128{factorC}, &second);
-  isShort = isShort && !__builtin_sub_overflow(first, second, &difference);
-  if (isShort) return static_cast<double>(difference);
+  using Long = long double;
+  const Long first = factorA * static_cast<Long>(a) * static_cast<Long>(b);
+  const Long second = factorC * static_cast<Long>(c) * static_cast<Long>(d);
+  const Long most = std::ldexp(Long{1}, 126);
+  if (std::abs(first) < most && std::abs(second) < most) {
+    return static_cast<double>(factorA * a * b - factorC * c * d);
+  }
   using Bits = UInt128;
   const Bits wrapped = static_cast<Bits>(a) * static_cast<Bits>(b) * static_cast<Bits>(factorA) -
                        static_cast<Bits>(c) * static_cast<Bits>(d) * static_cast<Bits>(factorC);
-  if (wrapped == 0) return 0;
-  using Long = long double;
-  return static_cast<double>(factorA * static_cast<Long>(a) * static_cast<Long>(b) -
-                             factorC * static_cast<Long>(c) * static_cast<Long>(d));
+  return wrapped == 0 ? 0 : static_cast<double>(first - second);
 }
 
 /// The rings of a polygon, whichever way it holds them.

@@ -154,7 +154,7 @@ VEXG_INLINE void Figures(const std::int32_t* counts, const double* sums, const d
     const double part = spread / (n * (n - 1));
     range[x] = n > 0 ? extent : 0;
     mean[x] = n > 0 ? middle : 0;
-    variance[x] = (n > 1) & (spread > 0) ? part : 0;
+    variance[x] = ((n > 1) & (spread > 0)) ? part : 0;
   }
 }
 
@@ -247,7 +247,7 @@ VEXG_CHOOSING_VECTOR_CLONES void FindEntropyOverN(const WindowCounts& counts, co
   for (std::size_t x = 0; x < count; ++x) {
     const std::int32_t second = all[x] - first[x] - third[x];
     const double sum = (logs[all[x]] - logs[first[x]] - logs[second] - logs[third[x]]) / all[x];
-    entropy[x] = (range[x] > even) & (sum > 0) ? sum : 0;
+    entropy[x] = ((range[x] > even) & (sum > 0)) ? sum : 0;
   }
 }
 
