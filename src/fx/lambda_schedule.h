@@ -72,8 +72,8 @@ class VEXG_EXPORT LambdaSchedule {
     std::uint32_t ids[2] = {};  // lower label first
     std::uint32_t next[2] = {};
     std::uint32_t previous[2] = {};
-    double length = 0;
     double cost = 0;
+    std::uint32_t length = 0;
     bool isChosen = false;
     bool isQueued = false;
 
