@@ -12,12 +12,15 @@ namespace lumo {
 /// Ownership: shares the raster, which does not know the view.
 /// Threads:   every operation may run on many threads at once, where the raster allows it; nothing
 ///            is stored per call.
+/// Cost:      reads all bands of the block; nothing at all where one of them has no no-data value,
+///            since every pixel counts then.
 /// Failure:   without a raster IsValid() is false, and operations give false, 0 or empty. A block
 ///            without one of the three interleaves, or that the raster can't deliver, reports
 ///            false. Nothing can be written.
 template <typename T>
 class PVSRaster final : public ComputedRaster<T> {
  public:
+  /// @param raster  whose pixels are looked at; an empty one makes a view that is not valid.
   explicit PVSRaster(const RasterPtr<T>& raster);
   ~PVSRaster() override { this->StopComputing(); }
 

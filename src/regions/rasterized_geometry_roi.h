@@ -7,9 +7,14 @@ namespace lumo {
 
 /// Shapes on the grid of a raster. Where their coordinate system is another than the raster's, they
 /// are shown in that by a ProjectedGeometryROI.
+///
+/// Threads, failure and cost: as those of RasterizedGeometry, which finds the pixels.
 class VEXG_EXPORT RasterizedGeometryROI final : public RasterizedROI {
  public:
   static const unsigned TypeCode;
+  /// @param definition     of the shapes, which it shares, and by which rules they become pixels.
+  /// @param samples,lines  size of the raster, where it has no geo-reference.
+  /// @param geoRef         of the grid, with its size; null for one of pixels.
   RasterizedGeometryROI(const GeometryROIDefPtr& definition, unsigned samples, unsigned lines,
                         const GeoRefPtr& geoRef);
   bool IsA(unsigned typeCode) const override;

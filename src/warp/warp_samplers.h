@@ -28,9 +28,9 @@ template <typename T>
 struct WarpTarget {
   T* pixels = nullptr;             ///< of the rectangle's first pixel
   unsigned char* state = nullptr;  ///< all 0 before
-  BlockStrides strides;
-  unsigned bands = 0;
-  const T* background = nullptr;  ///< by band
+  BlockStrides strides;            ///< of the pixels and the states
+  unsigned bands = 0;              ///< of the block
+  const T* background = nullptr;   ///< by band
 };
 
 /// Walks the lines of a rectangle in chunks of positions: the loop of all samplers, each of which
@@ -177,6 +177,10 @@ class NearestNeighborParallel final : public WarpParallel<T> {
 /// Interpolates between kSide by kSide neighbours. With kCorner a pixel has the state of the one
 /// that it falls into; with kCentred neighbours that aren't valid are left out, and the pixel is
 /// valid when one of the nearest four is.
+///
+/// Cost: the neighbours of a chunk are gathered band by band, and weighed in one loop that becomes
+///       vector code. Where the source has states, each pixel is looked at once more.
+/// @tparam kSide  2 or 4.
 template <typename T, unsigned kSide>
 class NeighbourhoodParallel : public WarpParallel<T> {
  public:
@@ -303,14 +307,15 @@ class NeighbourhoodParallel : public WarpParallel<T> {
   }
 };
 
-/// Interpolates bilinearly.
+/// Interpolates bilinearly between the 2 by 2 pixels around a position.
 template <typename T>
 class LinearInterpolateParallel final : public NeighbourhoodParallel<T, 2> {
  public:
   using NeighbourhoodParallel<T, 2>::NeighbourhoodParallel;
 };
 
-/// Interpolates by cubic convolution.
+/// Interpolates by cubic convolution of the 4 by 4 pixels around a position; warp_kernels.h has the
+/// formula.
 template <typename T>
 class CubicInterpolateParallel final : public NeighbourhoodParallel<T, 4> {
  public:
