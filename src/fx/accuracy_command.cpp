@@ -4,11 +4,10 @@
 
 #include "foundation/fault.h"
 #include "fx/accuracy.h"
-#include "fx/class_names.h"
+#include "fx/class_samples.h"
 #include "raster/raster_command.h"
 #include "raster/raster_def.h"
 #include "raster/raster_details.h"
-#include "regions/shape_file.h"
 #include "regions/zonal_pass.h"
 
 namespace lumo {
@@ -51,8 +50,7 @@ class AccuracyCommand final : public RasterCommand {
     const BasicRasterPtr map = FindRaster("MapURI");
     if (!map) return Fail();
     ReadNames(*map);
-    const std::string path = Read<String>("Vectors").ToUTF8();
-    if (!ReadSamples(path)) return Fail(FaultOfShapes(path));
+    if (!ReadSamples()) return Fail();
     std::vector<double> figures;
     bool isDone = false;
     const bool isKnown = DispatchType(EightTypes{}, map->DataType(), [&]<typename T>() {
@@ -80,22 +78,14 @@ class AccuracyCommand final : public RasterCommand {
     isNamed_ = !names_.empty();
   }
 
-  bool ReadSamples(const std::string& path) {
-    const VectorRecordSourcePtr source = OpenShapes(path);
-    if (!source) return false;
-    const std::vector<std::uint32_t> layers = FindLayers(*source, Read<String>("Layer").ToUTF8());
-    if (layers.empty()) return false;
-    const ShapeSelection selection{layers.front(), Read<String>("Where").ToUTF8(),
-                                   Read<String>("ClassField").ToUTF8()};
-    plan_.geometry = ReadNamedShapes(*source, selection, GetIPC(), known_);
-    if (!plan_.geometry) return false;
-    if (known_.empty()) {
-      SetFault("there is no sample");
-      return false;
-    }
-    plan_.options.pixels = PixelRule::kCenter;
-    plan_.options.rules = ScanRules::kSteady;
-    plan_.options.coordinates = ShapeCoordinates::kMap;
+  bool ReadSamples() {
+    const SampleSource source{Read<String>("Vectors").ToUTF8(), Read<String>("Layer").ToUTF8(),
+                              Read<String>("Where").ToUTF8(), Read<String>("ClassField").ToUTF8()};
+    ClassSamples samples;
+    if (!ReadClassSamples(source, GetIPC(), samples)) return false;
+    known_ = samples.classes;
+    plan_.geometry = samples.shapes;
+    plan_.options = SampleScan();
     for (const char* const figure : {"count", "majority"}) {
       plan_.requests.emplace_back();
       ParseZonalRequest(figure, plan_.requests.back());

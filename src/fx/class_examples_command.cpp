@@ -4,9 +4,8 @@
 
 #include "foundation/fault.h"
 #include "fx/attribute_inputs.h"
-#include "fx/class_names.h"
+#include "fx/class_samples.h"
 #include "raster/tile_functions.h"
-#include "regions/shape_file.h"
 #include "views/shapes_raster.h"
 
 namespace lumo {
@@ -38,9 +37,7 @@ class FindClassExamplesCommand final : public RegionCommand {
     if (!CheckInputs()) return Fail();
     const BasicRasterPtr labels = FindLabels(nullptr, false);
     if (!labels) return Fail();
-    const std::string path = Read<String>("Vectors").ToUTF8();
-    if (!ReadSamples(path, *labels)) return Fail(FaultOfShapes(path));
-    if (!OrderClasses()) return Fail();
+    if (!ReadSamples(*labels) || !OrderClasses()) return Fail();
     const RasterPtr<std::int32_t> samples(new ShapesRaster<std::int32_t>(shapes_));
     if (!samples->IsValid()) return Fail(TakeFaultOr("the samples can't be carried to the labels"));
     if (!CountPairs(RasterPtr<std::int32_t>(labels), samples)) {
@@ -50,28 +47,20 @@ class FindClassExamplesCommand final : public RegionCommand {
     return Succeed();
   }
 
-  bool ReadSamples(const std::string& path, const BasicRaster& labels) {
-    const VectorRecordSourcePtr source = OpenShapes(path);
-    if (!source) return false;
-    const std::vector<std::uint32_t> layers = FindLayers(*source, Read<String>("Layer").ToUTF8());
-    if (layers.empty()) return false;
-    const ShapeSelection selection{layers.front(), Read<String>("Where").ToUTF8(),
-                                   Read<String>("ClassField").ToUTF8()};
-    shapes_.geometry = ReadNamedShapes(*source, selection, GetIPC(), ofSample_);
-    if (!shapes_.geometry) return false;
-    if (ofSample_.empty()) {
-      SetFault("there is no sample");
-      return false;
-    }
+  bool ReadSamples(const BasicRaster& labels) {
+    const SampleSource source{Read<String>("Vectors").ToUTF8(), Read<String>("Layer").ToUTF8(),
+                              Read<String>("Where").ToUTF8(), Read<String>("ClassField").ToUTF8()};
+    ClassSamples samples;
+    if (!ReadClassSamples(source, GetIPC(), samples)) return false;
+    ofSample_ = samples.classes;
     for (std::size_t i = 0; i < ofSample_.size(); ++i) {
       shapes_.values.push_back(static_cast<double>(i + 1));
     }
+    shapes_.geometry = samples.shapes;
     shapes_.geoRef = labels.GetRasterDef().geoRef;
     shapes_.samples = labels.Samples();
     shapes_.lines = labels.Lines();
-    shapes_.options.pixels = PixelRule::kCenter;
-    shapes_.options.rules = ScanRules::kSteady;
-    shapes_.options.coordinates = ShapeCoordinates::kMap;
+    shapes_.options = SampleScan();
     return true;
   }
 

@@ -40,9 +40,9 @@ class LabelledPolygonSink final : public LabelPolygonSink {
 
 /// Holds regions until their last polygon has come, which a census knows beforehand.
 template <typename Item>
-class OpenShapes {
+class PendingRegions {
  public:
-  explicit OpenShapes(const LabelCensus& census) : census_(census) {}
+  explicit PendingRegions(const LabelCensus& census) : census_(census) {}
 
   /// Adds an item of a region. `merge(Item&, Item&&)` joins it to those that came before.
   template <typename Merge>
@@ -102,7 +102,7 @@ bool ForEachRegion(const RasterPtr<L>& labels, const LabelCensus& census, Region
   const unsigned lines = labels->Lines();
   LabelledPolygonSink sink;
   LabelVectorizer<L> vectorizer(labels->Samples(), sink);
-  OpenShapes<Item> open(census);
+  PendingRegions<Item> open(census);
   TileProcess<> process("RegionShapes", ipc);
   const auto tiles =
       process.Read(LabelTiles(labels, StripTiles(*labels, labels->Samples() * sizeof(L))));

@@ -10,27 +10,11 @@
 #include "options/option_values.h"
 #include "raster/pixel_value.h"
 #include "rasters/map_points.h"
+#include "rasters/shape_options.h"
 #include "verb.h"
 
 namespace lumo::host {
 namespace {
-
-/// A file of shapes, and a layer of it.
-struct RegionName {
-  std::string file;
-  std::string layer;  ///< empty: all
-};
-
-/// Splits FILE:LAYER; a file that is there needs no layer.
-RegionName SplitRegion(const std::string& text) {
-  const auto isThere = [](const std::string& file) {
-    std::error_code ignored;
-    return std::filesystem::exists(file, ignored);
-  };
-  const std::size_t colon = text.rfind(':');
-  if (colon == text.npos || isThere(text) || !isThere(text.substr(0, colon))) return {text, {}};
-  return {text.substr(0, colon), text.substr(colon + 1)};
-}
 
 /// A number with commas between its thousands.
 std::string Grouped(std::uint64_t number) {
@@ -174,7 +158,7 @@ bool AreaOptions::IsGiven() const {
 }
 
 std::vector<std::string> AreaOptions::GetFiles() const {
-  return region_.empty() ? std::vector<std::string>() : std::vector{SplitRegion(region_).file};
+  return region_.empty() ? std::vector<std::string>() : std::vector{SplitLayer(region_).file};
 }
 
 RasterInfo AreaOptions::Plan(JobSession& session, const String& raster, const RasterInfo& info,
@@ -236,7 +220,7 @@ void AreaOptions::AddPlace(RasterChain& chain, Masks masks, const std::string& n
 }
 
 void AreaOptions::AddRegion(JobDraft& draft, const std::string& name) const {
-  const RegionName from = SplitRegion(region_);
+  const LayerName from = SplitLayer(region_);
   JobWriterCommand& region = draft.Open(name, "CreateGeometryROIDefCommand");
   region.AddInput("Vectors", String(AbsoluteName(from.file)));
   if (!from.layer.empty()) region.AddInput("Layer", String(from.layer));

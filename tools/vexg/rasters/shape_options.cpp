@@ -1,9 +1,21 @@
 #include "rasters/shape_options.h"
 
+#include <filesystem>
+
 #include "options/option_values.h"
 #include "rasters/raster_source.h"
 
 namespace lumo::host {
+
+LayerName SplitLayer(const std::string& text) {
+  const auto isThere = [](const std::string& file) {
+    std::error_code ignored;
+    return std::filesystem::exists(file, ignored);
+  };
+  const std::size_t colon = text.rfind(':');
+  if (colon == text.npos || isThere(text) || !isThere(text.substr(0, colon))) return {text, {}};
+  return {text.substr(0, colon), text.substr(colon + 1)};
+}
 
 void ShapeOptions::AddTo(OptionSet& line) {
   line.Add("shapes", file, "The file of shapes").IsFile("SHAPES").Required();

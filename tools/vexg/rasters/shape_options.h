@@ -7,6 +7,15 @@
 
 namespace lumo::host {
 
+/// A file of shapes, and a layer of it.
+struct LayerName {
+  std::string file;
+  std::string layer;  ///< empty where none is named
+};
+
+/// Splits FILE:LAYER; a file that is there needs no layer.
+LayerName SplitLayer(const std::string& text);
+
 /// Shapes as the command line names them.
 struct ShapeOptions {
   std::string file;

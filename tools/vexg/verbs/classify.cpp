@@ -11,6 +11,7 @@
 #include "rasters/raster_target.h"
 #include "rasters/raster_verb.h"
 #include "rasters/rule_file.h"
+#include "rasters/shape_options.h"
 
 namespace lumo::host {
 namespace {
@@ -28,21 +29,6 @@ std::vector<std::string> SplitAtCommas(const std::string& text) {
   }
   return parts;
 }
-
-/// "FILE", or "FILE:LAYER".
-struct SampleFile {
-  std::string file;
-  std::string layer;
-
-  explicit SampleFile(const std::string& text) : file(text) {
-    std::error_code ignored;
-    const std::size_t colon = text.rfind(':');
-    if (colon == text.npos || std::filesystem::exists(text, ignored)) return;
-    if (!std::filesystem::exists(text.substr(0, colon), ignored)) return;
-    file = text.substr(0, colon);
-    layer = text.substr(colon + 1);
-  }
-};
 
 class ClassifyVerb final : public RasterVerb {
  public:
@@ -109,7 +95,7 @@ class ClassifyVerb final : public RasterVerb {
   std::vector<std::string> GetFurtherInputs() const override {
     std::vector<std::string> inputs = files_;
     if (!rules_.empty()) inputs.push_back(rules_);
-    if (!training_.empty()) inputs.push_back(SampleFile(training_).file);
+    if (!training_.empty()) inputs.push_back(SplitLayer(training_).file);
     return inputs;
   }
   std::vector<std::string> GetFurtherOutputs() const override {
@@ -186,7 +172,7 @@ class ClassifyVerb final : public RasterVerb {
   }
 
   void AddExampleStep(JobDraft& draft, const String& labels) const {
-    const SampleFile samples(training_);
+    const LayerName samples = SplitLayer(training_);
     JobWriterCommand& find = draft.Step(kExampleStep, "FindClassExamplesCommand");
     find.AddVariableInput("LabelURI", labels);
     find.AddInput("Vectors", String(AbsoluteName(samples.file)));
@@ -208,7 +194,7 @@ class ClassifyVerb final : public RasterVerb {
     const auto counts = ParseValue<Array<unsigned>>(returns.Find("Counts"));
     for (std::size_t i = 0; i < classes_.size(); ++i) {
       if (counts[i] == 0) {
-        throw HostError(kExitFailed, SampleFile(training_).file + ": class \"" +
+        throw HostError(kExitFailed, SplitLayer(training_).file + ": class \"" +
                                          Printable(classes_[i].name) + "\" hits no region");
       }
     }
