@@ -17,7 +17,7 @@ struct VEXG_EXPORT BestMatchClassificationAlgorithm {
   static unsigned Pick(const float* scores, unsigned count);
 };
 
-/// What a region is painted with: attributes, and what is computed from them.
+/// Names what a region is painted with: attributes, and perhaps rules that compute scores of them.
 struct RegionPaint {
   const ChosenAttributes* columns = nullptr;
   const FuzzyRuleSet* rules = nullptr;  ///< null where attributes are painted as they are

@@ -16,7 +16,7 @@ namespace lumo {
 /// their mean band values.
 enum class SegmentAlgorithm : unsigned char { kSobel, kIntensity };
 
-/// What a segmentation is made with.
+/// Holds the settings of a segmentation.
 struct SegmentRequest {
   SegmentAlgorithm algorithm = SegmentAlgorithm::kSobel;
   LinearStretch stretch;             ///< from gradients to levels

@@ -3,8 +3,7 @@
 #include "foundation/scalar.h"
 #include "tasks/task.h"
 
-// What the stages of the feature extraction share: how they read the objects that they are made
-// from.
+// Readers of the objects that the stages of the feature extraction are made from.
 
 namespace lumo {
 

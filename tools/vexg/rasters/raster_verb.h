@@ -46,7 +46,7 @@ class RasterVerb : public FileVerb {
   virtual const char* GetKeptDetails() const { return "All"; }
   /// Adds inputs to the command that makes the file, and commands behind it.
   virtual void AddToCreate(JobDraft& /*draft*/, JobWriterCommand& /*create*/) const {}
-  /// What the step kMakeStep works on.
+  /// Holds what the step kMakeStep works on.
   struct Making {
     const String& shown;       ///< variable of the raster that is shown
     const std::string& file;   ///< that is made; other files beside it, under its name and a

@@ -13,7 +13,7 @@ namespace {
 
 constexpr const char* kCompareStep = "compare";
 
-/// What AccuracyCommand gives.
+/// Holds what AccuracyCommand gives.
 struct Report {
   std::vector<std::string> classes;
   Array<unsigned> matrix;
