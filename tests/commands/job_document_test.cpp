@@ -1,3 +1,5 @@
+#include <random>
+
 #include "commands/job_writer.h"
 #include "platform/shared_memory.h"
 #include "support/test_commands.h"
@@ -109,8 +111,7 @@ TEST(JobResult, AnEmptyJobHasABareResult) {
 class Channel {
  public:
   explicit Channel(unsigned size)
-      : name("vexg-test-" + std::to_string(::testing::UnitTest::GetInstance()->random_seed()) +
-             "-" + std::to_string(size)),
+      : name("vexg-test-" + std::to_string(std::random_device()()) + "-" + std::to_string(size)),
         block(platform::SharedMemoryBlock::Create(name, size)) {
     if (block != nullptr) std::fill_n(block->GetData(), size, static_cast<unsigned char>(0x55));
   }
