@@ -9,7 +9,6 @@ namespace lumo {
 namespace {
 
 constexpr double kManyLevels = 65000;
-constexpr unsigned kLambdaBins = 10000;
 
 const CommandDeclaration kFit{
     "FitSegmentationCommand",

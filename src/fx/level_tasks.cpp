@@ -4,6 +4,7 @@
 #include <limits>
 
 #include "fx/task_setup.h"
+#include "fx/tile_shape.h"
 #include "platform/vector_clones.h"
 #include "tasks/task_errors.h"
 
@@ -12,15 +13,6 @@ namespace {
 
 constexpr double kLeastInt = std::numeric_limits<std::int32_t>::min();
 constexpr double kMostInt = std::numeric_limits<std::int32_t>::max();
-
-/// Sizes a tile like another one, and gives it the same states.
-bool SizeLike(const BasicTile& shape, BasicTile& tile) {
-  if (!tile.ResizeForOverwrite(shape.Dimensions())) return false;
-  std::ranges::copy(shape.StateArray(), tile.StateArray().begin());
-  tile.SetIndex(shape.Index());
-  tile.SetOrigin(shape.Origin());
-  return true;
-}
 
 VEXG_CHOOSING_VECTOR_CLONES
 void Stretch(const LinearStretch& by, const double* values, std::size_t count,

@@ -10,6 +10,9 @@ namespace lumo {
 /// "Sobel", "Intensity".
 VEXG_EXPORT std::span<const EnumWord<SegmentAlgorithm>> WordsOf(SegmentAlgorithm);
 
+/// The bins in which the costs of merges are counted.
+inline constexpr unsigned kLambdaBins = 10000;
+
 /// Helps the commands that segment.
 class VEXG_EXPORT SegmentCommand : public RasterCommand {
  protected:

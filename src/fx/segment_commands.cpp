@@ -43,8 +43,6 @@ String ScientificText(const T& value) {
   return String(out.str());
 }
 
-constexpr unsigned kLambdaBins = 10000;
-
 const CommandDeclaration kSegmentMerge{
     "FxTileSegmentMergeCommand",
     "Feature extraction",

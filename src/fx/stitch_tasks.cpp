@@ -3,6 +3,7 @@
 #include <algorithm>
 
 #include "fx/task_setup.h"
+#include "fx/tile_shape.h"
 #include "fx/watershed_task.h"
 #include "tasks/task_errors.h"
 
@@ -17,11 +18,7 @@ bool TakeTiles(const ArgList& args, TilePool<T>& pool, TilePtr<T>& labels, TileP
     return false;
   }
   result = pool.Take();
-  if (!result->ResizeForOverwrite(labels->Dimensions())) return false;
-  std::ranges::copy(labels->StateArray(), result->StateArray().begin());
-  result->SetIndex(labels->Index());
-  result->SetOrigin(labels->Origin());
-  return true;
+  return SizeLike(*labels, *result);
 }
 
 }  // namespace

@@ -1,8 +1,7 @@
 #include "fx/watershed_task.h"
 
-#include <algorithm>
-
 #include "fx/task_setup.h"
+#include "fx/tile_shape.h"
 #include "raster/pixel_states.h"
 #include "tasks/task_errors.h"
 
@@ -30,12 +29,7 @@ bool RasterTileWatershedTask<T>::Execute(ArgList& args) {
   const auto [column, row] = levels->Index();
   const std::size_t tile = std::size_t{row} * tilesAcross_ + column;
   const TilePtr<T> labels = pool_.Take();
-  if (tile >= labelCounts_->GetCount() || !labels->ResizeForOverwrite(levels->Dimensions())) {
-    return false;
-  }
-  std::ranges::copy(levels->StateArray(), labels->StateArray().begin());
-  labels->SetIndex(levels->Index());
-  labels->SetOrigin(levels->Origin());
+  if (tile >= labelCounts_->GetCount() || !SizeLike(*levels, *labels)) return false;
   (*labelCounts_)[tile] =
       1 + watersheds_.Borrow()->Label(levels->PixelArray().GetData(), FindExcluded(*levels),
                                       static_cast<std::uint32_t>(levels->FullWidth()),
