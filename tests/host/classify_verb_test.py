@@ -4,6 +4,7 @@ import json
 import random
 import subprocess
 import unittest
+from xml.etree import ElementTree
 
 from support import FolderTest, needs_gdal
 
@@ -75,6 +76,15 @@ class ClassifyVerbTest(FolderTest):
         self.assertIn("1: forest", subprocess.run(["gdalinfo", self.folder / "copy.tif"], check=True, capture_output=True,
                                                   text=True).stdout)
 
+    def test_components_find_the_fields(self):
+        self.fine(*self.classify(*self.training(), "--method", "pca", "--polygons", self.folder / "map.gpkg", "-q"))
+        self.assertGreater(self.accuracy()["overall"]["share"], 0.95)
+        style = ElementTree.parse(self.folder / "map.qml").getroot()
+        self.assertEqual([(c.get("value"), c.get("label")) for c in style.iter("category")],
+                         [(str(i), name) for i, name in enumerate(["unclassified", *sorted(CLASSES)])])
+        self.assertEqual(len({s.find("layer/prop[@k='color']").get("v") for s in style.iter("symbol")}), 4)
+        self.fails(2, "--neighbors goes with", *self.classify(*self.training(), "--method", "pca", "--neighbors", 3))
+
     def test_rules_find_the_fields(self):
         rules = {"classes": [{"name": "water", "color": "#0000ff"}, {"name": "forest", "color": "green"}, {"name": "town"}],
                  "rules": [
@@ -95,12 +105,12 @@ class ClassifyVerbTest(FolderTest):
         good = {"classes": [{"name": "a"}], "rules": [{"class": "a", "tests": [{"attribute": "area", "atLeast": 1}]}]}
         for words, text in (
                 ("wrong.json: line 2 is no JSON", '{"classes": [],\n "rules": [}'),
-                ("wrong.json: \"rules\" is missing", json.dumps({"classes": [{"name": "a"}]})),
-                ("wrong.json.classes[0]: \"name\" is missing", json.dumps({**good, "classes": [{"color": "red"}]})),
-                ("wrong.json.rules[0].class: there is no class", json.dumps({**good, "rules": [{"class": "b", "tests": good["rules"][0]["tests"]}]})),
-                ("wrong.json.rules[0].tests[0].attribute: there is no attribute \"aera\"; did you mean",
+                ("wrong.json: line 1: \"rules\" is missing", json.dumps({"classes": [{"name": "a"}]})),
+                ("wrong.json: line 1: classes[0]: \"name\" is missing", json.dumps({**good, "classes": [{"color": "red"}]})),
+                ("wrong.json: line 1: rules[0].class: there is no class", json.dumps({**good, "rules": [{"class": "b", "tests": good["rules"][0]["tests"]}]})),
+                ("wrong.json: line 1: rules[0].tests[0].attribute: there is no attribute \"aera\"; did you mean",
                  json.dumps(good).replace('"area"', '"aera"')),
-                ("wrong.json.rules[0].tests[0].atLeast: a number is expected", json.dumps(good).replace("1}", '"x"}')),
+                ("wrong.json: line 13: rules[0].tests[0].atLeast: a number is expected", json.dumps(good, indent=1).replace("atLeast\": 1", 'atLeast": "x"')),
                 ("there is no \"wieght\" here", json.dumps(good).replace('"atLeast"', '"wieght": 1, "atLeast"'))):
             rules.write_text(text)
             with self.subTest(words):

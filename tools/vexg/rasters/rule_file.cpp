@@ -4,87 +4,21 @@
 #include <cmath>
 
 #include "foundation/near_name.h"
-#include "jobs/document.h"
-#include "output/json_number.h"
 #include "verb.h"
 
 namespace lumo::host {
 namespace {
 
-/// A part of a file of rules, which knows where it stands.
-class Field {
- public:
-  Field(const Json& json, std::string path) : json_(json), path_(std::move(path)) {}
-
-  [[noreturn]] void Refuse(const std::string& why) const {
-    throw HostError(kExitUsage, path_ + ": " + why);
-  }
-
-  bool Has(const char* name) const { return json_.is_object() && json_.contains(name); }
-  Field Get(const char* name) const {
-    if (!Has(name)) Refuse(std::string("\"") + name + "\" is missing");
-    return {json_.at(name), path_ + "." + name};
-  }
-  std::vector<Field> List() const {
-    if (!json_.is_array() || json_.empty()) Refuse("a list of one or more is expected");
-    std::vector<Field> all;
-    for (std::size_t i = 0; i < json_.size(); ++i) {
-      all.emplace_back(json_[i], path_ + "[" + std::to_string(i) + "]");
-    }
-    return all;
-  }
-  std::string Text() const {
-    if (!json_.is_string()) Refuse("a text is expected");
-    return json_.get<std::string>();
-  }
-  double Number() const {
-    if (!json_.is_number()) Refuse("a number is expected");
-    return json_.get<double>();
-  }
-  double NumberOr(const char* name, double otherwise) const {
-    return Has(name) ? Get(name).Number() : otherwise;
-  }
-  /// Refuses members that mean nothing.
-  void Allow(std::initializer_list<const char*> names) const {
-    if (!json_.is_object()) Refuse("an object is expected");
-    for (const auto& [key, value] : json_.items()) {
-      const bool isKnown =
-          std::any_of(names.begin(), names.end(), [&](const char* name) { return key == name; });
-      if (!isKnown) Refuse("there is no \"" + key + "\" here");
-    }
-  }
-  const std::string& Path() const { return path_; }
-
- private:
-  const Json& json_;
-  std::string path_;
-};
-
-Color ReadColor(const Field& field) {
-  const std::string text = field.Text();
-  const bool isHex = text.size() == 7 && text[0] == '#' &&
-                     text.find_first_not_of("0123456789abcdefABCDEF", 1) == text.npos;
-  if (!isHex) {
-    const Color named = FindNamedColor(String(text));
-    if (named.isNull) field.Refuse("a colour is #rrggbb, or a name such as green");
-    return named;
-  }
-  const auto part = [&](std::size_t at) {
-    return static_cast<std::uint8_t>(std::stoul(text.substr(at, 2), nullptr, 16));
-  };
-  return {String("class"), part(1), part(3), part(5)};
-}
-
 constexpr const char* kComparisons[] = {"between", "atLeast", "atMost", "outside"};
 constexpr const char* kMemberships[] = {"crisp", "linear", "sCurve"};
 
 /// Adds the row of a test.
-void AddTest(const Field& test, unsigned rule, const AttributePlaces& places,
+void AddTest(const JsonField& test, unsigned rule, const AttributePlaces& places,
              std::vector<float>& row) {
   test.Allow({"attribute", "between", "atLeast", "atMost", "outside", "membership", "tolerance",
               "weight"});
-  const Field attribute = test.Get("attribute");
-  const AttributePlaces::Place place = places.Find(attribute.Text(), attribute.Path());
+  const JsonField attribute = test.Get("attribute");
+  const AttributePlaces::Place place = places.Find(attribute.Text(), attribute.Where());
   const char* const* const comparison =
       std::find_if(std::begin(kComparisons), std::end(kComparisons),
                    [&](const char* name) { return test.Has(name); });
@@ -92,18 +26,17 @@ void AddTest(const Field& test, unsigned rule, const AttributePlaces& places,
     test.Refuse("one of \"between\", \"atLeast\", \"atMost\" and \"outside\" is missing");
   }
   const auto number = comparison - kComparisons;
-  const Field bound = test.Get(*comparison);
+  const JsonField bound = test.Get(*comparison);
   double a = 0, b = 0;
   if (number == 0 || number == 3) {
-    const std::vector<Field> both = bound.List();
+    const std::vector<JsonField> both = bound.List();
     if (both.size() != 2) bound.Refuse("two numbers are expected");
     a = both[0].Number();
     b = both[1].Number();
   } else {
     a = bound.Number();
   }
-  std::string membership = kMemberships[0];
-  if (test.Has("membership")) membership = test.Get("membership").Text();
+  const std::string membership = test.TextOr("membership", kMemberships[0]);
   const auto* const kind = std::find(std::begin(kMemberships), std::end(kMemberships), membership);
   if (kind == std::end(kMemberships)) {
     test.Get("membership").Refuse("it is crisp, linear or sCurve");
@@ -119,17 +52,6 @@ Array<float> ArrayOfRows(const std::vector<float>& numbers, unsigned columns) {
   Array<float> rows{ArrayDims(static_cast<unsigned>(numbers.size()) / columns, columns)};
   std::copy(numbers.begin(), numbers.end(), rows.begin());
   return rows;
-}
-
-Json ParseRules(const std::string& file) {
-  const std::string text = ReadFile(file);
-  try {
-    return Json::parse(text);
-  } catch (const nlohmann::json::parse_error& error) {
-    const std::size_t end = std::min(error.byte, text.size());
-    const auto line = 1 + std::count(text.begin(), text.begin() + static_cast<long>(end), '\n');
-    throw HostError(kExitUsage, file + ": line " + std::to_string(line) + " is no JSON");
-  }
 }
 
 }  // namespace
@@ -161,23 +83,21 @@ std::vector<AttributePlaces::Place> AttributePlaces::All() const {
   return all;
 }
 
-RuleFile ReadRules(const std::string& file, const AttributePlaces& places) {
-  const Json json = ParseRules(file);
-  const Field root(json, file);
+RuleFile ReadRules(const JsonField& root, const AttributePlaces& places) {
   root.Allow({"$schema", "classes", "rules"});
   RuleFile rules;
   std::vector<float> classRows, ruleRows, testRows;
-  for (const Field& field : root.Get("classes").List()) {
+  for (const JsonField& field : root.Get("classes").List()) {
     field.Allow({"name", "color", "threshold"});
     const auto index = static_cast<unsigned>(rules.classes.size());
     rules.classes.push_back(
         {field.Get("name").Text(),
-         field.Has("color") ? ReadColor(field.Get("color")) : ColorOfClass(index),
+         field.Has("color") ? field.Get("color").AsColor() : ColorOfClass(index),
          field.NumberOr("threshold", 0)});
     classRows.push_back(static_cast<float>(rules.classes.back().threshold));
   }
   unsigned number = 0;
-  for (const Field& field : root.Get("rules").List()) {
+  for (const JsonField& field : root.Get("rules").List()) {
     field.Allow({"class", "weight", "tests"});
     const std::string name = field.Get("class").Text();
     const auto found = std::find_if(rules.classes.begin(), rules.classes.end(),
@@ -186,7 +106,7 @@ RuleFile ReadRules(const std::string& file, const AttributePlaces& places) {
       field.Get("class").Refuse("there is no class \"" + name + "\"");
     ruleRows.push_back(static_cast<float>(found - rules.classes.begin()));
     ruleRows.push_back(static_cast<float>(field.NumberOr("weight", 1)));
-    for (const Field& test : field.Get("tests").List()) AddTest(test, number, places, testRows);
+    for (const JsonField& test : field.Get("tests").List()) AddTest(test, number, places, testRows);
     ++number;
   }
   rules.classRows = ArrayOfRows(classRows, 1);

@@ -5,6 +5,7 @@
 
 #include "foundation/array.h"
 #include "foundation/color.h"
+#include "rasters/json_file.h"
 
 namespace lumo::host {
 
@@ -46,9 +47,9 @@ struct RuleFile {
   Array<float> classRows, ruleRows, testRows;
 };
 
-/// Reads a JSON file of rules; resources/rules.schema.json describes it. Throws HostError, which
-/// names the line or the field of what is wrong.
-RuleFile ReadRules(const std::string& file, const AttributePlaces& places);
+/// Reads rules; resources/schemas/rules.schema.json describes them. Throws HostError, which names
+/// the line and the field of what is wrong.
+RuleFile ReadRules(const JsonField& root, const AttributePlaces& places);
 
 /// A colour of its own for each of some classes.
 Color ColorOfClass(unsigned index);

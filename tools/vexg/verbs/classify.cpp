@@ -4,21 +4,15 @@
 
 #include <fmt/format.h>
 
-#include "foundation/near_name.h"
-#include "fx/attribute_names.h"
 #include "options/option_values.h"
 #include "raster/pixel_types.h"
+#include "rasters/class_steps.h"
 #include "rasters/raster_target.h"
 #include "rasters/raster_verb.h"
-#include "rasters/rule_file.h"
 #include "rasters/shape_options.h"
 
 namespace lumo::host {
 namespace {
-
-constexpr const char* kExampleStep = "examples";
-constexpr const char* kScoreStep = "score";
-constexpr std::size_t kMostClasses = 254;
 
 std::vector<std::string> SplitAtCommas(const std::string& text) {
   std::vector<std::string> parts;
@@ -54,7 +48,13 @@ class ClassifyVerb final : public RasterVerb {
     line.Add("--training", training_, "Samples of known classes, points or shapes")
         .Shows("SAMPLES[:LAYER]");
     line.Add("--class-field", field_, "The field with the class of a sample").Shows("FIELD");
-    line.Add("--neighbors", neighbors_, "How many examples vote").Within(1, 1000000).ShowsDefault();
+    line.Add("--method", request_.method,
+             "How samples make classes: knn, the votes of the nearest examples; pca, linear "
+             "discriminants of the principal components of the attributes")
+        .Takes(OneOf({"knn", "pca"}))
+        .ShowsDefault();
+    line.Add("--neighbors", neighbors_, "With knn, how many examples vote; 5 by default")
+        .Within(1, 1000000);
     line.Add("--use", use_, "The attributes that examples are compared by; all by default")
         .Shows("NAME,NAME...")
         .Example("mean_b0,area");
@@ -69,6 +69,12 @@ class ClassifyVerb final : public RasterVerb {
     if (rules_.empty() == training_.empty()) refuse("either --rules or --training is wanted");
     if (training_.empty() != field_.empty()) refuse("--training and --class-field go together");
     if (!rules_.empty() && !use_.empty()) refuse("--use goes with --training");
+    if (!rules_.empty() && request_.method != "knn") refuse("--method goes with --training");
+    if (neighbors_ && (!rules_.empty() || request_.method != "knn")) {
+      refuse("--neighbors goes with --training by knn");
+    }
+    request_.neighbors = neighbors_.value_or(request_.neighbors);
+    request_.samples = {training_, field_};
     FindFiles();
     RasterVerb::CheckOptions();
   }
@@ -78,37 +84,40 @@ class ClassifyVerb final : public RasterVerb {
     std::error_code ignored;
     for (const std::string& name : attributes_) {
       if (std::filesystem::is_regular_file(name, ignored)) {
-        files_.push_back(name);
+        request_.files.push_back(name);
         continue;
       }
-      const std::size_t before = files_.size();
+      const std::size_t before = request_.files.size();
       for (const char* const kind : {"spectral", "texture", "shape"}) {
         const std::string file = name + "." + kind + ".fxa";
-        if (std::filesystem::is_regular_file(file, ignored)) files_.push_back(file);
+        if (std::filesystem::is_regular_file(file, ignored)) request_.files.push_back(file);
       }
-      if (files_.size() == before) {
+      if (request_.files.size() == before) {
         throw HostError(kExitFailed, name + ": there are no attributes of this name");
       }
     }
   }
 
   std::vector<std::string> GetFurtherInputs() const override {
-    std::vector<std::string> inputs = files_;
+    std::vector<std::string> inputs = request_.files;
     if (!rules_.empty()) inputs.push_back(rules_);
     if (!training_.empty()) inputs.push_back(SplitLayer(training_).file);
     return inputs;
   }
   std::vector<std::string> GetFurtherOutputs() const override {
     std::vector<std::string> outputs;
-    if (!polygons_.empty()) outputs.push_back(polygons_);
+    if (!polygons_.empty()) {
+      outputs.push_back(polygons_);
+      outputs.push_back(StyleNameOf(polygons_));
+    }
     if (!scores_.empty()) outputs.push_back(scores_);
     return outputs;
   }
 
   void AddQuestions(JobDraft& draft) const override {
-    for (std::size_t i = 0; i < files_.size(); ++i) {
+    for (std::size_t i = 0; i < request_.files.size(); ++i) {
       draft.Step(fmt::format("file{}", i), "QueryAttributesCommand")
-          .AddInput("AttributeFXA", String(AbsoluteName(files_[i])));
+          .AddInput("AttributeFXA", String(AbsoluteName(request_.files[i])));
     }
   }
 
@@ -118,21 +127,21 @@ class ClassifyVerb final : public RasterVerb {
       throw HostError(kExitFailed, GetSource().file + ": labels are of type Int32");
     }
     AttributePlaces places;
-    for (std::size_t i = 0; i < files_.size(); ++i) {
+    for (std::size_t i = 0; i < request_.files.size(); ++i) {
       const auto& returns = opened.Find(String(fmt::format("file{}", i))).returns;
-      AddColumns(files_[i], ParseValue<unsigned>(returns.Find("Bands")),
+      AddColumns(request_.files[i], ParseValue<unsigned>(returns.Find("Bands")),
                  ParseValue<unsigned>(returns.Find("Attributes")), places);
     }
-    if (!rules_.empty()) {
-      ruleFile_ = ReadRules(rules_, places);
-      classes_ = ruleFile_.classes;
+    if (request_.HasRules()) {
+      request_.rules = ReadRules(JsonFile(rules_).GetRoot(), places);
+      request_.classes = request_.rules.classes;
     } else {
-      ChooseAttributes(places);
+      request_.used = RowsOf(SplitAtCommas(use_), "--use", places);
       FindExamples(session, URIOf(opened, "$source"));
     }
-    if (classes_.size() > kMostClasses) {
+    if (request_.classes.size() > kMostClasses) {
       throw HostError(kExitFailed, fmt::format("there are {} classes; a map has {} at most",
-                                               classes_.size(), kMostClasses));
+                                               request_.classes.size(), kMostClasses));
     }
     RasterInfo planned = source;
     planned.bands = 1;
@@ -140,161 +149,41 @@ class ClassifyVerb final : public RasterVerb {
     return planned;
   }
 
-  static void AddColumns(const std::string& file, unsigned bands, unsigned attributes,
-                         AttributePlaces& places) {
-    AttributeKind kind{};
-    std::vector<std::string> columns;
-    if (!FindKind(file, attributes, kind)) {
-      throw HostError(kExitFailed, file + ": its attributes have no names");
-    }
-    const auto names = NamesOf(kind);
-    for (unsigned band = 0; band < bands; ++band) {
-      for (unsigned i = 0; i < attributes; ++i) {
-        columns.push_back(i < names.size() ? ColumnName(kind, names[i], band) : std::string());
-      }
-    }
-    places.AddFile(columns, attributes);
-  }
-
-  void ChooseAttributes(const AttributePlaces& places) {
-    std::vector<AttributePlaces::Place> chosen;
-    for (const std::string& name : SplitAtCommas(use_)) {
-      chosen.push_back(places.Find(name, "--use"));
-    }
-    if (chosen.empty()) chosen = places.All();
-    used_.Resize(ArrayDims(static_cast<unsigned>(chosen.size()), 3));
-    unsigned at = 0;
-    for (const auto& place : chosen) {
-      used_[at++] = place.file;
-      used_[at++] = place.attribute;
-      used_[at++] = place.band;
-    }
-  }
-
-  void AddExampleStep(JobDraft& draft, const String& labels) const {
-    const LayerName samples = SplitLayer(training_);
-    JobWriterCommand& find = draft.Step(kExampleStep, "FindClassExamplesCommand");
-    find.AddVariableInput("LabelURI", labels);
-    find.AddInput("Vectors", String(AbsoluteName(samples.file)));
-    find.AddInput("ClassField", String(field_));
-    find.AddOutput("ExampleDefinition", "$examples");
-    if (!samples.layer.empty()) find.AddInput("Layer", String(samples.layer));
-  }
-
   /// Finds the examples in advance, to know the classes.
   void FindExamples(JobSession& session, const String& labels) {
     JobDraft draft;
-    AddExampleStep(draft, labels);
-    const JobResults results = session.Run(draft);
-    const auto& returns = results.Find(kExampleStep).returns;
-    for (const String& name : ParseValue<Array<String>>(returns.Find("Classes"))) {
-      const auto index = static_cast<unsigned>(classes_.size());
-      classes_.push_back({name.ToUTF8(), ColorOfClass(index), 0});
-    }
-    const auto counts = ParseValue<Array<unsigned>>(returns.Find("Counts"));
-    for (std::size_t i = 0; i < classes_.size(); ++i) {
-      if (counts[i] == 0) {
-        throw HostError(kExitFailed, SplitLayer(training_).file + ": class \"" +
-                                         Printable(classes_[i].name) + "\" hits no region");
-      }
-    }
-    const auto outside = ParseValue<unsigned>(returns.Find("Outside"));
-    const auto conflicts = ParseValue<unsigned>(returns.Find("Conflicts"));
-    if (outside != 0) Say(fmt::format("{}: {} samples hit no region", training_, outside));
-    if (conflicts != 0) {
-      Say(fmt::format(
-          "{}: {} regions are hit by samples of several classes; each is taken for that "
-          "of most pixels",
-          training_, conflicts));
-    }
+    AddExamples(draft, request_.samples, labels);
+    std::vector<std::string> said;
+    request_.classes = TakeClasses(session.Run(draft), request_.samples, said);
+    for (const std::string& line : said) Say(line);
   }
 
   const char* GetKeptDetails() const override { return "Told"; }
   FillValues GetNoData(const FillValues& /*chosen*/) const override {
-    return {static_cast<double>(classes_.size() + 1)};
+    return {static_cast<double>(request_.classes.size() + 1)};
   }
   bool MayChooseNoData() const override { return false; }
   const char* GetFirstStep() const override { return kScoreStep; }
 
   void AddToCreate(JobDraft& draft, JobWriterCommand& create) const override {
-    create.AddInput("DataType", DataTypeName(kDataTypeOf<std::uint8_t>));
-    create.AddInput("Bands", 1U);
-    Palette palette;
-    palette.Append(Color(String("none"), 0, 0, 0));
-    std::string names = "unclassified";
-    for (const NamedClass& one : classes_) {
-      palette.Append(one.color);
-      std::string name = one.name;
-      std::replace(name.begin(), name.end(), '|', '/');  // which parts texts of a list
-      names += "|" + name;
-    }
-    create.AddInput("Categories", String(names));
-    JobWriterCommand& set = draft.Step("palette", "SetRasterPaletteCommand");
-    set.AddInput("URI", String("$target"));
-    set.AddInput("Band", 0U);
-    set.AddInput("Palette", palette);
-  }
-
-  static std::string ListOf(const std::vector<std::string>& files) {
-    std::string list;
-    for (const std::string& file : files) {
-      if (!list.empty()) list += '|';
-      list += AbsoluteName(file);
-    }
-    return list;
+    AddClasses(draft, create, request_.classes);
   }
 
   std::vector<std::string> GetLeftovers() const override {
     std::vector<std::string> endings;
     if (scores_.empty()) endings.push_back(kScoresEnding);
-    for (std::size_t i = 0; i < files_.size(); ++i) endings.push_back(StatisticsEnding(i));
+    for (std::size_t i = 0; i < request_.files.size(); ++i) endings.push_back(StatisticsEnding(i));
     return endings;
   }
   static std::string StatisticsEnding(std::size_t file) { return fmt::format(".{}.fxas", file); }
 
   void AddMaking(JobDraft& draft, const Making& making) const override {
-    const String scores(AbsoluteName(making.file + kScoresEnding));
-    if (rules_.empty()) {
-      AddNearest(draft, making, scores);
-    } else {
-      AddRules(draft, scores);
+    ScoreFiles files{making.file + kScoresEnding, {}};
+    for (std::size_t i = 0; i < request_.files.size(); ++i) {
+      files.statistics.push_back(making.file + StatisticsEnding(i));
     }
-    JobWriterCommand& paint = draft.Step(kMakeStep, "FxCreateRegionClassificationRasterCommand");
-    paint.AddVariableInput("LabelURI", making.shown);
-    paint.AddInput("ClassFXC", scores);
-    paint.AddVariableInput("OutURI", "$target");
-  }
-
-  void AddRules(JobDraft& draft, const String& scores) const {
-    JobWriterCommand& score = draft.Step(kScoreStep, "FxComputeFuzzyClassificationCommand");
-    score.AddInput("ClassDefinition", ruleFile_.classRows);
-    score.AddInput("RuleDefinition", ruleFile_.ruleRows);
-    score.AddInput("AttributesFXA", String(ListOf(files_)));
-    score.AddInput("AttributeDefinition", ruleFile_.testRows);
-    Array<unsigned> all{ArrayDims(1)};
-    all[0] = 0xFFFFFFFF;
-    score.AddInput("LabelValues", all);
-    score.AddInput("ClassFXC", scores);
-  }
-
-  void AddNearest(JobDraft& draft, const Making& making, const String& scores) const {
-    AddExampleStep(draft, making.shown);
-    std::vector<std::string> statistics;
-    for (std::size_t i = 0; i < files_.size(); ++i) {
-      statistics.push_back(AbsoluteName(making.file + StatisticsEnding(i)));
-      JobWriterCommand& stats =
-          draft.Step(fmt::format("stats{}", i), "FxComputeAttributesStatsCommand");
-      stats.AddInput("AttributeFXA", String(AbsoluteName(files_[i])));
-      stats.AddInput("StatsFXAS", String(statistics.back()));
-    }
-    JobWriterCommand& score = draft.Step(kScoreStep, "FxComputeKNNClassificationCommand");
-    score.AddVariableInput("ExampleDefinition", "$examples");
-    score.AddInput("Neighbors", neighbors_);
-    score.AddInput("AttributesFXA", String(ListOf(files_)));
-    score.AddInput("StatsFXAS", String(ListOf(statistics)));
-    score.AddInput("AttributeDefinition", used_);
-    score.AddInput("ClassFXC", scores);
-    score.AddInput("Scores", String("Votes"));
+    AddScores(draft, request_, making.shown, files);
+    AddPainting(draft, kMakeStep, making.shown, files.scores);
   }
 
   RasterContents ReadWanted(const JobResults& results) const override {
@@ -322,10 +211,7 @@ class ClassifyVerb final : public RasterVerb {
                   const std::vector<std::string>& files) const override {
     if (polygons_.empty()) return;
     AddOpen(draft, "map", {made.file, made.format});
-    JobWriterCommand& polygons = draft.Step("polygons", "PolygonizeCommand");
-    polygons.AddVariableInput("URI", "$map");
-    polygons.AddInput("Vectors", String(files.front()));
-    polygons.AddInput("Field", String("class"));
+    AddClassPolygons(draft, "$map", files[0], files[1], request_.classes);
     draft.Close("close.map", "$map");
   }
 
@@ -340,12 +226,9 @@ class ClassifyVerb final : public RasterVerb {
 
   std::vector<std::string> attributes_;
   std::string rules_, training_, field_, use_, polygons_, scores_;
-  unsigned neighbors_ = 5;
+  std::optional<unsigned> neighbors_;
 
-  std::vector<std::string> files_;  // of attributes
-  std::vector<NamedClass> classes_;
-  RuleFile ruleFile_;
-  Array<unsigned> used_;  // rows of file, attribute and band
+  ClassRequest request_;
 };
 
 const VerbRegistration registration("classify", "Gives the regions of a label raster classes",
