@@ -7,6 +7,7 @@
 #include "foundation/near_name.h"
 #include "options/option_values.h"
 #include "output/json_number.h"
+#include "rasters/attribute_steps.h"
 #include "rasters/file_verb.h"
 #include "rasters/raster_target.h"
 #include "rasters/vector_info.h"
@@ -171,11 +172,11 @@ class AttributesVerb final : public FileVerb {
         .IsFile("LABELS")
         .Required();
     line.Add("--output,-o", name_, "The files without their endings").IsFile("NAME");
-    line.Add("--spectral", wantsSpectral_, "Mean, deviation, minimum, maximum and count");
-    line.Add("--texture", wantsTexture_, "Range, mean, variance and entropy of windows");
-    line.Add("--kernel", kernel_, "Side of the windows, in pixels").ShowsDefault();
-    line.Add("--shape", wantsShape_, "Area, perimeter, compactness and so on");
-    line.Add("--index", indices_,
+    line.Add("--spectral", request_.spectral, "Mean, deviation, minimum, maximum and count");
+    line.Add("--texture", request_.texture, "Range, mean, variance and entropy of windows");
+    line.Add("--kernel", request_.kernel, "Side of the windows, in pixels").ShowsDefault();
+    line.Add("--shape", request_.shape, "Area, perimeter, compactness and so on");
+    line.Add("--index", request_.indices,
              "Spectral values of what an expression makes of the bands, see vexg calc; may come "
              "again")
         .Shows("NAME=EXPRESSION")
@@ -260,42 +261,17 @@ class AttributesVerb final : public FileVerb {
       throw HostError(kExitUsage,
                       "--json, --band and --attribute are for info, stats and hist of a file");
     }
-    for (const std::string& index : indices_) {
-      const std::size_t equals = index.find('=');
-      const bool isNamed = equals != 0 && equals != index.npos && index[equals + 1] != '=' &&
-                           index.find_first_not_of(kNameLetters) == equals;
-      if (!isNamed || index.find(';') != index.npos) {
-        throw HostError(kExitUsage, fmt::format("--index: \"{}\" isn't of the form NAME=EXPRESSION",
-                                                Printable(index)));
-      }
-    }
-    if (!wantsSpectral_ && !wantsTexture_ && !wantsShape_ && indices_.empty())
-      wantsSpectral_ = wantsShape_ = true;
+    for (const std::string& index : request_.indices) CheckIndex(index, "--index");
+    if (!request_.spectral && !request_.texture && !request_.shape && request_.indices.empty())
+      request_.spectral = request_.shape = true;
     if (!table_.empty() && (!IsVectorName(table_) || table_.ends_with(".fxv"))) {
       throw HostError(kExitUsage, table_ + ": --table: no vector format has this ending");
     }
   }
 
-  /// The files to make, by the inputs of the commands.
-  struct Made {
-    const char* input;
-    std::string file;
-  };
-  std::vector<Made> GetMade() const {
-    std::vector<Made> made;
-    if (wantsSpectral_) made.push_back({"SpectralFXA", name_ + ".spectral.fxa"});
-    if (wantsTexture_) {
-      made.push_back({"TextureFXA", name_ + ".texture.fxa"});
-      made.push_back({"EntropyFXA", name_ + ".entropy.fxa"});
-    }
-    if (!indices_.empty()) made.push_back({"IndexFXA", name_ + ".index.fxa"});
-    if (wantsShape_) made.push_back({"SpatialFXA", name_ + ".shape.fxa"});
-    return made;
-  }
-
   std::vector<std::string> GetOutputs() const override {
     std::vector<std::string> outputs;
-    for (const Made& made : GetMade()) outputs.push_back(made.file);
+    for (const AttributeFile& made : FilesOf(request_, name_)) outputs.push_back(made.file);
     if (!table_.empty()) outputs.push_back(table_);
     return outputs;
   }
@@ -312,28 +288,23 @@ class AttributesVerb final : public FileVerb {
   void Plan(JobSession& /*session*/, const JobResults& opened) override {
     const RasterInfo scene = ReadInfo(opened, "source");
     const RasterInfo labels = ReadInfo(opened, "labels");
-    bands_ = ParseBands(bandsText_, scene);
+    request_.bands = ParseBands(bandsText_, scene);
+    request_.hasBands = !bandsText_.empty();
     if (labels.samples != scene.samples || labels.lines != scene.lines) {
       throw HostError(kExitFailed,
                       fmt::format("{}: the labels have {} x {} pixels, the scene {} x {}", labels_,
                                   labels.samples, labels.lines, scene.samples, scene.lines));
     }
-    isNarrow_ = DispatchType(TypeList<std::uint8_t, std::int8_t, std::uint16_t, std::int16_t>{},
-                             labels.dataType, [&]<typename T>() { return true; });
-    if (!isNarrow_ && labels.dataType != kDataTypeOf<std::int32_t> &&
+    request_.isNarrow =
+        DispatchType(TypeList<std::uint8_t, std::int8_t, std::uint16_t, std::int16_t>{},
+                     labels.dataType, [&]<typename T>() { return true; });
+    if (!request_.isNarrow && labels.dataType != kDataTypeOf<std::int32_t> &&
         labels.dataType != kDataTypeOf<std::uint32_t>) {
       throw HostError(kExitFailed,
                       fmt::format("{}: labels are whole numbers of up to 32 bits, not {}", labels_,
                                   DataTypeName(labels.dataType).ToUTF8()));
     }
-    const GeoRefPtr geoRef = labels.geoRef.IsNull() ? scene.geoRef : labels.geoRef;
-    if (geoRef.IsNull() || geoRef->GetType() == GeoRef::kRpc) return;
-    pixelX_ = SizeOr1(geoRef->PixelSizeX());
-    pixelY_ = SizeOr1(geoRef->PixelSizeY());
-  }
-
-  static double SizeOr1(double size) {
-    return std::isfinite(size) && size != 0 ? std::abs(size) : 1;
+    request_.TakePixelSize(labels.geoRef.IsNull() ? scene.geoRef : labels.geoRef);
   }
 
   /// @param names  of the outputs, in their order.
@@ -341,92 +312,13 @@ class AttributesVerb final : public FileVerb {
     JobDraft draft;
     AddOpen(draft, "source", GetSource());
     AddOpen(draft, "labels", {labels_, ""});
-    const String labels = isNarrow_ ? "$whole" : "$labels";
-    if (isNarrow_) {
-      draft.Open("whole", "CreateLabelsRasterCommand").AddVariableInput("SrcURI", "$labels");
-    }
-    const std::vector<Made> made = GetMade();
-    const auto addFiles = [&](JobWriterCommand& step, bool (*belongs)(const std::string&)) {
-      for (std::size_t i = 0; i < made.size(); ++i) {
-        if (belongs(made[i].input)) step.AddInput(made[i].input, String(names[i]));
-      }
-    };
-    const auto isShape = [](const std::string& input) { return input == "SpatialFXA"; };
-    const auto isOfBands = [](const std::string& input) {
-      return input != "SpatialFXA" && input != "IndexFXA";
-    };
-    const auto isAny = [](const std::string&) { return true; };
-    if (wantsSpectral_ || wantsTexture_) {
-      if (!bandsText_.empty()) AddBandView(draft, "bands", "$source", bands_);
-      JobWriterCommand& pixels = draft.Step("pixels", "FxComputePixelAttributesCommand");
-      pixels.AddVariableInput("SrcURI", bandsText_.empty() ? "$source" : "$bands");
-      pixels.AddVariableInput("LabelURI", labels);
-      pixels.AddInput("Values", String(!wantsTexture_    ? "spectral"
-                                       : !wantsSpectral_ ? "texture"
-                                                         : "spectral|texture"));
-      addFiles(pixels, isOfBands);
-      if (wantsTexture_) pixels.AddInput("TextureKernelSize", kernel_);
-      pixels.AddInput("Sums", String("Exact"));
-      if (!bandsText_.empty()) draft.Close("close.bands", "$bands");
-    }
-    if (!indices_.empty()) AddIndices(draft, labels, names);
-    if (wantsShape_) {
-      JobWriterCommand& shapes = draft.Step("shapes", "FxComputeVectorAttributesCommand");
-      shapes.AddVariableInput("LabelURI", labels);
-      addFiles(shapes, isShape);
-      shapes.AddInput("PixelXSize", pixelX_);
-      shapes.AddInput("PixelYSize", pixelY_);
-      shapes.AddInput("Parts", String("Together"));
-    }
-    if (!table_.empty()) {
-      JobWriterCommand& table = draft.Step("table", "CreateAttributeTableCommand");
-      table.AddInput("Table", String(names.back()));
-      addFiles(table, isAny);
-      if (!indices_.empty()) table.AddInput("IndexNames", String(IndexNames()));
-      if (!table_.ends_with(".csv")) table.AddVariableInput("LabelURI", labels);
-      if (!bandsText_.empty() && (wantsSpectral_ || wantsTexture_)) {
-        table.AddInput("Bands", bands_);
-      }
-    }
-    if (isNarrow_) draft.Close("close.whole", "$whole");
+    std::vector<AttributeFile> files = FilesOf(request_, name_);
+    for (std::size_t i = 0; i < files.size(); ++i) files[i].file = names[i];
+    AddAttributes(draft, request_, {"$source", "$labels"}, files,
+                  table_.empty() ? std::string() : names.back());
     draft.Close("close.labels", "$labels");
     draft.Close("close", "$source");
     return draft;
-  }
-
-  /// Adds the commands that compute the spectral values of expressions.
-  void AddIndices(JobDraft& draft, const String& labels,
-                  const std::vector<std::string>& names) const {
-    JobWriterCommand& view = draft.Open("index", "CreateExpressionRasterCommand");
-    view.AddExpandedInput("SrcURI", String("$source"));
-    std::string expressions;
-    for (const std::string& index : indices_) {
-      if (!expressions.empty()) expressions += ";";
-      expressions += index;
-    }
-    view.AddInput("Expressions", String(expressions));
-    JobWriterCommand& pixels = draft.Step("indices", "FxComputePixelAttributesCommand");
-    pixels.AddVariableInput("SrcURI", "$index");
-    pixels.AddVariableInput("LabelURI", labels);
-    pixels.AddInput("Values", String("spectral"));
-    const std::vector<Made> made = GetMade();
-    for (std::size_t i = 0; i < made.size(); ++i) {
-      if (std::string(made[i].input) == "IndexFXA") {
-        pixels.AddInput("SpectralFXA", String(names[i]));
-      }
-    }
-    pixels.AddInput("Sums", String("Exact"));
-    draft.Close("close.index", "$index");
-  }
-
-  /// The names in front of the expressions, as a list.
-  std::string IndexNames() const {
-    std::string names;
-    for (const std::string& index : indices_) {
-      if (!names.empty()) names += "|";
-      names += index.substr(0, index.find('='));
-    }
-    return names;
   }
 
   JobDraft GetJob(const Outputs& outputs) const override {
@@ -445,22 +337,10 @@ class AttributesVerb final : public FileVerb {
     session.Run(draft);
   }
 
-  static constexpr const char* kNameLetters =
-      "abcdefghijklmnopqrstuvwxyzABCDEFGHIJKLMNOPQRSTUVWXYZ0123456789_";
-
   std::string labels_, name_, bandsText_, table_, attribute_;
-  std::vector<std::string> indices_;
   std::optional<unsigned> band_;
-  unsigned kernel_ = 3;
-  bool wantsSpectral_ = false;
-  bool wantsTexture_ = false;
-  bool wantsShape_ = false;
   bool isJson_ = false;
-
-  bool isNarrow_ = false;  // the labels
-  Array<unsigned> bands_;
-  double pixelX_ = 1;
-  double pixelY_ = 1;
+  AttributeRequest request_;
 };
 
 const VerbRegistration registration("attributes",

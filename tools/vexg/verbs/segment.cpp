@@ -11,11 +11,11 @@
 #include "raster/pixel_types.h"
 #include "rasters/raster_target.h"
 #include "rasters/raster_verb.h"
+#include "rasters/segment_steps.h"
 
 namespace lumo::host {
 namespace {
 
-constexpr const char* kFitStep = "fit";
 constexpr const char* kGradientStep = "gradients";
 constexpr const char* kCostStep = "costs";
 
@@ -57,7 +57,8 @@ class SegmentVerb final : public RasterVerb {
     line.AddExample("vexg segment --estimate scene.tif -o curves.png");
     AddFilesTo(line, "The labels", false);
     line.Add("--tiled", isTiled_, "Segment tile by tile");
-    line.Add("--estimate", isEstimate_, "Say what percentages stand for, and make no labels");
+    line.Add("--estimate", request_.isEstimate,
+             "Say what percentages stand for, and make no labels");
     line.Add("--output,-o", picture_, "With --estimate: a picture of both curves, a PNG or JPEG")
         .IsFile("OUT.png|jpg");
     line.Add("--json", isJson_, "With --estimate: both curves as JSON");
@@ -65,22 +66,23 @@ class SegmentVerb final : public RasterVerb {
     line.Add("--bands", bandsText_, "Bands, from 0; all by default")
         .Shows("B,B...")
         .Example("3,2,1");
-    line.Add("--algorithm", algorithm_,
+    line.Add("--algorithm", request_.algorithm,
              "What is flooded: sobel, the largest gradient of the bands; intensity, their mean")
         .Takes(OneOf({"sobel", "intensity"}))
         .ShowsDefault();
-    line.Add("--segment-value", segmentValue_, "Gradients up to this one are one flat level")
+    line.Add("--segment-value", request_.segmentValue,
+             "Gradients up to this one are one flat level")
         .Shows("GRADIENT");
-    line.Add("--segment-percent", segmentPercent_,
+    line.Add("--segment-percent", request_.segmentPercent,
              "Percentage of the pixels whose gradients are one flat level")
         .Shows("P")
         .Example("20");
-    line.Add("--merge-value", mergeValue_, "Merge up to this cost; no merging by default")
+    line.Add("--merge-value", request_.mergeValue, "Merge up to this cost; no merging by default")
         .Shows("COST");
-    line.Add("--merge-percent", mergePercent_, "Percentage of all merges to do")
+    line.Add("--merge-percent", request_.mergePercent, "Percentage of all merges to do")
         .Shows("P")
         .Example("90");
-    line.Add("--merge-algorithm", mergeAlgorithm_,
+    line.Add("--merge-algorithm", request_.mergeAlgorithm,
              "schedule: the cheapest pair first, with new costs after each; rigorous: all pairs "
              "below "
              "--merge-value at once")
@@ -90,12 +92,14 @@ class SegmentVerb final : public RasterVerb {
              "A raster of the same size and pixel type whose bands drive merging, instead of "
              "INPUT's")
         .IsFile();
-    line.Add("--tile-memory", tileMemory_, "Bytes of the pixels of a tile; 8388608 by default")
+    line.Add("--tile-memory", request_.tileMemory,
+             "Bytes of the pixels of a tile; 8388608 by default")
         .Shows("BYTES");
-    line.Add("--tile-border", tileBorder_, "Overlap of tiles on each side, in pixels")
+    line.Add("--tile-border", request_.tileBorder, "Overlap of tiles on each side, in pixels")
         .Within(0, 65535)
         .ShowsDefault();
-    line.Add("--borders", isBorders_, "Make an image of the borders of segments, of 0 and 1");
+    line.Add("--borders", request_.isBorders,
+             "Make an image of the borders of segments, of 0 and 1");
     line.Add("--polygons", polygons_, "Make polygons of the segments as well, in this vector file")
         .IsFile("OUT");
     line.Add("--quicklook", quicklook_, "Draw the borders over the scene as well, in this picture")
@@ -105,21 +109,11 @@ class SegmentVerb final : public RasterVerb {
  private:
   void CheckOptions() override {
     const auto refuse = [](const std::string& line) { throw HostError(kExitUsage, line); };
-    if (segmentValue_ && segmentPercent_) {
-      refuse("--segment-value and --segment-percent exclude each other");
-    }
-    if (mergeValue_ && mergePercent_)
-      refuse("--merge-value and --merge-percent exclude each other");
-    for (const auto& [name, percent] :
-         {std::pair("--segment-percent", segmentPercent_), {"--merge-percent", mergePercent_}}) {
-      if (percent && !(*percent >= 0 && *percent <= 100)) {
-        refuse(std::string(name) + ": 0 to 100 percent");
-      }
-    }
+    request_.Check();
     if (!mergeRaster_.empty() && GetArea().IsGiven()) {
       refuse("--merge-raster goes with no area");
     }
-    if (isEstimate_) {
+    if (request_.isEstimate) {
       if (!GetTargetName().empty()) refuse("--estimate makes no labels");
       if (!polygons_.empty() || !quicklook_.empty()) refuse("--estimate makes one picture at most");
       if (!picture_.empty()) CheckPictureName(picture_);
@@ -128,7 +122,8 @@ class SegmentVerb final : public RasterVerb {
     if (GetTargetName().empty()) refuse("LABELS, the file to make, is missing");
     if (!isTiled_) refuse("--tiled is missing: segments are made tile by tile");
     if (!picture_.empty() || isJson_) refuse("-o and --json go with --estimate");
-    if (isBorders_ && !polygons_.empty()) refuse("--borders makes no segments for --polygons");
+    if (request_.isBorders && !polygons_.empty())
+      refuse("--borders makes no segments for --polygons");
     if (!quicklook_.empty()) CheckPictureName(quicklook_);
     RasterVerb::CheckOptions();
   }
@@ -137,11 +132,11 @@ class SegmentVerb final : public RasterVerb {
     return mergeRaster_.empty() ? std::vector<std::string>() : std::vector{mergeRaster_};
   }
   std::vector<std::string> GetOutputs() const override {
-    if (!isEstimate_) return RasterVerb::GetOutputs();
+    if (!request_.isEstimate) return RasterVerb::GetOutputs();
     return picture_.empty() ? std::vector<std::string>() : std::vector{picture_};
   }
   std::uint64_t GetBytes(std::size_t output) const override {
-    return isEstimate_ ? 0 : RasterVerb::GetBytes(output);
+    return request_.isEstimate ? 0 : RasterVerb::GetBytes(output);
   }
   std::vector<std::string> GetFurtherOutputs() const override {
     std::vector<std::string> files;
@@ -173,53 +168,20 @@ class SegmentVerb final : public RasterVerb {
 
   const char* GetKeptDetails() const override { return "Told"; }
   FillValues GetNoData(const FillValues& /*chosen*/) const override {
-    return isBorders_ ? FillValues() : FillValues{0.0};
+    return request_.isBorders ? FillValues() : FillValues{0.0};
   }
   bool MayChooseNoData() const override { return false; }
   const char* GetFirstStep() const override { return kFitStep; }
 
   void AddToCreate(JobDraft& /*draft*/, JobWriterCommand& create) const override {
-    create.AddInput("DataType", DataTypeName(kDataTypeOf<std::int32_t>));
-    create.AddInput("Bands", 1U);
-    if (!isBorders_) return;
-    Array<bool> none{ArrayDims(1)};  // 0 is as good a pixel as 1
-    none[0] = false;
-    create.AddInput("HasNoDataValue", none);
+    AddLabels(create, request_);
   }
 
-  String MergeRaster(const String& shown) const {
-    return mergeRaster_.empty() ? shown : String("$merge");
-  }
-
-  /// Adds the command that finds limits, and what percentages stand for, into variables.
-  void AddFit(JobDraft& draft, const String& shown) const {
-    if (!mergeRaster_.empty()) AddOpen(draft, "merge", {mergeRaster_, ""});
-    JobWriterCommand& fit = draft.Step(kFitStep, "FitSegmentationCommand");
-    fit.AddVariableInput("SegmentURI", shown);
-    fit.AddInput("SegmentAlgorithm", Algorithm());
-    if (segmentValue_) fit.AddInput("SegmentValue", *segmentValue_);
-    if (segmentPercent_) fit.AddInput("SegmentPercent", *segmentPercent_);
-    fit.AddVariableInput("MergeURI", MergeRaster(shown));
-    if (mergePercent_ && !isEstimate_) fit.AddInput("MergePercent", *mergePercent_);
-    fit.AddOutput("MinGradient", "$least");
-    fit.AddOutput("MaxGradient", "$most");
-    fit.AddOutput("StretchValue", "$levels");
-    fit.AddOutput("SegmentValue", "$flat");
-    fit.AddOutput("MergeValue", "$cost");
-  }
-
-  /// Adds the command that segments, or estimates; its further inputs are the caller's.
-  JobWriterCommand& AddSegment(JobDraft& draft, const char* step, const String& shown) const {
-    JobWriterCommand& segment = draft.Step(step, "FxTileSegmentMergeCommand");
-    segment.AddVariableInput("SegmentURI", shown);
-    segment.AddInput("SegmentAlgorithm", Algorithm());
-    segment.AddVariableInput("SegmentValue", "$flat");
-    segment.AddVariableInput("MinGradient", "$least");
-    segment.AddVariableInput("MaxGradient", "$most");
-    segment.AddVariableInput("MergeURI", MergeRaster(shown));
-    segment.AddVariableInput("StretchValue", "$levels");
-    segment.AddInput("LambdaEstimate", isEstimate_);
-    return segment;
+  /// Opens the raster that drives merging, where there is one of its own.
+  SegmentSources OpenMerge(JobDraft& draft, const String& shown) const {
+    if (mergeRaster_.empty()) return {shown, shown};
+    AddOpen(draft, "merge", {mergeRaster_, ""});
+    return {shown, "$merge"};
   }
 
   void CloseMerge(JobDraft& draft) const {
@@ -227,19 +189,9 @@ class SegmentVerb final : public RasterVerb {
   }
 
   void AddMaking(JobDraft& draft, const Making& making) const override {
-    AddFit(draft, making.shown);
-    JobWriterCommand& segment = AddSegment(draft, kMakeStep, making.shown);
-    segment.AddVariableInput("LabelURI", "$target");
-    segment.AddInput("MergeAlgorithm", mergeAlgorithm_ == "rigorous" ? 2 : 1);
-    if (mergeValue_) {
-      segment.AddInput("MergeValue", *mergeValue_);
-    } else {
-      segment.AddVariableInput("MergeValue", "$cost");
-    }
-    if (tileMemory_) segment.AddInput("TileMemorySize", *tileMemory_);
-    segment.AddInput("TileBorderSize", tileBorder_);
-    if (isBorders_) segment.AddInput("SegmentBorder", 1);
-    segment.AddInput("Sums", Form::kExact);
+    const SegmentSources sources = OpenMerge(draft, making.shown);
+    AddFit(draft, request_, sources);
+    AddSegment(draft, kMakeStep, request_, sources);
     CloseMerge(draft);
   }
 
@@ -269,11 +221,11 @@ class SegmentVerb final : public RasterVerb {
   }
 
   JobDraft GetJob(const Outputs& outputs) const override {
-    return isEstimate_ ? MakeEstimate() : RasterVerb::GetJob(outputs);
+    return request_.isEstimate ? MakeEstimate() : RasterVerb::GetJob(outputs);
   }
 
   void Make(JobSession& session, const Outputs& outputs) override {
-    if (isEstimate_) return Estimate(session, outputs);
+    if (request_.isEstimate) return Estimate(session, outputs);
     RasterVerb::Make(session, outputs);
     if (!quicklook_.empty()) DrawQuicklook(session, outputs);
   }
@@ -306,16 +258,17 @@ class SegmentVerb final : public RasterVerb {
     GetArea().AddViews(chain);
     AddViews(chain);
     const String shown = chain.GetTop();
-    AddFit(draft, shown);
+    const SegmentSources sources = OpenMerge(draft, shown);
+    AddFit(draft, request_, sources);
     JobWriterCommand& gradients = draft.Step(kGradientStep, "FxTileSegmentHistogramCommand");
     gradients.AddVariableInput("SegmentURI", shown);
     gradients.AddVariableInput("HistogramMin", "$least");
     gradients.AddVariableInput("HistogramMax", "$most");
-    gradients.AddInput("SegmentAlgorithm", Algorithm());
+    gradients.AddInput("SegmentAlgorithm", request_.algorithm == "sobel" ? 1 : 2);
     const bool isWhole = DispatchType(EightTypes{}, scene_.dataType,
                                       []<typename T>() { return std::is_integral_v<T>; });
     if (!isWhole) gradients.AddInput("HistogramBins", kFloatBins);
-    AddSegment(draft, kCostStep, shown);
+    AddSegment(draft, kCostStep, request_, sources);
     CloseMerge(draft);
     chain.Close();
     return draft;
@@ -363,7 +316,7 @@ class SegmentVerb final : public RasterVerb {
   }
 
   std::string Describe() const override {
-    if (!isEstimate_) return {};
+    if (!request_.isEstimate) return {};
     if (isJson_) {
       return Json{{"file", GetSource().file},
                   {"gradients", AsJson(gradients_)},
@@ -381,17 +334,12 @@ class SegmentVerb final : public RasterVerb {
     return text;
   }
 
-  int Algorithm() const { return algorithm_ == "sobel" ? 1 : 2; }
-
   static constexpr unsigned kFloatBins = 65000;
   static constexpr unsigned kQuicklookSize = 2048;
 
-  bool isTiled_ = false, isEstimate_ = false, isJson_ = false, isBorders_ = false;
+  bool isTiled_ = false, isJson_ = false;
   std::string picture_, bandsText_, mergeRaster_, polygons_, quicklook_;
-  std::string algorithm_ = "sobel", mergeAlgorithm_ = "schedule";
-  std::optional<double> segmentValue_, segmentPercent_, mergeValue_, mergePercent_;
-  std::optional<unsigned> tileMemory_;
-  unsigned tileBorder_ = 10;
+  SegmentRequest request_;
 
   RasterInfo scene_;
   Array<unsigned> bands_;

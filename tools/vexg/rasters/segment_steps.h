@@ -1,0 +1,43 @@
+#pragma once
+
+#include <optional>
+#include <string>
+
+#include "jobs/raster_job.h"
+
+namespace lumo::host {
+
+/// How a raster is divided into segments.
+struct SegmentRequest {
+  std::string algorithm = "sobel";          ///< what is flooded: sobel or intensity
+  std::string mergeAlgorithm = "schedule";  ///< or rigorous
+  std::optional<double> segmentValue, segmentPercent, mergeValue, mergePercent;
+  std::optional<unsigned> tileMemory;  ///< bytes
+  unsigned tileBorder = 10;            ///< pixels
+  bool isBorders = false;              ///< an image of the borders is made instead
+  bool isEstimate = false;             ///< costs are counted, and nothing made
+
+  /// Throws HostError for percentages out of bounds, and for a value beside a percentage.
+  void Check() const;
+};
+
+constexpr const char* kFitStep = "fit";
+
+/// The rasters that are segmented, as variables.
+struct SegmentSources {
+  String shown;  ///< whose gradients are flooded
+  String merge;  ///< whose bands drive merging
+};
+
+/// Adds the command that finds limits, and what percentages stand for, into variables.
+void AddFit(JobDraft& draft, const SegmentRequest& request, const SegmentSources& sources);
+
+/// Adds the command that segments, or estimates, with what AddFit found. The labels go into
+/// "$target".
+void AddSegment(JobDraft& draft, const char* step, const SegmentRequest& request,
+                const SegmentSources& sources);
+
+/// Adds to the command that makes the raster of labels what they are.
+void AddLabels(JobWriterCommand& create, const SegmentRequest& request);
+
+}  // namespace lumo::host
