@@ -48,10 +48,11 @@ JobDraft::JobDraft() : root_("Job") {
 JobWriterCommand& JobDraft::Step(const std::string& name, const char* id) {
   auto* const command = new JobWriterCommand;
   root_.children.PushBack(XMLElementPtr(command));
-  command->attributes["Name"] = String(name);
+  const String named(stage_ + name);
+  command->attributes["Name"] = named;
   command->attributes["ID"] = id;
   if (!steps_.empty()) command->AddDependsOn(steps_.back().name);
-  steps_.push_back({String(name), id, "", "", ""});
+  steps_.push_back({named, id, "", "", ""});
   return *command;
 }
 

@@ -37,6 +37,10 @@ class JobDraft {
  public:
   JobDraft();
 
+  /// Puts a word in front of the names of the steps that follow, where several pieces of work with
+  /// the same names of steps become one document.
+  void SetStage(const std::string& stage) { stage_ = stage + "."; }
+
   /// Adds a command at the end. Further inputs and outputs are the caller's.
   JobWriterCommand& Step(const std::string& name, const char* id);
 
@@ -62,6 +66,7 @@ class JobDraft {
  private:
   XMLElement root_;
   std::vector<StepInfo> steps_;
+  std::string stage_;
 };
 
 using JobResults = Map<String, JobResult>;

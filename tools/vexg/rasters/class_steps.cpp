@@ -88,14 +88,18 @@ Array<unsigned> RowsOf(const std::vector<std::string>& names, const std::string&
   return rows;
 }
 
-void AddExamples(JobDraft& draft, const SampleSet& samples, const String& labels) {
+void AddSamples(JobWriterCommand& command, const SampleSet& samples) {
   const LayerName name = SplitLayer(samples.file);
+  command.AddInput("Vectors", String(AbsoluteName(name.file)));
+  command.AddInput("ClassField", String(samples.field));
+  if (!name.layer.empty()) command.AddInput("Layer", String(name.layer));
+}
+
+void AddExamples(JobDraft& draft, const SampleSet& samples, const String& labels) {
   JobWriterCommand& find = draft.Step(kExampleStep, "FindClassExamplesCommand");
   find.AddVariableInput("LabelURI", labels);
-  find.AddInput("Vectors", String(AbsoluteName(name.file)));
-  find.AddInput("ClassField", String(samples.field));
+  AddSamples(find, samples);
   find.AddOutput("ExampleDefinition", "$examples");
-  if (!name.layer.empty()) find.AddInput("Layer", String(name.layer));
 }
 
 void AddScores(JobDraft& draft, const ClassRequest& request, const String& labels,

@@ -27,6 +27,9 @@ struct ClassRequest {
   bool HasRules() const { return samples.file.empty(); }
 };
 
+/// Gives a command its inputs "Vectors", "ClassField" and "Layer".
+void AddSamples(JobWriterCommand& command, const SampleSet& samples);
+
 constexpr unsigned kMostClasses = 254;
 
 /// Adds the columns of a file of attributes to the places. Throws HostError where they have no
