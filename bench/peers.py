@@ -10,6 +10,7 @@ import subprocess
 import sys
 import time
 
+import class_peers
 import segment_peers
 
 BANDS = 6
@@ -77,6 +78,14 @@ class Bench:
             if maker.exitcode != 0:
                 raise SystemExit(f"{path} could not be made")
         return path
+
+    def real_scene(self):
+        """The real scene that ./demo and the tests use."""
+        places = [pathlib.Path("../shared/data/landsat7_olinda.tif"), pathlib.Path("build/demo/L7_ETMs.tif")]
+        for path in places:
+            if path.exists():
+                return path
+        raise SystemExit("run ./demo first, which fetches the real scene")
 
     def once(self, command, env=None):
         """Seconds and peak memory in MiB of a command."""
@@ -500,7 +509,9 @@ def grass_windows(bench, scene):
 
 SECTIONS = {"stats": stats, "hist": hist, "calibrate": calibrate, "calc": calc, "pyramid": pyramid, "warp": warp,
             "polygons": polygons, "zones": zones, "segments": segment_peers.speed,
-            "segment-quality": segment_peers.quality, "attributes": attributes, "memory": memory}
+            "segment-quality": segment_peers.quality, "attributes": attributes,
+            "classes": lambda bench: class_peers.speed(bench, make_regions), "class-quality": class_peers.quality,
+            "memory": memory}
 
 
 def main():
