@@ -1,4 +1,6 @@
 #include "raster/raster_command.h"
+#include "raster/raster_def.h"
+#include "raster/raster_details.h"
 
 namespace lumo {
 namespace {
@@ -32,6 +34,30 @@ class GetRasterPaletteCommand final : public RasterCommand {
 };
 
 const CommandFactoryT<GetRasterPaletteCommand> getFactory(kGet);
+
+const CommandDeclaration kCategories{
+    "GetRasterCategoriesCommand",
+    "Palettes",
+    "Gives the names that the values of a band have. A command of this library's own.",
+    {kUri, {"Band", Presence::kRequired, ValueKind::kInteger, "from 0"}},
+    {{"Categories", ValueKind::kTextList, "of the values from 0 on; empty where it has none"}}};
+
+class GetRasterCategoriesCommand final : public RasterCommand {
+  CommandResult Execute() override {
+    if (!CheckInputs()) return Fail();
+    const BasicRasterPtr raster = FindRaster();
+    if (!raster) return Fail();
+    const auto band = Read<unsigned>("Band");
+    if (band >= raster->Bands()) return Fail("Band: the raster has no such band");
+    const std::vector<std::string> names = FindCategories(raster->GetRasterDef().metadata, band);
+    Array<String> categories{ArrayDims(static_cast<unsigned>(names.size()))};
+    for (unsigned i = 0; i < categories.GetCount(); ++i) categories[i] = String(names[i]);
+    Write("Categories", categories);
+    return Succeed();
+  }
+};
+
+const CommandFactoryT<GetRasterCategoriesCommand> categoriesFactory(kCategories);
 
 const CommandDeclaration kSet{
     "SetRasterPaletteCommand",

@@ -6,7 +6,7 @@ import unittest
 from xml.etree import ElementTree
 
 from field_scene import CLASSES, FieldScene
-from support import needs_gdal
+from support import gdal_pixels, needs_gdal
 
 
 @needs_gdal
@@ -44,6 +44,17 @@ class ClassifyVerbTest(FieldScene):
         self.assertLessEqual(values, {0, 1, 2, 3})
         self.assertEqual((self.folder / "scores.fxa").read_bytes()[:9], b"FXA50\x01\x00\x03\x00")
         self.assertEqual({p.name for p in self.folder.iterdir() if p.name.startswith("map.tif")} - {"map.tif.aux.xml"}, {"map.tif"})
+        # A picture of it, with its names beside.
+        for more, wide in (((), 120), (("--legend",), 200)):
+            self.fine("quicklook", self.folder / "map.tif", self.folder / "map.png", "--overwrite", "-q", *more)
+            picture = json.loads(subprocess.run(["gdalinfo", "-json", self.folder / "map.png"], check=True, capture_output=True,
+                                                text=True).stdout)
+            width, channels, data = picture["size"][0], len(picture["bands"]), gdal_pixels(self.folder / "map.png")
+            self.assertEqual(width > wide, wide == 200)
+            beside = {tuple(data[(y * width + x) * channels:][:3]) for y in range(120) for x in range(120, width)}
+            entries = {tuple(entry[:3]) for entry in info["colorTable"]["entries"][:4]}
+            self.assertEqual(entries <= beside, wide == 200)
+        self.fails(1, "--legend: the picture is in no palette", "quicklook", self.folder / "scene.tif", self.folder / "x.png", "--legend")
         # A copy keeps the names.
         self.fine("copy", self.folder / "map.tif", self.folder / "copy.tif", "-q")
         self.assertIn("1: forest", subprocess.run(["gdalinfo", self.folder / "copy.tif"], check=True, capture_output=True,

@@ -22,32 +22,6 @@ constexpr unsigned char kBar = 90;
 constexpr unsigned char kGrid = 225;
 constexpr unsigned char kInk = 0;
 
-/// A letter of 5 by 7 dots, a row to a byte, the leftmost dot in bit 4.
-struct Glyph {
-  char letter;
-  unsigned char rows[7];
-};
-
-constexpr Glyph kGlyphs[] = {
-    {'0', {14, 17, 19, 21, 25, 17, 14}}, {'1', {4, 12, 4, 4, 4, 4, 14}},
-    {'2', {14, 17, 1, 2, 4, 8, 31}},     {'3', {31, 2, 4, 2, 1, 17, 14}},
-    {'4', {2, 6, 10, 18, 31, 2, 2}},     {'5', {31, 16, 30, 1, 1, 17, 14}},
-    {'6', {6, 8, 16, 30, 17, 17, 14}},   {'7', {31, 1, 2, 4, 8, 8, 8}},
-    {'8', {14, 17, 17, 14, 17, 17, 14}}, {'9', {14, 17, 17, 15, 1, 2, 12}},
-    {'-', {0, 0, 0, 31, 0, 0, 0}},       {'+', {0, 4, 4, 31, 4, 4, 0}},
-    {'.', {0, 0, 0, 0, 0, 12, 12}},      {'e', {0, 0, 14, 17, 31, 16, 14}},
-    {'b', {16, 16, 22, 25, 17, 17, 30}}, {'a', {0, 0, 14, 1, 15, 17, 15}},
-    {'n', {0, 0, 22, 25, 17, 17, 17}},   {'d', {1, 1, 13, 19, 17, 17, 15}},
-    {'i', {4, 0, 12, 4, 4, 4, 14}},      {'f', {6, 9, 8, 28, 8, 8, 8}},
-    {'g', {0, 0, 15, 17, 15, 1, 14}},    {'r', {0, 0, 22, 25, 16, 16, 16}},
-    {'t', {8, 8, 28, 8, 8, 9, 6}},       {'s', {0, 0, 15, 16, 14, 1, 30}},
-    {'c', {0, 0, 14, 17, 16, 17, 14}},   {'o', {0, 0, 14, 17, 17, 17, 14}}};
-constexpr unsigned kGlyphWidth = 6;
-
-unsigned TextWidth(const std::string& text) {
-  return static_cast<unsigned>(text.size()) * kGlyphWidth;
-}
-
 /// About eight round numbers of one distance between two values.
 std::vector<double> Ticks(double low, double high) {
   const double raw = (high - low) / 8;
@@ -105,7 +79,7 @@ void HistogramPlot::DrawBars(const PlottedHistogram& histogram, unsigned top, do
 }
 
 void HistogramPlot::DrawAxes(const PlottedHistogram& histogram, unsigned top, double highest) {
-  DrawText(histogram.title, kLeft, top + 10);
+  Put(DrawText(histogram.title), kLeft, top + 8);
   const double high =
       histogram.lower + histogram.binSize * static_cast<double>(histogram.counts.size());
   const auto label = [](double value) { return fmt::format("{:.6g}", value == 0 ? 0.0 : value); };
@@ -115,32 +89,21 @@ void HistogramPlot::DrawAxes(const PlottedHistogram& histogram, unsigned top, do
     const unsigned x = kLeft + static_cast<unsigned>(std::lround(share * (kRight - kLeft)));
     Fill(x, top + kTop, x + 1, top + kBottom, kGrid);
     Fill(x, top + kBottom, x + 1, top + kBottom + 5, kInk);
-    const std::string text = label(tick);
-    DrawText(text, x - TextWidth(text) / 2, top + kBottom + 10);
+    const TextImage text = DrawText(label(tick));
+    Put(text, x - std::min(x, text.width / 2), top + kBottom + 6);
   }
   for (const double part : {0.5, 1.0}) {
     const unsigned y = top + kBottom - static_cast<unsigned>(part * (kBottom - kTop));
     Fill(kLeft, y, kRight, y + 1, kGrid);
-    const std::string text = label(part * highest);
-    DrawText(text, kLeft - 8 - std::min(kLeft - 8, TextWidth(text)), y - 3);
+    const TextImage text = DrawText(label(part * highest));
+    Put(text, kLeft - 8 - std::min(kLeft - 8, text.width), y - text.height / 2);
   }
   Fill(kLeft - 1, top + kTop, kLeft, top + kBottom + 1, kInk);
   Fill(kLeft - 1, top + kBottom, kRight + 1, top + kBottom + 1, kInk);
 }
 
-void HistogramPlot::DrawText(const std::string& text, unsigned x, unsigned y) {
-  for (const char letter : text) {
-    const auto* const glyph =
-        std::find_if(std::begin(kGlyphs), std::end(kGlyphs),
-                     [&](const Glyph& candidate) { return candidate.letter == letter; });
-    for (unsigned row = 0; glyph != std::end(kGlyphs) && row < 7; ++row) {
-      for (unsigned dot = 0; dot < 5; ++dot) {
-        if ((glyph->rows[row] >> (4 - dot) & 1) == 0) continue;
-        Fill(x + dot, y + row, x + dot + 1, y + row + 1, kInk);
-      }
-    }
-    x += kGlyphWidth;
-  }
+void HistogramPlot::Put(const TextImage& text, unsigned x, unsigned y) {
+  text.DrawOn(pixels_, kWidth, 1, x, y);
 }
 
 /// Right and bottom are beyond the last pixel. What lies outside the picture is left out.

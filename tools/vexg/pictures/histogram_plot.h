@@ -5,6 +5,7 @@
 #include <vector>
 
 #include "output/output_file.h"
+#include "pictures/text_image.h"
 
 namespace lumo::host {
 
@@ -30,7 +31,7 @@ class HistogramPlot {
   void DrawPanel(const PlottedHistogram& histogram, unsigned top);
   void DrawBars(const PlottedHistogram& histogram, unsigned top, double highest);
   void DrawAxes(const PlottedHistogram& histogram, unsigned top, double highest);
-  void DrawText(const std::string& text, unsigned x, unsigned y);
+  void Put(const TextImage& text, unsigned x, unsigned y);
   void Fill(unsigned left, unsigned top, unsigned right, unsigned bottom, unsigned char grey);
 
   unsigned height_;

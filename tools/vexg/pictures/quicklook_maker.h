@@ -13,6 +13,12 @@ struct ShownRaster {
   std::string file;  ///< what the user calls it
 };
 
+/// A colour and what it means.
+struct LegendRow {
+  std::string name;
+  Color color;
+};
+
 /// The picture that QuicklookMaker makes of a raster.
 struct QuicklookRequest {
   ShownRaster raster;
@@ -21,6 +27,7 @@ struct QuicklookRequest {
   QuicklookPicture::Stretch stretch;
   std::optional<Palette> palette;       ///< its colours, instead of the stretch, of one band
   std::optional<ShownRaster> outlines;  ///< labels of the same size whose borders are drawn over it
+  std::vector<LegendRow> legend;        ///< drawn beside it
 };
 
 /// The bands shown: those that a text asks for, else red, green and blue where there are three or

@@ -81,6 +81,10 @@ class AnalyzeVerb final {
         .Shows("SAMPLES[:LAYER]");
     line.Add("--class-field", field_, "With --init: the field with the class of a sample")
         .Shows("FIELD");
+    line.Add("--reference", reference_,
+             "With --init: samples to compare the map with, of the same field; those of --training "
+             "by default")
+        .Shows("SAMPLES[:LAYER]");
     line.Add("--overwrite", overwrite_, "Replace results of other settings");
   }
 
@@ -93,6 +97,7 @@ class AnalyzeVerb final {
   int Run() {
     const auto refuse = [](const std::string& line) { throw HostError(kExitUsage, line); };
     if (training_.empty() != field_.empty()) refuse("--training and --class-field go together");
+    if (!reference_.empty() && training_.empty()) refuse("--reference goes with --training");
     if (isInit_) {
       if (!recipeFile_.empty() || !folder_.empty()) refuse("--init goes with no --recipe and -o");
       return Init();
@@ -155,12 +160,18 @@ class AnalyzeVerb final {
         const Color color = ColorOfClass(index++);
         colors[name.ToUTF8()] = fmt::format("#{:02x}{:02x}{:02x}", color.r, color.g, color.b);
       }
+      Json means = Json::array();
+      for (unsigned band = 0; band < ReadInfo(results, "source").bands; ++band) {
+        means.push_back(fmt::format("mean_b{}", band));
+      }
       recipe["classify"] = {{"samples", AbsoluteName(training_)},
                             {"field", field_},
                             {"method", "knn"},
-                            {"neighbors", 5},
+                            {"neighbors", 3},
+                            {"use", means},
                             {"colors", colors}};
-      recipe["accuracy"] = {{"samples", AbsoluteName(training_)}, {"field", field_}};
+      const std::string& check = reference_.empty() ? training_ : reference_;
+      recipe["accuracy"] = {{"samples", AbsoluteName(check)}, {"field", field_}};
     }
     recipe["polygons"] = "classes.gpkg";
     std::cout << recipe.dump(2) << '\n';
@@ -424,7 +435,7 @@ class AnalyzeVerb final {
 
   SourceOptions scene_;
   RasterJobOptions job_;
-  std::string recipeFile_, folder_, training_, field_;
+  std::string recipeFile_, folder_, training_, reference_, field_;
   bool isInit_ = false, overwrite_ = false, isDurable_ = false;
 
   Recipe recipe_;

@@ -63,6 +63,8 @@ class QuicklookVerb final : public FileVerb {
     line.Add("--outlines", outlines_,
              "A raster of labels of the same size, whose borders are drawn over the picture")
         .IsFile("LABELS");
+    line.Add("--legend", hasLegend_,
+             "Draw the names of the values that have some, and their colours");
     line.Add("--size", size_, "Pixels of the longer side at most").Within(1, 16384).ShowsDefault();
     AddOverwriteTo(line, "a file that is there");
   }
@@ -90,6 +92,9 @@ class QuicklookVerb final : public FileVerb {
     info_ = shown.info;
     bands_ = ChoosePictureBands(bandsText_, info_);
     hasPalette_ = bands_.GetCount() == 1 && info_.hasPalette[bands_[0]] && stretchText_.empty();
+    if (hasLegend_ && !hasPalette_) {
+      throw HostError(kExitFailed, GetSource().file + ": --legend: the picture is in no palette");
+    }
     shown_ = raster_;
     if (outlines_.empty()) level_ = ChooseLevel(info_, size_);  // labels have no levels
     if (level_ != 0) ShowLevel(session);
@@ -123,10 +128,29 @@ class QuicklookVerb final : public FileVerb {
   }
 
   void Make(JobSession& session, const Outputs& outputs) override {
-    QuicklookRequest request{{shown_, info_, GetSource().file}, bands_, size_, stretch_, {}, {}};
+    QuicklookRequest request{
+        {shown_, info_, GetSource().file}, bands_, size_, stretch_, {}, {}, {}};
     if (hasPalette_) request.palette = ReadPalette(session, raster_, bands_[0]);
+    if (hasLegend_) request.legend = ReadLegend(session, *request.palette);
     if (!outlines_.empty()) request.outlines = OpenOutlines(session);
     MakeQuicklook(session, request, outputs.Get(0), GetProgressStyle());
+  }
+
+  /// The names of values, as far as the band has some.
+  std::vector<LegendRow> ReadLegend(JobSession& session, Palette palette) const {
+    JobDraft draft;
+    JobWriterCommand& ask = draft.Step("categories", "GetRasterCategoriesCommand");
+    ask.AddInput("URI", raster_);
+    ask.AddInput("Band", bands_[0]);
+    const String text = session.Run(draft).Find("categories").returns.Find("Categories");
+    std::vector<LegendRow> legend;
+    unsigned value = 0;
+    for (const String& name : ParseValue<Array<String>>(text)) {
+      if (name.GetLength() != 0) legend.push_back({name.ToUTF8(), *palette.At(value)});
+      ++value;
+    }
+    if (!legend.empty()) return legend;
+    throw HostError(kExitFailed, GetSource().file + ": --legend: its values have no names");
   }
 
   /// The labels, in the area that is shown.
@@ -151,6 +175,7 @@ class QuicklookVerb final : public FileVerb {
 
   std::string output_, bandsText_, stretchText_, outlines_;
   unsigned size_ = 1024;
+  bool hasLegend_ = false;
 
   QuicklookPicture::Stretch stretch_;
   String raster_;       // URI
