@@ -106,7 +106,23 @@ class ClassifyVerbTest(FieldScene):
                    "--attributes", self.folder / "none", *self.training())
         self.fails(1, "labels are of type Int32", "classify", self.folder / "scene.tif", self.folder / "map.tif", "--attributes",
                    self.folder / "fields", *self.training())
+        self.fine("segment", self.folder / "scene.tif", self.folder / "few.tif", "--tiled", "--merge-percent", 99, "-q")
+        self.fine("attributes", self.folder / "scene.tif", self.folder / "few.tif", "-o", self.folder / "few", "--shape", "-q")
+        self.fails(1, "they are of other labels", *self.classify(*self.training(), "--attributes", self.folder / "few"))
         self.assertFalse((self.folder / "map.tif").exists())
+
+    def test_a_constant_band_says_nothing(self):
+        self.fine("calc", self.folder / "flat.tif", "b0; b1*0+7; b2", self.folder / "scene.tif", "--type", "Byte", "-q")
+        self.fine("attributes", self.folder / "flat.tif", self.folder / "segments.tif", "-o", self.folder / "flat", "--spectral",
+                  "-q")
+        for method in ("knn", "pca"):
+            self.fine("classify", self.folder / "segments.tif", self.folder / "map.tif", "--attributes", self.folder / "flat",
+                      *self.training(), "--method", method, "--use", "mean_b0,mean_b1,std_b1,mean_b2", "-q", "--overwrite")
+            self.assertGreater(self.accuracy()["overall"]["share"], 0.9)
+        self.fails(1, "the attributes are the same for all regions", "classify", self.folder / "segments.tif",
+                   self.folder / "none.tif", "--attributes", self.folder / "flat", *self.training(), "--method", "pca", "--use",
+                   "mean_b1,std_b1")
+        self.assertFalse((self.folder / "none.tif").exists())
 
 
 if __name__ == "__main__":

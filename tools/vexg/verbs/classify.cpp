@@ -127,8 +127,16 @@ class ClassifyVerb final : public RasterVerb {
       throw HostError(kExitFailed, GetSource().file + ": labels are of type Int32");
     }
     AttributePlaces places;
+    std::uint64_t records = 0;
     for (std::size_t i = 0; i < request_.files.size(); ++i) {
       const auto& returns = opened.Find(String(fmt::format("file{}", i))).returns;
+      const auto count = ParseValue<std::uint64_t>(returns.Find("Records"));
+      if (i == 0) records = count;
+      if (count != records) {
+        throw HostError(kExitFailed,
+                        fmt::format("{}: it has {} regions, and {} has {}: they are of other labels",
+                                    request_.files[i], count, request_.files[0], records));
+      }
       AddColumns(request_.files[i], ParseValue<unsigned>(returns.Find("Bands")),
                  ParseValue<unsigned>(returns.Find("Attributes")), places);
     }
