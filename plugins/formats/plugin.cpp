@@ -5,6 +5,8 @@
 #include "orva/orva_factory.h"
 #include "tiff/tiff_factory.h"
 
+VEXG_OWN_PLUGIN;
+
 namespace {
 
 /// A function of the library that has GDAL behind it; null, with the fault set, without that.

@@ -1,9 +1,11 @@
 #include <cstring>
 #include <string>
 
+#include "commands/plain_xml.h"
 #include "commands/xml.h"
 #include "commands/xml_engine.h"
 #include "foundation/fault.h"
+#include "foundation/thrown.h"
 #include "platform/memory_shortage.h"
 
 namespace lumo {
@@ -65,6 +67,11 @@ void XMLSimpleParser::Parse(const String& document) {
   if (length == 0) return SetFault("the document is empty");
   if (length > kMaxXMLBytes) return SetFault("the document is too large");
 
+  try {
+    if (ReadPlainXml({text, length}, *this)) return;
+  } catch (...) {
+    return SetFault(DescribeException().c_str());
+  }
   XmlEngine* const engine = GetXmlEngine();
   if (engine == nullptr) return SetFault(TakeFault());
   ParserListener listener(*this);

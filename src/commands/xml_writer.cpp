@@ -1,3 +1,4 @@
+#include "commands/plain_xml.h"
 #include "commands/xml_engine.h"
 
 namespace lumo {
@@ -11,6 +12,7 @@ XMLElement* XMLElement::AddChild(const String& childName) {
 String XMLSimpleWriter::Write(const XMLDocumentRoot& root) {
   ClearErrorState();
   String document;
+  if (WritePlainXml(root, document)) return document;
   XmlEngine* const engine = GetXmlEngine();
   if (engine != nullptr && engine->Write(root, document)) return document;
   SetErrorState(ObjectErrorIO());
