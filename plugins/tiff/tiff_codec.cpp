@@ -1,6 +1,8 @@
 #include "tiff/tiff_codec.h"
 
+#include <algorithm>
 #include <array>
+#include <bit>
 #include <cstring>
 #include <libdeflate.h>
 #include <memory>
@@ -67,56 +69,80 @@ class CodeReader {
   unsigned held_ = 0;
 };
 
-/// LZW as the TIFF specification has it (TIFF 6.0, 1992, section 13). Each string of the table is a
-/// place in what has come out already: it is the one before with the byte that followed it.
-bool UnpackLzw(const unsigned char* packed, std::size_t packedBytes, unsigned char* out,
-               std::size_t bytes) {
-  constexpr unsigned kClear = 256, kEnd = 257, kFirst = 258, kMost = 4096;
-  struct String {
-    std::uint32_t offset;
-    std::uint32_t length;
-  };
-  thread_local std::array<String, kMost> strings;
+constexpr unsigned kMost = 4096;  // strings that the table of LZW holds
+
+/// One of them. Short ones are at hand as a number, since bytes that have just
+/// been written are slow to be read again.
+struct Piece {
+  std::uint64_t bytes;   // the first eight, the first one lowest
+  std::uint32_t offset;  // of a place where it has come out; without a meaning for single bytes
+  std::uint32_t length;
+
+  /// The string with one byte more.
+  Piece With(std::uint64_t byte) const {
+    const std::uint64_t more = length < sizeof bytes ? byte << (8 * length) : 0;
+    return {bytes | more, offset, length + 1};
+  }
+};
+
+/// LZW as the TIFF specification has it (TIFF 6.0, 1992, section 13). Each new string of the table
+/// is the one that came out before, with the byte that followed it.
+/// @param table  kMost strings, which have no meaning yet.
+[[gnu::noinline]] bool UnpackLzw(const unsigned char* packed, std::size_t packedBytes,
+                                 unsigned char* out, std::size_t bytes, Piece* table) {
+  constexpr unsigned kClear = 256, kEnd = 257, kFirst = 258;
+  constexpr std::size_t kStep = sizeof(std::uint64_t);
+  static_assert(std::endian::native == std::endian::little);
   if (bytes > UINT32_MAX || packedBytes < 2 || (packed[0] == 0 && (packed[1] & 1) != 0)) {
     return false;  // an older form has its bits the other way round
   }
+  for (unsigned i = 0; i < kClear; ++i) table[i] = {i, 0, 1};
   CodeReader codes(packed, packedBytes);
   std::size_t done = 0;
   unsigned bits = 9, next = kFirst;
-  std::uint32_t lastOffset = 0, lastLength = 0;  // of the string before; none after a clear code
+  Piece last{0, 0, 0};  // none after a clear code
   while (done < bytes) {
     const unsigned code = codes.Next(bits);
     if (code == kClear) {
-      bits = 9, next = kFirst, lastLength = 0;
+      bits = 9, next = kFirst, last.length = 0;
       continue;
     }
-    if (code == kEnd || code == CodeReader::kNone) return false;
-    const auto start = static_cast<std::uint32_t>(done);
-    std::uint32_t length = 1;
-    if (code < kClear) {
-      out[done] = static_cast<unsigned char>(code);
-    } else {
-      if (lastLength == 0 || code > next || (code == next && next >= kMost)) return false;
-      const String from = code < next ? strings[code] : String{lastOffset, lastLength + 1};
-      length = static_cast<std::uint32_t>(std::min<std::size_t>(from.length, bytes - done));
-      const unsigned char* const source = out + from.offset;
-      unsigned char* const target = out + done;
-      if (source + length <= target && length >= 16) {
-        std::memcpy(target, source, length);
-      } else {
-        for (std::uint32_t i = 0; i < length; ++i) target[i] = source[i];
+    Piece piece = table[code < kMost ? code : 0];
+    if (last.length != 0) {
+      // A code may be the one of the string that it completes.
+      if (code == next) piece = last.With(last.bytes & 0xFF);
+      if (code > next || code == kEnd || code >= kMost) return false;
+      if (next < kMost) {
+        table[next] = last.With(piece.bytes & 0xFF);
+        ++next;
+        // Codes get longer one entry early.
+        if (next >= (1U << bits) - 1 && bits < 12) ++bits;
       }
+    } else if (code >= kClear) {
+      return false;
     }
-    done += length;
-    if (lastLength != 0 && next < kMost) {
-      strings[next] = {lastOffset, lastLength + 1};
-      ++next;
-      // Codes get longer one entry early.
-      if (next >= (1U << bits) - 1 && bits < 12) ++bits;
+    unsigned char* const to = out + done;
+    if (piece.length <= kStep && bytes - done >= kStep) {
+      std::memcpy(to, &piece.bytes, kStep);  // what is too much is written over
+    } else if (piece.length <= kStep) {
+      piece.length = static_cast<std::uint32_t>(std::min<std::size_t>(piece.length, bytes - done));
+      std::memcpy(to, &piece.bytes, piece.length);
+    } else {
+      piece.length = static_cast<std::uint32_t>(std::min<std::size_t>(piece.length, bytes - done));
+      const unsigned char* const from = out + piece.offset;
+      for (std::uint32_t i = 0; i < piece.length; ++i) to[i] = from[i];
     }
-    lastOffset = start, lastLength = length;
+    last = {piece.bytes, static_cast<std::uint32_t>(done), piece.length};
+    done += piece.length;
   }
   return true;
+}
+
+/// A table of this thread. It is looked up once for a block: in a loop the look-up costs more than
+/// a code.
+Piece* LzwTable() {
+  thread_local std::vector<Piece> table(kMost);
+  return table.data();
 }
 
 template <typename T>
@@ -171,7 +197,7 @@ bool Decode(Compression compression, const unsigned char* packed, std::size_t pa
       std::memcpy(out, packed, bytes);
       return true;
     case Compression::kLzw:
-      return UnpackLzw(packed, packedBytes, out, bytes);
+      return UnpackLzw(packed, packedBytes, out, bytes, LzwTable());
     case Compression::kDeflate:
     case Compression::kOldDeflate:
       return Inflate(packed, packedBytes, out, bytes);
