@@ -9,6 +9,7 @@
 #include "foundation/warnings.h"
 #include "gdal_band_values.h"
 #include "gdal_common/file_guard.h"
+#include "gdal_common/level_number.h"
 #include "gdal_common/messages.h"
 #include "gdal_creation.h"
 #include "gdal_georef.h"
@@ -47,20 +48,6 @@ Interleave ReadInterleave(GDALDatasetH dataset) {
   // With one band all are the same.
   if (GDALGetRasterCount(dataset) == 1) return Interleave::BSQ;
   return text == "PIXEL" ? Interleave::BIP : text == "LINE" ? Interleave::BIL : Interleave::BSQ;
-}
-
-/// The number n of a reduction by 2^n; 0 when it is none.
-unsigned LevelOfSize(const RasterLevel& full, unsigned samples, unsigned lines) {
-  if (samples == 0 || lines == 0) return 0;
-  for (unsigned level = 1; level < 31; ++level) {
-    const auto fits = [&](unsigned whole, unsigned reduced) {
-      const unsigned down = whole >> level;
-      const bool isExact = (down << level) == whole;
-      return reduced == std::max(down, 1U) || reduced == down + (isExact ? 0 : 1);
-    };
-    if (fits(full.samples, samples) && fits(full.lines, lines)) return level;
-  }
-  return 0;
 }
 
 unsigned SizeOf(int size) {
@@ -211,7 +198,7 @@ void OpenRaster::FindLevels() {
   const int count = GDALGetOverviewCount(full.bands.front());
   for (int i = 0; i < count; ++i) {
     RasterLevel level = OverviewOf(full, i);
-    const unsigned number = LevelOfSize(full, level.samples, level.lines);
+    const unsigned number = LevelNumber(full.samples, full.lines, level.samples, level.lines);
     if (number != 0) reduced.try_emplace(number, std::move(level));
   }
   for (auto& [number, level] : reduced) {

@@ -1,7 +1,6 @@
 #include "data/data_connection.h"
 #include "gdal_common/library.h"
 #include "gdal_factory.h"
-#include "orva/orva_factory.h"
 #include "vector_sink.h"
 #include "vector_source.h"
 
@@ -21,10 +20,10 @@ class GdalVectorRecordFactory final : public lumo::VectorRecordFactory {
 
 }  // namespace
 
-/// The entry point of the plug-in.
+/// The entry point for rasters, which libvexgdal.so calls.
 extern "C" VEXG_EXPORT lumo::DataConnectionFactory* CreateDataConnectionFactory(
     lumo::FormatRecord* record) {
-  return record->driver == "ORVA" ? lumo::MakeOrvaFactory(*record) : lumo::MakeGdalFactory(*record);
+  return lumo::MakeGdalFactory(*record);
 }
 
 /// The entry point for files of records.

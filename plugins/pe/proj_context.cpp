@@ -1,5 +1,6 @@
 #include "proj_context.h"
 
+#include <memory>
 #include <mutex>
 #include <new>
 #include <string_view>
@@ -8,6 +9,7 @@
 
 #include "georef/coordsys_log.h"
 #include "platform/memory_shortage.h"
+#include "platform/process.h"
 
 namespace lumo::pe {
 namespace {
@@ -26,36 +28,97 @@ void LogFromProj(void*, int, const char* text) {
   LogCoordSys(CoordSysLog::kErrors, "%s", text);
 }
 
-/// The context and the transforms of a thread. The transforms go before the context that they
-/// belong to.
-struct ThreadState {
-  ThreadState() : context(proj_context_create()) {
+/// A context, and the transforms that belong to it and go before it. One thread has it at a time.
+struct ProjState {
+  explicit ProjState(const std::string& givenDirectory)
+      : directory(givenDirectory), context(proj_context_create()) {
     if (context == nullptr) throw std::bad_alloc();
     proj_context_set_enable_network(context, 0);
     proj_context_use_proj4_init_rules(context, 1);
     proj_log_func(context, nullptr, LogFromProj);
-    const std::lock_guard lock(gDirectoryMutex);
-    if (gDirectory.empty()) return;
+    if (directory.empty()) return;
     // The standard places stay in the list behind the directory.
     const PJ_INFO info = proj_info();
-    std::vector<const char*> paths{gDirectory.c_str()};
+    std::vector<const char*> paths{directory.c_str()};
     for (std::size_t i = 0; i < info.path_count; ++i) paths.push_back(info.paths[i]);
     proj_context_set_search_paths(context, static_cast<int>(paths.size()), paths.data());
   }
-  ~ThreadState() {
+  ~ProjState() {
     transforms.clear();
     proj_context_destroy(context);
   }
-  ThreadState(const ThreadState&) = delete;
-  ThreadState& operator=(const ThreadState&) = delete;
+  ProjState(const ProjState&) = delete;
+  ProjState& operator=(const ProjState&) = delete;
 
-  PJ_CONTEXT* context;
+  const std::string directory;  // of the database
+  PJ_CONTEXT* const context;
   std::unordered_map<std::string, PjPtr> transforms;
 };
 
-ThreadState& State() {
-  thread_local ThreadState state;
-  return state;
+/// The states that no thread has. Each source is opened on a thread of its own, and a new context
+/// would read the database, and make the same transforms, each time.
+///
+/// A process that was forked off begins with none: what its parent's threads held at that moment is
+/// left alone. Nobody waits for the lock, which one of them may have held.
+class ProjPool {
+ public:
+  static ProjPool& Get() {
+    static auto& pool = *new ProjPool;  // threads may end after all that is static
+    return pool;
+  }
+
+  std::unique_ptr<ProjState> Take(const std::string& directory) {
+    if (const std::unique_lock lock(mutex_, std::try_to_lock); lock.owns_lock()) {
+      ForgetParents();
+      for (auto at = idle_.rbegin(); at != idle_.rend(); ++at) {
+        if ((*at)->directory != directory) continue;
+        std::unique_ptr<ProjState> state = std::move(*at);
+        idle_.erase(std::next(at).base());
+        return state;
+      }
+    }
+    return std::make_unique<ProjState>(directory);
+  }
+
+  void GiveBack(std::unique_ptr<ProjState> state) {
+    constexpr std::size_t kMostIdle = 16;
+    const std::unique_lock lock(mutex_, std::try_to_lock);
+    if (!lock.owns_lock()) return;
+    ForgetParents();
+    if (idle_.size() < kMostIdle) idle_.push_back(std::move(state));
+  }
+
+ private:
+  void ForgetParents() {
+    if (process_ == platform::ProcessNumber()) return;
+    process_ = platform::ProcessNumber();
+    for (std::unique_ptr<ProjState>& state : idle_) static_cast<void>(state.release());
+    idle_.clear();
+  }
+
+  std::mutex mutex_;
+  int process_ = platform::ProcessNumber();
+  std::vector<std::unique_ptr<ProjState>> idle_;  // the latest last
+};
+
+std::string DataDirectory() {
+  const std::lock_guard lock(gDirectoryMutex);
+  return gDirectory;
+}
+
+/// The state that a thread has from its first use on until it ends.
+struct Borrowed {
+  Borrowed() : state(ProjPool::Get().Take(DataDirectory())) {}
+  ~Borrowed() { ProjPool::Get().GiveBack(std::move(state)); }
+  Borrowed(const Borrowed&) = delete;
+  Borrowed& operator=(const Borrowed&) = delete;
+
+  std::unique_ptr<ProjState> state;
+};
+
+ProjState& State() {
+  thread_local Borrowed borrowed;
+  return *borrowed.state;
 }
 
 }  // namespace
@@ -70,7 +133,7 @@ PJ_CONTEXT* ThreadContext() {
 }
 
 PJ* CachedTransform(const std::string& key, const std::function<PjPtr(PJ_CONTEXT*)>& make) {
-  ThreadState& state = State();
+  ProjState& state = State();
   const auto at = state.transforms.find(key);
   if (at != state.transforms.end()) return at->second.get();
   if (state.transforms.size() >= kMostTransforms) state.transforms.clear();

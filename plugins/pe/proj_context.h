@@ -15,10 +15,11 @@ using PjPtr = std::unique_ptr<PJ, PjDeleter>;
 /// Sets a directory in which contexts made from now on look for proj.db and grids first.
 void SetDataDirectory(const std::string& directory);
 
-/// The PROJ context of the calling thread, without network access; lives as long as the thread.
+/// The PROJ context of the calling thread, without network access; another thread may have it once
+/// this one has ended.
 PJ_CONTEXT* ThreadContext();
 
-/// A compiled transform that the calling thread keeps under `key`; made by `make` at first use.
+/// A compiled transform that the thread's context keeps under `key`; made by `make` at first use.
 /// Null when it can't be made, which is kept too.
 PJ* CachedTransform(const std::string& key, const std::function<PjPtr(PJ_CONTEXT*)>& make);
 

@@ -1,5 +1,8 @@
+#include "foundation/plugin_library.h"
 #include "memory_factory.h"
 #include "pyramid_factory.h"
+
+VEXG_OWN_PLUGIN;
 
 /// The entry point of the plug-in.
 extern "C" VEXG_EXPORT lumo::DataConnectionFactory* CreateDataConnectionFactory(

@@ -1,6 +1,9 @@
+#include "foundation/plugin_library.h"
 #include "gdal_common/messages.h"
 #include "gdal_common/source.h"
 #include "shape_connection.h"
+
+VEXG_OWN_PLUGIN;
 
 namespace lumo::shapefile {
 namespace {

@@ -3,6 +3,7 @@
 #include "data/access_policy.h"
 #include "data/data_manager.h"
 #include "data/dc_srv_call.h"
+#include "data/format_detection.h"
 #include "data/mt_raster_reader_body.h"
 #include "data/mt_vector_reader_body.h"
 
@@ -65,9 +66,11 @@ SourceStamp MtConnection<Base>::Stamp() {
 template <typename Base>
 bool MtConnection<Base>::Connect(const Array<String>& connStrings, const GeoRefPtr& geoRef,
                                  const MetadataPtr&) {
+  const FormatDetection* const detection = DetectedScope::Current();
   return Exchange(connStrings, false, [&] {
     return detail::CallServer(Server(), 2, "DcSrvCmdDcConnect", false,
                               [&](DcSrvContext& context, bool& result) {
+                                const DetectedScope scope(detection);
                                 result = Replace(context, [&](DataManager& manager) {
                                   return manager.ConnectDirect(connStrings, geoRef, MetadataPtr());
                                 });

@@ -1,13 +1,11 @@
-#include <cerrno>
-#include <cstring>
+#include <algorithm>
 #include <filesystem>
-#include <vector>
 
 #include "data/access_policy.h"
 #include "data/data_manager.h"
+#include "data/format_detection.h"
 #include "data/mt_connection.h"
 #include "foundation/fault.h"
-#include "foundation/file_faults.h"
 #include "foundation/thrown.h"
 #include "platform/memory_shortage.h"
 
@@ -30,48 +28,6 @@ DataConnectionPtr TryConnect(DataConnectionFactory& factory, const Array<String>
   return Guarded([&] { return factory.Connect(connStrings, geoRef, metadata); });
 }
 
-std::string Describe(const FileFault& fault) {
-  return fault.path + ": " + fault.Text();
-}
-
-/// Takes the fault of a row that has no factory; gives it where the plug-in is there and the system
-/// would not load it, and nothing where there is no such plug-in.
-String WhyNotLoaded(const FormatRecord& record) {
-  const String why = TakeFault();
-  const bool isAbsent = why.ToUTF8().find(std::strerror(ENOENT)) != std::string::npos;
-  return record.library == nullptr && !isAbsent ? why : String();
-}
-
-/// The factories that recognise the source, in the order of the table.
-/// @param unread  [out] why a file could not be read that had to be, to recognise the source: its
-///                own, one beside it or a plug-in. Where that is the source's own file, the formats
-///                that follow are not asked: what they make of it is nothing to go by.
-std::vector<DataConnectionFactory*> FindWilling(const Array<String>& connStrings, String& unread) {
-  std::vector<DataConnectionFactory*> willing;
-  std::error_code fault;
-  const std::string own = connStrings.GetCount() != 0
-                              ? std::filesystem::absolute(connStrings[0].ToUTF8(), fault).string()
-                              : std::string();
-  const FileFaults faults;
-  for (std::uint32_t row = 0; row < FormatCount(); ++row) {
-    const FormatRecord& format = GetFormat(row);
-    if (!MayUseFormat(format)) continue;
-    LoadFormat(row);
-    DataConnectionFactory* const factory = GetFactory(format);
-    if (factory == nullptr) {
-      if (unread.GetLength() == 0) unread = WhyNotLoaded(format);
-      continue;
-    }
-    if (Guarded([&] { return factory->CanConnect(connStrings); })) willing.push_back(factory);
-    if (const FileFault* const found = faults.FirstOf(own)) {
-      unread = Describe(*found);
-      return {};
-    }
-  }
-  if (unread.GetLength() == 0 && faults.First() != nullptr) unread = Describe(*faults.First());
-  return willing;
-}
-
 /// Why no format recognises a source, in one line.
 String DescribeUnrecognised(const Array<String>& connStrings) {
   if (connStrings.GetCount() == 0) return "no source named";
@@ -87,6 +43,22 @@ String DescribeUnrecognised(const Array<String>& connStrings) {
     return name + ": the file is empty";
   }
   return name + ": in no known format";
+}
+
+void SetUnrecognised(const FormatDetection& detection, const Array<String>& connStrings) {
+  SetFault(detection.unread.GetLength() != 0 ? detection.unread
+                                             : DescribeUnrecognised(connStrings));
+}
+
+/// The kind of a source that only plug-ins of the library were asked for: they are of the kinds
+/// that their rows say, so that none need be opened to find out. 0 where it has to be.
+std::int32_t KindOf(const FormatDetection& detection) {
+  if (!detection.isOwn || detection.willing.empty()) return 0;
+  const std::int32_t kind = GetFormat(detection.willing.front()).kind;
+  const bool areSame =
+      std::all_of(detection.willing.begin(), detection.willing.end(),
+                  [kind](std::uint32_t row) { return GetFormat(row).kind == kind; });
+  return areSame ? kind : 0;
 }
 
 template <typename Proxy>
@@ -107,18 +79,20 @@ DataConnectionPtr MtDataConnectionFactory::ConnectDirect(const Array<String>& co
     if (factory == nullptr) return {};
     return TryConnect(*factory, connStrings, geoRef, metadata);
   }
-  String unread;
-  const std::vector<DataConnectionFactory*> willing = FindWilling(connStrings, unread);
+  const FormatDetection* known = DetectedScope::Current();
+  const FormatDetection detection = known != nullptr ? *known : DetectFormats(connStrings);
   TakeFault();  // of rows that don't load: they are none of this source's
-  if (willing.empty()) {
-    SetFault(unread.GetLength() != 0 ? unread : DescribeUnrecognised(connStrings));
+  if (detection.willing.empty()) {
+    SetUnrecognised(detection, connStrings);
   }
-  if (willing.size() == 1) {
-    const DataConnectionPtr made = TryConnect(*willing.front(), connStrings, geoRef, metadata);
+  const auto factoryOf = [](std::uint32_t row) { return GetFactory(GetFormat(row)); };
+  if (detection.willing.size() == 1) {
+    const DataConnectionPtr made =
+        TryConnect(*factoryOf(detection.willing.front()), connStrings, geoRef, metadata);
     if (made) return made;
   }
-  for (DataConnectionFactory* const factory : willing) {
-    const DataConnectionPtr made = TryConnect(*factory, connStrings, geoRef, MetadataPtr());
+  for (const std::uint32_t row : detection.willing) {
+    const DataConnectionPtr made = TryConnect(*factoryOf(row), connStrings, geoRef, MetadataPtr());
     if (made) return made;
   }
   return {};
@@ -148,7 +122,20 @@ DataConnectionPtr MtDataConnectionFactory::Connect(const Array<String>& connStri
   if (!MayUseSource(connStrings, false)) return {};
   const FormatRecord* const record = FindFormat(FindFormatName(connStrings));
   std::int32_t kind = record != nullptr ? record->kind : 0;
+  FormatDetection detection;
+  bool isDetected = false;
   if (kind == 0) {
+    detection = DetectFormats(connStrings);
+    TakeFault();
+    kind = KindOf(detection);
+    isDetected = kind != 0;
+  }
+  const DetectedScope scope(isDetected ? &detection : nullptr);
+  if (kind == 0) {
+    if (detection.isOwn && detection.willing.empty()) {
+      SetUnrecognised(detection, connStrings);
+      return {};
+    }
     const DataConnectionPtr probe = ConnectDirect(connStrings, geoRef, metadata);
     if (!probe) return {};
     kind = Guarded([&] { return probe->DataSourceType(); });

@@ -3,8 +3,10 @@
 #include <filesystem>
 #include <map>
 #include <mutex>
+#include <string_view>
 
 #include "foundation/environment.h"
+#include "platform/random_access_file.h"
 
 namespace lumo {
 namespace {
@@ -30,6 +32,20 @@ Changes ChangesOf(const std::vector<std::string>& paths) {
   return changes;
 }
 
+/// Looks for the note of VEXG_OWN_PLUGIN.
+bool HasOwnMark(const std::string& path) {
+  constexpr std::size_t kFirstBytes = 8192;
+  const auto file =
+      platform::RandomAccessFile::Open(path, platform::RandomAccessFile::Access::kRead, nullptr,
+                                       platform::RandomAccessFile::Gate::kPassed);
+  std::string bytes(kFirstBytes, '\0');
+  std::size_t got = 0;
+  if (file == nullptr || !file->ReadUpTo(0, bytes.data(), bytes.size(), got)) return false;
+  bytes.resize(got);
+  static constexpr char kMark[] = "vexg-pi\0comes with vexg";
+  return bytes.find(std::string_view(kMark, sizeof kMark)) != bytes.npos;
+}
+
 struct Failure {
   Changes changes;
   std::string fault;
@@ -46,6 +62,22 @@ std::vector<std::string> PluginDirectories() {
   directories.push_back(own + "/vexg/plugins-" + InterfaceVersion());
   directories.push_back(own);
   return directories;
+}
+
+bool IsOwnPlugin(const std::string& name) {
+  static std::mutex mutex;
+  static auto& known = *new std::map<std::vector<std::string>, std::pair<Changes, bool>>;
+  std::vector<std::string> paths = PluginDirectories();
+  for (std::string& path : paths) path.append("/").append(name);
+  const Changes changes = ChangesOf(paths);
+  const std::lock_guard lock(mutex);
+  const auto at = known.find(paths);
+  if (at != known.end() && at->second.first == changes) return at->second.second;
+  std::size_t i = 0;
+  while (i < paths.size() && changes[i] == fs::file_time_type::min()) ++i;
+  const bool isOwn = i < paths.size() && HasOwnMark(paths[i]);
+  known[paths] = {changes, isOwn};
+  return isOwn;
 }
 
 platform::Module LoadPlugin(const std::string& name, std::string& fault) {

@@ -22,15 +22,20 @@ VerbRegistration::VerbRegistration(const char* name, const char* summary, Setup 
   Registry()[name] = {summary, setup};
 }
 
+Verb MakeVerb(const std::string& name) {
+  Verb verb;
+  const auto at = Registry().find(name);
+  if (at == Registry().end()) return verb;
+  verb.name = name;
+  verb.summary = at->second.summary;
+  verb.work = at->second.setup(verb.options);
+  return verb;
+}
+
 const std::vector<Verb>& GetVerbs() {
   static const std::vector<Verb> verbs = [] {
     std::vector<Verb> made;
-    for (const auto& [name, registered] : Registry()) {
-      Verb& verb = made.emplace_back();
-      verb.name = name;
-      verb.summary = registered.summary;
-      verb.work = registered.setup(verb.options);
-    }
+    for (const auto& [name, registered] : Registry()) made.push_back(MakeVerb(name));
     return made;
   }();
   return verbs;

@@ -49,6 +49,10 @@ const std::vector<Verb>& GetVerbs();
 /// The verb of a name; null for none.
 const Verb* FindVerb(const std::string& name);
 
+/// Makes a verb of a name with options of its own, to be run beside others of its name. Without
+/// work where there is no such verb.
+Verb MakeVerb(const std::string& name);
+
 /// Puts a verb into the list. A static object beside the verb's code does it.
 ///
 /// `setup` adds the verb's options and gives the function that does the work, which runs when the

@@ -47,6 +47,14 @@ constinit Next<void*(std::size_t, std::size_t)> gAlignedAlloc("aligned_alloc");
 constinit Next<void*(std::size_t, std::size_t)> gMemalign("memalign");
 constinit Next<int(void**, std::size_t, std::size_t)> gPosixMemalign("posix_memalign");
 
+/// Finds all of them before the program begins. Found at their first use they could be looked up
+/// while the loader writes down why it failed, and that look-up frees what it writes in.
+[[maybe_unused]] const bool gAreFound = [] {
+  gMalloc.Get(), gCalloc.Get(), gRealloc.Get();
+  gAlignedAlloc.Get(), gMemalign.Get(), gPosixMemalign.Get();
+  return true;
+}();
+
 void Look(bool isMade, std::size_t bytes) {
   if (!isMade && bytes != 0 && bytes <= kMostOfSense) lumo::platform::NoteMemoryShortage();
 }

@@ -171,6 +171,37 @@ Strings JoinLists(const Strings& arguments) {
   return joined;
 }
 
+/// Puts the arguments of the verb that "batch" is to run behind "--", where they belong to none of
+/// its own options.
+Strings MoveBatchWords(const Strings& arguments) {
+  const std::size_t batchAt = FindVerbPlace(arguments);
+  if (batchAt >= arguments.size() || arguments[batchAt] != "batch") return arguments;
+  const Verb& batch = *FindVerb("batch");
+  Strings own(arguments.begin(), arguments.begin() + static_cast<std::ptrdiff_t>(batchAt) + 1);
+  Strings words;
+  bool hasVerb = false;
+  for (std::size_t i = batchAt + 1; i < arguments.size(); ++i) {
+    const std::string& argument = arguments[i];
+    const std::string name = argument.substr(0, argument.find('='));
+    const OptionSpec* const option = name.starts_with('-') ? batch.options.Find(name) : nullptr;
+    if (argument == "--") {
+      words.insert(words.end(), arguments.begin() + static_cast<std::ptrdiff_t>(i) + 1,
+                   arguments.end());
+      break;
+    }
+    const bool isHelp = !hasVerb && (argument == "--help" || argument == "-h");
+    const bool isVerb = !hasVerb && !argument.starts_with('-');
+    hasVerb = hasVerb || isVerb;
+    (isVerb || isHelp || option != nullptr ? own : words).push_back(argument);
+    const bool hasValue = option != nullptr && option->type != OptionType::kFlag;
+    if (hasValue && name == argument && i + 1 < arguments.size()) own.push_back(arguments[++i]);
+  }
+  if (words.empty()) return own;
+  own.emplace_back("--");
+  own.insert(own.end(), words.begin(), words.end());
+  return own;
+}
+
 void AddLongNames(const OptionSet& options, Strings& names) {
   for (const OptionSpec& option : options.Options()) {
     for (const std::string& name : option.names) {
@@ -208,7 +239,7 @@ std::string DescribeFault(const Strings& arguments, const CLI::ParseError& error
 
 CommandLine ReadCommandLine(const Strings& arguments) {
   Parser parser;
-  const Strings joined = JoinLists(arguments);
+  const Strings joined = JoinLists(MoveBatchWords(arguments));
   try {
     parser.app.parse(Strings(joined.rbegin(), joined.rend()));  // as the parser takes them
   } catch (const CLI::CallForVersion& version) {
@@ -220,6 +251,22 @@ CommandLine ReadCommandLine(const Strings& arguments) {
     throw HostError(kExitUsage, DescribeFault(arguments, error));
   }
   return {FindVerb(parser.app.get_subcommands().front()->get_name()), {}};
+}
+
+void ReadVerbArguments(const Verb& verb, const Strings& arguments) {
+  CLI::App app{"", "vexg"};
+  app.require_subcommand(1);
+  app.fallthrough();
+  AddTo(app, GetGeneralOptions());
+  AddTo(*app.add_subcommand(verb.name, verb.summary), verb.options);
+  Strings line{verb.name};
+  line.insert(line.end(), arguments.begin(), arguments.end());
+  line = JoinLists(line);
+  try {
+    app.parse(Strings(line.rbegin(), line.rend()));
+  } catch (const CLI::ParseError& error) {
+    throw HostError(kExitUsage, DescribeFault(line, error));
+  }
 }
 
 std::string HelpOf(const Verb* verb) {

@@ -1,4 +1,4 @@
-#include "commands/xml_runtime.h"
+#include "xml_runtime.h"
 
 #include <mutex>
 #include <new>

@@ -4,8 +4,8 @@
 
 namespace lumo {
 
-/// Holds the XML library ready for the length of one parse or write. The library is made ready when
-/// libvexg is loaded and ended when it is unloaded; work that comes later is refused.
+/// Holds the XML library ready for the length of one parse or write. It is made ready when this
+/// plug-in is loaded, and ended when that is unloaded; work that comes later is refused.
 class XMLRuntime {
  public:
   XMLRuntime();

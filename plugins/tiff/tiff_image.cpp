@@ -1,0 +1,93 @@
+#include "tiff/tiff_image.h"
+
+#include <algorithm>
+
+#include "raster/pixel_types.h"
+
+namespace lumo::tiff {
+namespace {
+
+constexpr std::uint64_t kMostSide = INT32_MAX;
+/// A block beyond this is left to readers that don't decode blocks whole.
+constexpr std::uint64_t kMostBlockBytes = 16 << 20;
+
+unsigned TypeCode(unsigned format, unsigned bytes) {
+  constexpr unsigned kUnsigned = 1, kSigned = 2, kFloat = 3;
+  switch (format * 16 + bytes) {
+    case kUnsigned * 16 + 1:
+      return kDataTypeOf<std::uint8_t>;
+    case kUnsigned * 16 + 2:
+      return kDataTypeOf<std::uint16_t>;
+    case kUnsigned * 16 + 4:
+      return kDataTypeOf<std::uint32_t>;
+    case kUnsigned * 16 + 8:
+      return kDataTypeOf<std::uint64_t>;
+    case kSigned * 16 + 2:
+      return kDataTypeOf<std::int16_t>;
+    case kSigned * 16 + 4:
+      return kDataTypeOf<std::int32_t>;
+    case kSigned * 16 + 8:
+      return kDataTypeOf<std::int64_t>;
+    case kFloat * 16 + 4:
+      return kDataTypeOf<float>;
+    case kFloat * 16 + 8:
+      return kDataTypeOf<double>;
+    default:
+      return 0;
+  }
+}
+
+}  // namespace
+
+unsigned Image::DataType() const {
+  return TypeCode(sampleFormat, elementBytes);
+}
+
+std::optional<Image> FindImage(const File& file, const Directory& directory) {
+  const auto number = [&](Tag tag, std::uint64_t absent) {
+    return file.Number(directory, tag, absent);
+  };
+  const std::uint64_t samples = number(kImageWidth, 0), lines = number(kImageLength, 0);
+  const std::uint64_t bands = number(kSamplesPerPixel, 1), bits = number(kBitsPerSample, 0);
+  const std::uint64_t compression = number(kCompression, 0), format = number(kSampleFormat, 1);
+  const std::uint64_t planar = number(kPlanarConfiguration, 1), predictor = number(kPredictor, 1);
+  const bool isUsable = samples != 0 && lines != 0 && bands != 0 && samples <= kMostSide &&
+                        lines <= kMostSide && bands <= 65535 && bits != 0 && bits % 8 == 0 &&
+                        bits <= 64 && IsKnown(compression) && format >= 1 && format <= 3 &&
+                        (planar == 1 || planar == 2) && predictor >= 1 && predictor <= 3 &&
+                        number(kFillOrder, 1) == 1 && number(kOrientation, 1) == 1;
+  if (!isUsable) return std::nullopt;
+  // A tag whose values differ gives what is passed for a missing one: there are none of these.
+  if (directory.contains(kSampleFormat) && number(kSampleFormat, 0) == 0) return std::nullopt;
+  Image image;
+  image.samples = static_cast<unsigned>(samples);
+  image.lines = static_cast<unsigned>(lines);
+  image.bands = static_cast<unsigned>(bands);
+  image.elementBytes = static_cast<unsigned>(bits / 8);
+  image.sampleFormat = static_cast<unsigned>(format);
+  image.compression = static_cast<Compression>(compression);
+  image.predictor = compression == 1 ? 1 : static_cast<unsigned>(predictor);
+  image.byPixel = planar == 1 && bands > 1;
+  image.isTiled = directory.contains(kTileOffsets);
+  image.directory = &directory;
+  if (image.isTiled == directory.contains(kStripOffsets)) return std::nullopt;
+  const std::uint64_t width = image.isTiled ? number(kTileWidth, 0) : samples;
+  const std::uint64_t height =
+      image.isTiled
+          ? number(kTileLength, 0)
+          : std::min(number(kRowsPerStrip, directory.contains(kRowsPerStrip) ? 0 : lines), lines);
+  const bool hasBlocks = width != 0 && height != 0 && width <= kMostSide && height <= kMostSide &&
+                         width * image.PixelBytes() <= kMostBlockBytes / height;
+  if (!hasBlocks || image.DataType() == 0) return std::nullopt;
+  if (image.predictor == 3 && image.sampleFormat != 3) return std::nullopt;
+  if (image.predictor == 2 && image.sampleFormat == 3) return std::nullopt;
+  image.blockWidth = static_cast<unsigned>(width);
+  image.blockHeight = static_cast<unsigned>(height);
+  const auto at = directory.find(image.isTiled ? kTileOffsets : kStripOffsets);
+  const auto sizes = directory.find(image.isTiled ? kTileByteCounts : kStripByteCounts);
+  const bool isWhole = sizes != directory.end() && at->second.count == image.Blocks() &&
+                       sizes->second.count == image.Blocks();
+  return isWhole ? std::optional(image) : std::nullopt;
+}
+
+}  // namespace lumo::tiff

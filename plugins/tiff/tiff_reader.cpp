@@ -1,0 +1,7 @@
+#include "tiff/tiff_reader_body.h"
+
+namespace lumo::tiff {
+
+VEXG_INSTANCES(TWELVE, Reader);
+
+}  // namespace lumo::tiff

@@ -1,0 +1,198 @@
+#pragma once
+
+#include <algorithm>
+
+#include "raster/no_data_marker.h"
+#include "raster/pixel_value.h"
+#include "tiff/tiff_reader.h"
+
+namespace lumo::tiff {
+
+template <typename T>
+Reader<T>::Reader(RasterDataConnection* connection, Source& source, const lumo::RasterDef& def)
+    : PlainRasterReader<T>(connection), source_(source), def_(def) {
+  if (!source.NoData()) return;
+  noData_ = ToPixel<T>(*source.NoData());
+  def_.noData.clear();
+  for (unsigned band = 0; noData_ && band < def_.bands; ++band) {
+    if constexpr (std::is_arithmetic_v<T>) def_.noData[band] = static_cast<double>(*noData_);
+  }
+}
+
+/// GDAL's reader of the same file; null, with the fault set, when there is none.
+template <typename T>
+RasterReader<T>* Reader<T>::Inner() {
+  const RasterDataConnectionPtr inner = source_.Inner();
+  return inner ? inner->RasterReaderDispatch()->template Get<T>().Get() : nullptr;
+}
+
+/// The same for what changes the file.
+template <typename T>
+RasterReader<T>* Reader<T>::Changing() {
+  hasChanged_ = true;
+  return Inner();
+}
+
+template <typename T>
+unsigned Reader<T>::Samples(unsigned level) {
+  if (RasterReader<T>* const inner = Opened()) return inner->Samples(level);
+  const auto at = source_.Levels().find(level);
+  return at != source_.Levels().end() ? at->second.samples : 0;
+}
+
+template <typename T>
+unsigned Reader<T>::Lines(unsigned level) {
+  if (RasterReader<T>* const inner = Opened()) return inner->Lines(level);
+  const auto at = source_.Levels().find(level);
+  return at != source_.Levels().end() ? at->second.lines : 0;
+}
+
+template <typename T>
+std::int32_t Reader<T>::PyramidResamplingMethod() {
+  RasterReader<T>* const inner = Opened();
+  return inner != nullptr ? inner->PyramidResamplingMethod() : 0;
+}
+
+template <typename T>
+std::int32_t Reader<T>::PyramidLevelMin() {
+  if (RasterReader<T>* const inner = Opened()) return inner->PyramidLevelMin();
+  return PyramidExists() ? static_cast<std::int32_t>(std::next(source_.Levels().begin())->first)
+                         : 0;
+}
+
+template <typename T>
+std::int32_t Reader<T>::PyramidLevelMax() {
+  if (RasterReader<T>* const inner = Opened()) return inner->PyramidLevelMax();
+  return PyramidExists() ? static_cast<std::int32_t>(source_.Levels().rbegin()->first) : 0;
+}
+
+template <typename T>
+bool Reader<T>::PyramidExists() {
+  if (RasterReader<T>* const inner = Opened()) return inner->PyramidExists();
+  return source_.Levels().size() > 1;
+}
+
+template <typename T>
+bool Reader<T>::PyramidBuild(std::int32_t levelMin, std::int32_t levelMax,
+                             std::int32_t resamplingMethod, const TileDimensions& tiles) {
+  RasterReader<T>* const inner = Changing();
+  return inner != nullptr && inner->PyramidBuild(levelMin, levelMax, resamplingMethod, tiles);
+}
+
+template <typename T>
+bool Reader<T>::PyramidRebuild() {
+  RasterReader<T>* const inner = Changing();
+  return inner != nullptr && inner->PyramidRebuild();
+}
+
+template <typename T>
+bool Reader<T>::PyramidDelete() {
+  RasterReader<T>* const inner = Changing();
+  return inner != nullptr && inner->PyramidDelete();
+}
+
+template <typename T>
+bool Reader<T>::PyramidRefresh() {
+  RasterReader<T>* const inner = Changing();
+  return inner != nullptr && inner->PyramidRefresh();
+}
+
+template <typename T>
+std::int32_t Reader<T>::StatsMask() {
+  return std::is_arithmetic_v<T> ? lumo::StatsMask::Extended : lumo::StatsMask::None;
+}
+
+template <typename T>
+bool Reader<T>::StatsExist(unsigned band) {
+  RasterReader<T>* const inner = Opened();
+  return inner != nullptr && inner->StatsExist(band);
+}
+
+template <typename T>
+RasterBandStats<T> Reader<T>::ReadStats(unsigned band) {
+  RasterReader<T>* const inner = Opened();
+  return inner != nullptr ? inner->ReadStats(band) : RasterBandStats<T>();
+}
+
+template <typename T>
+bool Reader<T>::WriteStats(const Array<RasterBandStats<T>>& stats) {
+  RasterReader<T>* const inner = CanWriteStats() ? Inner() : nullptr;
+  return inner != nullptr && inner->WriteStats(stats);
+}
+
+template <typename T>
+Array<RasterBandHistogram<T>> Reader<T>::Histogram(unsigned band) {
+  RasterReader<T>* const inner = Opened();
+  return inner != nullptr ? inner->Histogram(band) : Array<RasterBandHistogram<T>>();
+}
+
+template <typename T>
+bool Reader<T>::WriteHistogram(const Array<RasterBandHistogram<T>>& histograms) {
+  RasterReader<T>* const inner = CanWriteHistogram() ? Inner() : nullptr;
+  return inner != nullptr && inner->WriteHistogram(histograms);
+}
+
+template <typename T>
+bool Reader<T>::HasPalette(unsigned band) {
+  RasterReader<T>* const inner = Opened();
+  return inner != nullptr && inner->HasPalette(band);
+}
+
+template <typename T>
+lumo::Palette Reader<T>::Palette(unsigned band) {
+  RasterReader<T>* const inner = Opened();
+  return inner != nullptr ? inner->Palette(band) : lumo::Palette();
+}
+
+template <typename T>
+bool Reader<T>::WritePalette(unsigned band, const lumo::Palette& palette) {
+  RasterReader<T>* const inner = Changing();
+  return inner != nullptr && inner->WritePalette(band, palette);
+}
+
+template <typename T>
+bool Reader<T>::DeletePalette(unsigned band) {
+  RasterReader<T>* const inner = Changing();
+  return inner != nullptr && inner->DeletePalette(band);
+}
+
+template <typename T>
+bool Reader<T>::IsInside(unsigned left, unsigned top, unsigned width, unsigned height,
+                         const Array<unsigned>& bands, unsigned level) const {
+  const auto at = source_.Levels().find(level);
+  return at != source_.Levels().end() && width != 0 && height != 0 && bands.GetCount() != 0 &&
+         std::uint64_t{left} + width <= at->second.samples &&
+         std::uint64_t{top} + height <= at->second.lines &&
+         std::all_of(bands.begin(), bands.end(), [&](unsigned band) { return band < def_.bands; });
+}
+
+template <typename T>
+bool Reader<T>::ReadPixels(unsigned left, unsigned top, unsigned width, unsigned height,
+                           const Array<unsigned>& bands, unsigned level, T* pixels,
+                           unsigned char* state) {
+  const bool isRead = !hasChanged_ && IsInside(left, top, width, height, bands, level) &&
+                      source_.Read({left, top, width, height}, bands, level,
+                                   reinterpret_cast<unsigned char*>(pixels));
+  if (!isRead) {
+    // GDAL says what is wrong, or reads what is of another kind.
+    RasterReader<T>* const inner = Inner();
+    return inner != nullptr &&
+           inner->ReadPixels(left, top, width, height, bands, level, pixels, state);
+  }
+  if (!noData_) return true;
+  const NoDataMarker<T> marker(std::vector<std::optional<T>>(bands.GetCount(), noData_),
+                               def_.interleave, width, height);
+  marker.Mark(0, std::uint64_t{width} * height * bands.GetCount(), pixels, state);
+  return true;
+}
+
+template <typename T>
+bool Reader<T>::WritePixels(unsigned left, unsigned top, unsigned width, unsigned height,
+                            const Array<unsigned>& bands, unsigned level, const T* pixels,
+                            const unsigned char* state) {
+  RasterReader<T>* const inner = Changing();
+  return inner != nullptr &&
+         inner->WritePixels(left, top, width, height, bands, level, pixels, state);
+}
+
+}  // namespace lumo::tiff

@@ -1,0 +1,243 @@
+#include "tiff/tiff_source.h"
+
+#include <algorithm>
+#include <charconv>
+#include <cmath>
+#include <cstdlib>
+#include <limits>
+
+#include "foundation/fault.h"
+#include "gdal_common/level_number.h"
+#include "raster/pixel_types.h"
+#include "raster/raster_details.h"
+#include "tiff/tiff_place.h"
+#include "tiff/tiff_siblings.h"
+
+namespace lumo::tiff {
+namespace {
+
+/// Tags that are texts about the raster, by GDAL's names of them.
+struct NamedTag {
+  Tag tag;
+  const char* name;
+};
+constexpr NamedTag kTexts[] = {{kImageDescription, "TIFFTAG_IMAGEDESCRIPTION"},
+                               {kSoftware, "TIFFTAG_SOFTWARE"},
+                               {kDateTime, "TIFFTAG_DATETIME"},
+                               {kArtist, "TIFFTAG_ARTIST"},
+                               {kHostComputer, "TIFFTAG_HOSTCOMPUTER"},
+                               {kCopyright, "TIFFTAG_COPYRIGHT"}};
+
+/// Tags that are understood here. A file with another one is GDAL's.
+bool IsKnown(std::uint16_t tag) {
+  static constexpr std::uint16_t kTags[] = {
+      kSubfileType,     kImageWidth,      kImageLength,      kBitsPerSample,       kCompression,
+      kPhotometric,     kFillOrder,       kImageDescription, kStripOffsets,        kOrientation,
+      kSamplesPerPixel, kRowsPerStrip,    kStripByteCounts,  kPlanarConfiguration, kSoftware,
+      kDateTime,        kArtist,          kHostComputer,     kPredictor,           kTileWidth,
+      kTileLength,      kTileOffsets,     kTileByteCounts,   kExtraSamples,        kSampleFormat,
+      kCopyright,       kModelPixelScale, kModelTiepoint,    kGeoKeyDirectory,     kGeoDoubleParams,
+      kGeoAsciiParams,  kNoData};
+  return std::find(std::begin(kTags), std::end(kTags), tag) != std::end(kTags);
+}
+
+/// Settings by which GDAL reads such files in other ways.
+bool HasSettings() {
+  for (const char* const name :
+       {"GTIFF_POINT_GEO_IGNORE", "GDAL_GEOREF_SOURCES", "GTIFF_HONOUR_NEGATIVE_SCALEY",
+        "GDAL_PAM_PROXY_DIR", "GTIFF_LINEAR_UNITS", "GTIFF_REPORT_COMPD_CS"}) {
+    if (std::getenv(name) != nullptr) return true;
+  }
+  return false;
+}
+
+constexpr unsigned kGray = 1, kRgb = 2;  // of the tag Photometric
+
+/// Says whether the bands mean what a plain raster's do: colours, or numbers.
+bool FindMeaning(const File& file, const Directory& directory, unsigned bands, bool& isRgb) {
+  const std::uint64_t photometric = file.Number(directory, kPhotometric, 0);
+  isRgb = photometric == kRgb;
+  if (photometric != kGray && !(isRgb && bands >= 3)) return false;
+  const unsigned extra = bands - (isRgb ? 3 : 1);
+  std::vector<std::uint64_t> kinds;
+  if (extra == 0) return !directory.contains(kExtraSamples);
+  return file.ReadNumbers(directory, kExtraSamples, bands, kinds) && kinds.size() == extra &&
+         std::all_of(kinds.begin(), kinds.end(), [](std::uint64_t kind) { return kind == 0; });
+}
+
+const char* WordOf(Compression compression) {
+  switch (compression) {
+    case Compression::kLzw:
+      return "LZW";
+    case Compression::kDeflate:
+    case Compression::kOldDeflate:
+      return "DEFLATE";
+    case Compression::kZstd:
+      return "ZSTD";
+    default:
+      return nullptr;
+  }
+}
+
+/// The value that marks pixels as not valid; false for a text that isn't plainly a number.
+bool ReadNoData(const File& file, const Image& image, std::optional<double>& value) {
+  if (!image.directory->contains(kNoData)) return true;
+  std::string text;
+  if (!file.ReadText(*image.directory, kNoData, text) || image.elementBytes == 8) return false;
+  double number = 0;
+  const char* const end = text.data() + text.size();
+  if (text == "nan") {
+    number = std::numeric_limits<double>::quiet_NaN();
+  } else if (const auto [stop, fault] = std::from_chars(text.data(), end, number);
+             fault != std::errc() || stop != end || !std::isfinite(number)) {
+    return false;
+  }
+  if (image.sampleFormat == 3 && !std::isnan(number)) {
+    // Texts of the largest float differ in their last digits.
+    constexpr double kMost = std::numeric_limits<float>::max();
+    if (std::abs(std::abs(number) - kMost) < 1e-10 * kMost) number = std::copysign(kMost, number);
+    if (std::abs(number) > kMost) return false;
+    number = static_cast<float>(number);
+  }
+  value = number;
+  return true;
+}
+
+/// Of a file that GDAL laid out as "cloud optimised"; nothing for one that was changed afterwards.
+std::optional<bool> IsCloudOptimised(const File& file) {
+  const std::string head = file.Head();
+  if (!head.starts_with("GDAL_STRUCTURAL_METADATA_SIZE=")) return false;
+  const std::string_view words(head.data(), std::min<std::size_t>(head.size(), 4096));
+  if (words.find("KNOWN_INCOMPATIBLE_EDITION=YES") != words.npos) return std::nullopt;
+  return words.find("LAYOUT=IFDS_BEFORE_DATA") != words.npos;
+}
+
+}  // namespace
+
+std::unique_ptr<Source> Source::Open(const std::string& path, const String& formatKey,
+                                     Opener opener) {
+  if (HasSettings() || !StandsAlone(path)) return nullptr;
+  std::unique_ptr<File> file = File::Open(path);
+  if (file == nullptr) return nullptr;
+  std::unique_ptr<Source> source(new Source(std::move(file), std::move(opener)));
+  return source->FindLevels() && source->Describe(formatKey) ? std::move(source) : nullptr;
+}
+
+bool Source::FindLevels() {
+  constexpr std::uint64_t kReduced = 1;
+  const std::vector<Directory>& directories = file_->Directories();
+  for (const Directory& directory : directories) {
+    for (const auto& [tag, entry] : directory) {
+      if (!IsKnown(tag)) return false;
+    }
+    const bool isFirst = &directory == &directories.front();
+    const std::optional<Image> image = FindImage(*file_, directory);
+    if (!image || file_->Number(directory, kSubfileType, 0) != (isFirst ? 0 : kReduced)) {
+      return false;
+    }
+    if (isFirst) {
+      levels_.emplace(0, *image);
+      continue;
+    }
+    const Image& full = levels_.at(0);
+    if (image->bands != full.bands || image->DataType() != full.DataType() ||
+        image->byPixel != full.byPixel) {
+      return false;
+    }
+    const unsigned number =
+        gdal::LevelNumber(full.samples, full.lines, image->samples, image->lines);
+    if (number != 0) levels_.emplace(number, *image);
+  }
+  // Without gaps, from the first one that there is.
+  unsigned last = 0;
+  for (auto at = std::next(levels_.begin()); at != levels_.end(); ++at) {
+    if (last != 0 && at->first != last + 1) {
+      levels_.erase(at, levels_.end());
+      break;
+    }
+    last = at->first;
+  }
+  return true;
+}
+
+bool Source::Describe(const String& formatKey) {
+  const Image& image = levels_.at(0);
+  const Directory& directory = *image.directory;
+  bool isRgb = false;
+  const std::optional<bool> isCloudOptimised = IsCloudOptimised(*file_);
+  if (!FindMeaning(*file_, directory, image.bands, isRgb) || !isCloudOptimised ||
+      !ReadNoData(*file_, image, noData_)) {
+    return false;
+  }
+  const std::optional<Place> place = FindPlace(*file_, image);
+  if (!place) return false;
+  def_.samples = image.samples;
+  def_.lines = image.lines;
+  def_.bands = image.bands;
+  def_.interleave = image.byPixel ? Interleave::BIP : Interleave::BSQ;
+  def_.dataType = image.DataType();
+  def_.format = formatKey;
+  const bool isTiled = image.blockWidth != image.samples && image.blockHeight > 1;
+  def_.tileWidth = image.blockWidth;
+  def_.tileHeight = isTiled ? image.blockHeight : 1;
+  def_.SetGeoRef(place->geoRef);
+
+  Metadata& metadata = def_.metadata;
+  const auto item = [&](const std::string& name, const std::string& text, bool isDetail) {
+    metadata.Set(String("/GDAL/Items/" + name), String(text));
+    if (isDetail) metadata.Set(DetailPath("Items/" + name), String(text));
+  };
+  const auto structure = [&](const char* name, const std::string& text) {
+    metadata.Set(String(std::string("/GDAL/IMAGE_STRUCTURE/") + name), String(text));
+  };
+  if (place->rasterType == 1) item("AREA_OR_POINT", "Area", false);
+  if (place->rasterType == 2) item("AREA_OR_POINT", "Point", true);
+  for (const NamedTag& named : kTexts) {
+    std::string text;
+    if (!directory.contains(named.tag)) continue;
+    if (!file_->ReadText(directory, named.tag, text)) return false;
+    item(named.name, text, true);
+  }
+  structure("INTERLEAVE", image.byPixel ? "PIXEL" : "BAND");
+  if (const char* const word = WordOf(image.compression)) structure("COMPRESSION", word);
+  if (image.predictor != 1) structure("PREDICTOR", std::to_string(image.predictor));
+  if (*isCloudOptimised) structure("LAYOUT", "COG");
+  const char* const colors[] = {"Red", "Green", "Blue"};
+  for (unsigned band = 0; isRgb && band < 3; ++band) {
+    metadata.Set(BandDetailPath(band, "Meaning"), String(colors[band]));
+  }
+  return true;
+}
+
+bool Source::Read(const Rect& rect, const Array<unsigned>& bands, unsigned level,
+                  unsigned char* pixels) {
+  const auto image = levels_.find(level);
+  if (image == levels_.end()) return false;
+  std::unique_ptr<Window>& window = windows_[level];
+  if (window == nullptr) window = std::make_unique<Window>(*file_, image->second);
+  return window->Read(rect, bands, pixels);
+}
+
+bool Source::CanWrite() {
+  if (!canWrite_) {
+    canWrite_ = platform::RandomAccessFile::Open(
+                    Path(), platform::RandomAccessFile::Access::kUpdate) != nullptr;
+  }
+  return *canWrite_;
+}
+
+RasterDataConnectionPtr Source::Inner() {
+  if (inner_) return inner_;
+  const RasterDataConnectionPtr opened(opener_());
+  if (!opened) return {};
+  const RasterDef def = opened->RasterDef();
+  if (def.samples != def_.samples || def.lines != def_.lines || def.bands != def_.bands ||
+      def.dataType != def_.dataType || def.interleave != def_.interleave) {
+    SetFault(Path() + ": has become another raster since it was opened");
+    return {};
+  }
+  inner_ = opened;
+  return inner_;
+}
+
+}  // namespace lumo::tiff

@@ -1,0 +1,62 @@
+#pragma once
+
+#include <functional>
+
+#include "data/data_connection.h"
+#include "raster/raster_def.h"
+#include "tiff/tiff_window.h"
+
+namespace lumo::tiff {
+
+/// Opens a source by GDAL.
+using Opener = std::function<DataConnectionPtr()>;
+
+/// An open TIFF file of a usual kind, with what its reader needs whatever the pixel type.
+///
+/// It describes itself, and gives its pixels, as GDAL would. What is asked of it beyond that, and
+/// what it can't read, goes to a connection of GDAL's, which is opened when that is first needed.
+/// Threads: one at a time, always the same.
+class Source {
+ public:
+  /// Opens a file. Null, without a word, for one that is GDAL's to open.
+  /// @param path  absolute.
+  static std::unique_ptr<Source> Open(const std::string& path, const String& formatKey,
+                                      Opener opener);
+
+  /// The description, with its metadata.
+  const RasterDef& Def() const { return def_; }
+  /// The no-data value of all bands.
+  const std::optional<double>& NoData() const { return noData_; }
+  const std::string& Path() const { return file_->Handle().Path(); }
+
+  /// The levels by number: 0, and a range without gaps from 1 on.
+  const std::map<unsigned, Image>& Levels() const { return levels_; }
+
+  /// Reads a rectangle of a level, in the order of axes of the description.
+  bool Read(const Rect& rect, const Array<unsigned>& bands, unsigned level, unsigned char* pixels);
+
+  /// True when the file may be written.
+  bool CanWrite();
+
+  /// GDAL's connection, empty with the fault set when the file can't be opened so.
+  RasterDataConnectionPtr Inner();
+  /// True once Inner was asked for.
+  bool HasInner() const { return bool(inner_); }
+
+ private:
+  Source(std::unique_ptr<File> file, Opener opener)
+      : file_(std::move(file)), opener_(std::move(opener)) {}
+  bool Describe(const String& formatKey);
+  bool FindLevels();
+
+  const std::unique_ptr<File> file_;
+  const Opener opener_;
+  RasterDef def_;
+  std::optional<double> noData_;
+  std::map<unsigned, Image> levels_;
+  std::map<unsigned, std::unique_ptr<Window>> windows_;
+  std::optional<bool> canWrite_;
+  RasterDataConnectionPtr inner_;
+};
+
+}  // namespace lumo::tiff

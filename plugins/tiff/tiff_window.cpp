@@ -1,0 +1,231 @@
+#include "tiff/tiff_window.h"
+
+#include <algorithm>
+#include <atomic>
+#include <cstring>
+
+#include "tasks/parallel.h"
+
+namespace lumo::tiff {
+namespace {
+
+/// Decoded bytes that are worth a task of their own.
+constexpr std::size_t kTaskBytes = 64 << 10;
+
+/// Copies rows of pixels, all bands of them or some.
+struct Carrier {
+  std::size_t element;                      // bytes of a value
+  std::size_t pixel;                        // bytes of a pixel in the block
+  std::size_t bands;                        // that are wanted
+  const Array<unsigned>* chosen = nullptr;  // null: all, in their order
+
+  void Row(const unsigned char* from, unsigned char* to, std::size_t width) const {
+    if (chosen == nullptr) {
+      std::memcpy(to, from, width * pixel);
+      return;
+    }
+    switch (element) {
+      case 1:
+        return Pick<1>(from, to, width);
+      case 2:
+        return Pick<2>(from, to, width);
+      case 4:
+        return Pick<4>(from, to, width);
+      default:
+        return Pick<8>(from, to, width);
+    }
+  }
+
+ private:
+  template <std::size_t kBytes>
+  void Pick(const unsigned char* from, unsigned char* to, std::size_t width) const {
+    for (std::size_t x = 0; x < width; ++x, from += pixel) {
+      for (std::size_t i = 0; i < bands; ++i, to += kBytes) {
+        std::memcpy(to, from + (*chosen)[static_cast<unsigned>(i)] * kBytes, kBytes);
+      }
+    }
+  }
+};
+
+bool AreAll(const Array<unsigned>& bands, unsigned count) {
+  if (bands.GetCount() != count) return false;
+  for (unsigned i = 0; i < count; ++i) {
+    if (bands[i] != i) return false;
+  }
+  return true;
+}
+
+}  // namespace
+
+/// The part of a block that a rectangle needs, and where it goes.
+struct Window::Piece {
+  std::uint64_t block;
+  unsigned lines;          // of the block
+  unsigned left, top;      // in the block
+  unsigned width, height;  // of the part
+  unsigned char* to;       // its first pixel
+  std::size_t stride;      // bytes from one of its rows to the next
+  const Carrier* carrier;
+};
+
+bool Window::FindBlocks() {
+  if (areBlocksFound_) return true;
+  const Tag offsets = image_.isTiled ? kTileOffsets : kStripOffsets;
+  const Tag sizes = image_.isTiled ? kTileByteCounts : kStripByteCounts;
+  const std::uint64_t count = image_.Blocks();
+  areBlocksFound_ = file_.ReadNumbers(*image_.directory, offsets, count, offsets_) &&
+                    file_.ReadNumbers(*image_.directory, sizes, count, sizes_) &&
+                    offsets_.size() == count && sizes_.size() == count;
+  return areBlocksFound_;
+}
+
+bool Window::DecodeBlock(std::uint64_t block, unsigned lines, unsigned char* out) const {
+  constexpr std::uint64_t kMostPacked = 64 << 20;
+  const std::uint64_t packedBytes = sizes_[block];
+  if (offsets_[block] == 0 || packedBytes == 0 || packedBytes > kMostPacked) return false;
+  const std::size_t rowBytes = image_.RowBytes(), bytes = lines * rowBytes;
+  thread_local std::vector<unsigned char> packed;
+  if (packed.size() < packedBytes) packed.resize(packedBytes);
+  if (!file_.Handle().Read(offsets_[block], packed.data(), packedBytes) ||
+      !Decode(image_.compression, packed.data(), packedBytes, out, bytes)) {
+    return false;
+  }
+  if (image_.predictor == 1) return true;
+  const Prediction prediction{image_.predictor, image_.elementBytes,
+                              image_.byPixel ? image_.bands : 1};
+  for (unsigned y = 0; y < lines; ++y) Undo(prediction, out + y * rowBytes, rowBytes);
+  return true;
+}
+
+Window::Bytes Window::Kept(std::uint64_t block) {
+  const std::lock_guard lock(mutex_);
+  for (auto at = kept_.begin(); at != kept_.end(); ++at) {
+    if (at->first != block) continue;
+    kept_.splice(kept_.begin(), kept_, at);
+    return at->second;
+  }
+  return {};
+}
+
+void Window::Keep(std::uint64_t block, Bytes bytes) {
+  const std::lock_guard lock(mutex_);
+  keptBytes_ += bytes->size();
+  kept_.emplace_front(block, std::move(bytes));
+  while (keptBytes_ > kMostKept && kept_.size() > 1) {
+    keptBytes_ -= kept_.back().second->size();
+    kept_.pop_back();
+  }
+}
+
+/// Reads a part of a block without compression, straight to its place where rows are long.
+bool Window::ReadPlain(const Piece& piece) {
+  const std::size_t rowBytes = image_.RowBytes(), pixelBytes = image_.PixelBytes();
+  if (offsets_[piece.block] == 0 || sizes_[piece.block] < piece.lines * rowBytes) return false;
+  const std::uint64_t first =
+      offsets_[piece.block] + piece.top * rowBytes + piece.left * pixelBytes;
+  const std::size_t bytes = piece.width * pixelBytes;
+  const bool isPlain = piece.carrier->chosen == nullptr;
+  if (isPlain && bytes == rowBytes && piece.stride == rowBytes) {
+    return file_.Handle().Read(first, piece.to, piece.height * rowBytes);
+  }
+  constexpr std::size_t kLongRow = 16384;
+  if (isPlain && bytes >= kLongRow) {
+    for (unsigned y = 0; y < piece.height; ++y) {
+      if (!file_.Handle().Read(first + y * rowBytes, piece.to + y * piece.stride, bytes)) {
+        return false;
+      }
+    }
+    return true;
+  }
+  thread_local std::vector<unsigned char> rows;
+  const std::size_t span = (piece.height - 1) * rowBytes + bytes;
+  if (rows.size() < span) rows.resize(span);
+  if (!file_.Handle().Read(first, rows.data(), span)) return false;
+  for (unsigned y = 0; y < piece.height; ++y) {
+    piece.carrier->Row(rows.data() + y * rowBytes, piece.to + y * piece.stride, piece.width);
+  }
+  return true;
+}
+
+bool Window::ReadPiece(const Piece& piece) {
+  if (image_.compression == Compression::kNone) return ReadPlain(piece);
+  const std::size_t rowBytes = image_.RowBytes(), pixelBytes = image_.PixelBytes();
+  const bool isWholeWidth = piece.width == image_.blockWidth;
+  const bool isWhole =
+      piece.height == piece.lines &&
+      (isWholeWidth || piece.left + piece.width == image_.samples % image_.blockWidth);
+  if (isWhole && isWholeWidth && piece.stride == rowBytes && piece.carrier->chosen == nullptr) {
+    return DecodeBlock(piece.block, piece.lines, piece.to);
+  }
+  const auto carry = [&](const unsigned char* block) {
+    const unsigned char* const first = block + piece.top * rowBytes + piece.left * pixelBytes;
+    for (unsigned y = 0; y < piece.height; ++y) {
+      piece.carrier->Row(first + y * rowBytes, piece.to + y * piece.stride, piece.width);
+    }
+    return true;
+  };
+  const std::size_t bytes = piece.lines * rowBytes;
+  if (isWhole) {
+    thread_local std::vector<unsigned char> decoded;
+    if (decoded.size() < bytes) decoded.resize(bytes);
+    return DecodeBlock(piece.block, piece.lines, decoded.data()) && carry(decoded.data());
+  }
+  if (const Bytes kept = Kept(piece.block)) return carry(kept->data());
+  auto decoded = std::make_shared<std::vector<unsigned char>>(bytes);
+  if (!DecodeBlock(piece.block, piece.lines, decoded->data())) return false;
+  carry(decoded->data());
+  Keep(piece.block, std::move(decoded));
+  return true;
+}
+
+bool Window::Read(const Rect& rect, const Array<unsigned>& bands, unsigned char* pixels) {
+  if (!FindBlocks()) return false;
+  const unsigned count = bands.GetCount();
+  Carrier carrier{image_.elementBytes, image_.PixelBytes(), count};
+  if (image_.byPixel && !AreAll(bands, image_.bands)) carrier.chosen = &bands;
+  const std::size_t rowBytes =
+      std::size_t{rect.width} * image_.elementBytes * (image_.byPixel ? count : 1);
+  const unsigned planes = image_.byPixel ? 1 : count;
+  const std::uint64_t perPlane = std::uint64_t{image_.BlocksAcross()} * image_.BlocksDown();
+  const unsigned bottom = rect.top + rect.height, right = rect.left + rect.width;
+  const unsigned width = image_.blockWidth, height = image_.blockHeight;
+  std::vector<Piece> pieces;
+  for (unsigned plane = 0; plane < planes; ++plane) {
+    unsigned char* const start = pixels + plane * rowBytes * rect.height;
+    for (unsigned row = rect.top / height; row <= (bottom - 1) / height; ++row) {
+      const unsigned top = std::max(rect.top, row * height);
+      const unsigned end =
+          static_cast<unsigned>(std::min<std::uint64_t>(bottom, std::uint64_t{row + 1} * height));
+      for (unsigned column = rect.left / width; column <= (right - 1) / width; ++column) {
+        const unsigned left = std::max(rect.left, column * width);
+        const unsigned stop = static_cast<unsigned>(
+            std::min<std::uint64_t>(right, std::uint64_t{column + 1} * width));
+        const std::uint64_t block = (image_.byPixel ? 0 : bands[plane] * perPlane) +
+                                    std::uint64_t{row} * image_.BlocksAcross() + column;
+        unsigned char* const to =
+            start + (top - rect.top) * rowBytes + (left - rect.left) * (rowBytes / rect.width);
+        pieces.push_back({block, image_.LinesOf(row), left - column * width, top - row * height,
+                          stop - left, end - top, to, rowBytes, &carrier});
+      }
+    }
+  }
+  const std::size_t pieceBytes = std::max<std::size_t>(height * image_.RowBytes(), 1);
+  const auto perTask = static_cast<unsigned>(std::max<std::size_t>(kTaskBytes / pieceBytes, 1));
+  const auto all = static_cast<unsigned>(pieces.size());
+  const unsigned tasks = (all + perTask - 1) / perTask;
+  std::atomic<bool> isRead{true};
+  const auto run = [&](unsigned task) {
+    const unsigned end = std::min(all, (task + 1) * perTask);
+    for (unsigned i = task * perTask; i < end && isRead; ++i) {
+      if (!ReadPiece(pieces[i])) isRead = false;
+    }
+  };
+  if (tasks == 1) {
+    run(0);
+  } else {
+    ParallelFor(tasks, nullptr, run);
+  }
+  return isRead;
+}
+
+}  // namespace lumo::tiff
