@@ -130,8 +130,10 @@ void RasterVerb::Make(JobSession& session, const Outputs& outputs) {
   losses.Settle();
   MakeFurther(session, outputs);
   for (const std::string& ending : GetLeftovers()) {
-    std::error_code isGone;
-    std::filesystem::remove(output.GetWorkName() + ending, isGone);
+    std::error_code fault;  // what stays there would take its place with the raster
+    std::filesystem::remove(output.GetWorkName() + ending, fault);
+    if (!fault) continue;
+    throw HostError(kExitFailed, output.GetShownName() + ": can't be written: " + fault.message());
   }
 }
 

@@ -5,6 +5,7 @@
 #include <fmt/format.h>
 
 #include "options/option_values.h"
+#include "platform/file_moves.h"
 #include "raster/pixel_types.h"
 #include "rasters/class_steps.h"
 #include "rasters/raster_target.h"
@@ -227,7 +228,12 @@ class ClassifyVerb final : public RasterVerb {
     RasterVerb::Make(session, outputs);
     if (scores_.empty()) return;
     const OutputFile& kept = outputs.Get(GetOutputs().size() - 1);
-    std::filesystem::rename(outputs.Get(0).GetWorkName() + kScoresEnding, kept.GetWorkName());
+    std::string why;
+    if (platform::RenameFile(outputs.Get(0).GetWorkName() + kScoresEnding, kept.GetWorkName(),
+                             &why)) {
+      return;
+    }
+    throw HostError(kExitFailed, kept.GetShownName() + ": can't be written: " + why);
   }
 
   static constexpr const char* kScoresEnding = ".fxc";
