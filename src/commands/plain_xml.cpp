@@ -1,7 +1,9 @@
 #include "commands/plain_xml.h"
 
 #include <algorithm>
-#include <charconv>
+#include <cstring>
+#include <expat.h>
+#include <memory>
 #include <string>
 #include <vector>
 
@@ -16,16 +18,6 @@ bool IsNameStart(char c) {
 
 bool IsNamePart(char c) {
   return IsNameStart(c) || (c >= '0' && c <= '9') || c == '-' || c == '.';
-}
-
-bool IsSpace(char c) {
-  return c == ' ' || c == '\n' || c == '\t';
-}
-
-/// The characters of XML 1.0 but for those that it reads as others.
-bool IsPlainCodePoint(std::uint32_t c) {
-  return c == '\t' || c == '\n' || (c >= 0x20 && c < 0xD800) || (c >= 0xE000 && c < 0xFFFE) ||
-         (c >= 0x10000 && c < 0x110000);
 }
 
 void AppendUtf8(std::uint32_t c, std::string& text) {
@@ -43,187 +35,80 @@ void AppendUtf8(std::uint32_t c, std::string& text) {
   }
 }
 
-/// A text that is empty rather than none.
-String ToString(const std::string& text) {
-  return text.empty() ? String("") : String(text);
-}
-
+/// A part of a document.
 struct Event {
   enum class Kind { kStart, kEnd, kText } kind;
   std::string text;  // or the name
   Map<String, String> attributes;
 };
 
+/// Gathers what a document holds, by Expat.
 class Reader {
  public:
-  explicit Reader(std::string_view document) : rest_(document) {}
-
-  bool Read(std::vector<Event>& events) {
-    if (!SkipDeclaration()) return false;
-    SkipSpace();
-    if (!ReadTree(events)) return false;
-    SkipSpace();
-    return rest_.empty();
+  Reader() : parser_(XML_ParserCreate("UTF-8")) {
+    if (!parser_) return;
+    XML_SetUserData(parser_.get(), this);
+    XML_SetElementHandler(parser_.get(), &Reader::OnStart, &Reader::OnEnd);
+    XML_SetCharacterDataHandler(parser_.get(), &Reader::OnText);
+    XML_SetXmlDeclHandler(parser_.get(), &Reader::OnDeclaration);
+    XML_SetStartDoctypeDeclHandler(parser_.get(), &Reader::OnDoctype);
   }
+
+  bool Read(std::string_view document) {
+    return parser_ && XML_Parse(parser_.get(), document.data(), static_cast<int>(document.size()),
+                                XML_TRUE) == XML_STATUS_OK;
+  }
+  const std::vector<Event>& Events() const { return events_; }
 
  private:
-  bool Take(std::string_view text) {
-    if (!rest_.starts_with(text)) return false;
-    rest_.remove_prefix(text.size());
-    return true;
+  struct Free {
+    void operator()(XML_Parser parser) const { XML_ParserFree(parser); }
+  };
+
+  static bool IsPlainName(const char* name) {
+    return IsNameStart(*name) &&
+           std::all_of(name, name + std::strlen(name), [](char c) { return IsNamePart(c); });
   }
 
-  bool SkipSpace() {
-    const std::size_t before = rest_.size();
-    while (!rest_.empty() && IsSpace(rest_.front())) rest_.remove_prefix(1);
-    return rest_.size() != before;
-  }
+  void Stop() { XML_StopParser(parser_.get(), XML_FALSE); }
 
-  /// Only the declarations that are written here, and the shortest.
-  bool SkipDeclaration() {
-    if (!rest_.starts_with("<?")) return true;
-    for (const char* const rest : {"encoding=\"UTF-8\" standalone=\"no\" ?>",
-                                   "encoding=\"UTF-8\"?>", "encoding=\"utf-8\"?>", "?>"}) {
-      const std::string form =
-          std::string("<?xml version=\"1.0\"") + (*rest == '?' ? "" : " ") + rest;
-      if (Take(form)) return true;
+  static void OnStart(void* user, const char* name, const char** attributes) {
+    Reader& self = *static_cast<Reader*>(user);
+    Event start{Event::Kind::kStart, name, {}};
+    bool isPlain = IsPlainName(name) && ++self.depth_ <= kMaxXMLDepth;
+    unsigned count = 0;
+    for (; isPlain && *attributes != nullptr; attributes += 2) {
+      isPlain = ++count <= kMaxXMLAttributes && IsPlainName(attributes[0]);
+      start.attributes[attributes[0]] = attributes[1];
     }
-    return false;
+    if (!isPlain) return self.Stop();
+    self.events_.push_back(std::move(start));
   }
-
-  bool ReadName(std::string& name) {
-    std::size_t length = 0;
-    while (length < rest_.size() && IsNamePart(rest_[length])) ++length;
-    if (length == 0 || !IsNameStart(rest_.front())) return false;
-    name = rest_.substr(0, length);
-    rest_.remove_prefix(length);
-    return true;
+  static void OnEnd(void* user, const char* name) {
+    Reader& self = *static_cast<Reader*>(user);
+    --self.depth_;
+    self.events_.push_back({Event::Kind::kEnd, name, {}});
   }
-
-  /// A reference to one of the five characters that have names, or to a number.
-  bool ReadReference(std::string& text) {
-    const std::size_t end = rest_.find(';');
-    if (end == rest_.npos || end > 12) return false;
-    const std::string_view name = rest_.substr(1, end - 1);
-    std::uint32_t code = 0;
-    if (name.starts_with('#')) {
-      const bool isHex = name.starts_with("#x");
-      const std::string_view digits = name.substr(isHex ? 2 : 1);
-      const auto [stop, fault] =
-          std::from_chars(digits.data(), digits.data() + digits.size(), code, isHex ? 16 : 10);
-      const bool isWhole = fault == std::errc() && stop == digits.data() + digits.size();
-      if (!isWhole || !(IsPlainCodePoint(code) || code == '\r')) return false;
-    } else {
-      constexpr std::pair<std::string_view, char> kNamed[] = {
-          {"amp", '&'}, {"lt", '<'}, {"gt", '>'}, {"quot", '"'}, {"apos", '\''}};
-      const auto* const at = std::find_if(std::begin(kNamed), std::end(kNamed),
-                                          [&](const auto& named) { return named.first == name; });
-      if (at == std::end(kNamed)) return false;
-      code = static_cast<unsigned char>(at->second);
+  static void OnText(void* user, const char* text, int length) {
+    std::vector<Event>& events = static_cast<Reader*>(user)->events_;
+    if (events.empty() || events.back().kind != Event::Kind::kText) {
+      events.push_back({Event::Kind::kText, {}, {}});
     }
-    AppendUtf8(code, text);
-    rest_.remove_prefix(end + 1);
-    return true;
+    events.back().text.append(text, static_cast<std::size_t>(length));
+  }
+  static void OnDeclaration(void* user, const char* version, const char* encoding, int) {
+    const bool isPlain = version != nullptr && std::string_view(version) == "1.0" &&
+                         (encoding == nullptr || std::string_view(encoding) == "UTF-8" ||
+                          std::string_view(encoding) == "utf-8");
+    if (!isPlain) static_cast<Reader*>(user)->Stop();
+  }
+  static void OnDoctype(void* user, const char*, const char*, const char*, int) {
+    static_cast<Reader*>(user)->Stop();
   }
 
-  /// One character as it stands. False for bytes that aren't one.
-  bool ReadCharacter(std::string& text) {
-    const auto first = static_cast<unsigned char>(rest_.front());
-    const std::size_t length = first < 0x80 ? 1 : first >= 0xF0 ? 4 : first >= 0xE0 ? 3 : 2;
-    if (first >= 0x80 && (first < 0xC2 || first > 0xF4)) return false;
-    if (rest_.size() < length) return false;
-    std::uint32_t code = length == 1 ? first : first & (0xFFU >> (length + 1));
-    for (std::size_t i = 1; i < length; ++i) {
-      const auto byte = static_cast<unsigned char>(rest_[i]);
-      if ((byte & 0xC0) != 0x80) return false;
-      code = code << 6 | (byte & 0x3F);
-    }
-    constexpr std::uint32_t kLeast[] = {0, 0, 0x80, 0x800, 0x10000};
-    if (code < kLeast[length] || !IsPlainCodePoint(code)) return false;
-    text.append(rest_.substr(0, length));
-    rest_.remove_prefix(length);
-    return true;
-  }
-
-  bool ReadAttribute(Map<String, String>& attributes) {
-    std::string name, value;
-    if (!ReadName(name)) return false;
-    SkipSpace();
-    if (!Take("=")) return false;
-    SkipSpace();
-    if (rest_.empty() || (rest_.front() != '"' && rest_.front() != '\'')) return false;
-    const char quote = rest_.front();
-    rest_.remove_prefix(1);
-    while (!rest_.empty() && rest_.front() != quote) {
-      const char c = rest_.front();
-      if (c == '<' || c == '\n' || c == '\t') return false;
-      if (!(c == '&' ? ReadReference(value) : ReadCharacter(value))) return false;
-    }
-    if (rest_.empty()) return false;
-    rest_.remove_prefix(1);
-    const String key(name);
-    if (attributes.HasKey(key)) return false;
-    attributes[key] = ToString(value);
-    return true;
-  }
-
-  bool ReadStart(std::vector<Event>& events, std::vector<std::string>& open) {
-    Event start{Event::Kind::kStart, {}, {}};
-    if (!ReadName(start.text)) return false;
-    bool isEmpty = false;
-    for (unsigned count = 0;; ++count) {
-      const bool hasSpace = SkipSpace();
-      if (Take(">")) break;
-      if (Take("/>")) {
-        isEmpty = true;
-        break;
-      }
-      if (!hasSpace || count >= kMaxXMLAttributes || !ReadAttribute(start.attributes)) return false;
-    }
-    if (open.size() >= kMaxXMLDepth) return false;
-    const std::string name = start.text;
-    events.push_back(std::move(start));
-    if (isEmpty) {
-      events.push_back({Event::Kind::kEnd, name, {}});
-    } else {
-      open.push_back(name);
-    }
-    return true;
-  }
-
-  bool ReadTree(std::vector<Event>& events) {
-    std::vector<std::string> open;
-    if (!Take("<") || !ReadStart(events, open)) return false;
-    std::string text;
-    const auto endText = [&] {
-      if (!text.empty()) events.push_back({Event::Kind::kText, text, {}});
-      text.clear();
-    };
-    while (!open.empty()) {
-      if (rest_.empty()) return false;
-      if (rest_.front() == '<') {
-        endText();
-        rest_.remove_prefix(1);
-        if (!Take("/")) {
-          if (!ReadStart(events, open)) return false;
-          continue;
-        }
-        std::string name;
-        if (!ReadName(name) || name != open.back()) return false;
-        SkipSpace();
-        if (!Take(">")) return false;
-        open.pop_back();
-        events.push_back({Event::Kind::kEnd, name, {}});
-      } else if (rest_.front() == '&') {
-        if (!ReadReference(text)) return false;
-      } else if (rest_.starts_with("]]>") || !ReadCharacter(text)) {
-        return false;
-      }
-    }
-    return true;
-  }
-
-  std::string_view rest_;
+  std::unique_ptr<XML_ParserStruct, Free> parser_;
+  std::vector<Event> events_;
+  unsigned depth_ = 0;
 };
 
 /// Writes elements as long as their texts are plain.
@@ -309,10 +194,10 @@ class Writer {
 }  // namespace
 
 bool ReadPlainXml(std::string_view document, XMLSimpleParser& target) {
-  std::vector<Event> events;
-  if (document.size() > kMostBytes || !Reader(document).Read(events)) return false;
+  Reader reader;
+  if (document.size() > kMostBytes || !reader.Read(document)) return false;
   target.StartDocument();
-  for (const Event& event : events) {
+  for (const Event& event : reader.Events()) {
     switch (event.kind) {
       case Event::Kind::kStart:
         target.StartElement(String(event.text), event.attributes);

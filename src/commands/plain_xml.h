@@ -7,8 +7,8 @@
 namespace lumo {
 
 // The documents that jobs are made of use little of XML: elements, attributes and texts. These are
-// read and written here, so that a command line or a job needs no XML library (XmlEngine); whatever
-// uses more, or is wrong, goes there.
+// read by Expat and written here, so that a command line or a job needs no large XML library
+// (XmlEngine); whatever uses more, or is wrong, goes there.
 
 /// Reads a document of elements, attributes and texts, and hands its events to `target`. False,
 /// with nothing handed over, for one that holds anything else or is not well formed.
