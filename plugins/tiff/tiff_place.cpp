@@ -58,26 +58,6 @@ bool ReadKeys(const File& file, const Directory& directory, GeoKeys& keys) {
   return true;
 }
 
-/// Puts the datum in the place of an ensemble of its realisations, as which it is meant. False when
-/// the text has another form than PROJ's.
-bool NameDatum(std::string& wkt) {
-  constexpr std::string_view kEnsemble = "ENSEMBLE[\"", kEnd = " ensemble\",";
-  const std::size_t start = wkt.find(kEnsemble);
-  if (start == wkt.npos) return true;
-  const std::size_t end = wkt.find(kEnd, start), ellipsoid = wkt.find("ELLIPSOID[", start);
-  const std::size_t accuracy = wkt.find(",ENSEMBLEACCURACY[", start);
-  if (end == wkt.npos || ellipsoid == wkt.npos || accuracy == wkt.npos || end > ellipsoid ||
-      ellipsoid > accuracy) {
-    return false;
-  }
-  const std::size_t close = wkt.find(']', accuracy);
-  if (close == wkt.npos || wkt.find(kEnsemble, close) != wkt.npos) return false;
-  const std::string name = wkt.substr(start + kEnsemble.size(), end - start - kEnsemble.size());
-  wkt = wkt.substr(0, start) + "DATUM[\"" + name + "\"," +
-        wkt.substr(ellipsoid, accuracy - ellipsoid) + wkt.substr(close + 1);
-  return true;
-}
-
 /// The text between the first quotes behind a word.
 std::string NameBehind(const std::string& wkt, const std::string& word) {
   const std::size_t at = wkt.find(word);
@@ -117,15 +97,17 @@ bool FindCoordSys(const GeoKeys& keys, CoordSys& system) {
   const unsigned model = keys.Number(kModelType);
   const unsigned code = keys.Number(model == 1 ? kProjectedType : kGeographicType);
   constexpr unsigned kFirstCode = 1024, kLastCode = 32766;
-  if ((model != 1 && model != 2) || code < kFirstCode || code > kLastCode) return false;
-  CoordSys registered;
+  // GDAL makes other geographic systems of their keys rather than of the registry.
+  constexpr unsigned kWgs84 = 4326;
+  const bool isTaken =
+      model == 1 ? code >= kFirstCode && code <= kLastCode : model == 2 && code == kWgs84;
+  if (!isTaken) return false;
   String text;
-  if (!registered.SetFromString(String("EPSG:" + std::to_string(code)))) return false;
-  registered.ToString(text);
-  std::string wkt = text.ToUTF8();
-  const bool isOfKind = wkt.starts_with(model == 1 ? "PROJCRS[" : "GEOGCRS[");
-  return isOfKind && NameDatum(wkt) && IsPlain(keys, wkt, *registered.Info()) &&
-         system.SetFromString(String(wkt));
+  if (!system.SetFromString(String("EPSG:" + std::to_string(code)))) return false;
+  system.ToString(text);
+  const std::string wkt = text.ToUTF8();
+  return wkt.starts_with(model == 1 ? "PROJCRS[" : "GEOGCRS[") &&
+         IsPlain(keys, wkt, *system.Info());
 }
 
 }  // namespace
