@@ -10,6 +10,7 @@ import subprocess
 import sys
 import time
 
+import opening_peers
 import segment_peers
 
 BANDS = 6
@@ -498,8 +499,9 @@ def grass_windows(bench, scene):
     return ["sh", "-c", f"grass {place / 'PERMANENT'} --exec sh -c '{' && '.join(steps)}' 2>/dev/null"]
 
 
-SECTIONS = {"stats": stats, "hist": hist, "calibrate": calibrate, "calc": calc, "pyramid": pyramid, "warp": warp,
-            "polygons": polygons, "zones": zones, "segments": segment_peers.speed,
+SECTIONS = {"open": opening_peers.opening, "read": opening_peers.reading, "stats": stats, "hist": hist,
+            "calibrate": calibrate, "calc": calc, "pyramid": pyramid, "warp": warp, "polygons": polygons,
+            "zones": zones, "segments": segment_peers.speed,
             "segment-quality": segment_peers.quality, "attributes": attributes, "memory": memory}
 
 

@@ -8,6 +8,7 @@
 
 #include "data/data_connection.h"
 #include "foundation/fault.h"
+#include "foundation/own_plugin.h"
 #include "support/raster_sources.h"
 #include "support/sample_data.h"
 #include "support/temporary_directory.h"
