@@ -58,6 +58,26 @@ bool ReadKeys(const File& file, const Directory& directory, GeoKeys& keys) {
   return true;
 }
 
+/// Puts a datum in the place of the ensemble of its realisations, as GDAL does where a process has
+/// only read files. False when the text has another form than PROJ's.
+bool NameDatum(std::string& wkt) {
+  constexpr std::string_view kEnsemble = "ENSEMBLE[\"", kEnd = " ensemble\",";
+  const std::size_t start = wkt.find(kEnsemble);
+  if (start == wkt.npos) return true;
+  const std::size_t end = wkt.find(kEnd, start), ellipsoid = wkt.find("ELLIPSOID[", start);
+  const std::size_t accuracy = wkt.find(",ENSEMBLEACCURACY[", start);
+  if (end == wkt.npos || ellipsoid == wkt.npos || accuracy == wkt.npos || end > ellipsoid ||
+      ellipsoid > accuracy) {
+    return false;
+  }
+  const std::size_t close = wkt.find(']', accuracy);
+  if (close == wkt.npos || wkt.find(kEnsemble, close) != wkt.npos) return false;
+  const std::string name = wkt.substr(start + kEnsemble.size(), end - start - kEnsemble.size());
+  wkt = wkt.substr(0, start) + "DATUM[\"" + name + "\"," +
+        wkt.substr(ellipsoid, accuracy - ellipsoid) + wkt.substr(close + 1);
+  return true;
+}
+
 /// The text between the first quotes behind a word.
 std::string NameBehind(const std::string& wkt, const std::string& word) {
   const std::size_t at = wkt.find(word);
@@ -102,12 +122,14 @@ bool FindCoordSys(const GeoKeys& keys, CoordSys& system) {
   const bool isTaken =
       model == 1 ? code >= kFirstCode && code <= kLastCode : model == 2 && code == kWgs84;
   if (!isTaken) return false;
+  CoordSys registered;
   String text;
-  if (!system.SetFromString(String("EPSG:" + std::to_string(code)))) return false;
-  system.ToString(text);
-  const std::string wkt = text.ToUTF8();
-  return wkt.starts_with(model == 1 ? "PROJCRS[" : "GEOGCRS[") &&
-         IsPlain(keys, wkt, *system.Info());
+  if (!registered.SetFromString(String("EPSG:" + std::to_string(code)))) return false;
+  registered.ToString(text);
+  std::string wkt = text.ToUTF8();
+  const bool isOfKind = wkt.starts_with(model == 1 ? "PROJCRS[" : "GEOGCRS[");
+  return isOfKind && NameDatum(wkt) && IsPlain(keys, wkt, *registered.Info()) &&
+         system.SetFromString(String(wkt));
 }
 
 }  // namespace

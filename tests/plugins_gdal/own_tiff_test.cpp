@@ -5,6 +5,7 @@
 #include <gdal.h>
 #include <ogr_srs_api.h>
 #include <random>
+#include <regex>
 #include <typeinfo>
 
 #include "foundation/plugin_library.h"
@@ -42,6 +43,17 @@ bool IsOwn(RasterDataConnection& connection) {
   return std::string(typeid(connection).name()).find("tiff") != std::string::npos;
 }
 
+/// The text of a system without what GDAL and PROJ say in one way or the other, by what their
+/// process has asked for before: an ensemble of datums as such or as one datum, and with it the
+/// name of a conversion.
+std::string Settled(std::string wkt) {
+  wkt = std::regex_replace(
+      wkt, std::regex("ENSEMBLE\\[\"([^\"]*) ensemble\",(MEMBER\\[\"[^\"]*\"\\],)*"),
+      "DATUM[\"$1\",");
+  wkt = std::regex_replace(wkt, std::regex(",ENSEMBLEACCURACY\\[[^\\]]*\\]"), "");
+  return std::regex_replace(wkt, std::regex("CONVERSION\\[\"[^\"]*\""), "CONVERSION[\"\"");
+}
+
 std::string TextOf(const GeoRefPtr& model) {
   if (!model) return "none";
   String system;
@@ -50,7 +62,8 @@ std::string TextOf(const GeoRefPtr& model) {
   model->PixelToMap(17.5, 3.25, x, y);
   return std::to_string(model->GetType()) + " " + FormatValue(model->PixelSizeX()).ToUTF8() + " " +
          FormatValue(model->PixelSizeY()).ToUTF8() + " " + FormatValue(model->Rotation()).ToUTF8() +
-         " " + FormatValue(x).ToUTF8() + " " + FormatValue(y).ToUTF8() + " " + system.ToUTF8();
+         " " + FormatValue(x).ToUTF8() + " " + FormatValue(y).ToUTF8() + " " +
+         Settled(system.ToUTF8());
 }
 
 void ExpectSameDefinition(const RasterDef& ours, const RasterDef& theirs) {
@@ -238,24 +251,26 @@ TEST(OwnTiff, SystemsOfTheRegistryAreThoseOfGdal) {
   const test::TemporaryDirectory directory;
   unsigned own = 0, all = 0;
   for (int code = 2000; code < 32767; code += code < 5000 ? 41 : 97) {
-    OGRSpatialReferenceH const system = OSRNewSpatialReference(nullptr);
-    CPLPushErrorHandler(CPLQuietErrorHandler);
-    const bool isKnown = OSRImportFromEPSG(system, code) == OGRERR_NONE &&
-                         (OSRIsProjected(system) != 0 || OSRIsGeographic(system) != 0);
-    CPLPopErrorHandler();
-    if (isKnown) {
-      const std::string path = (directory.Path() / ("c" + std::to_string(code) + "x.tif")).string();
-      GDALDatasetH const file =
-          GDALCreate(GDALGetDriverByName("GTiff"), path.c_str(), 3, 2, 1, GDT_Byte, nullptr);
-      double grid[] = {100, 1, 0, 50, 0, -1};
-      GDALSetGeoTransform(file, grid);
-      GDALSetSpatialRef(file, system);
-      GDALClose(file);
-      own += ExpectSame(path) ? 1 : 0;
-      ++all;
-      fs::remove(path);
+    const std::string path = (directory.Path() / ("c" + std::to_string(code) + "x.tif")).string();
+    {
+      OGRSpatialReferenceH const system = OSRNewSpatialReference(nullptr);
+      CPLPushErrorHandler(CPLQuietErrorHandler);
+      if (OSRImportFromEPSG(system, code) == OGRERR_NONE &&
+          (OSRIsProjected(system) != 0 || OSRIsGeographic(system) != 0)) {
+        GDALDatasetH const file =
+            GDALCreate(GDALGetDriverByName("GTiff"), path.c_str(), 3, 2, 1, GDT_Byte, nullptr);
+        double grid[] = {100, 1, 0, 50, 0, -1};
+        GDALSetGeoTransform(file, grid);
+        GDALSetSpatialRef(file, system);
+        GDALClose(file);
+      }
+      CPLPopErrorHandler();
+      OSRRelease(system);
     }
-    OSRRelease(system);
+    if (!fs::exists(path)) continue;
+    own += ExpectSame(path) ? 1 : 0;
+    ++all;
+    fs::remove(path);
   }
   EXPECT_GT(all, 80U);
   EXPECT_GT(own, all / 3);
