@@ -24,7 +24,8 @@ bool SizeBlock(Array<E>& block, Interleave interleave, const SubRect& rect, unsi
 /// reads.
 bool FillsBlocks(const String& format);
 
-/// What NativeInterleave keeps of a source: its interleave from 1 on, and whether it fills blocks.
+/// NativeInterleave keeps two things of a source: its interleave from 1 on, and whether it fills
+/// blocks.
 inline constexpr std::int32_t kFills = 256;
 
 inline bool IsInterleave(Interleave interleave) {
@@ -63,7 +64,7 @@ bool RasterReader<T>::ReadBlock(const SubRect& rect, const Array<unsigned>& band
   if (isStraight) {
     const bool isRead = ReadPixels(rect.left, rect.top, width, height, wanted, level,
                                    pixels.GetData(), state.GetData());
-    // What was there before is nothing to go by.
+    // The pixels of an earlier block are nothing to go by.
     if (!isRead && !isCleared) std::fill_n(pixels.GetData(), pixels.GetCount(), T());
     return isRead;
   }

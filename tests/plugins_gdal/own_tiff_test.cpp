@@ -293,7 +293,7 @@ TEST(OwnTiff, LeavesToGdalWhatItDoesNotKnow) {
   EXPECT_FALSE(isOwn("white.tif", {GDT_Byte, {"PHOTOMETRIC=MINISWHITE"}, 1}));
   EXPECT_FALSE(isOwn("sparse.tif", {GDT_UInt64, {}, 1, 32633, "5"}));
   EXPECT_TRUE(isOwn("colours.tif", {GDT_Byte, {"PHOTOMETRIC=RGB"}}));
-  // What lies beside a file may change what it is.
+  // Files beside a file may change what it is.
   for (const char* const beside : {"plain.tif.aux.xml", "plain.tfw", "PLAIN.TFW", "plain.tif.ovr",
                                    "plain.tif.msk", "plain_rpc.txt", "plain.IMD", "pla_MTL.txt"}) {
     SCOPED_TRACE(beside);
@@ -371,7 +371,7 @@ TEST(OwnTiff, SamplesAreThoseOfGdal) {
   EXPECT_GE(own, 7U);
 }
 
-/// What is asked beyond reading goes to GDAL, and what is read afterwards is what it changed.
+/// Requests beyond reading go to GDAL, and reads afterwards give what it changed.
 TEST(OwnTiff, ChangesGoThroughGdal) {
   const test::TemporaryDirectory directory;
   const std::string path = (directory.Path() / "changed.tif").string();
