@@ -42,6 +42,7 @@ enum Tag : std::uint16_t {
   kGeoKeyDirectory = 34735,
   kGeoDoubleParams = 34736,
   kGeoAsciiParams = 34737,
+  kGdalMetadata = 42112,
   kNoData = 42113
 };
 

@@ -146,6 +146,8 @@ bool ExpectSame(const std::string& path) {
       EXPECT_EQ(own->HasNoDataValue(band), other->HasNoDataValue(band));
       EXPECT_EQ(own->HasPalette(band), other->HasPalette(band));
       EXPECT_EQ(own->StatsExist(band), other->StatsExist(band));
+      EXPECT_EQ(own->ReadStats(band).mask, other->ReadStats(band).mask);
+      EXPECT_EQ(own->ReadStats(band).mean, other->ReadStats(band).mean);
     }
     for (int level = 0; level <= other->PyramidLevelMax(); ++level) {
       if (level == 0 || level >= other->PyramidLevelMin()) {
