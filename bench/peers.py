@@ -11,6 +11,7 @@ import sys
 import time
 
 import class_peers
+import opening_peers
 import segment_peers
 
 BANDS = 6
@@ -507,11 +508,11 @@ def grass_windows(bench, scene):
     return ["sh", "-c", f"grass {place / 'PERMANENT'} --exec sh -c '{' && '.join(steps)}' 2>/dev/null"]
 
 
-SECTIONS = {"stats": stats, "hist": hist, "calibrate": calibrate, "calc": calc, "pyramid": pyramid, "warp": warp,
-            "polygons": polygons, "zones": zones, "segments": segment_peers.speed,
-            "segment-quality": segment_peers.quality, "attributes": attributes,
-            "classes": lambda bench: class_peers.speed(bench, make_regions), "class-quality": class_peers.quality,
-            "memory": memory}
+SECTIONS = {"open": opening_peers.opening, "read": opening_peers.reading, "stats": stats, "hist": hist,
+            "calibrate": calibrate, "calc": calc, "pyramid": pyramid, "warp": warp, "polygons": polygons,
+            "zones": zones, "segments": segment_peers.speed, "segment-quality": segment_peers.quality,
+            "attributes": attributes, "classes": lambda bench: class_peers.speed(bench, make_regions),
+            "class-quality": class_peers.quality, "memory": memory}
 
 
 def main():

@@ -1,6 +1,7 @@
 #include "data/data_connection.h"
 #include "data/vector_records.h"
 #include "foundation/fault.h"
+#include "foundation/own_plugin.h"
 #include "foundation/plugin_library.h"
 #include "orva/orva_factory.h"
 #include "tiff/tiff_factory.h"

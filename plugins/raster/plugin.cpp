@@ -1,4 +1,4 @@
-#include "foundation/plugin_library.h"
+#include "foundation/own_plugin.h"
 #include "memory_factory.h"
 #include "pyramid_factory.h"
 

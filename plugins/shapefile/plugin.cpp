@@ -1,4 +1,4 @@
-#include "foundation/plugin_library.h"
+#include "foundation/own_plugin.h"
 #include "gdal_common/messages.h"
 #include "gdal_common/source.h"
 #include "shape_connection.h"

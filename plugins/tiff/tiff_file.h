@@ -42,6 +42,7 @@ enum Tag : std::uint16_t {
   kGeoKeyDirectory = 34735,
   kGeoDoubleParams = 34736,
   kGeoAsciiParams = 34737,
+  kGdalMetadata = 42112,
   kNoData = 42113
 };
 
@@ -80,7 +81,7 @@ class File {
   bool ReadDoubles(const Directory& directory, Tag tag, std::vector<double>& values) const;
   /// The characters of a tag up to the first null.
   bool ReadText(const Directory& directory, Tag tag, std::string& text) const;
-  /// What stands between the header and the first directory, of the first bytes of the file.
+  /// The text between the header and the first directory, as far as the first bytes of the file go.
   std::string Head() const;
 
  private:

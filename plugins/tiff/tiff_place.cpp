@@ -58,8 +58,8 @@ bool ReadKeys(const File& file, const Directory& directory, GeoKeys& keys) {
   return true;
 }
 
-/// Puts the datum in the place of an ensemble of its realisations, as which it is meant. False when
-/// the text has another form than PROJ's.
+/// Puts a datum in the place of the ensemble of its realisations, as GDAL does where a process has
+/// only read files. False when the text has another form than PROJ's.
 bool NameDatum(std::string& wkt) {
   constexpr std::string_view kEnsemble = "ENSEMBLE[\"", kEnd = " ensemble\",";
   const std::size_t start = wkt.find(kEnsemble);
@@ -117,7 +117,11 @@ bool FindCoordSys(const GeoKeys& keys, CoordSys& system) {
   const unsigned model = keys.Number(kModelType);
   const unsigned code = keys.Number(model == 1 ? kProjectedType : kGeographicType);
   constexpr unsigned kFirstCode = 1024, kLastCode = 32766;
-  if ((model != 1 && model != 2) || code < kFirstCode || code > kLastCode) return false;
+  // GDAL makes other geographic systems of their keys rather than of the registry.
+  constexpr unsigned kWgs84 = 4326;
+  const bool isTaken =
+      model == 1 ? code >= kFirstCode && code <= kLastCode : model == 2 && code == kWgs84;
+  if (!isTaken) return false;
   CoordSys registered;
   String text;
   if (!registered.SetFromString(String("EPSG:" + std::to_string(code)))) return false;

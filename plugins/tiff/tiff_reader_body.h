@@ -104,13 +104,13 @@ std::int32_t Reader<T>::StatsMask() {
 
 template <typename T>
 bool Reader<T>::StatsExist(unsigned band) {
-  RasterReader<T>* const inner = Opened();
+  RasterReader<T>* const inner = source_.HasStats() ? Inner() : Opened();
   return inner != nullptr && inner->StatsExist(band);
 }
 
 template <typename T>
 RasterBandStats<T> Reader<T>::ReadStats(unsigned band) {
-  RasterReader<T>* const inner = Opened();
+  RasterReader<T>* const inner = source_.HasStats() ? Inner() : Opened();
   return inner != nullptr ? inner->ReadStats(band) : RasterBandStats<T>();
 }
 

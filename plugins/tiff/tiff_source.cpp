@@ -31,13 +31,15 @@ constexpr NamedTag kTexts[] = {{kImageDescription, "TIFFTAG_IMAGEDESCRIPTION"},
 /// Tags that are understood here. A file with another one is GDAL's.
 bool IsKnown(std::uint16_t tag) {
   static constexpr std::uint16_t kTags[] = {
-      kSubfileType,     kImageWidth,      kImageLength,      kBitsPerSample,       kCompression,
-      kPhotometric,     kFillOrder,       kImageDescription, kStripOffsets,        kOrientation,
-      kSamplesPerPixel, kRowsPerStrip,    kStripByteCounts,  kPlanarConfiguration, kSoftware,
-      kDateTime,        kArtist,          kHostComputer,     kPredictor,           kTileWidth,
-      kTileLength,      kTileOffsets,     kTileByteCounts,   kExtraSamples,        kSampleFormat,
-      kCopyright,       kModelPixelScale, kModelTiepoint,    kGeoKeyDirectory,     kGeoDoubleParams,
-      kGeoAsciiParams,  kNoData};
+      kSubfileType,     kImageWidth,          kImageLength,     kBitsPerSample,
+      kCompression,     kPhotometric,         kFillOrder,       kImageDescription,
+      kStripOffsets,    kOrientation,         kSamplesPerPixel, kRowsPerStrip,
+      kStripByteCounts, kPlanarConfiguration, kSoftware,        kDateTime,
+      kArtist,          kHostComputer,        kPredictor,       kTileWidth,
+      kTileLength,      kTileOffsets,         kTileByteCounts,  kExtraSamples,
+      kSampleFormat,    kCopyright,           kModelPixelScale, kModelTiepoint,
+      kGeoKeyDirectory, kGeoDoubleParams,     kGeoAsciiParams,  kGdalMetadata,
+      kNoData};
   return std::find(std::begin(kTags), std::end(kTags), tag) != std::end(kTags);
 }
 
@@ -112,6 +114,32 @@ std::optional<bool> IsCloudOptimised(const File& file) {
   return words.find("LAYOUT=IFDS_BEFORE_DATA") != words.npos;
 }
 
+/// Says whether the items that GDAL keeps in a file are statistics of its bands, and nothing else.
+bool HoldsOnlyStats(std::string_view text) {
+  const auto take = [&text](std::string_view start) {
+    if (!text.starts_with(start)) return false;
+    text.remove_prefix(start.size());
+    return true;
+  };
+  const auto takeUpTo = [&text](std::string_view end, std::string_view forbidden) {
+    const std::size_t at = text.find(end);
+    if (at == text.npos || text.substr(0, at).find_first_of(forbidden) != text.npos) return false;
+    text.remove_prefix(at + end.size());
+    return true;
+  };
+  const auto skipSpace = [&text] {
+    text.remove_prefix(std::min(text.find_first_not_of(" \n"), text.size()));
+  };
+  if (!take("<GDALMetadata>")) return false;
+  for (skipSpace(); !take("</GDALMetadata>"); skipSpace()) {
+    const bool isStat = take("<Item name=\"STATISTICS_") && takeUpTo("\" sample=\"", "<>&\" ") &&
+                        takeUpTo("\">", "<>&\" ") && takeUpTo("</Item>", "<>&");
+    if (!isStat) return false;
+  }
+  skipSpace();
+  return text.empty();
+}
+
 }  // namespace
 
 std::unique_ptr<Source> Source::Open(const std::string& path, const String& formatKey,
@@ -131,6 +159,13 @@ bool Source::FindLevels() {
       if (!IsKnown(tag)) return false;
     }
     const bool isFirst = &directory == &directories.front();
+    if (directory.contains(kGdalMetadata)) {
+      std::string text;
+      hasStats_ = true;
+      if (!isFirst || !file_->ReadText(directory, kGdalMetadata, text) || !HoldsOnlyStats(text)) {
+        return false;
+      }
+    }
     const std::optional<Image> image = FindImage(*file_, directory);
     if (!image || file_->Number(directory, kSubfileType, 0) != (isFirst ? 0 : kReduced)) {
       return false;

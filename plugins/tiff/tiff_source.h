@@ -40,6 +40,8 @@ class Source {
 
   /// GDAL's connection, empty with the fault set when the file can't be opened so.
   RasterDataConnectionPtr Inner();
+  /// True when the file holds statistics, which GDAL's connection reads.
+  bool HasStats() const { return hasStats_; }
   /// True once Inner was asked for.
   bool HasInner() const { return bool(inner_); }
 
@@ -55,6 +57,7 @@ class Source {
   std::optional<double> noData_;
   std::map<unsigned, Image> levels_;
   std::map<unsigned, std::unique_ptr<Window>> windows_;
+  bool hasStats_ = false;
   std::optional<bool> canWrite_;
   RasterDataConnectionPtr inner_;
 };

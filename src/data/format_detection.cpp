@@ -9,6 +9,7 @@
 #include "data/source_head.h"
 #include "foundation/fault.h"
 #include "foundation/file_faults.h"
+#include "foundation/own_plugin.h"
 #include "foundation/thrown.h"
 
 namespace lumo {

@@ -9,14 +9,24 @@ namespace lumo {
 
 namespace detail {
 
-/// Gives an array the shape of a block, with every element zero.
+/// Gives an array the shape of a block, with every element zero unless all of them are about to be
+/// written.
 template <typename E>
-bool SizeBlock(Array<E>& block, Interleave interleave, const SubRect& rect, unsigned bands) {
+bool SizeBlock(Array<E>& block, Interleave interleave, const SubRect& rect, unsigned bands,
+               bool isCleared = true) {
   const ArrayDims dims = BlockDims(interleave, rect.Width(), rect.Height(), bands);
   if (!block.Resize(dims) || block.GetCount() != dims.count) return false;
-  std::fill_n(block.GetData(), block.GetCount(), E());
+  if (isCleared) std::fill_n(block.GetData(), block.GetCount(), E());
   return true;
 }
+
+/// True for a format whose plug-in comes with the library and writes every pixel of a block that it
+/// reads.
+bool FillsBlocks(const String& format);
+
+/// NativeInterleave keeps two things of a source: its interleave from 1 on, and whether it fills
+/// blocks.
+inline constexpr std::int32_t kFills = 256;
 
 inline bool IsInterleave(Interleave interleave) {
   return interleave >= Interleave::None && interleave <= Interleave::BSQ;
@@ -28,10 +38,12 @@ template <typename T>
 Interleave RasterReader<T>::NativeInterleave() {
   std::int32_t native = nativeInterleave_;
   if (native == kNotAsked) {
-    native = static_cast<std::int32_t>(RasterDef().interleave);
+    const lumo::RasterDef def = RasterDef();
+    native = (static_cast<std::int32_t>(def.interleave) + 1) |
+             (detail::FillsBlocks(def.format) ? detail::kFills : 0);
     nativeInterleave_ = native;
   }
-  return static_cast<Interleave>(native);
+  return static_cast<Interleave>((native & ~detail::kFills) - 1);
 }
 
 template <typename T>
@@ -42,25 +54,35 @@ bool RasterReader<T>::ReadBlock(const SubRect& rect, const Array<unsigned>& band
   if (!detail::IsInterleave(interleave) || bands.GetCount() == 0) return false;
   const Array<unsigned> wanted = BandsOfBlock(bands, interleave);
   const unsigned count = wanted.GetCount();
-  if (!detail::SizeBlock(pixels, interleave, rect, count) ||
-      !detail::SizeBlock(state, interleave, rect, count)) {
+  const Interleave native = NativeInterleave();
+  const bool isCleared = (nativeInterleave_ & detail::kFills) == 0;
+  const bool isStraight = native == interleave || count == 1;
+  if (!detail::SizeBlock(pixels, interleave, rect, count, isCleared) ||
+      !detail::SizeBlock(state, interleave, rect, count, isStraight || isCleared)) {
     return false;
   }
-  const Interleave native = NativeInterleave();
-  if (native == interleave || count == 1) {
-    return ReadPixels(rect.left, rect.top, width, height, wanted, level, pixels.GetData(),
-                      state.GetData());
+  if (isStraight) {
+    const bool isRead = ReadPixels(rect.left, rect.top, width, height, wanted, level,
+                                   pixels.GetData(), state.GetData());
+    // The pixels of an earlier block are nothing to go by.
+    if (!isRead && !isCleared) std::fill_n(pixels.GetData(), pixels.GetCount(), T());
+    return isRead;
   }
   Array<T> nativePixels;
   Array<unsigned char> nativeState;
-  return detail::SizeBlock(nativePixels, native, rect, count) &&
-         detail::SizeBlock(nativeState, native, rect, count) &&
-         ReadPixels(rect.left, rect.top, width, height, wanted, level, nativePixels.GetData(),
-                    nativeState.GetData()) &&
-         ConvertInterleave(nativePixels.GetData(), native, pixels.GetData(), interleave, width,
-                           height, count, sizeof(T)) &&
-         ConvertInterleave(nativeState.GetData(), native, state.GetData(), interleave, width,
-                           height, count, 1);
+  const bool isRead = detail::SizeBlock(nativePixels, native, rect, count, isCleared) &&
+                      detail::SizeBlock(nativeState, native, rect, count) &&
+                      ReadPixels(rect.left, rect.top, width, height, wanted, level,
+                                 nativePixels.GetData(), nativeState.GetData()) &&
+                      ConvertInterleave(nativePixels.GetData(), native, pixels.GetData(),
+                                        interleave, width, height, count, sizeof(T)) &&
+                      ConvertInterleave(nativeState.GetData(), native, state.GetData(), interleave,
+                                        width, height, count, 1);
+  if (!isRead && !isCleared) {
+    std::fill_n(pixels.GetData(), pixels.GetCount(), T());
+    std::fill_n(state.GetData(), state.GetCount(), static_cast<unsigned char>(0));
+  }
+  return isRead;
 }
 
 template <typename T>

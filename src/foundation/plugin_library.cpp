@@ -6,6 +6,7 @@
 #include <string_view>
 
 #include "foundation/environment.h"
+#include "foundation/own_plugin.h"
 #include "platform/random_access_file.h"
 
 namespace lumo {

@@ -7,8 +7,8 @@
 #include "commands/xml.h"
 #include "foundation/plugin_library.h"
 
-// What the library reads and writes itself has to be what the XML library makes of it. That is
-// asked through its plug-in.
+// Documents that the library reads and writes itself have to be as the XML library makes them. That
+// is asked through its plug-in.
 
 #include "commands/xml_engine.h"
 

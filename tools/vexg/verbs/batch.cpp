@@ -146,7 +146,7 @@ class Batch {
       Fail(file, DescribeException(), kExitFailed);
     }
     Print(OnOneLine(text));
-    // What follows would fail too, or isn't wanted any more.
+    // The next files would fail too, or aren't wanted any more.
     if (platform::CountMemoryShortages() != 0) {
       throw HostError(kExitFailed, platform::kOutOfMemory);
     }

@@ -1,0 +1,397 @@
+#include <cmath>
+#include <cpl_string.h>
+#include <filesystem>
+#include <fstream>
+#include <gdal.h>
+#include <ogr_srs_api.h>
+#include <random>
+#include <regex>
+#include <typeinfo>
+
+#include "foundation/plugin_library.h"
+#include "raster/raster_details.h"
+#include "support/raster_sources.h"
+#include "support/sample_data.h"
+#include "support/temporary_directory.h"
+
+// TIFF files that the library reads itself have to be what GDAL makes of them: each is opened both
+// ways, and all that the two connections say and give is compared.
+
+namespace lumo {
+namespace {
+
+namespace fs = std::filesystem;
+using test::Strings;
+
+DataConnectionFactory& GdalFactory() {
+  static DataConnectionFactory& factory = []() -> DataConnectionFactory& {
+    std::string fault;
+    const platform::Module module = LoadPlugin(platform::ModuleFileName("vexgdalcore"), fault);
+    auto* const create =
+        module.Find<CreateDataConnectionFactoryFunction>("CreateDataConnectionFactory");
+    return *create(FindFormat("TIFF"));
+  }();
+  return factory;
+}
+
+RasterDataConnectionPtr OpenBy(DataConnectionFactory& factory, const std::string& path) {
+  return RasterDataConnectionPtr(
+      factory.Connect(Strings({"TIFF", path}), GeoRefPtr(), MetadataPtr()));
+}
+
+bool IsOwn(RasterDataConnection& connection) {
+  return std::string(typeid(connection).name()).find("tiff") != std::string::npos;
+}
+
+/// The text of a system without what GDAL and PROJ say in one way or the other, by what their
+/// process has asked for before: an ensemble of datums as such or as one datum, and with it the
+/// name of a conversion.
+std::string Settled(std::string wkt) {
+  wkt = std::regex_replace(
+      wkt, std::regex("ENSEMBLE\\[\"([^\"]*) ensemble\",(MEMBER\\[\"[^\"]*\"\\],)*"),
+      "DATUM[\"$1\",");
+  wkt = std::regex_replace(wkt, std::regex(",ENSEMBLEACCURACY\\[[^\\]]*\\]"), "");
+  return std::regex_replace(wkt, std::regex("CONVERSION\\[\"[^\"]*\""), "CONVERSION[\"\"");
+}
+
+std::string TextOf(const GeoRefPtr& model) {
+  if (!model) return "none";
+  String system;
+  model->CoordinateSystem().ToString(system);
+  double x = 0, y = 0;
+  model->PixelToMap(17.5, 3.25, x, y);
+  return std::to_string(model->GetType()) + " " + FormatValue(model->PixelSizeX()).ToUTF8() + " " +
+         FormatValue(model->PixelSizeY()).ToUTF8() + " " + FormatValue(model->Rotation()).ToUTF8() +
+         " " + FormatValue(x).ToUTF8() + " " + FormatValue(y).ToUTF8() + " " +
+         Settled(system.ToUTF8());
+}
+
+void ExpectSameDefinition(const RasterDef& ours, const RasterDef& theirs) {
+  EXPECT_EQ(ours.samples, theirs.samples);
+  EXPECT_EQ(ours.lines, theirs.lines);
+  EXPECT_EQ(ours.bands, theirs.bands);
+  EXPECT_EQ(ours.dataType, theirs.dataType);
+  EXPECT_EQ(ours.interleave, theirs.interleave);
+  EXPECT_EQ(ours.tileWidth, theirs.tileWidth);
+  EXPECT_EQ(ours.tileHeight, theirs.tileHeight);
+  EXPECT_EQ(ours.format, theirs.format);
+  EXPECT_EQ(ours.metadata.Describe().ToUTF8(), theirs.metadata.Describe().ToUTF8());
+  EXPECT_EQ(DetailNames(ours.metadata), DetailNames(theirs.metadata));
+  for (const std::string& name : DetailNames(theirs.metadata)) {
+    EXPECT_EQ(FindDetail(ours.metadata, DetailPath(name)),
+              FindDetail(theirs.metadata, DetailPath(name)))
+        << name;
+  }
+  EXPECT_EQ(TextOf(ours.geoRef), TextOf(theirs.geoRef));
+  ASSERT_EQ(ours.noData.size(), theirs.noData.size());
+  for (const auto& [band, value] : theirs.noData) {
+    const double own = ours.noData.at(band);
+    EXPECT_TRUE(own == value || (std::isnan(own) && std::isnan(value))) << own << " " << value;
+  }
+}
+
+template <typename T>
+void ExpectSamePixels(RasterReader<T>& ours, RasterReader<T>& theirs, unsigned level,
+                      std::mt19937& random) {
+  const unsigned samples = theirs.Samples(level), lines = theirs.Lines(level);
+  ASSERT_EQ(ours.Samples(level), samples);
+  ASSERT_EQ(ours.Lines(level), lines);
+  for (int i = 0; i < 8; ++i) {
+    const bool isWhole = i == 0;
+    const unsigned left = isWhole ? 0 : random() % samples, top = isWhole ? 0 : random() % lines;
+    const unsigned width = isWhole ? samples : 1 + random() % (samples - left);
+    const unsigned height = isWhole ? lines : 1 + random() % (lines - top);
+    std::vector<unsigned> chosen;
+    for (unsigned band = 0; band < theirs.Bands(); ++band) chosen.push_back(band);
+    if (i % 3 == 2) std::reverse(chosen.begin(), chosen.end());
+    if (i % 3 == 1) chosen.resize(1 + random() % chosen.size());
+    Array<unsigned> bands{ArrayDims(static_cast<unsigned>(chosen.size()))};
+    std::copy(chosen.begin(), chosen.end(), bands.begin());
+    const std::size_t count = std::size_t{width} * height * chosen.size();
+    std::vector<T> own(count), other(count);
+    std::vector<unsigned char> ownState(count), otherState(count);
+    ASSERT_TRUE(
+        ours.ReadPixels(left, top, width, height, bands, level, own.data(), ownState.data()))
+        << TakeFault().ToUTF8();
+    ASSERT_TRUE(
+        theirs.ReadPixels(left, top, width, height, bands, level, other.data(), otherState.data()))
+        << TakeFault().ToUTF8();
+    EXPECT_EQ(0, std::memcmp(own.data(), other.data(), count * sizeof(T)))
+        << left << " " << top << " " << width << " " << height;
+    EXPECT_EQ(ownState, otherState);
+  }
+}
+
+/// Compares a file both ways. @return whether the library reads it itself.
+bool ExpectSame(const std::string& path) {
+  SCOPED_TRACE(path);
+  const RasterDataConnectionPtr ours = OpenBy(*FactoryForFormat("TIFF"), path);
+  const RasterDataConnectionPtr theirs = OpenBy(GdalFactory(), path);
+  EXPECT_EQ(bool(ours), bool(theirs));
+  if (!ours || !theirs) return false;
+  const bool isOwn = IsOwn(*ours);
+  EXPECT_EQ(ours->DataType(), theirs->DataType());
+  EXPECT_EQ(ours->URI(), theirs->URI());
+  EXPECT_EQ(ours->CanWrite(), theirs->CanWrite());
+  ExpectSameDefinition(ours->RasterDef(), theirs->RasterDef());
+  std::mt19937 random(5);
+  DispatchType(TwelveTypes{}, static_cast<unsigned>(theirs->DataType()), [&]<typename T>() {
+    const RasterReaderPtr<T> own = test::ReaderOf<T>(ours), other = test::ReaderOf<T>(theirs);
+    EXPECT_EQ(own->PyramidExists(), other->PyramidExists());
+    EXPECT_EQ(own->PyramidLevelMin(), other->PyramidLevelMin());
+    EXPECT_EQ(own->PyramidLevelMax(), other->PyramidLevelMax());
+    EXPECT_EQ(own->StatsMask(), other->StatsMask());
+    EXPECT_EQ(own->CanWritePixels(0), other->CanWritePixels(0));
+    for (unsigned band = 0; band < other->Bands(); ++band) {
+      EXPECT_EQ(own->HasNoDataValue(band), other->HasNoDataValue(band));
+      EXPECT_EQ(own->HasPalette(band), other->HasPalette(band));
+      EXPECT_EQ(own->StatsExist(band), other->StatsExist(band));
+      EXPECT_EQ(own->ReadStats(band).mask, other->ReadStats(band).mask);
+      EXPECT_EQ(own->ReadStats(band).mean, other->ReadStats(band).mean);
+    }
+    for (int level = 0; level <= other->PyramidLevelMax(); ++level) {
+      if (level == 0 || level >= other->PyramidLevelMin()) {
+        ExpectSamePixels(*own, *other, static_cast<unsigned>(level), random);
+      }
+    }
+    return true;
+  });
+  return isOwn;
+}
+
+struct Layout {
+  GDALDataType type;
+  std::vector<std::string> options;
+  unsigned bands = 3;
+  int epsg = 32633;
+  const char* noData = nullptr;
+  bool hasLevels = false;
+};
+
+void Make(const std::string& path, const Layout& layout, int seed) {
+  GDALAllRegister();
+  constexpr int kWidth = 203, kHeight = 149;
+  CPLStringList options;
+  for (const std::string& option : layout.options) options.AddString(option.c_str());
+  GDALDatasetH const file = GDALCreate(GDALGetDriverByName("GTiff"), path.c_str(), kWidth, kHeight,
+                                       static_cast<int>(layout.bands), layout.type, options.List());
+  ASSERT_NE(file, nullptr);
+  if (layout.epsg != 0) {
+    OGRSpatialReferenceH const system = OSRNewSpatialReference(nullptr);
+    ASSERT_EQ(OSRImportFromEPSG(system, layout.epsg), OGRERR_NONE);
+    GDALSetSpatialRef(file, system);
+    OSRRelease(system);
+    double grid[] = {500000.5, 30, 0, 4000000.25, 0, -20};
+    if (layout.epsg == 4326) grid[0] = 10, grid[1] = 0.01, grid[3] = 50, grid[5] = -0.02;
+    GDALSetGeoTransform(file, grid);
+  }
+  std::mt19937 random(static_cast<unsigned>(seed));
+  std::vector<double> values(std::size_t{kWidth} * kHeight);
+  for (unsigned band = 1; band <= layout.bands; ++band) {
+    GDALRasterBandH const target = GDALGetRasterBand(file, static_cast<int>(band));
+    if (layout.noData != nullptr) GDALSetRasterNoDataValue(target, CPLAtof(layout.noData));
+    // Runs of one value among noise, so that codecs have long strings as well as short ones.
+    double last = 0;
+    for (double& value : values) {
+      if (random() % 8 == 0) last = random() % 250;
+      value = last + (random() % 16 == 0 ? 1 : 0);
+    }
+    ASSERT_EQ(GDALRasterIO(target, GF_Write, 0, 0, kWidth, kHeight, values.data(), kWidth, kHeight,
+                           GDT_Float64, 0, 0),
+              CE_None);
+  }
+  if (layout.hasLevels) {
+    int factors[] = {2, 4, 8};
+    ASSERT_EQ(GDALBuildOverviews(file, "NEAREST", 3, factors, 0, nullptr, nullptr, nullptr),
+              CE_None);
+  }
+  GDALClose(file);
+}
+
+TEST(OwnTiff, IsReadAsGdalReadsIt) {
+  const test::TemporaryDirectory directory;
+  const std::vector<std::vector<std::string>> blocks = {
+      {"TILED=YES", "BLOCKXSIZE=64", "BLOCKYSIZE=32"}, {"BLOCKYSIZE=7"}, {"BLOCKYSIZE=149"}};
+  const std::vector<std::pair<const char*, std::vector<int>>> codecs = {
+      {"NONE", {1}}, {"DEFLATE", {1, 2, 3}}, {"LZW", {1, 2, 3}}, {"ZSTD", {1, 2, 3}}};
+  int number = 0;
+  for (const GDALDataType type :
+       {GDT_Byte, GDT_UInt16, GDT_Int16, GDT_UInt32, GDT_Int32, GDT_Float32, GDT_Float64}) {
+    for (const auto& block : blocks) {
+      for (const auto& [codec, predictors] : codecs) {
+        for (const int predictor : predictors) {
+          const bool isFloat = type == GDT_Float32 || type == GDT_Float64;
+          if ((predictor == 3) != isFloat && predictor != 1) continue;
+          Layout layout{type, block, number % 4 == 3 ? 1U : 3U};
+          layout.options.push_back(std::string("COMPRESS=").append(codec));
+          if (predictor != 1) layout.options.push_back("PREDICTOR=" + std::to_string(predictor));
+          layout.options.push_back(number % 2 == 0 ? "INTERLEAVE=PIXEL" : "INTERLEAVE=BAND");
+          layout.options.push_back(number % 5 == 0 ? "BIGTIFF=YES" : "BIGTIFF=NO");
+          layout.options.push_back("PHOTOMETRIC=MINISBLACK");
+          const char* const noData[] = {nullptr, "7", "-9999", "1e300", "nan"};
+          // Left to GDAL: no-data values of doubles, and those beyond what a float can hold.
+          const bool isBeyond = type == GDT_Float32 && number % 5 == 3;
+          if (type != GDT_Float64 && !isBeyond) layout.noData = noData[number % 5];
+          const int systems[] = {32633, 4326, 0, 3857, 31985, 2056};
+          layout.epsg = systems[number % 6];
+          layout.hasLevels = number % 3 == 0;
+          const std::string path =
+              (directory.Path() / ("s" + std::to_string(number) + "x.tif")).string();
+          Make(path, layout, number);
+          EXPECT_TRUE(ExpectSame(path)) << "GDAL had to read it";
+          ++number;
+        }
+      }
+    }
+  }
+  EXPECT_GT(number, 100);
+}
+
+/// Systems of all kinds: in feet and degrees, with other meridians, withdrawn ones.
+TEST(OwnTiff, SystemsOfTheRegistryAreThoseOfGdal) {
+  GDALAllRegister();
+  const test::TemporaryDirectory directory;
+  unsigned own = 0, all = 0;
+  for (int code = 2000; code < 32767; code += code < 5000 ? 41 : 97) {
+    const std::string path = (directory.Path() / ("c" + std::to_string(code) + "x.tif")).string();
+    {
+      OGRSpatialReferenceH const system = OSRNewSpatialReference(nullptr);
+      CPLPushErrorHandler(CPLQuietErrorHandler);
+      if (OSRImportFromEPSG(system, code) == OGRERR_NONE &&
+          (OSRIsProjected(system) != 0 || OSRIsGeographic(system) != 0)) {
+        GDALDatasetH const file =
+            GDALCreate(GDALGetDriverByName("GTiff"), path.c_str(), 3, 2, 1, GDT_Byte, nullptr);
+        double grid[] = {100, 1, 0, 50, 0, -1};
+        GDALSetGeoTransform(file, grid);
+        GDALSetSpatialRef(file, system);
+        GDALClose(file);
+      }
+      CPLPopErrorHandler();
+      OSRRelease(system);
+    }
+    if (!fs::exists(path)) continue;
+    own += ExpectSame(path) ? 1 : 0;
+    ++all;
+    fs::remove(path);
+  }
+  EXPECT_GT(all, 80U);
+  EXPECT_GT(own, all / 3);
+}
+
+TEST(OwnTiff, LeavesToGdalWhatItDoesNotKnow) {
+  const test::TemporaryDirectory directory;
+  const auto path = [&](const char* name) { return (directory.Path() / name).string(); };
+  const auto isOwn = [&](const char* name, const Layout& layout) {
+    Make(path(name), layout, 1);
+    return ExpectSame(path(name));
+  };
+  EXPECT_FALSE(isOwn("jpeg.tif", {GDT_Byte, {"COMPRESS=JPEG", "PHOTOMETRIC=YCBCR", "TILED=YES"}}));
+  EXPECT_FALSE(isOwn("packed.tif", {GDT_Byte, {"COMPRESS=PACKBITS"}}));
+  EXPECT_FALSE(isOwn("bits.tif", {GDT_Byte, {"NBITS=4"}}));
+  EXPECT_FALSE(isOwn("signed.tif", {GDT_Byte, {"PIXELTYPE=SIGNEDBYTE"}, 1}));
+  EXPECT_FALSE(isOwn("alpha.tif", {GDT_Byte, {"ALPHA=YES"}, 4}));
+  EXPECT_FALSE(isOwn("complex.tif", {GDT_CFloat32, {}, 1}));
+  EXPECT_FALSE(isOwn("other-end.tif", {GDT_UInt16, {"ENDIANNESS=BIG"}}));
+  EXPECT_FALSE(isOwn("white.tif", {GDT_Byte, {"PHOTOMETRIC=MINISWHITE"}, 1}));
+  EXPECT_FALSE(isOwn("sparse.tif", {GDT_UInt64, {}, 1, 32633, "5"}));
+  EXPECT_TRUE(isOwn("colours.tif", {GDT_Byte, {"PHOTOMETRIC=RGB"}}));
+  // Files beside a file may change what it is.
+  for (const char* const beside : {"plain.tif.aux.xml", "plain.tfw", "PLAIN.TFW", "plain.tif.ovr",
+                                   "plain.tif.msk", "plain_rpc.txt", "plain.IMD", "pla_MTL.txt"}) {
+    SCOPED_TRACE(beside);
+    Make(path("plain.tif"), {GDT_Byte, {}}, 2);
+    const auto opened = [&] {
+      const RasterDataConnectionPtr file = OpenBy(*FactoryForFormat("TIFF"), path("plain.tif"));
+      return file && IsOwn(*file);
+    };
+    EXPECT_TRUE(opened());
+    std::ofstream(path(beside)) << "0\n";
+    EXPECT_FALSE(opened());
+    fs::remove(path(beside));
+  }
+}
+
+TEST(OwnTiff, DamageIsWhatGdalSaysOfIt) {
+  const test::TemporaryDirectory directory;
+  const std::string path = (directory.Path() / "damaged.tif").string();
+  for (const char* const codec : {"NONE", "DEFLATE", "LZW", "ZSTD"}) {
+    for (int seed = 0; seed < 12; ++seed) {
+      Make(
+          path,
+          {GDT_UInt16,
+           {std::string("COMPRESS=").append(codec), "TILED=YES", "BLOCKXSIZE=64", "BLOCKYSIZE=64"}},
+          seed);
+      const auto size = static_cast<unsigned>(fs::file_size(path));
+      std::mt19937 random(static_cast<unsigned>(seed));
+      if (seed % 3 == 0) {
+        fs::resize_file(path, size / 2 + random() % (size / 2));
+      } else {
+        std::fstream file(path, std::ios::in | std::ios::out | std::ios::binary);
+        for (int i = 0; i < 20; ++i) {
+          file.seekp(static_cast<std::streamoff>(random() % size));
+          file.put(static_cast<char>(random()));
+        }
+      }
+      SCOPED_TRACE(std::string(codec) + " " + std::to_string(seed));
+      const RasterDataConnectionPtr ours = OpenBy(*FactoryForFormat("TIFF"), path);
+      const String ourFault = TakeFault();
+      const RasterDataConnectionPtr theirs = OpenBy(GdalFactory(), path);
+      const String theirFault = TakeFault();
+      ASSERT_EQ(bool(ours), bool(theirs));
+      EXPECT_EQ(ourFault, theirFault);
+      const RasterReaderPtr<std::uint16_t> own = test::ReaderOf<std::uint16_t>(ours),
+                                           other = test::ReaderOf<std::uint16_t>(theirs);
+      ASSERT_EQ(bool(own), bool(other));
+      if (!own) continue;
+      Array<unsigned> bands{ArrayDims(other->Bands())};
+      for (unsigned i = 0; i < bands.GetCount(); ++i) bands[i] = i;
+      const std::size_t count = std::size_t{other->Samples(0)} * other->Lines(0) * bands.GetCount();
+      if (count > 1 << 24) continue;
+      std::vector<std::uint16_t> a(count), b(count);
+      std::vector<unsigned char> state(count);
+      const bool isOurs = own->ReadPixels(0, 0, other->Samples(0), other->Lines(0), bands, 0,
+                                          a.data(), state.data());
+      const String ourRead = TakeFault();
+      const bool isTheirs = other->ReadPixels(0, 0, other->Samples(0), other->Lines(0), bands, 0,
+                                              b.data(), state.data());
+      const String theirRead = TakeFault();
+      EXPECT_EQ(isOurs, isTheirs) << ourRead.ToUTF8() << " / " << theirRead.ToUTF8();
+      if (isOurs && isTheirs) {
+        EXPECT_EQ(a, b);
+      } else if (!isOurs && !isTheirs) {
+        EXPECT_EQ(ourRead, theirRead);
+      }
+    }
+  }
+}
+
+TEST(OwnTiff, SamplesAreThoseOfGdal) {
+  unsigned own = 0;
+  for (const auto& entry : fs::recursive_directory_iterator(test::SampleData("."))) {
+    if (entry.path().extension() == ".tif" && ExpectSame(entry.path().string())) ++own;
+  }
+  EXPECT_GE(own, 7U);
+}
+
+/// Requests beyond reading go to GDAL, and reads afterwards give what it changed.
+TEST(OwnTiff, ChangesGoThroughGdal) {
+  const test::TemporaryDirectory directory;
+  const std::string path = (directory.Path() / "changed.tif").string();
+  Make(path, {GDT_Byte, {"TILED=YES", "COMPRESS=DEFLATE"}, 1}, 3);
+  const RasterDataConnectionPtr file = OpenBy(*FactoryForFormat("TIFF"), path);
+  ASSERT_TRUE(file && IsOwn(*file));
+  const RasterReaderPtr<std::uint8_t> reader = test::ReaderOf<std::uint8_t>(file);
+  test::Block<std::uint8_t> block{{5, 6, 8, 7}, {0}, {}, {}};
+  ASSERT_TRUE(block.Read(*reader));
+  block.pixels = {1, 2, 3, 4, 5, 6, 7, 8};
+  ASSERT_TRUE(block.Write(*reader)) << TakeFault().ToUTF8();
+  test::Block<std::uint8_t> again{{5, 6, 8, 7}, {0}, {}, {}};
+  ASSERT_TRUE(again.Read(*reader));
+  EXPECT_EQ(again.pixels, block.pixels);
+  EXPECT_TRUE(reader->PyramidBuild(1, 2, 0, TileDimensions{}));
+  EXPECT_EQ(reader->PyramidLevelMax(), 2);
+  EXPECT_EQ(reader->Samples(1), 102U);
+}
+
+}  // namespace
+}  // namespace lumo
