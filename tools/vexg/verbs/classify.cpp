@@ -134,9 +134,10 @@ class ClassifyVerb final : public RasterVerb {
       const auto count = ParseValue<std::uint64_t>(returns.Find("Records"));
       if (i == 0) records = count;
       if (count != records) {
-        throw HostError(kExitFailed,
-                        fmt::format("{}: it has {} regions, and {} has {}: they are of other labels",
-                                    request_.files[i], count, request_.files[0], records));
+        throw HostError(
+            kExitFailed,
+            fmt::format("{}: it has {} regions, and {} has {}: they are of other labels",
+                        request_.files[i], count, request_.files[0], records));
       }
       AddColumns(request_.files[i], ParseValue<unsigned>(returns.Find("Bands")),
                  ParseValue<unsigned>(returns.Find("Attributes")), places);
