@@ -59,6 +59,12 @@ class VEXG_EXPORT BasicMosaicRasterDef : public Object {
   Form Bins() const { return settings_.bins; }
   const MosaicSettings& Settings() const { return settings_; }
 
+  /// The base of the table files that pixels are made with; no text while there are none. LutPath
+  /// is where the next tables go.
+  virtual String TablesInUse() const;
+  /// False when the files that the definition came from have changed since.
+  virtual bool IsUpToDate() const { return true; }
+
   /// Stores the definition once footprints, tables or seams have come in, and has the mosaic's
   /// pixels made with them from then on. A definition in memory alone has nothing to store.
   /// @param reason  [out] why it can't be stored, in one line.
