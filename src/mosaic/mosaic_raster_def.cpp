@@ -1,0 +1,44 @@
+#include "mosaic/mosaic_raster_def.h"
+
+#include "foundation/type_code.h"
+
+namespace lumo {
+
+const unsigned BasicMosaicRasterDef::TypeCode =
+    GloballyUniqueObjectTypeCode("BasicMosaicRasterDef");
+
+BasicMosaicRasterDef::BasicMosaicRasterDef(MosaicSettings settings)
+    : settings_(std::move(settings)) {}
+
+bool BasicMosaicRasterDef::Keep(std::string& /*reason*/) {
+  ++revision_;
+  return true;
+}
+
+template <typename T>
+const unsigned MosaicRasterDef<T>::TypeCode = GloballyUniqueObjectTypeCode(
+    String("MosaicRasterDef<" + DataTypeName(kDataTypeOf<T>).ToUTF8() + ">"));
+
+template <typename T>
+MosaicRasterDef<T>::MosaicRasterDef(const Array<RasterPtr<T>>& scenes, MosaicSettings settings)
+    : BasicMosaicRasterDef(std::move(settings)), scenes_(scenes) {
+  Array<unsigned> flags{ArrayDims(scenes.GetCount())};
+  for (unsigned i = 0; i < flags.GetCount(); ++i) {
+    flags[i] = i < settings_.matchFlags.GetCount() ? settings_.matchFlags[i] : 1;
+  }
+  settings_.matchFlags = flags;
+}
+
+template <typename T>
+String MosaicRasterDef<T>::SceneKey(unsigned scene) const {
+  return scenes_[scene] ? String(scenes_[scene]->GetURI()) : String();
+}
+
+template <typename T>
+RasterPtr<T> MosaicRasterDef<T>::ReferenceScene() const {
+  return settings_.reference < scenes_.GetCount() ? scenes_[settings_.reference] : RasterPtr<T>();
+}
+
+VEXG_INSTANCES(EIGHT, MosaicRasterDef);
+
+}  // namespace lumo
