@@ -42,7 +42,7 @@ class VEXG_EXPORT BasicMosaicRasterDef : public Object {
   }
 
   /// The mutex of the definition: `const MutexLock lock(definition->Lock());`.
-  std::recursive_mutex& Lock() const { return lock_; }
+  virtual std::recursive_mutex& Lock() const { return lock_; }
 
   virtual unsigned SceneCount() const = 0;
   /// The text of a scene's URI, the key of Footprints and SeamFiles.
