@@ -75,7 +75,7 @@ PolygonFileOutput::~PolygonFileOutput() {
 }
 
 bool PolygonFileOutput::Fail(const std::string& why) {
-  SetFault(platform::WithoutTemporaryNames(why));
+  SetFault(String(why));
   error_.SetErrorState(ObjectErrorIO());
   return false;
 }
