@@ -1,7 +1,18 @@
 #pragma once
 
+#include <algorithm>
+#include <cmath>
+#include <cstring>
+
+#include "foundation/fault.h"
 #include "foundation/type_code.h"
+#include "georef/affine_link.h"
+#include "mosaic/colour_table.h"
+#include "mosaic/mosaic_masks.h"
 #include "mosaic/mosaic_raster.h"
+#include "mosaic/raster_outline.h"
+#include "mosaic/scene_tables.h"
+#include "pyramid/exact_levels.h"
 #include "raster/block_shape.h"
 #include "raster/block_strides.h"
 #include "raster/pixel_states.h"
@@ -10,30 +21,211 @@
 
 namespace lumo {
 
+namespace detail {
+
+/// Scenes whose views on the grid are kept.
+inline constexpr std::size_t kKeptViews = 32;
+/// Pixels of a strip that is feathered at once.
+inline constexpr std::size_t kFeatherPixels = std::size_t{1} << 18;
+
+/// The definition of a level of a mosaic: its scenes are the scenes' levels, or the scenes
+/// themselves where they have none; the rest is that of the mosaic.
+template <typename T>
+class LevelMosaicRasterDef final : public MosaicRasterDef<T> {
+ public:
+  LevelMosaicRasterDef(const MosaicRasterDefPtr<T>& base, const Array<RasterPtr<T>>& levels)
+      : MosaicRasterDef<T>(levels, base->Settings()), base_(base) {}
+
+  std::recursive_mutex& Lock() const override { return base_->Lock(); }
+  String SceneKey(unsigned scene) const override { return base_->SceneKey(scene); }
+  String TablesInUse() const override { return base_->TablesInUse(); }
+  bool IsUpToDate() const override { return base_->IsUpToDate(); }
+  bool Keep(std::string& reason) override {
+    return base_->Keep(reason) && MosaicRasterDef<T>::Keep(reason);
+  }
+
+ private:
+  const MosaicRasterDefPtr<T> base_;
+};
+
+/// The whole number next to a shift between two grids of one kind; false when there is none.
+inline bool IsWholeShift(double shift, double scale, unsigned size, std::int64_t& whole) {
+  constexpr double kNoise = 1e-6;  // pixels
+  const double rounded = std::floor(shift + 0.5);
+  whole = static_cast<std::int64_t>(rounded);
+  return std::abs(shift - rounded) < kNoise && std::abs(scale - 1) * size < kNoise;
+}
+
+inline SubRect Cut(const SubRect& rect, std::int64_t left, std::int64_t top, std::int64_t right,
+                   std::int64_t bottom) {
+  const auto low = [](unsigned a, std::int64_t b) {
+    return static_cast<unsigned>(std::max<std::int64_t>(a, b));
+  };
+  const auto high = [](unsigned a, std::int64_t b) {
+    return static_cast<unsigned>(std::min<std::int64_t>(a, b));
+  };
+  return {low(rect.left, left), low(rect.top, top), high(rect.right, right),
+          high(rect.bottom, bottom)};
+}
+
+}  // namespace detail
+
+/// What pixels are made with, as it is at one revision of the definition.
+template <typename T>
+struct MosaicRaster<T>::Shown {
+  std::uint64_t revision;
+  MosaicMasks masks;
+  SceneTables<T> tables;
+};
+
+/// A block that is asked for, while it is filled.
+template <typename T>
+struct MosaicRaster<T>::Block {
+  Block(const SubRect& rectangle, const Array<unsigned>& named, Interleave order,
+        Array<T>& values, Array<unsigned char>& marks)
+      : rect(rectangle),
+        shape(rectangle, named, order),
+        strides(order, shape.width, shape.height, shape.count),
+        pixels(values),
+        state(marks) {}
+
+  std::size_t PixelOf(unsigned x, unsigned y) const {
+    return std::size_t{y - rect.top} * shape.width + (x - rect.left);
+  }
+  std::size_t ElementOf(unsigned x, unsigned y) const {
+    return (y - rect.top) * strides.line + (x - rect.left) * strides.pixel;
+  }
+  /// Begins to keep count of the pixels that are there.
+  void Count() {
+    if (taken.empty()) taken.resize(std::size_t{shape.width} * shape.height);
+  }
+
+  const SubRect rect;
+  const BlockShape shape;
+  const BlockStrides strides;
+  Array<T>& pixels;
+  Array<unsigned char>& state;
+  std::vector<unsigned char> taken;  // for each pixel, 1 once a scene has given it
+  std::size_t left = 0;              // pixels that none has given
+};
+
 template <typename T>
 const unsigned MosaicRaster<T>::TypeCode = GloballyUniqueObjectTypeCode(
     String("MosaicRaster<" + DataTypeName(kDataTypeOf<T>).ToUTF8() + ">"));
 
 template <typename T>
-MosaicRaster<T>::MosaicRaster(const MosaicRasterDefPtr<T>& definition, const RasterDef& grid)
-    : definition_(definition), def_(grid) {
+MosaicRaster<T>::MosaicRaster(const MosaicRasterDefPtr<T>& definition, const RasterDef& grid,
+                              const RasterPtr<T>& plain, const URI& uri)
+    : ComputedRaster<T>(plain), definition_(definition), def_(grid), uri_(uri) {
+  if (definition) {
+    for (const RasterPtr<T>& scene : definition->Scenes()) {
+      models_.push_back(scene ? CloneOf(scene->GetRasterDef().geoRef) : GeoRefPtr());
+    }
+  }
+  SetUp();
+}
+
+template <typename T>
+MosaicRaster<T>::MosaicRaster(LevelTag, const MosaicRaster& base,
+                              const MosaicRasterDefPtr<T>& definition, const RasterDef& grid,
+                              const RasterPtr<T>& stored)
+    : definition_(definition),
+      def_(grid),
+      models_(base.models_),
+      scaleX_(double(grid.samples) / base.def_.samples),
+      scaleY_(double(grid.lines) / base.def_.lines),
+      stored_(stored) {
+  SetUp();
+}
+
+template <typename T>
+MosaicRaster<T>::~MosaicRaster() {
+  this->StopComputing();
+}
+
+template <typename T>
+void MosaicRaster<T>::SetUp() {
   def_.dataType = kDataTypeOf<T>;
-  const bool isUsable =
-      definition && def_.geoRef && def_.samples != 0 && def_.lines != 0 && def_.bands != 0;
+  const bool isUsable = definition_ && definition_->SceneCount() != 0 && def_.geoRef &&
+                        def_.geoRef->GetType() == GeoRef::kStd && def_.samples != 0 &&
+                        def_.lines != 0 && def_.bands != 0;
   if (!isUsable) {
     def_.Clear();
     return;
   }
   def_.SetGeoRef(def_.geoRef);  // of the size
-  const MosaicSettings& settings = definition->Settings();
-  const ProjectedRasterOptions options{ProjectedGrid::kExact, WarpSampling::kCentred,
-                                       settings.noData};
-  onGrid_.Resize(ArrayDims(definition->SceneCount()));
-  for (unsigned i = 0; i < onGrid_.GetCount(); ++i) {
-    onGrid_[i].Reset(new ProjectedRaster<T>(definition->Scenes()[i], def_.geoRef,
-                                            ReprojectionMethod::kPolynomial, settings.resampling,
-                                            options));
+  onGrid_ = std::make_unique<RecentScenes<RasterPtr<T>>>(detail::kKeptViews);
+  bool areAllOnGrid = true;
+  std::vector<RecordBox> boxes;
+  for (const RasterPtr<T>& scene : definition_->Scenes()) {
+    const RasterDef def = scene ? scene->GetRasterDef() : RasterDef();
+    const Place place = PlaceOf(def);
+    places_.push_back(place);
+    areAllOnGrid = areAllOnGrid && place.isOnGrid;
+    if (place.right < place.left || place.bottom < place.top) continue;
+    boxes.push_back({static_cast<std::int32_t>(places_.size() - 1),
+                     {double(place.left), double(place.top), double(place.right) + 1,
+                      double(place.bottom) + 1}});
+    if (def_.interleave == Interleave::None) def_.interleave = def.interleave;
+    if (def_.tileWidth == 0) {
+      def_.tileWidth = std::min(def.tileWidth, def_.samples);
+      def_.tileHeight = std::min(def.tileHeight, def_.lines);
+      if (def.tileWidth == def.samples) def_.tileWidth = def_.samples;
+    }
   }
+  constexpr unsigned kSquares = 256;
+  if (!areAllOnGrid) def_.tileWidth = def_.tileHeight = kSquares;
+  index_ = std::make_unique<RecordIndex>(boxes);
+}
+
+template <typename T>
+typename MosaicRaster<T>::Place MosaicRaster<T>::PlaceOf(const RasterDef& scene) const {
+  Place place;
+  if (!scene.geoRef) return place;
+  const auto link = FindAffineLink(*def_.geoRef, *scene.geoRef);
+  if (link) {
+    place.isOnGrid = link->xy == 0 && link->yx == 0 &&
+                     detail::IsWholeShift(link->x0, link->xx, def_.samples, place.toX) &&
+                     detail::IsWholeShift(link->y0, link->yy, def_.lines, place.toY);
+  }
+  double low[2] = {0, 0}, high[2] = {double(def_.samples), double(def_.lines)};
+  if (place.isOnGrid) {
+    low[0] = static_cast<double>(-place.toX);
+    low[1] = static_cast<double>(-place.toY);
+    high[0] = low[0] + scene.samples;
+    high[1] = low[1] + scene.lines;
+  } else {
+    const auto outline = OutlineIn(*def_.geoRef, scene);
+    if (outline.size() == 4 * kOutlinePieces) {
+      for (const unsigned axis : {0U, 1U}) {
+        const auto less = [axis](const auto& a, const auto& b) { return a[axis] < b[axis]; };
+        const auto [least, most] = std::ranges::minmax_element(outline, less);
+        // Between the points of the outline it may bend.
+        const double margin = 2 + 0.01 * ((*most)[axis] - (*least)[axis]);
+        low[axis] = std::floor((*least)[axis] - margin);
+        high[axis] = std::ceil((*most)[axis] + margin);
+      }
+    }
+  }
+  const auto cut = [](double value, unsigned size) {
+    return static_cast<std::int64_t>(std::clamp(value, 0.0, double(size)));
+  };
+  place.left = cut(low[0], def_.samples);
+  place.top = cut(low[1], def_.lines);
+  place.right = cut(high[0], def_.samples) - 1;
+  place.bottom = cut(high[1], def_.lines) - 1;
+  return place;
+}
+
+template <typename T>
+URI MosaicRaster<T>::GetURI() const {
+  return uri_.GetLength() != 0 ? uri_ : this->DefaultURI("MosaicRaster");
+}
+
+template <typename T>
+URI MosaicRaster<T>::PyramidURI() const {
+  const auto* const source = dynamic_cast<const SourceRaster*>(this->Parent().Get());
+  return source != nullptr ? source->PyramidURI() : URI();
 }
 
 template <typename T>
@@ -44,8 +236,25 @@ bool MosaicRaster<T>::HasNoDataValue(unsigned band) const {
 
 template <typename T>
 T MosaicRaster<T>::NoDataValue(unsigned band) const {
-  const auto at = def_.noData.find(band);
-  return at != def_.noData.end() ? ToPixel<T>(at->second).value_or(T()) : T();
+  return HasNoDataValue(band) ? *ToPixel<T>(def_.noData.at(band)) : T();
+}
+
+template <typename T>
+bool MosaicRaster<T>::HasPalette(unsigned band) const {
+  return IsValid() && definition_->Scenes()[0]->HasPalette(band);
+}
+
+template <typename T>
+PalettePtr MosaicRaster<T>::Palette(unsigned band) const {
+  return IsValid() ? definition_->Scenes()[0]->Palette(band) : PalettePtr();
+}
+
+template <typename T>
+TileDimensions MosaicRaster<T>::TileDimensions() const {
+  lumo::TileDimensions tiles;
+  tiles.width = def_.tileWidth;
+  tiles.height = def_.tileHeight;
+  return tiles;
 }
 
 template <typename T>
@@ -53,42 +262,434 @@ std::uint64_t MosaicRaster<T>::WriteCount() const {
   return definition_ ? definition_->Revision() : 0;
 }
 
+// Levels.
+
 template <typename T>
-bool MosaicRaster<T>::GetSubRect(const SubRect& rect, const Array<unsigned>& bands,
-                                 Interleave interleave, Array<T>& pixels,
-                                 Array<unsigned char>& state) {
-  const BlockShape block(rect, bands, interleave);
-  if (!IsValid() || !block.Size(pixels, state)) return false;
-  std::fill(state.begin(), state.end(), static_cast<unsigned char>(PixelValueState::NoData));
-  const BlockStrides strides(interleave, block.width, block.height, block.count);
-  for (unsigned band = 0; band < block.count; ++band) {
-    const T value = NoDataValue(block.bands[band]);
-    for (unsigned y = 0; y < block.height; ++y)
-      for (unsigned x = 0; x < block.width; ++x)
-        pixels[y * strides.line + x * strides.pixel + band * strides.band] = value;
+bool MosaicRaster<T>::PyramidExists() const {
+  return stored_.IsNull() && (ComputedRaster<T>::PyramidExists() || HaveLevel(0));
+}
+
+/// True when all scenes have a level; level 0 stands for any at all.
+template <typename T>
+bool MosaicRaster<T>::HaveLevel(unsigned level) const {
+  if (!IsValid() || scaleX_ != 1) return false;
+  const Array<RasterPtr<T>>& scenes = definition_->Scenes();
+  return std::all_of(scenes.begin(), scenes.end(), [&](const RasterPtr<T>& scene) {
+    const PyramidDef def = scene ? scene->GetPyramidDef() : PyramidDef();
+    return scene && scene->PyramidExists() && def.levelMax != 0 &&
+           (level == 0 || (level >= def.levelMin && level <= def.levelMax));
+  });
+}
+
+template <typename T>
+PyramidDef MosaicRaster<T>::GetPyramidDef() const {
+  PyramidDef def = ComputedRaster<T>::GetPyramidDef();
+  if (ComputedRaster<T>::PyramidExists() || !HaveLevel(0)) return def;
+  def.pyramidType = PyramidType::kDriver;
+  def.levelMin = 1;
+  def.levelMax = 31;
+  for (const RasterPtr<T>& scene : definition_->Scenes()) {
+    const PyramidDef own = scene->GetPyramidDef();
+    def.levelMin = std::max(def.levelMin, own.levelMin);
+    def.levelMax = std::min(def.levelMax, own.levelMax);
+    def.resamplingMethod = own.resamplingMethod;
   }
-  Array<T> scenePixels;
-  Array<unsigned char> sceneState;
-  const auto hasAny = [&](const Array<unsigned char>& states, std::size_t at) {
-    for (unsigned band = 0; band < block.count; ++band)
-      if (IsValidState(states[static_cast<unsigned>(at + band * strides.band)])) return true;
-    return false;
-  };
-  for (const RasterPtr<T>& scene : onGrid_) {
-    if (!scene->GetSubRect(rect, block.bands, interleave, scenePixels, sceneState)) return false;
-    for (unsigned y = 0; y < block.height; ++y) {
-      for (unsigned x = 0; x < block.width; ++x) {
-        const std::size_t at = y * strides.line + x * strides.pixel;
-        if (hasAny(state, at) || !hasAny(sceneState, at)) continue;
-        for (unsigned band = 0; band < block.count; ++band) {
-          const auto to = static_cast<unsigned>(at + band * strides.band);
-          pixels[to] = scenePixels[to];
-          state[to] = sceneState[to];
+  if (def.levelMin > def.levelMax) def = ComputedRaster<T>::GetPyramidDef();
+  return def;
+}
+
+template <typename T>
+RasterPtr<T> MosaicRaster<T>::PyramidLevel(unsigned level) {
+  if (!IsValid() || level == 0 || level > 31) return {};
+  const RasterPtr<T> stored = ComputedRaster<T>::PyramidExists()
+                                  ? ComputedRaster<T>::PyramidLevel(level)
+                                  : RasterPtr<T>();
+  const bool haveLevel = HaveLevel(level);
+  if (!stored && !haveLevel) return {};
+  const ExactLevels exactly(true);
+  Array<RasterPtr<T>> scenes{ArrayDims(definition_->SceneCount())};
+  for (unsigned i = 0; i < scenes.GetCount(); ++i) {
+    const RasterPtr<T>& scene = definition_->Scenes()[i];
+    scenes[i] = haveLevel ? scene->PyramidLevel(level) : scene;
+    if (!scenes[i]) return {};
+  }
+  RasterDef grid = def_;
+  grid.samples = std::max(1U, def_.samples >> level);
+  grid.lines = std::max(1U, def_.lines >> level);
+  grid.interleave = Interleave::None;
+  grid.tileWidth = grid.tileHeight = 0;
+  const double scale = std::ldexp(1.0, static_cast<int>(level));
+  grid.geoRef = CloneOf(def_.geoRef);
+  grid.geoRef->SetTiePixel(grid.geoRef->TiePixelX() / scale, grid.geoRef->TiePixelY() / scale);
+  grid.geoRef->SetPixelSize(grid.geoRef->PixelSizeX() * scale, grid.geoRef->PixelSizeY() * scale);
+  grid.SetGeoRef(grid.geoRef);
+  const MosaicRasterDefPtr<T> definition(
+      new detail::LevelMosaicRasterDef<T>(definition_, scenes));
+  const RasterPtr<T> shown(new MosaicRaster(LevelTag(), *this, definition, grid, stored));
+  return shown->IsValid() ? shown : RasterPtr<T>();
+}
+
+// Pixels.
+
+template <typename T>
+std::shared_ptr<typename MosaicRaster<T>::Shown> MosaicRaster<T>::Show() {
+  const std::lock_guard lock(shownLock_);
+  const std::uint64_t revision = definition_->Revision();
+  if (!shown_ || shown_->revision != revision) {
+    const std::optional<T> noData =
+        HasNoDataValue(0) ? std::optional<T>(NoDataValue(0)) : std::nullopt;
+    shown_ = std::shared_ptr<Shown>(
+        new Shown{revision,
+                  {*definition_, models_, def_.geoRef, scaleX_, scaleY_, kDataTypeOf<T>},
+                  SceneTables<T>(*definition_, def_.bands, noData)});
+  }
+  return shown_;
+}
+
+/// A scene in the grid of the mosaic.
+template <typename T>
+RasterPtr<T> MosaicRaster<T>::OnGrid(unsigned scene) {
+  return onGrid_->Get(scene, [&]() -> RasterPtr<T> {
+    const MosaicSettings& settings = definition_->Settings();
+    const ProjectedRasterOptions options{ProjectedGrid::kExact, WarpSampling::kCentred,
+                                         settings.noData};
+    const RasterPtr<T> view(new ProjectedRaster<T>(definition_->Scenes()[scene], def_.geoRef,
+                                                   ReprojectionMethod::kPolynomial,
+                                                   settings.resampling, options));
+    return view->IsValid() ? view : RasterPtr<T>();
+  });
+}
+
+/// Reads a part of the grid from a scene, with its colours turned.
+template <typename T>
+bool MosaicRaster<T>::ReadScene(Shown& shown, unsigned scene, const SubRect& part,
+                                const Block& block, Array<T>& pixels,
+                                Array<unsigned char>& state) {
+  const Place& place = places_[scene];
+  bool isRead = false;
+  if (place.isOnGrid) {
+    const auto moved = [](unsigned at, std::int64_t by) {
+      return static_cast<unsigned>(std::int64_t{at} + by);
+    };
+    const SubRect inScene(moved(part.left, place.toX), moved(part.top, place.toY),
+                          moved(part.right, place.toX), moved(part.bottom, place.toY));
+    isRead = definition_->Scenes()[scene]->GetSubRect(inScene, block.shape.bands,
+                                                      block.shape.interleave, pixels, state);
+  } else if (const RasterPtr<T> view = OnGrid(scene)) {
+    isRead = view->GetSubRect(part, block.shape.bands, block.shape.interleave, pixels, state);
+  }
+  if (!isRead) return false;
+  const auto tables = shown.tables.Of(scene);
+  if (!tables) return false;
+  const std::size_t width = part.Width(), height = part.Height();
+  const BlockStrides strides(block.shape.interleave, width, height, block.shape.count);
+  for (unsigned i = 0; i < block.shape.count && !tables->empty(); ++i) {
+    const ColourTable<T>& table = (*tables)[block.shape.bands[i]];
+    for (std::size_t y = 0; y < height; ++y) {
+      const std::size_t at = i * strides.band + y * strides.line;
+      table.Apply(pixels.GetData() + at, state.GetData() + at, width, strides.pixel);
+    }
+  }
+  return true;
+}
+
+namespace detail {
+
+/// Calls `take(y, first, last)` for the runs of columns of a rectangle that lie in a shape, or for
+/// its whole lines without one.
+template <typename Take>
+void ForEachRun(const SubRect& part, const MaskShape* shape, const Take& take) {
+  for (unsigned y = part.top; y <= part.bottom; ++y) {
+    if (shape == nullptr) {
+      take(y, part.left, part.right);
+      continue;
+    }
+    const SpanRows& rows = shape->Rows();
+    for (const ColumnSpan* span = rows.Begin(y); span != rows.End(y); ++span) {
+      const std::int64_t first = std::max<std::int64_t>(span->first, part.left);
+      const std::int64_t last = std::min<std::int64_t>(span->last, part.right);
+      if (first <= last) take(y, static_cast<unsigned>(first), static_cast<unsigned>(last));
+    }
+  }
+}
+
+/// The box around pixels that are added run by run.
+struct PixelBox {
+  unsigned left = ~0U, top = ~0U, right = 0, bottom = 0;
+
+  bool IsEmpty() const { return left > right; }
+  void Add(unsigned y, unsigned first, unsigned last) {
+    left = std::min(left, first);
+    right = std::max(right, last);
+    top = std::min(top, y);
+    bottom = y;
+  }
+  SubRect Rect() const { return {left, top, right, bottom}; }
+};
+
+}  // namespace detail
+
+/// Fills the block from the scenes in their order: first by the seam polygons, then, where there
+/// are any, the gaps by the footprints.
+template <typename T>
+bool MosaicRaster<T>::Compose(Shown& shown, const std::vector<std::int32_t>& scenes,
+                              Block& block) {
+  const BlockShape& shape = block.shape;
+  block.left = std::size_t{shape.width} * shape.height;
+  Array<T> pixels;
+  Array<unsigned char> state;
+  bool isUntouched = true;
+  const auto take = [&](unsigned scene, const MaskShape* mask) {
+    const Place& place = places_[scene];
+    const SubRect part =
+        detail::Cut(block.rect, place.left, place.top, place.right, place.bottom);
+    if (part.left > part.right || part.top > part.bottom) return true;
+    detail::PixelBox wanted;
+    if (mask == nullptr && block.taken.empty()) {
+      wanted = {part.left, part.top, part.right, part.bottom};
+    } else {
+      detail::ForEachRun(part, mask, [&](unsigned y, unsigned first, unsigned last) {
+        if (!block.taken.empty()) {
+          const unsigned char* const row = &block.taken[block.PixelOf(part.left, y)] - part.left;
+          while (first <= last && row[first] != 0) ++first;
+          while (last > first && row[last] != 0) --last;
+          if (first > last) return;
         }
+        wanted.Add(y, first, last);
+      });
+    }
+    if (wanted.IsEmpty()) return true;
+    const SubRect need = wanted.Rect();
+    const bool isWhole = need.Width() == shape.width && need.Height() == shape.height;
+    if (isWhole && isUntouched && mask == nullptr) {
+      // All of the block, as it is given.
+      if (!ReadScene(shown, scene, need, block, block.pixels, block.state)) return false;
+      isUntouched = false;
+      if (AllValid(block.state.GetData(), block.state.GetCount())) {
+        block.left = 0;
+        return true;
+      }
+      block.Count();
+      for (unsigned y = need.top; y <= need.bottom; ++y) {
+        for (unsigned x = need.left; x <= need.right; ++x) {
+          const unsigned char* const states = block.state.GetData() + block.ElementOf(x, y);
+          for (unsigned i = 0; i < shape.count; ++i) {
+            if (!IsValidState(states[i * block.strides.band])) continue;
+            block.taken[block.PixelOf(x, y)] = 1;
+            --block.left;
+            break;
+          }
+        }
+      }
+      return true;
+    }
+    block.Count();
+    isUntouched = false;
+    if (!ReadScene(shown, scene, need, block, pixels, state)) return false;
+    const BlockStrides from(shape.interleave, need.Width(), need.Height(), shape.count);
+    const bool areAllValid = AllValid(state.GetData(), state.GetCount());
+    detail::ForEachRun(need, mask, [&](unsigned y, unsigned first, unsigned last) {
+      for (unsigned x = first; x <= last; ++x) {
+        unsigned char& taken = block.taken[block.PixelOf(x, y)];
+        if (taken != 0) continue;
+        const std::size_t at = (y - need.top) * from.line + (x - need.left) * from.pixel;
+        bool isThere = areAllValid;
+        for (unsigned i = 0; i < shape.count && !isThere; ++i) {
+          isThere = IsValidState(state.GetData()[at + i * from.band]);
+        }
+        if (!isThere) continue;
+        const std::size_t to = block.ElementOf(x, y);
+        for (unsigned i = 0; i < shape.count; ++i) {
+          block.pixels.GetData()[to + i * block.strides.band] =
+              pixels.GetData()[at + i * from.band];
+          block.state.GetData()[to + i * block.strides.band] =
+              state.GetData()[at + i * from.band];
+        }
+        taken = 1;
+        --block.left;
+      }
+    });
+    return true;
+  };
+  MosaicMasks& masks = shown.masks;
+  for (const std::int32_t number : scenes) {
+    const auto scene = static_cast<unsigned>(number);
+    MosaicMasks::Shape mask;
+    if (masks.HasSeam(scene)) {
+      mask = masks.Seam(scene);
+      if (!mask) return false;
+    } else if (masks.HasFootprint(scene)) {
+      mask = masks.Footprint(scene);
+      if (!mask) return false;
+    }
+    if (!take(scene, mask.get())) return false;
+    if (block.left == 0) return true;
+  }
+  for (const std::int32_t number : scenes) {
+    const auto scene = static_cast<unsigned>(number);
+    if (!masks.HasSeam(scene) || !masks.HasFootprint(scene)) continue;
+    const MosaicMasks::Shape mask = masks.Footprint(scene);
+    if (!mask || !take(scene, mask.get())) return false;
+    if (block.left == 0) return true;
+  }
+  // What no scene has.
+  block.Count();
+  for (unsigned i = 0; i < shape.count; ++i) {
+    const T value = NoDataValue(shape.bands[i]);
+    for (unsigned y = block.rect.top; y <= block.rect.bottom; ++y) {
+      const unsigned char* const taken = &block.taken[block.PixelOf(block.rect.left, y)];
+      std::size_t to = block.ElementOf(block.rect.left, y) + i * block.strides.band;
+      for (unsigned x = 0; x < shape.width; ++x, to += block.strides.pixel) {
+        if (taken[x] != 0) continue;
+        block.pixels.GetData()[to] = value;
+        block.state.GetData()[to] = PixelValueState::NoData;
       }
     }
   }
   return true;
+}
+
+/// Replaces the pixels of the block that lie near seams.
+template <typename T>
+bool MosaicRaster<T>::Feather(Shown& shown, const std::vector<std::int32_t>& scenes,
+                              Block& block) {
+  const auto lines = static_cast<unsigned>(
+      std::clamp<std::size_t>(detail::kFeatherPixels / block.shape.width, 1, block.shape.height));
+  for (std::uint64_t top = block.rect.top; top <= block.rect.bottom; top += lines) {
+    const auto bottom = std::min<std::uint64_t>(top + lines - 1, block.rect.bottom);
+    const SubRect strip(block.rect.left, static_cast<unsigned>(top), block.rect.right,
+                        static_cast<unsigned>(bottom));
+    if (!FeatherStrip(shown, scenes, block, strip)) return false;
+  }
+  return true;
+}
+
+template <typename T>
+bool MosaicRaster<T>::FeatherStrip(Shown& shown, const std::vector<std::int32_t>& scenes,
+                                   Block& block, const SubRect& strip) {
+  const auto width = static_cast<float>(definition_->Settings().featherWidth * scaleX_);
+  const float limit = width / 2;
+  const std::size_t count = std::size_t{strip.Width()} * strip.Height();
+  MosaicMasks& masks = shown.masks;
+
+  // How far each pixel lies in each scene's polygon, without those of earlier scenes.
+  struct Layer {
+    unsigned scene;
+    std::vector<float> weights;  // distances at first
+  };
+  std::vector<Layer> layers;
+  std::vector<unsigned char> isNear(count);
+  bool isAnyNear = false;
+  for (const std::int32_t number : scenes) {
+    const auto scene = static_cast<unsigned>(number);
+    if (!masks.HasSeam(scene)) continue;
+    const MosaicMasks::Shape seam = masks.Seam(scene);
+    if (!seam) return false;
+    Layer layer{scene, std::vector<float>(count)};
+    if (seam->Distances(strip, limit, layer.weights.data())) {
+      isAnyNear = true;
+      for (std::size_t i = 0; i < count; ++i) isNear[i] |= std::abs(layer.weights[i]) < limit;
+    }
+    for (const Layer& earlier : layers) {
+      for (std::size_t i = 0; i < count; ++i) {
+        layer.weights[i] = std::min(layer.weights[i], -earlier.weights[i]);
+      }
+    }
+    layers.push_back(std::move(layer));
+  }
+  if (!isAnyNear || layers.size() < 2) return true;
+
+  const unsigned bands = block.shape.count;
+  std::vector<double> weightSums(count * bands), sums(count * bands);
+  std::vector<unsigned char> contributors(count * bands);
+  std::vector<float> fromBorder(count);
+  Array<T> pixels;
+  Array<unsigned char> state;
+  for (Layer& layer : layers) {
+    if (masks.HasFootprint(layer.scene)) {
+      const MosaicMasks::Shape footprint = masks.Footprint(layer.scene);
+      if (!footprint) return false;
+      footprint->Distances(strip, limit, fromBorder.data());
+    } else {
+      std::fill(fromBorder.begin(), fromBorder.end(), limit);
+    }
+    const Place& place = places_[layer.scene];
+    const SubRect part = detail::Cut(strip, place.left, place.top, place.right, place.bottom);
+    if (part.left > part.right || part.top > part.bottom) continue;
+    detail::PixelBox wanted;
+    for (unsigned y = part.top; y <= part.bottom; ++y) {
+      for (unsigned x = part.left; x <= part.right; ++x) {
+        const std::size_t i = std::size_t{y - strip.top} * strip.Width() + (x - strip.left);
+        const float ramp = std::min(layer.weights[i] + limit, 2 * fromBorder[i]) / width;
+        layer.weights[i] = isNear[i] != 0 ? std::clamp(ramp, 0.0F, 1.0F) : 0.0F;
+        if (layer.weights[i] > 0) {
+          wanted.left = std::min(wanted.left, x);
+          wanted.right = std::max(wanted.right, x);
+          wanted.top = std::min(wanted.top, y);
+          wanted.bottom = y;
+        }
+      }
+    }
+    if (wanted.IsEmpty()) continue;
+    const SubRect need = wanted.Rect();
+    if (!ReadScene(shown, layer.scene, need, block, pixels, state)) return false;
+    const BlockStrides from(block.shape.interleave, need.Width(), need.Height(), bands);
+    for (unsigned y = need.top; y <= need.bottom; ++y) {
+      for (unsigned x = need.left; x <= need.right; ++x) {
+        const std::size_t i = std::size_t{y - strip.top} * strip.Width() + (x - strip.left);
+        const double weight = layer.weights[i];
+        if (!(weight > 0)) continue;
+        const std::size_t at = (y - need.top) * from.line + (x - need.left) * from.pixel;
+        for (unsigned band = 0; band < bands; ++band) {
+          if (!IsValidState(state.GetData()[at + band * from.band])) continue;
+          const auto value = static_cast<double>(pixels.GetData()[at + band * from.band]);
+          const std::size_t sum = i * bands + band;
+          weightSums[sum] += weight;
+          sums[sum] += weight * value;
+          if (contributors[sum] < 2) ++contributors[sum];
+        }
+      }
+    }
+  }
+  for (unsigned y = strip.top; y <= strip.bottom; ++y) {
+    for (unsigned x = strip.left; x <= strip.right; ++x) {
+      const std::size_t i = std::size_t{y - strip.top} * strip.Width() + (x - strip.left);
+      if (isNear[i] == 0) continue;
+      for (unsigned band = 0; band < bands; ++band) {
+        const std::size_t sum = i * bands + band;
+        if (contributors[sum] < 2) continue;  // as it is
+        const std::size_t to = block.ElementOf(x, y) + band * block.strides.band;
+        const unsigned number = block.shape.bands[band];
+        const double mean = sums[sum] / weightSums[sum];
+        T value = NearestPixel<T>(mean);
+        if (HasNoDataValue(number) && value == NoDataValue(number)) {
+          value = BesideNoData(value, mean);
+        }
+        block.pixels.GetData()[to] = value;
+        block.state.GetData()[to] = PixelValueState::Valid;
+      }
+    }
+  }
+  return true;
+}
+
+template <typename T>
+bool MosaicRaster<T>::GetSubRect(const SubRect& rect, const Array<unsigned>& bands,
+                                 Interleave interleave, Array<T>& pixels,
+                                 Array<unsigned char>& state) {
+  if (!IsValid()) return false;
+  if (stored_) return stored_->GetSubRect(rect, bands, interleave, pixels, state);
+  Block block(rect, bands, interleave, pixels, state);
+  const bool isInside = rect.right < def_.samples && rect.bottom < def_.lines;
+  if (!isInside || !block.shape.Size(pixels, state)) return false;
+  for (const unsigned band : block.shape.bands) {
+    if (band >= def_.bands) return false;
+  }
+  const std::shared_ptr<Shown> shown = Show();
+  const std::vector<std::int32_t> scenes = index_->Find(WindowOf(rect));
+  if (!Compose(*shown, scenes, block)) return false;
+  const bool isFeathered = definition_->Settings().featherWidth > 0 && shown->masks.HaveSeams();
+  return !isFeathered || scenes.size() < 2 || Feather(*shown, scenes, block);
 }
 
 }  // namespace lumo

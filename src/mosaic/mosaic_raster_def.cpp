@@ -1,5 +1,7 @@
 #include "mosaic/mosaic_raster_def.h"
 
+#include <filesystem>
+
 #include "foundation/type_code.h"
 
 namespace lumo {
@@ -9,6 +11,13 @@ const unsigned BasicMosaicRasterDef::TypeCode =
 
 BasicMosaicRasterDef::BasicMosaicRasterDef(MosaicSettings settings)
     : settings_(std::move(settings)) {}
+
+String BasicMosaicRasterDef::TablesInUse() const {
+  std::error_code fault;
+  const std::string path = settings_.lutPath.ToUTF8();
+  return !path.empty() && std::filesystem::exists(path + ".mlh", fault) ? settings_.lutPath
+                                                                        : String();
+}
 
 bool BasicMosaicRasterDef::Keep(std::string& /*reason*/) {
   ++revision_;

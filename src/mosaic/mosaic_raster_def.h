@@ -42,7 +42,7 @@ class VEXG_EXPORT BasicMosaicRasterDef : public Object {
   }
 
   /// The mutex of the definition: `const MutexLock lock(definition->Lock());`.
-  std::recursive_mutex& Lock() const { return lock_; }
+  virtual std::recursive_mutex& Lock() const { return lock_; }
 
   virtual unsigned SceneCount() const = 0;
   /// The text of a scene's URI, the key of Footprints and SeamFiles.
@@ -58,6 +58,12 @@ class VEXG_EXPORT BasicMosaicRasterDef : public Object {
   const String& WorkingDirectory() const { return settings_.workingDirectory; }
   Form Bins() const { return settings_.bins; }
   const MosaicSettings& Settings() const { return settings_; }
+
+  /// The base of the table files that pixels are made with; no text while there are none. LutPath
+  /// is where the next tables go.
+  virtual String TablesInUse() const;
+  /// False when the files that the definition came from have changed since.
+  virtual bool IsUpToDate() const { return true; }
 
   /// Stores the definition once footprints, tables or seams have come in, and has the mosaic's
   /// pixels made with them from then on. A definition in memory alone has nothing to store.
