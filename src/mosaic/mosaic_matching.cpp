@@ -5,10 +5,10 @@
 #include <filesystem>
 
 #include "foundation/fault.h"
-#include "foundation/progress.h"
 #include "mosaic/histogram_match.h"
 #include "mosaic/mosaic_tables.h"
 #include "mosaic/overlap_raster.h"
+#include "mosaic/step_progress.h"
 #include "platform/file_swap.h"
 #include "platform/temporary_file.h"
 #include "stats/histogram_run.h"
@@ -150,7 +150,7 @@ class Matching {
   bool Prepare() {
     const unsigned scenes = definition_.SceneCount();
     for (unsigned i = 0; i < scenes; ++i) {
-      const IPC ipc(ipc_.abort, ProgressReportPtr(new ScaledProgressReport(ipc_.progress, scenes)));
+      const IPC ipc = StepOf(ipc_, 1.0 / scenes);
       const bool isDone =
           definition_.ColourMatchMode() == kMatchWhole || i == definition_.ReferenceIndex()
               ? PrepareWhole(Side(i), ipc)
@@ -164,9 +164,10 @@ class Matching {
     const RasterPtr<T>& raster = definition_.Scenes()[scene];
     const MatchSide<T> overlap = Overlap(raster, reference_.raster);
     bool isLarge = false;
-    if (overlap.raster->Samples() != 0 && !IsLarge(scene, 0, ipc, isLarge)) return false;
-    if (!isLarge) return PrepareWhole(Side(scene), ipc);
-    return PrepareWhole(overlap, ipc) && PrepareWhole(Overlap(reference_.raster, raster), ipc);
+    if (!IsLarge(scene, 0, StepOf(ipc, 0.2), isLarge)) return false;
+    if (!isLarge) return PrepareWhole(Side(scene), StepOf(ipc, 0.8));
+    return PrepareWhole(overlap, StepOf(ipc, 0.4)) &&
+           PrepareWhole(Overlap(reference_.raster, raster), StepOf(ipc, 0.4));
   }
 
   /// Whether the overlap of a scene with the reference has enough valid pixels of a band. False
@@ -200,7 +201,7 @@ class Matching {
     side.raster->SetStatsMode(StatsMode::kBasic);
     const unsigned bands = reference_.raster->Bands();
     for (unsigned band = 0; band < bands; ++band) {
-      const IPC part(ipc.abort, ProgressReportPtr(new ScaledProgressReport(ipc.progress, bands)));
+      const IPC part = StepOf(ipc, 1.0 / bands);
       BandCounts<T> counts;
       if (!FindCounts(side, band, part, counts)) return false;
     }
@@ -211,7 +212,7 @@ class Matching {
   bool FindRange(const MatchSide<T>& side, unsigned band, const IPC& ipc, BandCounts<T>& counts) {
     constexpr unsigned kRange = StatsMask::Min | StatsMask::Max;
     TakeFault();
-    const RasterBandStats<T> stats = side.raster->ComputeBandStats(band, kRange, ipc, 2);
+    const RasterBandStats<T> stats = side.raster->ComputeBandStats(band, kRange, ipc);
     if (ipc.abort->IsSet()) return Refuse("the matching was aborted");
     if ((stats.mask & kRange) != kRange) {
       return Refuse(side.name + ": " + TakeFaultOr("the pixels can't be read").ToUTF8());
@@ -223,7 +224,7 @@ class Matching {
 
   /// The histogram of a band, counted where it is not at hand.
   bool FindCounts(const MatchSide<T>& side, unsigned band, const IPC& ipc, BandCounts<T>& counts) {
-    if (!FindRange(side, band, ipc, counts)) return false;
+    if (!FindRange(side, band, StepOf(ipc, 0.5), counts)) return false;
     HistogramRequest<T> request = MatchingHistogram(counts.min, counts.max, definition_.Bins());
     request.bands.Resize(ArrayDims(1));
     request.bands[0] = band;
@@ -232,8 +233,7 @@ class Matching {
       return true;
     }
     const Turn turn(BasicRasterPtr(side.raster), Waiting::kAlways, ipc);
-    const ProgressReportPtr rest(new ScaledProgressReport(ipc.progress, 2));
-    const String why = RunHistogram(*side.raster, request, turn, IPC(ipc.abort, rest));
+    const String why = RunHistogram(*side.raster, request, turn, StepOf(ipc, 0.5));
     if (ipc.abort->IsSet()) return Refuse("the matching was aborted");
     if (why.GetLength() != 0) return Refuse(side.name + ": " + why.ToUTF8());
     return FindAtHand(*side.raster, request, counts.histogram) ||
