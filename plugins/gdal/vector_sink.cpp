@@ -37,7 +37,7 @@ struct SinkFormat {
 
 const std::vector<SinkFormat>& SinkFormats() {
   static const std::vector<SinkFormat> formats{
-      {".gpkg", "GPKG", {}},
+      {".gpkg", "GPKG", {}, true},
       {".fgb", "FlatGeobuf", {}},
       {".geojson", "GeoJSON", {}},
       {".geojsons", "GeoJSONSeq", {}},

@@ -56,16 +56,17 @@ inline bool IsWholeShift(double shift, double scale, unsigned size, std::int64_t
   return std::abs(shift - rounded) < kNoise && std::abs(scale - 1) * size < kNoise;
 }
 
-inline SubRect Cut(const SubRect& rect, std::int64_t left, std::int64_t top, std::int64_t right,
-                   std::int64_t bottom) {
-  const auto low = [](unsigned a, std::int64_t b) {
-    return static_cast<unsigned>(std::max<std::int64_t>(a, b));
-  };
-  const auto high = [](unsigned a, std::int64_t b) {
-    return static_cast<unsigned>(std::min<std::int64_t>(a, b));
-  };
-  return {low(rect.left, left), low(rect.top, top), high(rect.right, right),
-          high(rect.bottom, bottom)};
+/// The part of a rectangle between bounds, which may lie anywhere; false when there is none.
+inline bool Cut(const SubRect& rect, std::int64_t left, std::int64_t top, std::int64_t right,
+                std::int64_t bottom, SubRect& part) {
+  left = std::max<std::int64_t>(left, rect.left);
+  top = std::max<std::int64_t>(top, rect.top);
+  right = std::min<std::int64_t>(right, rect.right);
+  bottom = std::min<std::int64_t>(bottom, rect.bottom);
+  if (left > right || top > bottom) return false;
+  part = {static_cast<unsigned>(left), static_cast<unsigned>(top), static_cast<unsigned>(right),
+          static_cast<unsigned>(bottom)};
+  return true;
 }
 
 }  // namespace detail
@@ -448,8 +449,10 @@ bool MosaicRaster<T>::Compose(Shown& shown, const std::vector<std::int32_t>& sce
   bool isUntouched = true;
   const auto take = [&](unsigned scene, const MaskShape* mask) {
     const Place& place = places_[scene];
-    const SubRect part = detail::Cut(block.rect, place.left, place.top, place.right, place.bottom);
-    if (part.left > part.right || part.top > part.bottom) return true;
+    SubRect part;
+    if (!detail::Cut(block.rect, place.left, place.top, place.right, place.bottom, part)) {
+      return true;
+    }
     detail::PixelBox wanted;
     if (mask == nullptr && block.taken.empty()) {
       wanted = {part.left, part.top, part.right, part.bottom};
@@ -618,8 +621,8 @@ bool MosaicRaster<T>::FeatherStrip(Shown& shown, const std::vector<std::int32_t>
       std::fill(fromBorder.begin(), fromBorder.end(), limit);
     }
     const Place& place = places_[layer.scene];
-    const SubRect part = detail::Cut(strip, place.left, place.top, place.right, place.bottom);
-    if (part.left > part.right || part.top > part.bottom) continue;
+    SubRect part;
+    if (!detail::Cut(strip, place.left, place.top, place.right, place.bottom, part)) continue;
     detail::PixelBox wanted;
     for (unsigned y = part.top; y <= part.bottom; ++y) {
       for (unsigned x = part.left; x <= part.right; ++x) {
