@@ -27,9 +27,9 @@ T NearestPixel(double value) {
 /// A value beside one that pixels may not have, on the side where another value lies.
 template <typename T>
 T BesideNoData(T noData, double towards) {
-  const bool up = (towards > static_cast<double>(noData) &&
-                   noData != std::numeric_limits<T>::max()) ||
-                  noData == std::numeric_limits<T>::lowest();
+  const bool up =
+      (towards > static_cast<double>(noData) && noData != std::numeric_limits<T>::max()) ||
+      noData == std::numeric_limits<T>::lowest();
   if constexpr (std::is_floating_point_v<T>) {
     constexpr T kFar = std::numeric_limits<T>::max();
     return std::nextafter(noData, up ? kFar : -kFar);
@@ -122,7 +122,8 @@ void ColourTable<T>::Apply(T* values, const unsigned char* states, std::size_t c
     T& value = values[i * stride];
     if (!IsValidState(states[i * stride])) continue;
     if constexpr (kIsNarrow) {
-      value = byValue_[static_cast<std::size_t>(int{value} - int{std::numeric_limits<T>::lowest()})];
+      value =
+          byValue_[static_cast<std::size_t>(int{value} - int{std::numeric_limits<T>::lowest()})];
     } else {
       value = Turn(value);
     }

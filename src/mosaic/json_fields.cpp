@@ -1,5 +1,6 @@
 #include "mosaic/json_fields.h"
 
+#include <algorithm>
 #include <cmath>
 #include <iterator>
 
@@ -91,7 +92,46 @@ class PlaceInJson {
   std::vector<Step> steps_;
 };
 
+std::string Plain(const Json& json) {
+  return json.dump(-1, ' ', false, Json::error_handler_t::replace);
+}
+
+void Append(const Json& json, std::size_t indent, std::string& text) {
+  const bool isPlain =
+      std::none_of(json.begin(), json.end(), [](const Json& item) { return item.is_structured(); });
+  if (!json.is_structured() || json.empty()) {
+    text += Plain(json);
+    return;
+  }
+  if (json.is_array() && isPlain) {
+    char before = '[';
+    for (const Json& item : json) {
+      text += before;
+      if (before == ',') text += ' ';
+      text += Plain(item);
+      before = ',';
+    }
+    text += ']';
+    return;
+  }
+  text += json.is_object() ? "{" : "[";
+  bool isFirst = true;
+  for (const auto& [name, value] : json.items()) {
+    text.append(isFirst ? "\n" : ",\n").append(indent + 2, ' ');
+    if (json.is_object()) text.append(Plain(name)).append(": ");
+    Append(value, indent + 2, text);
+    isFirst = false;
+  }
+  text.append("\n").append(indent, ' ').append(json.is_object() ? "}" : "]");
+}
+
 }  // namespace
+
+std::string WriteJson(const Json& json) {
+  std::string text;
+  Append(json, 0, text);
+  return text + "\n";
+}
 
 JsonFields::JsonFields(const Json& object, std::string pointer)
     : object_(object), pointer_(std::move(pointer)) {
@@ -153,9 +193,10 @@ Json ParseJson(const std::string& text) {
                                           : LineOfJson(text, "");
     const bool isCutOff = error.byte >= text.size();
     throw JsonMisfit{
-        {}, isCutOff || reason == what.npos
-                ? fmt::format("line {}: the file breaks off", line)
-                : fmt::format("line {}: {}", line, Printable(what.substr(reason + 2), 120))};
+        {},
+        isCutOff || reason == what.npos
+            ? fmt::format("line {}: the file breaks off", line)
+            : fmt::format("line {}: {}", line, Printable(what.substr(reason + 2), 120))};
   }
 }
 

@@ -1,5 +1,6 @@
 #pragma once
 
+#include "foundation/fault.h"
 #include "mosaic/mosaic_raster.h"
 #include "raster/raster_command.h"
 
@@ -11,13 +12,15 @@ class MosaicCommand : public RasterCommand {
   /// Calls `work(mosaic)` with the mosaic of the input MosaicURI, a MosaicRasterPtr<T>, and gives
   /// its result. It holds the definition's lock meanwhile, and has the definition stored after a
   /// success. False, with the fault set, when there is no such mosaic.
+  /// @param storing  kNothing for work that changes nothing.
+  enum class Storing { kDefinition, kNothing };
   template <typename Work>
-  bool OnMosaic(const Work& work) {
+  bool OnMosaic(const Work& work, Storing storing = Storing::kDefinition) {
     const BasicRasterPtr raster = FindRaster("MosaicURI");
     if (!raster) return false;
     bool isDone = false;
     const bool isKnown = DispatchType(EightTypes{}, raster->DataType(), [&]<typename T>() {
-      isDone = OnTyped<T>(raster, work);
+      isDone = OnTyped<T>(raster, work, storing);
       return true;
     });
     if (!isKnown) SetFault("MosaicURI: a raster of this pixel type is no mosaic");
@@ -32,7 +35,7 @@ class MosaicCommand : public RasterCommand {
 
  private:
   template <typename T, typename Work>
-  bool OnTyped(const BasicRasterPtr& raster, const Work& work) {
+  bool OnTyped(const BasicRasterPtr& raster, const Work& work, Storing storing) {
     const MosaicRasterPtr<T> mosaic(LevelOf(RasterPtr<T>(raster)));
     if (!mosaic || !mosaic->IsValid() || !mosaic->Definition()) {
       SetFault("MosaicURI: the raster is no mosaic");
@@ -40,6 +43,7 @@ class MosaicCommand : public RasterCommand {
     }
     const MutexLock lock(mosaic->Definition()->Lock());
     if (!work(mosaic)) return false;
+    if (storing == Storing::kNothing) return true;
     std::string reason;
     if (mosaic->Definition()->Keep(reason)) return true;
     SetFault(String(reason));

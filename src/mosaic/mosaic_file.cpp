@@ -18,6 +18,7 @@
 #include "foundation/text_case.h"
 #include "georef/std_georef.h"
 #include "mosaic/json_fields.h"
+#include "mosaic/match_mode.h"
 #include "platform/folder_lock.h"
 #include "platform/owned_name.h"
 #include "platform/random_access_file.h"
@@ -75,10 +76,23 @@ class Systems {
   std::map<std::string, CoordSys> known_;
 };
 
+/// The text of a coordinate system: "EPSG:n" where it names its code at the end and is that one.
 std::string TextOf(const CoordSys& system) {
   String text;
   system.ToString(text);
-  return text.ToUTF8();
+  const std::string whole = text.ToUTF8();
+  constexpr std::string_view kMark = "ID[\"EPSG\",";
+  const std::size_t mark = whole.rfind(kMark);
+  if (mark == whole.npos) return whole;
+  const std::size_t digits = mark + kMark.size();
+  const std::size_t end = whole.find_first_not_of("0123456789", digits);
+  if (end == digits || whole.substr(std::min(end, whole.size())) != "]]") return whole;
+  const std::string code = "EPSG:" + whole.substr(digits, end - digits);
+  CoordSys named;
+  String again;
+  if (!named.SetFromString(String(code))) return whole;
+  named.ToString(again);
+  return again == text ? code : whole;
 }
 
 Json FromNumbers(std::initializer_list<double> values) {
@@ -286,7 +300,8 @@ void ReadMatch(JsonFields& fields, MosaicDocument& document) {
     throw JsonMisfit{match.PointerOf("mode"), "has to be \"overlaps\" or \"scenes\""};
   }
   document.matchMode = mode == kModes[1] ? 1 : 0;
-  document.bins = ReadWord<Form>(match.GetOr<std::string>("bins", "exact"), match.PointerOf("bins"));
+  document.bins =
+      ReadWord<Form>(match.GetOr<std::string>("bins", "exact"), match.PointerOf("bins"));
   match.Finish();
 }
 
@@ -340,8 +355,9 @@ MosaicDocument FromJson(const Json& json, const PathForm& paths) {
   document.resampling = ReadWord<PyramidResamplingMethod>(
       fields.GetOr<std::string>("resampling", "nearest"), fields.PointerOf("resampling"));
   document.featherWidth = fields.GetOr<double>("feather_width", 0);
-  if (!(document.featherWidth >= 0 && document.featherWidth <= 4096)) {
-    throw JsonMisfit{fields.PointerOf("feather_width"), "has to be 0 to 4096 pixels"};
+  if (!(document.featherWidth >= 0 && document.featherWidth <= kMostFeatherWidth)) {
+    throw JsonMisfit{fields.PointerOf("feather_width"),
+                     fmt::format("has to be 0 to {} pixels", kMostFeatherWidth)};
   }
   document.reference = fields.GetOr<unsigned>("reference", 0);
   ReadMatch(fields, document);
@@ -408,8 +424,7 @@ class OwnerFile {
       if (!ReadText(path_, owner, ignored)) owner.clear();
       // One that is empty, or has no mark, was cut off: its writer held the folder too.
       const std::size_t dot = owner.find('.');
-      const bool isMarked =
-          dot != owner.npos && platform::OwnerMarkLength(owner.substr(dot)) != 0;
+      const bool isMarked = dot != owner.npos && platform::OwnerMarkLength(owner.substr(dot)) != 0;
       const bool isHeld = isMarked && !platform::IsAbandoned(owner) && !platform::IsOwned(owner);
       if (isHeld) return true;
       fs::remove(path_, missing);
@@ -482,9 +497,9 @@ bool ReadMosaicFile(const std::string& path, MosaicDocument& document, std::stri
   return false;
 }
 
-bool WriteMosaicFile(const std::string& path, const MosaicDocument& document, std::string& fault) {
-  const std::string text =
-      ToJson(document, PathForm(path)).dump(2, ' ', false, Json::error_handler_t::replace) + "\n";
+bool WriteMosaicFile(const std::string& path, const MosaicDocument& document, std::string& fault,
+                     const std::string& place) {
+  const std::string text = WriteJson(ToJson(document, PathForm(place.empty() ? path : place)));
   return platform::ReplaceFile(path, text, &fault);
 }
 

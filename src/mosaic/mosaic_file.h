@@ -9,8 +9,8 @@
 #include "georef/georef.h"
 #include "platform/export.h"
 #include "platform/file_identity.h"
-#include "raster/raster_enums.h"
 #include "raster/raster_def.h"
+#include "raster/raster_enums.h"
 
 namespace lumo {
 
@@ -78,9 +78,10 @@ VEXG_EXPORT bool ReadMosaicFile(const std::string& path, MosaicDocument& documen
                                 std::string& fault);
 
 /// Puts a definition in the place of the file at `path`, whole or not at all.
+/// @param place  the path that it will have once somebody has moved it; `path` when empty.
 /// @return false with the fault, one line.
 VEXG_EXPORT bool WriteMosaicFile(const std::string& path, const MosaicDocument& document,
-                                 std::string& fault);
+                                 std::string& fault, const std::string& place = {});
 
 /// Reads the definition, lets `change` alter it, and puts it in its place, while no other process
 /// does the same. A file "<path>.lock" names the process that does; one whose process is gone is

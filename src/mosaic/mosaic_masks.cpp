@@ -35,10 +35,9 @@ bool MosaicMasks::Read(const std::string& path, Polygon2D<std::uint32_t>& polygo
   return false;
 }
 
-MosaicMasks::Shape MosaicMasks::ReadSeam(unsigned scene) const {
+bool MosaicMasks::ReadSeamRings(unsigned scene, Contour2DArray<double>& rings) const {
   Polygon2D<std::uint32_t> polygon;
-  if (!Read(seams_[scene], polygon)) return {};
-  Contour2DArray<double> rings;
+  if (!Read(seams_[scene], polygon)) return false;
   for (const auto& ring : polygon.Rings()) {
     Contour2D<double>& scaled = rings.emplace_back();
     scaled.hole = ring.hole;
@@ -46,15 +45,14 @@ MosaicMasks::Shape MosaicMasks::ReadSeam(unsigned scene) const {
       scaled.points.push_back({point.x * scaleX_, point.y * scaleY_});
     }
   }
-  return std::make_shared<const MaskShape>(std::move(rings), grid_->Lines());
+  return true;
 }
 
-MosaicMasks::Shape MosaicMasks::ReadFootprintOf(unsigned scene) const {
+bool MosaicMasks::ReadFootprintRings(unsigned scene, Contour2DArray<double>& rings) const {
   Polygon2D<std::uint32_t> polygon;
-  if (!Read(footprints_[scene], polygon)) return {};
+  if (!Read(footprints_[scene], polygon)) return false;
   const GeoRef& model = *sceneModels_[scene];
   const double shift = model.GetType() == GeoRef::kRpc ? 0.5 : 0.0;  // counts from its middle
-  Contour2DArray<double> rings;
   for (const auto& ring : polygon.Rings()) {
     Array<double> points{ArrayDims(static_cast<unsigned>(ring.points.size()), 2)};
     double* at = points.begin();
@@ -69,15 +67,23 @@ MosaicMasks::Shape MosaicMasks::ReadFootprintOf(unsigned scene) const {
       carried.points.push_back({points[i], points[i + 1]});
     }
   }
-  return std::make_shared<const MaskShape>(std::move(rings), grid_->Lines());
+  return true;
 }
 
 MosaicMasks::Shape MosaicMasks::Seam(unsigned scene) {
-  return seamShapes_.Get(scene, [&] { return ReadSeam(scene); });
+  return seamShapes_.Get(scene, [&]() -> Shape {
+    Contour2DArray<double> rings;
+    if (!ReadSeamRings(scene, rings)) return {};
+    return std::make_shared<const MaskShape>(std::move(rings), grid_->Lines());
+  });
 }
 
 MosaicMasks::Shape MosaicMasks::Footprint(unsigned scene) {
-  return footprintShapes_.Get(scene, [&] { return ReadFootprintOf(scene); });
+  return footprintShapes_.Get(scene, [&]() -> Shape {
+    Contour2DArray<double> rings;
+    if (!ReadFootprintRings(scene, rings)) return {};
+    return std::make_shared<const MaskShape>(std::move(rings), grid_->Lines());
+  });
 }
 
 }  // namespace lumo

@@ -15,8 +15,8 @@ namespace lumo {
 /// first needed, and those needed last are kept.
 ///
 /// Threads: any number.
-/// Failure: a file that can't be read gives none, with the fault set.
-class MosaicMasks {
+/// Failure: a file that can't be read gives none, or false, with the fault set.
+class VEXG_EXPORT MosaicMasks {
  public:
   /// @param definition  names the files; its maps are copied.
   /// @param sceneModels of all scenes, with their sizes.
@@ -30,6 +30,12 @@ class MosaicMasks {
   bool HasSeam(unsigned scene) const { return !seams_[scene].empty(); }
   bool HasFootprint(unsigned scene) const { return !footprints_[scene].empty(); }
 
+  /// The rings of the polygon that a scene is shown in, in pixels of the grid.
+  bool ReadSeamRings(unsigned scene, Contour2DArray<double>& rings) const;
+  /// The rings of a scene's footprint, in pixels of the grid. Those that can't be carried there are
+  /// left out.
+  bool ReadFootprintRings(unsigned scene, Contour2DArray<double>& rings) const;
+
   using Shape = std::shared_ptr<const MaskShape>;
   /// The polygon that a scene is shown in.
   Shape Seam(unsigned scene);
@@ -38,8 +44,6 @@ class MosaicMasks {
 
  private:
   bool Read(const std::string& path, Polygon2D<std::uint32_t>& polygon) const;
-  Shape ReadSeam(unsigned scene) const;
-  Shape ReadFootprintOf(unsigned scene) const;
 
   std::vector<std::string> seams_, footprints_;
   std::vector<GeoRefPtr> sceneModels_;

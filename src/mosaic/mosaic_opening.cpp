@@ -1,5 +1,6 @@
 #include "mosaic/mosaic_opening.h"
 
+#include <algorithm>
 #include <filesystem>
 
 #include <fmt/format.h>
@@ -33,9 +34,8 @@ bool RefreshScene(MosaicScene& scene, const MosaicDocument& document, std::strin
     return true;
   }
   fault = fmt::format("{}: the raster has {} bands of type {} by now, and the mosaic {} of {}",
-                      scene.file, scene.header.bands,
-                      DataTypeName(scene.header.dataType).ToUTF8(), document.bands,
-                      DataTypeName(document.dataType).ToUTF8());
+                      scene.file, scene.header.bands, DataTypeName(scene.header.dataType).ToUTF8(),
+                      document.bands, DataTypeName(document.dataType).ToUTF8());
   return false;
 }
 
@@ -102,7 +102,8 @@ class FileMosaicRasterDef final : public MosaicRasterDef<T> {
     const MutexLock lock(this->Lock());
     const std::string made = this->settings_.lutPath.ToUTF8();
     std::error_code missing;
-    const bool hasNewTables = fs::exists(made + ".mlh", missing) && fs::exists(made + ".mlt", missing);
+    const bool hasNewTables =
+        fs::exists(made + ".mlh", missing) && fs::exists(made + ".mlt", missing);
     MosaicDocument kept;
     const auto merge = [&](MosaicDocument& document, std::string& fault) {
       if (document.scenes.size() != scenes_.size()) {
@@ -168,6 +169,24 @@ RasterDef GridOf(const MosaicDocument& document) {
   return def;
 }
 
+/// False, with the fault, when a definition has itself among its scenes, or among theirs.
+bool CheckLoops(const std::string& path, const MosaicDocument& document,
+                std::vector<std::string>& above, std::string& fault) {
+  above.push_back(FileURI(path).ToUTF8());
+  for (const MosaicScene& scene : document.scenes) {
+    if (!IsMosaicFile(scene.file)) continue;
+    if (std::find(above.begin(), above.end(), FileURI(scene.file).ToUTF8()) != above.end()) {
+      fault = scene.file + ": the mosaic is a scene of itself";
+      return false;
+    }
+    MosaicDocument below;
+    if (!ReadMosaicFile(scene.file, below, fault)) return false;
+    if (!CheckLoops(scene.file, below, above, fault)) return false;
+  }
+  above.pop_back();
+  return true;
+}
+
 /// Stands a mosaic on the source of a definition.
 BasicRasterPtr DecorateMosaic(const BasicRasterPtr& plain, RasterDataConnection& source,
                               const URI& uri) {
@@ -187,7 +206,10 @@ const bool isRegistered = RegisterRasterDecorator("EXTERNAL", &DecorateMosaic);
 }  // namespace
 
 bool LoadMosaic(const std::string& path, MosaicDocument& document, std::string& fault) {
-  if (!ReadMosaicFile(path, document, fault)) return false;
+  std::vector<std::string> above;
+  if (!ReadMosaicFile(path, document, fault) || !CheckLoops(path, document, above, fault)) {
+    return false;
+  }
   for (MosaicScene& scene : document.scenes) {
     std::string why;
     if (RefreshScene(scene, document, why)) continue;
@@ -206,8 +228,7 @@ BasicRasterPtr MakeMosaicRaster(const std::string& path, const MosaicDocument& d
     for (unsigned i = 0; i < scenes.GetCount(); ++i) {
       scenes[i].Reset(new SceneRaster<T>(document.scenes[i], i, open));
     }
-    const MosaicRasterDefPtr<T> definition(
-        new FileMosaicRasterDef<T>(path, document, scenes));
+    const MosaicRasterDefPtr<T> definition(new FileMosaicRasterDef<T>(path, document, scenes));
     made.Reset(new MosaicRaster<T>(definition, GridOf(document), RasterPtr<T>(plain), uri));
     return true;
   });

@@ -13,6 +13,8 @@
 
 namespace lumo {
 
+class MosaicMasks;
+
 /// Shows the scenes of a mosaic as one raster on a grid of its own. Exists for EightTypes.
 ///
 /// A pixel is that of the first scene, in the order of the definition, that has it. A scene has a
@@ -83,12 +85,19 @@ class MosaicRaster final : public ComputedRaster<T>, public SourceRaster {
   }
   std::uint64_t WriteCount() const override;
 
+  /// The numbers of the scenes that may have pixels in a rectangle, ascending.
+  std::vector<std::int32_t> ScenesIn(const SubRect& rect) const;
+  /// The polygons of the scenes, as the definition names their files now.
+  std::unique_ptr<MosaicMasks> MakeMasks() const;
+  /// True when the pixels of a scene are pixels of the mosaic as they are.
+  bool IsOnGrid(unsigned scene) const { return places_[scene].isOnGrid; }
+
  private:
   /// The place of a scene on the grid.
   struct Place {
-    std::int64_t left = 0, top = 0;       // of the pixels that it may have, all inclusive
+    std::int64_t left = 0, top = 0;  // of the pixels that it may have, all inclusive
     std::int64_t right = -1, bottom = -1;
-    bool isOnGrid = false;       // its pixel (x + toX, y + toY) is the mosaic's (x, y)
+    bool isOnGrid = false;  // its pixel (x + toX, y + toY) is the mosaic's (x, y)
     std::int64_t toX = 0, toY = 0;
   };
   struct Shown;
@@ -113,7 +122,7 @@ class MosaicRaster final : public ComputedRaster<T>, public SourceRaster {
   MosaicRasterDefPtr<T> definition_;
   RasterDef def_;
   URI uri_;
-  std::vector<GeoRefPtr> models_;  // of the scenes, at full resolution
+  std::vector<GeoRefPtr> models_;   // of the scenes, at full resolution
   double scaleX_ = 1, scaleY_ = 1;  // below 1 for a level
   RasterPtr<T> stored_;             // has the pixels of a level that a pyramid file holds
   std::vector<Place> places_;

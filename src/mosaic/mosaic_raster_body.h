@@ -56,16 +56,17 @@ inline bool IsWholeShift(double shift, double scale, unsigned size, std::int64_t
   return std::abs(shift - rounded) < kNoise && std::abs(scale - 1) * size < kNoise;
 }
 
-inline SubRect Cut(const SubRect& rect, std::int64_t left, std::int64_t top, std::int64_t right,
-                   std::int64_t bottom) {
-  const auto low = [](unsigned a, std::int64_t b) {
-    return static_cast<unsigned>(std::max<std::int64_t>(a, b));
-  };
-  const auto high = [](unsigned a, std::int64_t b) {
-    return static_cast<unsigned>(std::min<std::int64_t>(a, b));
-  };
-  return {low(rect.left, left), low(rect.top, top), high(rect.right, right),
-          high(rect.bottom, bottom)};
+/// The part of a rectangle between bounds, which may lie anywhere; false when there is none.
+inline bool Cut(const SubRect& rect, std::int64_t left, std::int64_t top, std::int64_t right,
+                std::int64_t bottom, SubRect& part) {
+  left = std::max<std::int64_t>(left, rect.left);
+  top = std::max<std::int64_t>(top, rect.top);
+  right = std::min<std::int64_t>(right, rect.right);
+  bottom = std::min<std::int64_t>(bottom, rect.bottom);
+  if (left > right || top > bottom) return false;
+  part = {static_cast<unsigned>(left), static_cast<unsigned>(top), static_cast<unsigned>(right),
+          static_cast<unsigned>(bottom)};
+  return true;
 }
 
 }  // namespace detail
@@ -81,8 +82,8 @@ struct MosaicRaster<T>::Shown {
 /// A block that is asked for, while it is filled.
 template <typename T>
 struct MosaicRaster<T>::Block {
-  Block(const SubRect& rectangle, const Array<unsigned>& named, Interleave order,
-        Array<T>& values, Array<unsigned char>& marks)
+  Block(const SubRect& rectangle, const Array<unsigned>& named, Interleave order, Array<T>& values,
+        Array<unsigned char>& marks)
       : rect(rectangle),
         shape(rectangle, named, order),
         strides(order, shape.width, shape.height, shape.count),
@@ -262,6 +263,17 @@ std::uint64_t MosaicRaster<T>::WriteCount() const {
   return definition_ ? definition_->Revision() : 0;
 }
 
+template <typename T>
+std::vector<std::int32_t> MosaicRaster<T>::ScenesIn(const SubRect& rect) const {
+  return index_ ? index_->Find(WindowOf(rect)) : std::vector<std::int32_t>();
+}
+
+template <typename T>
+std::unique_ptr<MosaicMasks> MosaicRaster<T>::MakeMasks() const {
+  return std::make_unique<MosaicMasks>(*definition_, models_, def_.geoRef, scaleX_, scaleY_,
+                                       kDataTypeOf<T>);
+}
+
 // Levels.
 
 template <typename T>
@@ -301,9 +313,8 @@ PyramidDef MosaicRaster<T>::GetPyramidDef() const {
 template <typename T>
 RasterPtr<T> MosaicRaster<T>::PyramidLevel(unsigned level) {
   if (!IsValid() || level == 0 || level > 31) return {};
-  const RasterPtr<T> stored = ComputedRaster<T>::PyramidExists()
-                                  ? ComputedRaster<T>::PyramidLevel(level)
-                                  : RasterPtr<T>();
+  const RasterPtr<T> stored =
+      ComputedRaster<T>::PyramidExists() ? ComputedRaster<T>::PyramidLevel(level) : RasterPtr<T>();
   const bool haveLevel = HaveLevel(level);
   if (!stored && !haveLevel) return {};
   const ExactLevels exactly(true);
@@ -323,8 +334,7 @@ RasterPtr<T> MosaicRaster<T>::PyramidLevel(unsigned level) {
   grid.geoRef->SetTiePixel(grid.geoRef->TiePixelX() / scale, grid.geoRef->TiePixelY() / scale);
   grid.geoRef->SetPixelSize(grid.geoRef->PixelSizeX() * scale, grid.geoRef->PixelSizeY() * scale);
   grid.SetGeoRef(grid.geoRef);
-  const MosaicRasterDefPtr<T> definition(
-      new detail::LevelMosaicRasterDef<T>(definition_, scenes));
+  const MosaicRasterDefPtr<T> definition(new detail::LevelMosaicRasterDef<T>(definition_, scenes));
   const RasterPtr<T> shown(new MosaicRaster(LevelTag(), *this, definition, grid, stored));
   return shown->IsValid() ? shown : RasterPtr<T>();
 }
@@ -363,8 +373,7 @@ RasterPtr<T> MosaicRaster<T>::OnGrid(unsigned scene) {
 /// Reads a part of the grid from a scene, with its colours turned.
 template <typename T>
 bool MosaicRaster<T>::ReadScene(Shown& shown, unsigned scene, const SubRect& part,
-                                const Block& block, Array<T>& pixels,
-                                Array<unsigned char>& state) {
+                                const Block& block, Array<T>& pixels, Array<unsigned char>& state) {
   const Place& place = places_[scene];
   bool isRead = false;
   if (place.isOnGrid) {
@@ -432,8 +441,7 @@ struct PixelBox {
 /// Fills the block from the scenes in their order: first by the seam polygons, then, where there
 /// are any, the gaps by the footprints.
 template <typename T>
-bool MosaicRaster<T>::Compose(Shown& shown, const std::vector<std::int32_t>& scenes,
-                              Block& block) {
+bool MosaicRaster<T>::Compose(Shown& shown, const std::vector<std::int32_t>& scenes, Block& block) {
   const BlockShape& shape = block.shape;
   block.left = std::size_t{shape.width} * shape.height;
   Array<T> pixels;
@@ -441,9 +449,10 @@ bool MosaicRaster<T>::Compose(Shown& shown, const std::vector<std::int32_t>& sce
   bool isUntouched = true;
   const auto take = [&](unsigned scene, const MaskShape* mask) {
     const Place& place = places_[scene];
-    const SubRect part =
-        detail::Cut(block.rect, place.left, place.top, place.right, place.bottom);
-    if (part.left > part.right || part.top > part.bottom) return true;
+    SubRect part;
+    if (!detail::Cut(block.rect, place.left, place.top, place.right, place.bottom, part)) {
+      return true;
+    }
     detail::PixelBox wanted;
     if (mask == nullptr && block.taken.empty()) {
       wanted = {part.left, part.top, part.right, part.bottom};
@@ -502,8 +511,7 @@ bool MosaicRaster<T>::Compose(Shown& shown, const std::vector<std::int32_t>& sce
         for (unsigned i = 0; i < shape.count; ++i) {
           block.pixels.GetData()[to + i * block.strides.band] =
               pixels.GetData()[at + i * from.band];
-          block.state.GetData()[to + i * block.strides.band] =
-              state.GetData()[at + i * from.band];
+          block.state.GetData()[to + i * block.strides.band] = state.GetData()[at + i * from.band];
         }
         taken = 1;
         --block.left;
@@ -551,8 +559,7 @@ bool MosaicRaster<T>::Compose(Shown& shown, const std::vector<std::int32_t>& sce
 
 /// Replaces the pixels of the block that lie near seams.
 template <typename T>
-bool MosaicRaster<T>::Feather(Shown& shown, const std::vector<std::int32_t>& scenes,
-                              Block& block) {
+bool MosaicRaster<T>::Feather(Shown& shown, const std::vector<std::int32_t>& scenes, Block& block) {
   const auto lines = static_cast<unsigned>(
       std::clamp<std::size_t>(detail::kFeatherPixels / block.shape.width, 1, block.shape.height));
   for (std::uint64_t top = block.rect.top; top <= block.rect.bottom; top += lines) {
@@ -614,8 +621,8 @@ bool MosaicRaster<T>::FeatherStrip(Shown& shown, const std::vector<std::int32_t>
       std::fill(fromBorder.begin(), fromBorder.end(), limit);
     }
     const Place& place = places_[layer.scene];
-    const SubRect part = detail::Cut(strip, place.left, place.top, place.right, place.bottom);
-    if (part.left > part.right || part.top > part.bottom) continue;
+    SubRect part;
+    if (!detail::Cut(strip, place.left, place.top, place.right, place.bottom, part)) continue;
     detail::PixelBox wanted;
     for (unsigned y = part.top; y <= part.bottom; ++y) {
       for (unsigned x = part.left; x <= part.right; ++x) {
@@ -686,7 +693,7 @@ bool MosaicRaster<T>::GetSubRect(const SubRect& rect, const Array<unsigned>& ban
     if (band >= def_.bands) return false;
   }
   const std::shared_ptr<Shown> shown = Show();
-  const std::vector<std::int32_t> scenes = index_->Find(WindowOf(rect));
+  const std::vector<std::int32_t> scenes = ScenesIn(rect);
   if (!Compose(*shown, scenes, block)) return false;
   const bool isFeathered = definition_->Settings().featherWidth > 0 && shown->masks.HaveSeams();
   return !isFeathered || scenes.size() < 2 || Feather(*shown, scenes, block);

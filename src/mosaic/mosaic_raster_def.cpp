@@ -3,8 +3,15 @@
 #include <filesystem>
 
 #include "foundation/type_code.h"
+#include "mosaic/match_mode.h"
 
 namespace lumo {
+
+std::span<const EnumWord<MatchMode>> WordsOf(MatchMode) {
+  static constexpr EnumWord<MatchMode> kWords[] = {{"Overlaps", MatchMode::kOverlaps},
+                                                   {"Scenes", MatchMode::kScenes}};
+  return kWords;
+}
 
 const unsigned BasicMosaicRasterDef::TypeCode =
     GloballyUniqueObjectTypeCode("BasicMosaicRasterDef");

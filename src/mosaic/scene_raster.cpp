@@ -61,8 +61,8 @@ BasicRasterPtr OpenScene(const MosaicScene& scene) {
   return raster;
 }
 
-bool ReadSceneHeader(const BasicRaster& raster, const MosaicScene& scene,
-                     MosaicSceneHeader& header, std::string& fault) {
+bool ReadSceneHeader(const BasicRaster& raster, const MosaicScene& scene, MosaicSceneHeader& header,
+                     std::string& fault) {
   const RasterDef def = raster.GetRasterDef();
   header = {};
   header.samples = raster.Samples();
@@ -127,15 +127,14 @@ SceneRaster<T>::SceneRaster(const SceneRaster& base, unsigned level)
 /// The open source, or its level.
 template <typename T>
 RasterPtr<T> SceneRaster<T>::Source() const {
-  const BasicRasterPtr opened =
-      open_->Get(number_, [this]() -> BasicRasterPtr {
-        BasicRasterPtr raster = OpenScene(scene_);
-        if (raster && !Fits(*raster, scene_.header)) {
-          SetFault(scene_.file + ": the raster has another size, bands or pixel type by now");
-          raster = BasicRasterPtr();
-        }
-        return raster;
-      });
+  const BasicRasterPtr opened = open_->Get(number_, [this]() -> BasicRasterPtr {
+    BasicRasterPtr raster = OpenScene(scene_);
+    if (raster && !Fits(*raster, scene_.header)) {
+      SetFault(scene_.file + ": the raster has another size, bands or pixel type by now");
+      raster = BasicRasterPtr();
+    }
+    return raster;
+  });
   const RasterPtr<T> source(opened);
   if (!source || level_ == 0) return source;
   const ExactLevels exactly(true);

@@ -125,7 +125,7 @@ class QuicklookVerb final : public FileVerb {
   void Make(JobSession& session, const Outputs& outputs) override {
     QuicklookRequest request{{shown_, info_, GetSource().file}, bands_, size_, stretch_, {}, {}};
     if (hasPalette_) request.palette = ReadPalette(session, raster_, bands_[0]);
-    if (!outlines_.empty()) request.outlines = OpenOutlines(session);
+    if (!outlines_.empty()) request.outlines.push_back({OpenOutlines(session), {255, 255, 0}});
     MakeQuicklook(session, request, outputs.Get(0), GetProgressStyle());
   }
 
