@@ -15,8 +15,8 @@ const CommandDeclaration kFootPrints{
     "Makes the footprint of a scene: polygons around its valid pixels.",
     {{"RasterURI", Presence::kRequired, ValueKind::kURI, "the scene, of one of eight types"},
      {"Level", Presence::kRequired, ValueKind::kInteger,
-      "the pyramid level whose pixels are looked at; 0 for the scene itself, as one that there "
-      "isn't"},
+      "the pyramid level whose pixels are looked at; 0, and one that there isn't, stand for the "
+      "scene itself"},
      {"SmoothParameter", Presence::kRequired, ValueKind::kNumber,
       "how far the outline may lie from the pixels; 0 keeps it", "square pixels"},
      {"VectorMSCFP", Presence::kRequired, ValueKind::kURI, "the footprint file to create"},

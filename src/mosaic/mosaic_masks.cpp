@@ -29,7 +29,9 @@ bool MosaicMasks::Read(const std::string& path, Polygon2D<std::uint32_t>& polygo
     polygon = ReadFootprint<T>(String(path));
     return true;
   });
-  if (polygon.IsValid()) return true;
+  // A whole file without polygons says that nothing of the scene is shown.
+  const bool isEmpty = polygon.GetErrorState().code == PolygonErrorBadPolygon::Code;
+  if (polygon.IsValid() || isEmpty) return true;
   const std::string why = TakeFaultOr("holds no polygon").ToUTF8();
   SetFault(why.find(path) != why.npos ? why : path + ": " + why);
   return false;

@@ -291,6 +291,8 @@ class Matching {
     files.items.Ref(scene, band) = {static_cast<double>(sceneCounts.min),
                                     static_cast<double>(sceneCounts.max),
                                     static_cast<std::uint32_t>(table.size()), 0};
+    // With its window over this table alone the file stays sparse.
+    files.entries.At(scene, band, kMosaicTableBins - 1);
     for (unsigned bin = 0; bin < table.size(); ++bin) {
       files.entries.Ref(scene, band, bin) = table[bin];
     }

@@ -15,6 +15,7 @@
 #include "mosaic/seam_generator.h"
 #include "mosaic/step_progress.h"
 #include "platform/file_swap.h"
+#include "platform/owned_name.h"
 #include "platform/temporary_file.h"
 
 namespace lumo {
@@ -185,6 +186,24 @@ bool CheckScenes(const MosaicRasterDef<T>& definition) {
   return true;
 }
 
+/// Removes what processes that have ended left of side files in a working directory.
+void RemoveAbandonedSideFiles(const String& workingDirectory) {
+  std::error_code fault;
+  const fs::path folder = fs::path(workingDirectory.ToUTF8() + ".").parent_path();
+  std::vector<fs::path> abandoned;
+  for (fs::directory_iterator at(folder.empty() ? "." : folder, fault), end; !fault && at != end;
+       at.increment(fault)) {
+    const std::string name = at->path().filename().string();
+    for (const std::string_view ending : {".emp.", "_footprint.msf."}) {
+      const std::size_t found = name.find(ending);
+      if (found == std::string::npos || !name.ends_with(".tmp")) continue;
+      const std::string_view mark = std::string_view(name).substr(found + ending.size() - 1);
+      if (platform::IsAbandoned(mark)) abandoned.push_back(at->path());
+    }
+  }
+  for (const fs::path& path : abandoned) fs::remove(path, fault);
+}
+
 bool RefuseAborted() {
   return Refuse("the seams were aborted");
 }
@@ -260,6 +279,7 @@ template <typename T>
 bool MakeSeams(MosaicRaster<T>& mosaic, const IPC& ipc) {
   MosaicRasterDef<T>& definition = *mosaic.Definition();
   if (!CheckScenes(definition)) return false;
+  RemoveAbandonedSideFiles(definition.WorkingDirectory());
   const unsigned count = definition.SceneCount();
   double rest = 1.0;  // of the progress, when the footprints are there
   for (unsigned i = 0; i < count; ++i) {

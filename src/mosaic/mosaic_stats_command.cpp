@@ -13,8 +13,8 @@ const CommandDeclaration kStats{
     "Makes the tables that match the colours of a mosaic's scenes to those of its reference scene.",
     {{"MosaicURI", Presence::kRequired, ValueKind::kURI, "the mosaic, of one of eight types"},
      {"Level", Presence::kRequired, ValueKind::kInteger,
-      "the pyramid level whose pixels are counted; 0 for the mosaic itself, as one that there "
-      "isn't"}},
+      "the pyramid level whose pixels are counted; 0, and one that there isn't, stand for the "
+      "mosaic itself"}},
     {{"Success", ValueKind::kBoolean, "the tables were made"}}};
 
 class MosaicStatsCommand final : public MosaicCommand {

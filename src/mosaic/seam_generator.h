@@ -42,7 +42,7 @@ class VEXG_EXPORT SeamGenerator {
   /// it was aborted.
   bool AssignRest(const IPC& ipc);
 
-  /// What each scene shows. One that shows nothing isn't valid.
+  /// The ground that each scene shows. That of a scene that shows nothing isn't valid.
   const std::vector<Polygon2D<double>>& Parts() const { return parts_; }
   /// The pairs whose overlap stays with both.
   const std::vector<LonePair>& LeftAlone() const { return leftAlone_; }

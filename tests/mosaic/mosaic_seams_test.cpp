@@ -24,12 +24,12 @@ using Scene = RasterPtr<std::uint8_t>;
 using Mosaic = MosaicRasterPtr<std::uint8_t>;
 
 /// A scene of 200 x 150 pixels of 10 m, with a border of no data 5 pixels wide.
-Scene BorderedScene(double x, double y, const char* coordSys = nullptr) {
+Scene BorderedScene(double x, double y, std::uint8_t value = 100) {
   return test::MakeScene<std::uint8_t>(
-      MakeGrid(x, y, 10, 200, 150, coordSys), 1,
-      [](unsigned column, unsigned line, unsigned) {
+      MakeGrid(x, y, 10, 200, 150), 1,
+      [value](unsigned column, unsigned line, unsigned) {
         const bool isIn = column >= 5 && column < 195 && line >= 5 && line < 145;
-        return std::uint8_t(isIn ? 100 : 0);
+        return isIn ? value : std::uint8_t{0};
       },
       std::uint8_t{0});
 }
@@ -185,6 +185,32 @@ TEST_F(MosaicSeams, AFailureSaysWhyAndLeavesWhatStood) {
   EXPECT_EQ(partly->Definition()->Footprints().GetCount(), 1U);  // the other one is made
   broken->fails = false;
   EXPECT_TRUE(Run(partly).Succeeded());  // a second run goes on
+}
+
+TEST_F(MosaicSeams, ASceneWithoutPolygonsIsShownWhereNoOtherIs) {
+  const Mosaic mosaic = Make({BorderedScene(0, 0, 100), BorderedScene(1500, -600, 50)});
+  ASSERT_TRUE(Run(mosaic).Succeeded());
+  MosaicRasterDef<std::uint8_t>& definition = *mosaic->Definition();
+  const auto shown = [&](unsigned x, unsigned y) {
+    Array<std::uint8_t> pixels;
+    Array<unsigned char> state;
+    EXPECT_TRUE(
+        mosaic->GetSubRect({x, y, x, y}, MakeArray<unsigned>({0}), Interleave::BSQ, pixels, state))
+        << TakeFault().ToUTF8();
+    return pixels.GetCount() == 1 ? pixels[0] : 0;
+  };
+  EXPECT_EQ(shown(325, 200), 100);  // left of the seam through the overlap
+  const auto write = [&](unsigned scene, const Contour2DArray<std::uint32_t>& rings) {
+    MosaicFootPrintPolygonWriter<std::uint8_t> writer{
+        URI(definition.SeamFiles().Find(definition.SceneKey(scene)))};
+    return writer.Write(Polygon2D<std::uint32_t>(rings, 1)) && writer.Close();
+  };
+  ASSERT_TRUE(write(0, {}));
+  ASSERT_TRUE(write(1, {{{{310, 130}, {690, 130}, {690, 410}, {310, 410}, {310, 130}}, false}}));
+  std::string reason;
+  ASSERT_TRUE(definition.Keep(reason));
+  EXPECT_EQ(shown(325, 200), 50);
+  EXPECT_EQ(shown(100, 100), 100);
 }
 
 /// Keeps what was reported.

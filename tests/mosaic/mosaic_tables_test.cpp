@@ -345,5 +345,48 @@ TEST_F(MosaicTables, AFailureLeavesTheOlderTables) {
   EXPECT_FALSE(fs::exists(Base() + "no.mlh"));
 }
 
+TEST_F(MosaicTables, AnAbortEndsTheRun) {
+  const auto ramp = MakeRamp<std::uint16_t>(300, 200, 1);
+  unsigned reads = 0;
+  for (unsigned at = 0;; ++at) {  // in each read
+    const IPC ipc;
+    ramp->abort = ipc.abort;
+    ramp->reads = 0;
+    ramp->abortAtRead = at;
+    const RasterPtr<std::uint16_t> fresh(
+        new SpatialSubsetRaster<std::uint16_t>(RasterPtr<std::uint16_t>(ramp), {0, 0, 299, 199}));
+    const auto mosaic =
+        test::MakeMosaic<std::uint16_t>({fresh}, MakeGrid(0, 0, 1, 300, 200), Settings(1));
+    const bool isMade = MatchScenes(*mosaic->Definition(), ipc);
+    reads = ramp->reads;
+    EXPECT_EQ(isMade, !ipc.abort->IsSet());
+    EXPECT_EQ(fs::exists(Base() + ".mlh"), isMade);
+    if (isMade) break;
+    EXPECT_EQ(TakeFault().ToUTF8(), "the matching was aborted");
+    ASSERT_LT(at, 100U);
+  }
+  EXPECT_GT(reads, 1U);
+}
+
+TEST_F(MosaicTables, ProgressGrowsToItsEnd) {
+  struct Reports : AsyncCallback {
+    void OnProgress(double progress) override { values.push_back(progress); }
+    std::vector<double> values;
+  };
+  const auto scene = [](double x) {
+    return test::MakeScene<std::uint8_t>(MakeGrid(x, 0, 1, 50, 50), 2, Hills);
+  };
+  for (const unsigned mode : {0U, 1U}) {
+    const Pointer<Reports> reports(new Reports);
+    const IPC ipc(AbortFlagPtr(new StandardAbortFlag),
+                  ProgressReportPtr(new StandardProgressReport(reports)));
+    const auto mosaic = test::MakeMosaic<std::uint8_t>({scene(0), scene(20), scene(48)},
+                                                       MakeGrid(0, 0, 1, 99, 50), Settings(mode));
+    ASSERT_TRUE(MatchScenes(*mosaic->Definition(), ipc));
+    EXPECT_TRUE(std::is_sorted(reports->values.begin(), reports->values.end()));
+    EXPECT_NEAR(reports->values.back(), 1, 1e-9);
+  }
+}
+
 }  // namespace
 }  // namespace lumo
