@@ -112,7 +112,8 @@ class CreateMosaicCommand final : public RasterCommand {
   }
 
   bool ReadScene(MosaicScene& scene, std::string& fault) {
-    const BasicRasterPtr raster = OpenScene(scene);
+    if (!document_.scenes.empty()) scene.header.format = document_.scenes.back().header.format;
+    const BasicRasterPtr raster = OpenScene(scene, SceneThread::kThis);
     if (!raster) {
       fault = TakeFaultOr((scene.file + ": can't be opened").c_str()).ToUTF8();
       return false;

@@ -184,6 +184,8 @@ Json ToJson(const MosaicSceneHeader& header, const std::string& systemOfMosaic) 
             {"bands", header.bands},
             {"pixel_type", DataTypeName(header.dataType).ToUTF8()},
             {"interleave", FormatValue(header.interleave).ToUTF8()}};
+  if (!header.format.empty()) json["format"] = header.format;
+  if (!header.palettes.empty()) json["palettes"] = header.palettes;
   if (header.tileWidth != 0 || header.tileHeight != 0) {
     json["tile"] = {header.tileWidth, header.tileHeight};
   }
@@ -208,6 +210,14 @@ MosaicSceneHeader ReadHeader(const Json& json, const std::string& pointer,
   header.bands = fields.Get<unsigned>("bands");
   header.dataType = ReadPixelType(fields);
   header.interleave = ParseValue<Interleave>(String(fields.GetOr<std::string>("interleave", "")));
+  header.format = fields.GetOr<std::string>("format", "");
+  if (fields.Has("palettes")) {
+    const Json& bands = fields.At("palettes");
+    if (!bands.is_array()) throw JsonMisfit{fields.PointerOf("palettes"), "has to be a list"};
+    for (const Json& band : bands) {
+      header.palettes.push_back(JsonFields::As<unsigned>(band, fields.PointerOf("palettes")));
+    }
+  }
   const auto pair = [&](const char* name, unsigned& first, unsigned& second) {
     if (!fields.Has(name)) return;
     JsonFields::Numbers(fields.At(name), fields.PointerOf(name), 2);
@@ -479,11 +489,66 @@ bool IsMosaicFile(const std::string& path) {
   return first != text.npos && text[first] == '{';
 }
 
+namespace {
+
+/// The definitions that were read last, as long as their files stay the same: a raster is opened by
+/// several hands, each of which reads it.
+class RecentDocuments {
+ public:
+  bool Find(const std::string& path, const platform::FileIdentity& file, MosaicDocument& document) {
+    const std::lock_guard lock(lock_);
+    for (const Entry& entry : entries_) {
+      if (entry.path != path || !(entry.file == file)) continue;
+      document = entry.document;
+      return true;
+    }
+    return false;
+  }
+  void Add(const std::string& path, const platform::FileIdentity& file,
+           const MosaicDocument& document) {
+    const std::lock_guard lock(lock_);
+    constexpr std::size_t kKept = 4;
+    std::erase_if(entries_, [&](const Entry& entry) { return entry.path == path; });
+    if (entries_.size() == kKept) entries_.erase(entries_.begin());
+    entries_.push_back({path, file, document});
+  }
+
+ private:
+  struct Entry {
+    std::string path;
+    platform::FileIdentity file;
+    MosaicDocument document;
+  };
+  std::mutex lock_;
+  std::vector<Entry> entries_;
+};
+
+RecentDocuments& GetRecentDocuments() {
+  static RecentDocuments documents;
+  return documents;
+}
+
+/// True for a file that was last changed so long ago that a change since would show in its time.
+bool IsSettled(const platform::FileIdentity& file) {
+  const auto now = std::chrono::duration_cast<std::chrono::nanoseconds>(
+                       std::chrono::system_clock::now().time_since_epoch())
+                       .count();
+  constexpr std::int64_t kTick = 20'000'000;  // ns, above that of file systems' clocks
+  return file.exists && now - file.time > kTick;
+}
+
+}  // namespace
+
 bool ReadMosaicFile(const std::string& path, MosaicDocument& document, std::string& fault) {
+  const platform::FileIdentity file = platform::IdentifyFile(path);
+  if (MayReachFile(path, false) && GetRecentDocuments().Find(path, file, document)) return true;
   std::string text;
   if (!ReadText(path, text, fault)) return false;
   try {
     document = FromJson(ParseJson(text), PathForm(path));
+    if (IsSettled(file) && platform::IdentifyFile(path) == file) {
+      GetRecentDocuments().Add(path, file, document);
+    }
     return true;
   } catch (const JsonMisfit& misfit) {
     fault = misfit.pointer.empty() && misfit.what.starts_with("line ")

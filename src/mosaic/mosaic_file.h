@@ -23,9 +23,11 @@ struct MosaicSceneHeader {
   unsigned tileWidth = 0;
   unsigned tileHeight = 0;
   Interleave interleave = Interleave::None;
+  std::string format;     ///< key; the scene is opened by it, or else detected
   unsigned levelMin = 0;  ///< of the pyramid; 0 without one
   unsigned levelMax = 0;
   std::vector<std::optional<double>> noData;  ///< of each band
+  std::vector<unsigned> palettes;             ///< numbers of the bands that have one
   GeoRefPtr geoRef;
   std::string state;  ///< of the scene's files, see StateOfScene
 };

@@ -24,7 +24,7 @@ bool RefreshScene(MosaicScene& scene, const MosaicDocument& document, std::strin
   }
   const std::string state = StateOfScene(scene);
   if (state == scene.header.state && !state.empty()) return true;
-  const BasicRasterPtr raster = OpenScene(scene);
+  const BasicRasterPtr raster = OpenScene(scene, SceneThread::kThis);
   if (!raster) {
     fault = TakeFaultOr("can't be opened").ToUTF8();
     return false;

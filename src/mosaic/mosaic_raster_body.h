@@ -100,6 +100,15 @@ struct MosaicRaster<T>::Block {
   void Count() {
     if (taken.empty()) taken.resize(std::size_t{shape.width} * shape.height);
   }
+  /// Takes pixels of a line over that no scene has given yet, where they are valid in some band.
+  /// @param given  where the first of them stands in what a scene has given, which may be the
+  /// block.
+  struct Given {
+    const T* pixels;
+    const unsigned char* state;
+    BlockStrides strides;
+  };
+  void Take(unsigned y, unsigned first, unsigned last, const Given& given);
 
   const SubRect rect;
   const BlockShape shape;
@@ -109,6 +118,87 @@ struct MosaicRaster<T>::Block {
   std::vector<unsigned char> taken;  // for each pixel, 1 once a scene has given it
   std::size_t left = 0;              // pixels that none has given
 };
+
+namespace detail {
+
+/// Calls `take(begin, end)` for the runs of bytes from 0 to below `count` that are 0.
+template <typename Take>
+void ForEachZeroRun(const unsigned char* bytes, std::size_t count, const Take& take) {
+  for (std::size_t at = 0; at < count;) {
+    const void* const zero = std::memchr(bytes + at, 0, count - at);
+    if (zero == nullptr) return;
+    const auto begin = static_cast<std::size_t>(static_cast<const unsigned char*>(zero) - bytes);
+    const void* const one = std::memchr(bytes + begin, 1, count - begin);
+    const std::size_t end =
+        one == nullptr ? count
+                       : static_cast<std::size_t>(static_cast<const unsigned char*>(one) - bytes);
+    take(begin, end);
+    at = end;
+  }
+}
+
+/// True when no value of some pixels of a line is invalid.
+inline bool AllValidIn(const unsigned char* state, std::size_t pixels, unsigned bands,
+                       const BlockStrides& strides) {
+  if (strides.band == 1) return AllValid(state, pixels * bands);
+  for (unsigned i = 0; i < bands; ++i) {
+    if (!AllValid(state + i * strides.band, pixels)) return false;
+  }
+  return true;
+}
+
+/// Copies pixels of a line from one block into another of the same order of axes.
+template <typename V>
+void CopyLine(const V* from, const BlockStrides& fromStrides, V* to, const BlockStrides& toStrides,
+              std::size_t pixels, unsigned bands) {
+  if (fromStrides.band == 1) {
+    std::copy(from, from + pixels * bands, to);
+    return;
+  }
+  for (unsigned i = 0; i < bands; ++i) {
+    const V* const line = from + i * fromStrides.band;
+    std::copy(line, line + pixels, to + i * toStrides.band);
+  }
+}
+
+}  // namespace detail
+
+template <typename T>
+void MosaicRaster<T>::Block::Take(unsigned y, unsigned first, unsigned last, const Given& given) {
+  unsigned char* const marks = &taken[PixelOf(first, y)];
+  const std::size_t target = ElementOf(first, y);
+  const unsigned bands = shape.count;
+  detail::ForEachZeroRun(marks, last - first + 1, [&](std::size_t begin, std::size_t end) {
+    const std::size_t at = begin * given.strides.pixel;
+    if (detail::AllValidIn(given.state + at, end - begin, bands, given.strides)) {
+      const std::size_t to = target + begin * strides.pixel;
+      if (given.pixels + at != pixels.GetData() + to) {
+        detail::CopyLine(given.pixels + at, given.strides, pixels.GetData() + to, strides,
+                         end - begin, bands);
+        detail::CopyLine(given.state + at, given.strides, state.GetData() + to, strides,
+                         end - begin, bands);
+      }
+      std::memset(marks + begin, 1, end - begin);
+      left -= end - begin;
+      return;
+    }
+    for (std::size_t x = begin; x < end; ++x) {
+      const std::size_t from = x * given.strides.pixel;
+      bool isThere = false;
+      for (unsigned i = 0; i < bands && !isThere; ++i) {
+        isThere = IsValidState(given.state[from + i * given.strides.band]);
+      }
+      if (!isThere) continue;
+      const std::size_t to = target + x * strides.pixel;
+      for (unsigned i = 0; i < bands; ++i) {
+        pixels.GetData()[to + i * strides.band] = given.pixels[from + i * given.strides.band];
+        state.GetData()[to + i * strides.band] = given.state[from + i * given.strides.band];
+      }
+      marks[x] = 1;
+      --left;
+    }
+  });
+}
 
 template <typename T>
 const unsigned MosaicRaster<T>::TypeCode = GloballyUniqueObjectTypeCode(
@@ -480,15 +570,9 @@ bool MosaicRaster<T>::Compose(Shown& shown, const std::vector<std::int32_t>& sce
       }
       block.Count();
       for (unsigned y = need.top; y <= need.bottom; ++y) {
-        for (unsigned x = need.left; x <= need.right; ++x) {
-          const unsigned char* const states = block.state.GetData() + block.ElementOf(x, y);
-          for (unsigned i = 0; i < shape.count; ++i) {
-            if (!IsValidState(states[i * block.strides.band])) continue;
-            block.taken[block.PixelOf(x, y)] = 1;
-            --block.left;
-            break;
-          }
-        }
+        const std::size_t at = block.ElementOf(need.left, y);
+        block.Take(y, need.left, need.right,
+                   {block.pixels.GetData() + at, block.state.GetData() + at, block.strides});
       }
       return true;
     }
@@ -496,26 +580,9 @@ bool MosaicRaster<T>::Compose(Shown& shown, const std::vector<std::int32_t>& sce
     isUntouched = false;
     if (!ReadScene(shown, scene, need, block, pixels, state)) return false;
     const BlockStrides from(shape.interleave, need.Width(), need.Height(), shape.count);
-    const bool areAllValid = AllValid(state.GetData(), state.GetCount());
     detail::ForEachRun(need, mask, [&](unsigned y, unsigned first, unsigned last) {
-      for (unsigned x = first; x <= last; ++x) {
-        unsigned char& taken = block.taken[block.PixelOf(x, y)];
-        if (taken != 0) continue;
-        const std::size_t at = (y - need.top) * from.line + (x - need.left) * from.pixel;
-        bool isThere = areAllValid;
-        for (unsigned i = 0; i < shape.count && !isThere; ++i) {
-          isThere = IsValidState(state.GetData()[at + i * from.band]);
-        }
-        if (!isThere) continue;
-        const std::size_t to = block.ElementOf(x, y);
-        for (unsigned i = 0; i < shape.count; ++i) {
-          block.pixels.GetData()[to + i * block.strides.band] =
-              pixels.GetData()[at + i * from.band];
-          block.state.GetData()[to + i * block.strides.band] = state.GetData()[at + i * from.band];
-        }
-        taken = 1;
-        --block.left;
-      }
+      const std::size_t at = (y - need.top) * from.line + (first - need.left) * from.pixel;
+      block.Take(y, first, last, {pixels.GetData() + at, state.GetData() + at, from});
     });
     return true;
   };
@@ -541,18 +608,23 @@ bool MosaicRaster<T>::Compose(Shown& shown, const std::vector<std::int32_t>& sce
     if (block.left == 0) return true;
   }
   // What no scene has.
+  constexpr auto kNoData = static_cast<unsigned char>(PixelValueState::NoData);
   block.Count();
-  for (unsigned i = 0; i < shape.count; ++i) {
-    const T value = NoDataValue(shape.bands[i]);
-    for (unsigned y = block.rect.top; y <= block.rect.bottom; ++y) {
-      const unsigned char* const taken = &block.taken[block.PixelOf(block.rect.left, y)];
-      std::size_t to = block.ElementOf(block.rect.left, y) + i * block.strides.band;
-      for (unsigned x = 0; x < shape.width; ++x, to += block.strides.pixel) {
-        if (taken[x] != 0) continue;
-        block.pixels.GetData()[to] = value;
-        block.state.GetData()[to] = PixelValueState::NoData;
+  for (unsigned y = block.rect.top; y <= block.rect.bottom; ++y) {
+    const unsigned char* const taken = &block.taken[block.PixelOf(block.rect.left, y)];
+    const std::size_t line = block.ElementOf(block.rect.left, y);
+    detail::ForEachZeroRun(taken, shape.width, [&](std::size_t begin, std::size_t end) {
+      const std::size_t to = line + begin * block.strides.pixel, count = end - begin;
+      if (block.strides.band == 1) {  // all bands have one value
+        std::fill_n(block.pixels.GetData() + to, count * shape.count, NoDataValue(0));
+        std::fill_n(block.state.GetData() + to, count * shape.count, kNoData);
+        return;
       }
-    }
+      for (unsigned i = 0; i < shape.count; ++i) {
+        std::fill_n(block.pixels.GetData() + to + i * block.strides.band, count, NoDataValue(0));
+        std::fill_n(block.state.GetData() + to + i * block.strides.band, count, kNoData);
+      }
+    });
   }
   return true;
 }

@@ -4,6 +4,7 @@
 
 #include <fmt/format.h>
 
+#include "data/access_policy.h"
 #include "data/data_manager.h"
 #include "data/file_uri.h"
 #include "foundation/fault.h"
@@ -15,13 +16,36 @@
 namespace lumo {
 namespace {
 
+/// Opens a source of this process.
+DataConnectionPtr Connect(const Array<String>& strings, SceneThread thread) {
+  DataManager& manager = GetGlobalDataManager();
+  if (thread == SceneThread::kOwn) return manager.Connect(strings, GeoRefPtr(), MetadataPtr());
+  return MayUseSource(strings, false) ? manager.ConnectDirect(strings, GeoRefPtr(), MetadataPtr())
+                                      : DataConnectionPtr();
+}
+
+/// Opens a scene by the format that its header names, or else in whatever format it is.
+DataConnectionPtr ConnectScene(const MosaicScene& scene, SceneThread thread) {
+  const Array<String> strings = ConnStringsOf(scene);
+  const bool isNamed = FindFormatName(strings).GetLength() != 0;
+  if (!isNamed && FindFormat(String(scene.header.format)) != nullptr) {
+    Array<String> keyed{ArrayDims(strings.GetCount() + 1)};
+    keyed[0] = String(scene.header.format);
+    std::copy(strings.begin(), strings.end(), keyed.begin() + 1);
+    const DataConnectionPtr source = Connect(keyed, thread);
+    if (source) return source;
+    TakeFault();
+  }
+  return Connect(strings, thread);
+}
+
 /// The pyramid file beside a scene, where it is of the scene as that is now.
-DataConnectionPtr ConnectPyramidOf(const MosaicScene& scene, const DataConnectionPtr& source) {
+DataConnectionPtr ConnectPyramidOf(const MosaicScene& scene, const DataConnectionPtr& source,
+                                   SceneThread thread) {
   const std::string path = scene.file + ".pyr";
   std::error_code fault;
   if (!scene.options.empty() || !std::filesystem::is_regular_file(path, fault)) return {};
-  const DataConnectionPtr pyramid = GetGlobalDataManager().Connect(
-      ConnStrings({"Pyramid", String(path)}), GeoRefPtr(), MetadataPtr());
+  const DataConnectionPtr pyramid = Connect(ConnStrings({"Pyramid", String(path)}), thread);
   TakeFault();
   const RasterDataConnectionPtr raster(source), levels(pyramid);
   return raster && levels && FindMismatch(*raster, *levels).empty() ? pyramid : DataConnectionPtr();
@@ -44,15 +68,14 @@ std::string Blame(const std::string& file, const std::string& fault) {
 
 }  // namespace
 
-BasicRasterPtr OpenScene(const MosaicScene& scene) {
+BasicRasterPtr OpenScene(const MosaicScene& scene, SceneThread thread) {
   TakeFault();
-  const DataConnectionPtr source =
-      GetGlobalDataManager().Connect(ConnStringsOf(scene), GeoRefPtr(), MetadataPtr());
+  const DataConnectionPtr source = ConnectScene(scene, thread);
   if (!source) {
     SetFault(Blame(scene.file, TakeFaultOr("can't be opened").ToUTF8()));
     return {};
   }
-  BasicRasterPtr raster = MakeReaderRaster(source, ConnectPyramidOf(scene, source));
+  BasicRasterPtr raster = MakeReaderRaster(source, ConnectPyramidOf(scene, source, thread));
   if (raster && !IsEightType(raster->DataType())) {
     SetFault(fmt::format("{}: pixels of type {} are in no mosaic", scene.file,
                          DataTypeName(raster->DataType()).ToUTF8()));
@@ -72,10 +95,14 @@ bool ReadSceneHeader(const BasicRaster& raster, const MosaicScene& scene, Mosaic
   header.tileWidth = def.tileWidth;
   header.tileHeight = def.tileHeight;
   header.interleave = def.interleave;
+  header.format = FindFormat(def.format) != nullptr ? def.format.ToUTF8() : std::string();
   const PyramidDef levels = raster.GetPyramidDef();
   if (raster.PyramidExists() && levels.levelMax != 0) {
     header.levelMin = levels.levelMin;
     header.levelMax = levels.levelMax;
+  }
+  for (unsigned band = 0; band < header.bands; ++band) {
+    if (raster.HasPalette(band)) header.palettes.push_back(band);
   }
   header.noData.resize(header.bands);
   for (const auto& [band, value] : def.noData) {
@@ -168,12 +195,6 @@ bool SceneRaster<T>::HasNoDataValue(unsigned band) const {
 template <typename T>
 T SceneRaster<T>::NoDataValue(unsigned band) const {
   return HasNoDataValue(band) ? *ToPixel<T>(def_.noData.at(band)) : T();
-}
-
-template <typename T>
-bool SceneRaster<T>::HasPalette(unsigned band) const {
-  const RasterPtr<T> source = Source();
-  return source && source->HasPalette(band);
 }
 
 template <typename T>

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <algorithm>
 #include <memory>
 #include <string>
 
@@ -14,9 +15,16 @@ using OpenScenes = RecentScenes<BasicRasterPtr>;
 /// How many scenes of a mosaic are open at once, beside those that are just being read.
 inline constexpr unsigned kMostOpenScenes = 16;
 
+/// Where the source of a scene lives.
+enum class SceneThread {
+  kOwn,   ///< on a thread of its own, as all sources that are shared
+  kThis,  ///< on this thread, which lets go of it too: for a look at its header
+};
+
 /// Opens a scene, with the pyramid file beside it where that is one of it.
 /// @return empty, with the fault set, when it can't be opened, or isn't of a type of EightTypes.
-VEXG_EXPORT BasicRasterPtr OpenScene(const MosaicScene& scene);
+VEXG_EXPORT BasicRasterPtr OpenScene(const MosaicScene& scene,
+                                     SceneThread thread = SceneThread::kOwn);
 
 /// The header of an open scene. False, with the fault, when it can't be part of a mosaic: it has no
 /// geo-reference or no coordinate system.
@@ -51,7 +59,10 @@ class SceneRaster final : public ComputedRaster<T> {
   unsigned Bands() const override { return def_.bands; }
   bool HasNoDataValue(unsigned band) const override;
   T NoDataValue(unsigned band) const override;
-  bool HasPalette(unsigned band) const override;
+  bool HasPalette(unsigned band) const override {
+    return std::find(scene_.header.palettes.begin(), scene_.header.palettes.end(), band) !=
+           scene_.header.palettes.end();
+  }
   PalettePtr Palette(unsigned band) const override;
   lumo::TileDimensions TileDimensions() const override;
 
