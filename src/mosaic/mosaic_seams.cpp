@@ -160,17 +160,20 @@ class SeamFiles {
 /// Carries the vertices of a footprint to the grid of the mosaic.
 bool CarryRings(Contour2DArray<double>& rings, const GeoRef& from, const GeoRef& to) {
   for (Contour2D<double>& ring : rings) {
-    const auto count = static_cast<unsigned>(ring.points.size());
-    Array<double> points{ArrayDims(count, 2)};
+    if (ring.points.empty()) continue;
+    Array<double> points{ArrayDims(static_cast<unsigned>(ring.points.size()), 2)};
     if (!points.IsValid()) return false;
-    for (unsigned i = 0; i < count; ++i) {
-      points[2 * i] = ring.points[i].x;
-      points[2 * i + 1] = ring.points[i].y;
+    double* put = points.begin();
+    for (const Point2D<double>& point : ring.points) {
+      *put++ = point.x;
+      *put++ = point.y;
     }
     if (!CarryPixels(from, to, points)) return false;
-    for (unsigned i = 0; i < count; ++i) {
-      ring.points[i] = {points[2 * i], points[2 * i + 1]};
-      if (!std::isfinite(points[2 * i]) || !std::isfinite(points[2 * i + 1])) return false;
+    const double* get = points.begin();
+    for (Point2D<double>& point : ring.points) {
+      point.x = *get++;
+      point.y = *get++;
+      if (!std::isfinite(point.x) || !std::isfinite(point.y)) return false;
     }
   }
   return true;
@@ -219,6 +222,7 @@ bool MakeMissingFootprints(MosaicRasterDef<T>& definition, const FootprintOption
   if (options.masks.GetCount() != 0 && options.masks.GetCount() != count) {
     return Refuse("there has to be a mask for each scene, or an empty name");
   }
+  RemoveAbandonedSideFiles(definition.WorkingDirectory());
   FreeNames names(definition.Footprints());
   std::string why;
   auto kept = std::chrono::steady_clock::now();
