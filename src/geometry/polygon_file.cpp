@@ -59,7 +59,6 @@ PolygonFileOutput::PolygonFileOutput(const PolygonFileKind& kind, const std::str
       growing_(growth == PolygonFileGrowth::kInPlace ? path : platform::TemporaryPathBeside(path)),
       error_(error),
       buffer_(std::max(bufferSize, kPolygonHeaderSize)) {
-  if (growing_ != path_) platform::RemoveAbandonedFiles(path_);
   std::string fault;
   file_ = platform::RandomAccessFile::CreateOrEmpty(growing_, &fault);
   if (!file_) {

@@ -3,6 +3,7 @@
 #include "mosaic/footprint_file.h"
 #include "mosaic/pvs_raster.h"
 #include "mosaic/scene_border.h"
+#include "platform/temporary_file.h"
 #include "raster/raster_command.h"
 #include "raster/raster_def.h"
 
@@ -66,9 +67,10 @@ class MosaicFootPrintsCommand final : public RasterCommand {
     LabelMaskPtr mask;
     if (!FindMask<T>(scene, mask)) return false;
     const RasterPtr<T> validity(new PVSRaster<T>(scene));
+    const URI path(ReadBare<String>("VectorMSCFP"));
+    platform::RemoveAbandonedFiles(path.ToUTF8());
     const Pointer<MosaicFootPrintPolygonWriter<T>> writer(new MosaicFootPrintPolygonWriter<T>(
-        URI(ReadBare<String>("VectorMSCFP")), kPolygonBufferSize,
-        ReadBare<float>("SmoothParameter")));
+        path, kPolygonBufferSize, ReadBare<float>("SmoothParameter")));
     if (!writer->IsValid()) return false;
     RasterToVectorProcess<T> process(validity, 0, writer, GetIPC());
     process.SetMask(mask);

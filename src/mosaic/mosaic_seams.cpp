@@ -23,9 +23,6 @@ namespace {
 
 namespace fs = std::filesystem;
 
-// The smoothing of footprints that are made here, in square pixels.
-constexpr float kSmoothing = 3.1F;
-
 // The definition is stored as footprints come in, but not more often than this.
 constexpr std::chrono::seconds kKeepInterval{2};
 
@@ -60,14 +57,18 @@ class FreeNames {
 };
 
 /// Runs a job of one MosaicFootPrintsCommand. @return no text, or why it failed.
-String RunFootprintJob(const URI& scene, const std::string& path, const IPC& ipc) {
+String RunFootprintJob(const URI& scene, const std::string& path, const FootprintOptions& options,
+                       const URI& mask, const IPC& ipc) {
   JobWriter writer;
   JobWriterCommand* const command =
       writer.AddCommand(String("Footprints@" + scene.ToUTF8()), "MosaicFootPrintsCommand");
   command->AddInput("RasterURI", scene);
   command->AddInput("Level", 0U);
-  command->AddInput("SmoothParameter", kSmoothing);
+  command->AddInput("SmoothParameter", options.smoothing);
   command->AddInput("VectorMSCFP", URI(path));
+  if (options.noData) command->AddInput("NoData", *options.noData);
+  if (options.tolerance != 0) command->AddInput("Tolerance", options.tolerance);
+  if (mask.GetLength() != 0) command->AddInput("MaskURI", mask);
   Job job;
   JobParser(job).Parse(writer.Write());
   job.ipc.Reset(new IPC(ipc));
@@ -159,17 +160,20 @@ class SeamFiles {
 /// Carries the vertices of a footprint to the grid of the mosaic.
 bool CarryRings(Contour2DArray<double>& rings, const GeoRef& from, const GeoRef& to) {
   for (Contour2D<double>& ring : rings) {
-    const auto count = static_cast<unsigned>(ring.points.size());
-    Array<double> points{ArrayDims(count, 2)};
+    if (ring.points.empty()) continue;
+    Array<double> points{ArrayDims(static_cast<unsigned>(ring.points.size()), 2)};
     if (!points.IsValid()) return false;
-    for (unsigned i = 0; i < count; ++i) {
-      points[2 * i] = ring.points[i].x;
-      points[2 * i + 1] = ring.points[i].y;
+    double* put = points.begin();
+    for (const Point2D<double>& point : ring.points) {
+      *put++ = point.x;
+      *put++ = point.y;
     }
     if (!CarryPixels(from, to, points)) return false;
-    for (unsigned i = 0; i < count; ++i) {
-      ring.points[i] = {points[2 * i], points[2 * i + 1]};
-      if (!std::isfinite(points[2 * i]) || !std::isfinite(points[2 * i + 1])) return false;
+    const double* get = points.begin();
+    for (Point2D<double>& point : ring.points) {
+      point.x = *get++;
+      point.y = *get++;
+      if (!std::isfinite(point.x) || !std::isfinite(point.y)) return false;
     }
   }
   return true;
@@ -205,30 +209,40 @@ void RemoveAbandonedSideFiles(const String& workingDirectory) {
 }
 
 bool RefuseAborted() {
-  return Refuse("the seams were aborted");
+  return Refuse("the work on the mosaic was aborted");
 }
 
 }  // namespace
 
 template <typename T>
-bool MakeMissingFootprints(MosaicRasterDef<T>& definition, const IPC& ipc) {
+bool MakeMissingFootprints(MosaicRasterDef<T>& definition, const FootprintOptions& options,
+                           const IPC& ipc, unsigned& made) {
+  made = 0;
+  const unsigned count = definition.SceneCount();
+  if (options.masks.GetCount() != 0 && options.masks.GetCount() != count) {
+    return Refuse("there has to be a mask for each scene, or an empty name");
+  }
+  RemoveAbandonedSideFiles(definition.WorkingDirectory());
   FreeNames names(definition.Footprints());
-  const double count = definition.SceneCount();
   std::string why;
   auto kept = std::chrono::steady_clock::now();
   bool isKept = true;
-  for (unsigned i = 0; i < definition.SceneCount() && !ipc.abort->IsSet(); ++i) {
+  for (unsigned i = 0; i < count && !ipc.abort->IsSet(); ++i) {
     const String key = definition.SceneKey(i);
-    if (definition.Footprints().HasKey(key)) continue;
+    const bool isThere = definition.Footprints().HasKey(key);
+    if (isThere && !options.again) continue;
     const std::string path =
-        names.Find(definition.WorkingDirectory().ToUTF8(), 10000, "_footprint.msf");
+        isThere ? definition.Footprints().Find(key).ToUTF8()
+                : names.Find(definition.WorkingDirectory().ToUTF8(), 10000, "_footprint.msf");
     const RasterPtr<T>& scene = definition.Scenes()[i];
+    const URI mask = options.masks.GetCount() != 0 ? options.masks[i] : URI();
     catalog::Add(scene);
-    const String reason = RunFootprintJob(URI(key), path, StepOf(ipc, 1 / count));
+    const String reason = RunFootprintJob(URI(key), path, options, mask, StepOf(ipc, 1.0 / count));
     catalog::Remove(scene);
     if (reason.GetLength() == 0) {
       definition.Footprints()[key] = String(path);
       isKept = false;
+      ++made;
     } else if (why.empty()) {
       why = key.ToUTF8() + ": " + reason.ToUTF8();
     }
@@ -238,7 +252,7 @@ bool MakeMissingFootprints(MosaicRasterDef<T>& definition, const IPC& ipc) {
       isKept = definition.Keep(unused);
       kept = now;
     }
-    ipc.progress->Update((i + 1) / count);
+    ipc.progress->Update((i + 1.0) / count);
   }
   std::string fault;
   if (!isKept && !definition.Keep(fault)) return Refuse(fault);
@@ -285,7 +299,8 @@ bool MakeSeams(MosaicRaster<T>& mosaic, const IPC& ipc) {
   for (unsigned i = 0; i < count; ++i) {
     if (!definition.Footprints().HasKey(definition.SceneKey(i))) rest = 0.1;
   }
-  if (rest < 1 && !MakeMissingFootprints(definition, StepOf(ipc, 0.9))) return false;
+  unsigned made = 0;
+  if (rest < 1 && !MakeMissingFootprints(definition, {}, StepOf(ipc, 0.9), made)) return false;
 
   SeamFiles files(definition.SeamFiles());
   files.NameAll(definition);
@@ -316,10 +331,11 @@ bool MakeSeams(MosaicRaster<T>& mosaic, const IPC& ipc) {
   return files.Keep();
 }
 
-#define VEXG_SEAMS(T)                                                                    \
-  template VEXG_EXPORT bool MakeMissingFootprints<T>(MosaicRasterDef<T>&, const IPC&);   \
-  template VEXG_EXPORT Polygon2D<double> LoadFootprint<T>(MosaicRasterDef<T>&, unsigned, \
-                                                          const GeoRef&);                \
+#define VEXG_SEAMS(T)                                                                              \
+  template VEXG_EXPORT bool MakeMissingFootprints<T>(MosaicRasterDef<T>&, const FootprintOptions&, \
+                                                     const IPC&, unsigned&);                       \
+  template VEXG_EXPORT Polygon2D<double> LoadFootprint<T>(MosaicRasterDef<T>&, unsigned,           \
+                                                          const GeoRef&);                          \
   template VEXG_EXPORT bool MakeSeams<T>(MosaicRaster<T>&, const IPC&);
 VEXG_FOR_ALL(EIGHT, VEXG_SEAMS);
 #undef VEXG_SEAMS

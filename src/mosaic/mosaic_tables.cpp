@@ -11,6 +11,9 @@ namespace {
 constexpr std::string_view kItemMark = "MOSAICLUTBASE51";
 constexpr std::string_view kEntryMark = "MOSAICLUT51";
 
+// A header with more of them is damaged: no file could hold their entries.
+constexpr std::uint64_t kMostTables = std::uint64_t{1} << 40;
+
 String ItemPath(const String& base) {
   return String(base.ToUTF8() + ".mlh");
 }
@@ -116,7 +119,8 @@ MosaicTableReader::MosaicTableReader(const String& base)
     : items_(ItemPath(base)), entries_(EntryPath(base)) {
   const bool isWhole = items_.IsValid() && entries_.IsValid();
   const bool fits = items_.Scenes() == entries_.Scenes() && items_.Bands() == entries_.Bands() &&
-                    entries_.Bins() == kMosaicTableBins;
+                    entries_.Bins() == kMosaicTableBins &&
+                    std::uint64_t{items_.Scenes()} * items_.Bands() <= kMostTables;
   if (isWhole && !fits) SetFault(base.ToUTF8() + ".mlt: doesn't belong to the .mlh file beside it");
   if (!isWhole || !fits) SetErrorState(ObjectErrorIO());
 }

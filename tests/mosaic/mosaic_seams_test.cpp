@@ -160,7 +160,7 @@ TEST_F(MosaicSeams, AFailureSaysWhyAndLeavesWhatStood) {
   IPC aborted;
   aborted.abort->Set(true);
   EXPECT_FALSE(MakeSeams(*mosaic, aborted));
-  EXPECT_EQ(TakeFault().ToUTF8(), "the seams were aborted");
+  EXPECT_EQ(TakeFault().ToUTF8(), "the work on the mosaic was aborted");
   EXPECT_EQ(content(), before);
 
   const auto reasonOf = [&](const std::vector<Scene>& scenes, const char* coordSys = nullptr) {
@@ -211,6 +211,36 @@ TEST_F(MosaicSeams, ASceneWithoutPolygonsIsShownWhereNoOtherIs) {
   ASSERT_TRUE(definition.Keep(reason));
   EXPECT_EQ(shown(325, 200), 50);
   EXPECT_EQ(shown(100, 100), 100);
+}
+
+TEST_F(MosaicSeams, MakesTheFootprintsThatAreWanted) {
+  const Mosaic mosaic = Make({BorderedScene(0, 0), BorderedScene(1500, -600)});
+  const auto make = [&](std::map<std::string, std::string> more) {
+    more["MosaicURI"] = FormatValue(mosaic->GetURI()).ToUTF8();
+    return test::RunCommand("MakeMosaicFootPrintsCommand", more).outputs["Made"];
+  };
+  MosaicRasterDef<std::uint8_t>& definition = *mosaic->Definition();
+  const auto areaOf = [&](unsigned scene) {
+    return ReadFootprint<std::uint8_t>(definition.Footprints().Find(definition.SceneKey(scene)))
+        .Measure(PolygonMeasure::kArea);
+  };
+  EXPECT_EQ(make({}), "2");
+  EXPECT_EQ(areaOf(0), 190 * 140);
+  EXPECT_EQ(make({}), "0");
+  EXPECT_EQ(Files().size(), 2U);
+
+  // Anew, with a mask for the second scene alone.
+  const auto left = test::MakeScene<std::uint8_t>(
+      MakeGrid(0, 0, 10, 200, 150), 1,
+      [](unsigned x, unsigned, unsigned) { return std::uint8_t(x < 100); });
+  catalog::Add(left);
+  published_.push_back(left);
+  Array<URI> masks{ArrayDims(2)};
+  masks[1] = left->GetURI();
+  EXPECT_EQ(make({{"Again", "1"}, {"MaskURIs", FormatValue(masks).ToUTF8()}}), "2");
+  EXPECT_EQ(areaOf(0), 190 * 140);
+  EXPECT_EQ(areaOf(1), 95 * 140);
+  EXPECT_EQ(Files().size(), 2U);
 }
 
 /// Keeps what was reported.
