@@ -103,7 +103,7 @@ bool MaskShape::Distances(const SubRect& rect, float limit, float* distances) co
   }
   const bool isAnyNear =
       std::any_of(distances, distances + count, [&](float distance) { return distance < limit; });
-  // What isn't in a span lies outside.
+  // Pixels in no span lie outside.
   for (unsigned line = rect.top; line <= rect.bottom; ++line) {
     float* const row = distances + std::size_t{line - rect.top} * rect.Width();
     std::int64_t next = rect.left;

@@ -71,7 +71,7 @@ inline bool Cut(const SubRect& rect, std::int64_t left, std::int64_t top, std::i
 
 }  // namespace detail
 
-/// What pixels are made with, as it is at one revision of the definition.
+/// Holds all that pixels are made with, as it is at one revision of the definition.
 template <typename T>
 struct MosaicRaster<T>::Shown {
   std::uint64_t revision;
@@ -607,7 +607,7 @@ bool MosaicRaster<T>::Compose(Shown& shown, const std::vector<std::int32_t>& sce
     if (!mask || !take(scene, mask.get())) return false;
     if (block.left == 0) return true;
   }
-  // What no scene has.
+  // The rest is in no scene.
   constexpr auto kNoData = static_cast<unsigned char>(PixelValueState::NoData);
   block.Count();
   for (unsigned y = block.rect.top; y <= block.rect.bottom; ++y) {
