@@ -6,7 +6,7 @@
 
 namespace lumo {
 
-MosaicMasks::MosaicMasks(BasicMosaicRasterDef& definition,
+MosaicMasks::MosaicMasks(const BasicMosaicRasterDef& definition, const MosaicSideFiles& files,
                          const std::vector<GeoRefPtr>& sceneModels, const GeoRefPtr& grid,
                          double scaleX, double scaleY, unsigned dataType)
     : sceneModels_(sceneModels),
@@ -14,11 +14,10 @@ MosaicMasks::MosaicMasks(BasicMosaicRasterDef& definition,
       scaleX_(scaleX),
       scaleY_(scaleY),
       dataType_(dataType) {
-  const MutexLock lock(definition.Lock());
   for (unsigned i = 0; i < sceneModels.size(); ++i) {
     const String key = definition.SceneKey(i);
-    seams_.push_back(definition.SeamFiles().Find(key).ToUTF8());
-    footprints_.push_back(definition.Footprints().Find(key).ToUTF8());
+    seams_.push_back(files.seamFiles.Find(key).ToUTF8());
+    footprints_.push_back(files.footprints.Find(key).ToUTF8());
     haveSeams_ = haveSeams_ || !seams_.back().empty();
   }
 }

@@ -18,12 +18,13 @@ namespace lumo {
 /// Failure: a file that can't be read gives none, or false, with the fault set.
 class VEXG_EXPORT MosaicMasks {
  public:
-  /// @param definition  names the files; its maps are copied.
+  /// @param files       named by the scenes' keys.
   /// @param sceneModels of all scenes, with their sizes.
   /// @param grid        of the mosaic, with its size.
   /// @param scaleX,scaleY  pixels of the grid for one of the definition's own, below 1 for a level.
-  MosaicMasks(BasicMosaicRasterDef& definition, const std::vector<GeoRefPtr>& sceneModels,
-              const GeoRefPtr& grid, double scaleX, double scaleY, unsigned dataType);
+  MosaicMasks(const BasicMosaicRasterDef& definition, const MosaicSideFiles& files,
+              const std::vector<GeoRefPtr>& sceneModels, const GeoRefPtr& grid, double scaleX,
+              double scaleY, unsigned dataType);
 
   /// True when some scene has a seam file.
   bool HaveSeams() const { return haveSeams_; }

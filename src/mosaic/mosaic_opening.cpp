@@ -86,12 +86,12 @@ class FileMosaicRasterDef final : public MosaicRasterDef<T> {
   }
 
   String TablesInUse() const override {
-    const MutexLock lock(this->Lock());
+    const std::lock_guard lock(stateLock_);
     return String(tables_);
   }
 
   bool IsUpToDate() const override {
-    const MutexLock lock(this->Lock());
+    const std::lock_guard lock(stateLock_);
     if (!(platform::IdentifyFile(path_) == identity_)) return false;
     return std::all_of(scenes_.begin(), scenes_.end(), [](const MosaicScene& scene) {
       return scene.header.state.empty() || StateOfScene(scene) == scene.header.state;
@@ -126,13 +126,16 @@ class FileMosaicRasterDef final : public MosaicRasterDef<T> {
       return true;
     };
     if (!UpdateMosaicFile(path_, merge, reason)) return false;
-    identity_ = platform::IdentifyFile(path_);
-    if (hasNewTables) {
-      RemoveTables(tables_);
-      tables_ = made;
-      this->settings_.lutPath = String(FreeTables(kept, path_));
+    std::string older;
+    {
+      const std::lock_guard state(stateLock_);
+      identity_ = platform::IdentifyFile(path_);
+      if (hasNewTables) older = std::exchange(tables_, made);
     }
-    return MosaicRasterDef<T>::Keep(reason);
+    if (hasNewTables) this->settings_.lutPath = String(FreeTables(kept, path_));
+    if (!MosaicRasterDef<T>::Keep(reason)) return false;
+    RemoveTables(older);  // which nobody begins to read any more
+    return true;
   }
 
  private:
@@ -151,7 +154,8 @@ class FileMosaicRasterDef final : public MosaicRasterDef<T> {
 
   const std::string path_;
   std::vector<MosaicScene> scenes_;
-  std::string tables_;  // in use
+  mutable std::mutex stateLock_;  // of what follows
+  std::string tables_;            // in use
   platform::FileIdentity identity_;
 };
 

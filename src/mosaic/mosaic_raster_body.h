@@ -34,7 +34,7 @@ template <typename T>
 class LevelMosaicRasterDef final : public MosaicRasterDef<T> {
  public:
   LevelMosaicRasterDef(const MosaicRasterDefPtr<T>& base, const Array<RasterPtr<T>>& levels)
-      : MosaicRasterDef<T>(levels, base->Settings()), base_(base) {}
+      : MosaicRasterDef<T>(levels, SettingsOf(*base, *base->SideFiles())), base_(base) {}
 
   std::recursive_mutex& Lock() const override { return base_->Lock(); }
   String SceneKey(unsigned scene) const override { return base_->SceneKey(scene); }
@@ -45,6 +45,24 @@ class LevelMosaicRasterDef final : public MosaicRasterDef<T> {
   }
 
  private:
+  /// The settings, with the files as they were last stored, whatever a command changes now.
+  static MosaicSettings SettingsOf(const MosaicRasterDef<T>& base, const MosaicSideFiles& files) {
+    const MosaicSettings& given = base.Settings();
+    MosaicSettings settings;
+    settings.resampling = given.resampling;
+    settings.reference = given.reference;
+    settings.colourMatchMode = given.colourMatchMode;
+    settings.matchFlags = given.matchFlags;
+    settings.lutPath = files.lutPath;
+    settings.footprints = files.footprints;
+    settings.seamFiles = files.seamFiles;
+    settings.workingDirectory = given.workingDirectory;
+    settings.bins = given.bins;
+    settings.featherWidth = given.featherWidth;
+    settings.noData = given.noData;
+    return settings;
+  }
+
   const MosaicRasterDefPtr<T> base_;
 };
 
@@ -264,6 +282,7 @@ void MosaicRaster<T>::SetUp() {
       if (def.tileWidth == def.samples) def_.tileWidth = def_.samples;
     }
   }
+  definition_->SideFiles();  // as they are before a command changes them
   constexpr unsigned kSquares = 256;
   if (!areAllOnGrid) def_.tileWidth = def_.tileHeight = kSquares;
   index_ = std::make_unique<RecordIndex>(boxes);
@@ -360,8 +379,8 @@ std::vector<std::int32_t> MosaicRaster<T>::ScenesIn(const SubRect& rect) const {
 
 template <typename T>
 std::unique_ptr<MosaicMasks> MosaicRaster<T>::MakeMasks() const {
-  return std::make_unique<MosaicMasks>(*definition_, models_, def_.geoRef, scaleX_, scaleY_,
-                                       kDataTypeOf<T>);
+  return std::make_unique<MosaicMasks>(*definition_, *definition_->SideFiles(), models_,
+                                       def_.geoRef, scaleX_, scaleY_, kDataTypeOf<T>);
 }
 
 // Levels.
@@ -434,14 +453,14 @@ RasterPtr<T> MosaicRaster<T>::PyramidLevel(unsigned level) {
 template <typename T>
 std::shared_ptr<typename MosaicRaster<T>::Shown> MosaicRaster<T>::Show() {
   const std::lock_guard lock(shownLock_);
-  const std::uint64_t revision = definition_->Revision();
-  if (!shown_ || shown_->revision != revision) {
+  const std::shared_ptr<const MosaicSideFiles> files = definition_->SideFiles();
+  if (!shown_ || shown_->revision != files->revision) {
     const std::optional<T> noData =
         HasNoDataValue(0) ? std::optional<T>(NoDataValue(0)) : std::nullopt;
     shown_ = std::shared_ptr<Shown>(
-        new Shown{revision,
-                  {*definition_, models_, def_.geoRef, scaleX_, scaleY_, kDataTypeOf<T>},
-                  SceneTables<T>(*definition_, def_.bands, noData)});
+        new Shown{files->revision,
+                  {*definition_, *files, models_, def_.geoRef, scaleX_, scaleY_, kDataTypeOf<T>},
+                  SceneTables<T>(*definition_, *files, def_.bands, noData)});
   }
   return shown_;
 }

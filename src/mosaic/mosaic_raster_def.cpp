@@ -32,7 +32,26 @@ String BasicMosaicRasterDef::TablesInUse() const {
 
 bool BasicMosaicRasterDef::Keep(std::string& /*reason*/) {
   ++revision_;
+  const std::shared_ptr<const MosaicSideFiles> files = TakeSideFiles();
+  const std::lock_guard lock(sideFilesLock_);
+  sideFiles_ = files;
   return true;
+}
+
+std::shared_ptr<const MosaicSideFiles> BasicMosaicRasterDef::TakeSideFiles() {
+  const auto files = std::make_shared<MosaicSideFiles>();
+  files->revision = revision_;
+  files->footprints = settings_.footprints;
+  files->seamFiles = settings_.seamFiles;
+  files->tables = TablesInUse();
+  files->lutPath = settings_.lutPath;
+  return files;
+}
+
+std::shared_ptr<const MosaicSideFiles> BasicMosaicRasterDef::SideFiles() {
+  const std::lock_guard lock(sideFilesLock_);
+  if (!sideFiles_) sideFiles_ = TakeSideFiles();
+  return sideFiles_;
 }
 
 template <typename T>

@@ -1,6 +1,7 @@
 #pragma once
 
 #include <atomic>
+#include <memory>
 #include <mutex>
 #include <optional>
 #include <string>
@@ -28,10 +29,20 @@ struct MosaicSettings {
   std::optional<double> noData;    ///< of pixels without a scene, in all bands
 };
 
+/// Holds the names of the files that pixels of a mosaic are made with, as they were at one moment.
+struct MosaicSideFiles {
+  std::uint64_t revision = 0;      ///< of the definition
+  Map<String, String> footprints;  ///< see MosaicSettings
+  Map<String, String> seamFiles;   ///< see MosaicSettings
+  String tables;                   ///< see BasicMosaicRasterDef::TablesInUse
+  String lutPath;                  ///< where the next tables go
+};
+
 /// Holds all of a mosaic's definition that doesn't depend on the type of its pixels.
 ///
 /// Threads: Lock() is held for a whole run of a command that changes the maps; readers of a map
-///          hold it as well. The rest doesn't change.
+///          hold it as well. Who reads pixels meanwhile goes by SideFiles, which change with Keep
+///          alone. The rest doesn't change.
 class VEXG_EXPORT BasicMosaicRasterDef : public Object {
  public:
   static const unsigned TypeCode;
@@ -69,6 +80,9 @@ class VEXG_EXPORT BasicMosaicRasterDef : public Object {
   /// pixels made with them from then on. A definition in memory alone has nothing to store.
   /// @param reason  [out] why it can't be stored, in one line.
   virtual bool Keep(std::string& reason);
+  /// The files that pixels are made with, as of the last Keep or the first call, which comes before
+  /// any command that changes them.
+  std::shared_ptr<const MosaicSideFiles> SideFiles();
   /// How often Keep has been called: pixels that were made before may be other ones now.
   std::uint64_t Revision() const { return revision_; }
 
@@ -76,7 +90,11 @@ class VEXG_EXPORT BasicMosaicRasterDef : public Object {
   MosaicSettings settings_;
 
  private:
+  std::shared_ptr<const MosaicSideFiles> TakeSideFiles();
+
   mutable std::recursive_mutex lock_;
+  std::mutex sideFilesLock_;
+  std::shared_ptr<const MosaicSideFiles> sideFiles_;
   std::atomic<std::uint64_t> revision_{0};
 };
 

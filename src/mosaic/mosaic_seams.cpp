@@ -12,6 +12,7 @@
 #include "geometry/polygon_clip.h"
 #include "georef/affine_link.h"
 #include "mosaic/footprint_file.h"
+#include "mosaic/scene_raster.h"
 #include "mosaic/seam_generator.h"
 #include "mosaic/step_progress.h"
 #include "platform/file_swap.h"
@@ -244,7 +245,7 @@ bool MakeMissingFootprints(MosaicRasterDef<T>& definition, const FootprintOption
       isKept = false;
       ++made;
     } else if (why.empty()) {
-      why = key.ToUTF8() + ": " + reason.ToUTF8();
+      why = SceneFileOf(key) + ": " + reason.ToUTF8();
     }
     const auto now = std::chrono::steady_clock::now();
     if (!isKept && now - kept >= kKeepInterval) {

@@ -1,11 +1,11 @@
 #include <algorithm>
 #include <cmath>
 
-#include "data/file_uri.h"
 #include "data/vector_records.h"
 #include "foundation/fault.h"
 #include "mosaic/mosaic_command.h"
 #include "mosaic/mosaic_masks.h"
+#include "mosaic/scene_raster.h"
 
 namespace lumo {
 namespace {
@@ -173,9 +173,7 @@ class CreateMosaicVectorsCommand final : public MosaicCommand {
       record.holes.push_back(ring.hole ? 1 : 0);
       area += std::abs(SignedArea(ring.points)) * (ring.hole ? -1 : 1);
     }
-    std::string file = PathOfFileURI(URI(definition.SceneKey(scene)));
-    file.resize(std::min(file.find("//scene"), file.size()));
-    record.values = {std::int64_t{scene}, file, area};
+    record.values = {std::int64_t{scene}, SceneFileOf(definition.SceneKey(scene)), area};
     return sink_->Write(record);
   }
 

@@ -83,6 +83,12 @@ std::string Blame(const std::string& file, const std::string& fault) {
 
 }  // namespace
 
+std::string SceneFileOf(const String& key) {
+  std::string file = PathOfFileURI(URI(key));
+  file.resize(std::min(file.find("//scene"), file.size()));
+  return file;
+}
+
 BasicRasterPtr OpenScene(const MosaicScene& scene, SceneThread thread) {
   TakeFault();
   const DataConnectionPtr source = ConnectScene(scene, thread);

@@ -12,6 +12,9 @@ namespace lumo {
 
 /// The scenes of one mosaic that are open; the one used longest ago is closed for another.
 using OpenScenes = RecentScenes<BasicRasterPtr>;
+/// The file of a scene out of the text of its URI, the key of footprints and seams.
+VEXG_EXPORT std::string SceneFileOf(const String& key);
+
 /// How many scenes of a mosaic are open at once, beside those that are just being read.
 inline constexpr unsigned kMostOpenScenes = 64;
 

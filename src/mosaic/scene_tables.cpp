@@ -12,9 +12,9 @@
 namespace lumo {
 
 template <typename T>
-SceneTables<T>::SceneTables(const BasicMosaicRasterDef& definition, unsigned bands,
-                            std::optional<T> noData)
-    : base_(definition.TablesInUse().ToUTF8()),
+SceneTables<T>::SceneTables(const BasicMosaicRasterDef& definition, const MosaicSideFiles& files,
+                            unsigned bands, std::optional<T> noData)
+    : base_(files.tables.ToUTF8()),
       bins_(definition.Bins()),
       scenes_(definition.SceneCount()),
       reference_(definition.ReferenceIndex()),

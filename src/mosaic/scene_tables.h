@@ -22,7 +22,8 @@ class SceneTables {
   using Tables = std::shared_ptr<const std::vector<ColourTable<T>>>;
 
   /// @param noData  a value that no pixel may get.
-  SceneTables(const BasicMosaicRasterDef& definition, unsigned bands, std::optional<T> noData);
+  SceneTables(const BasicMosaicRasterDef& definition, const MosaicSideFiles& files, unsigned bands,
+              std::optional<T> noData);
 
   /// The tables of a scene's bands; an empty list where there are none. Null, with the fault set,
   /// when the files can't be read, or are of other scenes or bands.

@@ -5,8 +5,8 @@
 
 #include <fmt/format.h>
 
-#include "data/file_uri.h"
 #include "foundation/near_name.h"
+#include "mosaic/scene_raster.h"
 #include "options/option_values.h"
 #include "output/json_number.h"
 #include "pictures/picture_writer.h"
@@ -360,7 +360,7 @@ class MosaicVerb final : public RasterVerb {
     std::vector<std::string> masks;
     for (const URI& scene : ParseValue<Array<URI>>(asked_.Find("Scenes"))) {
       std::string mask = footprints_.mask;
-      mask.replace(mask.find('*'), 1, fs::path(PathOfScene(scene)).stem().string());
+      mask.replace(mask.find('*'), 1, fs::path(SceneFileOf(scene)).stem().string());
       if (!IsFile(mask)) throw HostError(kExitFailed, mask + ": --mask: no such file");
       masks.push_back(mask);
     }
@@ -455,12 +455,6 @@ class MosaicVerb final : public RasterVerb {
 
   static constexpr const char* kQueryStep = "mosaic.scenes";
 
-  static std::string PathOfScene(const URI& scene) {
-    std::string path = PathOfFileURI(scene);
-    path.resize(std::min(path.find("//scene"), path.size()));
-    return path;
-  }
-
   int Info() {
     JobDraft draft;
     AddOpening(draft);
@@ -489,7 +483,7 @@ class MosaicVerb final : public RasterVerb {
     Json list = Json::array();
     for (unsigned i = 0; i < scenes.GetCount(); ++i) {
       list.push_back({{"scene", i},
-                      {"file", PathOfScene(scenes[i])},
+                      {"file", SceneFileOf(scenes[i])},
                       {"samples", sizes[2 * i]},
                       {"lines", sizes[2 * i + 1]},
                       {"onGrid", onGrid[i]},
