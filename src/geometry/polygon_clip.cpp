@@ -167,9 +167,13 @@ Polygon2D<double> UnionOf(std::span<const Polygon2D<double>> shapes) {
   try {
     // With outer rings turned one way and holes the other, shapes can be counted together.
     for (const Polygon2D<double>& shape : shapes) {
-      cl::Paths paths = ToPaths(shape, origin);
-      cl::SimplifyPolygons(paths, cl::pftEvenOdd);
-      std::move(paths.begin(), paths.end(), std::back_inserter(all));
+      cl::Clipper clipper;
+      clipper.AddPaths(ToPaths(shape, origin), cl::ptSubject, true);
+      cl::Paths turned;
+      if (!clipper.Execute(cl::ctUnion, turned, cl::pftEvenOdd, cl::pftEvenOdd)) {
+        return Failed(ObjectErrorNotConstructed());
+      }
+      std::move(turned.begin(), turned.end(), std::back_inserter(all));
     }
   } catch (const std::exception&) {
     return Failed(ObjectErrorOutOfMemory());
