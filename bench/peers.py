@@ -10,6 +10,7 @@ import subprocess
 import sys
 import time
 
+import mosaic_peers
 import segment_peers
 
 BANDS = 6
@@ -499,6 +500,7 @@ def grass_windows(bench, scene):
 
 
 SECTIONS = {"stats": stats, "hist": hist, "calibrate": calibrate, "calc": calc, "pyramid": pyramid, "warp": warp,
+            "mosaic": mosaic_peers.mosaic,
             "polygons": polygons, "zones": zones, "segments": segment_peers.speed,
             "segment-quality": segment_peers.quality, "attributes": attributes, "memory": memory}
 

@@ -1,7 +1,7 @@
 #!/usr/bin/env bash
 # Runs vexg beside public tools that do the same work, in one go, and prints medians and ratios.
 # Usage: bench/peers.sh [--size N] [--runs N] [--work FOLDER] [SECTION...]
-#   sections: stats hist calibrate calc pyramid warp polygons zones segments segment-quality attributes memory; all by
+#   sections: stats hist calibrate calc pyramid warp mosaic polygons zones segments segment-quality attributes memory; all by
 #   default. Installs the peers if they are missing.
 set -euo pipefail
 cd "$(dirname "${BASH_SOURCE[0]}")/.."

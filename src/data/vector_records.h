@@ -79,8 +79,8 @@ class VEXG_EXPORT VectorRecordSource {
 
 using VectorRecordSourcePtr = Pointer<VectorRecordSource>;
 
-/// A file of layers that is made, one layer after the other. It isn't there before Close says so; one that is destroyed
-/// before leaves nothing.
+/// A file of layers that is made, one layer after the other. It isn't there before Close says so;
+/// one that is destroyed before leaves nothing.
 class VEXG_EXPORT VectorRecordSink {
  public:
   using PointerRoot = VectorRecordSink;

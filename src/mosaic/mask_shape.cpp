@@ -78,20 +78,32 @@ void MaskShape::AddEdge(const Edge& edge, const SubRect& rect, double limit, flo
   }
 }
 
+/// Compares the distance of the rectangle's middle, which is at most half a diagonal from any of
+/// its pixels.
+bool MaskShape::MayBeNear(const Edge& edge, const SubRect& rect, double limit) {
+  const double x = (double(rect.left) + rect.right + 1) / 2;
+  const double y = (double(rect.top) + rect.bottom + 1) / 2;
+  const double reach = limit + std::hypot(rect.Width(), rect.Height()) / 2 + 1;
+  const double dx = edge.toX - edge.fromX, dy = edge.toY - edge.fromY;
+  const double along =
+      std::clamp(((x - edge.fromX) * dx + (y - edge.fromY) * dy) / (dx * dx + dy * dy), 0.0, 1.0);
+  return std::hypot(x - (edge.fromX + along * dx), y - (edge.fromY + along * dy)) <= reach;
+}
+
+bool MaskShape::MayBeNear(const SubRect& rect, double limit) const {
+  return std::any_of(edges_.begin(), edges_.end(),
+                     [&](const Edge& edge) { return MayBeNear(edge, rect, limit); });
+}
+
 bool MaskShape::Distances(const SubRect& rect, float limit, float* distances) const {
   const std::size_t count = std::size_t{rect.Width()} * rect.Height();
   std::fill(distances, distances + count, limit);
-  const double lowX = rect.left - double(limit), highX = rect.right + 1 + double(limit);
-  const double lowY = rect.top - double(limit), highY = rect.bottom + 1 + double(limit);
   for (const Edge& edge : edges_) {
-    const bool isNear =
-        std::min(edge.fromX, edge.toX) <= highX && std::max(edge.fromX, edge.toX) >= lowX &&
-        std::min(edge.fromY, edge.toY) <= highY && std::max(edge.fromY, edge.toY) >= lowY;
-    if (isNear) AddEdge(edge, rect, limit, distances);
+    if (MayBeNear(edge, rect, double(limit))) AddEdge(edge, rect, limit, distances);
   }
   const bool isAnyNear =
       std::any_of(distances, distances + count, [&](float distance) { return distance < limit; });
-  // What isn't in a span lies outside.
+  // Pixels in no span lie outside.
   for (unsigned line = rect.top; line <= rect.bottom; ++line) {
     float* const row = distances + std::size_t{line - rect.top} * rect.Width();
     std::int64_t next = rect.left;

@@ -21,6 +21,8 @@ class MaskShape {
 
   const SpanRows& Rows() const { return rows_; }
 
+  /// False when no pixel of the rectangle can be nearer to the border than `limit`.
+  bool MayBeNear(const SubRect& rect, double limit) const;
   /// Computes how far the centres of pixels lie from the border: above 0 inside, below 0 outside,
   /// and not beyond `limit`.
   /// @param distances  [out] of the pixels of the rectangle, line by line.
@@ -31,6 +33,7 @@ class MaskShape {
   struct Edge {
     double fromX, fromY, toX, toY;
   };
+  static bool MayBeNear(const Edge& edge, const SubRect& rect, double limit);
   static void AddEdge(const Edge& edge, const SubRect& rect, double limit, float* distances);
 
   SpanRows rows_;

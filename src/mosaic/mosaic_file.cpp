@@ -353,6 +353,7 @@ MosaicDocument FromJson(const Json& json, const PathForm& paths) {
   JsonFields grid(fields.At("grid"), fields.PointerOf("grid"));
   unsigned samples = 0, lines = 0;
   ReadSize(grid, samples, lines);
+  const auto system = grid.GetOr<std::string>("coordinate_system", "");
   document.grid = ReadGeoRef(grid, "", systems);
   grid.Finish();
   if (document.grid->GetType() != GeoRef::kStd) {
@@ -374,7 +375,6 @@ MosaicDocument FromJson(const Json& json, const PathForm& paths) {
   document.tables = paths.Absolute(fields.GetOr<std::string>("tables", ""));
   document.workingDirectory = paths.Absolute(fields.GetOr<std::string>("working_directory", "."));
   if (!document.workingDirectory.ends_with('/')) document.workingDirectory += '/';
-  const std::string system = TextOf(document.grid->CoordinateSystem());
   ReadScenes(fields, paths, system, systems, document);
   if (document.reference >= document.scenes.size()) {
     throw JsonMisfit{fields.PointerOf("reference"), "there is no such scene"};

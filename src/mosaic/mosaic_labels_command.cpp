@@ -32,7 +32,7 @@ const CommandDeclaration kLabels{
       "", &WordsIn<MosaicLabels>}},
     PublishedOutputs()};
 
-/// What the labels of a mosaic come from.
+/// Holds all that the labels of a mosaic come from.
 struct LabelSource {
   RasterDef grid;
   std::shared_ptr<MosaicMasks> masks;

@@ -115,9 +115,9 @@ class MosaicRaster final : public ComputedRaster<T>, public SourceRaster {
   bool ReadScene(Shown& shown, unsigned scene, const SubRect& part, const Block& block,
                  Array<T>& pixels, Array<unsigned char>& state);
   bool Compose(Shown& shown, const std::vector<std::int32_t>& scenes, Block& block);
-  bool Feather(Shown& shown, const std::vector<std::int32_t>& scenes, Block& block);
-  bool FeatherStrip(Shown& shown, const std::vector<std::int32_t>& scenes, Block& block,
-                    const SubRect& strip);
+  bool Feather(Shown& shown, Block& block);
+  bool FeatherPart(Shown& shown, Block& block, const SubRect& part);
+  std::vector<std::int32_t> ScenesNear(const SubRect& rect) const;
 
   MosaicRasterDefPtr<T> definition_;
   RasterDef def_;

@@ -25,8 +25,8 @@ namespace detail {
 
 /// Scenes whose views on the grid are kept.
 inline constexpr std::size_t kKeptViews = 32;
-/// Pixels of a strip that is feathered at once.
-inline constexpr std::size_t kFeatherPixels = std::size_t{1} << 18;
+/// Side of the squares of the grid that are feathered, each by itself.
+inline constexpr unsigned kFeatherSide = 256;
 
 /// The definition of a level of a mosaic: its scenes are the scenes' levels, or the scenes
 /// themselves where they have none; the rest is that of the mosaic.
@@ -71,7 +71,7 @@ inline bool Cut(const SubRect& rect, std::int64_t left, std::int64_t top, std::i
 
 }  // namespace detail
 
-/// What pixels are made with, as it is at one revision of the definition.
+/// Holds all that pixels are made with, as it is at one revision of the definition.
 template <typename T>
 struct MosaicRaster<T>::Shown {
   std::uint64_t revision;
@@ -607,7 +607,7 @@ bool MosaicRaster<T>::Compose(Shown& shown, const std::vector<std::int32_t>& sce
     if (!mask || !take(scene, mask.get())) return false;
     if (block.left == 0) return true;
   }
-  // What no scene has.
+  // The rest is in no scene.
   constexpr auto kNoData = static_cast<unsigned char>(PixelValueState::NoData);
   block.Count();
   for (unsigned y = block.rect.top; y <= block.rect.bottom; ++y) {
@@ -631,25 +631,51 @@ bool MosaicRaster<T>::Compose(Shown& shown, const std::vector<std::int32_t>& sce
 
 /// Replaces the pixels of the block that lie near seams.
 template <typename T>
-bool MosaicRaster<T>::Feather(Shown& shown, const std::vector<std::int32_t>& scenes, Block& block) {
-  const auto lines = static_cast<unsigned>(
-      std::clamp<std::size_t>(detail::kFeatherPixels / block.shape.width, 1, block.shape.height));
-  for (std::uint64_t top = block.rect.top; top <= block.rect.bottom; top += lines) {
-    const auto bottom = std::min<std::uint64_t>(top + lines - 1, block.rect.bottom);
-    const SubRect strip(block.rect.left, static_cast<unsigned>(top), block.rect.right,
-                        static_cast<unsigned>(bottom));
-    if (!FeatherStrip(shown, scenes, block, strip)) return false;
+bool MosaicRaster<T>::Feather(Shown& shown, Block& block) {
+  constexpr unsigned kSide = detail::kFeatherSide;
+  for (unsigned row = block.rect.top / kSide; row <= block.rect.bottom / kSide; ++row) {
+    for (unsigned column = block.rect.left / kSide; column <= block.rect.right / kSide; ++column) {
+      const SubRect square(std::max(column * kSide, block.rect.left),
+                           std::max(row * kSide, block.rect.top),
+                           std::min(column * kSide + kSide - 1, block.rect.right),
+                           std::min(row * kSide + kSide - 1, block.rect.bottom));
+      if (!FeatherPart(shown, block, square)) return false;
+    }
   }
   return true;
 }
 
+/// The scenes whose polygons may reach a rectangle, or come nearer to it than half the feathering
+/// width: whatever else lies around has no influence on its pixels.
 template <typename T>
-bool MosaicRaster<T>::FeatherStrip(Shown& shown, const std::vector<std::int32_t>& scenes,
-                                   Block& block, const SubRect& strip) {
+std::vector<std::int32_t> MosaicRaster<T>::ScenesNear(const SubRect& rect) const {
+  const double margin = definition_->Settings().featherWidth * scaleX_ / 2 + 2;
+  const auto by = static_cast<std::int64_t>(margin);
+  const RegionWindow window{std::int64_t{rect.left} - by, std::int64_t{rect.top} - by,
+                            static_cast<unsigned>(rect.Width() + 2 * by),
+                            static_cast<unsigned>(rect.Height() + 2 * by), 0};
+  return index_->Find(window);
+}
+
+template <typename T>
+bool MosaicRaster<T>::FeatherPart(Shown& shown, Block& block, const SubRect& strip) {
   const auto width = static_cast<float>(definition_->Settings().featherWidth * scaleX_);
   const float limit = width / 2;
   const std::size_t count = std::size_t{strip.Width()} * strip.Height();
   MosaicMasks& masks = shown.masks;
+
+  // Where no seam is near all pixels are those of one scene.
+  const std::vector<std::int32_t> scenes = ScenesNear(strip);
+  std::vector<std::pair<unsigned, MosaicMasks::Shape>> seams;
+  bool isAnyNear = false;
+  for (const std::int32_t number : scenes) {
+    const auto scene = static_cast<unsigned>(number);
+    if (!masks.HasSeam(scene)) continue;
+    seams.emplace_back(scene, masks.Seam(scene));
+    if (!seams.back().second) return false;
+    isAnyNear = isAnyNear || seams.back().second->MayBeNear(strip, double(limit));
+  }
+  if (!isAnyNear || seams.size() < 2) return true;
 
   // How far each pixel lies in each scene's polygon, without those of earlier scenes.
   struct Layer {
@@ -658,12 +684,8 @@ bool MosaicRaster<T>::FeatherStrip(Shown& shown, const std::vector<std::int32_t>
   };
   std::vector<Layer> layers;
   std::vector<unsigned char> isNear(count);
-  bool isAnyNear = false;
-  for (const std::int32_t number : scenes) {
-    const auto scene = static_cast<unsigned>(number);
-    if (!masks.HasSeam(scene)) continue;
-    const MosaicMasks::Shape seam = masks.Seam(scene);
-    if (!seam) return false;
+  isAnyNear = false;
+  for (const auto& [scene, seam] : seams) {
     Layer layer{scene, std::vector<float>(count)};
     if (seam->Distances(strip, limit, layer.weights.data())) {
       isAnyNear = true;
@@ -676,7 +698,7 @@ bool MosaicRaster<T>::FeatherStrip(Shown& shown, const std::vector<std::int32_t>
     }
     layers.push_back(std::move(layer));
   }
-  if (!isAnyNear || layers.size() < 2) return true;
+  if (!isAnyNear) return true;
 
   const unsigned bands = block.shape.count;
   std::vector<double> weightSums(count * bands), sums(count * bands);
@@ -768,7 +790,7 @@ bool MosaicRaster<T>::GetSubRect(const SubRect& rect, const Array<unsigned>& ban
   const std::vector<std::int32_t> scenes = ScenesIn(rect);
   if (!Compose(*shown, scenes, block)) return false;
   const bool isFeathered = definition_->Settings().featherWidth > 0 && shown->masks.HaveSeams();
-  return !isFeathered || scenes.size() < 2 || Feather(*shown, scenes, block);
+  return !isFeathered || Feather(*shown, block);
 }
 
 }  // namespace lumo

@@ -16,6 +16,10 @@ std::span<const EnumWord<MatchMode>> WordsOf(MatchMode) {
 const unsigned BasicMosaicRasterDef::TypeCode =
     GloballyUniqueObjectTypeCode("BasicMosaicRasterDef");
 
+/// A name that others may ask for; no class of this library has it.
+[[maybe_unused]] const unsigned kFastMosaicRaster =
+    GloballyUniqueObjectTypeCode("FastMosaicRaster");
+
 BasicMosaicRasterDef::BasicMosaicRasterDef(MosaicSettings settings)
     : settings_(std::move(settings)) {}
 

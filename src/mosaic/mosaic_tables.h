@@ -87,8 +87,8 @@ class LUTFile {
   bool isNew_ = false;
 };
 
-extern template class LUTFile<MosaicLUTItemBase>;
-extern template class LUTFile<double>;
+extern template class VEXG_EXPORT LUTFile<MosaicLUTItemBase>;
+extern template class VEXG_EXPORT LUTFile<double>;
 
 }  // namespace detail
 

@@ -17,11 +17,23 @@ namespace lumo {
 namespace {
 
 /// Opens a source of this process.
-DataConnectionPtr Connect(const Array<String>& strings, SceneThread thread) {
+/// @param geoRef  in place of its own, which it need not find out then; may be empty.
+DataConnectionPtr Connect(const Array<String>& strings, SceneThread thread,
+                          const GeoRefPtr& geoRef = {}) {
   DataManager& manager = GetGlobalDataManager();
-  if (thread == SceneThread::kOwn) return manager.Connect(strings, GeoRefPtr(), MetadataPtr());
+  if (thread == SceneThread::kOwn) return manager.Connect(strings, geoRef, MetadataPtr());
   return MayUseSource(strings, false) ? manager.ConnectDirect(strings, GeoRefPtr(), MetadataPtr())
                                       : DataConnectionPtr();
+}
+
+/// The grid of a scene, without its coordinate system: the source need not find that out, which
+/// takes longer than all else, since the header has it.
+GeoRefPtr PlaceOf(const MosaicScene& scene) {
+  const GeoRefPtr place = CloneOf(scene.header.geoRef);
+  if (!place || place->GetType() != GeoRef::kStd) return {};
+  place->SetDimensions(0, 0);
+  place->SetCoordinateSystem(CoordSys());
+  return place;
 }
 
 /// Opens a scene by the format that its header names, or else in whatever format it is.
@@ -29,10 +41,13 @@ DataConnectionPtr ConnectScene(const MosaicScene& scene, SceneThread thread) {
   const Array<String> strings = ConnStringsOf(scene);
   const bool isNamed = FindFormatName(strings).GetLength() != 0;
   if (!isNamed && FindFormat(String(scene.header.format)) != nullptr) {
-    Array<String> keyed{ArrayDims(strings.GetCount() + 1)};
+    const GeoRefPtr place = thread == SceneThread::kOwn ? PlaceOf(scene) : GeoRefPtr();
+    const bool isTiff = place && scene.header.format == "TIFF";
+    Array<String> keyed{ArrayDims(strings.GetCount() + (isTiff ? 2 : 1))};
     keyed[0] = String(scene.header.format);
     std::copy(strings.begin(), strings.end(), keyed.begin() + 1);
-    const DataConnectionPtr source = Connect(keyed, thread);
+    if (isTiff) keyed[keyed.GetCount() - 1] = "GEOREF_SOURCES=NONE";  // read whether needed or not
+    const DataConnectionPtr source = Connect(keyed, thread, place);
     if (source) return source;
     TakeFault();
   }
@@ -146,6 +161,9 @@ SceneRaster<T>::SceneRaster(const SceneRaster& base, unsigned level)
   const RasterPtr<T> source = Source();
   if (!source) return;
   def_ = source->GetRasterDef();
+  if (def_.geoRef && def_.geoRef->CoordinateSystem().IsEmpty()) {
+    def_.geoRef->SetCoordinateSystem(scene_.header.geoRef->CoordinateSystem());
+  }
   def_.samples = source->Samples();
   def_.lines = source->Lines();
   def_.bands = source->Bands();

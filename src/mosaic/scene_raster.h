@@ -13,7 +13,7 @@ namespace lumo {
 /// The scenes of one mosaic that are open; the one used longest ago is closed for another.
 using OpenScenes = RecentScenes<BasicRasterPtr>;
 /// How many scenes of a mosaic are open at once, beside those that are just being read.
-inline constexpr unsigned kMostOpenScenes = 16;
+inline constexpr unsigned kMostOpenScenes = 64;
 
 /// Where the source of a scene lives.
 enum class SceneThread {

@@ -17,6 +17,7 @@ SceneTables<T>::SceneTables(const BasicMosaicRasterDef& definition, unsigned ban
     : base_(definition.TablesInUse().ToUTF8()),
       bins_(definition.Bins()),
       scenes_(definition.SceneCount()),
+      reference_(definition.ReferenceIndex()),
       bands_(bands),
       noData_(noData),
       kept_(RoomFor(bands)) {}
@@ -30,7 +31,7 @@ std::size_t SceneTables<T>::RoomFor(unsigned bands) {
 
 template <typename T>
 typename SceneTables<T>::Tables SceneTables<T>::Of(unsigned scene) {
-  if (base_.empty()) return none_;
+  if (base_.empty() || scene == reference_) return none_;
   return kept_.Get(scene, [&] { return Read(scene); });
 }
 

@@ -11,8 +11,9 @@
 
 namespace lumo {
 
-/// The colour tables of a mosaic's scenes, out of its table files. Those used last are kept. Exists
-/// for EightTypes.
+/// The colour tables of a mosaic's scenes, out of its table files. Those used last are kept. The
+/// reference scene, to which the others are matched, has its values as they are. Exists for
+/// EightTypes.
 ///
 /// Threads: any number.
 template <typename T>
@@ -36,6 +37,7 @@ class SceneTables {
   const std::string base_;
   const Form bins_;
   const unsigned scenes_;
+  const unsigned reference_;
   const unsigned bands_;
   const std::optional<T> noData_;
   const Tables none_ = std::make_shared<const std::vector<ColourTable<T>>>();

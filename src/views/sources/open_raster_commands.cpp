@@ -9,8 +9,8 @@
 #include "foundation/fault.h"
 #include "foundation/warnings.h"
 #include "views/publish_raster.h"
-#include "views/sources/file_state.h"
 #include "views/sources/catalog_raster_ref.h"
+#include "views/sources/file_state.h"
 #include "views/sources/source_raster.h"
 
 namespace lumo {

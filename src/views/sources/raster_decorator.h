@@ -16,7 +16,7 @@ using RasterDecorator = BasicRasterPtr (*)(const BasicRasterPtr& plain,
 /// Has `decorate` make the rasters of a format. Called at load, once for a format.
 VEXG_EXPORT bool RegisterRasterDecorator(const String& format, RasterDecorator decorate);
 
-/// What makes the rasters of a format; null for those that stay plain.
+/// Finds who makes the rasters of a format; null for those that stay plain.
 VEXG_EXPORT RasterDecorator FindRasterDecorator(const String& format);
 
 }  // namespace lumo
