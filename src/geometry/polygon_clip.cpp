@@ -13,19 +13,21 @@ namespace {
 namespace cl = ClipperLib;
 
 // Steps of the integers in a unit. Up to 262,144 units from the middle of the shapes, products of
-// the library stay within 64 bits, which is several times as fast.
-constexpr double kSteps = 4096;
+// the library stay within 64 bits, which is several times as fast. Where edges meet so unluckily
+// that it gives up, which is seldom, other steps are tried.
+constexpr double kSteps[] = {4096, 16384, 65536};
 
 constexpr double kFarthest = 1e12;
 
-// Of a ring that is kept, in steps.
-constexpr double kLeastArea = 2;
+// Of a ring that is kept, in units.
+constexpr double kLeastArea = 2 / (kSteps[0] * kSteps[0]);
 
-/// Where the integers of an operation have their origin: a whole number, so that the steps lie
-/// alike in all operations.
+/// How the integers of an operation lie: from a whole number on, so that the steps lie alike in all
+/// operations.
 struct Origin {
   double x = 0;
   double y = 0;
+  double steps = kSteps[0];  // in a unit
 };
 
 struct Box {
@@ -56,8 +58,8 @@ cl::Paths ToPaths(const Polygon2D<double>& shape, const Origin& origin) {
     cl::Path& path = paths.emplace_back();
     path.reserve(ring.points.size());
     for (const Point2D<double>& point : ring.points) {
-      path.emplace_back(std::llround((point.x - origin.x) * kSteps),
-                        std::llround((point.y - origin.y) * kSteps));
+      path.emplace_back(std::llround((point.x - origin.x) * origin.steps),
+                        std::llround((point.y - origin.y) * origin.steps));
     }
   }
   return paths;
@@ -68,8 +70,8 @@ Contour2D<double> ToRing(const cl::Path& path, bool isHole, const Origin& origin
   ring.hole = isHole;
   ring.points.reserve(path.size() + 1);
   for (const cl::IntPoint& point : path) {
-    ring.points.push_back({static_cast<double>(point.X) / kSteps + origin.x,
-                           static_cast<double>(point.Y) / kSteps + origin.y});
+    ring.points.push_back({static_cast<double>(point.X) / origin.steps + origin.x,
+                           static_cast<double>(point.Y) / origin.steps + origin.y});
   }
   ring.points.push_back(ring.points.front());
   return ring;
@@ -82,9 +84,10 @@ Contour2DArray<double> ToRings(const cl::PolyTree& tree, const Origin& origin) {
     const cl::PolyNode* node;
   };
   std::vector<Part> parts;
+  const double least = kLeastArea * origin.steps * origin.steps;
   for (const cl::PolyNode* node = tree.GetFirst(); node != nullptr; node = node->GetNext()) {
     const double area = std::abs(cl::Area(node->Contour));
-    if (!node->IsHole() && area >= kLeastArea) parts.push_back({area, node});
+    if (!node->IsHole() && area >= least) parts.push_back({area, node});
   }
   std::stable_sort(parts.begin(), parts.end(),
                    [](const Part& a, const Part& b) { return a.area > b.area; });
@@ -92,7 +95,7 @@ Contour2DArray<double> ToRings(const cl::PolyTree& tree, const Origin& origin) {
   for (const Part& part : parts) {
     rings.push_back(ToRing(part.node->Contour, false, origin));
     for (const cl::PolyNode* hole : part.node->Childs) {
-      if (std::abs(cl::Area(hole->Contour)) < kLeastArea) continue;
+      if (std::abs(cl::Area(hole->Contour)) < least) continue;
       rings.push_back(ToRing(hole->Contour, true, origin));
     }
   }
@@ -105,21 +108,36 @@ Polygon2D<double> Failed(const ObjectErrorState& error) {
   return none;
 }
 
-/// Runs an operation of the library, whose exceptions end here.
-Polygon2D<double> Run(cl::ClipType type, const cl::Paths& subjects, const cl::Paths& clips,
-                      cl::PolyFillType fill, const Origin& origin, double label) {
-  try {
-    cl::Clipper clipper;
-    clipper.AddPaths(subjects, cl::ptSubject, true);
-    clipper.AddPaths(clips, cl::ptClip, true);
-    cl::PolyTree tree;
-    if (!clipper.Execute(type, tree, fill, fill)) return Failed(ObjectErrorNotConstructed());
-    return Polygon2D<double>(ToRings(tree, origin), label);
-  } catch (const std::bad_alloc&) {
-    return Failed(ObjectErrorOutOfMemory());
-  } catch (const std::exception&) {
-    return Failed(ObjectErrorNotConstructed());
+/// Runs `work(origin)`, which gives a shape or nothing, with one number of steps after the other
+/// until it gives one. Exceptions of the library end here.
+template <typename Work>
+Polygon2D<double> Try(Origin origin, const Work& work) {
+  for (const double steps : kSteps) {
+    origin.steps = steps;
+    try {
+      if (std::optional<Polygon2D<double>> shape = work(origin)) return *std::move(shape);
+    } catch (const std::bad_alloc&) {
+      return Failed(ObjectErrorOutOfMemory());
+    } catch (const std::exception&) {
+      continue;
+    }
   }
+  return Failed(ObjectErrorNotConstructed());
+}
+
+/// The rings of a shape with outer ones turned one way and holes the other, so that shapes can be
+/// counted together; nothing where the library gives up.
+std::optional<cl::Paths> TurnedPaths(const Polygon2D<double>& shape, const Origin& origin) {
+  cl::Clipper clipper;
+  clipper.AddPaths(ToPaths(shape, origin), cl::ptSubject, true);
+  cl::PolyTree tree;
+  if (!clipper.Execute(cl::ctUnion, tree, cl::pftEvenOdd, cl::pftEvenOdd)) return {};
+  cl::Paths paths;
+  for (cl::PolyNode* node = tree.GetFirst(); node != nullptr; node = node->GetNext()) {
+    if (cl::Orientation(node->Contour) == node->IsHole()) cl::ReversePath(node->Contour);
+    paths.push_back(std::move(node->Contour));
+  }
+  return paths;
 }
 
 cl::ClipType TypeOf(ClipOperation operation) {
@@ -150,8 +168,14 @@ Polygon2D<double> Clip(ClipOperation operation, const Polygon2D<double>& a,
   const Origin origin = MiddleOf(a.Rings().empty()   ? boxB
                                  : b.Rings().empty() ? boxA
                                                      : Around(boxA, boxB));
-  return Run(TypeOf(operation), ToPaths(a, origin), ToPaths(b, origin), cl::pftEvenOdd, origin,
-             a.Label());
+  return Try(origin, [&](const Origin& of) -> std::optional<Polygon2D<double>> {
+    cl::Clipper clipper;
+    clipper.AddPaths(ToPaths(a, of), cl::ptSubject, true);
+    clipper.AddPaths(ToPaths(b, of), cl::ptClip, true);
+    cl::PolyTree tree;
+    if (!clipper.Execute(TypeOf(operation), tree, cl::pftEvenOdd, cl::pftEvenOdd)) return {};
+    return Polygon2D<double>(ToRings(tree, of), a.Label());
+  });
 }
 
 Polygon2D<double> UnionOf(std::span<const Polygon2D<double>> shapes) {
@@ -162,19 +186,23 @@ Polygon2D<double> UnionOf(std::span<const Polygon2D<double>> shapes) {
     box = box ? Around(*box, BoxOf(shape)) : BoxOf(shape);
   }
   if (!box) return {};
-  const Origin origin = MiddleOf(*box);
-  cl::Paths all;
-  try {
-    // With outer rings turned one way and holes the other, shapes can be counted together.
-    for (const Polygon2D<double>& shape : shapes) {
-      cl::Paths paths = ToPaths(shape, origin);
-      cl::SimplifyPolygons(paths, cl::pftEvenOdd);
-      std::move(paths.begin(), paths.end(), std::back_inserter(all));
-    }
-  } catch (const std::exception&) {
-    return Failed(ObjectErrorOutOfMemory());
-  }
-  return Run(cl::ctUnion, all, {}, cl::pftNonZero, origin, 0);
+  Polygon2D<double> all =
+      Try(MiddleOf(*box), [&](const Origin& of) -> std::optional<Polygon2D<double>> {
+        cl::Clipper clipper;
+        for (const Polygon2D<double>& shape : shapes) {
+          const std::optional<cl::Paths> paths = TurnedPaths(shape, of);
+          if (!paths) return {};
+          clipper.AddPaths(*paths, cl::ptSubject, true);
+        }
+        cl::PolyTree tree;
+        if (!clipper.Execute(cl::ctUnion, tree, cl::pftNonZero, cl::pftNonZero)) return {};
+        return Polygon2D<double>(ToRings(tree, of));
+      });
+  if (all.GetErrorState().code != ObjectErrorNotConstructed::Code) return all;
+  // One after the other there is less that meets at once.
+  all = {};
+  for (const Polygon2D<double>& shape : shapes) all = Clip(ClipOperation::kUnion, all, shape);
+  return all;
 }
 
 }  // namespace lumo

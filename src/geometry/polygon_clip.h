@@ -20,8 +20,8 @@ enum class ClipOperation : unsigned {
 /// from that of the shape. Rings with less area than two such squares are left out.
 /// @return a shape of closed rings with the label of `a`: each outer ring with a positive area, the
 ///         largest first, its holes behind it. One without rings, which isn't valid then, where
-///         nothing lies; where a coordinate isn't finite, or beyond 10^12, or memory is short it
-///         holds another error than PolygonErrorBadPolygon.
+///         nothing lies; where a coordinate isn't finite, or beyond 10^12, where memory is short or
+///         the library gives up it holds another error than PolygonErrorBadPolygon.
 VEXG_EXPORT Polygon2D<double> Clip(ClipOperation operation, const Polygon2D<double>& a,
                                    const Polygon2D<double>& b);
 

@@ -20,6 +20,11 @@ void Tidy(Outline& outline) {
   if (outline.IsValid()) RemoveSmallRings(outline, kLeastRest);
 }
 
+/// True for the result of a clipping that could not be done, which an empty one isn't.
+bool HasFailed(const Outline& clipped) {
+  return clipped.HasError() && clipped.GetErrorState().code != PolygonErrorBadPolygon::Code;
+}
+
 std::vector<OutlineBox> BoxesOf(const std::vector<Outline>& outlines) {
   return {outlines.begin(), outlines.end()};
 }
@@ -61,8 +66,9 @@ bool SeamGenerator::CutPairs(const IPC& ipc) {
 void SeamGenerator::CutPair(unsigned first, unsigned second) {
   const Outline &a = footprints_[first], &b = footprints_[second];
   const Outline common = Clip(ClipOperation::kIntersection, a, b);
-  if (IsEmptyOutline(common)) return;
   const auto leave = [&](PairLeftAlone why) { leftAlone_.push_back({first, second, why}); };
+  if (HasFailed(common)) leave(PairLeftAlone::kImpossible);
+  if (IsEmptyOutline(common)) return;
   if (IsEmptyOutline(Clip(ClipOperation::kDifference, a, b)) ||
       IsEmptyOutline(Clip(ClipOperation::kDifference, b, a))) {
     leave(PairLeftAlone::kNested);
@@ -80,8 +86,14 @@ void SeamGenerator::CutPair(unsigned first, unsigned second) {
                                                  : PairLeftAlone::kImpossible);
     return;
   }
-  parts_[first] = Clip(ClipOperation::kIntersection, parts_[first], ofA);
-  parts_[second] = Clip(ClipOperation::kIntersection, parts_[second], ofB);
+  ofA = Clip(ClipOperation::kIntersection, parts_[first], ofA);
+  ofB = Clip(ClipOperation::kIntersection, parts_[second], ofB);
+  if (HasFailed(ofA) || HasFailed(ofB)) {
+    leave(PairLeftAlone::kImpossible);
+    return;
+  }
+  parts_[first] = std::move(ofA);
+  parts_[second] = std::move(ofB);
 }
 
 bool SeamGenerator::AssignRest(const IPC& ipc) {
@@ -94,10 +106,14 @@ bool SeamGenerator::AssignRest(const IPC& ipc) {
     Outline near(TakeRingsNear(rings, OutlineBox(footprints_[i])));
     const Outline taken = Clip(ClipOperation::kIntersection, footprints_[i], near);
     if (!IsEmptyOutline(taken)) {
-      parts_[i] = Clip(ClipOperation::kUnion, parts_[i], taken);
-      RemoveSmallRings(parts_[i], kLeastRest);
-      near = Clip(ClipOperation::kDifference, near, taken);
-      Tidy(near);
+      Outline more = Clip(ClipOperation::kUnion, parts_[i], taken);
+      Outline left = Clip(ClipOperation::kDifference, near, taken);
+      if (!HasFailed(more) && !HasFailed(left)) {
+        RemoveSmallRings(more, kLeastRest);
+        Tidy(left);
+        parts_[i] = std::move(more);
+        near = std::move(left);
+      }
       ipc.progress->Update(static_cast<double>(i + 1) / static_cast<double>(parts_.size()));
     }
     rings.insert(rings.end(), near.Rings().begin(), near.Rings().end());

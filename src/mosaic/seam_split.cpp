@@ -75,12 +75,58 @@ double SquaredLength(const Point& a, const Point& b) {
   return (b.x - a.x) * (b.x - a.x) + (b.y - a.y) * (b.y - a.y);
 }
 
+/// The edges of the outer rings of an outline by the rows that they lie in, to find those near a
+/// point without a look at all: outlines that follow pixels have ten thousands.
+class EdgeRows {
+ public:
+  explicit EdgeRows(const Outline& outline)
+      : top_(outline.Measure(PolygonMeasure::kMinY)),
+        rows_(RowOf(outline.Measure(PolygonMeasure::kMaxY)) + 1) {
+    for (const Contour2D<double>& ring : outline.Rings()) {
+      if (ring.hole) continue;
+      for (std::size_t i = 0; i + 1 < ring.points.size(); ++i) {
+        const Point &s = ring.points[i], &e = ring.points[i + 1];
+        const std::size_t last = RowOf(std::max(s.y, e.y));
+        for (std::size_t row = RowOf(std::min(s.y, e.y)); row <= last; ++row) {
+          rows_[row].push_back({s, e});
+        }
+      }
+    }
+  }
+
+  /// True when the point lies nearer to an edge than `reach`.
+  bool IsNear(const Point& p, double reach) const {
+    if (!(p.y + reach >= top_)) return false;
+    const std::size_t last = std::min(RowOf(p.y + reach), rows_.size() - 1);
+    for (std::size_t row = RowOf(p.y - reach); row <= last; ++row) {
+      for (const auto& [s, e] : rows_[row]) {
+        if (SquaredDistanceToSegment(p, s, e) < reach * reach) return true;
+      }
+    }
+    return false;
+  }
+
+ private:
+  struct Edge {
+    Point s, e;
+  };
+  static constexpr double kHeight = 64;  // of a row, in pixels
+
+  std::size_t RowOf(double y) const {
+    constexpr double kMost = 1 << 20;
+    return static_cast<std::size_t>(std::clamp((y - top_) / kHeight, 0.0, kMost));
+  }
+
+  const double top_;
+  std::vector<std::vector<Edge>> rows_;
+};
+
 /// Finds the two crossings that lie farthest apart. False where there are fewer.
 bool FindCrossings(const Outline& a, const Outline& b, Points ring, CrossedRing& crossed) {
   std::vector<std::size_t> crossings;
+  const EdgeRows edgesOfA(a), edgesOfB(b);
   for (std::size_t i = 0; i < ring.size(); ++i) {
-    if (DistanceToOutline(ring[i], a) < kCrossingReach &&
-        DistanceToOutline(ring[i], b) < kCrossingReach) {
+    if (edgesOfA.IsNear(ring[i], kCrossingReach) && edgesOfB.IsNear(ring[i], kCrossingReach)) {
       crossings.push_back(i);
     }
   }

@@ -128,6 +128,21 @@ TEST(PolygonClip, AreasOfRandomShapesAddUp) {
   }
 }
 
+TEST(PolygonClip, ManyShapesAtOnceAreThoseOneByOne) {
+  std::mt19937 random(23);
+  for (int round = 0; round < 40; ++round) {
+    std::vector<Shape> shapes(2 + random() % 30);
+    Shape all;
+    for (Shape& shape : shapes) {
+      shape = RandomShape(random);
+      // Parts that share borders, as those that seams leave.
+      if (all.IsValid() && round % 2 == 0) shape = Clip(ClipOperation::kDifference, shape, all);
+      all = Clip(ClipOperation::kUnion, all, shape);
+    }
+    EXPECT_NEAR(AreaOf(UnionOf(shapes)), AreaOf(all), 1) << round;
+  }
+}
+
 TEST(PolygonClip, AThousandthOfAPixelSurvives) {
   for (const double far : {0.0, 70000.0, 3e6}) {
     const Shape strip = Clip(ClipOperation::kDifference, Box(far, 0, far + 1000, 1000),

@@ -2,7 +2,6 @@
 
 #include <cmath>
 #include <filesystem>
-#include <regex>
 #include <set>
 
 #include "commands/catalog.h"
@@ -80,8 +79,13 @@ TEST_F(MosaicSeams, CutsScenesInPixelsOfTheMosaic) {
   ASSERT_TRUE(made.Succeeded()) << made.reason;
   EXPECT_EQ(made.outputs.at("Success"), "1");
   for (const std::string& name : Files()) {
-    EXPECT_TRUE(std::regex_match(name, std::regex("[0-9]{1,5}_footprint.msf|200_150_[0-9]+.emp")))
-        << name;
+    const bool isSeam = name.ends_with(".emp");
+    const std::string beginning = isSeam ? "200_150_" : "",
+                      ending = isSeam ? ".emp" : "_footprint.msf";
+    ASSERT_TRUE(name.starts_with(beginning) && name.ends_with(ending)) << name;
+    const std::string number =
+        name.substr(beginning.size(), name.size() - beginning.size() - ending.size());
+    EXPECT_EQ(number.find_first_not_of("0123456789"), number.npos) << name;
   }
   ASSERT_EQ(Files().size(), 4U);
   // In pixels of 5 m: the first scene covers 10 to 390 by 10 to 290, the second 310 to 690 by 130

@@ -16,7 +16,7 @@ namespace {
 using Outline = Polygon2D<double>;
 using Point = Point2D<double>;
 
-constexpr unsigned kSide = 1400;  // of the ground that is looked at, in pixels
+constexpr unsigned kSide = 700;  // of the ground that is looked at, in pixels
 
 /// For each pixel, whether its centre lies in a shape: by its crossings with the rings.
 std::vector<bool> PixelsOf(const Outline& shape) {
@@ -79,11 +79,11 @@ Outline RandomScene(std::mt19937& random, double x, double y, double reach) {
 }
 
 std::vector<Outline> RandomLayout(std::mt19937& random, unsigned count) {
-  std::uniform_real_distribution<double> place(300, 1100);
+  std::uniform_real_distribution<double> place(150, 550);
   std::vector<Outline> scenes;
   for (unsigned i = 0; i < count; ++i) {
     scenes.push_back(
-        RandomScene(random, place(random), place(random), random() % 8 == 0 ? 90 : 420));
+        RandomScene(random, place(random), place(random), random() % 8 == 0 ? 45 : 210));
   }
   return scenes;
 }
@@ -92,8 +92,8 @@ std::vector<Outline> RandomLayout(std::mt19937& random, unsigned count) {
 std::vector<Outline> AlignedLayout(std::mt19937& random, unsigned count) {
   std::vector<Outline> scenes;
   for (unsigned i = 0; i < count; ++i) {
-    const double x = 100.0 * double(random() % 10), y = 100.0 * double(random() % 10);
-    scenes.push_back(Box(x, y, x + 150 + 100.0 * double(random() % 3), y + 200));
+    const double x = 50.0 * double(random() % 10), y = 50.0 * double(random() % 10);
+    scenes.push_back(Box(x, y, x + 75 + 50.0 * double(random() % 3), y + 100));
   }
   return scenes;
 }
@@ -105,7 +105,7 @@ bool Generate(SeamGenerator& seams) {
 TEST(SeamGenerator, PartsTileTheUnionOfRandomLayouts) {
   std::mt19937 random(41);
   std::size_t divided = 0, left = 0;
-  for (unsigned round = 0; round < 60; ++round) {
+  for (unsigned round = 0; round < 40; ++round) {
     SCOPED_TRACE(round);
     const unsigned count = 2 + round % 29;
     const std::vector<Outline> scenes =
@@ -143,7 +143,7 @@ TEST(SeamGenerator, PartsTileTheUnionOfRandomLayouts) {
     EXPECT_LT(double(twice), 0.001 * double(ground)) << "of " << overlapped;
     divided += overlapped;
   }
-  EXPECT_GT(divided, 1000000U);
+  EXPECT_GT(divided, 500000U);
   EXPECT_LT(left, divided / 2);
 }
 
