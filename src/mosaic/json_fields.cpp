@@ -1,4 +1,4 @@
-#include "mosaic/json_fields.h"
+#include "mosaic/json_fields_body.h"
 
 #include <algorithm>
 #include <cmath>

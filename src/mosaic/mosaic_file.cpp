@@ -17,7 +17,7 @@
 #include "foundation/near_name.h"
 #include "foundation/text_case.h"
 #include "georef/std_georef.h"
-#include "mosaic/json_fields.h"
+#include "mosaic/json_fields_body.h"
 #include "mosaic/match_mode.h"
 #include "platform/folder_lock.h"
 #include "platform/owned_name.h"

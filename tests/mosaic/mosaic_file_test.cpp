@@ -6,7 +6,6 @@
 #include <thread>
 
 #include "georef/std_georef.h"
-#include "mosaic/json_fields.h"
 #include "mosaic/mosaic_grid.h"
 #include "platform/owned_name.h"
 #include "support/coordsys_support.h"
