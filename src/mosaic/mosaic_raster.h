@@ -109,6 +109,7 @@ class MosaicRaster final : public ComputedRaster<T>, public SourceRaster {
   void SetUp();
   Place PlaceOf(const RasterDef& scene) const;
   bool HaveLevel(unsigned level) const;
+  bool HasPyramidFile() const;
   std::shared_ptr<Shown> Show();
   RasterPtr<T> OnGrid(unsigned scene);
 

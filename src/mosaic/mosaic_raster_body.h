@@ -387,7 +387,13 @@ std::unique_ptr<MosaicMasks> MosaicRaster<T>::MakeMasks() const {
 
 template <typename T>
 bool MosaicRaster<T>::PyramidExists() const {
-  return stored_.IsNull() && (ComputedRaster<T>::PyramidExists() || HaveLevel(0));
+  return stored_.IsNull() && (HasPyramidFile() || HaveLevel(0));
+}
+
+/// True while a pyramid file shows the mosaic as it is: none does once that has changed.
+template <typename T>
+bool MosaicRaster<T>::HasPyramidFile() const {
+  return definition_ && definition_->Revision() == 0 && ComputedRaster<T>::PyramidExists();
 }
 
 /// True when all scenes have a level; level 0 stands for any at all.
@@ -405,7 +411,10 @@ bool MosaicRaster<T>::HaveLevel(unsigned level) const {
 template <typename T>
 PyramidDef MosaicRaster<T>::GetPyramidDef() const {
   PyramidDef def = ComputedRaster<T>::GetPyramidDef();
-  if (ComputedRaster<T>::PyramidExists() || !HaveLevel(0)) return def;
+  if (HasPyramidFile()) return def;
+  def.pyramidType = PyramidType::kNone;
+  def.levelMin = def.levelMax = 0;
+  if (!HaveLevel(0)) return def;
   def.pyramidType = PyramidType::kDriver;
   def.levelMin = 1;
   def.levelMax = 31;
@@ -415,7 +424,10 @@ PyramidDef MosaicRaster<T>::GetPyramidDef() const {
     def.levelMax = std::min(def.levelMax, own.levelMax);
     def.resamplingMethod = own.resamplingMethod;
   }
-  if (def.levelMin > def.levelMax) def = ComputedRaster<T>::GetPyramidDef();
+  if (def.levelMin > def.levelMax) {
+    def.pyramidType = PyramidType::kNone;
+    def.levelMin = def.levelMax = 0;
+  }
   return def;
 }
 
@@ -423,7 +435,7 @@ template <typename T>
 RasterPtr<T> MosaicRaster<T>::PyramidLevel(unsigned level) {
   if (!IsValid() || level == 0 || level > 31) return {};
   const RasterPtr<T> stored =
-      ComputedRaster<T>::PyramidExists() ? ComputedRaster<T>::PyramidLevel(level) : RasterPtr<T>();
+      HasPyramidFile() ? ComputedRaster<T>::PyramidLevel(level) : RasterPtr<T>();
   const bool haveLevel = HaveLevel(level);
   if (!stored && !haveLevel) return {};
   const ExactLevels exactly(true);
