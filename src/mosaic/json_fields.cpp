@@ -1,5 +1,3 @@
-#include "mosaic/json_fields_body.h"
-
 #include <algorithm>
 #include <cmath>
 #include <iterator>
@@ -7,6 +5,7 @@
 #include <fmt/format.h>
 
 #include "foundation/near_name.h"
+#include "mosaic/json_fields_body.h"
 
 namespace lumo {
 namespace {
