@@ -11,6 +11,7 @@ import sys
 import time
 
 import class_peers
+import mosaic_peers
 import opening_peers
 import segment_peers
 
@@ -509,7 +510,8 @@ def grass_windows(bench, scene):
 
 
 SECTIONS = {"open": opening_peers.opening, "read": opening_peers.reading, "stats": stats, "hist": hist,
-            "calibrate": calibrate, "calc": calc, "pyramid": pyramid, "warp": warp, "polygons": polygons,
+            "calibrate": calibrate, "calc": calc, "pyramid": pyramid, "warp": warp,
+            "mosaic": mosaic_peers.mosaic, "polygons": polygons,
             "zones": zones, "segments": segment_peers.speed, "segment-quality": segment_peers.quality,
             "attributes": attributes, "classes": lambda bench: class_peers.speed(bench, make_regions),
             "class-quality": class_peers.quality, "memory": memory}

@@ -15,7 +15,7 @@ bool Connection::Connect(const Array<String>& connStrings, const GeoRefPtr& geoR
   if (!ParseSource(connStrings, source)) return false;
   raster_ = OpenRaster::Open(format_, source);
   if (raster_ == nullptr) return false;
-  lumo::RasterDef def = raster_->Describe();
+  lumo::RasterDef def = raster_->Describe(geoRef.IsNull());
   const bool hasGrid = def.geoRef && def.geoRef->GetType() != GeoRef::kRpc;
   if (geoRef) def.SetGeoRef(geoRef);
   def.metadata = metadata ? *metadata : ReadMetadata(raster_->Dataset(), hasGrid);

@@ -117,7 +117,7 @@ bool WriteCoordSys(GDALDatasetH dataset, const CoordSys& system) {
 
 }  // namespace
 
-GeoRefPtr ReadGeoRef(GDALDatasetH dataset) {
+GeoRefPtr ReadGeoRef(GDALDatasetH dataset, bool hasSystem) {
   RpcGeoRef camera;
   const bool hasCamera = ReadCamera(dataset, camera);
   auto* const both = hasCamera ? new StdRpcGeoRef : nullptr;
@@ -125,7 +125,7 @@ GeoRefPtr ReadGeoRef(GDALDatasetH dataset) {
   GeoRefPtr owner(grid);
   if (!ReadGrid(dataset, *grid)) return hasCamera ? GeoRefPtr(camera.Clone()) : GeoRefPtr();
   if (hasCamera) both->SetRpc(camera);
-  grid->SetCoordinateSystem(ReadCoordSys(GDALGetSpatialRef(dataset)));
+  if (hasSystem) grid->SetCoordinateSystem(ReadCoordSys(GDALGetSpatialRef(dataset)));
   return owner;
 }
 

@@ -11,7 +11,8 @@ namespace lumo::gdal {
 /// The model that a raster comes with: an affine grid, a camera, or both; empty when it has none.
 /// A grid that no StdGeoRef is, because its axes stand at another angle than a right one, counts as
 /// none.
-GeoRefPtr ReadGeoRef(GDALDatasetH dataset);
+/// @param hasSystem  whether a grid gets its coordinate system, which takes long to find out.
+GeoRefPtr ReadGeoRef(GDALDatasetH dataset, bool hasSystem = true);
 
 /// GDAL's six numbers of an affine grid.
 using GridTransform = std::array<double, 6>;

@@ -224,7 +224,7 @@ const RasterLevel* OpenRaster::FindLevel(unsigned level) const {
   return at != levels_.end() ? &at->second : nullptr;
 }
 
-RasterDef OpenRaster::Describe() const {
+RasterDef OpenRaster::Describe(bool hasSystem) const {
   const Messages messages;
   RasterDef def;
   const RasterLevel& full = levels_.at(0);
@@ -240,7 +240,7 @@ RasterDef OpenRaster::Describe() const {
   const bool isTiled = SizeOf(width) != full.samples && height > 1;
   def.tileWidth = SizeOf(width);
   def.tileHeight = isTiled ? SizeOf(height) : 1;
-  def.SetGeoRef(ReadGeoRef(full.dataset));
+  def.SetGeoRef(ReadGeoRef(full.dataset, hasSystem));
   return def;
 }
 

@@ -66,7 +66,7 @@ class OpenRaster {
   bool HasBand(unsigned band) const { return band < Bands(); }
 
   /// The description that the source itself gives, without no-data values and metadata.
-  RasterDef Describe() const;
+  RasterDef Describe(bool hasSystem = true) const;
 
   /// True when the format and the file let pixels be changed. Opens nothing with GDAL.
   bool CanWrite();

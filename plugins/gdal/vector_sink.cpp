@@ -32,11 +32,12 @@ struct SinkFormat {
   const char* ending;
   const char* driver;
   std::vector<const char*> options;  // of the layer
+  bool hasLayers = false;            // a file may hold several
 };
 
 const std::vector<SinkFormat>& SinkFormats() {
   static const std::vector<SinkFormat> formats{
-      {".gpkg", "GPKG", {}},
+      {".gpkg", "GPKG", {}, true},
       {".fgb", "FlatGeobuf", {}},
       {".geojson", "GeoJSON", {}},
       {".geojsons", "GeoJSONSeq", {}},
@@ -161,8 +162,10 @@ class GdalVectorSink final : public VectorRecordSink {
   bool Begin(const VectorLayer& layer);
   bool Write(const VectorRecord& record) override;
   bool Close() override;
+  bool NextLayer(const VectorLayer& layer) override;
 
  private:
+  void Commit();
   bool MakeLayer(const VectorLayer& layer);
   bool SetShape(const VectorRecord& record);
   bool SetValues(const VectorRecord& record);
@@ -281,13 +284,29 @@ bool GdalVectorSink::Close() {
   if (dataset_ == nullptr || isFailed_) return false;
   const Settings settings;
   const Messages messages;
+  Commit();
+  dataset_.reset();
+  if (messages.HasError()) return Fail(messages);
+  return TakePlace();
+}
+
+void GdalVectorSink::Commit() {
   feature_.reset();
   if (GDALDatasetTestCapability(dataset_.get(), ODsCTransactions) != 0) {
     GDALDatasetCommitTransaction(dataset_.get());
   }
-  dataset_.reset();
-  if (messages.HasError()) return Fail(messages);
-  return TakePlace();
+}
+
+bool GdalVectorSink::NextLayer(const VectorLayer& layer) {
+  if (dataset_ == nullptr || isFailed_) return false;
+  if (!format_.hasLayers) return FailWith(path_, "a file of this format holds one layer");
+  const Settings settings;
+  const Messages messages;
+  Commit();
+  if (!MakeLayer(layer) || messages.HasError()) return Fail(messages);
+  GDALDatasetStartTransaction(dataset_.get(), FALSE);
+  feature_.reset(OGR_F_Create(OGR_L_GetLayerDefn(layer_)));
+  return feature_ != nullptr;
 }
 
 /// Moves the files into their places, the one that was asked for last.

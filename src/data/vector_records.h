@@ -79,8 +79,8 @@ class VEXG_EXPORT VectorRecordSource {
 
 using VectorRecordSourcePtr = Pointer<VectorRecordSource>;
 
-/// A file with one layer that is made. It isn't there before Close says so; one that is destroyed
-/// before leaves nothing.
+/// A file of layers that is made, one layer after the other. It isn't there before Close says so;
+/// one that is destroyed before leaves nothing.
 class VEXG_EXPORT VectorRecordSink {
  public:
   using PointerRoot = VectorRecordSink;
@@ -90,6 +90,8 @@ class VEXG_EXPORT VectorRecordSink {
   /// Completes the file, and puts it in its place. Nothing is written after that.
   virtual bool Close() = 0;
   virtual ~VectorRecordSink() = default;
+  /// Ends the layer, and begins another one. False for a format whose files hold one layer.
+  virtual bool NextLayer(const VectorLayer& layer) = 0;
 };
 
 using VectorRecordSinkPtr = Pointer<VectorRecordSink>;

@@ -57,21 +57,21 @@ TEST(PluginLibrary, ManyThreadsMakeOneFactory) {
 
 TEST(PluginLibrary, OneWithoutTheEntryPointCountsAsMissing) {
   const test::TemporaryDirectory directory;
-  fs::create_symlink(Built("lib/libvexg_example_commands.so"), directory.Path() / "libvexzep.so");
+  fs::create_symlink(Built("lib/libvexg_example_commands.so"), directory.Path() / "libvexgdb.so");
   LookForPluginsIn(directory.Path());
-  EXPECT_EQ(FactoryForFormat("EXTERNAL"), nullptr);
+  EXPECT_EQ(FactoryForFormat("GDBRaster"), nullptr);
   EXPECT_THAT(TakeFault().ToUTF8(), testing::HasSubstr("CreateDataConnectionFactory"));
-  std::ofstream(directory.Path() / "libvexzep2.so") << "no library";
-  fs::remove(directory.Path() / "libvexzep.so");
-  fs::rename(directory.Path() / "libvexzep2.so", directory.Path() / "libvexzep.so");
-  EXPECT_EQ(FactoryForFormat("EXTERNAL"), nullptr);
-  EXPECT_THAT(TakeFault().ToUTF8(), testing::HasSubstr("libvexzep.so"));
+  std::ofstream(directory.Path() / "libvexgdb2.so") << "no library";
+  fs::remove(directory.Path() / "libvexgdb.so");
+  fs::rename(directory.Path() / "libvexgdb2.so", directory.Path() / "libvexgdb.so");
+  EXPECT_EQ(FactoryForFormat("GDBRaster"), nullptr);
+  EXPECT_THAT(TakeFault().ToUTF8(), testing::HasSubstr("libvexgdb.so"));
   // It is tried again when there is another file, and not before.
-  EXPECT_EQ(FactoryForFormat("EXTERNAL"), nullptr);
-  fs::remove(directory.Path() / "libvexzep.so");
-  EXPECT_EQ(FactoryForFormat("EXTERNAL"), nullptr);
-  fs::create_symlink(Built("lib/libvexg_example_commands.so"), directory.Path() / "libvexzep.so");
-  EXPECT_EQ(FactoryForFormat("EXTERNAL"), nullptr);
+  EXPECT_EQ(FactoryForFormat("GDBRaster"), nullptr);
+  fs::remove(directory.Path() / "libvexgdb.so");
+  EXPECT_EQ(FactoryForFormat("GDBRaster"), nullptr);
+  fs::create_symlink(Built("lib/libvexg_example_commands.so"), directory.Path() / "libvexgdb.so");
+  EXPECT_EQ(FactoryForFormat("GDBRaster"), nullptr);
   EXPECT_THAT(TakeFault().ToUTF8(), testing::HasSubstr("CreateDataConnectionFactory"));
 }
 

@@ -5,6 +5,7 @@
 #include "data/data_manager.h"
 #include "data/file_uri.h"
 #include "foundation/fault.h"
+#include "views/sources/raster_decorator.h"
 #include "views/sources/reader_raster.h"
 #include "views/sources/source_raster.h"
 
@@ -65,8 +66,12 @@ BasicRasterPtr MakeReaderRaster(const DataConnectionPtr& connection,
       return true;
     });
   }
-  if (!made) SetFault(source->URI().ToUTF8() + ": the pixel type of the source can't be read");
-  return made;
+  if (!made) {
+    SetFault(source->URI().ToUTF8() + ": the pixel type of the source can't be read");
+    return made;
+  }
+  const RasterDecorator decorate = FindRasterDecorator(source->RasterDef().format);
+  return decorate != nullptr ? decorate(made, *source, uri) : made;
 }
 
 CatalogRasterRef::CatalogRasterRef(const BasicRasterPtr& raster, bool releaseOnDestroy)

@@ -9,8 +9,9 @@
 #include "foundation/fault.h"
 #include "foundation/warnings.h"
 #include "views/publish_raster.h"
+#include "views/sources/catalog_raster_ref.h"
 #include "views/sources/file_state.h"
-#include "views/sources/reader_raster.h"
+#include "views/sources/source_raster.h"
 
 namespace lumo {
 namespace {
@@ -184,13 +185,8 @@ class OpenRasterCommand final : public PublishCommand {
 
   /// The source that the pyramid of an open raster was opened from; no text for none.
   static URI PyramidOf(const BasicRaster& raster) {
-    URI uri;
-    DispatchType(TwelveTypes{}, raster.DataType(), [&]<typename T>() {
-      const auto* const reader = dynamic_cast<const ReaderRaster<T>*>(&raster);
-      if (reader != nullptr) uri = reader->PyramidURI();
-      return true;
-    });
-    return uri;
+    const auto* const source = dynamic_cast<const SourceRaster*>(&raster);
+    return source != nullptr ? source->PyramidURI() : URI();
   }
 
   /// Opens a pyramid; one of the library's own that isn't there, or is to be replaced, has no file

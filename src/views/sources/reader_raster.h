@@ -44,8 +44,7 @@ class ReaderRaster final : public ComputedRaster<T>, public SourceRaster {
 
   bool PyramidExists() const override;
   PyramidDef GetPyramidDef() const override;
-  /// The source that the pyramid was opened from; no text when it is the raster's own, or none.
-  lumo::URI PyramidURI() const {
+  lumo::URI PyramidURI() const override {
     return pyramidConnection_ ? pyramidConnection_->URI() : lumo::URI();
   }
   AsyncPtr PyramidBuild(const PyramidDef& def, const lumo::TileDimensions& tiles,

@@ -106,12 +106,12 @@ void MakeQuicklook(JobSession& session, const QuicklookRequest& request, const O
   ReadPixels(session, request.raster, request.bands, progress, picture);
   QuicklookPicture::Bytes bytes =
       request.palette ? picture.Draw(*request.palette) : picture.Draw(request.stretch);
-  if (request.outlines) {
+  for (const Outlines& outlines : request.outlines) {
     Array<unsigned> first{ArrayDims(1)};
     first[0] = 0;
-    QuicklookPicture labels(request.outlines->info, request.size, first);
-    ReadPixels(session, *request.outlines, first, progress, labels);
-    labels.DrawOutlines(bytes);
+    QuicklookPicture labels(outlines.labels.info, request.size, first);
+    ReadPixels(session, outlines.labels, first, progress, labels);
+    labels.DrawOutlines(outlines.colour, bytes);
   }
   if (request.legend.empty()) {
     return WritePicture(session, output, picture.GetWidth(), picture.GetHeight(), bytes);

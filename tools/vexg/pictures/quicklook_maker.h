@@ -1,6 +1,8 @@
 #pragma once
 
+#include <array>
 #include <optional>
+#include <vector>
 
 #include "pictures/quicklook_picture.h"
 
@@ -19,15 +21,21 @@ struct LegendRow {
   Color color;
 };
 
+/// Labels of the same size as a raster, whose borders are drawn over its picture.
+struct Outlines {
+  ShownRaster labels;
+  std::array<unsigned char, 3> colour{255, 255, 0};  ///< red, green, blue
+};
+
 /// The picture that QuicklookMaker makes of a raster.
 struct QuicklookRequest {
   ShownRaster raster;
   Array<unsigned> bands;  ///< one, or red, green and blue
   unsigned size = 1024;   ///< pixels of the longer side at most
   QuicklookPicture::Stretch stretch;
-  std::optional<Palette> palette;       ///< its colours, instead of the stretch, of one band
-  std::optional<ShownRaster> outlines;  ///< labels of the same size whose borders are drawn over it
-  std::vector<LegendRow> legend;        ///< drawn beside it
+  std::optional<Palette> palette;  ///< its colours, instead of the stretch, of one band
+  std::vector<Outlines> outlines;  ///< drawn over it, one after the other
+  std::vector<LegendRow> legend;   ///< drawn beside it
 };
 
 /// The bands shown: those that a text asks for, else red, green and blue where there are three or

@@ -202,7 +202,8 @@ QuicklookPicture::Bytes QuicklookPicture::Draw(const Palette& palette) const {
   return bytes;
 }
 
-void QuicklookPicture::DrawOutlines(Bytes& picture) const {
+void QuicklookPicture::DrawOutlines(const std::array<unsigned char, 3>& colour,
+                                    Bytes& picture) const {
   const bool isGrey = picture.channels < 3;
   const bool hasAlpha = picture.channels % 2 == 0;
   const std::size_t width = columns_.size(), height = lines_.size();
@@ -219,8 +220,7 @@ void QuicklookPicture::DrawOutlines(Bytes& picture) const {
       unsigned char* const to = &drawn.pixels[at * drawn.channels];
       const bool isLine =
           (x + 1 < width && differs(at, at + 1)) || (y + 1 < height && differs(at, at + width));
-      constexpr unsigned char kYellow[] = {255, 255, 0};
-      for (unsigned i = 0; i < 3; ++i) to[i] = isLine ? kYellow[i] : from[isGrey ? 0 : i];
+      for (unsigned i = 0; i < 3; ++i) to[i] = isLine ? colour[i] : from[isGrey ? 0 : i];
       if (hasAlpha) to[3] = isLine ? 255 : from[picture.channels - 1];
     }
   }

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <array>
 #include <vector>
 
 #include "foundation/color.h"
@@ -42,9 +43,9 @@ class QuicklookPicture {
   /// The picture in the colours of a table.
   Bytes Draw(const Palette& palette) const;
 
-  /// Draws lines, in yellow, over a picture of the same size: where the value of the first band
-  /// differs from that of the pixel on the right or below.
-  void DrawOutlines(Bytes& picture) const;
+  /// Draws lines over a picture of the same size: where the value of the first band differs from
+  /// that of the pixel on the right or below.
+  void DrawOutlines(const std::array<unsigned char, 3>& colour, Bytes& picture) const;
 
  private:
   bool IsShown(std::size_t pixel) const;

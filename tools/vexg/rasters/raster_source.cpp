@@ -66,6 +66,8 @@ std::string AbsoluteName(const std::string& file) {
 Array<String> ConnStringsOf(const SourceOptions& source) {
   std::vector<String> pieces;
   if (!source.format.empty()) pieces.emplace_back(FormatKey("--input-format", source.format));
+  const bool isMosaic = source.format.empty() && source.file.ends_with(".vmosaic");
+  if (isMosaic) pieces.emplace_back("EXTERNAL");  // which no other format need be asked for
   std::string rest = source.file;
   std::size_t bar = rest.find('|');
   pieces.emplace_back(AbsoluteName(rest.substr(0, bar)));

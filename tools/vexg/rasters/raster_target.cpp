@@ -36,6 +36,10 @@ bool HoldsAllPixels(const std::string& format) {
 void TargetOptions::AddTo(OptionSet& line, const std::string& meaning) {
   Option option = line.Add("output", output, meaning).IsFile("OUT");
   if (isRequired) option.Required();
+  AddFormatTo(line);
+}
+
+void TargetOptions::AddFormatTo(OptionSet& line) {
   line.Add("--format", format,
            "Key of its format, see vexg formats; by default from its name's ending")
       .Shows("KEY");

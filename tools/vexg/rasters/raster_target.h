@@ -18,6 +18,8 @@ struct TargetOptions {
 
   /// @param meaning  what the file is, for the help.
   void AddTo(OptionSet& line, const std::string& meaning);
+  /// Adds what is said of the file beside its name.
+  void AddFormatTo(OptionSet& line);
 };
 
 /// The key of the format to make. Throws HostError for none that is known.

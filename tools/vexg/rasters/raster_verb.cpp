@@ -17,6 +17,11 @@ void RasterVerb::AddOutputTo(OptionSet& line, const std::string& meaning) {
   AddOverwriteTo(line, "files that are there");
 }
 
+void RasterVerb::AddFormatTo(OptionSet& line) {
+  target_.AddFormatTo(line);
+  AddOverwriteTo(line, "files that are there");
+}
+
 void RasterVerb::AddSource(RasterChain& chain) const {
   AddOpen(chain.GetDraft(), "source", GetSource());
   chain.Take("source");

@@ -25,6 +25,9 @@ class RasterVerb : public FileVerb {
   void AddFilesTo(OptionSet& line, const std::string& meaning, bool isRequired = true);
   /// Adds the output alone.
   void AddOutputTo(OptionSet& line, const std::string& meaning);
+  /// Adds what is said of the output beside its name, which the verb sets.
+  void AddFormatTo(OptionSet& line);
+  void SetTargetName(const std::string& name) { target_.output = name; }
 
   // A verb says what is made:
 
@@ -97,9 +100,13 @@ class RasterVerb : public FileVerb {
   std::uint64_t GetBytes(std::size_t output) const override;
   void Make(JobSession& session, const Outputs& outputs) override;
 
+  // These are the steps of a verb that makes a raster; one that also makes other things overrides
+  // them for those alone.
+
+  void AddOpening(JobDraft& draft) const override;
+  void Plan(JobSession& session, const JobResults& opened) override;
+
  private:
-  void AddOpening(JobDraft& draft) const final;
-  void Plan(JobSession& session, const JobResults& opened) final;
   void MakeFurther(JobSession& session, const Outputs& outputs);
   JobDraft MakeDraft(const std::string& file, const FillValues& noData) const;
 

@@ -187,7 +187,7 @@ class AnalyzeVerb final {
     return ParseValue<Array<String>>(results.Find(step).returns.Find("Classes"));
   }
 
-  // What is done.
+  // The plan and its stages.
 
   /// Looks at the scene, and at what the recipe names.
   void Plan() {

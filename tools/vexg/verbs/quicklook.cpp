@@ -132,7 +132,7 @@ class QuicklookVerb final : public FileVerb {
         {shown_, info_, GetSource().file}, bands_, size_, stretch_, {}, {}, {}};
     if (hasPalette_) request.palette = ReadPalette(session, raster_, bands_[0]);
     if (hasLegend_) request.legend = ReadLegend(session, *request.palette);
-    if (!outlines_.empty()) request.outlines = OpenOutlines(session);
+    if (!outlines_.empty()) request.outlines.push_back({OpenOutlines(session), {255, 255, 0}});
     MakeQuicklook(session, request, outputs.Get(0), GetProgressStyle());
   }
 

@@ -245,7 +245,8 @@ class SegmentVerb final : public RasterVerb {
         bands_.GetCount() == 1 || bands_.GetCount() == 3 ? bandsText_ : std::string(),
         request.raster.info);
     request.size = kQuicklookSize;
-    request.outlines = {URIOf(opened, "$labels"), ReadInfo(opened, "labels"), GetTargetName()};
+    request.outlines.push_back(
+        {{URIOf(opened, "$labels"), ReadInfo(opened, "labels"), GetTargetName()}, {255, 255, 0}});
     const std::size_t last = GetOutputs().size() - 1;
     MakeQuicklook(session, request, outputs.Get(last), ProgressStyle::kNone);
   }

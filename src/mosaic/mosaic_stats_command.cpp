@@ -1,0 +1,36 @@
+#include "foundation/fault.h"
+#include "mosaic/mosaic_command.h"
+#include "mosaic/mosaic_matching.h"
+
+namespace lumo {
+namespace {
+
+constexpr unsigned kMostMode = 1;
+
+const CommandDeclaration kStats{
+    "MosaicStatsCommand",
+    "Mosaics",
+    "Makes the tables that match the colours of a mosaic's scenes to those of its reference scene.",
+    {{"MosaicURI", Presence::kRequired, ValueKind::kURI, "the mosaic, of one of eight types"},
+     {"Level", Presence::kRequired, ValueKind::kInteger,
+      "the pyramid level whose pixels are counted; 0, and one that there isn't, stand for the "
+      "mosaic itself"}},
+    {{"Success", ValueKind::kBoolean, "the tables were made"}}};
+
+class MosaicStatsCommand final : public MosaicCommand {
+  CommandResult Execute() override {
+    if (!CheckInputs()) return Fail();
+    return End(OnMosaic([&]<typename T>(const MosaicRasterPtr<T>& mosaic) {
+      if (mosaic->Definition()->ColourMatchMode() <= kMostMode) {
+        return MatchScenes(*mosaic->Definition(), GetIPC());
+      }
+      SetFault("MosaicURI: the mosaic has no colour match mode that is known");
+      return false;
+    }));
+  }
+};
+
+const CommandFactoryT<MosaicStatsCommand> factory(kStats);
+
+}  // namespace
+}  // namespace lumo
