@@ -33,9 +33,9 @@ struct QuicklookRequest {
   Array<unsigned> bands;  ///< one, or red, green and blue
   unsigned size = 1024;   ///< pixels of the longer side at most
   QuicklookPicture::Stretch stretch;
-  std::optional<Palette> palette;  ///< its colours, instead of the stretch, of one band
-  std::vector<Outlines> outlines;  ///< drawn over it, one after the other
-  std::vector<LegendRow> legend;   ///< drawn beside it
+  std::optional<Palette> palette;    ///< its colours, instead of the stretch, of one band
+  std::vector<Outlines> outlines{};  ///< drawn over it, one after the other
+  std::vector<LegendRow> legend{};   ///< drawn beside it
 };
 
 /// The bands shown: those that a text asks for, else red, green and blue where there are three or
