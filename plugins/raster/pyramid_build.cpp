@@ -6,6 +6,7 @@
 #include <map>
 
 #include "foundation/fault.h"
+#include "foundation/file_faults.h"
 #include "platform/file_moves.h"
 #include "platform/folder_lock.h"
 #include "platform/temporary_file.h"
@@ -63,8 +64,10 @@ std::shared_ptr<Build> Build::Begin(const std::string& path, const Header& heade
     return nullptr;
   }
   std::error_code ignored;
+  const FileFaults faults;
   if (std::filesystem::exists(path, ignored) && !IsPyramidFile(path)) {
-    build->Fail("is there, and no pyramid: it stays");
+    const FileFault* const unread = faults.FirstOf(path);
+    build->Fail(unread != nullptr ? unread->Text() : "is there, and no pyramid: it stays");
     return nullptr;
   }
   if (Find(path) != nullptr) {
@@ -109,6 +112,12 @@ bool Build::FailBy(const std::string& fault) {
   fault_ = fault.starts_with(temporary_) ? path_ + fault.substr(temporary_.size()) : fault;
   SetFault(fault_);
   return false;
+}
+
+void Build::GiveUp(const std::string& fault) {
+  const std::lock_guard lock(lock_);
+  isOver_ = true;
+  if (fault_.empty()) fault_ = fault;
 }
 
 bool Build::HasFailed() const {

@@ -72,7 +72,8 @@ class Build {
   bool IsOver() const { return isOver_; }
   /// True when it has ended without its place; sets the fault.
   bool HasFailed() const;
-  void GiveUp() { isOver_ = true; }
+  /// Ends the build. @param fault  why, for those who ask it later; empty for no fault.
+  void GiveUp(const std::string& fault = {});
 
  private:
   struct Packed;

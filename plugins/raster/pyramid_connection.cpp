@@ -180,7 +180,9 @@ bool Connection::Refresh(const std::string& values, bool getsStats) {
   if (std::filesystem::exists(PathShown(), ignored)) {
     const bool isShown = OpenFile();
     if (!isShown && IsPending()) {
-      build_->GiveUp();  // what can't be read again isn't given its place
+      const String fault = TakeFault();
+      build_->GiveUp(fault.ToUTF8());  // what can't be read again isn't given its place
+      SetFault(fault);
       LeaveBuild();
     }
     return isShown || hasTakenPlace;

@@ -89,7 +89,4 @@ nlohmann::ordered_json ParseJson(const std::string& text);
 /// Writes a JSON value with a field a line, and lists of plain values on one.
 std::string WriteJson(const nlohmann::ordered_json& json);
 
-/// The line, from 1, in which the field of a pointer stands; 1 where there is none.
-unsigned LineOfJson(const std::string& text, const std::string& pointer);
-
 }  // namespace lumo

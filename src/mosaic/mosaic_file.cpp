@@ -7,20 +7,19 @@
 #include <map>
 #include <mutex>
 #include <set>
-#include <thread>
 
 #include <fmt/format.h>
 
 #include "data/access_policy.h"
 #include "data/format_table.h"
 #include "foundation/fault.h"
+#include "foundation/json_lines.h"
 #include "foundation/near_name.h"
 #include "foundation/text_case.h"
 #include "georef/std_georef.h"
 #include "mosaic/json_fields_body.h"
 #include "mosaic/match_mode.h"
-#include "platform/folder_lock.h"
-#include "platform/owned_name.h"
+#include "mosaic/owner_file.h"
 #include "platform/random_access_file.h"
 #include "raster/pixel_types.h"
 
@@ -396,56 +395,6 @@ bool ReadText(const std::string& path, std::string& text, std::string& fault) {
   text.resize(size);
   return file->Read(0, text.data(), text.size(), &fault);
 }
-
-/// The file that names who changes a definition.
-class OwnerFile {
- public:
-  explicit OwnerFile(const std::string& path) : path_(path + ".lock") {}
-  ~OwnerFile() {
-    std::error_code ignored;
-    if (isOurs_) fs::remove(path_, ignored);
-  }
-  OwnerFile(const OwnerFile&) = delete;
-  OwnerFile& operator=(const OwnerFile&) = delete;
-
-  /// Waits until nobody else changes the definition, up to half a minute.
-  bool Take(std::string& fault) {
-    const auto end = std::chrono::steady_clock::now() + std::chrono::seconds(30);
-    for (;;) {
-      std::string owner;
-      if (!TryTake(owner, fault)) return false;
-      if (isOurs_) return true;
-      if (std::chrono::steady_clock::now() > end) {
-        fault = fmt::format("{}: held by {}", path_, Printable(owner, 80));
-        return false;
-      }
-      std::this_thread::sleep_for(std::chrono::milliseconds(20));
-    }
-  }
-
- private:
-  /// Takes the file unless a process that runs has it.
-  bool TryTake(std::string& owner, std::string& fault) {
-    const platform::FolderLock folder(path_);
-    if (!folder.IsHeld(&fault)) return false;
-    std::error_code missing;
-    if (fs::exists(path_, missing)) {
-      std::string ignored;
-      if (!ReadText(path_, owner, ignored)) owner.clear();
-      // One that is empty, or has no mark, was cut off: its writer held the folder too.
-      const std::size_t dot = owner.find('.');
-      const bool isMarked = dot != owner.npos && platform::OwnerMarkLength(owner.substr(dot)) != 0;
-      const bool isHeld = isMarked && !platform::IsAbandoned(owner) && !platform::IsOwned(owner);
-      if (isHeld) return true;
-      fs::remove(path_, missing);
-    }
-    isOurs_ = platform::WriteNewFile(path_, platform::OwnedName("vexg"), &fault);
-    return isOurs_;
-  }
-
-  const std::string path_;
-  bool isOurs_ = false;
-};
 
 }  // namespace
 

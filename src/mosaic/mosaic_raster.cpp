@@ -1,4 +1,4 @@
-#include "mosaic/mosaic_raster_body.h"
+#include "mosaic/mosaic_pixels_body.h"
 
 namespace lumo {
 

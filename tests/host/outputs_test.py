@@ -14,7 +14,8 @@ import sys
 import time
 import unittest
 
-from support import BUILD, SANITIZED, SOURCE, VEXG, FolderTest, PipeTest, needs_gdal, run, start, write_orva
+from support import (BUILD, SANITIZED, SOURCE, VEXG, FolderTest, PipeTest, gdal_pixels, needs_gdal, run, start,
+                     write_orva)
 
 SIDES = [".hdr", ".aux.xml", ".ovr", ".msk"]
 GAINS = ["--gain", "1", "--offset", "0"]
@@ -64,6 +65,20 @@ class OutputTest(FolderTest):
 
     def made(self):
         return sorted(path.name for path in self.output.iterdir())
+
+
+@needs_gdal
+class OpenAtTheEnd(FolderTest):
+    """What a job has made and not closed is finished with it, or given up where it failed."""
+
+    def test_a_job_that_closes_nothing(self):
+        write_orva(self.folder / "in.dat", 4, 3, 1, bytes(range(12)))
+        job = self.fine("copy", self.folder / "in.dat", self.folder / "out.tif", "--print-job")
+        job = re.sub(r'<Command ID="CloseRasterCommand".*?</Command>', "", job, flags=re.DOTALL)
+        self.assertEqual(run("run", "-", stdin=job.replace("CopyRasterCommand", "CopyNothing"))[0], 1)
+        self.assertEqual({p.name for p in self.folder.iterdir()}, {"in.dat", "in.dat.hdr"})
+        self.assertEqual(run("run", "-", stdin=job)[0], 0)
+        self.assertEqual(gdal_pixels(self.folder / "out.tif"), bytes(range(12)))
 
 
 class Places(OutputTest):

@@ -5,88 +5,22 @@
 
 #include <fmt/format.h>
 
+#include "foundation/json_lines.h"
 #include "foundation/near_name.h"
 #include "jobs/document.h"
 #include "verb.h"
 
 namespace lumo::host {
-namespace {
-
-std::size_t LineOf(const std::string& text, std::size_t at) {
-  const auto end = text.begin() + static_cast<std::ptrdiff_t>(std::min(at, text.size()));
-  return 1 + static_cast<std::size_t>(std::count(text.begin(), end, '\n'));
-}
-
-/// Walks over a text that is known to be JSON.
-class Walker {
- public:
-  explicit Walker(const std::string& text) : text_(text) {}
-
-  std::size_t At() const { return at_; }
-  char Peek() {
-    at_ = std::min(text_.find_first_not_of(" \t\r\n,:", at_), text_.size());
-    return at_ < text_.size() ? text_[at_] : '\0';
-  }
-  void Enter() { ++at_; }
-  std::string TakeString() {
-    const std::size_t begin = at_;
-    SkipString();
-    return Json::parse(text_.substr(begin, at_ - begin)).get<std::string>();
-  }
-  void SkipValue() {
-    int depth = 0;
-    do {
-      const char c = Peek();
-      if (c == '\0') return;
-      if (c == '"') {
-        SkipString();
-      } else if (c == '{' || c == '[') {
-        ++depth, ++at_;
-      } else if (c == '}' || c == ']') {
-        --depth, ++at_;
-      } else {
-        at_ = std::min(text_.find_first_of(" \t\r\n,:]}", at_), text_.size());
-      }
-    } while (depth > 0);
-  }
-
- private:
-  void SkipString() {
-    for (++at_; at_ < text_.size() && text_[at_] != '"'; ++at_) at_ += text_[at_] == '\\' ? 1 : 0;
-    ++at_;
-  }
-
-  const std::string& text_;
-  std::size_t at_ = 0;
-};
-
-}  // namespace
-
 JsonField JsonField::Below(const Json& json, Step step) const {
   std::vector<Step> steps = steps_;
   steps.push_back(std::move(step));
   return {source_, json, std::move(steps)};
 }
 
-/// The line in which the part begins.
-std::size_t JsonField::FindLine() const {
-  Walker walker(source_->text);
-  for (const Step& step : steps_) {
-    walker.Peek();
-    walker.Enter();
-    for (std::size_t i = 0; walker.Peek() != '\0'; ++i) {
-      const bool isIt = step.isIndex ? i == step.index : walker.TakeString() == step.name;
-      if (isIt) break;
-      walker.SkipValue();
-    }
-  }
-  walker.Peek();
-  return LineOf(source_->text, walker.At());
-}
-
 std::string JsonField::Where() const {
-  std::string path;
+  std::string path, pointer;
   for (const Step& step : steps_) {
+    pointer += fmt::format("/{}", step.isIndex ? std::to_string(step.index) : step.name);
     if (step.isIndex) {
       path += fmt::format("[{}]", step.index);
     } else {
@@ -94,7 +28,8 @@ std::string JsonField::Where() const {
       path += Printable(step.name);
     }
   }
-  return fmt::format("{}: line {}{}{}", source_->name, FindLine(), path.empty() ? "" : ": ", path);
+  return fmt::format("{}: line {}{}{}", source_->name, LineOfJson(source_->text, pointer),
+                     path.empty() ? "" : ": ", path);
 }
 
 void JsonField::Refuse(const std::string& why) const {
@@ -185,9 +120,9 @@ JsonFile::JsonFile(const std::string& file) {
   source->text = ReadFile(file);
   try {
     source->json = Json::parse(source->text);
-  } catch (const nlohmann::json::parse_error& error) {
+  } catch (const nlohmann::json::parse_error&) {
     throw HostError(kExitUsage,
-                    fmt::format("{}: line {} is no JSON", file, LineOf(source->text, error.byte)));
+                    fmt::format("{}: line {} is no JSON", file, LineOfJson(source->text, "")));
   }
   source_ = source;
 }

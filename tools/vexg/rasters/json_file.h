@@ -73,7 +73,6 @@ class JsonField {
   JsonField(std::shared_ptr<const Source> source, const Json& json, std::vector<Step> steps)
       : source_(std::move(source)), json_(&json), steps_(std::move(steps)) {}
   JsonField Below(const Json& json, Step step) const;
-  std::size_t FindLine() const;
 
   std::shared_ptr<const Source> source_;
   const Json* json_;  // in the source

@@ -29,16 +29,18 @@ int RunJobFile(const JobOptions& options) {
     const platform::InterruptWatch interrupts([&] { abort->Set(true); }, output.IsStandardOutput());
     ProgressView view(job.GetIPC().progress, ChooseProgressStyle(options.progress, options.quiet));
     RunJob(job);
-    if (abort->IsSet()) {
-      const AbandonScope abandonment;  // of files that aren't whole
-      catalog::Empty();
-    }
     result = JobResultWriter(job).Write();
     outcome = OutcomeOf(result, abort->IsSet());
+    const AbandonScope abandonment(outcome != Outcome::kDone);  // of files that aren't whole
+    for (const String& fault : catalog::Empty()) {
+      Say(fault.ToUTF8());
+      if (outcome == Outcome::kDone) outcome = Outcome::kFailed;
+    }
     view.SetOutcome(outcome);
   }
   WriteResult(document, result, options.json, output);
-  return ExitCodeAfter(outcome, ExitCodeOf(document, result));
+  const int code = ExitCodeAfter(outcome, ExitCodeOf(document, result));
+  return outcome == Outcome::kFailed && code == kExitSuccess ? kExitFailed : code;
 }
 
 const VerbRegistration registration(
