@@ -264,7 +264,7 @@ bool IsAFarther(const Shape& shape, const Outline& a, const Outline& b) {
       probes = {shape.c, shape.d};
       break;
     default:
-      probes = {shape.b, middle(shape.a, shape.b), middle(shape.c, shape.b)};
+      probes = {shape.b, middle(shape.a, shape.b), middle(shape.c, shape.d)};
   }
   double fromA = 0, fromB = 0;
   for (const Point& probe : probes) {

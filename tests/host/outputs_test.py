@@ -321,6 +321,7 @@ class Interrupts(PipeTest, OutputTest):
         moments = random.Random(seed)
         shared = set(os.listdir("/dev/shm")) if os.path.isdir("/dev/shm") else set()
         for line, names in self.cases():
+            self.clear()  # the one before may have come through
             began = time.monotonic()
             code, _, err = run(*line)
             whole = time.monotonic() - began
