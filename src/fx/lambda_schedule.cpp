@@ -13,6 +13,7 @@ void LambdaSchedule::Begin(std::uint32_t labelCount, std::uint32_t bands) {
   bands_ = bands;
   regions_.assign(labelCount, {});
   means_.assign(std::size_t{labelCount} * bands, 0.0);
+  ranks_.clear();
   pairs_.clear();
   queue_ = {};
   pairTo_.assign(labelCount, kNone);
@@ -75,15 +76,15 @@ void LambdaSchedule::Choose(std::uint32_t region, std::uint32_t pair) {
 }
 
 void LambdaSchedule::FindNearest(std::uint32_t region) {
-  std::uint32_t best = kNone, bestLabel = 0;
+  std::uint32_t best = kNone, bestRank = 0;
   double bestCost = kCostLimit;
   ForEachPair(region, [&](std::uint32_t pair) {
     const double cost = pairs_[pair].cost;
     if (!(cost <= bestCost)) return;  // nor is a cost that is no number ever the least
-    const std::uint32_t label = pairs_[pair].Other(region);
-    if (cost == bestCost && (best == kNone || label > bestLabel)) return;
+    const std::uint32_t rank = RankOf(pairs_[pair].Other(region));
+    if (cost == bestCost && (best == kNone || rank > bestRank)) return;
     best = pair;
-    bestLabel = label;
+    bestRank = rank;
     bestCost = cost;
   });
   if (best != kNone) {
@@ -145,11 +146,6 @@ void LambdaSchedule::TakeOverPairs(std::uint32_t lower, std::uint32_t higher) {
 void LambdaSchedule::Relabel(std::uint32_t pair, std::uint32_t from, std::uint32_t to) {
   Pair& moved = pairs_[pair];
   moved.ids[moved.SlotOf(from)] = to;
-  if (moved.ids[0] > moved.ids[1]) {
-    std::swap(moved.ids[0], moved.ids[1]);
-    std::swap(moved.next[0], moved.next[1]);
-    std::swap(moved.previous[0], moved.previous[1]);
-  }
   Link(pair, to);
 }
 
@@ -186,7 +182,8 @@ bool LambdaSchedule::Step(Merge& merge) {
   queue_.pop();
   Pair& merged = pairs_[top.pair];
   merged.isQueued = false;
-  const std::uint32_t lower = merged.ids[0], higher = merged.ids[1];
+  std::uint32_t lower = merged.ids[0], higher = merged.ids[1];
+  if (RankOf(lower) > RankOf(higher)) std::swap(lower, higher);
   merge = {top.cost, lower, higher};
   Unlink(top.pair, lower);
   Unlink(top.pair, higher);

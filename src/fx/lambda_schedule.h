@@ -40,6 +40,10 @@ class VEXG_EXPORT LambdaSchedule {
   /// Forgets everything, and makes room for labels below `labelCount`, of `bands` bands.
   void Begin(std::uint32_t labelCount, std::uint32_t bands);
 
+  /// Takes numbers by which labels are compared, where not by their own: the lower of a pair is the
+  /// one with the lower number. Behind Begin. @param ranks  by label, all different.
+  void CompareBy(std::vector<std::uint32_t>&& ranks) { ranks_ = std::move(ranks); }
+
   /// Adds a pixel to its segment.
   /// @param label   not 0.
   /// @param values  one for each band.
@@ -69,7 +73,7 @@ class VEXG_EXPORT LambdaSchedule {
 
   /// A pair stands in the lists of both of its regions; slot i of the links belongs to ids[i].
   struct Pair {
-    std::uint32_t ids[2] = {};  // lower label first
+    std::uint32_t ids[2] = {};
     std::uint32_t next[2] = {};
     std::uint32_t previous[2] = {};
     double cost = 0;
@@ -95,6 +99,7 @@ class VEXG_EXPORT LambdaSchedule {
     const Pair& pair = pairs_[entry.pair];
     return pair.isQueued && pair.cost == entry.cost;
   }
+  std::uint32_t RankOf(std::uint32_t label) const { return ranks_.empty() ? label : ranks_[label]; }
   template <typename Visit>
   void ForEachPair(std::uint32_t region, Visit&& visit);
   void Link(std::uint32_t pair, std::uint32_t region);
@@ -109,8 +114,9 @@ class VEXG_EXPORT LambdaSchedule {
                      std::uint32_t higher);
 
   std::uint32_t bands_ = 0;
-  std::vector<Region> regions_;  // by label
-  std::vector<double> means_;    // by label, then band
+  std::vector<Region> regions_;       // by label
+  std::vector<double> means_;         // by label, then band
+  std::vector<std::uint32_t> ranks_;  // by label; empty: they compare as they are
   std::vector<Pair> pairs_;
   std::priority_queue<Queued> queue_;
   std::vector<std::uint32_t> pairTo_;  // by label: the pair of the region that is merged into

@@ -26,6 +26,10 @@ struct SegmentRequest {
   bool bordersOnly = false;          ///< an image of the borders instead of labels
   unsigned tileBytes = kTileBudget;  ///< of the band values of a tile
   unsigned tileBorder = 1;           ///< overlap on each side
+  bool isRigorous = false;           ///< merging without tiles: by RigorousMerge
+  std::uint64_t memory = kNoLimit;   ///< bytes for the segments and their neighbours, without tiles
+
+  static constexpr std::uint64_t kNoLimit = 0xFFFFFFFFFFFFFFFF;
 };
 
 /// The grid of tiles that a raster is cut into.
