@@ -111,7 +111,7 @@ def speed(bench):
     """1000 x 1000 and 4000 x 4000 pixels of 6 bands; whole commands, with reading and writing."""
     scene, _ = fields(bench, 1000)
     labels, theirs = bench.work / "labels-of-fields.tif", bench.work / "their-labels.tif"
-    ours = [bench.vexg, "segment", scene, labels, "--tiled", "-q"]
+    ours = [bench.vexg, "segment", scene, labels, "-q"]
     bench.compare("watershed 1000 x 1000 x 6", ours, {
         "scikit-image": python(WATERSHED, scene, theirs),
         "Orfeo ToolBox": ["otbcli_Segmentation", "-in", scene, "-filter", "watershed", "-mode", "raster",
@@ -164,7 +164,7 @@ def quality(bench):
     """Made fields of three contrasts; each program at the best of five settings, by the Rand index."""
     out = bench.work / "found.tif"
     programs = {
-        "vexg": lambda scene, k: [bench.vexg, "segment", scene, out, "--tiled", "-q", "--merge-value",
+        "vexg": lambda scene, k: [bench.vexg, "segment", scene, out, "-q", "--merge-value",
                                   (200, 400, 800, 1600, 6400)[k]],
         "OTB watershed": lambda scene, k: [
             "otbcli_Segmentation", "-in", scene, "-filter", "watershed", "-filter.watershed.threshold", "0.01",
