@@ -13,10 +13,9 @@ std::uint64_t MemoryOfMerging(std::uint64_t basins, unsigned bands, bool isRigor
 }
 
 String MemoryFault(std::uint64_t basins, std::uint64_t needed, std::uint64_t allowed) {
-  constexpr std::uint64_t kMebi = 1U << 20U;
   return String("merging " + std::to_string(basins) + " segments needs up to " +
-                std::to_string((needed + kMebi - 1) / kMebi) + " MiB of memory, and may take " +
-                std::to_string(allowed / kMebi) + "; a higher SegmentValue makes fewer");
+                std::to_string(needed) + " bytes of memory, and may take " +
+                std::to_string(allowed) + "; a higher SegmentValue makes fewer");
 }
 
 unsigned SeamlessStripBytes(const BasicRaster& raster, std::size_t elementBytes) {

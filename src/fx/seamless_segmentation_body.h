@@ -99,7 +99,8 @@ template <typename T>
 bool SeamlessSegmentation<T>::Run() {
   if (!FindBasins()) return false;
   if (IsAborted()) return true;
-  if (request_.mergeValue > 0 && watershed_.Count() > 0 && !Merge()) return false;
+  const bool merges = request_.mergeValue > 0 || request_.leastPixels > 1;
+  if (merges && watershed_.Count() > 0 && !Merge()) return false;
   return IsAborted() || Write();
 }
 
@@ -187,6 +188,7 @@ bool SeamlessSegmentation<T>::MergeBySchedule() {
   const std::uint32_t count = watershed_.Count();
   LambdaSchedule schedule;
   schedule.Begin(count + 1, merge_->Bands());
+  schedule.Limit(request_.growth);
   schedule.CompareBy(watershed_.TakeRanks());
   {
     LabelPairs pairs;
@@ -199,7 +201,8 @@ bool SeamlessSegmentation<T>::MergeBySchedule() {
   std::iota(roots_.begin(), roots_.end(), 0U);
   const IPC pass = NextPass();
   LambdaSchedule::Merge merge;
-  for (std::uint32_t step = 0; schedule.Step(merge); ++step) {
+  const bool doesSteps = request_.mergeValue > 0;
+  for (std::uint32_t step = 0; doesSteps && schedule.Step(merge); ++step) {
     roots_[merge.higher] = merge.lower;
     if (merge.lambda > request_.mergeValue) break;
     constexpr std::uint32_t kEvery = 4096;
@@ -207,6 +210,8 @@ bool SeamlessSegmentation<T>::MergeBySchedule() {
     if (IsAborted()) return true;
     pass.progress->Update(static_cast<double>(step) / count);
   }
+  schedule.JoinSmall(request_.leastPixels,
+                     [this](const auto& join) { roots_[join.higher] = join.lower; });
   for (std::uint32_t label = 1; label <= count; ++label) {
     std::uint32_t root = label;
     while (roots_[root] != root) root = roots_[root] = roots_[roots_[root]];

@@ -84,7 +84,16 @@ const CommandDeclaration kSegmentMerge{
       "there is no TileBorderSize; false when absent"},
      {"Memory", Presence::kOptional, ValueKind::kInteger,
       "bytes that merging may take when Seamless is true: it fails before merging when it needs "
-      "more; half the machine's when absent"}},
+      "more; half the machine's when absent"},
+     {"MinSize", Presence::kOptional, ValueKind::kInteger,
+      "with Seamless and MergeAlgorithm 1: segments of fewer pixels join at the end the neighbour "
+      "that costs least, the smallest first; 0 when absent"},
+     {"MaxSize", Presence::kOptional, ValueKind::kInteger,
+      "with Seamless and MergeAlgorithm 1: segments that have more pixels together are not merged, "
+      "except by MinSize; none when absent"},
+     {"Compactness", Presence::kOptional, ValueKind::kNumber,
+      "with Seamless and MergeAlgorithm 1: costs are divided by the length of the common border to "
+      "the power of this besides, 0 to 10; 0 when absent"}},
     {{"LambdaHistogram", ValueKind::kIntegerArray,
       "cumulative counts of the costs of all merges, in 10000 bins from 0 on"},
      {"LambdaBinSize", ValueKind::kNumber, "width of these bins"}}};
@@ -148,7 +157,30 @@ class FxTileSegmentMergeCommand final : public SegmentCommand {
     request.bordersOnly = Read<int>("SegmentBorder") == 1;
     isSeamless_ = Read<bool>("Seamless");
     request.isRigorous = isRigorous_;
-    return ReadMemory(segment, request) && ReadTiles(segment, request);
+    return ReadGrowth(request) && ReadMemory(segment, request) && ReadTiles(segment, request);
+  }
+
+  bool ReadGrowth(SegmentRequest& request) {
+    const bool isGiven = HasInput("MinSize") || HasInput("MaxSize") || HasInput("Compactness");
+    if (!isGiven) return true;
+    const auto refuse = [](const char* fault) {
+      SetFault(fault);
+      return false;
+    };
+    if (!isSeamless_ || isRigorous_) {
+      return refuse("MinSize, MaxSize and Compactness go with Seamless and MergeAlgorithm 1");
+    }
+    const auto least = Read<std::int64_t>("MinSize"), most = Read<std::int64_t>("MaxSize");
+    if (least < 0) return refuse("MinSize: 0 pixels or more");
+    if (HasInput("MaxSize") && most < 1) return refuse("MaxSize: 1 pixel or more");
+    constexpr double kMostCompact = 10;
+    request.growth.compactness = Read<double>("Compactness");
+    if (!(request.growth.compactness >= 0 && request.growth.compactness <= kMostCompact)) {
+      return refuse("Compactness: 0 to 10");
+    }
+    request.leastPixels = static_cast<double>(least);
+    if (HasInput("MaxSize")) request.growth.mostPixels = static_cast<double>(most);
+    return true;
   }
 
   bool ReadMemory(const BasicRaster& segment, SegmentRequest& request) {

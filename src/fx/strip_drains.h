@@ -103,9 +103,12 @@ class VEXG_EXPORT StripDrains {
   /// Calls `visit(neighbour, direction)` for the neighbours in the strip on the same level.
   template <typename Visit>
   void ForEachSame(std::uint32_t pixel, Visit&& visit) const {
-    for (unsigned direction = 0; direction < 4; ++direction) {
-      if ((cells_[pixel] & SameBit(direction)) == 0 || !IsInside(pixel, direction)) continue;
-      visit(static_cast<std::uint32_t>(pixel + StepTo(direction)), direction);
+    const Cell cell = cells_[pixel];
+    if ((cell & SameBit(kUp)) != 0 && pixel >= width_) visit(pixel - width_, kUp);
+    if ((cell & SameBit(kLeft)) != 0) visit(pixel - 1, kLeft);
+    if ((cell & SameBit(kRight)) != 0) visit(pixel + 1, kRight);
+    if ((cell & SameBit(kDown)) != 0 && pixel + width_ < cells_.size()) {
+      visit(pixel + width_, kDown);
     }
   }
   void Reach(std::uint32_t pixel, Cell way);

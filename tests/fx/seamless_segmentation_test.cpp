@@ -195,7 +195,7 @@ TEST(SeamlessSegmentation, SaysWhatMergingNeedsBeforeAnythingIsWritten) {
   request.mergeValue = 10;
   request.memory = 1000;
   EXPECT_FALSE(SeamlessSegmentation<std::uint8_t>(scene, scene, labels, request).Run());
-  EXPECT_THAT(TakeFault().ToUTF8(), testing::HasSubstr("MiB of memory"));
+  EXPECT_THAT(TakeFault().ToUTF8(), testing::HasSubstr("bytes of memory, and may take 1000"));
   EXPECT_EQ(labels->pixels, Labels(3600, 0));
   request.mergeValue = 0;  // no graph is made
   EXPECT_TRUE(SeamlessSegmentation<std::uint8_t>(scene, scene, labels, request).Run());

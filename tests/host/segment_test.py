@@ -191,6 +191,28 @@ class SegmentTest(FolderTest):
             with self.subTest(path.name, **arguments):
                 self.assertEqual(got, labels)
 
+    def test_limits_of_growth_beside_the_plain_form(self):
+        chance, runs, wanted = random.Random(11), [], []
+        for number in range(30):
+            path, image, invalid = self.make_image(f"image{number}.dat", chance, chance.choice(["Byte", "Single"]), 2)
+            limits = chance.choice([{"MinSize": 5}, {"MaxSize": 20}, {"Compactness": 0.7},
+                                    {"MinSize": 12, "MaxSize": 30, "Compactness": 2}])
+            arguments = {"SegmentAlgorithm": 2, "SegmentValue": 0, "MinGradient": 0, "MaxGradient": 200, "StretchValue": 200,
+                         "MergeValue": chance.choice([0, 5, 1000, 1e9]), "LambdaEstimate": False, "Seamless": True,
+                         "TileMemorySize": 100, **limits}
+            runs.append((path, arguments))
+            width, height, values = image.width, image.height, image.intensity()[0]
+            out = [hole for row in invalid for hole in row]
+            labels, _ = peer.flood([peer.cut(v / 200 * 200) for row in values for v in row], out, width, height)
+            pairs = peer.adjacency(labels, out, width, height, width, height, False)
+            bands = [[float(v) for row in band for v in row] for band in image.bands]
+            labels = peer.merge_schedule(bands, labels, pairs, arguments["MergeValue"], **limits)
+            numbers = {0: 0}
+            wanted.append([numbers.setdefault(label, len(numbers)) for label in labels])
+        for (path, arguments), got, labels in zip(runs, self.segment_all(runs), wanted):
+            with self.subTest(path.name, **arguments):
+                self.assertEqual(got, labels)
+
     def test_estimate_gathers_the_costs_of_all_tiles(self):
         chance = random.Random(3)
         width = height = 24
@@ -338,7 +360,7 @@ class SegmentTest(FolderTest):
         self.fails(2, "is there already", "segment", scene, labels, "--format", "ORVA")
         self.fails(2, "--tile-border goes with --tiled", "segment", scene, labels, "--tile-border", 3)
         self.fails(2, "--memory goes without --tiled", "segment", scene, labels, "--memory", 3, "--tiled")
-        self.fails(1, "MiB of memory", "segment", scene, self.folder / "new.dat", "--format", "ORVA", "--merge-value", 9,
+        self.fails(1, "bytes of memory", "segment", scene, self.folder / "new.dat", "--format", "ORVA", "--merge-value", 9,
                    "--memory", 100)
         self.assertFalse((self.folder / "new.dat").exists())
 

@@ -15,9 +15,11 @@ struct SegmentRequest {
   std::optional<unsigned> tileMemory;  ///< bytes
   std::optional<unsigned> tileBorder;  ///< pixels, with tiles; 10 when not given
   std::uint64_t memory = 0;            ///< bytes for merging, without tiles; 0 for those by default
-  bool isTiled = false;                ///< tile by tile, and not as a whole
-  bool isBorders = false;              ///< an image of the borders is made instead
-  bool isEstimate = false;             ///< costs are counted, and nothing made
+  std::optional<unsigned> minSize, maxSize;  ///< pixels, without tiles
+  std::optional<double> compactness;         ///< a power of border lengths, without tiles
+  bool isTiled = false;                      ///< tile by tile, and not as a whole
+  bool isBorders = false;                    ///< an image of the borders is made instead
+  bool isEstimate = false;                   ///< costs are counted, and nothing made
 
   /// Throws HostError for percentages out of bounds, for a value beside a percentage, and for what
   /// goes with tiles alone or without them.

@@ -95,6 +95,18 @@ class SegmentVerb final : public RasterVerb {
              "A raster of the same size and pixel type whose bands drive merging, instead of "
              "INPUT's")
         .IsFile();
+    line.Add("--min-size", request_.minSize,
+             "Smaller segments join at the end the neighbour that costs least, the smallest first")
+        .Shows("PIXELS");
+    line.Add("--max-size", request_.maxSize,
+             "Segments that have more pixels together are not merged, except by --min-size")
+        .Shows("PIXELS")
+        .Within(1, 4294967295U);
+    line.Add("--compactness", request_.compactness,
+             "Costs are divided by the length of the common border to this power besides, 0 to 10; "
+             "0 "
+             "by default")
+        .Shows("W");
     line.Add("--tile-memory", request_.tileMemory,
              "Bytes of the pixels of a tile, or of the strips in which a whole raster is read; "
              "8388608 by default")
