@@ -131,7 +131,23 @@ def speed(bench):
                           for _ in range(bench.options.runs) if labels.unlink(missing_ok=True) is None)
              for threads in (1, 2)}
     print(f"{times[1] / times[2]:.2f} times one")
+    tiled = [*swap, "--tiled"]
+    bench.compare("as a whole, 4000 x 4000 x 6", swap, {"in tiles": tiled}, clean=[labels])
+    huge, _ = fields(bench, 10000)
+    bench.compare("as a whole, 10,000 x 10,000 x 6", [huge if word == large else word for word in swap],
+                  {"in tiles": [huge if word == large else word for word in tiled]}, clean=[labels])
     labels.unlink(missing_ok=True)
+
+
+def seams(bench):
+    """The faint fields in tiles of 50 x 50 pixels that overlap by one, beside the same as a whole."""
+    scene, _ = fields(bench, 300, "faint", 90, 140, 12)
+    files = [bench.work / "in-tiles.tif", bench.work / "as-a-whole.tif"]
+    for file, options in zip(files, (["--tiled", "--tile-border", "1", "--tile-memory", str(50 * 50 * BANDS)], [])):
+        file.unlink(missing_ok=True)
+        subprocess.run([str(bench.vexg), "segment", str(scene), str(file), "-q", "--merge-value", "800", *options], check=True)
+    draw(scene, files, bench.work / "seams.png")
+    print(f"{bench.work / 'seams.png'}: tiles that overlap by one pixel, and the whole")
 
 
 def judge(labels_file, truth_file):
@@ -196,6 +212,7 @@ def quality(bench):
     known = [truth, *(bench.work / f"best-{program.replace(' ', '-')}.tif" for program in programs)]
     draw(scene, known, bench.work / "segments.png")
     print(f"{bench.work / 'segments.png'}: the faint fields, those that are known first")
+    seams(bench)
 
 
 def draw(scene, labels, picture):

@@ -156,7 +156,7 @@ bool SeamlessSegmentation<T>::Gather(Graph& graph, LabelPairs& pairs) {
         if (!watershed_.Label(strip, made.labels.data())) return false;
         if (abort != nullptr && abort->IsSet()) return false;
         const auto found = scratch.Borrow();
-        found->Begin(0);
+        found->Begin(watershed_.Count() / watershed_.Strips() + 1);
         detail::ForEachStripEdge(made.labels, width, watershed_.LabelsBelow(strip),
                                  [&](std::uint32_t a, std::uint32_t b) { found->AddEdge(a, b); });
         made.pairs = found->Pairs();
