@@ -111,7 +111,7 @@ def speed(bench):
     """1000 x 1000 and 4000 x 4000 pixels of 6 bands; whole commands, with reading and writing."""
     scene, _ = fields(bench, 1000)
     labels, theirs = bench.work / "labels-of-fields.tif", bench.work / "their-labels.tif"
-    ours = [bench.vexg, "segment", scene, labels, "--tiled", "-q"]
+    ours = [bench.vexg, "segment", scene, labels, "-q"]
     bench.compare("watershed 1000 x 1000 x 6", ours, {
         "scikit-image": python(WATERSHED, scene, theirs),
         "Orfeo ToolBox": ["otbcli_Segmentation", "-in", scene, "-filter", "watershed", "-mode", "raster",
@@ -131,7 +131,23 @@ def speed(bench):
                           for _ in range(bench.options.runs) if labels.unlink(missing_ok=True) is None)
              for threads in (1, 2)}
     print(f"{times[1] / times[2]:.2f} times one")
+    tiled = [*swap, "--tiled"]
+    bench.compare("as a whole, 4000 x 4000 x 6", swap, {"in tiles": tiled}, clean=[labels])
+    huge, _ = fields(bench, 10000)
+    bench.compare("as a whole, 10,000 x 10,000 x 6", [huge if word == large else word for word in swap],
+                  {"in tiles": [huge if word == large else word for word in tiled]}, clean=[labels])
     labels.unlink(missing_ok=True)
+
+
+def seams(bench):
+    """The faint fields in tiles of 50 x 50 pixels that overlap by one, beside the same as a whole."""
+    scene, _ = fields(bench, 300, "faint", 90, 140, 12)
+    files = [bench.work / "in-tiles.tif", bench.work / "as-a-whole.tif"]
+    for file, options in zip(files, (["--tiled", "--tile-border", "1", "--tile-memory", str(50 * 50 * BANDS)], [])):
+        file.unlink(missing_ok=True)
+        subprocess.run([str(bench.vexg), "segment", str(scene), str(file), "-q", "--merge-value", "800", *options], check=True)
+    draw(scene, files, bench.work / "seams.png")
+    print(f"{bench.work / 'seams.png'}: tiles that overlap by one pixel, and the whole")
 
 
 def judge(labels_file, truth_file):
@@ -164,7 +180,7 @@ def quality(bench):
     """Made fields of three contrasts; each program at the best of five settings, by the Rand index."""
     out = bench.work / "found.tif"
     programs = {
-        "vexg": lambda scene, k: [bench.vexg, "segment", scene, out, "--tiled", "-q", "--merge-value",
+        "vexg": lambda scene, k: [bench.vexg, "segment", scene, out, "-q", "--merge-value",
                                   (200, 400, 800, 1600, 6400)[k]],
         "OTB watershed": lambda scene, k: [
             "otbcli_Segmentation", "-in", scene, "-filter", "watershed", "-filter.watershed.threshold", "0.01",
@@ -196,6 +212,7 @@ def quality(bench):
     known = [truth, *(bench.work / f"best-{program.replace(' ', '-')}.tif" for program in programs)]
     draw(scene, known, bench.work / "segments.png")
     print(f"{bench.work / 'segments.png'}: the faint fields, those that are known first")
+    seams(bench)
 
 
 def draw(scene, labels, picture):

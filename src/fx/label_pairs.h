@@ -38,6 +38,17 @@ class VEXG_EXPORT LabelPairs {
     ++pairs_[lastPair_].length;
   }
 
+  /// Counts `length` edges between two labels that differ, in any order.
+  void AddEdges(std::uint32_t a, std::uint32_t b, std::uint32_t length) {
+    pairs_[FindOrAdd(a < b ? KeyOf(a, b) : KeyOf(b, a))].length += length;
+  }
+
+  /// Frees what is needed to add more, and gives the pairs.
+  std::vector<LabelPair> TakePairs() {
+    table_ = {};
+    return std::move(pairs_);
+  }
+
   /// The pairs so far; the reference is good until the next edge.
   const std::vector<LabelPair>& Pairs() const { return pairs_; }
 

@@ -1,6 +1,7 @@
 #include "fx/lambda_schedule.h"
 
 #include <algorithm>
+#include <cmath>
 
 namespace lumo {
 namespace {
@@ -13,6 +14,8 @@ void LambdaSchedule::Begin(std::uint32_t labelCount, std::uint32_t bands) {
   bands_ = bands;
   regions_.assign(labelCount, {});
   means_.assign(std::size_t{labelCount} * bands, 0.0);
+  limits_ = {};
+  ranks_.clear();
   pairs_.clear();
   queue_ = {};
   pairTo_.assign(labelCount, kNone);
@@ -52,6 +55,7 @@ void LambdaSchedule::ForEachPair(std::uint32_t region, Visit&& visit) {
 double LambdaSchedule::CostOf(const Pair& pair) const {
   const double a = regions_[pair.ids[0]].area, b = regions_[pair.ids[1]].area;
   if (a == 0 || b == 0 || pair.length == 0) return 0;
+  if (a + b > limits_.mostPixels) return std::numeric_limits<double>::infinity();
   const double* const u = means_.data() + std::size_t{pair.ids[0]} * bands_;
   const double* const v = means_.data() + std::size_t{pair.ids[1]} * bands_;
   double sum = 0;
@@ -59,7 +63,8 @@ double LambdaSchedule::CostOf(const Pair& pair) const {
     const double difference = u[band] - v[band];
     sum += difference * difference;
   }
-  return a * b / (a + b) * sum / pair.length;
+  const double cost = a * b / (a + b) * sum / pair.length;
+  return limits_.compactness == 0 ? cost : cost / std::pow(pair.length, limits_.compactness);
 }
 
 /// Makes a pair the nearest of a region, and queues it when it is that of both of its regions.
@@ -75,15 +80,15 @@ void LambdaSchedule::Choose(std::uint32_t region, std::uint32_t pair) {
 }
 
 void LambdaSchedule::FindNearest(std::uint32_t region) {
-  std::uint32_t best = kNone, bestLabel = 0;
+  std::uint32_t best = kNone, bestRank = 0;
   double bestCost = kCostLimit;
   ForEachPair(region, [&](std::uint32_t pair) {
     const double cost = pairs_[pair].cost;
     if (!(cost <= bestCost)) return;  // nor is a cost that is no number ever the least
-    const std::uint32_t label = pairs_[pair].Other(region);
-    if (cost == bestCost && (best == kNone || label > bestLabel)) return;
+    const std::uint32_t rank = RankOf(pairs_[pair].Other(region));
+    if (cost == bestCost && (best == kNone || rank > bestRank)) return;
     best = pair;
-    bestLabel = label;
+    bestRank = rank;
     bestCost = cost;
   });
   if (best != kNone) {
@@ -145,11 +150,6 @@ void LambdaSchedule::TakeOverPairs(std::uint32_t lower, std::uint32_t higher) {
 void LambdaSchedule::Relabel(std::uint32_t pair, std::uint32_t from, std::uint32_t to) {
   Pair& moved = pairs_[pair];
   moved.ids[moved.SlotOf(from)] = to;
-  if (moved.ids[0] > moved.ids[1]) {
-    std::swap(moved.ids[0], moved.ids[1]);
-    std::swap(moved.next[0], moved.next[1]);
-    std::swap(moved.previous[0], moved.previous[1]);
-  }
   Link(pair, to);
 }
 
@@ -179,6 +179,36 @@ void LambdaSchedule::UpdateNearest(std::uint32_t neighbour, std::uint32_t pair, 
   Choose(neighbour, pair);
 }
 
+/// Joins the segments of a pair, and leaves costs as they were. @param merge  [out] who they are.
+void LambdaSchedule::Join(std::uint32_t pair, Merge& merge) {
+  std::uint32_t lower = pairs_[pair].ids[0], higher = pairs_[pair].ids[1];
+  if (RankOf(lower) > RankOf(higher)) std::swap(lower, higher);
+  merge.lower = lower;
+  merge.higher = higher;
+  Unlink(pair, lower);
+  Unlink(pair, higher);
+  JoinMeans(lower, higher);
+  TakeOverPairs(lower, higher);
+}
+
+/// Finds the pair of a segment that costs least, by the segments as they are now.
+bool LambdaSchedule::FindCheapest(std::uint32_t region, std::uint32_t& pair, double& cost) const {
+  pair = kNone;
+  std::uint32_t bestRank = 0;
+  for (std::uint32_t at = regions_[region].first; at != kNone;) {
+    const Pair& seen = pairs_[at];
+    const double costs = CostOf(seen);
+    const std::uint32_t rank = RankOf(seen.Other(region));
+    if (pair == kNone || costs < cost || (!(costs > cost) && rank < bestRank)) {
+      pair = at;
+      cost = costs;
+      bestRank = rank;
+    }
+    at = seen.next[seen.SlotOf(region)];
+  }
+  return pair != kNone;
+}
+
 bool LambdaSchedule::Step(Merge& merge) {
   while (!queue_.empty() && !IsCurrent(queue_.top())) queue_.pop();
   if (queue_.empty()) return false;
@@ -186,12 +216,9 @@ bool LambdaSchedule::Step(Merge& merge) {
   queue_.pop();
   Pair& merged = pairs_[top.pair];
   merged.isQueued = false;
-  const std::uint32_t lower = merged.ids[0], higher = merged.ids[1];
-  merge = {top.cost, lower, higher};
-  Unlink(top.pair, lower);
-  Unlink(top.pair, higher);
-  JoinMeans(lower, higher);
-  TakeOverPairs(lower, higher);
+  merge.lambda = top.cost;
+  Join(top.pair, merge);
+  const std::uint32_t lower = merge.lower, higher = merge.higher;
   ForEachPair(lower, [&](std::uint32_t pair) { pairs_[pair].cost = CostOf(pairs_[pair]); });
   ForEachPair(lower, [&](std::uint32_t pair) {
     UpdateNearest(pairs_[pair].Other(lower), pair, lower, higher);

@@ -2,12 +2,22 @@
 
 #include <cstddef>
 #include <cstdint>
+#include <limits>
 #include <queue>
 #include <vector>
 
 #include "fx/label_pairs.h"
 
 namespace lumo {
+
+/// Limits how segments grow.
+struct GrowthLimits {
+  /// The pixels of a segment at most: a pair that has more together is not merged.
+  double mostPixels = std::numeric_limits<double>::infinity();
+  /// A cost is divided by l to the power of this besides, l the length of the common boundary:
+  /// above 0, segments with much common boundary merge earlier, which makes them more compact.
+  double compactness = 0;
+};
 
 /// Neighbouring segments of a label image, and the cost of joining them: for segments of a and b
 /// pixels with mean band vectors u and v and a common boundary of l pixel edges
@@ -40,6 +50,13 @@ class VEXG_EXPORT LambdaSchedule {
   /// Forgets everything, and makes room for labels below `labelCount`, of `bands` bands.
   void Begin(std::uint32_t labelCount, std::uint32_t bands);
 
+  /// Takes numbers by which labels are compared, where not by their own: the lower of a pair is the
+  /// one with the lower number. Behind Begin. @param ranks  by label, all different.
+  void CompareBy(std::vector<std::uint32_t>&& ranks) { ranks_ = std::move(ranks); }
+
+  /// Limits how segments grow; see GrowthLimits. Behind Begin.
+  void Limit(const GrowthLimits& limits) { limits_ = limits; }
+
   /// Adds a pixel to its segment.
   /// @param label   not 0.
   /// @param values  one for each band.
@@ -58,6 +75,13 @@ class VEXG_EXPORT LambdaSchedule {
   /// Merges the next pair. @return false when there is none.
   bool Step(Merge& merge);
 
+  /// Joins the segments of fewer than `least` pixels to the neighbour that costs least, one with
+  /// the lowest label among equal costs: the smallest segment first, the lowest label among equal
+  /// sizes, with sizes and costs brought up to date after each, until none has a neighbour any
+  /// more. No limit of sizes holds. Behind the last step. `visit(merge)` hears of each.
+  template <typename Visit>
+  void JoinSmall(double least, Visit&& visit);
+
  private:
   static constexpr std::uint32_t kNone = 0xFFFFFFFF;
 
@@ -69,7 +93,7 @@ class VEXG_EXPORT LambdaSchedule {
 
   /// A pair stands in the lists of both of its regions; slot i of the links belongs to ids[i].
   struct Pair {
-    std::uint32_t ids[2] = {};  // lower label first
+    std::uint32_t ids[2] = {};
     std::uint32_t next[2] = {};
     std::uint32_t previous[2] = {};
     double cost = 0;
@@ -95,12 +119,15 @@ class VEXG_EXPORT LambdaSchedule {
     const Pair& pair = pairs_[entry.pair];
     return pair.isQueued && pair.cost == entry.cost;
   }
+  std::uint32_t RankOf(std::uint32_t label) const { return ranks_.empty() ? label : ranks_[label]; }
   template <typename Visit>
   void ForEachPair(std::uint32_t region, Visit&& visit);
   void Link(std::uint32_t pair, std::uint32_t region);
   void Unlink(std::uint32_t pair, std::uint32_t region);
   void Relabel(std::uint32_t pair, std::uint32_t from, std::uint32_t to);
   double CostOf(const Pair& pair) const;
+  void Join(std::uint32_t pair, Merge& merge);
+  bool FindCheapest(std::uint32_t region, std::uint32_t& pair, double& cost) const;
   void Choose(std::uint32_t region, std::uint32_t pair);
   void FindNearest(std::uint32_t region);
   void JoinMeans(std::uint32_t lower, std::uint32_t higher);
@@ -108,12 +135,47 @@ class VEXG_EXPORT LambdaSchedule {
   void UpdateNearest(std::uint32_t neighbour, std::uint32_t pair, std::uint32_t lower,
                      std::uint32_t higher);
 
+  /// A segment that is too small; the smallest is on top.
+  struct Small {
+    double area;
+    std::uint32_t rank;
+    std::uint32_t region;
+    bool operator<(const Small& other) const {
+      return area != other.area ? area > other.area : rank > other.rank;
+    }
+  };
+
+  GrowthLimits limits_;
   std::uint32_t bands_ = 0;
-  std::vector<Region> regions_;  // by label
-  std::vector<double> means_;    // by label, then band
+  std::vector<Region> regions_;       // by label
+  std::vector<double> means_;         // by label, then band
+  std::vector<std::uint32_t> ranks_;  // by label; empty: they compare as they are
   std::vector<Pair> pairs_;
   std::priority_queue<Queued> queue_;
   std::vector<std::uint32_t> pairTo_;  // by label: the pair of the region that is merged into
 };
+
+template <typename Visit>
+void LambdaSchedule::JoinSmall(double least, Visit&& visit) {
+  limits_.mostPixels = std::numeric_limits<double>::infinity();
+  std::priority_queue<Small> small;
+  const auto note = [&](std::uint32_t region) {
+    const double area = regions_[region].area;
+    if (area > 0 && area < least) small.push({area, RankOf(region), region});
+  };
+  for (std::uint32_t region = 1; region < regions_.size(); ++region) note(region);
+  while (!small.empty()) {
+    const Small top = small.top();
+    small.pop();
+    if (regions_[top.region].area != top.area) continue;  // it has joined another, or grown
+    Merge merge;
+    std::uint32_t pair = kNone;
+    if (!FindCheapest(top.region, pair, merge.lambda)) continue;
+    Join(pair, merge);
+    regions_[merge.higher].area = 0;
+    note(merge.lower);
+    visit(merge);
+  }
+}
 
 }  // namespace lumo

@@ -3,8 +3,10 @@
 
 #include "foundation/fault.h"
 #include "foundation/scientific_notation.h"
+#include "fx/seamless_segmentation.h"
 #include "fx/segment_command.h"
 #include "fx/variance_process.h"
+#include "platform/system_memory.h"
 #include "raster/pixel_types.h"
 #include "stats/raster_histogram.h"
 
@@ -75,7 +77,23 @@ const CommandDeclaration kSegmentMerge{
       "1: an image of the borders between segments, of 0 and 1, instead of labels"},
      {"Sums", Presence::kOptional, ValueKind::kWord,
       "how the rigorous merge adds up. Told: in single precision; Exact: in double precision", "",
-      &WordsIn<Form>}},
+      &WordsIn<Form>},
+     {"Seamless", Presence::kOptional, ValueKind::kBoolean,
+      "the segments are those of one tile as large as the raster, numbered in raster order without "
+      "gaps; TileMemorySize is then that of the strips that are read, and changes no label, and "
+      "there is no TileBorderSize; false when absent"},
+     {"Memory", Presence::kOptional, ValueKind::kInteger,
+      "bytes that merging may take when Seamless is true: it fails before merging when it needs "
+      "more; half the machine's when absent"},
+     {"MinSize", Presence::kOptional, ValueKind::kInteger,
+      "with Seamless and MergeAlgorithm 1: segments of fewer pixels join at the end the neighbour "
+      "that costs least, the smallest first; 0 when absent"},
+     {"MaxSize", Presence::kOptional, ValueKind::kInteger,
+      "with Seamless and MergeAlgorithm 1: segments that have more pixels together are not merged, "
+      "except by MinSize; none when absent"},
+     {"Compactness", Presence::kOptional, ValueKind::kNumber,
+      "with Seamless and MergeAlgorithm 1: costs are divided by the length of the common border to "
+      "the power of this besides, 0 to 10; 0 when absent"}},
     {{"LambdaHistogram", ValueKind::kIntegerArray,
       "cumulative counts of the costs of all merges, in 10000 bins from 0 on"},
      {"LambdaBinSize", ValueKind::kNumber, "width of these bins"}}};
@@ -137,13 +155,51 @@ class FxTileSegmentMergeCommand final : public SegmentCommand {
         mergeAlgorithm == 1 || mergeAlgorithm == 2 ? Read<double>("MergeValue") : 0.0;
     request.sums = Read<Form>("Sums");
     request.bordersOnly = Read<int>("SegmentBorder") == 1;
-    return ReadTiles(segment, request);
+    isSeamless_ = Read<bool>("Seamless");
+    request.isRigorous = isRigorous_;
+    return ReadGrowth(request) && ReadMemory(segment, request) && ReadTiles(segment, request);
+  }
+
+  bool ReadGrowth(SegmentRequest& request) {
+    const bool isGiven = HasInput("MinSize") || HasInput("MaxSize") || HasInput("Compactness");
+    if (!isGiven) return true;
+    const auto refuse = [](const char* fault) {
+      SetFault(fault);
+      return false;
+    };
+    if (!isSeamless_ || isRigorous_) {
+      return refuse("MinSize, MaxSize and Compactness go with Seamless and MergeAlgorithm 1");
+    }
+    const auto least = Read<std::int64_t>("MinSize"), most = Read<std::int64_t>("MaxSize");
+    if (least < 0) return refuse("MinSize: 0 pixels or more");
+    if (HasInput("MaxSize") && most < 1) return refuse("MaxSize: 1 pixel or more");
+    constexpr double kMostCompact = 10;
+    request.growth.compactness = Read<double>("Compactness");
+    if (!(request.growth.compactness >= 0 && request.growth.compactness <= kMostCompact)) {
+      return refuse("Compactness: 0 to 10");
+    }
+    request.leastPixels = static_cast<double>(least);
+    if (HasInput("MaxSize")) request.growth.mostPixels = static_cast<double>(most);
+    return true;
+  }
+
+  bool ReadMemory(const BasicRaster& segment, SegmentRequest& request) {
+    if (!isSeamless_) return true;
+    const auto given = Read<std::int64_t>("Memory");
+    if (given < 0 || (HasInput("Memory") && given == 0)) {
+      SetFault("Memory: 1 byte or more");
+      return false;
+    }
+    request.memory =
+        HasInput("Memory") ? static_cast<std::uint64_t>(given) : platform::GetMemoryOfMachine() / 2;
+    request.tileBytes = SeamlessStripBytes(segment, DataTypeBytes(segment.DataType()));
+    return true;
   }
 
   bool ReadTiles(const BasicRaster& segment, SegmentRequest& request) {
     constexpr std::int64_t kMost = 0xFFFFFFFF;
     const auto bytes = HasInput("TileMemorySize") ? Read<std::int64_t>("TileMemorySize")
-                                                  : std::int64_t{kTileBudget};
+                                                  : std::int64_t{request.tileBytes};
     const auto border =
         HasInput("TileBorderSize") ? Read<std::int64_t>("TileBorderSize") : std::int64_t{1};
     if (bytes < 0 || bytes > kMost) {
@@ -151,6 +207,7 @@ class FxTileSegmentMergeCommand final : public SegmentCommand {
       return false;
     }
     request.tileBytes = static_cast<unsigned>(bytes);
+    if (isSeamless_) return true;
     const SegmentGrid grid(segment, DataTypeBytes(segment.DataType()), request.tileBytes, 1);
     if (border < 0 || (!grid.IsOneTile() && border > std::int64_t{grid.side})) {
       SetFault("TileBorderSize: a border has 0 to " + std::to_string(grid.side) +
@@ -170,13 +227,16 @@ class FxTileSegmentMergeCommand final : public SegmentCommand {
   template <typename T>
   bool Segment(const RasterPtr<T>& segment, const RasterPtr<T>& merge,
                const RasterPtr<std::int32_t>& labels, const SegmentRequest& request) {
+    if (isSeamless_) {
+      return SeamlessSegmentation<T>(segment, merge, labels, request, GetIPC()).Run();
+    }
     return isRigorous_
                ? Run<RasterTileWatershedSegmentLambdaMergeProcess<T>>(segment, merge, labels,
                                                                       request)
                : Run<RasterTileWatershedSegmentFLSMergeProcess<T>>(segment, merge, labels, request);
   }
 
-  bool isRigorous_ = false;
+  bool isRigorous_ = false, isSeamless_ = false;
 };
 
 const CommandFactoryT<FxTileSegmentMergeCommand> segmentMergeFactory(kSegmentMerge);

@@ -2,6 +2,7 @@
 
 #include "commands/value_text.h"
 #include "foundation/scalar.h"
+#include "fx/lambda_schedule.h"
 #include "fx/level_tasks.h"
 #include "raster/tile_process.h"
 
@@ -26,6 +27,12 @@ struct SegmentRequest {
   bool bordersOnly = false;          ///< an image of the borders instead of labels
   unsigned tileBytes = kTileBudget;  ///< of the band values of a tile
   unsigned tileBorder = 1;           ///< overlap on each side
+  bool isRigorous = false;           ///< merging without tiles: by RigorousMerge
+  double leastPixels = 0;            ///< smaller segments join others, without tiles
+  GrowthLimits growth;               ///< of merging by schedule, without tiles
+  std::uint64_t memory = kNoLimit;   ///< bytes for the segments and their neighbours, without tiles
+
+  static constexpr std::uint64_t kNoLimit = 0xFFFFFFFFFFFFFFFF;
 };
 
 /// The grid of tiles that a raster is cut into.

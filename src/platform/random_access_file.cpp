@@ -5,6 +5,7 @@
 #include <cerrno>
 #include <climits>
 #include <cstdio>
+#include <cstdlib>
 #include <fcntl.h>
 #include <sys/stat.h>
 #include <sys/uio.h>
@@ -139,6 +140,24 @@ std::unique_ptr<RandomAccessFile> RandomAccessFile::Create(const std::string& pa
   FileDescriptor file = OpenRegular(path, O_RDWR | O_CREAT | O_EXCL, fault);
   if (!file.IsOpen()) return nullptr;
   return std::unique_ptr<RandomAccessFile>(new RandomAccessFile(path, file.Release()));
+}
+
+std::unique_ptr<RandomAccessFile> RandomAccessFile::CreateUnnamed(std::string* fault) {
+  const char* const wanted = std::getenv("TMPDIR");
+  const std::string folder = wanted != nullptr && *wanted != '\0' ? wanted : "/var/tmp";
+  constexpr mode_t kOwnersAlone = 0600;
+  FileDescriptor file(RetryInterrupted(
+      [&] { return open(folder.c_str(), O_RDWR | O_TMPFILE | O_CLOEXEC, kOwnersAlone); }));
+  if (!file.IsOpen() && (errno == EOPNOTSUPP || errno == EISDIR || errno == EINVAL)) {
+    std::string path = folder + "/vexg-XXXXXX";  // the file system knows no files without names
+    file = FileDescriptor(mkostemp(path.data(), O_CLOEXEC));
+    if (file.IsOpen()) unlink(path.c_str());
+  }
+  if (!file.IsOpen()) {
+    FailBySystem(fault, folder, errno);
+    return nullptr;
+  }
+  return std::unique_ptr<RandomAccessFile>(new RandomAccessFile(folder, file.Release()));
 }
 
 RandomAccessFile::~RandomAccessFile() {

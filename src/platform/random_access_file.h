@@ -58,6 +58,10 @@ class VEXG_EXPORT RandomAccessFile {
   static std::unique_ptr<RandomAccessFile> CreateOrEmpty(const std::string& path,
                                                          std::string* fault = nullptr);
 
+  /// Makes an empty file without a name in $TMPDIR, or where that isn't set in /var/tmp, and opens
+  /// it for kUpdate. It goes with its last user, whatever ends him. Path() names the folder.
+  static std::unique_ptr<RandomAccessFile> CreateUnnamed(std::string* fault = nullptr);
+
   ~RandomAccessFile();
   RandomAccessFile(const RandomAccessFile&) = delete;
   RandomAccessFile& operator=(const RandomAccessFile&) = delete;

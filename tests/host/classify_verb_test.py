@@ -13,7 +13,7 @@ from support import gdal_pixels, needs_gdal
 class ClassifyVerbTest(FieldScene):
     def setUp(self):
         super().setUp()
-        self.fine("segment", self.folder / "scene.tif", self.folder / "segments.tif", "--tiled", "--merge-percent", 90, "-q")
+        self.fine("segment", self.folder / "scene.tif", self.folder / "segments.tif", "--merge-percent", 90, "-q")
         self.fine("attributes", self.folder / "scene.tif", self.folder / "segments.tif", "-o", self.folder / "fields",
                   "--spectral", "--shape", "-q")
 
@@ -106,7 +106,7 @@ class ClassifyVerbTest(FieldScene):
                    "--attributes", self.folder / "none", *self.training())
         self.fails(1, "labels are of type Int32", "classify", self.folder / "scene.tif", self.folder / "map.tif", "--attributes",
                    self.folder / "fields", *self.training())
-        self.fine("segment", self.folder / "scene.tif", self.folder / "few.tif", "--tiled", "--merge-percent", 99, "-q")
+        self.fine("segment", self.folder / "scene.tif", self.folder / "few.tif", "--merge-percent", 99, "-q")
         self.fine("attributes", self.folder / "scene.tif", self.folder / "few.tif", "-o", self.folder / "few", "--shape", "-q")
         self.fails(1, "they are of other labels", *self.classify(*self.training(), "--attributes", self.folder / "few"))
         self.assertFalse((self.folder / "map.tif").exists())

@@ -148,7 +148,8 @@ def adjacency(labels, excluded, width, height, columns, rows, with_zero):
 class Schedule:
     """Merges the cheapest pair of mutually nearest regions, one at a time."""
 
-    def __init__(self, values, labels, pairs, bands):
+    def __init__(self, values, labels, pairs, bands, most=float("inf"), compactness=0):
+        self.most, self.compactness = most, compactness
         self.area, self.mean = collections.Counter(), {}
         for p, label in enumerate(labels):
             if label:
@@ -177,6 +178,10 @@ class Schedule:
         for u, v in zip(self.mean[a], self.mean[b]):
             total += (u - v) * (u - v)
         self.cost[index] = m * n / (m + n) * total / self.length[index]
+        if self.compactness:
+            self.cost[index] /= float(self.length[index]) ** self.compactness
+        if m + n > self.most:
+            self.cost[index] = float("inf")
 
     def choose(self, label, index):
         self.least[label] = index
@@ -227,15 +232,44 @@ class Schedule:
         return cost, a, b
 
 
-def merge_schedule(values, labels, pairs, threshold):
-    schedule, parent = Schedule(values, labels, pairs, len(values)), {}
+def join_small(schedule, least, parent):
+    """The smallest region joins its cheapest neighbour, until none is too small."""
+    schedule.most = float("inf")
+    area, near = schedule.area, schedule.near
     while True:
+        small = [label for label in area if area[label] < least and near[label] and label not in parent]
+        if not small:
+            return
+        label = min(small, key=lambda label: (area[label], label))
+        for index in near[label].values():
+            schedule.price(index)
+        other = min(near[label], key=lambda other: (schedule.cost[near[label][other]], other))
+        a, b = min(label, other), max(label, other)
+        m, n = float(area[a]), float(area[b])
+        schedule.mean[a] = [n / (m + n) * v + m / (m + n) * u for u, v in zip(schedule.mean[a], schedule.mean[b])]
+        area[a] += area[b]
+        del near[a][b], near[b][a]
+        for third, index in near[b].items():
+            del near[third][b]
+            if third in near[a]:
+                schedule.length[near[a][third]] += schedule.length[index]
+            else:
+                near[a][third] = near[third][a] = index
+                schedule.ids[index] = sorted([a, third])
+        near[b] = {}
+        parent[b] = a
+
+
+def merge_schedule(values, labels, pairs, threshold, MinSize=0, MaxSize=float("inf"), Compactness=0):
+    schedule, parent = Schedule(values, labels, pairs, len(values), MaxSize, Compactness), {}
+    while threshold > 0:
         merge = schedule.step()
         if merge is None:
             break
         parent[merge[2]] = merge[1]
         if merge[0] > threshold:
             break
+    join_small(schedule, MinSize, parent)
     result = []
     for label in labels:
         while label in parent:

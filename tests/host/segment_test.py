@@ -179,8 +179,36 @@ class SegmentTest(FolderTest):
                 "TileMemorySize": side * side * bands * struct.calcsize(TYPES[kind]),
                 "TileBorderSize": chance.randint(0, 5), "Sums": chance.choice(["Told", "Exact"]),
                 "LambdaEstimate": False}
+            if number % 3 == 0:  # strips, and the segments of one tile, numbered anew
+                whole = sum(plain(image, invalid, 1000, 1, arguments), [])
+                arguments.update(Seamless=True, TileMemorySize=[1, 60, 300, 1000000][number % 4])
+                numbers = {0: 0}
+                wanted.append([numbers.setdefault(label, len(numbers)) for label in whole])
+            else:
+                wanted.append(sum(plain(image, invalid, side, arguments["TileBorderSize"], arguments), []))
             runs.append((path, arguments))
-            wanted.append(sum(plain(image, invalid, side, arguments["TileBorderSize"], arguments), []))
+        for (path, arguments), got, labels in zip(runs, self.segment_all(runs), wanted):
+            with self.subTest(path.name, **arguments):
+                self.assertEqual(got, labels)
+
+    def test_limits_of_growth_beside_the_plain_form(self):
+        chance, runs, wanted = random.Random(11), [], []
+        for number in range(30):
+            path, image, invalid = self.make_image(f"image{number}.dat", chance, chance.choice(["Byte", "Single"]), 2)
+            limits = chance.choice([{"MinSize": 5}, {"MaxSize": 20}, {"Compactness": 0.7},
+                                    {"MinSize": 12, "MaxSize": 30, "Compactness": 2}])
+            arguments = {"SegmentAlgorithm": 2, "SegmentValue": 0, "MinGradient": 0, "MaxGradient": 200, "StretchValue": 200,
+                         "MergeValue": chance.choice([0, 5, 1000, 1e9]), "LambdaEstimate": False, "Seamless": True,
+                         "TileMemorySize": 100, **limits}
+            runs.append((path, arguments))
+            width, height, values = image.width, image.height, image.intensity()[0]
+            out = [hole for row in invalid for hole in row]
+            labels, _ = peer.flood([peer.cut(v / 200 * 200) for row in values for v in row], out, width, height)
+            pairs = peer.adjacency(labels, out, width, height, width, height, False)
+            bands = [[float(v) for row in band for v in row] for band in image.bands]
+            labels = peer.merge_schedule(bands, labels, pairs, arguments["MergeValue"], **limits)
+            numbers = {0: 0}
+            wanted.append([numbers.setdefault(label, len(numbers)) for label in labels])
         for (path, arguments), got, labels in zip(runs, self.segment_all(runs), wanted):
             with self.subTest(path.name, **arguments):
                 self.assertEqual(got, labels)
@@ -311,7 +339,7 @@ class SegmentTest(FolderTest):
                        for value in ((200, 20, 30) if x < 30 else (20, 200, 30) if y < 25 else (20, 20, 220)))
         scene = write_orva(self.folder / "scene.dat", width, height, 3, pixels)
         labels = self.folder / "labels.dat"
-        self.fine("segment", scene, labels, "--tiled", "--format", "ORVA", "--polygons",
+        self.fine("segment", scene, labels, "--format", "ORVA", "--polygons",
                   self.folder / "fields.geojson", "--quicklook", self.folder / "look.png", "-q")
         got = struct.unpack(f"<{width * height}i", labels.read_bytes())
         fields = {(x < 30, x >= 30 and y < 25): got[y * width + x] for x in (10, 50) for y in (10, 40)}
@@ -329,7 +357,12 @@ class SegmentTest(FolderTest):
             for x in range(width - 1):
                 at = y * width + x
                 self.assertEqual(yellow[at], got[at] != got[at + 1] or got[at] != got[at + width], (x, y))
-        self.fails(2, "is there already", "segment", scene, labels, "--tiled", "--format", "ORVA")
+        self.fails(2, "is there already", "segment", scene, labels, "--format", "ORVA")
+        self.fails(2, "--tile-border goes with --tiled", "segment", scene, labels, "--tile-border", 3)
+        self.fails(2, "--memory goes without --tiled", "segment", scene, labels, "--memory", 3, "--tiled")
+        self.fails(1, "bytes of memory", "segment", scene, self.folder / "new.dat", "--format", "ORVA", "--merge-value", 9,
+                   "--memory", 100)
+        self.assertFalse((self.folder / "new.dat").exists())
 
     def test_estimate_agrees_with_what_percentages_do(self):
         chance = random.Random(5)
@@ -338,10 +371,10 @@ class SegmentTest(FolderTest):
         shares = curves["gradients"]["shares"]
         self.assertEqual(shares, sorted(shares))
         self.assertEqual((shares[-1], curves["costs"]["shares"][-1]), (1, 1))
-        document = self.fine("segment", scene, self.folder / "l.dat", "--format", "ORVA", "--tiled", "--merge-percent", 100,
+        document = self.fine("segment", scene, self.folder / "l.dat", "--format", "ORVA", "--merge-percent", 100,
                              "--segment-percent", 50, "--print-job")
         self.assertIn('<Input SegmentPercent="50"/>', document)
-        self.fine("segment", scene, self.folder / "l.dat", "--format", "ORVA", "--tiled", "--merge-percent", 100, "-q")
+        self.fine("segment", scene, self.folder / "l.dat", "--format", "ORVA", "--merge-percent", 100, "-q")
         labels = struct.unpack("<1600i", (self.folder / "l.dat").read_bytes())
         self.assertEqual(len(set(labels)), 1)  # all merges are done
         self.fine("segment", "--estimate", scene, "-o", self.folder / "curves.png", "-q")

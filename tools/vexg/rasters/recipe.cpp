@@ -70,7 +70,7 @@ class Reader {
 
   void ReadSegments(const JsonField& field) {
     field.Allow({"bands", "algorithm", "segmentValue", "segmentPercent", "mergeValue",
-                 "mergePercent", "mergeAlgorithm", "tileMemory", "tileBorder"});
+                 "mergePercent", "mergeAlgorithm", "tiled", "tileMemory", "tileBorder"});
     SegmentRequest& request = recipe_.segments;
     if (field.Has("bands")) recipe_.segmentBands = field.Get("bands");
     if (field.Has("algorithm")) {
@@ -97,6 +97,10 @@ class Reader {
     }
     if (field.Has("tileMemory")) {
       request.tileMemory = field.Get("tileMemory").Whole(1, 4294967295U);
+    }
+    request.isTiled = field.FlagOr("tiled", false);
+    if (field.Has("tileBorder") && !request.isTiled) {
+      field.Get("tileBorder").Refuse("it goes with \"tiled\"");
     }
     if (field.Has("tileBorder")) request.tileBorder = field.Get("tileBorder").Whole(0, 65535);
   }

@@ -23,6 +23,13 @@ void SegmentRequest::Check() const {
     refuse("--segment-value and --segment-percent exclude each other");
   }
   if (mergeValue && mergePercent) refuse("--merge-value and --merge-percent exclude each other");
+  if (tileBorder && !isTiled) refuse("--tile-border goes with --tiled");
+  if (memory != 0 && isTiled) refuse("--memory goes without --tiled");
+  if ((minSize || maxSize || compactness) && (isTiled || mergeAlgorithm != "schedule")) {
+    refuse(
+        "--min-size, --max-size and --compactness go with --merge-algorithm schedule, without "
+        "--tiled");
+  }
   for (const auto& [name, percent] :
        {std::pair("--segment-percent", segmentPercent), {"--merge-percent", mergePercent}}) {
     if (percent && !(*percent >= 0 && *percent <= 100)) {
@@ -68,7 +75,16 @@ void AddSegment(JobDraft& draft, const char* step, const SegmentRequest& request
     segment.AddVariableInput("MergeValue", "$cost");
   }
   if (request.tileMemory) segment.AddInput("TileMemorySize", *request.tileMemory);
-  segment.AddInput("TileBorderSize", request.tileBorder);
+  if (request.isTiled) {
+    constexpr unsigned kBorder = 10;
+    segment.AddInput("TileBorderSize", request.tileBorder.value_or(kBorder));
+  } else {
+    segment.AddInput("Seamless", true);
+    if (request.minSize) segment.AddInput("MinSize", *request.minSize);
+    if (request.maxSize) segment.AddInput("MaxSize", *request.maxSize);
+    if (request.compactness) segment.AddInput("Compactness", *request.compactness);
+    if (request.memory != 0) segment.AddInput("Memory", request.memory);
+  }
   if (request.isBorders) segment.AddInput("SegmentBorder", 1);
   segment.AddInput("Sums", Form::kExact);
 }

@@ -13,11 +13,16 @@ struct SegmentRequest {
   std::string mergeAlgorithm = "schedule";  ///< or rigorous
   std::optional<double> segmentValue, segmentPercent, mergeValue, mergePercent;
   std::optional<unsigned> tileMemory;  ///< bytes
-  unsigned tileBorder = 10;            ///< pixels
-  bool isBorders = false;              ///< an image of the borders is made instead
-  bool isEstimate = false;             ///< costs are counted, and nothing made
+  std::optional<unsigned> tileBorder;  ///< pixels, with tiles; 10 when not given
+  std::uint64_t memory = 0;            ///< bytes for merging, without tiles; 0 for those by default
+  std::optional<unsigned> minSize, maxSize;  ///< pixels, without tiles
+  std::optional<double> compactness;         ///< a power of border lengths, without tiles
+  bool isTiled = false;                      ///< tile by tile, and not as a whole
+  bool isBorders = false;                    ///< an image of the borders is made instead
+  bool isEstimate = false;                   ///< costs are counted, and nothing made
 
-  /// Throws HostError for percentages out of bounds, and for a value beside a percentage.
+  /// Throws HostError for percentages out of bounds, for a value beside a percentage, and for what
+  /// goes with tiles alone or without them.
   void Check() const;
 };
 

@@ -46,17 +46,20 @@ class SegmentVerb final : public RasterVerb {
         "and the length of their common border, become one. LABELS holds the number of the segment "
         "of each pixel, 0 where there is none, as 32-bit integers.");
     line.AddNote(
-        "The raster is worked on in tiles that overlap by --tile-border; a segment that reaches "
-        "into "
-        "the next tile keeps its number there, and two that met in an earlier tile stay two.");
+        "The segments are those of the raster as a whole, of any size, and don't depend on memory "
+        "or "
+        "threads. With --tiled it is worked on in tiles that overlap by --tile-border: a segment "
+        "that reaches into the next tile keeps its number there, and two that met in an earlier "
+        "tile stay two.");
     line.AddNote(
         "--estimate makes no labels. It says which gradient and which cost a percentage stands "
         "for, "
         "-o draws both curves, --json prints them.");
-    line.AddExample("vexg segment scene.tif segments.tif --tiled --merge-percent 90");
+    line.AddExample("vexg segment scene.tif segments.tif --merge-percent 90");
     line.AddExample("vexg segment --estimate scene.tif -o curves.png");
     AddFilesTo(line, "The labels", false);
-    line.Add("--tiled", isTiled_, "Segment tile by tile");
+    line.Add("--tiled", request_.isTiled,
+             "Segment tile by tile, which takes less memory and leaves seams");
     line.Add("--estimate", request_.isEstimate,
              "Say what percentages stand for, and make no labels");
     line.Add("--output,-o", picture_, "With --estimate: a picture of both curves, a PNG or JPEG")
@@ -92,12 +95,30 @@ class SegmentVerb final : public RasterVerb {
              "A raster of the same size and pixel type whose bands drive merging, instead of "
              "INPUT's")
         .IsFile();
+    line.Add("--min-size", request_.minSize,
+             "Smaller segments join at the end the neighbour that costs least, the smallest first")
+        .Shows("PIXELS");
+    line.Add("--max-size", request_.maxSize,
+             "Segments that have more pixels together are not merged, except by --min-size")
+        .Shows("PIXELS")
+        .Within(1, 4294967295U);
+    line.Add("--compactness", request_.compactness,
+             "Costs are divided by the length of the common border to this power besides, 0 to 10; "
+             "0 "
+             "by default")
+        .Shows("W");
     line.Add("--tile-memory", request_.tileMemory,
-             "Bytes of the pixels of a tile; 8388608 by default")
+             "Bytes of the pixels of a tile, or of the strips in which a whole raster is read; "
+             "8388608 by default")
         .Shows("BYTES");
-    line.Add("--tile-border", request_.tileBorder, "Overlap of tiles on each side, in pixels")
-        .Within(0, 65535)
-        .ShowsDefault();
+    line.Add("--tile-border", request_.tileBorder,
+             "With --tiled: overlap of tiles on each side, in pixels; 10 by default")
+        .Shows("PIXELS")
+        .Within(0, 65535);
+    line.Add("--memory", request_.memory,
+             "Bytes that merging may take, else it isn't begun; half the machine's by default")
+        .Shows("BYTES")
+        .Within(1, 1ULL << 62U);
     line.Add("--borders", request_.isBorders,
              "Make an image of the borders of segments, of 0 and 1");
     line.Add("--polygons", polygons_, "Make polygons of the segments as well, in this vector file")
@@ -120,7 +141,6 @@ class SegmentVerb final : public RasterVerb {
       return;
     }
     if (GetTargetName().empty()) refuse("LABELS, the file to make, is missing");
-    if (!isTiled_) refuse("--tiled is missing: segments are made tile by tile");
     if (!picture_.empty() || isJson_) refuse("-o and --json go with --estimate");
     if (request_.isBorders && !polygons_.empty())
       refuse("--borders makes no segments for --polygons");
@@ -338,7 +358,7 @@ class SegmentVerb final : public RasterVerb {
   static constexpr unsigned kFloatBins = 65000;
   static constexpr unsigned kQuicklookSize = 2048;
 
-  bool isTiled_ = false, isJson_ = false;
+  bool isJson_ = false;
   std::string picture_, bandsText_, mergeRaster_, polygons_, quicklook_;
   SegmentRequest request_;
 

@@ -1,0 +1,69 @@
+#pragma once
+
+#include "fx/label_pairs.h"
+#include "fx/seamless_watershed.h"
+#include "fx/segment_process.h"
+
+namespace lumo {
+
+/// Segments a raster of any size as if it were one tile. The segments are those of the processes of
+/// segment_process.h with a tile as large as the raster; they are numbered from 1 in raster order
+/// of their first pixels, without gaps. The result has the same bits for any height of the strips
+/// in which the raster is read, and any number of threads.
+///
+/// The levels go into a SeamlessWatershed; areas, band sums and borders of its basins are added up
+/// in raster order; all basins are merged in one graph; and labels are written once, in one pass.
+///
+/// Memory: MemoryOfMerging for the graph, and some 100 bytes a pixel of a strip for each
+///         thread. Failure: false, with the fault set, and nothing written unless the writing
+///         itself failed; at an abort true.
+template <typename T>
+class SeamlessSegmentation {
+ public:
+  /// @param segment  what gradients are computed from.
+  /// @param merge    what drives merging; may be the same.
+  /// @param labels   one band, of the size of the others.
+  /// @param request  whose tileBytes are those of a strip, which has whole lines, at least one.
+  SeamlessSegmentation(const RasterPtr<T>& segment, const RasterPtr<T>& merge,
+                       const RasterPtr<std::int32_t>& labels, const SegmentRequest& request,
+                       const IPC& ipc = {});
+
+  bool Run();
+
+ private:
+  bool FindBasins();
+  bool Merge();
+  template <typename Graph>
+  bool Gather(Graph& graph, LabelPairs& pairs);
+  bool MergeBySchedule();
+  bool MergeRigorously();
+  bool Write();
+  IPC NextPass() const;
+  TileDimensions Strips(unsigned border) const;
+  bool IsAborted() const { return !ipc_.abort.IsNull() && ipc_.abort->IsSet(); }
+
+  RasterPtr<T> segment_, merge_;
+  RasterPtr<std::int32_t> labels_;
+  SegmentRequest request_;
+  IPC ipc_;
+  unsigned stripLines_ = 1;
+  SeamlessWatershed watershed_;
+  std::vector<std::uint32_t> roots_;  // by basin: one that stands for its segment; empty for itself
+};
+
+/// The bytes that merging so many basins takes at most, their neighbours included.
+VEXG_EXPORT std::uint64_t MemoryOfMerging(std::uint64_t basins, unsigned bands, bool isRigorous);
+
+/// Says that merging would take more memory than it may.
+VEXG_EXPORT String MemoryFault(std::uint64_t basins, std::uint64_t needed, std::uint64_t allowed);
+
+/// A budget for strips: that of tiles, or 32 lines where they are more, up to 256 MiB.
+VEXG_EXPORT unsigned SeamlessStripBytes(const BasicRaster& raster, std::size_t elementBytes);
+
+/// The lines of the strips that fill a budget: at least one, and at most what a strip may have.
+VEXG_EXPORT unsigned SeamlessStripLines(const BasicRaster& raster, std::size_t elementBytes,
+                                        unsigned stripBytes);
+
+VEXG_EXTERN(EIGHT, SeamlessSegmentation);
+
+}  // namespace lumo

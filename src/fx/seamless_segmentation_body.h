@@ -1,0 +1,259 @@
+#pragma once
+
+#include <algorithm>
+#include <numeric>
+
+#include "foundation/fault.h"
+#include "foundation/progress.h"
+#include "fx/gradient_stages.h"
+#include "fx/lambda_schedule.h"
+#include "fx/rigorous_merge.h"
+#include "fx/seamless_segmentation.h"
+#include "fx/strip_numbers.h"
+#include "fx/task_setup.h"
+#include "fx/usable_pixels.h"
+#include "fx/watershed_task.h"
+#include "tasks/thread_limit.h"
+
+namespace lumo {
+namespace detail {
+
+inline constexpr unsigned kSeamlessPasses = 4;  // basins, graph, merging, labels
+
+/// The labels of a strip, and the neighbours among them.
+struct StripGraph {
+  std::vector<std::int32_t> labels;
+  std::vector<LabelPair> pairs;
+};
+
+/// Calls `visit(a, b)` for each edge of a strip between labels that differ, none of them 0: row by
+/// row, for each pixel first the edge to the right, then the one below.
+/// @param below  the labels of the line below the strip; null at the end of the raster.
+template <typename Visit>
+void ForEachStripEdge(const std::vector<std::int32_t>& labels, std::uint32_t width,
+                      const std::int32_t* below, const Visit& visit) {
+  const auto visitTo = [&](std::int32_t a, std::int32_t b) {
+    if (a != b && a != 0 && b != 0) {
+      visit(static_cast<std::uint32_t>(a), static_cast<std::uint32_t>(b));
+    }
+  };
+  for (std::size_t at = 0; at < labels.size(); at += width) {
+    const std::int32_t* const line = labels.data() + at;
+    const std::int32_t* const next = at + width < labels.size() ? line + width : below;
+    for (std::uint32_t x = 0; x < width; ++x) {
+      if (x + 1 < width) visitTo(line[x], line[x + 1]);
+      if (next != nullptr) visitTo(line[x], next[x]);
+    }
+  }
+}
+
+inline void AddTo(LambdaSchedule& schedule, std::uint32_t label, const auto* values,
+                  const unsigned char* /*states*/, unsigned /*bands*/) {
+  schedule.AddPixel(label, values, 1);
+}
+inline void AddTo(RigorousMerge& merge, std::uint32_t label, const auto* values,
+                  const unsigned char* states, unsigned bands) {
+  if (IsUsable(states, bands)) merge.AddPixel(label, values, 1);
+}
+
+/// The pipeline of a pass, with as many strips in flight as there are threads and one more.
+class StripProcess : public TileProcess<> {
+ public:
+  StripProcess(const char* name, const IPC& ipc) : TileProcess<>(name, ipc) {
+    this->GetPipeline().SetTokenLimit(ThreadLimit::GetCurrent() + 1);
+  }
+  void SetStrips(unsigned strips) { this->GetPipeline().SetTotalTokens(strips); }
+};
+
+}  // namespace detail
+
+template <typename T>
+SeamlessSegmentation<T>::SeamlessSegmentation(const RasterPtr<T>& segment,
+                                              const RasterPtr<T>& merge,
+                                              const RasterPtr<std::int32_t>& labels,
+                                              const SegmentRequest& request, const IPC& ipc)
+    : segment_(segment),
+      merge_(merge),
+      labels_(labels),
+      request_(request),
+      ipc_(ipc),
+      stripLines_(SeamlessStripLines(*segment, sizeof(T), request.tileBytes)) {}
+
+template <typename T>
+IPC SeamlessSegmentation<T>::NextPass() const {
+  return IPC(ipc_.abort,
+             ProgressReportPtr(new ScaledProgressReport(ipc_.progress, detail::kSeamlessPasses)));
+}
+
+template <typename T>
+TileDimensions SeamlessSegmentation<T>::Strips(unsigned border) const {
+  TileDimensions strips;
+  strips.width = segment_->Samples();
+  strips.height = stripLines_;
+  strips.borderTop = strips.borderBottom = border;
+  strips.borderClamp = 1;
+  return strips;
+}
+
+template <typename T>
+bool SeamlessSegmentation<T>::Run() {
+  if (!FindBasins()) return false;
+  if (IsAborted()) return true;
+  const bool merges = request_.mergeValue > 0 || request_.leastPixels > 1;
+  if (merges && watershed_.Count() > 0 && !Merge()) return false;
+  return IsAborted() || Write();
+}
+
+template <typename T>
+bool SeamlessSegmentation<T>::FindBasins() {
+  if (!watershed_.Begin({segment_->Samples(), segment_->Lines(), stripLines_})) return false;
+  const RasterIteratorPtr<T> strips(
+      new RasterIterator<T>(segment_, Strips(detail::GradientBorder(request_.algorithm, 1))));
+  detail::StripProcess process("SeamlessBasins", NextPass());
+  const ArgID slot = process.Read(strips).id;
+  const Array<ArgID> inPlace = ArgIDs({slot, slot});
+  detail::AddGradient<T>(process, request_.algorithm, slot, slot, 1);
+  process.AddTask<RasterLinearStretchTask<double, std::int32_t>>(inPlace,
+                                                                 MakeSetup(request_.stretch));
+  process.AddTask<RasterClipInPlaceTask<std::int32_t>>(inPlace, MakeSetup(request_.limits));
+  process.Add("Basins", StageOrder::kSeveralAtOnce, [this, slot](ArgList& token, const AbortFlag*) {
+    const TilePtr<std::int32_t> levels = TileSlot<std::int32_t>{slot}.In(token);
+    if (!levels || !levels->IsValid()) return false;
+    return watershed_.AddStrip(levels->Index().second,
+                               {levels->PixelArray().GetData(), FindExcluded(*levels)});
+  });
+  process.Close();
+  if (!process.RunProcess(process.kHere)) return false;
+  return IsAborted() || watershed_.Connect(ipc_.abort.Get());
+}
+
+template <typename T>
+bool SeamlessSegmentation<T>::Merge() {
+  const std::uint64_t needed =
+      MemoryOfMerging(watershed_.Count(), merge_->Bands(), request_.isRigorous);
+  if (needed > request_.memory) {
+    SetFault(MemoryFault(watershed_.Count(), needed, request_.memory));
+    return false;
+  }
+  return request_.isRigorous ? MergeRigorously() : MergeBySchedule();
+}
+
+/// Adds all pixels to a graph, in raster order, and finds the neighbours.
+template <typename T>
+template <typename Graph>
+bool SeamlessSegmentation<T>::Gather(Graph& graph, LabelPairs& pairs) {
+  const RasterIteratorPtr<T> strips(new RasterIterator<T>(merge_, Strips(0)));
+  detail::StripProcess process("SeamlessGraph", NextPass());
+  const auto tiles = process.Read(strips);
+  const auto graphs = process.template TakeSlot<ValueSlot<detail::StripGraph>>();
+  ScratchPool<LabelPairs> scratch;
+  process.Add(
+      "Neighbours", StageOrder::kSeveralAtOnce, [&](ArgList& token, const AbortFlag* abort) {
+        const unsigned strip = tiles.In(token)->Index().second;
+        const std::uint32_t width = watershed_.Width();
+        detail::StripGraph made;
+        made.labels.resize(std::size_t{width} * watershed_.LinesOf(strip));
+        if (!watershed_.Label(strip, made.labels.data())) return false;
+        if (abort != nullptr && abort->IsSet()) return false;
+        const auto found = scratch.Borrow();
+        found->Begin(watershed_.Count() / watershed_.Strips() + 1);
+        detail::ForEachStripEdge(made.labels, width, watershed_.LabelsBelow(strip),
+                                 [&](std::uint32_t a, std::uint32_t b) { found->AddEdge(a, b); });
+        made.pairs = found->Pairs();
+        return graphs.Put(token, std::move(made));
+      });
+  process.Add("Sums", StageOrder::kOneByOne, [&](ArgList& token, const AbortFlag*) {
+    const TilePtr<T> tile = tiles.In(token);
+    const detail::StripGraph* const made = graphs.In(token);
+    if (!tile || !tile->IsValid() || made == nullptr) return false;
+    const unsigned bands = tile->Bands();
+    const T* values = tile->PixelArray().GetData();
+    const unsigned char* states = tile->StateArray().GetData();
+    for (const std::int32_t label : made->labels) {
+      if (label != 0) {
+        detail::AddTo(graph, static_cast<std::uint32_t>(label), values, states, bands);
+      }
+      values += bands;
+      states += bands;
+    }
+    for (const LabelPair& pair : made->pairs) pairs.AddEdges(pair.low, pair.high, pair.length);
+    return true;
+  });
+  process.Close();
+  return process.RunProcess(process.kHere);
+}
+
+template <typename T>
+bool SeamlessSegmentation<T>::MergeBySchedule() {
+  const std::uint32_t count = watershed_.Count();
+  LambdaSchedule schedule;
+  schedule.Begin(count + 1, merge_->Bands());
+  schedule.Limit(request_.growth);
+  schedule.CompareBy(watershed_.TakeRanks());
+  {
+    LabelPairs pairs;
+    pairs.Begin(count);
+    if (!Gather(schedule, pairs)) return false;
+    if (IsAborted()) return true;
+    schedule.Build(pairs.TakePairs());
+  }
+  roots_.resize(std::size_t{count} + 1);
+  std::iota(roots_.begin(), roots_.end(), 0U);
+  const IPC pass = NextPass();
+  LambdaSchedule::Merge merge;
+  const bool doesSteps = request_.mergeValue > 0;
+  for (std::uint32_t step = 0; doesSteps && schedule.Step(merge); ++step) {
+    roots_[merge.higher] = merge.lower;
+    if (merge.lambda > request_.mergeValue) break;
+    constexpr std::uint32_t kEvery = 4096;
+    if (step % kEvery != 0) continue;
+    if (IsAborted()) return true;
+    pass.progress->Update(static_cast<double>(step) / count);
+  }
+  schedule.JoinSmall(request_.leastPixels,
+                     [this](const auto& join) { roots_[join.higher] = join.lower; });
+  for (std::uint32_t label = 1; label <= count; ++label) {
+    std::uint32_t root = label;
+    while (roots_[root] != root) root = roots_[root] = roots_[roots_[root]];
+    roots_[label] = root;
+  }
+  return true;
+}
+
+template <typename T>
+bool SeamlessSegmentation<T>::MergeRigorously() {
+  const std::uint32_t count = watershed_.Count();
+  RigorousMerge merge;
+  merge.Begin(count, merge_->Bands(), request_.sums);
+  LabelPairs pairs;
+  pairs.Begin(count);
+  if (!Gather(merge, pairs)) return false;
+  if (!IsAborted()) roots_ = merge.Join(pairs.TakePairs(), request_.mergeValue);
+  return true;
+}
+
+template <typename T>
+bool SeamlessSegmentation<T>::Write() {
+  detail::StripProcess process("SeamlessLabels", NextPass());
+  const auto numbers = process.template TakeSlot<TileSlot<Scalar<unsigned>>>();
+  const auto tiles = process.template TakeSlot<TileSlot<std::int32_t>>();
+  process.SetStrips(watershed_.Strips());
+  process.template AddTask<StripNumberTask>(ArgIDs({numbers.id}), MakeSetup(watershed_.Strips()));
+  SegmentNumbers segments(watershed_, std::move(roots_), request_.bordersOnly);
+  TilePool<std::int32_t> pool;
+  process.Add("Labels", StageOrder::kSeveralAtOnce, [&](ArgList& token, const AbortFlag*) {
+    const TilePtr<std::int32_t> tile = pool.Take();
+    return segments.FindSegments(*FindScalarValue<unsigned>(token.Get(numbers.id)), *tile) &&
+           tiles.Put(token, tile);
+  });
+  process.Add("Numbers", StageOrder::kOneByOne, [&](ArgList& token, const AbortFlag*) {
+    segments.Number(*tiles.In(token));
+    return true;
+  });
+  process.Write(
+      tiles, RasterIteratorPtr<std::int32_t>(new RasterIterator<std::int32_t>(labels_, Strips(0))));
+  process.Close();
+  return process.RunProcess(process.kHere);
+}
+
+}  // namespace lumo

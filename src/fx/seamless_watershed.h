@@ -1,0 +1,120 @@
+#pragma once
+
+#include <memory>
+#include <string>
+#include <vector>
+
+#include "foundation/run_controls.h"
+#include "fx/strip_drains.h"
+#include "platform/random_access_file.h"
+#include "tasks/scratch_pool.h"
+
+namespace lumo {
+
+/// Labels the catchment basins of an image of any size, strip by strip: the same basins as
+/// Watershed on the whole, for any height of the strips.
+///
+/// Which neighbour a pixel drains to depends on its own neighbours alone, but on plateaus also on
+/// how far lower ground is. So every strip finds these distances from its own lower ground, and
+/// from the distances in the lines that border on it; strips whose neighbours came nearer begin
+/// again, until none does. Plateaus without a way down are joined where strips meet, and the pixels
+/// there are followed to the minima that they drain to. Then every strip can be labelled on its
+/// own.
+///
+/// Cost: a byte a pixel in a file without a name, read and written twice and read once for each
+/// labelling; in memory 12 bytes a minimum, 25 a pixel of the lines at which strips meet, and a few
+/// bytes a pixel of the strips that are worked on.
+/// Threads: AddStrip and Label may be called for several strips at once; Connect works on all
+///          threads. Failure: false, with the fault set.
+///
+///     SeamlessWatershed watershed;
+///     if (!watershed.Begin({width, height, 64})) return false;
+///     for (unsigned strip = 0; strip < watershed.Strips(); ++strip) {
+///       if (!watershed.AddStrip(strip, LevelsOf(strip))) return false;
+///     }
+///     if (!watershed.Connect(nullptr) || !watershed.Label(0, labels.data())) return false;
+class VEXG_EXPORT SeamlessWatershed {
+ public:
+  /// How an image is cut: the last strip may be lower.
+  struct Cut {
+    std::uint32_t width = 0;
+    std::uint32_t height = 0;
+    std::uint32_t stripLines = 0;
+  };
+
+  /// The levels of a strip, with one line above and one below it where the image has them.
+  struct StripLevels {
+    const std::int32_t* levels = nullptr;    ///< from the first line on, that above included
+    const std::uint8_t* excluded = nullptr;  ///< like `levels`; null when no pixel is
+  };
+
+  /// Takes an image of one pixel or more, and forgets the last one.
+  bool Begin(const Cut& cut);
+
+  /// How many strips there are.
+  unsigned Strips() const { return static_cast<unsigned>(strips_.size()); }
+  /// The lines of a strip.
+  std::uint32_t LinesOf(unsigned strip) const;
+  std::uint32_t Width() const { return cut_.width; }
+
+  /// Takes the levels of a strip; each strip once.
+  bool AddStrip(unsigned strip, const StripLevels& from);
+
+  /// Connects the strips, behind all of them. After an abort nothing may be asked any more.
+  bool Connect(const AbortFlag* abort);
+
+  /// How many minima there are. Labels go from 1 to this, in the order of their first pixels.
+  std::uint32_t Count() const { return count_; }
+  /// For each label its number in the order of levels, and of first pixels where these are equal,
+  /// which is the label that Watershed gives. Empties the list.
+  std::vector<std::uint32_t> TakeRanks() { return std::move(ranks_); }
+
+  /// Labels a strip: 0 for excluded pixels.
+  bool Label(unsigned strip, std::int32_t* labels) const;
+  /// The labels of the line above a strip, and below it; null where there is none.
+  const std::int32_t* LabelsAbove(unsigned strip) const {
+    return strip == 0 ? nullptr : strips_[strip - 1].lastLabels.data();
+  }
+  const std::int32_t* LabelsBelow(unsigned strip) const {
+    return strip + 1 < strips_.size() ? strips_[strip + 1].firstLabels.data() : nullptr;
+  }
+
+ private:
+  /// A plateau, or the part of one in a strip, without a way down inside.
+  struct Minimum {
+    std::uint32_t first;  // pixel of the strip
+    std::int32_t level;
+  };
+
+  struct Strip {
+    std::vector<std::uint32_t> first, last;  // distances of the pixels of these lines
+    std::vector<StripDrains::Cell> same;     // of the first line: who is on the level above
+    std::vector<std::int32_t> firstLabels, lastLabels;  // below 0: see Beyond
+    std::vector<Minimum> minima;
+    std::uint32_t base = 0;  // number of the first of them
+  };
+
+  StripDrains::Beyond BeyondOf(unsigned strip) const;
+  bool ComesNearer(unsigned strip) const;
+  bool Settle(const AbortFlag* abort);
+  bool Drain(unsigned strip, StripDrains& drains);
+  bool FindWays(unsigned strip);
+  bool JoinMinima();
+  void NumberMinima(std::vector<std::int32_t>&& levels);
+  void FollowSeams();
+  std::int32_t& SeamLabel(unsigned strip, std::int32_t beyond);
+  bool ReadCells(unsigned strip, StripDrains& drains) const;
+  bool WriteCells(unsigned strip, const std::vector<StripDrains::Cell>& cells);
+  template <typename Work>
+  bool ForEachStrip(const std::vector<unsigned>& strips, const AbortFlag* abort, const Work& work);
+
+  Cut cut_;
+  std::unique_ptr<platform::RandomAccessFile> file_;
+  std::vector<Strip> strips_;
+  std::vector<std::uint32_t> labels_;  // of the minima of all strips, by number
+  std::vector<std::uint32_t> ranks_;   // by label
+  std::uint32_t count_ = 0;
+  mutable ScratchPool<StripDrains> drains_;
+};
+
+}  // namespace lumo

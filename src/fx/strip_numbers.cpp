@@ -1,0 +1,87 @@
+#include "fx/strip_numbers.h"
+
+#include <algorithm>
+
+#include "fx/task_setup.h"
+#include "tasks/task_errors.h"
+
+namespace lumo {
+
+StripNumberTask::StripNumberTask(ArgList& setup) : SequentialTask("StripNumberTask") {
+  if (!ReadSetup(setup, 0, count_)) SetErrorState(TaskErrorBadParams());
+}
+
+bool StripNumberTask::Execute(ArgList& args) {
+  return !HasError() && next_ < count_ && args.Set(0, MakeSetup(next_++));
+}
+
+SegmentNumbers::SegmentNumbers(const SeamlessWatershed& basins, std::vector<std::uint32_t>&& roots,
+                               bool bordersOnly)
+    : basins_(basins), roots_(std::move(roots)), bordersOnly_(bordersOnly) {
+  if (!roots_.empty()) roots_[0] = 0;  // excluded pixels
+  if (!bordersOnly_) numbers_.assign(std::size_t{basins.Count()} + 1, 0);
+}
+
+bool SegmentNumbers::FindSegments(unsigned strip, Tile<std::int32_t>& tile) const {
+  TileDimensions size;
+  size.width = basins_.Width();
+  size.height = basins_.LinesOf(strip);
+  size.bands = 1;
+  if (!tile.ResizeForOverwrite(size)) return false;
+  tile.SetIndex({0, strip});
+  std::fill(tile.StateArray().begin(), tile.StateArray().end(),
+            static_cast<unsigned char>(PixelValueState::Valid));
+  if (!basins_.Label(strip, tile.PixelArray().GetData())) return false;
+  for (std::int32_t& label : tile.PixelArray()) label = RootOf(label);
+  if (bordersOnly_) MarkBorders(strip, tile);
+  return true;
+}
+
+void SegmentNumbers::MarkBorders(unsigned strip, Tile<std::int32_t>& tile) const {
+  const std::size_t width = tile.Width(), lines = tile.Height();
+  const bool isLast = strip + 1 == basins_.Strips();
+  // The line that a line is compared with; a raster of one line compares it with itself.
+  const auto lineOf = [width](const std::int32_t* from) {
+    return std::vector<std::int32_t>(from, from + width);
+  };
+  const auto rootsOf = [&](const std::int32_t* from) {
+    std::vector<std::int32_t> line = lineOf(from);
+    for (std::int32_t& label : line) label = RootOf(label);
+    return line;
+  };
+  std::int32_t* const pixels = tile.PixelArray().GetData();
+  const std::vector<std::int32_t> below =
+      isLast ? std::vector<std::int32_t>() : rootsOf(basins_.LabelsBelow(strip));
+  std::vector<std::int32_t> before =
+      strip == 0 ? lineOf(pixels) : rootsOf(basins_.LabelsAbove(strip));
+  // The last but one line of the raster, and the last, look back.
+  const auto looksBack = [&](std::size_t y) {
+    const std::size_t behind = lines - 1 - y;
+    return isLast ? behind < 2
+                  : behind == 0 && basins_.LinesOf(strip + 1) == 1 && strip + 2 == basins_.Strips();
+  };
+  for (std::size_t y = 0; y < lines; ++y) {
+    std::int32_t* const to = pixels + y * width;
+    std::vector<std::int32_t> line = lineOf(to);
+    const std::int32_t* const other = looksBack(y)    ? before.data()
+                                      : y + 1 < lines ? to + width
+                                                      : below.data();
+    for (std::size_t x = 0; x < width; ++x) {
+      const std::size_t beside = x + 2 < width ? x + 1 : x == 0 ? 0 : x - 1;
+      to[x] = line[x] == line[beside] && line[x] == other[x] ? 0 : 1;
+    }
+    before.swap(line);
+  }
+}
+
+void SegmentNumbers::Number(Tile<std::int32_t>& tile) {
+  if (bordersOnly_) return;
+  for (std::int32_t& label : tile.PixelArray()) {
+    if (label == 0) continue;
+    std::int32_t& number = numbers_[static_cast<std::size_t>(label)];
+    if (number == 0) number = ++count_;
+    label = number;
+  }
+}
+
+}  // namespace lumo
