@@ -140,12 +140,12 @@ def speed(bench):
 
 
 def seams(bench):
-    """The faint fields in tiles of 50 x 50 pixels that overlap by one, beside the same as a whole."""
-    scene, _ = fields(bench, 300, "faint", 90, 140, 12)
+    """Hardly visible fields in tiles of 50 x 50 pixels that overlap by one, beside the same as a whole."""
+    scene, _ = fields(bench, 300, "hidden", 110, 125, 14)
     files = [bench.work / "in-tiles.tif", bench.work / "as-a-whole.tif"]
     for file, options in zip(files, (["--tiled", "--tile-border", "1", "--tile-memory", str(50 * 50 * BANDS)], [])):
         file.unlink(missing_ok=True)
-        subprocess.run([str(bench.vexg), "segment", str(scene), str(file), "-q", "--merge-value", "800", *options], check=True)
+        subprocess.run([str(bench.vexg), "segment", str(scene), str(file), "-q", "--merge-value", "600", *options], check=True)
     draw(scene, files, bench.work / "seams.png")
     print(f"{bench.work / 'seams.png'}: tiles that overlap by one pixel, and the whole")
 

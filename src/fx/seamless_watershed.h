@@ -22,7 +22,7 @@ namespace lumo {
 /// own.
 ///
 /// Cost: a byte a pixel in a file without a name, read and written twice and read once for each
-/// labelling; in memory 12 bytes a minimum, 25 a pixel of the lines at which strips meet, and a few
+/// labelling; in memory 20 bytes a minimum, 25 a pixel of the lines at which strips meet, and a few
 /// bytes a pixel of the strips that are worked on.
 /// Threads: AddStrip and Label may be called for several strips at once; Connect works on all
 ///          threads. Failure: false, with the fault set.
