@@ -10,7 +10,7 @@
 
 namespace lumo::host {
 
-/// What a scene is calibrated to, and by which constants.
+/// A calibration that a user asks for: of which quantity, and by which constants.
 struct CalibrationRequest {
   std::string quantity;                                  ///< radiance, reflectance or temperature
   std::vector<double> gain, offset, irradiance, k1, k2;  ///< for each band, or one for all
