@@ -291,7 +291,7 @@ Polygon2D<double> LoadFootprint(MosaicRasterDef<T>& definition, unsigned scene,
 }
 
 template <typename T>
-bool MakeSeams(MosaicRaster<T>& mosaic, const IPC& ipc) {
+bool MakeSeams(MosaicRaster<T>& mosaic, const IPC& ipc, Form sides) {
   MosaicRasterDef<T>& definition = *mosaic.Definition();
   if (!CheckScenes(definition)) return false;
   RemoveAbandonedSideFiles(definition.WorkingDirectory());
@@ -315,7 +315,7 @@ bool MakeSeams(MosaicRaster<T>& mosaic, const IPC& ipc) {
     loading.progress->Update((i + 1.0) / count);
   }
 
-  SeamGenerator seams(std::move(footprints));
+  SeamGenerator seams(std::move(footprints), sides);
   const IPC pairs = StepOf(ipc, 0.8 * rest);
   if (!seams.CutPairs(pairs)) return RefuseAborted();
   pairs.progress->Update(1);
@@ -337,7 +337,7 @@ bool MakeSeams(MosaicRaster<T>& mosaic, const IPC& ipc) {
                                                      const IPC&, unsigned&);                       \
   template VEXG_EXPORT Polygon2D<double> LoadFootprint<T>(MosaicRasterDef<T>&, unsigned,           \
                                                           const GeoRef&);                          \
-  template VEXG_EXPORT bool MakeSeams<T>(MosaicRaster<T>&, const IPC&);
+  template VEXG_EXPORT bool MakeSeams<T>(MosaicRaster<T>&, const IPC&, Form);
 VEXG_FOR_ALL(EIGHT, VEXG_SEAMS);
 #undef VEXG_SEAMS
 

@@ -41,6 +41,6 @@ VEXG_EXPORT Polygon2D<double> LoadFootprint(MosaicRasterDef<T>& definition, unsi
 /// @return false, with the fault set, when it failed or was aborted; files that were there before
 ///         stay then.
 template <typename T>
-VEXG_EXPORT bool MakeSeams(MosaicRaster<T>& mosaic, const IPC& ipc);
+VEXG_EXPORT bool MakeSeams(MosaicRaster<T>& mosaic, const IPC& ipc, Form sides = Form::kTold);
 
 }  // namespace lumo

@@ -42,8 +42,8 @@ Contour2DArray<double> TakeRingsNear(Contour2DArray<double>& rings, const Outlin
 
 }  // namespace
 
-SeamGenerator::SeamGenerator(std::vector<Polygon2D<double>> footprints)
-    : footprints_(std::move(footprints)), parts_(footprints_) {}
+SeamGenerator::SeamGenerator(std::vector<Polygon2D<double>> footprints, Form sides)
+    : footprints_(std::move(footprints)), sides_(sides), parts_(footprints_) {}
 
 bool SeamGenerator::CutPairs(const IPC& ipc) {
   const auto count = static_cast<unsigned>(footprints_.size());
@@ -79,7 +79,7 @@ void SeamGenerator::CutPair(unsigned first, unsigned second) {
     return;
   }
   Outline ofA, ofB;
-  const SplitOutcome outcome = SplitOverlap(a, b, common, ofA, ofB);
+  const SplitOutcome outcome = SplitOverlap(a, b, common, sides_, ofA, ofB);
   if (outcome != SplitOutcome::kDivided) {
     leave(outcome == SplitOutcome::kTooThin      ? PairLeftAlone::kTooThin
           : outcome == SplitOutcome::kComesApart ? PairLeftAlone::kComesApart

@@ -2,6 +2,7 @@
 
 #include <vector>
 
+#include "commands/value_text.h"
 #include "foundation/run_controls.h"
 #include "geometry/polygon2d.h"
 
@@ -34,7 +35,8 @@ struct LonePair {
 class VEXG_EXPORT SeamGenerator {
  public:
   /// @param footprints  with closed rings.
-  explicit SeamGenerator(std::vector<Polygon2D<double>> footprints);
+  /// @param sides       see SplitOverlap.
+  explicit SeamGenerator(std::vector<Polygon2D<double>> footprints, Form sides = Form::kTold);
 
   /// Divides the overlaps, pair by pair. @return false when it was aborted.
   bool CutPairs(const IPC& ipc);
@@ -51,6 +53,7 @@ class VEXG_EXPORT SeamGenerator {
   void CutPair(unsigned first, unsigned second);
 
   const std::vector<Polygon2D<double>> footprints_;
+  const Form sides_;
   std::vector<Polygon2D<double>> parts_;
   std::vector<LonePair> leftAlone_;
 };

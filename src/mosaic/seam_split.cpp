@@ -251,7 +251,7 @@ Sides CutRing(const CrossedRing& ring, const Shape& shape, const Points& seam) {
 
 /// True when the edge of a lies farther from the apex side, or from the side with b, than that of
 /// b.
-bool IsAFarther(const Shape& shape, const Outline& a, const Outline& b) {
+bool IsAFarther(const Shape& shape, const Outline& a, const Outline& b, Form sides) {
   Points probes;
   const auto middle = [](const Point& p, const Point& q) {
     return Point{(p.x + q.x) / 2, (p.y + q.y) / 2};
@@ -264,7 +264,8 @@ bool IsAFarther(const Shape& shape, const Outline& a, const Outline& b) {
       probes = {shape.c, shape.d};
       break;
     default:
-      probes = {shape.b, middle(shape.a, shape.b), middle(shape.c, shape.d)};
+      probes = {shape.b, middle(shape.a, shape.b),
+                middle(shape.c, sides == Form::kTold ? shape.d : shape.b)};
   }
   double fromA = 0, fromB = 0;
   for (const Point& probe : probes) {
@@ -295,7 +296,7 @@ SplitOutcome Settle(const Outline& a, const Outline& b, const Outline& overlap, 
 }  // namespace
 
 SplitOutcome SplitOverlap(const Polygon2D<double>& a, const Polygon2D<double>& b,
-                          const Polygon2D<double>& overlap, Polygon2D<double>& ofA,
+                          const Polygon2D<double>& overlap, Form sides, Polygon2D<double>& ofA,
                           Polygon2D<double>& ofB) {
   if (overlap.Rings().empty()) return SplitOutcome::kImpossible;
   Points ring = overlap.Rings()[0].points;
@@ -309,11 +310,11 @@ SplitOutcome SplitOverlap(const Polygon2D<double>& a, const Polygon2D<double>& b
   const bool isTriangle = shape.kind == Shape::Kind::kTriangle;
   if (!(isTriangle ? TriangleSeam(shape, seam) : QuadrilateralSeam(shape, seam)))
     return SplitOutcome::kImpossible;
-  const Sides sides = CutRing(crossed, shape, seam);
+  const Sides cut = CutRing(crossed, shape, seam);
   // The side that a lies farther from stays with a: it is x of a two-sided shape, else y.
-  const bool losesX = IsAFarther(shape, a, b) != (shape.kind == Shape::Kind::kTwoSided);
-  ofA = Without(a, losesX ? sides.x : sides.y);
-  ofB = Without(b, losesX ? sides.y : sides.x);
+  const bool losesX = IsAFarther(shape, a, b, sides) != (shape.kind == Shape::Kind::kTwoSided);
+  ofA = Without(a, losesX ? cut.x : cut.y);
+  ofB = Without(b, losesX ? cut.y : cut.x);
   if (IsEmptyOutline(ofA) || IsEmptyOutline(ofB)) return SplitOutcome::kImpossible;
   RemoveSpikes(ofA, kSpikeAngle);
   RemoveSpikes(ofB, kSpikeAngle);

@@ -1,5 +1,6 @@
 #pragma once
 
+#include "commands/value_text.h"
 #include "geometry/polygon2d.h"
 
 namespace lumo {
@@ -21,11 +22,15 @@ enum class SplitOutcome {
 /// lies farther from it. An overlap thinner than 10 pixels at every vertex is not divided.
 ///
 /// @param overlap    what a and b have in common; its first ring is divided.
+/// @param sides      whether, of an overlap with four corners a, b, c, d, the middles of a, b and
+/// of
+///                   c, d tell how far an edge is (Told), or those of a, b and of b, c (Exact),
+///                   which all lie on one side: of two scenes side by side each keeps its own then.
 /// @param ofA, ofB   [out] what remains of a and of b, where the overlap is divided.
 /// @return kImpossible where there are fewer than two crossings, where corners coincide, where
 ///         bisectors do not meet, and where nothing of an outline would remain.
 VEXG_EXPORT SplitOutcome SplitOverlap(const Polygon2D<double>& a, const Polygon2D<double>& b,
-                                      const Polygon2D<double>& overlap, Polygon2D<double>& ofA,
-                                      Polygon2D<double>& ofB);
+                                      const Polygon2D<double>& overlap, Form sides,
+                                      Polygon2D<double>& ofA, Polygon2D<double>& ofB);
 
 }  // namespace lumo

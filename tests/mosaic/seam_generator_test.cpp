@@ -192,6 +192,14 @@ TEST(SeamGenerator, ASeamFollowsTheMiddleOfTheOverlap) {
   }
 }
 
+TEST(SeamGenerator, ScenesSideBySideKeepTheirOwnSide) {
+  SeamGenerator seams({Box(0, 0, 200, 300), Box(140, 0, 340, 300)}, Form::kExact);
+  ASSERT_TRUE(Generate(seams));
+  const Outline mine = Clip(ClipOperation::kDifference, Box(0, 0, 140, 300), seams.Parts()[0]);
+  EXPECT_LT(AreaOf(mine), 1);  // neither loses ground that it alone has, or gets its pieces back
+  for (const Outline& part : seams.Parts()) EXPECT_EQ(part.Rings().size(), 1U);
+}
+
 TEST(SeamGenerator, LeavesPairsAloneByTheRules) {
   const Outline two({Ring({{0, 0}, {100, 0}, {100, 100}, {0, 100}}),
                      Ring({{0, 300}, {100, 300}, {100, 400}, {0, 400}})});

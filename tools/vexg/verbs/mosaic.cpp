@@ -374,7 +374,9 @@ class MosaicVerb final : public RasterVerb {
   }
 
   static void AddSeams(JobDraft& draft, const char* name, const String& mosaic) {
-    draft.Step(name, "MosaicAutoSeamGenCommand").AddInput("MosaicURI", mosaic);
+    JobWriterCommand& seams = draft.Step(name, "MosaicAutoSeamGenCommand");
+    seams.AddInput("MosaicURI", mosaic);
+    seams.AddInput("Sides", Form::kExact);
   }
 
   // Building.
