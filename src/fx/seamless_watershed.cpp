@@ -4,6 +4,7 @@
 #include <limits>
 #include <numeric>
 
+#include "data/access_policy.h"
 #include "foundation/fault.h"
 #include "tasks/parallel.h"
 
@@ -28,7 +29,9 @@ bool SeamlessWatershed::Begin(const Cut& cut) {
     return false;
   }
   std::string fault;
-  file_ = platform::RandomAccessFile::CreateUnnamed(&fault);
+  // Where the process keeps to some folders, no other one can be written to.
+  const std::vector<std::string> roots = GetAccessPolicy().roots;
+  file_ = platform::RandomAccessFile::CreateUnnamed(roots.empty() ? "" : roots.front(), &fault);
   if (!file_) return FailBy(fault);
   strips_.clear();
   strips_.resize((std::uint64_t{cut.height} + cut.stripLines - 1) / cut.stripLines);

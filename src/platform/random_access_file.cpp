@@ -142,9 +142,10 @@ std::unique_ptr<RandomAccessFile> RandomAccessFile::Create(const std::string& pa
   return std::unique_ptr<RandomAccessFile>(new RandomAccessFile(path, file.Release()));
 }
 
-std::unique_ptr<RandomAccessFile> RandomAccessFile::CreateUnnamed(std::string* fault) {
+std::unique_ptr<RandomAccessFile> RandomAccessFile::CreateUnnamed(std::string folder,
+                                                                  std::string* fault) {
   const char* const wanted = std::getenv("TMPDIR");
-  const std::string folder = wanted != nullptr && *wanted != '\0' ? wanted : "/var/tmp";
+  if (folder.empty()) folder = wanted != nullptr && *wanted != '\0' ? wanted : "/var/tmp";
   constexpr mode_t kOwnersAlone = 0600;
   FileDescriptor file(RetryInterrupted(
       [&] { return open(folder.c_str(), O_RDWR | O_TMPFILE | O_CLOEXEC, kOwnersAlone); }));

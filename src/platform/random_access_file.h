@@ -58,9 +58,11 @@ class VEXG_EXPORT RandomAccessFile {
   static std::unique_ptr<RandomAccessFile> CreateOrEmpty(const std::string& path,
                                                          std::string* fault = nullptr);
 
-  /// Makes an empty file without a name in $TMPDIR, or where that isn't set in /var/tmp, and opens
-  /// it for kUpdate. It goes with its last user, whatever ends him. Path() names the folder.
-  static std::unique_ptr<RandomAccessFile> CreateUnnamed(std::string* fault = nullptr);
+  /// Makes an empty file without a name, and opens it for kUpdate. It goes with its last user,
+  /// whatever ends him. Path() names the folder.
+  /// @param folder  empty for $TMPDIR, or where that isn't set /var/tmp.
+  static std::unique_ptr<RandomAccessFile> CreateUnnamed(std::string folder,
+                                                         std::string* fault = nullptr);
 
   ~RandomAccessFile();
   RandomAccessFile(const RandomAccessFile&) = delete;

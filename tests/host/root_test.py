@@ -234,6 +234,8 @@ class Roots(PipeTest, FolderTest):
         self.assertEqual((code, err), (0, ""))
         code, _, err = run("pyramid", "build", scene, "--server", "test")
         self.assertEqual((code, err), (0, ""))
+        code, _, err = run("segment", scene, self.inside / "labels.tif", "--server", "test", "-q")  # with a working file
+        self.assertEqual((code, err), (0, ""))
 
     def test_inside_everything_opens(self):
         odd = self.inside / "vsi_scenes"
