@@ -105,7 +105,8 @@ bool ReadNoData(const File& file, const Image& image, std::optional<double>& val
   return true;
 }
 
-/// Of a file that GDAL laid out as "cloud optimised"; nothing for one that was changed afterwards.
+/// Tells whether GDAL laid the file out as "cloud optimised"; nothing for one that was changed
+/// afterwards.
 std::optional<bool> IsCloudOptimised(const File& file) {
   const std::string head = file.Head();
   if (!head.starts_with("GDAL_STRUCTURAL_METADATA_SIZE=")) return false;

@@ -19,7 +19,7 @@ constexpr double kSteps[] = {4096, 16384, 65536};
 
 constexpr double kFarthest = 1e12;
 
-// Of a ring that is kept, in units.
+// A ring that is kept has this area, in units, at least.
 constexpr double kLeastArea = 2 / (kSteps[0] * kSteps[0]);
 
 /// How the integers of an operation lie: from a whole number on, so that the steps lie alike in all

@@ -29,8 +29,8 @@ struct SceneDistribution {
 /// The values that give a scene the distribution of a reference, one for each of its bins
 /// (histogram matching; Gonzalez and Woods, Digital Image Processing, section 3.3). Between two
 /// bins of the reference the value is the mean of theirs, weighted by the inverse distance.
-/// Where one of the two has counted nothing, or the reference has one bin alone, each bin keeps its
-/// own value.
+/// Each bin keeps its own value where one of the two has counted nothing, or the reference has one
+/// bin alone.
 VEXG_EXPORT std::vector<double> MatchDistributions(const ReferenceDistribution& reference,
                                                    const SceneDistribution& scene);
 

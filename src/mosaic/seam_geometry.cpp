@@ -9,7 +9,7 @@ namespace {
 
 using Point = Point2D<double>;
 
-// Of a spike: how far a neighbour may lie from the edge to the other one, squared.
+// The neighbour of a spike lies this near to the edge to the other one, squared.
 constexpr double kSpikeWidth = 0.25 * 0.25;
 
 double SquaredLength(const Point& a, const Point& b) {
