@@ -103,6 +103,16 @@ CommandResult ClassScoresCommand::Finish(bool isDone) {
   return Fail(TakeFaultOr("the scores can't be written"));
 }
 
+InputDeclaration ExamplesInput() {
+  return {"ExampleDefinition", Presence::kRequired, ValueKind::kIntegerArray,
+          "rows of class and region, each an example"};
+}
+
+InputDeclaration ChoicesInput() {
+  return {"AttributeDefinition", Presence::kRequired, ValueKind::kIntegerArray,
+          "rows of file, attribute and band"};
+}
+
 InputDeclaration AttributesInput() {
   return {"AttributesFXA", Presence::kRequired, ValueKind::kTextList, "the files of regions"};
 }

@@ -47,6 +47,8 @@ class ClassScoresCommand : public RegionCommand {
 };
 
 /// The inputs that the commands share.
+InputDeclaration ExamplesInput();
+InputDeclaration ChoicesInput();
 InputDeclaration AttributesInput();
 InputDeclaration StatisticsInput();
 InputDeclaration ScoresInput();

@@ -13,12 +13,10 @@ const CommandDeclaration kFit{
     "Feature extraction",
     "Fits the model by which FxComputePCAClassificationCommand scores regions, from examples. A "
     "command of this library's own.",
-    {{"ExampleDefinition", Presence::kRequired, ValueKind::kIntegerArray,
-      "rows of class and region, each an example"},
+    {ExamplesInput(),
      AttributesInput(),
      StatisticsInput(),
-     {"AttributeDefinition", Presence::kRequired, ValueKind::kIntegerArray,
-      "rows of file, attribute and band"},
+     ChoicesInput(),
      {"Variance", Presence::kOptional, ValueKind::kNumber,
       "the share of the variance that the components hold at least, above 0 to 1; 0.99 when "
       "absent"}},

@@ -150,8 +150,10 @@ std::unique_ptr<RandomAccessFile> RandomAccessFile::CreateUnnamed(std::string fo
   FileDescriptor file(RetryInterrupted(
       [&] { return open(folder.c_str(), O_RDWR | O_TMPFILE | O_CLOEXEC, kOwnersAlone); }));
   if (!file.IsOpen() && (errno == EOPNOTSUPP || errno == EISDIR || errno == EINVAL)) {
-    std::string path = folder + "/vexg-XXXXXX";  // the file system knows no files without names
-    file = FileDescriptor(mkostemp(path.data(), O_CLOEXEC));
+    // The file system knows no files without names: one gets a name for a moment.
+    const std::string path = TemporaryPathBeside(folder + "/vexg");
+    file = FileDescriptor(RetryInterrupted(
+        [&] { return open(path.c_str(), O_RDWR | O_CREAT | O_EXCL | O_CLOEXEC, kOwnersAlone); }));
     if (file.IsOpen()) unlink(path.c_str());
   }
   if (!file.IsOpen()) {
