@@ -156,7 +156,7 @@ RasterPtr<T> MosaicRaster<T>::OnGrid(unsigned scene) {
   return onGrid_->Get(scene, [&]() -> RasterPtr<T> {
     const MosaicSettings& settings = definition_->Settings();
     const ProjectedRasterOptions options{ProjectedGrid::kExact, WarpSampling::kCentred,
-                                         settings.noData};
+                                         settings.noData, KernelOf(settings.resampling)};
     const RasterPtr<T> view(new ProjectedRaster<T>(definition_->Scenes()[scene], def_.geoRef,
                                                    ReprojectionMethod::kPolynomial,
                                                    settings.resampling, options));

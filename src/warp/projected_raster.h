@@ -23,6 +23,8 @@ struct ProjectedRasterOptions {
   /// The no-data value of all bands, which pixels outside the parent have; otherwise the parent's.
   /// With one that the pixel type can't hold, bands have none.
   std::optional<double> noData;
+  /// The kernel in place of the resampling and the sampling; for an exact grid.
+  WarpKernel kernel = WarpKernel::kTold;
 };
 
 /// Shows its parent in the grid of another geo-reference. Nothing is computed until a block is
@@ -45,7 +47,7 @@ struct ProjectedRasterOptions {
 ///     const GeoRefPtr grid(new StdGeoRef(target));  // with its size set
 ///     const RasterPtr<float> warped(new ProjectedRaster<float>(
 ///         raster, grid, ReprojectionMethod::kRigorous, PyramidResamplingMethod::kCubic,
-///         {ProjectedGrid::kExact, WarpSampling::kCentred, -9999.0}));
+///         {ProjectedGrid::kExact, WarpSampling::kCentred, -9999.0, WarpKernel::kCubic}));
 template <typename T>
 class ProjectedRaster final : public ComputedRaster<T> {
  public:

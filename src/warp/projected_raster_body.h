@@ -61,8 +61,10 @@ bool ProjectedRaster<T>::SetUp() {
     constexpr unsigned kSquares = 256;
     grid = CloneOf(target_);
     const bool isRigorous = method_ == ReprojectionMethod::kRigorous;
-    reprojection_.SetMap(std::make_shared<WarpMap>(grid, def_.geoRef, def_.samples, def_.lines,
-                                                   isRigorous ? 0.0 : WarpMap::kUsualTolerance));
+    const auto map = std::make_shared<WarpMap>(grid, def_.geoRef, def_.samples, def_.lines,
+                                               isRigorous ? 0.0 : WarpMap::kUsualTolerance);
+    if (options_.kernel != WarpKernel::kTold) map->MeasureFootprints();
+    reprojection_.SetMap(map);
     def_.tileWidth = def_.tileHeight = kSquares;  // squares cover least of a turned source
   } else {
     grid = ComputedGrid(*def_.geoRef);
@@ -81,6 +83,7 @@ bool ProjectedRaster<T>::SetUp() {
     reprojection_.SetBackground(*options_.noData);
   }
   reprojection_.SetSampling(options_.sampling);
+  if (options_.grid == ProjectedGrid::kExact) reprojection_.SetKernel(options_.kernel);
   reprojection_.SetOutputGrid(def_.geoRef);
   return true;
 }

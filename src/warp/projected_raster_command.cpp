@@ -29,6 +29,12 @@ const CommandDeclaration kProjected{
       "they "
       "weigh from the centres, round to the nearest, and leave out pixels that aren't valid",
       "", &WordsIn<WarpSampling>},
+     {"Kernel", Presence::kOptional, ValueKind::kWord,
+      "in place of ResamplingMethod and Sampling, on an exact grid. Told: those; Nearest; Linear, "
+      "Cubic (-0.5) and Lanczos are stretched over the area that a pixel covers; Average, Mode, "
+      "Min, "
+      "Max and Median are of the pixels in it",
+      "", &WordsIn<WarpKernel>},
      {"NoData", Presence::kOptional, ValueKind::kNumber,
       "the no-data value of all bands, outside the raster too; the raster's own when absent"}},
     PublishedOutputs()};
@@ -43,6 +49,10 @@ class CreateProjectedRasterCommand final : public ViewCommand {
     ProjectedRasterOptions options;
     if (HasInput("Grid")) options.grid = Read<ProjectedGrid>("Grid");
     if (HasInput("Sampling")) options.sampling = Read<WarpSampling>("Sampling");
+    if (HasInput("Kernel")) options.kernel = Read<WarpKernel>("Kernel");
+    if (options.kernel != WarpKernel::kTold && options.grid != ProjectedGrid::kExact) {
+      return Fail("Kernel: only on an exact grid");
+    }
     if (HasInput("NoData")) options.noData = Read<double>("NoData");
     const BasicRasterPtr parent = options.noData ? FindRaster("SrcURI") : BasicRasterPtr();
     if (parent && !FitsPixel(parent->DataType(), *options.noData)) {

@@ -12,6 +12,7 @@
 namespace lumo {
 
 struct WarpLimits;
+struct WarpRule;
 class WarpPositions;
 template <typename T>
 class WarpParallel;
@@ -73,6 +74,9 @@ class Reprojection {
   /// Has positions come from a map of the grid, of the raster that Reproject is given, and no
   /// longer from the method.
   void SetMap(std::shared_ptr<const WarpMap> map) { map_ = std::move(map); }
+  /// Replaces the resampling by a kernel that reads from centres. It wants a map, and one that
+  /// widens wants a map that measures footprints.
+  void SetKernel(WarpKernel kernel);
   /// Sets the value of pixels outside the source; at first, and with one that T can't hold, it is
   /// the source's no-data value, or 0.
   void SetBackground(double value) { background_ = value; }
@@ -109,8 +113,11 @@ class Reprojection {
   std::unique_ptr<WarpParallel<T>> MakeSampler(const WarpPositions& positions, unsigned lines,
                                                const WarpLimits& limits,
                                                const WarpSource<T>& source,
-                                               const WarpTarget<T>& target) const;
-  WarpLimits LimitsIn(const SubRectProj& pixels, double noise) const;
+                                               const WarpTarget<T>& target,
+                                               const WarpRule& rule) const;
+  bool CanHalve(const SubRectProj& part) const;
+  WarpRule RuleOf(const WarpPiece& piece) const;
+  WarpLimits LimitsIn(const SubRectProj& pixels, double noise, bool isOfFootprints = false) const;
   std::unique_ptr<Window> TakeWindow() const;
   void GiveBack(std::unique_ptr<Window> window) const;
 
@@ -122,6 +129,7 @@ class Reprojection {
   GeoRefPtr outputGrid_;
   bool pixelCentres_ = true;
   WarpSampling sampling_ = WarpSampling::kCorner;
+  WarpKernel kernel_ = WarpKernel::kTold;
   std::shared_ptr<const WarpMap> map_;
   std::optional<double> background_;
   mutable std::mutex windowsLock_;

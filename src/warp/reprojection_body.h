@@ -10,6 +10,7 @@
 #include "raster/pixel_states.h"
 #include "raster/pixel_value.h"
 #include "raster/raster_def.h"
+#include "warp/footprint_sampler.h"
 #include "warp/reprojection.h"
 #include "warp/warp_samplers.h"
 
@@ -56,10 +57,6 @@ inline SubRectProj HalfOf(const SubRectProj& rect, bool second) {
   const std::int32_t middle = low + (high - low) / 2;
   (second ? low : high) = second ? middle + 1 : middle;
   return half;
-}
-
-inline bool CanHalve(const SubRectProj& rect) {
-  return std::max(rect.Width(), rect.Height()) > kWarpLeastSide;
 }
 
 inline void LogSourceRect(const SubRectProj& rect, const BasicRaster& source) {
@@ -135,6 +132,20 @@ struct Reprojection<T>::MappedPart {
       if (pieces[strips[i].piece].way != WarpPiece::Way::kTransform) return;
       map.Transform(strips[i].rect, &positions[strips[i].positions]);
     });
+  }
+
+  /// Pixels around a position that are read.
+  /// @param least  as many as the resampling needs.
+  std::int32_t Margin(std::int32_t least, WarpKernel kernel) const {
+    if (kernel == WarpKernel::kTold || kernel == WarpKernel::kNearest) return least;
+    double reach = least;
+    for (const WarpPiece& piece : pieces) {
+      if (piece.way == WarpPiece::Way::kOutside) continue;
+      const double size = std::max(piece.footprint.width, piece.footprint.height);
+      reach = std::max(reach, KernelReach(kernel, size) + 1);
+    }
+    constexpr double kMost = std::numeric_limits<std::int32_t>::max() / 2;
+    return static_cast<std::int32_t>(std::min(std::ceil(reach), kMost));
   }
 
   /// The pixels of the source on which its positions fall.
@@ -215,7 +226,7 @@ typename Reprojection<T>::Outcome Reprojection<T>::RunPart(Work& work,
   };
   CoveredRect covered = cover(false);
   if (covered.isPartial) {
-    if (detail::CanHalve(part)) return RunHalves(work, part);
+    if (CanHalve(part)) return RunHalves(work, part);
     covered = cover(true);
   }
   if (covered.misses) {
@@ -226,7 +237,7 @@ typename Reprojection<T>::Outcome Reprojection<T>::RunPart(Work& work,
   detail::LogSourceRect(from, work.parent);
   const std::uint64_t bytes = static_cast<std::uint64_t>(from.Width() * from.Height()) *
                               work.bands.GetCount() * (sizeof(T) + 1);
-  if (bytes > detail::kWarpWindowBytes && detail::CanHalve(part)) return RunHalves(work, part);
+  if (bytes > detail::kWarpWindowBytes && CanHalve(part)) return RunHalves(work, part);
   std::unique_ptr<Window> window = TakeWindow();
   const bool fetched = Fetch(work, from, *window);
   if (fetched) SamplePart(work, *window, part);
@@ -237,7 +248,7 @@ typename Reprojection<T>::Outcome Reprojection<T>::RunPart(Work& work,
 template <typename T>
 typename Reprojection<T>::Outcome Reprojection<T>::RunMapped(Work& work,
                                                              const SubRectProj& part) const {
-  if (part.Width() * part.Height() > detail::kWarpMappedPixels && detail::CanHalve(part)) {
+  if (part.Width() * part.Height() > detail::kWarpMappedPixels && CanHalve(part)) {
     return RunHalves(work, part);
   }
   const MappedPart mapped(*work.map, part);
@@ -246,11 +257,11 @@ typename Reprojection<T>::Outcome Reprojection<T>::RunMapped(Work& work,
     detail::FillBackground(detail::TargetOf(work.target, work.rect, part), part);
     return Outcome::kMissed;
   }
-  const SubRectProj from = bounds.Pixels(SamplingMargin(resampling_));
+  const SubRectProj from = bounds.Pixels(mapped.Margin(SamplingMargin(resampling_), kernel_));
   detail::LogSourceRect(from, work.parent);
   const std::uint64_t bytes = static_cast<std::uint64_t>(from.Width() * from.Height()) *
                               work.bands.GetCount() * (sizeof(T) + 1);
-  if (bytes > detail::kWarpWindowBytes && detail::CanHalve(part)) return RunHalves(work, part);
+  if (bytes > detail::kWarpWindowBytes && CanHalve(part)) return RunHalves(work, part);
   std::unique_ptr<Window> window = TakeWindow();
   const bool fetched = Fetch(work, from, *window);
   if (fetched) SampleMapped(work, *window, mapped);
@@ -282,7 +293,10 @@ void Reprojection<T>::SampleMapped(Work& work, const Window& window,
                     : WarpPositions(piece.fit, width, double(strip.rect.left) - piece.originX + 0.5,
                                     double(strip.rect.top) - piece.originY + 0.5);
     const auto lines = static_cast<unsigned>(strip.rect.Height());
-    MakeSampler(positions, lines, LimitsIn(all, noise), window.source, target)->Body(0, lines);
+    const WarpRule rule = RuleOf(piece);
+    const bool isOfFootprints = IsOfFootprints(rule);
+    MakeSampler(positions, lines, LimitsIn(all, noise, isOfFootprints), window.source, target, rule)
+        ->Body(0, lines);
   });
 }
 
@@ -305,6 +319,24 @@ Reprojection<T>::Reprojection(const GeoRefPtr& target, ReprojectionMethod method
 
 template <typename T>
 Reprojection<T>::~Reprojection() = default;
+
+template <typename T>
+void Reprojection<T>::SetKernel(WarpKernel kernel) {
+  kernel_ = kernel;
+  if (kernel == WarpKernel::kTold) return;
+  sampling_ = WarpSampling::kCentred;
+  using enum PyramidResamplingMethod;
+  resampling_ = kernel == WarpKernel::kNearest  ? kNearest
+                : kernel == WarpKernel::kLinear ? kLinear
+                                                : kCubic;
+}
+
+/// Footprints may be so large that only a few pixels go together.
+template <typename T>
+bool Reprojection<T>::CanHalve(const SubRectProj& part) const {
+  const std::int64_t least = kernel_ == WarpKernel::kTold ? detail::kWarpLeastSide : 1;
+  return std::max(part.Width(), part.Height()) > least;
+}
 
 template <typename T>
 std::unique_ptr<typename Reprojection<T>::Window> Reprojection<T>::TakeWindow() const {
@@ -344,7 +376,13 @@ bool Reprojection<T>::Fetch(Work& work, const SubRectProj& rect, Window& window)
 }
 
 template <typename T>
-WarpLimits Reprojection<T>::LimitsIn(const SubRectProj& pixels, double noise) const {
+WarpRule Reprojection<T>::RuleOf(const WarpPiece& piece) const {
+  return {sampling_, kernel_, piece.footprint};
+}
+
+template <typename T>
+WarpLimits Reprojection<T>::LimitsIn(const SubRectProj& pixels, double noise,
+                                     bool isOfFootprints) const {
   const bool isNearest = resampling_ == PyramidResamplingMethod::kNearest;
   const bool isCorner = sampling_ == WarpSampling::kCorner;
   const int last = isNearest && isCorner && method_ == ReprojectionMethod::kRigorous ? 0 : 1;
@@ -352,19 +390,18 @@ WarpLimits Reprojection<T>::LimitsIn(const SubRectProj& pixels, double noise) co
           double(pixels.top),
           double(pixels.right) + last,
           double(pixels.bottom) + last,
-          isNearest || isCorner ? 0.0 : 0.5,
+          isNearest || isCorner || isOfFootprints ? 0.0 : 0.5,
           noise};
 }
 
 template <typename T>
-std::unique_ptr<WarpParallel<T>> Reprojection<T>::MakeSampler(const WarpPositions& positions,
-                                                              unsigned lines,
-                                                              const WarpLimits& limits,
-                                                              const WarpSource<T>& source,
-                                                              const WarpTarget<T>& target) const {
+std::unique_ptr<WarpParallel<T>> Reprojection<T>::MakeSampler(
+    const WarpPositions& positions, unsigned lines, const WarpLimits& limits,
+    const WarpSource<T>& source, const WarpTarget<T>& target, const WarpRule& rule) const {
   const auto make = [&]<typename Sampler>() {
-    return std::make_unique<Sampler>(positions, lines, limits, source, target, sampling_);
+    return std::make_unique<Sampler>(positions, lines, limits, source, target, rule);
   };
+  if (IsOfFootprints(rule)) return make.template operator()<FootprintParallel<T>>();
   if (resampling_ == PyramidResamplingMethod::kNearest) {
     return make.template operator()<NearestNeighborParallel<T>>();
   }
@@ -402,7 +439,7 @@ void Reprojection<T>::SamplePart(Work& work, const Window& window, const SubRect
   const auto sampler =
       MakeSampler(positions, static_cast<unsigned>(part.Height()),
                   LimitsIn(window.source.window, affine ? WarpLimits::kAffineNoise : 0.0),
-                  window.source, target);
+                  window.source, target, {sampling_});
   RunParallelFor(*sampler);
 }
 

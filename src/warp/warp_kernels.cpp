@@ -1,30 +1,9 @@
 #include "warp/warp_kernels.h"
 
-#include <algorithm>
-#include <cmath>
-#include <limits>
-#include <type_traits>
-
 #include "platform/vector_clones.h"
 
 namespace lumo {
 namespace {
-
-/// A result as a pixel value.
-template <typename T, bool kNearest>
-[[gnu::always_inline]] inline T Store(double value) {
-  if constexpr (std::is_floating_point_v<T>) {
-    return static_cast<T>(value);
-  } else {
-    if constexpr (kNearest) value = std::floor(value + 0.5);
-    const double low = std::numeric_limits<T>::min(), high = std::numeric_limits<T>::max();
-    value = value < low ? low : value;
-    value = value > high ? high : value;
-    // By way of a type that vector code converts to.
-    if constexpr (sizeof(T) < 4) return static_cast<T>(static_cast<std::int32_t>(value));
-    return static_cast<T>(value);
-  }
-}
 
 template <typename T, bool kNearest>
 [[gnu::always_inline]] inline void Linear(WarpLanes<T, 4>& lanes, const double* as,
@@ -36,7 +15,7 @@ template <typename T, bool kNearest>
     const auto p11 = static_cast<double>(lanes.taps[3][i]);
     const double a = as[i], b = bs[i];
     const double value = p00 + (p10 - p00) * a + (p01 - p00) * b + (p11 + p00 - p01 - p10) * a * b;
-    lanes.out[i] = Store<T, kNearest>(value);
+    lanes.out[i] = StorePixel<T, kNearest>(value);
   }
 }
 
@@ -58,7 +37,7 @@ template <typename T>
     const double c1 = Convolve(tap(1), tap(5), tap(9), tap(13), b);
     const double c2 = Convolve(tap(2), tap(6), tap(10), tap(14), b);
     const double c3 = Convolve(tap(3), tap(7), tap(11), tap(15), b);
-    lanes.out[i] = Store<T, false>(Convolve(c0, c1, c2, c3, a));
+    lanes.out[i] = StorePixel<T, false>(Convolve(c0, c1, c2, c3, a));
   }
 }
 
@@ -72,21 +51,22 @@ template <typename T>
              static_cast<double>(lanes.taps[n + 2][i]) * x.of[2][i] +
              static_cast<double>(lanes.taps[n + 3][i]) * x.of[3][i];
     };
-    lanes.out[i] = Store<T, true>(line(0) * y.of[0][i] + line(4) * y.of[1][i] +
-                                  line(8) * y.of[2][i] + line(12) * y.of[3][i]);
+    lanes.out[i] = StorePixel<T, true>(line(0) * y.of[0][i] + line(4) * y.of[1][i] +
+                                       line(8) * y.of[2][i] + line(12) * y.of[3][i]);
   }
 }
 
 }  // namespace
 
 VEXG_VECTOR_CLONES
-void FindCubicWeights(const double* ways, unsigned count, CubicWeights& weights) {
+void FindCubicWeights(const double* ways, unsigned count, double parameter, CubicWeights& weights) {
+  const double k = parameter;
   for (unsigned i = 0; i < count; ++i) {
     const double t = ways[i], t2 = t * t, t3 = t2 * t;
-    weights.of[0][i] = 2 * t2 - t3 - t;
-    weights.of[1][i] = 1 - 2 * t2 + t3;
-    weights.of[2][i] = t + t2 - t3;
-    weights.of[3][i] = t3 - t2;
+    weights.of[0][i] = k * (t3 - 2 * t2 + t);
+    weights.of[1][i] = (k + 2) * t3 - (k + 3) * t2 + 1;
+    weights.of[2][i] = (2 * k + 3) * t2 - (k + 2) * t3 - k * t;
+    weights.of[3][i] = k * (t2 - t3);
   }
 }
 
@@ -109,6 +89,10 @@ void FindCubicWeights(const double* ways, unsigned count, CubicWeights& weights)
   void WeighCubic(WarpLanes<T, 16>& lanes, const CubicWeights& x, const CubicWeights& y,           \
                   unsigned count) {                                                                \
     Weigh(lanes, x, y, count);                                                                     \
+  }                                                                                                \
+  VEXG_VECTOR_CLONES                                                                               \
+  void AddWeighed(const T* values, std::size_t count, double weight, double* sums) {               \
+    for (std::size_t i = 0; i < count; ++i) sums[i] += weight * static_cast<double>(values[i]);    \
   }
 VEXG_WARP_KERNELS(std::uint8_t)
 VEXG_WARP_KERNELS(std::int8_t)

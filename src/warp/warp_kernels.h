@@ -1,7 +1,10 @@
 #pragma once
 
+#include <cmath>
 #include <cstddef>
 #include <cstdint>
+#include <limits>
+#include <type_traits>
 
 namespace lumo {
 
@@ -23,23 +26,42 @@ struct CubicWeights {
 
 /// Computes the weights for `count` fractional positions between the first middle column, or line,
 /// and the next one, 0 to 1.
-void FindCubicWeights(const double* ways, unsigned count, CubicWeights& weights);
+/// @param parameter  of the kernel: its slope at the distance 1.
+void FindCubicWeights(const double* ways, unsigned count, double parameter, CubicWeights& weights);
+
+/// Makes a result a pixel value: whole numbers are rounded and limited to their type.
+template <typename T, bool kNearest = true>
+[[gnu::always_inline]] inline T StorePixel(double value) {
+  if constexpr (std::is_floating_point_v<T>) {
+    return static_cast<T>(value);
+  } else {
+    if constexpr (kNearest) value = std::floor(value + 0.5);
+    const double low = std::numeric_limits<T>::min(), high = std::numeric_limits<T>::max();
+    value = value < low ? low : value;
+    value = value > high ? high : value;
+    // By way of a type that vector code converts to.
+    if constexpr (sizeof(T) < 4) return static_cast<T>(static_cast<std::int32_t>(value));
+    return static_cast<T>(value);
+  }
+}
 
 /// Bilinear interpolation of `count` lanes between the taps (0, 0), (1, 0), (0, 1), (1, 1).
-/// Cubic convolution between four by four taps, the kernel's parameter -1; whole numbers are
-/// limited to their type (Keys, Cubic convolution interpolation for digital image processing, 1981,
-/// the kernel with a free parameter). InterpolateCubic rounds toward zero, and gives the value of
-/// four equal taps exactly; WeighCubic rounds to the nearest, and is faster.
+/// Cubic convolution between four by four taps, in InterpolateCubic of the parameter -1; whole
+/// numbers are limited to their type (Keys, Cubic convolution interpolation for digital image
+/// processing, 1981, the kernel with a free parameter). InterpolateCubic rounds toward zero, and
+/// gives the value of four equal taps exactly; WeighCubic rounds to the nearest, and is faster.
 /// @param a  the fractional position of each lane between its first middle column and the next, 0
 /// to 1.
 /// @param b  the same between lines.
+/// AddWeighed adds `count` values, each times a weight, to as many sums.
 #define VEXG_WARP_KERNELS(T)                                                                       \
   void InterpolateLinear(WarpLanes<T, 4>& lanes, const double* a, const double* b, unsigned count, \
                          WarpRounding rounding);                                                   \
   void InterpolateCubic(WarpLanes<T, 16>& lanes, const double* a, const double* b,                 \
                         unsigned count);                                                           \
   void WeighCubic(WarpLanes<T, 16>& lanes, const CubicWeights& x, const CubicWeights& y,           \
-                  unsigned count);
+                  unsigned count);                                                                 \
+  void AddWeighed(const T* values, std::size_t count, double weight, double* sums);
 VEXG_WARP_KERNELS(std::uint8_t)
 VEXG_WARP_KERNELS(std::int8_t)
 VEXG_WARP_KERNELS(std::uint16_t)

@@ -115,7 +115,9 @@ WarpMap::WarpMap(const GeoRefPtr& grid, const GeoRefPtr& source, unsigned sample
 
 void WarpMap::Cut(const SubRectProj& rect, std::vector<WarpPiece>& pieces) const {
   if (affine_) {
-    pieces.push_back({rect, WarpPiece::Way::kFit, PolynomialOf(*affine_)});
+    WarpPiece piece{rect, WarpPiece::Way::kFit, PolynomialOf(*affine_)};
+    piece.footprint = {std::hypot(affine_->xx, affine_->xy), std::hypot(affine_->yx, affine_->yy)};
+    pieces.push_back(piece);
     return;
   }
   for (std::int32_t y = SquareOf(rect.top); y <= SquareOf(rect.bottom); ++y) {
@@ -141,6 +143,7 @@ void WarpMap::CutSquare(const Square& square, const SubRectProj& rect,
     }
     return;
   }
+  piece.footprint = node.footprint;
   if (node.kind == Node::Kind::kTransform) piece.way = WarpPiece::Way::kTransform;
   if (node.kind == Node::Kind::kFit) {
     piece.way = WarpPiece::Way::kFit;
@@ -181,6 +184,7 @@ WarpMap::Node WarpMap::MakeNode(const Square& square) const {
     return static_cast<std::int32_t>(std::min(size, 0x7FFFFFFFU)) - 1;
   };
   Intersect(rect, SubRectProj(0, 0, last(grid_->Samples()), last(grid_->Lines())), rect);
+  if (measuresFootprints_ && isWhole) node.footprint = FootprintOf(rect);
   const std::vector<double> places = NetOf(rect);
   std::vector<double> points = places;
   if (!CarryNet(rect, points)) return node;
@@ -193,8 +197,49 @@ WarpMap::Node WarpMap::MakeNode(const Square& square) const {
   node.fit.u = FitSide(places, points, 0, worstU);
   node.fit.v = FitSide(places, points, 1, worstV);
   node.fit.worst = std::max(worstU, worstV);
-  if (node.fit.worst <= tolerance_) node.kind = Node::Kind::kFit;
+  if (node.fit.worst > tolerance_) return node;
+  node.kind = Node::Kind::kFit;
+  if (measuresFootprints_ && !isWhole) node.footprint = FootprintOf(rect);
   return node;
+}
+
+/// The medians of the steps in the source that go with steps of a pixel, at nine places of a
+/// rectangle: an edge between some of them, where the source begins anew, doesn't count.
+WarpFootprint WarpMap::FootprintOf(const SubRectProj& rect) const {
+  constexpr unsigned kSide = 3, kEnds = 4;
+  std::vector<double> points;
+  points.reserve(2 * kSide * kSide * kEnds);
+  const auto add = [&](double x, double y) {
+    points.push_back(x);
+    points.push_back(y);
+  };
+  for (unsigned j = 0; j < kSide; ++j) {
+    for (unsigned i = 0; i < kSide; ++i) {
+      const double x = (i + 0.5) * double(rect.Width()) / kSide;
+      const double y = (j + 0.5) * double(rect.Height()) / kSide;
+      add(x - 0.5, y);
+      add(x + 0.5, y);
+      add(x, y - 0.5);
+      add(x, y + 0.5);
+    }
+  }
+  CarryNet(rect, points);
+  std::array<std::vector<double>, 4> steps;  // of x and y of the source along x, then along y
+  for (std::size_t i = 0; i < points.size(); i += 4) {
+    for (const std::size_t side : {0U, 1U}) {
+      const double step = std::abs(points[i + 2 + side] - points[i + side]);
+      if (std::isfinite(step)) steps[(i / 4 % 2) * 2 + side].push_back(step);
+    }
+  }
+  const auto median = [](std::vector<double>& of) {
+    if (of.empty()) return 0.0;
+    const auto middle = of.begin() + static_cast<std::ptrdiff_t>(of.size() / 2);
+    std::nth_element(of.begin(), middle, of.end());
+    return *middle;
+  };
+  const double width = std::hypot(median(steps[0]), median(steps[2]));
+  const double height = std::hypot(median(steps[1]), median(steps[3]));
+  return {width > 0 ? width : 1.0, height > 0 ? height : 1.0};
 }
 
 /// Carries places in a rectangle of the grid to the source. False unless all can be carried.

@@ -10,6 +10,7 @@
 #include "commands/value_text.h"
 #include "georef/affine_link.h"
 #include "warp/reprojection_geometry.h"
+#include "warp/warp_kernel.h"
 
 namespace lumo {
 
@@ -26,6 +27,7 @@ struct WarpPiece {
   WarpPolynomial fit;
   std::int32_t originX = 0;  ///< the pixel of the grid where the fit counts from
   std::int32_t originY = 0;
+  WarpFootprint footprint{};  ///< of its pixels, where the map measures them
 };
 
 /// Writes an affine map as a polynomial.
@@ -61,6 +63,9 @@ class VEXG_EXPORT WarpMap {
   WarpMap(const GeoRefPtr& grid, const GeoRefPtr& source, unsigned samples, unsigned lines,
           double tolerance, Form form = Form::kExact);
 
+  /// Has pieces say how large their pixels are in the source, one footprint for each square.
+  void MeasureFootprints() { measuresFootprints_ = true; }
+
   /// True within one coordinate system.
   bool IsAffine() const { return affine_.has_value(); }
 
@@ -76,6 +81,7 @@ class VEXG_EXPORT WarpMap {
   struct Node {
     enum class Kind { kOutside, kFit, kTransform, kSplit } kind = Kind::kSplit;
     WarpPolynomial fit;
+    WarpFootprint footprint;
   };
   struct Square {
     std::int32_t left, top, side;
@@ -86,11 +92,13 @@ class VEXG_EXPORT WarpMap {
   void CutSquare(const Square& square, const SubRectProj& rect,
                  std::vector<WarpPiece>& pieces) const;
   bool CarryNet(const SubRectProj& rect, std::vector<double>& points) const;
+  WarpFootprint FootprintOf(const SubRectProj& rect) const;
   bool MayTouch(const std::vector<double>& points) const;
 
   GeoRefPtr grid_;
   GeoRefPtr source_;
   double tolerance_;
+  bool measuresFootprints_ = false;
   double gridShift_;    // from coordinates that count from a corner to the grid's own
   double sourceShift_;  // from the source's to such
   std::optional<AffineLink> affine_;

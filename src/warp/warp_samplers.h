@@ -33,6 +33,15 @@ struct WarpTarget {
   const T* background = nullptr;   ///< by band
 };
 
+/// Says how samplers make pixels.
+struct WarpRule {
+  WarpSampling sampling = WarpSampling::kCorner;
+  WarpKernel kernel = WarpKernel::kTold;
+  WarpFootprint footprint{};  ///< of all pixels of the rectangle
+  /// The parameter of cubic convolution from centres.
+  double CubicParameter() const { return kernel == WarpKernel::kCubic ? -0.5 : -1.0; }
+};
+
 /// Walks the lines of a rectangle in chunks of positions: the loop of all samplers, each of which
 /// gives the pixels of a chunk. Pixels whose position lies outside the limits get the background
 /// value and the state NoData.
@@ -42,9 +51,9 @@ class WarpParallel : public ArrayParallelFor {
   /// All but the limits outlive the loop.
   /// @param lines  of the rectangle.
   WarpParallel(const WarpPositions& positions, unsigned lines, const WarpLimits& limits,
-               const WarpSource<T>& source, const WarpTarget<T>& target, WarpSampling sampling)
+               const WarpSource<T>& source, const WarpTarget<T>& target, const WarpRule& rule)
       : ArrayParallelFor(lines),
-        sampling_(sampling),
+        rule_(rule),
         positions_(positions),
         limits_(limits),
         source_(source),
@@ -85,7 +94,7 @@ class WarpParallel : public ArrayParallelFor {
     return static_cast<std::uint32_t>(std::clamp(y, window.top, window.bottom) - window.top);
   }
 
-  const WarpSampling sampling_;
+  const WarpRule rule_;
 
  private:
   void FillOutside(const WarpChunk& chunk, std::size_t out) {
@@ -125,7 +134,7 @@ class NearestNeighborParallel final : public WarpParallel<T> {
     Pick(chunk.count, from, source.pixels, source.strides, target.pixels + out);
     if (source.state == nullptr) return;
     Pick(chunk.count, from, source.state, source.strides, target.state + out);
-    if (this->sampling_ == WarpSampling::kCentred) HideNotValid(chunk, out);
+    if (this->rule_.sampling == WarpSampling::kCentred) HideNotValid(chunk, out);
   }
 
   /// Gives pixels that aren't valid the background value.
@@ -198,11 +207,11 @@ class NeighbourhoodParallel : public WarpParallel<T> {
     Offsets from;
     FindTaps(chunk, from);
     WarpLanes<T, kTaps> lanes;
-    const bool isCentred = this->sampling_ == WarpSampling::kCentred;
+    const bool isCentred = this->rule_.sampling == WarpSampling::kCentred;
     CubicWeights x, y;
     if (kSide == 4 && isCentred) {
-      FindCubicWeights(chunk.a, chunk.count, x);
-      FindCubicWeights(chunk.b, chunk.count, y);
+      FindCubicWeights(chunk.a, chunk.count, this->rule_.CubicParameter(), x);
+      FindCubicWeights(chunk.b, chunk.count, this->rule_.CubicParameter(), y);
     }
     for (unsigned band = 0; band < target.bands; ++band) {
       const T* const in = source.pixels + band * source.strides.band;
@@ -267,7 +276,7 @@ class NeighbourhoodParallel : public WarpParallel<T> {
     const unsigned char* const state = source.state + band * source.strides.band;
     for (unsigned i = 0; i < chunk.count; ++i) {
       const std::size_t at = first + i * target.strides.pixel;
-      if (this->sampling_ == WarpSampling::kCorner) {
+      if (this->rule_.sampling == WarpSampling::kCorner) {
         target.state[at] = state[from[kMiddle][i]];
         continue;
       }

@@ -73,37 +73,54 @@ TEST(ExactGrid, GivesAPixelTheSameBitsInEveryRequest) {
       {"turned", Turned(utm, 12), MakeGrid(599000, 5003000, 30, 400, 300, "EPSG:32633")},
       {"around the pole", globe, MakeGrid(-4e6, 4e6, 26000, 300, 300, "EPSG:3995")},
       {"around the date line", globe, MakeGrid(-1.8e7, 9e6, 65000, 550, 280, kMollweide)},
+      {"smaller", utm, MakeGrid(16.26, 45.16, 0.002, 60, 42, "EPSG:4326")},
   };
   std::mt19937 random(11);
   const auto below = [&](unsigned n) { return static_cast<unsigned>(random() % n); };
+  struct Way {
+    PyramidResamplingMethod resampling;
+    WarpSampling sampling;
+    WarpKernel kernel = WarpKernel::kTold;
+  };
+  std::vector<Way> ways;
+  for (const auto resampling : {kNearest, kLinear, kCubic}) {
+    ways.push_back({resampling, WarpSampling::kCentred});
+    ways.push_back({resampling, WarpSampling::kCorner});
+  }
+  for (const auto kernel : {WarpKernel::kCubic, WarpKernel::kAverage, WarpKernel::kMedian}) {
+    ways.push_back({kNearest, WarpSampling::kCentred, kernel});
+  }
   for (const auto& c : cases) {
     const RasterPtr<float> source = MakeNoise(c.source, 3);
     for (const auto method : {kPolynomial, kRigorous}) {
-      for (const auto resampling : {kNearest, kLinear, kCubic}) {
-        for (const auto sampling : {WarpSampling::kCentred, WarpSampling::kCorner}) {
-          SCOPED_TRACE(testing::Message()
-                       << c.name << ", method " << unsigned(method) << ", resampling "
-                       << unsigned(resampling) << ", sampling " << unsigned(sampling));
-          auto view = View(source, c.grid, method, resampling, sampling);
-          const auto whole = Read(view, AllOf(view), {0, 1, 2});
-          for (int i = 0; i < 6; ++i) {
-            const SubRect rect(below(view.Samples()), below(view.Lines()), below(view.Samples()),
-                               below(view.Lines()));
-            std::vector<unsigned> bands(1 + below(3));
-            for (unsigned& band : bands) band = below(3);
-            const ThreadLimit threads(1 + below(4));
-            auto fresh = View(source, c.grid, method, resampling, sampling);
-            const auto part = Read(i % 2 == 0 ? view : fresh, rect, bands);
-            std::size_t at = 0;
-            for (unsigned y = rect.top; y <= rect.bottom; ++y)
-              for (unsigned x = rect.left; x <= rect.right; ++x)
-                for (const unsigned band : bands) {
-                  const std::size_t in = (y * std::size_t{view.Samples()} + x) * 3 + band;
-                  ASSERT_EQ(part.pixels[at], whole.pixels[in]) << x << " " << y;
-                  ASSERT_EQ(part.state[at], whole.state[in]) << x << " " << y;
-                  ++at;
-                }
-          }
+      for (const Way& way : ways) {
+        SCOPED_TRACE(testing::Message()
+                     << c.name << ", method " << unsigned(method) << ", resampling "
+                     << unsigned(way.resampling) << ", sampling " << unsigned(way.sampling)
+                     << ", kernel " << unsigned(way.kernel));
+        const auto open = [&] {
+          return ProjectedRaster<float>(source, c.grid, method, way.resampling,
+                                        {ProjectedGrid::kExact, way.sampling, 0.0, way.kernel});
+        };
+        auto view = open();
+        const auto whole = Read(view, AllOf(view), {0, 1, 2});
+        for (int i = 0; i < 6; ++i) {
+          const SubRect rect(below(view.Samples()), below(view.Lines()), below(view.Samples()),
+                             below(view.Lines()));
+          std::vector<unsigned> bands(1 + below(3));
+          for (unsigned& band : bands) band = below(3);
+          const ThreadLimit threads(1 + below(4));
+          auto fresh = open();
+          const auto part = Read(i % 2 == 0 ? view : fresh, rect, bands);
+          std::size_t at = 0;
+          for (unsigned y = rect.top; y <= rect.bottom; ++y)
+            for (unsigned x = rect.left; x <= rect.right; ++x)
+              for (const unsigned band : bands) {
+                const std::size_t in = (y * std::size_t{view.Samples()} + x) * 3 + band;
+                ASSERT_EQ(part.pixels[at], whole.pixels[in]) << x << " " << y;
+                ASSERT_EQ(part.state[at], whole.state[in]) << x << " " << y;
+                ++at;
+              }
         }
       }
     }

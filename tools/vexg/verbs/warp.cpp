@@ -121,9 +121,10 @@ class WarpVerb final : public RasterVerb {
   explicit WarpVerb(OptionSet& line) : RasterVerb(line, "The warped raster") {
     line.AddNote(
         "The polynomial method is within an eighth of a pixel; rigorous transforms every pixel. "
-        "Linear and cubic leave out pixels that aren't valid; cubic has the parameter -1. Pixels "
-        "outside the source are not valid: they have the no-data value, or 0 under a mask.");
-    line.AddExample("vexg warp scene.tif geographic.tif --to EPSG:4326 --resampling linear");
+        "All but nearest take in the whole area that a pixel covers, and leave out pixels that "
+        "aren't valid; cubic has the parameter -0.5. Pixels outside the source are not valid: they "
+        "have the no-data value, or 0 under a mask.");
+    line.AddExample("vexg warp scene.tif geographic.tif --to EPSG:4326 --resampling bilinear");
     line.Add("--to", to_,
              "Coordinate system (EPSG:n, WKT, PROJ text), or a raster file whose grid is "
              "taken over")
@@ -141,7 +142,8 @@ class WarpVerb final : public RasterVerb {
         .Takes(OneOf({"polynomial", "rigorous"}))
         .ShowsDefault();
     line.Add("--resampling", resampling_, "How pixels are made")
-        .Takes(OneOf({"nearest", "linear", "cubic"}))
+        .Takes(OneOf({"nearest", "bilinear", "cubic", "lanczos", "average", "mode", "min", "max",
+                      "median", "linear"}))
         .ShowsDefault();
     line.Add("--bands", bandsText_, "Bands in the order wanted, from 0; all by default")
         .Shows("B,B...")
@@ -214,7 +216,8 @@ class WarpVerb final : public RasterVerb {
     JobWriterCommand& view = chain.AddView("warped", "CreateProjectedRasterCommand");
     view.AddInput("GeoRef", grid_);
     view.AddInput("ReprojectionMethod", String(Capital(method_)));
-    view.AddInput("ResamplingMethod", String(Capital(resampling_)));
+    view.AddInput("ResamplingMethod", String("Nearest"));
+    view.AddInput("Kernel", String(Capital(resampling_ == "bilinear" ? "linear" : resampling_)));
     view.AddInput("Grid", String("Exact"));
     view.AddInput("Sampling", String("Centred"));
     if (noData_) view.AddInput("NoData", *noData_);
