@@ -10,18 +10,9 @@
 
 namespace lumo {
 
-/// True for a rule that wants all pixels under a footprint; the others read as many whatever it is.
+/// True for a rule by which pixels are made from a footprint.
 inline bool IsOfFootprints(const WarpRule& rule) {
-  switch (rule.kernel) {
-    case WarpKernel::kTold:
-    case WarpKernel::kNearest:
-      return false;
-    case WarpKernel::kLinear:
-    case WarpKernel::kCubic:
-      return rule.footprint.IsWide();
-    default:
-      return true;
-  }
+  return rule.kernel != WarpKernel::kTold && rule.kernel != WarpKernel::kNearest;
 }
 
 /// Makes each pixel from all pixels of the source under its footprint; see WarpKernel.
@@ -43,15 +34,17 @@ class FootprintParallel final : public WarpParallel<T> {
   };
 
   void Sample(const WarpChunk& chunk, std::size_t out) override {
+    std::copy_n(chunk.inside, chunk.count, left_);
+    if (IsNear()) SampleNear(chunk, out);
     if (columnWeights_.size() < WarpChunk::kPixels) columnWeights_.resize(WarpChunk::kPixels);
-    for (unsigned at = 0; at < chunk.count;) {
+    for (unsigned at = 0; at < chunk.count; ++at) {
+      if (left_[at] == 0) continue;
       Span span{at, at + 1};
-      while (span.end < chunk.count && chunk.inside[span.end] != 0 &&
-             IsOneLine(chunk, at, span.end)) {
+      while (span.end < chunk.count && left_[span.end] != 0 && IsOneLine(chunk, at, span.end)) {
         ++span.end;
       }
-      at = span.end;
-      if (chunk.inside[span.begin] != 0) SampleSpan(chunk, span, out);
+      SampleSpan(chunk, span, out);
+      at = span.end - 1;
     }
   }
 
@@ -60,6 +53,98 @@ class FootprintParallel final : public WarpParallel<T> {
   }
 
   WarpKernel Kernel() const { return this->rule_.kernel; }
+
+  /// True for kernels of few pixels, which are summed position by position.
+  bool IsNear() const {
+    const WarpFootprint& size = this->rule_.footprint;
+    return IsWeighing(Kernel()) && CountTaps(Kernel(), size.width) <= NearWeights::kMostTaps &&
+           CountTaps(Kernel(), size.height) <= NearWeights::kMostTaps;
+  }
+
+  /// Makes the pixels whose kernel lies within the source.
+  void SampleNear(const WarpChunk& chunk, std::size_t out) {
+    const WarpSource<T>& source = this->Source();
+    const WarpTarget<T>& target = this->Target();
+    const WarpFootprint& size = this->rule_.footprint;
+    FindNearWeights(Kernel(), chunk.x, chunk.a, chunk.count, size.width, near_[0]);
+    FindNearWeights(Kernel(), chunk.y, chunk.b, chunk.count, size.height, near_[1]);
+    std::uint8_t wanted[WarpChunk::kPixels];
+    const SubRectProj window = source.window;
+    for (unsigned i = 0; i < chunk.count; ++i) {
+      const bool isWithin = IsWithin(near_[0], i, window.left, window.right) &&
+                            IsWithin(near_[1], i, window.top, window.bottom) && !IsLast(i);
+      wanted[i] = isWithin ? left_[i] : 0;
+      left_[i] -= wanted[i];
+    }
+    const bool isPixelwise = source.strides.band == 1;
+    for (unsigned run = 0; run < Runs(); ++run) {
+      const NearPixels<T> pixels{source.pixels + run * source.strides.band,
+                                 source.strides.pixel,
+                                 source.strides.line,
+                                 isPixelwise ? target.bands : 1,
+                                 target.pixels + out + run * target.strides.band,
+                                 target.strides.pixel,
+                                 target.strides.band};
+      WeighNear(pixels, near_[0], near_[1], wanted, chunk.count);
+    }
+    if (source.state != nullptr) SettleNear(chunk, wanted, out);
+  }
+
+  /// True when the last pixel of the block is needed, behind which there is nothing to be read.
+  bool IsLast(unsigned i) const {
+    const SubRectProj& window = this->Source().window;
+    return near_[0].first[i] + near_[0].taps == window.Width() &&
+           near_[1].first[i] + near_[1].taps == window.Height();
+  }
+
+  /// Counts the pixels from a window's edge; false when some of them lie outside of it.
+  static bool IsWithin(NearWeights& weights, unsigned i, std::int32_t low, std::int32_t high) {
+    const std::int32_t first = weights.first[i];
+    weights.first[i] = first - low;
+    return first >= low && first + static_cast<std::int32_t>(weights.taps) - 1 <= high;
+  }
+
+  /// Makes anew what isn't valid everywhere.
+  void SettleNear(const WarpChunk& chunk, const std::uint8_t* wanted, std::size_t out) {
+    for (unsigned i = 0; i < chunk.count; ++i) {
+      if (wanted[i] == 0) continue;
+      bool hasWeights = false;
+      for (unsigned band = 0; band < this->Target().bands; ++band) {
+        if (IsValidState(StatesNear(i, band))) continue;
+        if (!hasWeights) FindWeights(chunk, i);
+        hasWeights = true;
+        SampleValid(chunk, i, band,
+                    out + i * this->Target().strides.pixel + band * this->Target().strides.band);
+      }
+    }
+  }
+
+  unsigned char StatesNear(unsigned i, unsigned band) const {
+    const auto& [x, y] = near_;
+    const BlockStrides& strides = this->Source().strides;
+    const unsigned char* const first = this->Source().state + band * strides.band +
+                                       static_cast<std::size_t>(x.first[i]) * strides.pixel +
+                                       static_cast<std::size_t>(y.first[i]) * strides.line;
+    unsigned char any = 0;
+    for (unsigned line = 0; line < y.taps; ++line) {
+      if (y.of[line][i] == 0) continue;
+      for (unsigned column = 0; column < x.taps; ++column) {
+        if (x.of[column][i] != 0) any |= first[line * strides.line + column * strides.pixel];
+      }
+    }
+    return any;
+  }
+
+  /// The weights of a pixel, one direction at a time.
+  void FindWeights(const WarpChunk& chunk, unsigned i) {
+    const SubRectProj& window = this->Source().window;
+    const WarpFootprint& size = this->rule_.footprint;
+    if (columnWeights_.size() < WarpChunk::kPixels) columnWeights_.resize(WarpChunk::kPixels);
+    FindKernelWeights(Kernel(), chunk.x[i] + chunk.a[i], size.width, window.left, window.right,
+                      columnWeights_[i]);
+    FindKernelWeights(Kernel(), chunk.y[i] + chunk.b[i], size.height, window.top, window.bottom,
+                      lineWeights_);
+  }
 
   void SampleSpan(const WarpChunk& chunk, Span& span, std::size_t out) {
     const SubRectProj& window = this->Source().window;
@@ -119,7 +204,8 @@ class FootprintParallel final : public WarpParallel<T> {
     for (unsigned run = 0; run < Runs(); ++run) {
       std::int32_t line = lineWeights_.first;
       for (const double weight : lineWeights_.of) {
-        AddWeighed(At(span.left, line++, run), length, weight, &sums_[run * length]);
+        const T* const at = At(span.left, line++, run);
+        if (weight != 0) AddWeighed(at, length, weight, &sums_[run * length]);
       }
     }
   }
@@ -131,6 +217,7 @@ class FootprintParallel final : public WarpParallel<T> {
     for (unsigned run = 0; run < Runs(); ++run) {
       unsigned char* const all = &joined_[run * length];
       for (std::size_t k = 0; k < lineWeights_.of.size(); ++k) {
+        if (lineWeights_.of[k] == 0) continue;
         const std::int32_t line = lineWeights_.first + static_cast<std::int32_t>(k);
         const unsigned char* const state = this->Source().state + IndexOf(span.left, line, run);
         for (std::size_t i = 0; i < length; ++i) all[i] |= state[i];
@@ -147,7 +234,7 @@ class FootprintParallel final : public WarpParallel<T> {
     const double* at = &sums_[FirstOf(span, i, band)];
     double sum = 0;
     for (const double weight : columnWeights_[i].of) {
-      sum += weight * *at;
+      if (weight != 0) sum += weight * *at;
       at += ColumnStep();
     }
     return sum;
@@ -156,8 +243,9 @@ class FootprintParallel final : public WarpParallel<T> {
   bool IsWholeUnder(const Span& span, unsigned i, unsigned band) const {
     std::size_t at = FirstOf(span, i, band);
     unsigned char any = 0;
-    for (std::size_t k = 0; k < columnWeights_[i].of.size(); ++k, at += ColumnStep()) {
-      any |= joined_[at];
+    for (const double weight : columnWeights_[i].of) {
+      if (weight != 0) any |= joined_[at];
+      at += ColumnStep();
     }
     return IsValidState(any);
   }
@@ -262,6 +350,8 @@ class FootprintParallel final : public WarpParallel<T> {
     return best;
   }
 
+  std::uint8_t left_[WarpChunk::kPixels];  // 1 for a pixel that has to be made yet
+  std::array<NearWeights, 2> near_;        // of columns, and of lines
   KernelWeights lineWeights_;
   std::vector<KernelWeights> columnWeights_;
   std::array<KernelWeights, 2> linear_;

@@ -4,6 +4,8 @@
 #include <cmath>
 #include <numbers>
 
+#include "platform/vector_clones.h"
+
 namespace lumo {
 namespace {
 
@@ -39,11 +41,34 @@ double Lanczos(double x) {
 }
 
 /// The weight at a distance from 0 on.
+template <WarpKernel kKernel>
+[[gnu::always_inline]] inline double WeightAt(double x) {
+  if constexpr (kKernel == WarpKernel::kLinear) {
+    return x < 1 ? 1 - x : 0.0;
+  } else if constexpr (kKernel == WarpKernel::kCubic) {
+    const double near = (1.5 * x - 2.5) * x * x + 1;
+    const double far = ((-0.5 * x + 2.5) * x - 4) * x + 2;
+    return x < 1 ? near : x < 2 ? far : 0.0;
+  } else {
+    return x < 3 ? Lanczos(x) : 0.0;
+  }
+}
+
 double WeightAt(WarpKernel kernel, double x) {
-  if (x >= RadiusOf(kernel)) return 0;
-  if (kernel == WarpKernel::kLinear) return 1 - x;
-  if (kernel == WarpKernel::kLanczos) return Lanczos(x);
-  return x < 1 ? (1.5 * x - 2.5) * x * x + 1 : ((-0.5 * x + 2.5) * x - 4) * x + 2;
+  return kernel == WarpKernel::kLinear  ? WeightAt<WarpKernel::kLinear>(x)
+         : kernel == WarpKernel::kCubic ? WeightAt<WarpKernel::kCubic>(x)
+                                        : WeightAt<WarpKernel::kLanczos>(x);
+}
+
+/// The part of a pixel between two places; 0 for next to nothing.
+[[gnu::always_inline]] inline double Covered(double at, double from, double end, double nothing) {
+  const double part = std::min(end, at + 1.0) - std::max(from, at);
+  return part > nothing ? part : 0.0;
+}
+
+/// Below it a part of a pixel isn't covered by a footprint of that size.
+double NothingOf(double size) {
+  return std::min(kNothing, size / 2);
 }
 
 /// The pixels whose centre lies in a range, or else the one at the position.
@@ -60,12 +85,12 @@ void WeighCentres(double position, double size, std::int32_t low, std::int32_t h
   weights.of.assign(static_cast<std::size_t>(last - first + 1), 1.0 / (last - first + 1));
 }
 
-/// Takes weights that are nothing off the ends, and makes the sum of the others 1.
-void Normalise(KernelWeights& weights, double nothing) {
+/// Takes the pixels without weight off the ends, and makes the sum of the others 1.
+void Normalise(KernelWeights& weights) {
   std::vector<double>& of = weights.of;
-  while (of.size() > 1 && std::abs(of.back()) <= nothing) of.pop_back();
+  while (of.size() > 1 && of.back() == 0) of.pop_back();
   std::size_t left = 0;
-  while (left + 1 < of.size() && std::abs(of[left]) <= nothing) ++left;
+  while (left + 1 < of.size() && of[left] == 0) ++left;
   of.erase(of.begin(), of.begin() + static_cast<std::ptrdiff_t>(left));
   weights.first += static_cast<std::int32_t>(left);
   double sum = 0;
@@ -75,6 +100,66 @@ void Normalise(KernelWeights& weights, double nothing) {
     return;
   }
   for (double& weight : of) weight /= sum;
+}
+
+/// Makes the sums of weights 1.
+[[gnu::always_inline]] inline void Share(unsigned count, NearWeights& weights) {
+  double sums[NearWeights::kMostPositions];
+  for (unsigned i = 0; i < count; ++i) sums[i] = 0;
+  for (unsigned k = 0; k < weights.taps; ++k) {
+    for (unsigned i = 0; i < count; ++i) sums[i] += weights.of[k][i];
+  }
+  for (unsigned k = 0; k < weights.taps; ++k) {
+    for (unsigned i = 0; i < count; ++i) weights.of[k][i] /= sums[i];
+  }
+}
+
+template <WarpKernel kKernel>
+[[gnu::always_inline]] inline void WeighNear(const std::int32_t* whole, const double* rest,
+                                             unsigned count, double stretch, NearWeights& weights) {
+  const double reach = RadiusOf(kKernel) * stretch;
+  double positions[NearWeights::kMostPositions];
+  for (unsigned i = 0; i < count; ++i) {
+    positions[i] = whole[i] + rest[i];
+    weights.first[i] = static_cast<std::int32_t>(std::floor(positions[i] - reach - 0.5)) + 1;
+  }
+  for (unsigned k = 0; k < weights.taps; ++k) {
+    for (unsigned i = 0; i < count; ++i) {
+      const double centre = weights.first[i] + static_cast<std::int32_t>(k) + 0.5;
+      weights.of[k][i] = WeightAt<kKernel>(std::abs(centre - positions[i]) / stretch);
+    }
+  }
+  Share(count, weights);
+}
+
+VEXG_CHOOSING_VECTOR_CLONES
+void WeighLinear(const std::int32_t* whole, const double* rest, unsigned count, double stretch,
+                 NearWeights& weights) {
+  WeighNear<WarpKernel::kLinear>(whole, rest, count, stretch, weights);
+}
+
+VEXG_CHOOSING_VECTOR_CLONES
+void WeighCubic(const std::int32_t* whole, const double* rest, unsigned count, double stretch,
+                NearWeights& weights) {
+  WeighNear<WarpKernel::kCubic>(whole, rest, count, stretch, weights);
+}
+
+VEXG_CHOOSING_VECTOR_CLONES
+void WeighCovered(const std::int32_t* whole, const double* rest, unsigned count, double size,
+                  NearWeights& weights) {
+  const double nothing = NothingOf(size);
+  double positions[NearWeights::kMostPositions];
+  for (unsigned i = 0; i < count; ++i) {
+    positions[i] = whole[i] + rest[i];
+    weights.first[i] = static_cast<std::int32_t>(std::floor(positions[i] - size / 2));
+  }
+  for (unsigned k = 0; k < weights.taps; ++k) {
+    for (unsigned i = 0; i < count; ++i) {
+      const double at = weights.first[i] + static_cast<std::int32_t>(k);
+      weights.of[k][i] = Covered(at, positions[i] - size / 2, positions[i] + size / 2, nothing);
+    }
+  }
+  Share(count, weights);
 }
 
 }  // namespace
@@ -104,11 +189,29 @@ void FindKernelWeights(WarpKernel kernel, double position, double size, std::int
   const auto last = static_cast<std::int32_t>(std::clamp<double>(std::ceil(end) - 1, low, high));
   weights.of.clear();
   for (std::int32_t at = weights.first; at <= std::max(last, weights.first); ++at) {
-    const double weight = IsBox(kernel) ? std::min(end, at + 1.0) - std::max(from, double(at))
-                                        : WeightAt(kernel, std::abs(at + 0.5 - position) / stretch);
-    weights.of.push_back(weight);
+    weights.of.push_back(IsBox(kernel) ? Covered(at, from, end, NothingOf(size))
+                                       : WeightAt(kernel, std::abs(at + 0.5 - position) / stretch));
   }
-  Normalise(weights, IsBox(kernel) ? std::min(kNothing, size / 2) : 0.0);
+  Normalise(weights);
+}
+
+double CountTaps(WarpKernel kernel, double size) {
+  return IsBox(kernel) ? std::ceil(size) + 1 : std::ceil(2 * RadiusOf(kernel) * StretchOf(size));
+}
+
+void FindNearWeights(WarpKernel kernel, const std::int32_t* whole, const double* rest,
+                     unsigned count, double size, NearWeights& weights) {
+  weights.taps = static_cast<unsigned>(CountTaps(kernel, size));
+  switch (kernel) {
+    case WarpKernel::kLinear:
+      return WeighLinear(whole, rest, count, StretchOf(size), weights);
+    case WarpKernel::kCubic:
+      return WeighCubic(whole, rest, count, StretchOf(size), weights);
+    case WarpKernel::kLanczos:
+      return WeighNear<WarpKernel::kLanczos>(whole, rest, count, StretchOf(size), weights);
+    default:
+      return WeighCovered(whole, rest, count, size, weights);
+  }
 }
 
 }  // namespace lumo

@@ -67,12 +67,30 @@ struct KernelWeights {
   std::vector<double> of;  ///< a weight for it and for each that follows; their sum is 1
 };
 
-/// Computes the weights of the pixels around a position. kMode weighs as kAverage, kMin, kMax and
-/// kMedian give each pixel that counts the same weight.
+/// Computes the weights of the pixels around a position. kMode weighs as kAverage; kMin, kMax and
+/// kMedian give each pixel that counts the same weight. A pixel of weight 0 isn't looked at.
 /// @param position  in pixels of the source, 0 at the edge of the first one.
 /// @param size      of the footprint.
 /// @param low,high  the first and the last pixel that there is.
 VEXG_EXPORT void FindKernelWeights(WarpKernel kernel, double position, double size,
                                    std::int32_t low, std::int32_t high, KernelWeights& weights);
+
+/// Holds the weights around many positions, as long as they are few for each.
+struct NearWeights {
+  static constexpr unsigned kMostTaps = 8;
+  static constexpr unsigned kMostPositions = 128;
+  unsigned taps = 0;                   ///< for each position
+  std::int32_t first[kMostPositions];  ///< the first pixel of each
+  double of[kMostTaps][kMostPositions];
+};
+
+/// Says how many pixels in a row a weighing kernel may need; see NearWeights::taps.
+VEXG_EXPORT double CountTaps(WarpKernel kernel, double size);
+
+/// Computes what FindKernelWeights does, to the bit, for many positions far from all edges.
+/// @param whole,rest  the positions, taken apart.
+/// @param count       of positions.
+VEXG_EXPORT void FindNearWeights(WarpKernel kernel, const std::int32_t* whole, const double* rest,
+                                 unsigned count, double size, NearWeights& weights);
 
 }  // namespace lumo

@@ -1,5 +1,8 @@
 #include "warp/warp_kernels.h"
 
+#include <algorithm>
+#include <cstring>
+
 #include "platform/vector_clones.h"
 
 namespace lumo {
@@ -56,6 +59,87 @@ template <typename T>
   }
 }
 
+using FourDoubles [[gnu::vector_size(32)]] = double;
+
+/// Adds four values in a row, each times a weight.
+template <typename T>
+[[gnu::always_inline]] inline void AddFour(double weight, const T* at, FourDoubles& sums) {
+  using Four [[gnu::vector_size(4 * sizeof(T))]] = T;
+  Four values;
+  std::memcpy(&values, at, sizeof values);
+  sums += weight * __builtin_convertvector(values, FourDoubles);
+}
+
+/// Sums of four bands, or eight.
+template <unsigned kFours>
+struct FourSums {
+  FourDoubles of[kFours] = {};
+
+  template <typename T>
+  [[gnu::always_inline]] void Add(double weight, const T* at) {
+    for (unsigned k = 0; k < kFours; ++k) AddFour(weight, at + 4 * k, of[k]);
+  }
+  [[gnu::always_inline]] void Add(double weight, const FourSums& sums) {
+    for (unsigned k = 0; k < kFours; ++k) of[k] += weight * sums.of[k];
+  }
+  double operator[](unsigned i) const { return of[i / 4][i % 4]; }
+};
+
+/// The sum of one band.
+struct OneSum {
+  double of = 0;
+
+  template <typename T>
+  [[gnu::always_inline]] void Add(double weight, const T* at) {
+    of += weight * static_cast<double>(*at);
+  }
+  [[gnu::always_inline]] void Add(double weight, const OneSum& sum) { of += weight * sum.of; }
+  double operator[](unsigned) const { return of; }
+};
+
+/// Some bands of the pixels at `count` positions.
+template <typename Sums, typename T>
+[[gnu::always_inline]] inline void Near(const NearPixels<T>& pixels, unsigned band, unsigned bands,
+                                        const NearWeights& x, const NearWeights& y,
+                                        const std::uint8_t* wanted, unsigned count) {
+  for (unsigned i = 0; i < count; ++i) {
+    if (wanted[i] == 0) continue;
+    const T* const in = pixels.in + static_cast<std::size_t>(x.first[i]) * pixels.inPixel +
+                        static_cast<std::size_t>(y.first[i]) * pixels.inLine + band;
+    Sums sums;
+    for (unsigned column = 0; column < x.taps; ++column) {
+      const double columnWeight = x.of[column][i];
+      if (columnWeight == 0) continue;
+      Sums sum;
+      const T* at = in + column * pixels.inPixel;
+      for (unsigned line = 0; line < y.taps; ++line, at += pixels.inLine) {
+        const double lineWeight = y.of[line][i];
+        if (lineWeight != 0) sum.Add(lineWeight, at);
+      }
+      sums.Add(columnWeight, sum);
+    }
+    T* const out = pixels.out + i * pixels.outPixel + band * pixels.outBand;
+    for (unsigned b = 0; b < bands; ++b) out[b * pixels.outBand] = StorePixel<T, true>(sums[b]);
+  }
+}
+
+template <typename T>
+[[gnu::always_inline]] inline void NearBands(const NearPixels<T>& pixels, const NearWeights& x,
+                                             const NearWeights& y, const std::uint8_t* wanted,
+                                             unsigned count) {
+  for (unsigned band = 0; band < pixels.bands;) {
+    const unsigned bands = std::min(pixels.bands - band, 8U);
+    if (bands > 4) {
+      Near<FourSums<2>>(pixels, band, bands, x, y, wanted, count);
+    } else if (bands > 1) {
+      Near<FourSums<1>>(pixels, band, bands, x, y, wanted, count);
+    } else {
+      Near<OneSum>(pixels, band, bands, x, y, wanted, count);
+    }
+    band += bands;
+  }
+}
+
 }  // namespace
 
 VEXG_VECTOR_CLONES
@@ -93,6 +177,11 @@ void FindCubicWeights(const double* ways, unsigned count, double parameter, Cubi
   VEXG_VECTOR_CLONES                                                                               \
   void AddWeighed(const T* values, std::size_t count, double weight, double* sums) {               \
     for (std::size_t i = 0; i < count; ++i) sums[i] += weight * static_cast<double>(values[i]);    \
+  }                                                                                                \
+  VEXG_VECTOR_CLONES                                                                               \
+  void WeighNear(const NearPixels<T>& pixels, const NearWeights& x, const NearWeights& y,          \
+                 const std::uint8_t* wanted, unsigned count) {                                     \
+    NearBands(pixels, x, y, wanted, count);                                                        \
   }
 VEXG_WARP_KERNELS(std::uint8_t)
 VEXG_WARP_KERNELS(std::int8_t)

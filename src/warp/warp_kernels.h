@@ -6,6 +6,8 @@
 #include <limits>
 #include <type_traits>
 
+#include "warp/warp_kernel.h"
+
 namespace lumo {
 
 /// Values of one band to be interpolated at once.
@@ -22,6 +24,16 @@ enum class WarpRounding { kTowardZero, kNearest };
 /// Holds the weights of the four columns, or lines, around each position in cubic convolution.
 struct CubicWeights {
   double of[4][128];  ///< by column, then position
+};
+
+/// Names the pixels that WeighNear reads and those that it makes.
+template <typename T>
+struct NearPixels {
+  const T* in = nullptr;  ///< the pixel (0, 0) of the weights
+  std::size_t inPixel = 0, inLine = 0;
+  unsigned bands = 0;  ///< that lie next to one another
+  T* out = nullptr;    ///< of the first position
+  std::size_t outPixel = 0, outBand = 0;
 };
 
 /// Computes the weights for `count` fractional positions between the first middle column, or line,
@@ -54,6 +66,8 @@ template <typename T, bool kNearest = true>
 /// to 1.
 /// @param b  the same between lines.
 /// AddWeighed adds `count` values, each times a weight, to as many sums.
+/// WeighNear sums the pixels around each of `count` positions, line by line within a column, then
+/// over the columns; see NearPixels. Up to three elements behind a pixel are read too.
 #define VEXG_WARP_KERNELS(T)                                                                       \
   void InterpolateLinear(WarpLanes<T, 4>& lanes, const double* a, const double* b, unsigned count, \
                          WarpRounding rounding);                                                   \
@@ -61,7 +75,9 @@ template <typename T, bool kNearest = true>
                         unsigned count);                                                           \
   void WeighCubic(WarpLanes<T, 16>& lanes, const CubicWeights& x, const CubicWeights& y,           \
                   unsigned count);                                                                 \
-  void AddWeighed(const T* values, std::size_t count, double weight, double* sums);
+  void AddWeighed(const T* values, std::size_t count, double weight, double* sums);                \
+  void WeighNear(const NearPixels<T>& pixels, const NearWeights& x, const NearWeights& y,          \
+                 const std::uint8_t* wanted, unsigned count);
 VEXG_WARP_KERNELS(std::uint8_t)
 VEXG_WARP_KERNELS(std::int8_t)
 VEXG_WARP_KERNELS(std::uint16_t)
