@@ -134,6 +134,15 @@ void ChooseBandDetails(Metadata& metadata, const Array<unsigned>& bands) {
   }
 }
 
+void AddBandDetails(Metadata& metadata, unsigned offset, const Metadata& other) {
+  for (const std::string& name : DetailNames(other)) {
+    unsigned band = 0;
+    std::string rest;
+    if (!SplitBandName(name, band, rest)) continue;
+    metadata.Set(BandDetailPath(offset + band, rest), String(FindDetail(other, DetailPath(name))));
+  }
+}
+
 void MovePlaceDetails(Metadata& metadata, unsigned left, unsigned top) {
   for (const std::string& name : DetailNames(metadata)) {
     const bool isGrid = name == kGrid;

@@ -64,6 +64,10 @@ VEXG_EXPORT std::vector<std::string> FindCategories(const Metadata& metadata, un
 /// @param bands  which one each band was before; one may come twice.
 VEXG_EXPORT void ChooseBandDetails(Metadata& metadata, const Array<unsigned>& bands);
 
+/// Adds the details of the bands of another raster.
+/// @param offset  band in `metadata` of the other's band 0.
+VEXG_EXPORT void AddBandDetails(Metadata& metadata, unsigned offset, const Metadata& other);
+
 /// Moves the details of the place to an origin that lies at a pixel of the raster.
 VEXG_EXPORT void MovePlaceDetails(Metadata& metadata, unsigned left, unsigned top);
 

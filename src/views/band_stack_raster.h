@@ -24,7 +24,9 @@ template <typename T>
 class BandStackRaster final : public ComputedRaster<T> {
  public:
   /// @param members  empty ones are passed over.
-  explicit BandStackRaster(const Array<RasterPtr<T>>& members);
+  /// @param form     kTold: the details of bands are the first member's; kExact: each band has its
+  ///                 own.
+  explicit BandStackRaster(const Array<RasterPtr<T>>& members, Form form = Form::kTold);
   ~BandStackRaster() override { this->StopComputing(); }
 
   URI GetURI() const override { return this->DefaultURI("BandStackRaster"); }

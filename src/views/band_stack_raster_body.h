@@ -3,6 +3,7 @@
 #include <algorithm>
 
 #include "raster/block_shape.h"
+#include "raster/raster_details.h"
 #include "views/band_stack_raster.h"
 
 namespace lumo {
@@ -19,7 +20,7 @@ RasterPtr<T> FirstOf(const Array<RasterPtr<T>>& members) {
 }  // namespace detail
 
 template <typename T>
-BandStackRaster<T>::BandStackRaster(const Array<RasterPtr<T>>& members)
+BandStackRaster<T>::BandStackRaster(const Array<RasterPtr<T>>& members, Form form)
     : ComputedRaster<T>(detail::FirstOf(members)) {
   for (const RasterPtr<T>& member : members) {
     if (!member) continue;
@@ -34,6 +35,9 @@ BandStackRaster<T>::BandStackRaster(const Array<RasterPtr<T>>& members)
     pyramidDef_.levelMin = std::max(pyramidDef_.levelMin, pyramid.levelMin);
     pyramidDef_.levelMax = std::min(pyramidDef_.levelMax, pyramid.levelMax);
     pyramidDef_.levelMin = std::min(pyramidDef_.levelMin, pyramidDef_.levelMax);
+    if (form == Form::kExact && !members_.empty()) {
+      AddBandDetails(def_.metadata, static_cast<unsigned>(sources_.size()), def.metadata);
+    }
     const auto index = static_cast<unsigned>(members_.size());
     for (unsigned band = 0; band < member->Bands(); ++band) {
       const auto value = def.noData.find(band);

@@ -1,21 +1,10 @@
-#include <cmath>
-
 #include "foundation/fault.h"
 #include "foundation/text_case.h"
-#include "georef/affine_link.h"
-#include "raster/raster_def.h"
 #include "views/expression_raster.h"
 #include "views/publish_raster.h"
 
 namespace lumo {
 namespace {
-
-std::vector<OutputDeclaration> Outputs() {
-  std::vector<OutputDeclaration> outputs = PublishedOutputs();
-  outputs.push_back({"Warning", ValueKind::kText,
-                     "which rasters lie elsewhere than the first one; absent when none does"});
-  return outputs;
-}
 
 const CommandDeclaration kExpression{
     "CreateExpressionRasterCommand",
@@ -38,9 +27,9 @@ const CommandDeclaration kExpression{
       "pixel type; Single when absent. Results for integers are rounded, and what does not fit is "
       "not valid",
       "", &EightTypeWords}},
-    Outputs()};
+    CombinedOutputs()};
 
-class CreateExpressionRasterCommand final : public PublishCommand {
+class CreateExpressionRasterCommand final : public CombineCommand {
   CommandResult Execute() override {
     if (!CheckInputs()) return Fail();
     const std::vector<BasicRasterPtr> rasters = FindRasters("SrcURI");
@@ -59,8 +48,7 @@ class CreateExpressionRasterCommand final : public PublishCommand {
     });
     if (!isKnown) return Fail("DataType: an expression gives no such pixels");
     if (!view->IsValid()) return Fail();
-    const std::string apart = FindApart(rasters);
-    if (!apart.empty()) Write("Warning", String(apart));
+    WriteApart(rasters);
     return Publish(view);
   }
 
@@ -104,32 +92,6 @@ class CreateExpressionRasterCommand final : public PublishCommand {
   static std::string NameOf(unsigned index) {
     const std::string letter(1, static_cast<char>('a' + index % 26));
     return index < 26 ? letter : letter + std::to_string(index / 26);
-  }
-
-  /// Names the rasters that lie elsewhere than the first one, as far as grids of one coordinate
-  /// system tell; empty for none.
-  static std::string FindApart(const std::vector<BasicRasterPtr>& rasters) {
-    const RasterDef first = rasters.front()->GetRasterDef();
-    std::string apart;
-    for (std::size_t i = 1; i < rasters.size(); ++i) {
-      const RasterDef def = rasters[i]->GetRasterDef();
-      if (!first.geoRef || !def.geoRef) continue;
-      Array<double> corners{ArrayDims(2, 2)};
-      corners[0] = corners[1] = 0;
-      corners[2] = first.samples;
-      corners[3] = first.lines;
-      if (!CarryPixels(*first.geoRef, *def.geoRef, corners)) continue;
-      const double off = std::max(std::hypot(corners[0], corners[1]),
-                                  std::hypot(corners[2] - first.samples, corners[3] - first.lines));
-      constexpr double kRounding = 0.01;  // pixels
-      if (!(off > kRounding)) continue;
-      apart.append(apart.empty() ? "" : ", ").append(rasters[i]->GetURI().ToUTF8());
-    }
-    if (!apart.empty()) {
-      apart += ": not where " + rasters.front()->GetURI().ToUTF8() +
-               " lies; pixels are taken by their sample and line";
-    }
-    return apart;
   }
 };
 

@@ -84,13 +84,14 @@ void SetDetails(Metadata& metadata, const std::vector<NamedExpression>& expressi
 
 template <typename T>
 ExpressionRaster<T>::ExpressionRaster(const std::vector<BasicRasterPtr>& rasters,
-                                      const std::vector<NamedExpression>& expressions)
+                                      const std::vector<NamedExpression>& expressions,
+                                      const Metadata* details)
     : rasters_(rasters), expressions_(expressions) {
-  if (!SetUp()) def_.Clear();
+  if (!SetUp(details)) def_.Clear();
 }
 
 template <typename T>
-bool ExpressionRaster<T>::SetUp() {
+bool ExpressionRaster<T>::SetUp(const Metadata* details) {
   if (rasters_.empty() || expressions_.empty()) return false;
   for (const BasicRasterPtr& raster : rasters_) {
     if (!raster || !raster->IsValid()) return false;
@@ -109,7 +110,11 @@ bool ExpressionRaster<T>::SetUp() {
   def_.dataType = kDataTypeOf<T>;
   def_.bands = static_cast<unsigned>(expressions_.size());
   def_.noData.clear();  // the states carry it
-  SetDetails(def_.metadata, expressions_);
+  if (details != nullptr) {
+    def_.metadata = *details;
+  } else {
+    SetDetails(def_.metadata, expressions_);
+  }
   return true;
 }
 

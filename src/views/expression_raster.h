@@ -31,8 +31,11 @@ class ExpressionRaster final : public ComputedRaster<T> {
  public:
   /// @param rasters      that the bands of the expressions are of.
   /// @param expressions  one for each band.
+  /// @param details      of bands and raster, in the place of the names of expressions and what
+  ///                     the first raster has of its place; null for those.
   ExpressionRaster(const std::vector<BasicRasterPtr>& rasters,
-                   const std::vector<NamedExpression>& expressions);
+                   const std::vector<NamedExpression>& expressions,
+                   const Metadata* details = nullptr);
   ~ExpressionRaster() override { this->StopComputing(); }
 
   URI GetURI() const override { return this->DefaultURI("ExpressionRaster"); }
@@ -55,7 +58,7 @@ class ExpressionRaster final : public ComputedRaster<T> {
                   Array<T>& pixels, Array<unsigned char>& state) override;
 
  private:
-  bool SetUp();
+  bool SetUp(const Metadata* details);
 
   std::vector<BasicRasterPtr> rasters_;
   std::vector<NamedExpression> expressions_;

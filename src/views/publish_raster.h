@@ -29,10 +29,21 @@ class VEXG_EXPORT PublishCommand : public RasterCommand {
   }
 };
 
+/// Helps commands that show several rasters as one, pixel for pixel.
+class VEXG_EXPORT CombineCommand : public PublishCommand {
+ protected:
+  /// Gives the output Warning when rasters lie elsewhere than the first one, as far as grids of one
+  /// coordinate system tell.
+  void WriteApart(const std::vector<BasicRasterPtr>& rasters);
+};
+
 /// The words of the types of EightTypes, for an input that chooses one.
 VEXG_EXPORT std::vector<const char*> EightTypeWords();
 
 /// The outputs of a PublishCommand.
 VEXG_EXPORT std::vector<OutputDeclaration> PublishedOutputs();
+
+/// The outputs of a CombineCommand.
+VEXG_EXPORT std::vector<OutputDeclaration> CombinedOutputs();
 
 }  // namespace lumo

@@ -1,3 +1,5 @@
+#include <fmt/format.h>
+
 #include "raster/pixel_value.h"
 #include "views/band_stack_raster.h"
 #include "views/complex_raster.h"
@@ -80,10 +82,15 @@ const CommandDeclaration kStack{
     "CreateBandStackRasterCommand",
     "Views",
     "Shows the bands of several rasters of one pixel type as one raster.",
-    {{"SrcURI", Presence::kRequired, ValueKind::kURIArray, "the rasters, in order"}},
-    PublishedOutputs()};
+    {{"SrcURI", Presence::kRequired, ValueKind::kURIArray, "the rasters, in order"},
+     {"Bands", Presence::kOptional, ValueKind::kWord,
+      "Told: names, units and further details are those of the first raster; Exact: each band "
+      "keeps "
+      "its own, and rasters of another size than the first are refused",
+      "", &WordsIn<Form>}},
+    CombinedOutputs()};
 
-class CreateBandStackRasterCommand final : public PublishCommand {
+class CreateBandStackRasterCommand final : public CombineCommand {
   CommandResult Execute() override {
     if (!CheckInputs()) return Fail();
     const std::vector<BasicRasterPtr> sources = FindRasters("SrcURI");
@@ -93,11 +100,23 @@ class CreateBandStackRasterCommand final : public PublishCommand {
         return Fail("SrcURI: the pixel types differ");
       }
     }
+    const Form form = HasInput("Bands") ? Read<Form>("Bands") : Form::kTold;
+    if (form == Form::kExact) {
+      for (const BasicRasterPtr& source : sources) {
+        if (source->Samples() == sources[0]->Samples() && source->Lines() == sources[0]->Lines()) {
+          continue;
+        }
+        return Fail(fmt::format("SrcURI: {} has {} x {} pixels, the first raster {} x {}",
+                                source->GetURI().ToUTF8(), source->Samples(), source->Lines(),
+                                sources[0]->Samples(), sources[0]->Lines()));
+      }
+      WriteApart(sources);
+    }
     BasicRasterPtr stack;
     const bool typed = DispatchType(EightTypes{}, sources[0]->DataType(), [&]<typename T>() {
       Array<RasterPtr<T>> members{ArrayDims(static_cast<unsigned>(sources.size()))};
       for (unsigned i = 0; i < members.GetCount(); ++i) members[i] = RasterPtr<T>(sources[i]);
-      stack.Reset(new BandStackRaster<T>(members));
+      stack.Reset(new BandStackRaster<T>(members, form));
       return true;
     });
     return typed ? Publish(stack) : Fail("SrcURI: there is no such view on this pixel type");

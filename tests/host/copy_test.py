@@ -136,7 +136,7 @@ class Refusals(CopyTest):
             ("no file that can be replaced", ["/dev/null", "--format", "ORVA", *force]),
             ("tells no format", [self.output / "o.xyz"]),
             ('no format "X"', [self.output / "o.dat", "--format", "X"]),
-            ("does not change their type", [self.output / "o.dat", "--type", "Double"]),
+            ("--type", [self.output / "o.dat", "--type", "Complex"]),
             ("--rect", [self.output / "o.dat", "--rect", "0,0,4,4"]),
             ("no band 3", [self.output / "o.dat", "--bands", "3"]),
             ("--input-format", [self.output / "o.dat", "--input-format", "X"]),

@@ -3,7 +3,7 @@
 #include "foundation/color.h"
 #include "options/option_values.h"
 #include "pictures/palette_reading.h"
-#include "raster/pixel_types.h"
+#include "rasters/pixel_conversion.h"
 #include "rasters/raster_verb.h"
 
 namespace lumo::host {
@@ -22,6 +22,7 @@ class CopyVerb final : public RasterVerb {
         "The copy keeps which pixels are valid, pixel type, no-data values, geo-reference, "
         "palettes, names, units and scales of bands and metadata items, as far as its format can; "
         "what it can't is said, and with --strict a failure.");
+    line.AddExample("vexg copy scene.tif picture.tif --type Byte --scale 0,3000");
     line.AddExample("vexg copy scene.tif part.dat --format ORVA --rect 0,0,99,49 --bands 2,1,0");
     AddAreaTo(line);
     line.Add("--bands", bandsText_, "Bands in the order wanted, from 0; all by default")
@@ -33,9 +34,8 @@ class CopyVerb final : public RasterVerb {
         .ShowsDefault();
     line.Add("--interleave", interleave_, "Order of the pixels in the copy")
         .Takes(OneOf({"bip", "bil", "bsq"}));
-    line.Add("--type", type_, "Pixel type that the source has to have")
-        .Shows("TYPE")
-        .Takes(PixelTypeName());
+    conversion_.AddTypeTo(line, "Pixel type of the copy");
+    conversion_.AddScaleTo(line);
   }
 
  private:
@@ -52,11 +52,6 @@ class CopyVerb final : public RasterVerb {
 
   RasterInfo PlanRaster(JobSession& session, const JobResults& opened,
                         const RasterInfo& source) override {
-    if (!type_.empty() && DataTypeName(source.dataType) != String(type_)) {
-      throw HostError(kExitUsage, fmt::format("--type: the pixels are {}, and a copy does not "
-                                              "change their type to {}",
-                                              DataTypeName(source.dataType).ToUTF8(), type_));
-    }
     bands_ = ParseBands(bandsText_, source);
     ReadPalettes(session,
                  level_ == 0 ? opened.Find("source").returns.Find("URI")
@@ -64,6 +59,8 @@ class CopyVerb final : public RasterVerb {
                  source);
     RasterInfo planned = source;
     planned.bands = bands_.GetCount();
+    dataType_ = source.dataType;
+    planned.dataType = conversion_.TypeOf(dataType_);
     return planned;
   }
 
@@ -80,6 +77,7 @@ class CopyVerb final : public RasterVerb {
       AddBandView(chain.GetDraft(), "bands", chain.GetTop(), bands_);
       chain.Take("bands");
     }
+    conversion_.AddView(chain, "converted", dataType_);
   }
 
   void AddToCreate(JobDraft& draft, JobWriterCommand& create) const override {
@@ -108,9 +106,11 @@ class CopyVerb final : public RasterVerb {
     if (GetFormat() == "JPEG") losses.Add("the values of pixels exactly");
   }
 
-  std::string bandsText_, interleave_, type_;
+  std::string bandsText_, interleave_;
+  PixelConversion conversion_;
   unsigned level_ = 0;  // of the source's pyramid; 0: the source itself
 
+  unsigned dataType_ = 0;  // of the source
   Array<unsigned> bands_;
   std::vector<BandPalette> palettes_;
 };
