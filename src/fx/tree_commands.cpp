@@ -122,7 +122,8 @@ const CommandDeclaration kSuggest{
     "SuggestSegmentScalesCommand",
     "Feature extraction",
     "Finds costs at which segments of a tree are likely to be whole objects: peaks of the rate at "
-    "which the local variance changes with scale (Dragut, Tiede and Levick 2010). A command of this "
+    "which the local variance changes with scale (Dragut, Tiede and Levick 2010). A command of "
+    "this "
     "library's own.",
     {TreeInput(),
      {"LeastProminence", Presence::kOptional, ValueKind::kNumber,
@@ -133,7 +134,11 @@ const CommandDeclaration kSuggest{
      {"LocalVariance", ValueKind::kNumberArray,
       "mean over the segments of each level of the standard deviation of their values"},
      {"Rates", ValueKind::kNumberArray, "its change from the level before, in percent"},
-     {"Peaks", ValueKind::kNumberArray, "costs at the peaks of the rates, the most prominent first"},
+     {"Peaks", ValueKind::kNumberArray,
+      "costs at the peaks of the rates, the most prominent first"},
+     {"Onsets", ValueKind::kNumberArray,
+      "for each peak the cost of the lowest rate in front of it, at which its objects are whole "
+      "yet"},
      {"Prominences", ValueKind::kNumberArray,
       "how far the rate falls on both sides of each peak, in percent"}}};
 
@@ -152,6 +157,7 @@ class SuggestSegmentScalesCommand final : public Command {
     WriteAll("Rates", levels, [](const ScaleLevel& l) { return l.rate; });
     const std::vector<ScaleLevel> peaks = PeaksOf(levels, least);
     WriteAll("Peaks", peaks, [](const ScaleLevel& l) { return l.mergeValue; });
+    WriteAll("Onsets", peaks, [](const ScaleLevel& l) { return l.onset; });
     WriteAll("Prominences", peaks, [](const ScaleLevel& l) { return l.prominence; });
     return Succeed();
   }

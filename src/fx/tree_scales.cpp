@@ -43,11 +43,14 @@ class Deviations {
   }
 
   std::uint64_t Count() const { return count_; }
-  double Mean() const { return count_ == 0 ? 0 : std::max(sum_, 0.0) / static_cast<double>(count_); }
+  double Mean() const {
+    return count_ == 0 ? 0 : std::max(sum_, 0.0) / static_cast<double>(count_);
+  }
 
  private:
   double Of(std::size_t basin) const {
-    return std::sqrt(basins_.squares[basin] / (static_cast<double>(basins_.pixels[basin]) * bands_));
+    return std::sqrt(basins_.squares[basin] /
+                     (static_cast<double>(basins_.pixels[basin]) * bands_));
   }
 
   TreeBasins basins_;  // no pixels: stands for no segment
@@ -63,31 +66,31 @@ bool IsPeak(const std::vector<ScaleLevel>& levels, std::size_t at) {
          (at + 1 == levels.size() || levels[at].rate >= levels[at + 1].rate);
 }
 
-/// How far the rates fall from a level on before one is higher.
-template <typename Levels>
-double FallOf(double peak, const Levels& levels) {
-  double least = peak;
-  for (const ScaleLevel& level : levels) {
-    if (level.rate > peak) break;
-    least = std::min(least, level.rate);
+/// The level of the lowest rate from one on, before one has a higher rate than a peak. The first of
+/// equal ones.
+template <typename Iterator>
+Iterator FindLowest(double peak, Iterator at, Iterator end) {
+  Iterator lowest = at;
+  for (; at != end && !(at->rate > peak); ++at) {
+    if (at->rate < lowest->rate) lowest = at;
   }
-  return peak - least;
+  return lowest;
 }
 
 void FindRates(std::vector<ScaleLevel>& levels) {
   for (std::size_t i = 1; i < levels.size(); ++i) {
     const double before = levels[i - 1].localVariance;
     constexpr double kPercent = 100;
-    levels[i].rate =
-        before > 0 ? (levels[i].localVariance - before) / before * kPercent : 0;
+    levels[i].rate = before > 0 ? (levels[i].localVariance - before) / before * kPercent : 0;
   }
   for (std::size_t i = 0; i < levels.size(); ++i) {
     if (!IsPeak(levels, i)) continue;
     const auto at = levels.begin() + static_cast<std::ptrdiff_t>(i);
-    const double after = FallOf(at->rate, std::vector<ScaleLevel>(at + 1, levels.end()));
-    const double before =
-        FallOf(at->rate, std::vector<ScaleLevel>(std::reverse_iterator(at), levels.rend()));
-    at->prominence = std::min(before, after);
+    // Both begin at the peak itself: nothing lower may lie on one side.
+    const auto after = FindLowest(at->rate, at, levels.end());
+    const auto before = FindLowest(at->rate, std::reverse_iterator(at + 1), levels.rend());
+    at->prominence = at->rate - std::max(before->rate, after->rate);
+    at->onset = before->mergeValue;
   }
 }
 
@@ -101,7 +104,7 @@ bool FindScales(const SegmentTree& tree, std::vector<ScaleLevel>& levels) {
   std::int64_t next = 0;
   bool isWell = true;
   const auto note = [&] {
-    levels.push_back({CostOfLevel(next++), deviations.Count(), deviations.Mean(), 0, 0});
+    levels.push_back({CostOfLevel(next++), deviations.Count(), deviations.Mean(), 0, 0, 0});
   };
   const bool isRead = tree.ForEachMerge([&](const TreeMerge& merge) {
     isWell = merge.cost >= 0 && std::isfinite(merge.cost) && deviations.Join(merge);

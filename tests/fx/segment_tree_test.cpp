@@ -5,11 +5,13 @@
 #include <fstream>
 #include <map>
 #include <random>
+#include <set>
 
 #include "foundation/fault.h"
 #include "fx/seamless_segmentation.h"
 #include "fx/tree_cut.h"
 #include "fx/tree_labels_raster.h"
+#include "fx/tree_scales.h"
 #include "support/file_bytes.h"
 #include "support/file_size_limit.h"
 #include "support/temporary_directory.h"
@@ -197,6 +199,82 @@ TEST(SegmentTree, KnowsItsBasinsLevelsAndPercentages) {
   }
 }
 
+/// The mean over all labels of the standard deviation of their pixels from the means of their
+/// bands.
+double LocalVariance(const MemoryPtr<std::int16_t>& scene, const Labels& labels) {
+  struct Sums {
+    double pixels = 0, sums[2] = {}, squares[2] = {};
+  };
+  std::map<std::int32_t, Sums> all;
+  for (std::size_t i = 0; i < labels.size(); ++i) {
+    if (labels[i] == 0) continue;
+    Sums& sums = all[labels[i]];
+    ++sums.pixels;
+    for (unsigned band = 0; band < 2; ++band) {
+      const double value = scene->pixels[2 * i + band];
+      sums.sums[band] += value;
+      sums.squares[band] += value * value;
+    }
+  }
+  double total = 0;
+  for (const auto& [label, s] : all) {
+    const double variance = (s.squares[0] + s.squares[1]) / s.pixels -
+                            (s.sums[0] * s.sums[0] + s.sums[1] * s.sums[1]) / s.pixels / s.pixels;
+    total += std::sqrt(std::max(variance, 0.0) / 2);
+  }
+  return total / static_cast<double>(all.size());
+}
+
+TEST(SegmentTree, SuggestsCostsAtPeaksOfTheChangeOfLocalVariance) {
+  const test::TemporaryDirectory folder;
+  const std::string file = folder.Path() / "a.tree";
+  const auto scene = MakeScene<std::int16_t>(100, 80, 2, 13);
+  for (std::size_t i = 0; i < scene->pixels.size(); ++i) {  // squares of 20 x 20 pixels
+    const std::size_t x = i / 2 % 100 / 20, y = i / 200 / 20;
+    scene->pixels[i] = static_cast<std::int16_t>(scene->pixels[i] + (x * 7 + y * 11) % 5 * 300);
+  }
+  for (const double compactness : {0.0, 0.5}) {
+    Segment(scene, {0, file, 16, {1e9, compactness}});
+    const SegmentTreePtr tree = SegmentTree::Open(file);
+    std::vector<ScaleLevel> levels;
+    ASSERT_TRUE(tree && FindScales(*tree, levels));
+    ASSERT_GT(levels.size(), 20U);
+    std::vector<double> rates;
+    for (const ScaleLevel& level : levels) {
+      const Labels labels = Cut(tree, level.mergeValue);
+      const double variance = LocalVariance(scene, labels);
+      ASSERT_NEAR(level.localVariance, variance, 1e-7 * variance) << level.mergeValue;
+      ASSERT_EQ(level.segments, std::set<std::int32_t>(labels.begin(), labels.end()).size() - 1);
+      const double before = rates.empty() ? variance : (&level - 1)->localVariance;
+      rates.push_back((variance - before) / before * 100);
+      ASSERT_NEAR(level.rate, rates.back(), 1e-4);
+    }
+    for (std::size_t i = 0; i < levels.size(); ++i) {
+      // A peak's prominence is the smaller of the drops on its sides.
+      double drops[2] = {}, lowest = levels[i].rate;
+      for (const int step : {-1, 1}) {
+        for (int at = static_cast<int>(i);
+             at >= 0 && at < static_cast<int>(rates.size()) &&
+             levels[static_cast<std::size_t>(at)].rate <= levels[i].rate;
+             at += step) {
+          const double rate = levels[static_cast<std::size_t>(at)].rate;
+          drops[step > 0] = std::max(drops[step > 0], levels[i].rate - rate);
+          if (step < 0) lowest = std::min(lowest, rate);
+        }
+      }
+      if (levels[i].prominence == 0) continue;
+      EXPECT_DOUBLE_EQ(levels[i].prominence, std::min(drops[0], drops[1]));
+      const auto onset = std::find_if(levels.begin(), levels.end(), [&](const ScaleLevel& level) {
+        return level.mergeValue == levels[i].onset;
+      });
+      EXPECT_EQ(onset->rate, lowest);
+    }
+    const std::vector<ScaleLevel> peaks = PeaksOf(levels, 0.1);
+    ASSERT_FALSE(peaks.empty());
+    for (const ScaleLevel& peak : peaks) EXPECT_GE(peak.prominence, 0.1 * peaks[0].prominence);
+  }
+}
+
 /// Reads all of a file. @return whether it could be read; the fault tells where not.
 bool ReadAll(const std::string& file) {
   const SegmentTreePtr tree = SegmentTree::Open(file);
@@ -208,7 +286,9 @@ bool ReadAll(const std::string& file) {
   TreeBasins basins;
   std::vector<TreeCut> cuts;
   double value = 0;
-  return tree->ReadBasins(basins) && FindMergeValue(*tree, 40, value) &&
+  std::vector<ScaleLevel> levels;
+  return tree->ReadBasins(basins) && FindScales(*tree, levels) &&
+         FindMergeValue(*tree, 40, value) &&
          CutTree(*tree, std::vector<double>{0, value, 1e300}, cuts);
 }
 

@@ -396,6 +396,17 @@ class SegmentTest(FolderTest):
             for n, parent in zip(level, numbers[i + 1] if i < 2 else ()):
                 self.assertEqual(upper[n], parent)
         self.assertEqual(rows, wanted)
+        told = json.loads(self.fine("segment", "--suggest", tree, "--json"))
+        self.assertGreater(len(told["levels"]), 10)
+        costs = [level["mergeValue"] for level in told["levels"]]
+        for one in told["suggested"]:
+            self.assertIn(one["mergeValue"], costs)
+            self.assertLess(one["onset"], one["mergeValue"])
+        table = self.fine("segment", "--suggest", tree).splitlines()
+        self.assertEqual([float(row.split()[0]) for row in table[1:]],
+                         [float(f"{one['mergeValue']:.6g}") for one in told["suggested"]])
+        self.fine("segment", "--suggest", tree, "-o", self.folder / "curve.png", "-q")
+        self.assertTrue((self.folder / "curve.png").exists())
         document = self.fine("segment", "levels", tree, "--values", "1,2", "-o", self.folder / "p", "--print-job")
         self.fine("run", "-", stdin=document)
         self.assertTrue((self.folder / "p.2.tif").exists())
@@ -414,7 +425,8 @@ class SegmentTest(FolderTest):
                 (2, "no option that segments", "cut", tree, out, "--segment-value", 4),
                 (2, "exclude each other", "cut", tree, out, "--merge-value", 4, "--merge-percent", 4),
                 (2, "--values", "cut", tree, out, "--values", "3"), (2, "--values is required", "levels", tree, "-o", out),
-                (2, "is no cost", "levels", tree, "-o", out, "--values", "3,x"),
+                (2, "a tree alone", "--suggest", tree, out), (2, "takes no costs", "--suggest", tree, "--merge-value", 3),
+                (1, "isn't a whole tree", "--suggest", scene), (2, "is no cost", "levels", tree, "-o", out, "--values", "3,x"),
                 (2, "comes twice", "levels", tree, "-o", out, "--values", "3,1,3"),
                 (1, "isn't a whole tree", "cut", scene, out), (1, "no-such", "cut", self.folder / "no-such", out)):
             with self.subTest(words):

@@ -5,6 +5,7 @@
 #include <vector>
 
 #include "jobs/raster_job.h"
+#include "output/output_file.h"
 
 namespace lumo::host {
 
@@ -34,6 +35,24 @@ struct TreeLevels {
   /// Throws HostError when a raster could not be written to its end. Behind the making.
   void CheckMade(const JobResults& results) const;
 };
+
+/// Holds how local variance grows with scale, and the costs that it suggests.
+struct ScaleCurve {
+  std::vector<double> mergeValues, segments, localVariance, rates;  ///< by level
+  std::vector<double> peaks, onsets, prominences;                   ///< the most prominent first
+
+  static ScaleCurve Read(const JobResults& results);
+
+  std::string AsText() const;
+  std::string AsJson(const std::string& file) const;
+  /// Draws the rates and the local variance over the binary logarithm of the cost.
+  void Draw(const OutputFile& output) const;
+};
+
+/// Adds the command whose results ScaleCurve reads.
+void AddSuggest(JobDraft& draft, const std::string& tree);
+/// The name of its step.
+inline constexpr const char* kSuggestStep = "suggest";
 
 /// Reads costs, one at least, and puts them in order. Throws HostError for what are none.
 std::vector<double> ReadMergeValues(const std::string& list);

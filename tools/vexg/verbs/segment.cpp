@@ -66,6 +66,12 @@ class SegmentVerb final : public RasterVerb {
     line.AddExample("vexg segment scene.tif segments.tif --merge-value 100 --tree scene.tree");
     line.AddExample("vexg segment cut scene.tree segments.tif --merge-value 250");
     line.AddExample("vexg segment levels scene.tree --values 50,200,800 -o levels");
+    line.AddNote(
+        "--suggest TREE makes no labels. It gives costs at which segments are likely to be whole "
+        "objects: where the local variance, the mean deviation inside segments, begins to grow "
+        "faster with the cost. The most prominent comes first; -o draws the curve, --json prints "
+        "it.");
+    line.AddExample("vexg segment --suggest scene.tree");
     line.AddExample("vexg segment --estimate scene.tif -o curves.png");
     AddFilesTo(line, "The labels; with cut and levels the tree", false);
     line.Add("more", more_, "With cut, the labels").IsFile("LABELS");
@@ -73,12 +79,15 @@ class SegmentVerb final : public RasterVerb {
              "Segment tile by tile, which takes less memory and leaves seams");
     line.Add("--estimate", request_.isEstimate,
              "Say what percentages stand for, and make no labels");
+    line.Add("--suggest", isSuggest_, "Say which costs suit a tree, and make no labels");
+    line.AllowOneOf({"--estimate", "--suggest", "--tiled"});
     line.Add("--output,-o", picture_,
-             "With --estimate: a picture of both curves, a PNG or JPEG; with levels: the files "
+             "With --estimate and --suggest: a picture of the curves, a PNG or JPEG; with levels: "
+             "the files "
              "without "
              "their endings")
         .IsFile("OUT");
-    line.Add("--json", isJson_, "With --estimate: both curves as JSON");
+    line.Add("--json", isJson_, "With --estimate and --suggest: the curves as JSON");
     AddAreaTo(line);
     line.Add("--bands", bandsText_, "Bands, from 0; all by default")
         .Shows("B,B...")
@@ -147,10 +156,17 @@ class SegmentVerb final : public RasterVerb {
   }
 
   int Run() override {
-    const std::string& word = GetSource().file;
-    action_ = word == "cut" ? Action::kCut : word == "levels" ? Action::kLevels : Action::kSegment;
+    const std::string word = GetSource().file;
+    action_ = isSuggest_         ? Action::kSuggest
+              : word == "cut"    ? Action::kCut
+              : word == "levels" ? Action::kLevels
+                                 : Action::kSegment;
     if (Is(Action::kSegment)) {
       if (!more_.empty()) throw HostError(kExitUsage, "there is a word too many: " + more_.front());
+      return RasterVerb::Run();
+    }
+    if (Is(Action::kSuggest)) {
+      if (!GetTargetName().empty()) throw HostError(kExitUsage, "--suggest takes a tree alone");
       return RasterVerb::Run();
     }
     GetSource().file = GetTargetName();
@@ -165,7 +181,7 @@ class SegmentVerb final : public RasterVerb {
 
  private:
   /// Says which files are made of which.
-  enum class Action { kSegment, kCut, kLevels };
+  enum class Action { kSegment, kCut, kLevels, kSuggest };
 
   bool Is(Action action) const { return action_ == action; }
 
@@ -174,8 +190,15 @@ class SegmentVerb final : public RasterVerb {
     const auto refuse = [](const std::string& line) { throw HostError(kExitUsage, line); };
     if (request_.IsSegmenting() || !bandsText_.empty() || !mergeRaster_.empty() ||
         !polygons_.empty() || !quicklook_.empty() || !tree_.empty() || GetArea().IsGiven() ||
-        isJson_) {
-      refuse("cut and levels take a tree as it is, with no option that segments");
+        (isJson_ && !Is(Action::kSuggest))) {
+      refuse("cut, levels and --suggest take a tree as it is, with no option that segments");
+    }
+    if (Is(Action::kSuggest)) {
+      if (request_.mergeValue || request_.mergePercent || !valuesText_.empty()) {
+        refuse("--suggest takes no costs");
+      }
+      if (!picture_.empty()) CheckPictureName(picture_);
+      return;
     }
     if (Is(Action::kCut)) {
       if (!picture_.empty() || !valuesText_.empty()) refuse("-o and --values go with levels");
@@ -219,11 +242,13 @@ class SegmentVerb final : public RasterVerb {
   }
   std::vector<std::string> GetOutputs() const override {
     if (Is(Action::kLevels)) return levels_.FilesOf(picture_);
-    if (!request_.isEstimate) return RasterVerb::GetOutputs();
+    if (!request_.isEstimate && !Is(Action::kSuggest)) return RasterVerb::GetOutputs();
     return picture_.empty() ? std::vector<std::string>() : std::vector{picture_};
   }
   std::uint64_t GetBytes(std::size_t output) const override {
-    return request_.isEstimate || Is(Action::kLevels) ? 0 : RasterVerb::GetBytes(output);
+    return request_.isEstimate || Is(Action::kLevels) || Is(Action::kSuggest)
+               ? 0
+               : RasterVerb::GetBytes(output);
   }
   std::vector<std::string> GetFurtherOutputs() const override {
     std::vector<std::string> files;
@@ -322,6 +347,11 @@ class SegmentVerb final : public RasterVerb {
   }
 
   JobDraft GetJob(const Outputs& outputs) const override {
+    if (Is(Action::kSuggest)) {
+      JobDraft draft;
+      AddSuggest(draft, GetSource().file);
+      return draft;
+    }
     if (Is(Action::kLevels)) {
       JobDraft draft;
       levels_.AddMaking(draft, NamesOf(outputs, &OutputFile::GetName), GetFormat());
@@ -334,6 +364,11 @@ class SegmentVerb final : public RasterVerb {
   void Make(JobSession& session, const Outputs& outputs) override {
     if (request_.isEstimate) return Estimate(session, outputs);
     if (Is(Action::kLevels)) return MakeLevels(session, outputs);
+    if (Is(Action::kSuggest)) {
+      scales_ = ScaleCurve::Read(session.Run(GetJob(outputs)));
+      if (!picture_.empty()) scales_.Draw(outputs.Get(0));
+      return;
+    }
     if (!tree_.empty()) treePlace_ = outputs.Get(GetOutputs().size() - 1).GetWorkName();
     RasterVerb::Make(session, outputs);
     if (!quicklook_.empty()) DrawQuicklook(session, outputs);
@@ -442,6 +477,10 @@ class SegmentVerb final : public RasterVerb {
   }
 
   std::string Describe() const override {
+    if (Is(Action::kSuggest)) {
+      if (isJson_) return scales_.AsJson(GetSource().file);
+      return picture_.empty() ? scales_.AsText() : std::string();
+    }
     if (!request_.isEstimate) return {};
     if (isJson_) {
       return Json{{"file", GetSource().file},
@@ -463,12 +502,13 @@ class SegmentVerb final : public RasterVerb {
   static constexpr unsigned kFloatBins = 65000;
   static constexpr unsigned kQuicklookSize = 2048;
 
-  bool isJson_ = false;
+  bool isJson_ = false, isSuggest_ = false;
   Action action_ = Action::kSegment;
   std::vector<std::string> more_;
   std::string picture_, bandsText_, mergeRaster_, polygons_, quicklook_, tree_, valuesText_;
   mutable std::string treePlace_;  // where the tree is made, or where it will be
   TreeLevels levels_;
+  ScaleCurve scales_;
   SegmentRequest request_;
 
   RasterInfo scene_;
