@@ -135,9 +135,9 @@ std::uint64_t Build::TileValues(const TilePlace& place) const {
 
 /// A tile as it is to be stored: what was packed, else what was given.
 struct Build::Packed {
-  Bytes pixels;
-  Bytes states;
-  Bytes maskStates;  // as they were given, less the bit of no data
+  RawBytes pixels;
+  RawBytes states;
+  RawBytes maskStates;  // as they were given, less the bit of no data
   std::vector<platform::ConstFilePiece> pieces;
   TileEntry entry;
 };
@@ -149,8 +149,8 @@ void Build::Pack(const TileRow& tiles, unsigned index, Packed& packed) const {
   place.column += index;
   const std::uint64_t values = TileValues(place);
   const unsigned elementBytes = DataTypeBytes(header_.dataType);
-  const auto add = [&](std::span<const unsigned char> plain, Bytes& part) -> std::uint32_t {
-    pyramid::Pack(header_.compression, plain, part);
+  const auto add = [&](std::span<const unsigned char> plain, RawBytes& part) -> std::uint32_t {
+    PackBytes(header_.compression, plain, part);
     const std::span<const unsigned char> stored = part.Count() != 0 ? part.All() : plain;
     packed.pieces.push_back({stored.data(), stored.size()});
     return static_cast<std::uint32_t>(stored.size());

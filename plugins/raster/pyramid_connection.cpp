@@ -12,9 +12,9 @@ namespace {
 
 constexpr std::string_view kCompression = "COMPRESSION=";
 
-bool ReadCompression(std::string_view word, Compression& compression) {
+bool ReadCompression(std::string_view word, Packing& compression) {
   if (word != "LZ4" && word != "NONE") return false;
-  compression = word == "LZ4" ? Compression::kLz4 : Compression::kNone;
+  compression = word == "LZ4" ? Packing::kLz4 : Packing::kNone;
   return true;
 }
 

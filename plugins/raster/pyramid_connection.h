@@ -54,7 +54,7 @@ class Connection final : public PlainRasterConnection {
   bool MakeReader();
 
   std::string path_;
-  Compression compression_ = Compression::kLz4;
+  Packing compression_ = Packing::kLz4;
   lumo::RasterDef def_;
   std::unique_ptr<PyramidFile> file_;
   std::shared_ptr<Build> build_;
@@ -64,7 +64,7 @@ class Connection final : public PlainRasterConnection {
 /// The contents of connection strings beside the format's key: the path, and how tiles are packed.
 struct Place {
   std::string path;  ///< absolute, with links resolved; empty when the strings name none
-  Compression compression = Compression::kLz4;
+  Packing compression = Packing::kLz4;
 };
 /// False, with SetFault, for strings that name no file, or have a piece too many.
 bool FindPlace(const Array<String>& connStrings, Place& place);

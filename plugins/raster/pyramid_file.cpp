@@ -116,15 +116,16 @@ bool PyramidFile::ReadTile(const TilePlace& place, Tile& tile, std::string& faul
   tile.states.Resize(entry.stateBytes != 0 ? values : 0);
 
   const bool isPlain = entry.pixelBytes == pixelBytes && entry.stateBytes == 0;
-  Bytes packed;
+  RawBytes packed;
   if (!isPlain) packed.Resize(stored);
   unsigned char* const into = isPlain ? tile.pixels.Get() : packed.Get();
   if (!file_->Read(entry.offset, into, stored, &fault)) return false;
   if (Checksum(into, stored) != entry.checksum) return fail("is damaged");
   if (isPlain) return true;
-  const bool isWhole = Unpack({into, entry.pixelBytes}, tile.pixels.All()) &&
-                       (entry.stateBytes == 0 ||
-                        Unpack({into + entry.pixelBytes, entry.stateBytes}, tile.states.All()));
+  const bool isWhole =
+      UnpackBytes({into, entry.pixelBytes}, tile.pixels.All()) &&
+      (entry.stateBytes == 0 ||
+       UnpackBytes({into + entry.pixelBytes, entry.stateBytes}, tile.states.All()));
   return isWhole || fail("can't be unpacked");
 }
 

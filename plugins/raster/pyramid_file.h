@@ -5,8 +5,8 @@
 #include <mutex>
 #include <vector>
 
+#include "foundation/packing.h"
 #include "platform/random_access_file.h"
-#include "pyramid_codec.h"
 #include "pyramid_header.h"
 
 namespace lumo::pyramid {
@@ -16,8 +16,8 @@ struct Tile {
   unsigned width = 0;
   unsigned height = 0;
   unsigned bands = 0;
-  Bytes pixels;
-  Bytes states;  ///< one for each value; none when all are 0
+  RawBytes pixels;
+  RawBytes states;  ///< one for each value; none when all are 0
 };
 
 /// Which tile of a pyramid.

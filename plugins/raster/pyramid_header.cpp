@@ -4,9 +4,6 @@
 #include <string_view>
 #include <type_traits>
 
-#define XXH_INLINE_ALL
-#include <xxhash.h>
-
 #include "raster/pixel_types.h"
 #include "raster/raster_enums.h"
 
@@ -14,19 +11,6 @@ namespace lumo::pyramid {
 
 static_assert(std::is_trivially_copyable_v<StoredHeader> &&
               std::has_unique_object_representations_v<Header> && sizeof(TileEntry) == 24);
-
-std::uint64_t Checksum(const void* bytes, std::size_t count) {
-  return XXH3_64bits(bytes, count);
-}
-
-std::uint64_t Checksum(const void* first, std::size_t firstCount, const void* second,
-                       std::size_t secondCount) {
-  XXH3_state_t state;
-  XXH3_64bits_reset(&state);
-  XXH3_64bits_update(&state, first, firstCount);
-  XXH3_64bits_update(&state, second, secondCount);
-  return XXH3_64bits_digest(&state);
-}
 
 std::uint64_t Header::TileCount(unsigned level) const {
   constexpr std::uint64_t kMost = std::uint64_t{1} << 48;
@@ -62,7 +46,7 @@ const char* FindFault(const Header& h) {
   if (h.tileSide == 0 || h.tileSide > kMostTileSide) return "tiles are 1 to 2048 pixels wide";
   if (h.levelMin > h.levelMax || h.levelMax >= kLevelCount) return "levels go from 0 to 31";
   if (h.resamplingMethod > kMethods) return "no such way of resampling";
-  if (h.compression > Compression::kLz4) return "no such compression";
+  if (h.compression > Packing::kLz4) return "no such compression";
   for (unsigned level = h.levelMin; level <= h.levelMax; ++level) {
     if (h.TileCount(level) == Header::kTooMany) return "too many tiles";
   }

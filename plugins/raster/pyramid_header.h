@@ -6,14 +6,12 @@
 #include <cstdint>
 #include <string>
 
+#include "foundation/packing.h"
 #include "pyramid/level_shape.h"
 
 namespace lumo::pyramid {
 
 static_assert(std::endian::native == std::endian::little, "the file's numbers are little endian");
-
-/// How the tiles of a file are packed.
-enum class Compression : std::uint32_t { kNone = 0, kLz4 = 1 };
 
 /// A run of the file, and the checksum of its bytes.
 struct Extent {
@@ -21,12 +19,6 @@ struct Extent {
   std::uint64_t bytes = 0;
   std::uint64_t checksum = 0;
 };
-
-/// The checksum of the file format: XXH3, 64 bits.
-std::uint64_t Checksum(const void* bytes, std::size_t count);
-/// Of two runs that follow one another in the file.
-std::uint64_t Checksum(const void* first, std::size_t firstCount, const void* second,
-                       std::size_t secondCount);
 
 /// A stored tile: pixels, then states where it has any. A part that is as long as what it stands
 /// for lies there plainly.
@@ -56,7 +48,7 @@ struct Header {
   std::uint32_t levelMin = 0;
   std::uint32_t levelMax = 0;
   std::uint32_t resamplingMethod = 0;
-  Compression compression = Compression::kNone;
+  Packing compression = Packing::kNone;
   std::uint32_t reserved = 0;
   Extent values;                           ///< text of the values of bands
   std::array<Extent, kLevelCount> levels;  ///< by level: its TileEntries, by row, column and band

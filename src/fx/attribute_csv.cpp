@@ -54,6 +54,11 @@ bool AttributeCsv::Write(std::uint32_t label, std::span<const float> values) {
   return text_.size() < kTextBytes || Flush();
 }
 
+bool AttributeCsv::WriteLine(std::string_view line) {
+  text_.append(line) += '\n';
+  return text_.size() < kTextBytes || Flush();
+}
+
 bool AttributeCsv::Flush() {
   std::string why;
   if (!file_->Write(place_, text_.data(), text_.size(), &why)) {

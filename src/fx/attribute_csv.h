@@ -4,6 +4,7 @@
 #include <memory>
 #include <span>
 #include <string>
+#include <string_view>
 #include <vector>
 
 #include "platform/random_access_file.h"
@@ -31,6 +32,8 @@ class AttributeCsv {
   bool Begin(const std::string& path, const std::vector<std::string>& names);
   /// Adds a line. @param values  of the columns behind the label.
   bool Write(std::uint32_t label, std::span<const float> values);
+  /// Adds a line as it is.
+  bool WriteLine(std::string_view line);
   bool Close();
 
  private:

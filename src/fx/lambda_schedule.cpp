@@ -185,6 +185,7 @@ void LambdaSchedule::Join(std::uint32_t pair, Merge& merge) {
   if (RankOf(lower) > RankOf(higher)) std::swap(lower, higher);
   merge.lower = lower;
   merge.higher = higher;
+  merge.border = pairs_[pair].length;
   Unlink(pair, lower);
   Unlink(pair, higher);
   JoinMeans(lower, higher);

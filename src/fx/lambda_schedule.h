@@ -45,6 +45,7 @@ class VEXG_EXPORT LambdaSchedule {
     double lambda = 0;  ///< the cost
     std::uint32_t lower = 0;
     std::uint32_t higher = 0;
+    std::uint32_t border = 0;  ///< length of the common boundary, in pixel edges
   };
 
   /// Forgets everything, and makes room for labels below `labelCount`, of `bands` bands.
@@ -71,6 +72,12 @@ class VEXG_EXPORT LambdaSchedule {
   /// Computes means and costs, and finds the nearest neighbours. Behind all pixels.
   /// @param pairs  of neighbours; none has the label 0.
   void Build(const std::vector<LabelPair>& pairs);
+
+  /// The pixels of a segment, and the mean of one of its bands. Behind Build.
+  double AreaOf(std::uint32_t label) const { return regions_[label].area; }
+  double MeanOf(std::uint32_t label, std::uint32_t band) const {
+    return means_[std::size_t{label} * bands_ + band];
+  }
 
   /// Merges the next pair. @return false when there is none.
   bool Step(Merge& merge);

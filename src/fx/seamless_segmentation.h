@@ -3,6 +3,7 @@
 #include "fx/label_pairs.h"
 #include "fx/seamless_watershed.h"
 #include "fx/segment_process.h"
+#include "fx/segment_tree.h"
 
 namespace lumo {
 
@@ -13,6 +14,7 @@ namespace lumo {
 ///
 /// The levels go into a SeamlessWatershed; areas, band sums and borders of its basins are added up
 /// in raster order; all basins are merged in one graph; and labels are written once, in one pass.
+/// With a tree, merging goes on until no pair is left, and the labels are a cut of the tree.
 ///
 /// Memory: MemoryOfMerging for the graph, and some 100 bytes a pixel of a strip for each
 ///         thread. Failure: false, with the fault set, and nothing written unless the writing
@@ -36,6 +38,13 @@ class SeamlessSegmentation {
   template <typename Graph>
   bool Gather(Graph& graph, LabelPairs& pairs);
   bool MergeBySchedule();
+  bool DoSteps(LambdaSchedule& schedule);
+  bool BeginTree();
+  bool KeepLines(const std::vector<std::int32_t>& labels);
+  template <typename V>
+  void AddSquares(std::uint32_t label, const V* values, unsigned bands);
+  bool KeepBasins(const LambdaSchedule& schedule);
+  bool CutOwnTree();
   bool MergeRigorously();
   bool Write();
   IPC NextPass() const;
@@ -49,10 +58,17 @@ class SeamlessSegmentation {
   unsigned stripLines_ = 1;
   SeamlessWatershed watershed_;
   std::vector<std::uint32_t> roots_;  // by basin: one that stands for its segment; empty for itself
+  std::optional<SegmentTreeWriter> tree_;
+  // With a tree, by basin: its number in raster order of first pixels, and the squares of its
+  // values.
+  std::vector<std::uint32_t> order_;
+  std::vector<double> squares_;
+  std::uint32_t ordered_ = 0;  // basins that have a number
 };
 
 /// The bytes that merging so many basins takes at most, their neighbours included.
-VEXG_EXPORT std::uint64_t MemoryOfMerging(std::uint64_t basins, unsigned bands, bool isRigorous);
+VEXG_EXPORT std::uint64_t MemoryOfMerging(std::uint64_t basins, unsigned bands,
+                                          const SegmentRequest& request);
 
 /// Says that merging would take more memory than it may.
 VEXG_EXPORT String MemoryFault(std::uint64_t basins, std::uint64_t needed, std::uint64_t allowed);

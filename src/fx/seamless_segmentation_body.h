@@ -11,8 +11,10 @@
 #include "fx/seamless_segmentation.h"
 #include "fx/strip_numbers.h"
 #include "fx/task_setup.h"
+#include "fx/tree_cut.h"
 #include "fx/usable_pixels.h"
 #include "fx/watershed_task.h"
+#include "raster/raster_def.h"
 #include "tasks/thread_limit.h"
 
 namespace lumo {
@@ -97,11 +99,13 @@ TileDimensions SeamlessSegmentation<T>::Strips(unsigned border) const {
 
 template <typename T>
 bool SeamlessSegmentation<T>::Run() {
-  if (!FindBasins()) return false;
+  if (!BeginTree() || !FindBasins()) return false;
   if (IsAborted()) return true;
   const bool merges = request_.mergeValue > 0 || request_.leastPixels > 1;
-  if (merges && watershed_.Count() > 0 && !Merge()) return false;
-  return IsAborted() || Write();
+  if (((merges && watershed_.Count() > 0) || tree_) && !Merge()) return false;
+  if (IsAborted()) return true;
+  if (!Write()) return false;
+  return IsAborted() || !tree_ || tree_->Place();
 }
 
 template <typename T>
@@ -129,8 +133,7 @@ bool SeamlessSegmentation<T>::FindBasins() {
 
 template <typename T>
 bool SeamlessSegmentation<T>::Merge() {
-  const std::uint64_t needed =
-      MemoryOfMerging(watershed_.Count(), merge_->Bands(), request_.isRigorous);
+  const std::uint64_t needed = MemoryOfMerging(watershed_.Count(), merge_->Bands(), request_);
   if (needed > request_.memory) {
     SetFault(MemoryFault(watershed_.Count(), needed, request_.memory));
     return false;
@@ -172,12 +175,13 @@ bool SeamlessSegmentation<T>::Gather(Graph& graph, LabelPairs& pairs) {
     for (const std::int32_t label : made->labels) {
       if (label != 0) {
         detail::AddTo(graph, static_cast<std::uint32_t>(label), values, states, bands);
+        if (tree_) AddSquares(static_cast<std::uint32_t>(label), values, bands);
       }
       values += bands;
       states += bands;
     }
     for (const LabelPair& pair : made->pairs) pairs.AddEdges(pair.low, pair.high, pair.length);
-    return true;
+    return !tree_ || KeepLines(made->labels);
   });
   process.Close();
   return process.RunProcess(process.kHere);
@@ -190,6 +194,10 @@ bool SeamlessSegmentation<T>::MergeBySchedule() {
   schedule.Begin(count + 1, merge_->Bands());
   schedule.Limit(request_.growth);
   schedule.CompareBy(watershed_.TakeRanks());
+  if (tree_) {
+    order_.assign(std::size_t{count} + 1, 0);
+    squares_.assign(std::size_t{count} + 1, 0);
+  }
   {
     LabelPairs pairs;
     pairs.Begin(count);
@@ -197,19 +205,35 @@ bool SeamlessSegmentation<T>::MergeBySchedule() {
     if (IsAborted()) return true;
     schedule.Build(pairs.TakePairs());
   }
-  roots_.resize(std::size_t{count} + 1);
-  std::iota(roots_.begin(), roots_.end(), 0U);
+  if (tree_ && !KeepBasins(schedule)) return false;
+  return DoSteps(schedule) && (!tree_ || IsAborted() || CutOwnTree());
+}
+
+/// Merges up to the threshold, or with a tree to the end.
+template <typename T>
+bool SeamlessSegmentation<T>::DoSteps(LambdaSchedule& schedule) {
+  const std::uint32_t count = watershed_.Count();
+  if (!tree_) {
+    roots_.resize(std::size_t{count} + 1);
+    std::iota(roots_.begin(), roots_.end(), 0U);
+  }
   const IPC pass = NextPass();
   LambdaSchedule::Merge merge;
-  const bool doesSteps = request_.mergeValue > 0;
+  const bool doesSteps = request_.mergeValue > 0 || tree_;
   for (std::uint32_t step = 0; doesSteps && schedule.Step(merge); ++step) {
-    roots_[merge.higher] = merge.lower;
-    if (merge.lambda > request_.mergeValue) break;
+    if (tree_) {
+      const TreeMerge kept{merge.lambda, order_[merge.lower], order_[merge.higher], merge.border};
+      if (!tree_->AddMerge(kept)) return false;
+    } else {
+      roots_[merge.higher] = merge.lower;
+      if (merge.lambda > request_.mergeValue) break;
+    }
     constexpr std::uint32_t kEvery = 4096;
     if (step % kEvery != 0) continue;
     if (IsAborted()) return true;
     pass.progress->Update(static_cast<double>(step) / count);
   }
+  if (tree_) return true;
   schedule.JoinSmall(request_.leastPixels,
                      [this](const auto& join) { roots_[join.higher] = join.lower; });
   for (std::uint32_t label = 1; label <= count; ++label) {
@@ -217,6 +241,92 @@ bool SeamlessSegmentation<T>::MergeBySchedule() {
     while (roots_[root] != root) root = roots_[root] = roots_[roots_[root]];
     roots_[label] = root;
   }
+  return true;
+}
+
+template <typename T>
+bool SeamlessSegmentation<T>::BeginTree() {
+  if (request_.tree.empty()) return true;
+  TreeScene scene;
+  scene.samples = segment_->Samples();
+  scene.lines = segment_->Lines();
+  scene.bands = merge_->Bands();
+  scene.dataType = merge_->DataType();
+  scene.compactness = request_.growth.compactness;
+  scene.mostPixels = request_.growth.mostPixels;
+  const RasterDef def = segment_->GetRasterDef();
+  scene.tileWidth = def.tileWidth;
+  scene.tileHeight = def.tileHeight;
+  scene.interleave = def.interleave;
+  scene.geoRef = def.geoRef;
+  return tree_.emplace().Begin(request_.tree, scene);
+}
+
+/// Gives the basins of the next strip their numbers in raster order, and puts them into the tree.
+template <typename T>
+bool SeamlessSegmentation<T>::KeepLines(const std::vector<std::int32_t>& labels) {
+  std::vector<std::uint32_t> numbers(labels.size());
+  for (std::size_t i = 0; i < labels.size(); ++i) {
+    if (labels[i] == 0) continue;
+    std::uint32_t& number = order_[static_cast<std::size_t>(labels[i])];
+    if (number == 0) number = ++ordered_;
+    numbers[i] = number;
+  }
+  return tree_->AddLines(numbers.data(), labels.size() / watershed_.Width());
+}
+
+template <typename T>
+template <typename V>
+void SeamlessSegmentation<T>::AddSquares(std::uint32_t label, const V* values, unsigned bands) {
+  double sum = 0;
+  for (unsigned band = 0; band < bands; ++band) {
+    const auto value = static_cast<double>(values[band]);
+    sum += value * value;
+  }
+  squares_[label] += sum;
+}
+
+template <typename T>
+bool SeamlessSegmentation<T>::KeepBasins(const LambdaSchedule& schedule) {
+  const std::uint32_t count = watershed_.Count();
+  TreeBasins basins;
+  basins.pixels.resize(count);
+  basins.squares.resize(count);
+  for (std::uint32_t label = 1; label <= count; ++label) {
+    const double area = schedule.AreaOf(label);
+    double squares = squares_[label];
+    for (unsigned band = 0; band < merge_->Bands(); ++band) {
+      const double mean = schedule.MeanOf(label, band);
+      squares -= area * mean * mean;
+    }
+    const std::uint32_t at = order_[label] - 1;
+    basins.pixels[at] = static_cast<std::uint32_t>(area);
+    basins.squares[at] = squares > 0 ? squares : 0;  // not for values that are no numbers
+  }
+  squares_ = {};
+  return tree_->AddBasins(basins);
+}
+
+/// Finds the segments from the tree, as everybody will.
+template <typename T>
+bool SeamlessSegmentation<T>::CutOwnTree() {
+  if (!tree_->Complete()) return false;
+  const SegmentTreePtr tree = SegmentTree::Open(tree_->WorkPath());
+  if (!tree) return false;
+  double mergeValue = request_.mergeValue;
+  if (request_.mergePercent && !FindMergeValue(*tree, *request_.mergePercent, mergeValue)) {
+    return false;
+  }
+  TreeCut cut;
+  if (!CutTree(*tree, mergeValue, cut)) return false;
+  std::vector<std::uint32_t> first(std::size_t{cut.count} + 1, 0);  // basin of each segment
+  roots_.assign(order_.size(), 0);
+  for (std::uint32_t label = 1; label < order_.size(); ++label) {
+    std::uint32_t& root = first[cut.numbers[order_[label]]];
+    if (root == 0) root = label;
+    roots_[label] = root;
+  }
+  order_ = {};
   return true;
 }
 

@@ -93,7 +93,12 @@ const CommandDeclaration kSegmentMerge{
       "except by MinSize; none when absent"},
      {"Compactness", Presence::kOptional, ValueKind::kNumber,
       "with Seamless and MergeAlgorithm 1: costs are divided by the length of the common border to "
-      "the power of this besides, 0 to 10; 0 when absent"}},
+      "the power of this besides, 0 to 10; 0 when absent"},
+     {"Tree", Presence::kOptional, ValueKind::kText,
+      "with Seamless and MergeAlgorithm 1: the file to make of all merges, from which segments of "
+      "every MergeValue can be made (CreateTreeLabelsRasterCommand); none when absent"},
+     {"MergePercent", Presence::kOptional, ValueKind::kNumber,
+      "with Tree: percentage of all merges to do, in place of MergeValue"}},
     {{"LambdaHistogram", ValueKind::kIntegerArray,
       "cumulative counts of the costs of all merges, in 10000 bins from 0 on"},
      {"LambdaBinSize", ValueKind::kNumber, "width of these bins"}}};
@@ -157,7 +162,8 @@ class FxTileSegmentMergeCommand final : public SegmentCommand {
     request.bordersOnly = Read<int>("SegmentBorder") == 1;
     isSeamless_ = Read<bool>("Seamless");
     request.isRigorous = isRigorous_;
-    return ReadGrowth(request) && ReadMemory(segment, request) && ReadTiles(segment, request);
+    return ReadGrowth(request) && ReadTree(request) && ReadMemory(segment, request) &&
+           ReadTiles(segment, request);
   }
 
   bool ReadGrowth(SegmentRequest& request) {
@@ -180,6 +186,29 @@ class FxTileSegmentMergeCommand final : public SegmentCommand {
     }
     request.leastPixels = static_cast<double>(least);
     if (HasInput("MaxSize")) request.growth.mostPixels = static_cast<double>(most);
+    return true;
+  }
+
+  bool ReadTree(SegmentRequest& request) {
+    if (!HasInput("Tree") && !HasInput("MergePercent")) return true;
+    const auto refuse = [](const char* fault) {
+      SetFault(fault);
+      return false;
+    };
+    request.tree = Read<String>("Tree").ToUTF8();
+    if (request.tree.empty()) {
+      return refuse(HasInput("Tree") ? "Tree: there is no name of a file"
+                                     : "MergePercent goes with Tree");
+    }
+    if (!isSeamless_ || isRigorous_ || Read<bool>("LambdaEstimate")) {
+      return refuse("Tree goes with Seamless and MergeAlgorithm 1, and without an estimate");
+    }
+    if (request.leastPixels > 0) return refuse("Tree goes without MinSize");
+    if (!HasInput("MergePercent")) return true;
+    request.mergePercent = Read<double>("MergePercent");
+    if (!(*request.mergePercent >= 0 && *request.mergePercent <= 100)) {
+      return refuse("MergePercent: 0 to 100 percent");
+    }
     return true;
   }
 

@@ -1,5 +1,8 @@
 #pragma once
 
+#include <optional>
+#include <string>
+
 #include "commands/value_text.h"
 #include "foundation/scalar.h"
 #include "fx/lambda_schedule.h"
@@ -30,7 +33,11 @@ struct SegmentRequest {
   bool isRigorous = false;           ///< merging without tiles: by RigorousMerge
   double leastPixels = 0;            ///< smaller segments join others, without tiles
   GrowthLimits growth;               ///< of merging by schedule, without tiles
-  std::uint64_t memory = kNoLimit;   ///< bytes for the segments and their neighbours, without tiles
+  /// A file to keep the tree of merging by schedule in, without tiles; empty for none.
+  std::string tree;
+  /// With a tree: the percentage of all merges to do, instead of those up to mergeValue.
+  std::optional<double> mergePercent;
+  std::uint64_t memory = kNoLimit;  ///< bytes for the segments and their neighbours, without tiles
 
   static constexpr std::uint64_t kNoLimit = 0xFFFFFFFFFFFFFFFF;
 };

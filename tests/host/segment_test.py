@@ -10,6 +10,9 @@ import unittest
 import segment_peer as peer
 from support import DATA, FolderTest, needs_data, needs_gdal, gdal_pixels, read_png, run, write_orva
 
+GRID = """georeference = Std -9999 0 0 0 0 28.5 28.5 288776.3 9120760.8 0 0 90 70 0 EPSG:31985|
+coordinate system string = {EPSG:31985}
+"""
 TYPES = {"Byte": "B", "Int16": "h", "UInt32": "I", "Single": "f"}
 
 
@@ -363,6 +366,82 @@ class SegmentTest(FolderTest):
         self.fails(1, "bytes of memory", "segment", scene, self.folder / "new.dat", "--format", "ORVA", "--merge-value", 9,
                    "--memory", 100)
         self.assertFalse((self.folder / "new.dat").exists())
+
+    def test_a_tree_gives_the_labels_of_every_cost(self):
+        chance = random.Random(21)
+        pixels = bytes(chance.randint(0, 99) + 40 * (x // 9 % 3) for y in range(70) for x in range(90) for _ in range(2))
+        scene = write_orva(self.folder / "scene.dat", 90, 70, 2, pixels, more="no data values = {0,0}\n" + GRID)
+        tree, labels = self.folder / "scene.tree", self.folder / "labels.tif"
+        self.fine("segment", scene, labels, "--merge-value", 200, "--tree", tree, "-q")
+        for name, options in (("own", ["--merge-value", 200]), ("none", []), ("high", ["--merge-value", 3000.5]),
+                              ("percent", ["--merge-percent", 60])):
+            fresh, cut = self.folder / f"{name}.tif", self.folder / f"{name}.cut.tif"
+            more = ["--tree", self.folder / "other.tree"] if name == "percent" else []
+            self.fine("segment", scene, fresh, *options, *more, "-q")
+            self.fine("segment", "cut", tree, cut, *options, "-q")
+            self.assertEqual(cut.read_bytes(), fresh.read_bytes(), name)
+        self.assertEqual(labels.read_bytes(), (self.folder / "own.tif").read_bytes())
+        self.fine("segment", "levels", tree, "--values", "3000.5,0,200", "-o", self.folder / "l", "-q")
+        levels = [gdal_pixels(self.folder / f"l.{i}.tif") for i in (1, 2, 3)]
+        for level, name in zip(levels, ("none", "own", "high")):
+            self.assertEqual(level, gdal_pixels(self.folder / f"{name}.tif"))
+        numbers = [struct.unpack("<6300i", level) for level in levels]
+        rows = [line.split(",") for line in (self.folder / "l.csv").read_text().splitlines()]
+        self.assertEqual(rows.pop(0), ["level", "mergeValue", "segment", "pixels", "parent"])
+        wanted = []
+        for i, (value, level) in enumerate(zip(("0", "200", "3000.5"), numbers)):
+            upper = dict(zip(level, numbers[i + 1])) if i < 2 else {}
+            wanted += [[str(i + 1), value, str(n), str(level.count(n)), str(upper.get(n, ""))]
+                       for n in range(1, max(level) + 1)]
+            for n, parent in zip(level, numbers[i + 1] if i < 2 else ()):
+                self.assertEqual(upper[n], parent)
+        self.assertEqual(rows, wanted)
+        told = json.loads(self.fine("segment", "--suggest", tree, "--json"))
+        self.assertGreater(len(told["levels"]), 10)
+        costs = [level["mergeValue"] for level in told["levels"]]
+        for one in told["suggested"]:
+            self.assertIn(one["mergeValue"], costs)
+            self.assertLess(one["onset"], one["mergeValue"])
+        table = self.fine("segment", "--suggest", tree).splitlines()
+        self.assertEqual([float(row.split()[0]) for row in table[1:]],
+                         [float(f"{one['mergeValue']:.6g}") for one in told["suggested"]])
+        self.fine("segment", "--suggest", tree, "-o", self.folder / "curve.png", "-q")
+        self.assertTrue((self.folder / "curve.png").exists())
+        document = self.fine("segment", "levels", tree, "--values", "1,2", "-o", self.folder / "p", "--print-job")
+        self.fine("run", "-", stdin=document)
+        self.assertTrue((self.folder / "p.2.tif").exists())
+
+    def test_what_a_tree_does_not_go_with_is_refused(self):
+        scene = write_orva(self.folder / "scene.dat", 20, 20, 1, bytes(range(200)) * 2)
+        tree, out = self.folder / "a.tree", self.folder / "out.dat"
+        self.fine("segment", scene, self.folder / "a.dat", "--tree", tree, "-q")
+        before = sorted(path.name for path in self.folder.iterdir())
+        for code, words, *command in (
+                (2, "--tree goes with", scene, out, "--tree", self.folder / "b.tree", "--tiled"),
+                (2, "--tree goes with", scene, out, "--tree", self.folder / "b.tree", "--min-size", 3),
+                (2, "--tree goes with", scene, out, "--tree", self.folder / "b.tree", "--merge-algorithm", "rigorous"),
+                (2, "is there already", scene, out, "--tree", tree),
+                (2, "name the labels", "cut", tree), (2, "which tree", "cut"), (2, "a word too many", scene, out, tree),
+                (2, "no option that segments", "cut", tree, out, "--segment-value", 4),
+                (2, "exclude each other", "cut", tree, out, "--merge-value", 4, "--merge-percent", 4),
+                (2, "--values", "cut", tree, out, "--values", "3"), (2, "--values is required", "levels", tree, "-o", out),
+                (2, "a tree alone", "--suggest", tree, out), (2, "takes no costs", "--suggest", tree, "--merge-value", 3),
+                (1, "isn't a whole tree", "--suggest", scene), (2, "is no cost", "levels", tree, "-o", out, "--values", "3,x"),
+                (2, "comes twice", "levels", tree, "-o", out, "--values", "3,1,3"),
+                (1, "isn't a whole tree", "cut", scene, out), (1, "no-such", "cut", self.folder / "no-such", out)):
+            with self.subTest(words):
+                self.fails(code, words, "segment", *command)
+        self.assertEqual(sorted(path.name for path in self.folder.iterdir()), before)
+        base = {"SegmentAlgorithm": 1, "SegmentValue": 0, "MinGradient": 0, "MaxGradient": 9, "StretchValue": 9,
+                "LambdaEstimate": False, "Tree": self.folder / "b.tree"}
+        for words, more in (("Tree goes with Seamless", {}), ("without MinSize", {"Seamless": True, "MinSize": 4}),
+                            ("Tree goes with Seamless", {"Seamless": True, "MergeAlgorithm": 2}),
+                            ("MergePercent: 0 to 100", {"Seamless": True, "MergePercent": 101})):
+            job = Job()
+            job.segment(scene, self.folder / "l.dat", {**base, **more})
+            code, _, err = run("run", "-", stdin=job.text())
+            self.assertEqual(code, 1)
+            self.assertIn(words, err)
 
     def test_estimate_agrees_with_what_percentages_do(self):
         chance = random.Random(5)

@@ -6,6 +6,7 @@
 #include "options/option_values.h"
 #include "raster/pixel_types.h"
 #include "raster/raster_enums.h"
+#include "rasters/raster_source.h"
 #include "verb.h"
 
 namespace lumo::host {
@@ -30,12 +31,23 @@ void SegmentRequest::Check() const {
         "--min-size, --max-size and --compactness go with --merge-algorithm schedule, without "
         "--tiled");
   }
+  if (!tree.empty() && (isTiled || isEstimate || mergeAlgorithm != "schedule" || minSize)) {
+    refuse(
+        "--tree goes with --merge-algorithm schedule, without --tiled, --estimate and --min-size");
+  }
   for (const auto& [name, percent] :
        {std::pair("--segment-percent", segmentPercent), {"--merge-percent", mergePercent}}) {
     if (percent && !(*percent >= 0 && *percent <= 100)) {
       refuse(fmt::format("{}: 0 to 100 percent", name));
     }
   }
+}
+
+bool SegmentRequest::IsSegmenting() const {
+  const SegmentRequest none;
+  return algorithm != none.algorithm || mergeAlgorithm != none.mergeAlgorithm || segmentValue ||
+         segmentPercent || tileMemory || tileBorder || memory != 0 || minSize || maxSize ||
+         compactness || isTiled || isBorders || isEstimate;
 }
 
 void AddFit(JobDraft& draft, const SegmentRequest& request, const SegmentSources& sources) {
@@ -45,7 +57,7 @@ void AddFit(JobDraft& draft, const SegmentRequest& request, const SegmentSources
   if (request.segmentValue) fit.AddInput("SegmentValue", *request.segmentValue);
   if (request.segmentPercent) fit.AddInput("SegmentPercent", *request.segmentPercent);
   fit.AddVariableInput("MergeURI", sources.merge);
-  if (request.mergePercent && !request.isEstimate) {
+  if (request.mergePercent && !request.isEstimate && request.tree.empty()) {
     fit.AddInput("MergePercent", *request.mergePercent);
   }
   fit.AddOutput("MinGradient", "$least");
@@ -69,8 +81,11 @@ void AddSegment(JobDraft& draft, const char* step, const SegmentRequest& request
   if (request.isEstimate) return;
   segment.AddVariableInput("LabelURI", "$target");
   segment.AddInput("MergeAlgorithm", request.mergeAlgorithm == "rigorous" ? 2 : 1);
+  if (!request.tree.empty()) segment.AddInput("Tree", String(AbsoluteName(request.tree)));
   if (request.mergeValue) {
     segment.AddInput("MergeValue", *request.mergeValue);
+  } else if (request.mergePercent && !request.tree.empty()) {
+    segment.AddInput("MergePercent", *request.mergePercent);
   } else {
     segment.AddVariableInput("MergeValue", "$cost");
   }

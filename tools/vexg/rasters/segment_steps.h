@@ -17,6 +17,7 @@ struct SegmentRequest {
   std::uint64_t memory = 0;            ///< bytes for merging, without tiles; 0 for those by default
   std::optional<unsigned> minSize, maxSize;  ///< pixels, without tiles
   std::optional<double> compactness;         ///< a power of border lengths, without tiles
+  std::string tree;                          ///< file of all merges; empty for none
   bool isTiled = false;                      ///< tile by tile, and not as a whole
   bool isBorders = false;                    ///< an image of the borders is made instead
   bool isEstimate = false;                   ///< costs are counted, and nothing made
@@ -24,6 +25,8 @@ struct SegmentRequest {
   /// Throws HostError for percentages out of bounds, for a value beside a percentage, and for what
   /// goes with tiles alone or without them.
   void Check() const;
+  /// True when any option beside those of a threshold is given.
+  bool IsSegmenting() const;
 };
 
 constexpr const char* kFitStep = "fit";

@@ -12,6 +12,7 @@
 #include "rasters/raster_target.h"
 #include "rasters/raster_verb.h"
 #include "rasters/segment_steps.h"
+#include "rasters/tree_steps.h"
 
 namespace lumo::host {
 namespace {
@@ -55,16 +56,38 @@ class SegmentVerb final : public RasterVerb {
         "--estimate makes no labels. It says which gradient and which cost a percentage stands "
         "for, "
         "-o draws both curves, --json prints them.");
+    line.AddNote(
+        "--tree keeps all merges in a file, from which segments of every other cost can be made "
+        "without segmenting again: cut TREE LABELS makes those of one --merge-value or "
+        "--merge-percent, levels TREE those of several --values, as NAME.1.tif and so on, each "
+        "within those of the next, with a table of their parents, NAME.csv. (For a raster of such "
+        "a name write ./cut.)");
     line.AddExample("vexg segment scene.tif segments.tif --merge-percent 90");
+    line.AddExample("vexg segment scene.tif segments.tif --merge-value 100 --tree scene.tree");
+    line.AddExample("vexg segment cut scene.tree segments.tif --merge-value 250");
+    line.AddExample("vexg segment levels scene.tree --values 50,200,800 -o levels");
+    line.AddNote(
+        "--suggest TREE makes no labels. It gives costs at which segments are likely to be whole "
+        "objects: where the local variance, the mean deviation inside segments, begins to grow "
+        "faster with the cost. The most prominent comes first; -o draws the curve, --json prints "
+        "it.");
+    line.AddExample("vexg segment --suggest scene.tree");
     line.AddExample("vexg segment --estimate scene.tif -o curves.png");
-    AddFilesTo(line, "The labels", false);
+    AddFilesTo(line, "The labels; with cut and levels the tree", false);
+    line.Add("more", more_, "With cut, the labels").IsFile("LABELS");
     line.Add("--tiled", request_.isTiled,
              "Segment tile by tile, which takes less memory and leaves seams");
     line.Add("--estimate", request_.isEstimate,
              "Say what percentages stand for, and make no labels");
-    line.Add("--output,-o", picture_, "With --estimate: a picture of both curves, a PNG or JPEG")
-        .IsFile("OUT.png|jpg");
-    line.Add("--json", isJson_, "With --estimate: both curves as JSON");
+    line.Add("--suggest", isSuggest_, "Say which costs suit a tree, and make no labels");
+    line.AllowOneOf({"--estimate", "--suggest", "--tiled"});
+    line.Add("--output,-o", picture_,
+             "With --estimate and --suggest: a picture of the curves, a PNG or JPEG; with levels: "
+             "the files "
+             "without "
+             "their endings")
+        .IsFile("OUT");
+    line.Add("--json", isJson_, "With --estimate and --suggest: the curves as JSON");
     AddAreaTo(line);
     line.Add("--bands", bandsText_, "Bands, from 0; all by default")
         .Shows("B,B...")
@@ -107,6 +130,11 @@ class SegmentVerb final : public RasterVerb {
              "0 "
              "by default")
         .Shows("W");
+    line.Add("--tree", tree_, "Make a file of all merges as well, for cut and levels")
+        .IsFile("TREE");
+    line.Add("--values", valuesText_, "With levels: the costs up to which to merge")
+        .Shows("COST,COST...")
+        .Example("50,200,800");
     line.Add("--tile-memory", request_.tileMemory,
              "Bytes of the pixels of a tile, or of the strips in which a whole raster is read; "
              "8388608 by default")
@@ -127,9 +155,70 @@ class SegmentVerb final : public RasterVerb {
         .IsFile("OUT.png|jpg");
   }
 
+  int Run() override {
+    const std::string word = GetSource().file;
+    action_ = isSuggest_         ? Action::kSuggest
+              : word == "cut"    ? Action::kCut
+              : word == "levels" ? Action::kLevels
+                                 : Action::kSegment;
+    if (Is(Action::kSegment)) {
+      if (!more_.empty()) throw HostError(kExitUsage, "there is a word too many: " + more_.front());
+      return RasterVerb::Run();
+    }
+    if (Is(Action::kSuggest)) {
+      if (!GetTargetName().empty()) throw HostError(kExitUsage, "--suggest takes a tree alone");
+      return RasterVerb::Run();
+    }
+    GetSource().file = GetTargetName();
+    if (GetSource().file.empty()) throw HostError(kExitUsage, word + ": which tree?");
+    if (more_.size() != (Is(Action::kCut) ? 1U : 0U)) {
+      throw HostError(kExitUsage, Is(Action::kCut) ? "cut: name the labels to make behind the tree"
+                                                   : "levels takes a tree alone, and -o");
+    }
+    SetTargetName(Is(Action::kCut) ? more_.front() : "");
+    return RasterVerb::Run();
+  }
+
  private:
+  /// Says which files are made of which.
+  enum class Action { kSegment, kCut, kLevels, kSuggest };
+
+  bool Is(Action action) const { return action_ == action; }
+
+  /// Throws HostError for options that segment a raster, where there is a tree.
+  void CheckTreeOptions() {
+    const auto refuse = [](const std::string& line) { throw HostError(kExitUsage, line); };
+    if (request_.IsSegmenting() || !bandsText_.empty() || !mergeRaster_.empty() ||
+        !polygons_.empty() || !quicklook_.empty() || !tree_.empty() || GetArea().IsGiven() ||
+        (isJson_ && !Is(Action::kSuggest))) {
+      refuse("cut, levels and --suggest take a tree as it is, with no option that segments");
+    }
+    if (Is(Action::kSuggest)) {
+      if (request_.mergeValue || request_.mergePercent || !valuesText_.empty()) {
+        refuse("--suggest takes no costs");
+      }
+      if (!picture_.empty()) CheckPictureName(picture_);
+      return;
+    }
+    if (Is(Action::kCut)) {
+      if (!picture_.empty() || !valuesText_.empty()) refuse("-o and --values go with levels");
+      request_.Check();
+      RasterVerb::CheckOptions();
+      return;
+    }
+    if (request_.mergeValue || request_.mergePercent) refuse("levels takes its costs by --values");
+    if (picture_.empty()) refuse("--output is required");
+    if (valuesText_.empty()) refuse("--values is required");
+    levels_ = {GetSource().file, ReadMergeValues(valuesText_)};
+    SetTargetName(levels_.FilesOf(picture_).front());
+    RasterVerb::CheckOptions();
+  }
+
   void CheckOptions() override {
     const auto refuse = [](const std::string& line) { throw HostError(kExitUsage, line); };
+    if (!Is(Action::kSegment)) return CheckTreeOptions();
+    if (!valuesText_.empty()) refuse("--values goes with levels");
+    request_.tree = tree_;
     request_.Check();
     if (!mergeRaster_.empty() && GetArea().IsGiven()) {
       refuse("--merge-raster goes with no area");
@@ -152,21 +241,26 @@ class SegmentVerb final : public RasterVerb {
     return mergeRaster_.empty() ? std::vector<std::string>() : std::vector{mergeRaster_};
   }
   std::vector<std::string> GetOutputs() const override {
-    if (!request_.isEstimate) return RasterVerb::GetOutputs();
+    if (Is(Action::kLevels)) return levels_.FilesOf(picture_);
+    if (!request_.isEstimate && !Is(Action::kSuggest)) return RasterVerb::GetOutputs();
     return picture_.empty() ? std::vector<std::string>() : std::vector{picture_};
   }
   std::uint64_t GetBytes(std::size_t output) const override {
-    return request_.isEstimate ? 0 : RasterVerb::GetBytes(output);
+    return request_.isEstimate || Is(Action::kLevels) || Is(Action::kSuggest)
+               ? 0
+               : RasterVerb::GetBytes(output);
   }
   std::vector<std::string> GetFurtherOutputs() const override {
     std::vector<std::string> files;
     if (!polygons_.empty()) files.push_back(polygons_);
     if (!quicklook_.empty()) files.push_back(quicklook_);
+    if (!tree_.empty()) files.push_back(tree_);
     return files;
   }
 
   RasterInfo PlanRaster(JobSession& /*session*/, const JobResults& /*opened*/,
                         const RasterInfo& source) override {
+    if (!Is(Action::kSegment)) return source;
     bands_ = ParseBands(bandsText_, source);
     scene_ = source;
     if (!DispatchType(EightTypes{}, source.dataType, []<typename T>() { return true; })) {
@@ -180,6 +274,13 @@ class SegmentVerb final : public RasterVerb {
     return planned;
   }
 
+  void AddSource(RasterChain& chain) const override {
+    if (Is(Action::kSegment)) return RasterVerb::AddSource(chain);
+    AddTreeLabels(chain.GetDraft(), "source",
+                  {GetSource().file, request_.mergeValue, request_.mergePercent});
+    chain.Take("source");
+  }
+
   void AddViews(RasterChain& chain) const override {
     if (bandsText_.empty()) return;
     AddBandView(chain.GetDraft(), "bands", chain.GetTop(), bands_);
@@ -191,10 +292,10 @@ class SegmentVerb final : public RasterVerb {
     return request_.isBorders ? FillValues() : FillValues{0.0};
   }
   bool MayChooseNoData() const override { return false; }
-  const char* GetFirstStep() const override { return kFitStep; }
+  const char* GetFirstStep() const override { return Is(Action::kSegment) ? kFitStep : kMakeStep; }
 
   void AddToCreate(JobDraft& /*draft*/, JobWriterCommand& create) const override {
-    AddLabels(create, request_);
+    if (Is(Action::kSegment)) AddLabels(create, request_);
   }
 
   /// Opens the raster that drives merging, where there is one of its own.
@@ -209,13 +310,17 @@ class SegmentVerb final : public RasterVerb {
   }
 
   void AddMaking(JobDraft& draft, const Making& making) const override {
+    if (!Is(Action::kSegment)) return RasterVerb::AddMaking(draft, making);
     const SegmentSources sources = OpenMerge(draft, making.shown);
-    AddFit(draft, request_, sources);
-    AddSegment(draft, kMakeStep, request_, sources);
+    SegmentRequest request = request_;
+    request.tree = treePlace_;
+    AddFit(draft, request, sources);
+    AddSegment(draft, kMakeStep, request, sources);
     CloseMerge(draft);
   }
 
   RasterContents ReadWanted(const JobResults& results) const override {
+    if (!Is(Action::kSegment)) return RasterVerb::ReadWanted(results);
     RasterContents wanted = ReadContents(results, kShown);
     wanted.info.dataType = kDataTypeOf<std::int32_t>;
     wanted.info.bands = 1;
@@ -224,6 +329,7 @@ class SegmentVerb final : public RasterVerb {
   }
 
   void Compare(MadeRaster& raster, Losses& losses) const override {
+    if (!Is(Action::kSegment)) return RasterVerb::Compare(raster, losses);
     raster.put.info.hasNoData = raster.made.info.hasNoData;
     raster.put.info.hasPalette = raster.made.info.hasPalette;
     raster.isFilled = true;
@@ -241,13 +347,47 @@ class SegmentVerb final : public RasterVerb {
   }
 
   JobDraft GetJob(const Outputs& outputs) const override {
+    if (Is(Action::kSuggest)) {
+      JobDraft draft;
+      AddSuggest(draft, GetSource().file);
+      return draft;
+    }
+    if (Is(Action::kLevels)) {
+      JobDraft draft;
+      levels_.AddMaking(draft, NamesOf(outputs, &OutputFile::GetName), GetFormat());
+      return draft;
+    }
+    if (!tree_.empty()) treePlace_ = outputs.Get(GetOutputs().size() - 1).GetName();
     return request_.isEstimate ? MakeEstimate() : RasterVerb::GetJob(outputs);
   }
 
   void Make(JobSession& session, const Outputs& outputs) override {
     if (request_.isEstimate) return Estimate(session, outputs);
+    if (Is(Action::kLevels)) return MakeLevels(session, outputs);
+    if (Is(Action::kSuggest)) {
+      scales_ = ScaleCurve::Read(session.Run(GetJob(outputs)));
+      if (!picture_.empty()) scales_.Draw(outputs.Get(0));
+      return;
+    }
+    if (!tree_.empty()) treePlace_ = outputs.Get(GetOutputs().size() - 1).GetWorkName();
     RasterVerb::Make(session, outputs);
     if (!quicklook_.empty()) DrawQuicklook(session, outputs);
+  }
+
+  std::vector<std::string> NamesOf(const Outputs& outputs,
+                                   std::string (OutputFile::*name)() const) const {
+    std::vector<std::string> names;
+    for (std::size_t i = 0; i < GetOutputs().size(); ++i) {
+      names.push_back((outputs.Get(i).*name)());
+    }
+    return names;
+  }
+
+  void MakeLevels(JobSession& session, const Outputs& outputs) const {
+    JobDraft draft;
+    levels_.AddMaking(draft, NamesOf(outputs, &OutputFile::GetWorkName), GetFormat());
+    const ProgressView view(session.GetProgress(), GetProgressStyle());
+    levels_.CheckMade(session.Run(draft));
   }
 
   void DrawQuicklook(JobSession& session, const Outputs& outputs) const {
@@ -267,8 +407,8 @@ class SegmentVerb final : public RasterVerb {
     request.size = kQuicklookSize;
     request.outlines.push_back(
         {{URIOf(opened, "$labels"), ReadInfo(opened, "labels"), GetTargetName()}, {255, 255, 0}});
-    const std::size_t last = GetOutputs().size() - 1;
-    MakeQuicklook(session, request, outputs.Get(last), ProgressStyle::kNone);
+    const std::size_t picture = polygons_.empty() ? 1 : 2;
+    MakeQuicklook(session, request, outputs.Get(picture), ProgressStyle::kNone);
   }
 
   /// The gradients in bins that suit the pixel type, and the costs of all merges.
@@ -337,6 +477,10 @@ class SegmentVerb final : public RasterVerb {
   }
 
   std::string Describe() const override {
+    if (Is(Action::kSuggest)) {
+      if (isJson_) return scales_.AsJson(GetSource().file);
+      return picture_.empty() ? scales_.AsText() : std::string();
+    }
     if (!request_.isEstimate) return {};
     if (isJson_) {
       return Json{{"file", GetSource().file},
@@ -358,8 +502,13 @@ class SegmentVerb final : public RasterVerb {
   static constexpr unsigned kFloatBins = 65000;
   static constexpr unsigned kQuicklookSize = 2048;
 
-  bool isJson_ = false;
-  std::string picture_, bandsText_, mergeRaster_, polygons_, quicklook_;
+  bool isJson_ = false, isSuggest_ = false;
+  Action action_ = Action::kSegment;
+  std::vector<std::string> more_;
+  std::string picture_, bandsText_, mergeRaster_, polygons_, quicklook_, tree_, valuesText_;
+  mutable std::string treePlace_;  // where the tree is made, or where it will be
+  TreeLevels levels_;
+  ScaleCurve scales_;
   SegmentRequest request_;
 
   RasterInfo scene_;

@@ -1,9 +1,12 @@
-#include "pyramid_codec.h"
+#include "foundation/packing.h"
 
 #include <algorithm>
 #include <lz4.h>
 
-namespace lumo::pyramid {
+#define XXH_INLINE_ALL
+#include <xxhash.h>
+
+namespace lumo {
 namespace {
 
 constexpr std::size_t kLeastGain = 8;  // an eighth
@@ -26,11 +29,11 @@ bool IsWorthwhile(std::span<const unsigned char> bytes) {
 
 }  // namespace
 
-void Pack(Compression compression, std::span<const unsigned char> bytes, Bytes& packed) {
+void PackBytes(Packing packing, std::span<const unsigned char> bytes, RawBytes& packed) {
   packed.Resize(0);
   constexpr std::size_t kLeast = 64;
-  if (compression == Compression::kNone || bytes.size() < kLeast ||
-      bytes.size() > LZ4_MAX_INPUT_SIZE || !IsWorthwhile(bytes)) {
+  if (packing == Packing::kNone || bytes.size() < kLeast || bytes.size() > LZ4_MAX_INPUT_SIZE ||
+      !IsWorthwhile(bytes)) {
     return;
   }
   const std::size_t most = bytes.size() - bytes.size() / kLeastGain - 1;
@@ -41,14 +44,14 @@ void Pack(Compression compression, std::span<const unsigned char> bytes, Bytes& 
   packed.Resize(static_cast<std::size_t>(std::max(count, 0)));
 }
 
-bool MayUnpackTo(Compression compression, std::uint64_t stored, std::uint64_t bytes) {
+bool MayUnpackTo(Packing packing, std::uint64_t stored, std::uint64_t bytes) {
   constexpr std::uint64_t kMostRatio = 255;  // of a block of LZ4
   if (stored == bytes) return true;
-  return compression == Compression::kLz4 && stored != 0 && stored < bytes &&
+  return packing == Packing::kLz4 && stored != 0 && stored < bytes &&
          bytes / kMostRatio <= stored && bytes <= LZ4_MAX_INPUT_SIZE;
 }
 
-bool Unpack(std::span<const unsigned char> stored, std::span<unsigned char> bytes) {
+bool UnpackBytes(std::span<const unsigned char> stored, std::span<unsigned char> bytes) {
   if (stored.size() == bytes.size()) {
     std::ranges::copy(stored, bytes.begin());
     return true;
@@ -59,4 +62,17 @@ bool Unpack(std::span<const unsigned char> stored, std::span<unsigned char> byte
   return count >= 0 && static_cast<std::size_t>(count) == bytes.size();
 }
 
-}  // namespace lumo::pyramid
+std::uint64_t Checksum(const void* bytes, std::size_t count) {
+  return XXH3_64bits(bytes, count);
+}
+
+std::uint64_t Checksum(const void* first, std::size_t firstCount, const void* second,
+                       std::size_t secondCount) {
+  XXH3_state_t state;
+  XXH3_64bits_reset(&state);
+  XXH3_64bits_update(&state, first, firstCount);
+  XXH3_64bits_update(&state, second, secondCount);
+  return XXH3_64bits_digest(&state);
+}
+
+}  // namespace lumo
