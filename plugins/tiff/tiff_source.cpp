@@ -115,41 +115,29 @@ std::optional<bool> IsCloudOptimised(const File& file) {
   return words.find("LAYOUT=IFDS_BEFORE_DATA") != words.npos;
 }
 
-/// Says whether the items that GDAL keeps in a file are statistics of its bands, and nothing else.
-bool HoldsOnlyStats(std::string_view text) {
-  const auto take = [&text](std::string_view start) {
-    if (!text.starts_with(start)) return false;
-    text.remove_prefix(start.size());
-    return true;
-  };
-  const auto takeUpTo = [&text](std::string_view end, std::string_view forbidden) {
-    const std::size_t at = text.find(end);
-    if (at == text.npos || text.substr(0, at).find_first_of(forbidden) != text.npos) return false;
-    text.remove_prefix(at + end.size());
-    return true;
-  };
-  const auto skipSpace = [&text] {
-    text.remove_prefix(std::min(text.find_first_not_of(" \n"), text.size()));
-  };
-  if (!take("<GDALMetadata>")) return false;
-  for (skipSpace(); !take("</GDALMetadata>"); skipSpace()) {
-    const bool isStat = take("<Item name=\"STATISTICS_") && takeUpTo("\" sample=\"", "<>&\" ") &&
-                        takeUpTo("\">", "<>&\" ") && takeUpTo("</Item>", "<>&");
-    if (!isStat) return false;
-  }
-  skipSpace();
-  return text.empty();
+/// The text of a whole file. False when it can't be read, or is too long for what is looked for.
+bool ReadWhole(const std::string& path, std::string& text) {
+  constexpr std::uint64_t kMostBytes = 4 << 20;
+  const auto file =
+      platform::RandomAccessFile::Open(path, platform::RandomAccessFile::Access::kRead);
+  std::uint64_t size = 0;
+  if (file == nullptr || !file->GetSize(size) || size > kMostBytes) return false;
+  text.resize(size);
+  return file->Read(0, text.data(), text.size());
 }
 
 }  // namespace
 
 std::unique_ptr<Source> Source::Open(const std::string& path, const String& formatKey,
                                      Opener opener) {
-  if (HasSettings() || !StandsAlone(path)) return nullptr;
+  const Company company = HasSettings() ? Company::kOthers : CompanyOf(path);
+  if (company == Company::kOthers) return nullptr;
   std::unique_ptr<File> file = File::Open(path);
   if (file == nullptr) return nullptr;
   std::unique_ptr<Source> source(new Source(std::move(file), std::move(opener)));
-  return source->FindLevels() && source->Describe(formatKey) ? std::move(source) : nullptr;
+  const bool isOwn = source->FindLevels() && source->Describe(formatKey) &&
+                     (company == Company::kNone || source->TakeSideFile());
+  return isOwn ? std::move(source) : nullptr;
 }
 
 bool Source::FindLevels() {
@@ -162,8 +150,9 @@ bool Source::FindLevels() {
     const bool isFirst = &directory == &directories.front();
     if (directory.contains(kGdalMetadata)) {
       std::string text;
-      hasStats_ = true;
-      if (!isFirst || !file_->ReadText(directory, kGdalMetadata, text) || !HoldsOnlyStats(text)) {
+      const auto bands = static_cast<unsigned>(file_->Number(directory, kSamplesPerPixel, 1));
+      if (!isFirst || !file_->ReadText(directory, kGdalMetadata, text) ||
+          !stored_.TakeTag(text, bands)) {
         return false;
       }
     }
@@ -194,6 +183,12 @@ bool Source::FindLevels() {
     last = at->first;
   }
   return true;
+}
+
+/// Takes the values in the file beside this one; those in the file itself were taken before.
+bool Source::TakeSideFile() {
+  std::string text;
+  return ReadWhole(Path() + ".aux.xml", text) && stored_.TakeSideFile(text, def_.bands);
 }
 
 bool Source::Describe(const String& formatKey) {

@@ -122,6 +122,17 @@ void ExpectSamePixels(RasterReader<T>& ours, RasterReader<T>& theirs, unsigned l
   }
 }
 
+/// Compares statistics by all that they hold, by their texts and beyond.
+template <typename T>
+void ExpectSameStats(const RasterBandStats<T>& ours, const RasterBandStats<T>& theirs) {
+  std::ostringstream own, other;
+  own << ours, other << theirs;
+  EXPECT_EQ(own.str(), other.str());
+  EXPECT_EQ(ours.mask, theirs.mask);
+  EXPECT_EQ(ours.band, theirs.band);
+  EXPECT_EQ(ours.pixelCount, theirs.pixelCount);
+}
+
 /// Compares a file both ways. @return whether the library reads it itself.
 bool ExpectSame(const std::string& path) {
   SCOPED_TRACE(path);
@@ -146,8 +157,11 @@ bool ExpectSame(const std::string& path) {
       EXPECT_EQ(own->HasNoDataValue(band), other->HasNoDataValue(band));
       EXPECT_EQ(own->HasPalette(band), other->HasPalette(band));
       EXPECT_EQ(own->StatsExist(band), other->StatsExist(band));
-      EXPECT_EQ(own->ReadStats(band).mask, other->ReadStats(band).mask);
-      EXPECT_EQ(own->ReadStats(band).mean, other->ReadStats(band).mean);
+      if constexpr (std::is_arithmetic_v<T>) {
+        ExpectSameStats(own->ReadStats(band), other->ReadStats(band));
+        const auto mine = own->Histogram(band), his = other->Histogram(band);
+        EXPECT_TRUE(std::equal(mine.begin(), mine.end(), his.begin(), his.end()));
+      }
     }
     for (int level = 0; level <= other->PyramidLevelMax(); ++level) {
       if (level == 0 || level >= other->PyramidLevelMin()) {
@@ -276,6 +290,76 @@ TEST(OwnTiff, SystemsOfTheRegistryAreThoseOfGdal) {
   }
   EXPECT_GT(all, 80U);
   EXPECT_GT(own, all / 3);
+}
+
+/// Each case stores statistics in another way, or something that isn't statistics of all pixels.
+TEST(OwnTiff, StoredStatisticsAreThoseOfGdal) {
+  const test::TemporaryDirectory directory;
+  const auto set = [](GDALDatasetH file, const char* name, const char* text, int band = 2) {
+    GDALSetMetadataItem(GDALGetRasterBand(file, band), name, text, nullptr);
+  };
+  const auto compute = [](GDALDatasetH file, bool isApproximate) {
+    double n = 0;
+    GDALComputeRasterStatistics(GDALGetRasterBand(file, 1), isApproximate, &n, &n, &n, &n, nullptr,
+                                nullptr);
+  };
+  using Store = std::function<void(GDALDatasetH)>;
+  const struct {
+    const char* name;
+    bool isOwn;
+    Store store;
+  } cases[] = {
+      {"computed", true, [&](GDALDatasetH file) { compute(file, false); }},
+      {"approximate", true, [&](GDALDatasetH file) { compute(file, true); }},
+      {"some are missing", true, [&](GDALDatasetH file) { set(file, "STATISTICS_MEAN", "3"); }},
+      {"odd texts", true,
+       [&](GDALDatasetH file) {
+         compute(file, false);
+         set(file, "STATISTICS_MEAN", " +1e400 and more");
+         set(file, "STATISTICS_STDDEV", "-1.#IND");
+         set(file, "STATISTICS_MINIMUM", "  3.5");
+         set(file, "STATISTICS_MAXIMUM", "260");
+         set(file, "STATISTICS_APPROXIMATE", "Off");
+         set(file, "STATISTICS_VALID_PERCENT", "97.3");
+         set(file, "STATISTICS_MEAN", "7", 1);  // beside the others of this band
+       }},
+      {"marks in a text", true, [&](GDALDatasetH file) { set(file, "STATISTICS_MEAN", "<&>"); }},
+      {"another item", false, [&](GDALDatasetH file) { set(file, "SENSOR", "here"); }},
+      {"a scale", false,
+       [](GDALDatasetH file) { GDALSetRasterScale(GDALGetRasterBand(file, 1), 2); }},
+      {"a name", false,
+       [](GDALDatasetH file) { GDALSetDescription(GDALGetRasterBand(file, 1), "Red"); }},
+      {"a histogram", true,
+       [&](GDALDatasetH file) {
+         compute(file, false);
+         GUIntBig counts[] = {1, 2, 3};
+         GDALSetDefaultHistogramEx(GDALGetRasterBand(file, 2), -0.5, 2.5, 3, counts);
+       }},
+  };
+  int number = 0;
+  for (const GDALDataType type : {GDT_Byte, GDT_Int16, GDT_Float32}) {
+    for (const auto& each : cases) {
+      for (const int how : {0, 1, 2}) {  // beside the file, in the file, in both
+        SCOPED_TRACE(std::string(each.name) + " " + std::to_string(how));
+        const std::string path =
+            (directory.Path() / ("v" + std::to_string(number++) + "x.tif")).string();
+        const bool hasNoData = number % 3 == 0;
+        Make(path, {type, {}, 3, 32633, hasNoData ? "7" : nullptr}, number);
+        const auto store = [&](unsigned flags, const Store& body) {
+          GDALDatasetH const file = GDALOpenEx(path.c_str(), flags, nullptr, nullptr, nullptr);
+          body(file);
+          GDALClose(file);
+        };
+        if (how != 0) store(GDAL_OF_RASTER | GDAL_OF_UPDATE, each.store);
+        if (how == 2) {
+          store(GDAL_OF_RASTER, [&](GDALDatasetH file) { set(file, "STATISTICS_MAXIMUM", "9"); });
+        } else if (how == 0) {
+          store(GDAL_OF_RASTER, each.store);
+        }
+        EXPECT_EQ(ExpectSame(path), each.isOwn);
+      }
+    }
+  }
 }
 
 TEST(OwnTiff, LeavesToGdalWhatItDoesNotKnow) {
