@@ -4,7 +4,7 @@
 #include <atomic>
 #include <cstring>
 
-#include "tasks/parallel.h"
+#include "tasks/crew.h"
 
 namespace lumo::tiff {
 namespace {
@@ -220,11 +220,7 @@ bool Window::Read(const Rect& rect, const Array<unsigned>& bands, unsigned char*
       if (!ReadPiece(pieces[i])) isRead = false;
     }
   };
-  if (tasks == 1) {
-    run(0);
-  } else {
-    ParallelFor(tasks, nullptr, run);
-  }
+  RunByCrew(tasks, run);
   return isRead;
 }
 
