@@ -31,15 +31,15 @@ constexpr NamedTag kTexts[] = {{kImageDescription, "TIFFTAG_IMAGEDESCRIPTION"},
 /// Tags that are understood here. A file with another one is GDAL's.
 bool IsKnown(std::uint16_t tag) {
   static constexpr std::uint16_t kTags[] = {
-      kSubfileType,     kImageWidth,          kImageLength,     kBitsPerSample,
-      kCompression,     kPhotometric,         kFillOrder,       kImageDescription,
-      kStripOffsets,    kOrientation,         kSamplesPerPixel, kRowsPerStrip,
-      kStripByteCounts, kPlanarConfiguration, kSoftware,        kDateTime,
-      kArtist,          kHostComputer,        kPredictor,       kTileWidth,
-      kTileLength,      kTileOffsets,         kTileByteCounts,  kExtraSamples,
-      kSampleFormat,    kCopyright,           kModelPixelScale, kModelTiepoint,
-      kGeoKeyDirectory, kGeoDoubleParams,     kGeoAsciiParams,  kGdalMetadata,
-      kNoData};
+      kSubfileType,     kImageWidth,          kImageLength,      kBitsPerSample,
+      kCompression,     kPhotometric,         kFillOrder,        kImageDescription,
+      kStripOffsets,    kOrientation,         kSamplesPerPixel,  kRowsPerStrip,
+      kStripByteCounts, kPlanarConfiguration, kSoftware,         kDateTime,
+      kArtist,          kHostComputer,        kPredictor,        kTileWidth,
+      kTileLength,      kTileOffsets,         kTileByteCounts,   kExtraSamples,
+      kSampleFormat,    kCopyright,           kModelPixelScale,  kModelTiepoint,
+      kGeoKeyDirectory, kGeoDoubleParams,     kGeoAsciiParams,   kGdalMetadata,
+      kNoData,          kJpegTables,          kYCbCrSubsampling, kReferenceBlackWhite};
   return std::find(std::begin(kTags), std::end(kTags), tag) != std::end(kTags);
 }
 
@@ -53,12 +53,12 @@ bool HasSettings() {
   return false;
 }
 
-constexpr unsigned kGray = 1, kRgb = 2;  // of the tag Photometric
-
 /// Says whether the bands mean what a plain raster's do: colours, or numbers.
-bool FindMeaning(const File& file, const Directory& directory, unsigned bands, bool& isRgb) {
+bool FindMeaning(const File& file, const Image& image, bool& isRgb) {
+  const Directory& directory = *image.directory;
+  const unsigned bands = image.bands;
   const std::uint64_t photometric = file.Number(directory, kPhotometric, 0);
-  isRgb = photometric == kRgb;
+  isRgb = photometric == kRgb || (image.jpeg != nullptr && image.jpeg->isYcc);
   if (photometric != kGray && !(isRgb && bands >= 3)) return false;
   const unsigned extra = bands - (isRgb ? 3 : 1);
   std::vector<std::uint64_t> kinds;
@@ -67,8 +67,10 @@ bool FindMeaning(const File& file, const Directory& directory, unsigned bands, b
          std::all_of(kinds.begin(), kinds.end(), [](std::uint64_t kind) { return kind == 0; });
 }
 
-const char* WordOf(Compression compression) {
-  switch (compression) {
+const char* WordOf(const Image& image) {
+  switch (image.compression) {
+    case Compression::kJpeg:
+      return image.jpeg->isYcc ? "YCbCr JPEG" : "JPEG";
     case Compression::kLzw:
       return "LZW";
     case Compression::kDeflate:
@@ -196,7 +198,7 @@ bool Source::Describe(const String& formatKey) {
   const Directory& directory = *image.directory;
   bool isRgb = false;
   const std::optional<bool> isCloudOptimised = IsCloudOptimised(*file_);
-  if (!FindMeaning(*file_, directory, image.bands, isRgb) || !isCloudOptimised ||
+  if (!FindMeaning(*file_, image, isRgb) || !isCloudOptimised ||
       !ReadNoData(*file_, image, noData_)) {
     return false;
   }
@@ -230,7 +232,14 @@ bool Source::Describe(const String& formatKey) {
     item(named.name, text, true);
   }
   structure("INTERLEAVE", image.byPixel ? "PIXEL" : "BAND");
-  if (const char* const word = WordOf(image.compression)) structure("COMPRESSION", word);
+  if (const char* const word = WordOf(image)) structure("COMPRESSION", word);
+  if (image.jpeg != nullptr) {
+    const std::optional<JpegTables> tables = FindJpegTables(*image.jpeg);
+    if (!tables) return false;
+    structure("JPEGTABLESMODE", std::to_string(tables->mode));
+    structure("JPEG_QUALITY", std::to_string(tables->quality));
+    if (image.jpeg->isYcc) structure("SOURCE_COLOR_SPACE", "YCbCr");
+  }
   if (image.predictor != 1) structure("PREDICTOR", std::to_string(image.predictor));
   if (*isCloudOptimised) structure("LAYOUT", "COG");
   const char* const colors[] = {"Red", "Green", "Blue"};

@@ -86,8 +86,11 @@ bool Window::DecodeBlock(std::uint64_t block, unsigned lines, unsigned char* out
   const std::size_t rowBytes = image_.RowBytes(), bytes = lines * rowBytes;
   thread_local std::vector<unsigned char> packed;
   if (packed.size() < packedBytes) packed.resize(packedBytes);
-  if (!file_.Handle().Read(offsets_[block], packed.data(), packedBytes) ||
-      !Decode(image_.compression, packed.data(), packedBytes, out, bytes)) {
+  if (!file_.Handle().Read(offsets_[block], packed.data(), packedBytes)) return false;
+  if (image_.jpeg != nullptr) {
+    return DecodeJpeg(*image_.jpeg, image_.blockWidth, lines, packed.data(), packedBytes, out);
+  }
+  if (!Decode(image_.compression, packed.data(), packedBytes, out, bytes)) {
     return false;
   }
   if (image_.predictor == 1) return true;

@@ -261,6 +261,37 @@ TEST(OwnTiff, IsReadAsGdalReadsIt) {
   EXPECT_GT(number, 100);
 }
 
+/// JPEG in its forms; the bands of each are grey, or colours that may be stored as such or not.
+TEST(OwnTiff, JpegIsDecodedAsByGdal) {
+  const test::TemporaryDirectory directory;
+  const std::vector<std::vector<std::string>> blocks = {
+      {"TILED=YES", "BLOCKXSIZE=64", "BLOCKYSIZE=32"}, {"BLOCKYSIZE=16"}, {"BLOCKYSIZE=149"}};
+  const std::vector<std::pair<unsigned, std::vector<std::string>>> forms = {
+      {1, {}},
+      {3, {"PHOTOMETRIC=YCBCR"}},
+      {3, {"PHOTOMETRIC=RGB"}},
+      {3, {"PHOTOMETRIC=MINISBLACK"}},
+      {5, {"INTERLEAVE=BAND", "PHOTOMETRIC=MINISBLACK"}},
+      {3, {"INTERLEAVE=BAND", "PHOTOMETRIC=RGB"}}};
+  int number = 0;
+  for (const auto& block : blocks) {
+    for (const auto& [bands, options] : forms) {
+      for (const char* const quality : {"JPEG_QUALITY=75", "JPEG_QUALITY=23", "JPEG_QUALITY=100"}) {
+        Layout layout{GDT_Byte, block, bands};
+        layout.options.insert(layout.options.end(), options.begin(), options.end());
+        layout.options.insert(layout.options.end(), {"COMPRESS=JPEG", quality});
+        layout.hasLevels = number % 3 == 0;
+        layout.noData = number % 4 == 1 ? "7" : nullptr;
+        const std::string path =
+            (directory.Path() / ("j" + std::to_string(number++) + "x.tif")).string();
+        Make(path, layout, number);
+        EXPECT_TRUE(ExpectSame(path))
+            << "GDAL had to read it: " << number << " " << bands << " " << quality;
+      }
+    }
+  }
+}
+
 /// Systems of all kinds: in feet and degrees, with other meridians, withdrawn ones.
 TEST(OwnTiff, SystemsOfTheRegistryAreThoseOfGdal) {
   GDALAllRegister();
@@ -369,7 +400,7 @@ TEST(OwnTiff, LeavesToGdalWhatItDoesNotKnow) {
     Make(path(name), layout, 1);
     return ExpectSame(path(name));
   };
-  EXPECT_FALSE(isOwn("jpeg.tif", {GDT_Byte, {"COMPRESS=JPEG", "PHOTOMETRIC=YCBCR", "TILED=YES"}}));
+  EXPECT_FALSE(isOwn("cmyk.tif", {GDT_Byte, {"COMPRESS=JPEG", "PHOTOMETRIC=CMYK"}, 4}));
   EXPECT_FALSE(isOwn("packed.tif", {GDT_Byte, {"COMPRESS=PACKBITS"}}));
   EXPECT_FALSE(isOwn("bits.tif", {GDT_Byte, {"NBITS=4"}}));
   EXPECT_FALSE(isOwn("signed.tif", {GDT_Byte, {"PIXELTYPE=SIGNEDBYTE"}, 1}));
@@ -395,14 +426,41 @@ TEST(OwnTiff, LeavesToGdalWhatItDoesNotKnow) {
   }
 }
 
+/// Reads all of a damaged file both ways.
+template <typename T>
+void ExpectSameOutcome(const RasterDataConnectionPtr& ours, const RasterDataConnectionPtr& theirs) {
+  const RasterReaderPtr<T> own = test::ReaderOf<T>(ours), other = test::ReaderOf<T>(theirs);
+  ASSERT_EQ(bool(own), bool(other));
+  if (!own) return;
+  Array<unsigned> bands{ArrayDims(other->Bands())};
+  for (unsigned i = 0; i < bands.GetCount(); ++i) bands[i] = i;
+  const std::size_t count = std::size_t{other->Samples(0)} * other->Lines(0) * bands.GetCount();
+  if (count > 1 << 24) return;
+  std::vector<T> a(count), b(count);
+  std::vector<unsigned char> state(count);
+  const bool isOurs =
+      own->ReadPixels(0, 0, other->Samples(0), other->Lines(0), bands, 0, a.data(), state.data());
+  const String ourRead = TakeFault();
+  const bool isTheirs =
+      other->ReadPixels(0, 0, other->Samples(0), other->Lines(0), bands, 0, b.data(), state.data());
+  const String theirRead = TakeFault();
+  EXPECT_EQ(isOurs, isTheirs) << ourRead.ToUTF8() << " / " << theirRead.ToUTF8();
+  if (isOurs && isTheirs) {
+    EXPECT_EQ(a, b);
+  } else if (!isOurs && !isTheirs) {
+    EXPECT_EQ(ourRead, theirRead);
+  }
+}
+
 TEST(OwnTiff, DamageIsWhatGdalSaysOfIt) {
   const test::TemporaryDirectory directory;
   const std::string path = (directory.Path() / "damaged.tif").string();
-  for (const char* const codec : {"NONE", "DEFLATE", "LZW", "ZSTD"}) {
+  for (const char* const codec : {"NONE", "DEFLATE", "LZW", "ZSTD", "JPEG"}) {
     for (int seed = 0; seed < 12; ++seed) {
+      const bool isJpeg = std::string(codec) == "JPEG";
       Make(
           path,
-          {GDT_UInt16,
+          {isJpeg ? GDT_Byte : GDT_UInt16,
            {std::string("COMPRESS=").append(codec), "TILED=YES", "BLOCKXSIZE=64", "BLOCKYSIZE=64"}},
           seed);
       const auto size = static_cast<unsigned>(fs::file_size(path));
@@ -423,27 +481,10 @@ TEST(OwnTiff, DamageIsWhatGdalSaysOfIt) {
       const String theirFault = TakeFault();
       ASSERT_EQ(bool(ours), bool(theirs));
       EXPECT_EQ(ourFault, theirFault);
-      const RasterReaderPtr<std::uint16_t> own = test::ReaderOf<std::uint16_t>(ours),
-                                           other = test::ReaderOf<std::uint16_t>(theirs);
-      ASSERT_EQ(bool(own), bool(other));
-      if (!own) continue;
-      Array<unsigned> bands{ArrayDims(other->Bands())};
-      for (unsigned i = 0; i < bands.GetCount(); ++i) bands[i] = i;
-      const std::size_t count = std::size_t{other->Samples(0)} * other->Lines(0) * bands.GetCount();
-      if (count > 1 << 24) continue;
-      std::vector<std::uint16_t> a(count), b(count);
-      std::vector<unsigned char> state(count);
-      const bool isOurs = own->ReadPixels(0, 0, other->Samples(0), other->Lines(0), bands, 0,
-                                          a.data(), state.data());
-      const String ourRead = TakeFault();
-      const bool isTheirs = other->ReadPixels(0, 0, other->Samples(0), other->Lines(0), bands, 0,
-                                              b.data(), state.data());
-      const String theirRead = TakeFault();
-      EXPECT_EQ(isOurs, isTheirs) << ourRead.ToUTF8() << " / " << theirRead.ToUTF8();
-      if (isOurs && isTheirs) {
-        EXPECT_EQ(a, b);
-      } else if (!isOurs && !isTheirs) {
-        EXPECT_EQ(ourRead, theirRead);
+      if (isJpeg) {
+        ExpectSameOutcome<std::uint8_t>(ours, theirs);
+      } else {
+        ExpectSameOutcome<std::uint16_t>(ours, theirs);
       }
     }
   }
