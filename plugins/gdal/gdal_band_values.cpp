@@ -14,14 +14,6 @@
 namespace lumo::gdal {
 namespace {
 
-constexpr const char* kMin = "STATISTICS_MINIMUM";
-constexpr const char* kMax = "STATISTICS_MAXIMUM";
-constexpr const char* kMean = "STATISTICS_MEAN";
-constexpr const char* kStd = "STATISTICS_STDDEV";
-constexpr const char* kApproximate = "STATISTICS_APPROXIMATE";
-constexpr const char* kValidPercent = "STATISTICS_VALID_PERCENT";
-constexpr const char* kRecord = "STATISTICS_RECORD";
-
 std::string Item(GDALRasterBandH band, const char* name) {
   const char* const value = GDALGetMetadataItem(band, name, nullptr);
   return value != nullptr ? value : "";
@@ -65,43 +57,38 @@ struct ColorTableDeleter {
 }  // namespace
 
 std::optional<StoredStats> ReadStoredStats(GDALRasterBandH band) {
-  StoredStats stats{Item(band, kMin), Item(band, kMax),          Item(band, kMean),
-                    Item(band, kStd), Item(band, kValidPercent), Item(band, kRecord)};
-  const bool isWhole =
-      !stats.min.empty() && !stats.max.empty() && !stats.mean.empty() && !stats.std.empty();
-  // Statistics of a sample of the pixels are not those of the band.
-  const std::string approximate = Item(band, kApproximate);
-  if (!isWhole || (!approximate.empty() && CPLTestBool(approximate.c_str()))) return std::nullopt;
-  return stats;
+  return StatsOfItems([band](const char* name) { return Item(band, name); });
 }
 
 bool WriteStoredStats(GDALRasterBandH band, const StoredStats& stats) {
   const std::pair<const char*, const char*> items[] = {
-      {kMin, stats.min.c_str()}, {kMax, stats.max.c_str()},       {kMean, stats.mean.c_str()},
-      {kStd, stats.std.c_str()}, {kRecord, stats.record.c_str()},
+      {kStatsMin, stats.min.c_str()},       {kStatsMax, stats.max.c_str()},
+      {kStatsMean, stats.mean.c_str()},     {kStatsStd, stats.std.c_str()},
+      {kStatsRecord, stats.record.c_str()},
   };
   for (const auto& [name, value] : items) {
     if (GDALSetMetadataItem(band, name, value, nullptr) != CE_None) return false;
   }
-  for (const char* const name : {kApproximate, kValidPercent}) {
+  for (const char* const name : {kStatsApproximate, kStatsValidPercent}) {
     if (!Item(band, name).empty()) GDALSetMetadataItem(band, name, nullptr, nullptr);
   }
   return true;
 }
 
 void DeleteStoredStats(GDALRasterBandH band) {
-  if (Item(band, kMin).empty()) return;
-  for (const char* const name : {kMin, kMax, kMean, kStd, kApproximate, kValidPercent, kRecord}) {
+  if (Item(band, kStatsMin).empty()) return;
+  for (const char* const name : {kStatsMin, kStatsMax, kStatsMean, kStatsStd, kStatsApproximate,
+                                 kStatsValidPercent, kStatsRecord}) {
     GDALSetMetadataItem(band, name, nullptr, nullptr);
   }
 }
 
 void DeleteStoredPairs(GDALRasterBandH band) {
-  std::string record = Item(band, kRecord);
+  std::string record = Item(band, kStatsRecord);
   constexpr std::string_view kNone = "0: [] 0: []";
   record.erase(record.find_last_not_of(' ') + 1);
   if (record.empty() || record.ends_with(kNone)) return;
-  GDALSetMetadataItem(band, kRecord, nullptr, nullptr);
+  GDALSetMetadataItem(band, kStatsRecord, nullptr, nullptr);
 }
 
 std::optional<StoredHistogram> ReadStoredHistogram(GDALRasterBandH band) {

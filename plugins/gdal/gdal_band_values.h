@@ -6,20 +6,11 @@
 
 #include "foundation/array.h"
 #include "foundation/color.h"
+#include "gdal_common/stored_stats.h"
 
 namespace lumo::gdal {
 
 // The values that a band carries beside its pixels, as GDAL has them and as we do.
-
-/// A band's statistics as GDAL keeps them, as text so that whole numbers stay exact.
-///
-/// GDAL's deviation is divided by n, ours by n - 1, and it has no count and no sums. So ours stand
-/// beside them in a record, which counts as long as GDAL's numbers are those it was written with.
-struct StoredStats {
-  std::string min, max, mean, std;
-  std::string validPercent;  ///< share of the pixels that counted, rounded; "" where not known
-  std::string record;        ///< the pixel count and the text form of RasterBandStats; or ""
-};
 
 /// Those that the source holds, of all its pixels; none are computed.
 std::optional<StoredStats> ReadStoredStats(GDALRasterBandH band);

@@ -16,31 +16,13 @@
 #include "gdal_masks.h"
 #include "gdal_open.h"
 #include "gdal_overviews.h"
+#include "gdal_twins.h"
 #include "gdal_types.h"
 #include "platform/folder_lock.h"
 #include "platform/random_access_file.h"
 
 namespace lumo::gdal {
 namespace {
-
-/// Strides of a block in an interleave, in bytes.
-struct Strides {
-  Strides(Interleave interleave, const BlockPlace& place, GSpacing element) {
-    const GSpacing width = place.width, height = place.height, bands = place.bands.GetCount();
-    switch (interleave) {
-      case Interleave::BIP:
-        pixel = bands * element, line = width * pixel, band = element;
-        break;
-      case Interleave::BIL:
-        pixel = element, band = width * element, line = bands * band;
-        break;
-      default:
-        pixel = element, line = width * element, band = height * line;
-        break;
-    }
-  }
-  GSpacing pixel, line, band;
-};
 
 Interleave ReadInterleave(GDALDatasetH dataset) {
   const char* const word = GDALGetMetadataItem(dataset, "INTERLEAVE", "IMAGE_STRUCTURE");
@@ -124,6 +106,25 @@ void WarnOfUnusedFiles(const std::string& name, const RasterLevel& full) {
 
 }  // namespace
 
+/// Strides of a block in an interleave, in bytes.
+struct OpenRaster::Strides {
+  Strides(lumo::Interleave interleave, const BlockPlace& place, GSpacing element) {
+    const GSpacing width = place.width, height = place.height, bands = place.bands.GetCount();
+    switch (interleave) {
+      case lumo::Interleave::BIP:
+        pixel = bands * element, line = width * pixel, band = element;
+        break;
+      case lumo::Interleave::BIL:
+        pixel = element, band = width * element, line = bands * band;
+        break;
+      default:
+        pixel = element, line = width * element, band = height * line;
+        break;
+    }
+  }
+  GSpacing pixel, line, band;
+};
+
 OpenRaster::OpenRaster(const Format& format, const Source& source)
     : format_(format), source_(source) {}
 
@@ -133,10 +134,25 @@ OpenRaster::~OpenRaster() {
 
 std::unique_ptr<OpenRaster> OpenRaster::Open(const Format& format, const Source& source) {
   std::unique_ptr<OpenRaster> raster(new OpenRaster(format, source));
-  DatasetPtr dataset = OpenToRead(format, source, raster->isThreaded_);
-  if (!raster->TakeDataset(std::move(dataset))) return nullptr;
+  if (!raster->TakeDataset(OpenToRead(format, source))) return nullptr;
+  raster->twins_ = std::make_unique<Twins>(format, source, raster->dataset_.get());
   if (source.isFile) WarnOfUnusedFiles(source.name, raster->levels_.at(0));
   return raster;
+}
+
+std::unique_ptr<OpenRaster> OpenRaster::OpenTwin(const Format& format, const Source& source) {
+  std::unique_ptr<OpenRaster> raster(new OpenRaster(format, source));
+  return raster->TakeDataset(OpenToRead(format, source)) ? std::move(raster) : nullptr;
+}
+
+bool OpenRaster::IsAlike(const OpenRaster& other) const {
+  return dataType_ == other.dataType_ && Bands() == other.Bands() &&
+         interleave_ == other.interleave_ &&
+         std::equal(levels_.begin(), levels_.end(), other.levels_.begin(), other.levels_.end(),
+                    [](const auto& a, const auto& b) {
+                      return a.first == b.first && a.second.samples == b.second.samples &&
+                             a.second.lines == b.second.lines;
+                    });
 }
 
 std::unique_ptr<OpenRaster> OpenRaster::Create(const Format& format, const Source& source,
@@ -157,6 +173,7 @@ std::unique_ptr<OpenRaster> OpenRaster::Create(const Format& format, const Sourc
 
 bool OpenRaster::TakeDataset(DatasetPtr dataset) {
   const Messages messages;
+  twins_.reset();  // of what was open before
   dataset_ = std::move(dataset);
   levels_.clear();
   if (dataset_ == nullptr) return false;
@@ -211,6 +228,7 @@ void OpenRaster::FindLevels() {
 bool OpenRaster::Close() {
   if (dataset_ == nullptr) return true;
   levels_.clear();
+  twins_.reset();
   const std::unique_ptr<NewRaster> made = std::move(newRaster_);
   if (made != nullptr) return made->Finish(std::move(dataset_));
   const Messages messages;
@@ -261,7 +279,6 @@ bool OpenRaster::OpenForUpdate() {
   canWrite_ = updated != nullptr ? Answer::kYes : Answer::kNo;
   if (updated == nullptr) return false;
   isUpdated_ = true;
-  isThreaded_ = false;
   return TakeAgain(std::move(updated));
 }
 
@@ -281,7 +298,22 @@ const RasterLevel* OpenRaster::CheckPlace(const BlockPlace& place) const {
   return nullptr;
 }
 
+bool OpenRaster::ReadInto(const BlockPlace& part, const BlockPlace& whole, unsigned band,
+                          void* pixels) const {
+  const GSpacing element = GDALGetDataTypeSizeBytes(PixelTypeOf(dataType_).type);
+  const Strides strides(interleave_, whole, element);
+  char* const first = static_cast<char*>(pixels) + (part.left - whole.left) * strides.pixel +
+                      (part.top - whole.top) * strides.line + band * strides.band;
+  return Transfer(GF_Read, part, strides, first);
+}
+
 bool OpenRaster::Transfer(GDALRWFlag direction, const BlockPlace& place, void* pixels) const {
+  const GSpacing element = GDALGetDataTypeSizeBytes(PixelTypeOf(dataType_).type);
+  return Transfer(direction, place, Strides(interleave_, place, element), pixels);
+}
+
+bool OpenRaster::Transfer(GDALRWFlag direction, const BlockPlace& place, const Strides& strides,
+                          void* pixels) const {
   const RasterLevel* const level = CheckPlace(place);
   if (level == nullptr) return false;
   if (newRaster_ != nullptr && newRaster_->HasPixels()) {
@@ -290,12 +322,9 @@ bool OpenRaster::Transfer(GDALRWFlag direction, const BlockPlace& place, void* p
   }
   const Messages messages(Messages::Damage::kIsError);
   const GDALDataType type = PixelTypeOf(dataType_).type;
-  const Strides strides(interleave_, place, GDALGetDataTypeSizeBytes(type));
   const auto at = [](unsigned number) { return static_cast<int>(number); };
   CPLErr result = CE_None;
-  // Several bands of a file that keeps them one by one: GDAL 3.6 mixes them up on its threads.
-  const bool isWhole =
-      level->dataset != nullptr && !(isThreaded_ && interleave_ != lumo::Interleave::BIP);
+  const bool isWhole = level->dataset != nullptr;
   if (isWhole) {
     std::vector<int> numbers;
     for (const unsigned band : place.bands) numbers.push_back(at(band) + 1);
@@ -318,18 +347,18 @@ bool OpenRaster::Transfer(GDALRWFlag direction, const BlockPlace& place, void* p
 bool OpenRaster::Read(const BlockPlace& place, void* pixels) {
   // GDAL's cache holds what was read of damaged data as if it were whole, and codecs warn once.
   if (isDamaged_ && !isUpdated_) {
-    isThreaded_ = false;
     isPlain_ = true;
     if (!TakeAgain(OpenDataset(source_, format_, GDAL_OF_RASTER))) return false;
   }
   isDamaged_ = false;
+  if (twins_ != nullptr && CheckPlace(place) != nullptr && twins_->Read(*this, place, pixels)) {
+    return true;
+  }
   if (Transfer(GF_Read, place, pixels)) return true;
   isDamaged_ = CheckPlace(place) != nullptr;
   const bool isShortCut = !isPlain_ && !isUpdated_ && format_.drivers.front() == "GTiff";
   if (!isShortCut || !isDamaged_) return false;
-  // Messages of a thread of GDAL's reach nobody, and a read past its cache says nothing. A
-  // plain one says it here.
-  isThreaded_ = false;
+  // A read past its cache says nothing. A plain one says it here.
   isPlain_ = true;
   isDamaged_ = !TakeAgain(OpenDataset(source_, format_, GDAL_OF_RASTER)) ||
                !Transfer(GF_Read, place, pixels);
@@ -425,12 +454,12 @@ bool OpenRaster::Reopen() {
     if (messages.HasError()) return messages.Fail(Name());
     return TakeAgain(OpenDataset(source_, format_, GDAL_OF_RASTER | GDAL_OF_UPDATE));
   }
-  bool isThreaded = false;
-  DatasetPtr dataset = OpenToRead(format_, source_, isThreaded);
+  DatasetPtr dataset = OpenToRead(format_, source_);
   if (dataset == nullptr) return false;  // what is open stays
-  isThreaded_ = isThreaded;
   isPlain_ = false;
-  return TakeAgain(std::move(dataset));
+  if (!TakeAgain(std::move(dataset))) return false;
+  twins_ = std::make_unique<Twins>(format_, source_, dataset_.get());
+  return true;
 }
 
 bool OpenRaster::ChangeStored(const std::function<bool()>& change) {

@@ -10,6 +10,7 @@
 namespace lumo::gdal {
 
 class NewRaster;
+class Twins;
 
 /// A block of pixels: where it lies in the raster, and in the caller's memory.
 struct BlockPlace {
@@ -37,6 +38,8 @@ class OpenRaster {
   static std::unique_ptr<OpenRaster> Open(const Format& format, const Source& source);
   static std::unique_ptr<OpenRaster> Create(const Format& format, const Source& source,
                                             const RasterDef& def);
+  /// Opens one more handle of a raster that is open already. It warns of nothing.
+  static std::unique_ptr<OpenRaster> OpenTwin(const Format& format, const Source& source);
   ~OpenRaster();
   OpenRaster(const OpenRaster&) = delete;
   OpenRaster& operator=(const OpenRaster&) = delete;
@@ -75,6 +78,11 @@ class OpenRaster {
 
   /// Carries a block to the caller's memory, in the raster's interleave.
   bool Read(const BlockPlace& place, void* pixels);
+  /// Carries a part of a block to its place in the memory of the whole, by this handle alone.
+  /// @param band  the band of the whole at which those of the part begin.
+  bool ReadInto(const BlockPlace& part, const BlockPlace& whole, unsigned band, void* pixels) const;
+  /// True for a raster of the same size, levels, bands, type and interleave.
+  bool IsAlike(const OpenRaster& other) const;
   bool Write(const BlockPlace& place, const void* pixels);
   /// Lets `change` change values that the raster, or the file beside it, stores of its bands, and
   /// stores them. It sees what others have stored by now, and nobody else stores anything
@@ -99,19 +107,22 @@ class OpenRaster {
   bool TakeAgain(DatasetPtr dataset);
   bool Reopen();
   void FindLevels();
+  struct Strides;
   bool Transfer(GDALRWFlag direction, const BlockPlace& place, void* pixels) const;
+  bool Transfer(GDALRWFlag direction, const BlockPlace& place, const Strides& strides,
+                void* pixels) const;
   const RasterLevel* CheckPlace(const BlockPlace& place) const;
   void ForgetStatistics(const Array<unsigned>& bands);
 
   Format format_;
   Source source_;
   DatasetPtr dataset_;
+  std::unique_ptr<Twins> twins_;  // none for a raster that may be written
   std::unique_ptr<NewRaster> newRaster_;
   unsigned dataType_ = 0;
   lumo::Interleave interleave_ = lumo::Interleave::BSQ;
   std::map<unsigned, RasterLevel> levels_;
   bool isUpdated_ = false;    // open for writing
-  bool isThreaded_ = false;   // GDAL decodes on threads of its own
   bool isPlain_ = false;      // opened without what makes reads faster, as one has failed
   bool isDamaged_ = false;    // the last read failed
   bool mayHavePairs_ = true;  // stored statistics between bands

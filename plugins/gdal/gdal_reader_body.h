@@ -1,13 +1,10 @@
 #pragma once
 
 #include <algorithm>
-#include <charconv>
 #include <cmath>
 #include <cpl_conv.h>
 #include <cpl_string.h>
 #include <limits>
-#include <locale>
-#include <sstream>
 
 #include "gdal_band_values.h"
 #include "gdal_common/messages.h"
@@ -22,82 +19,6 @@
 namespace lumo::gdal {
 
 namespace detail {
-
-/// A number out of a text, as a pixel value.
-template <typename T>
-std::optional<T> ParsePixel(const std::string& text) {
-  if constexpr (std::is_integral_v<T>) {
-    T whole{};
-    const auto [end, fault] = std::from_chars(text.data(), text.data() + text.size(), whole);
-    if (fault == std::errc() && end == text.data() + text.size()) return whole;
-  }
-  return ToPixel<T>(CPLAtof(text.c_str()));
-}
-
-template <typename T>
-std::string PrintPixel(T value) {
-  if constexpr (std::is_integral_v<T>) {
-    return std::to_string(value);
-  } else {
-    char text[40];
-    CPLsnprintf(text, sizeof text, "%.17g", static_cast<double>(value));
-    return text;
-  }
-}
-
-/// Statistics as GDAL keeps them, with ours in the record.
-template <typename T>
-StoredStats ToStored(const RasterBandStats<T>& stats) {
-  StoredStats stored;
-  stored.min = PrintPixel(stats.min);
-  stored.max = PrintPixel(stats.max);
-  stored.mean = PrintPixel(stats.mean);
-  const auto n = static_cast<double>(stats.pixelCount);
-  stored.std = PrintPixel(n > 0 ? stats.std * std::sqrt((n - 1) / n) : stats.std);
-  std::ostringstream record;
-  record.imbue(std::locale::classic());
-  record << stats.pixelCount << ' ' << stats;
-  stored.record = record.str();
-  return stored;
-}
-
-/// The record of ours, when GDAL's numbers are still those it was written with.
-template <typename T>
-std::optional<RasterBandStats<T>> ReadRecord(const StoredStats& stored) {
-  std::istringstream record(stored.record);
-  record.imbue(std::locale::classic());
-  std::uint64_t pixelCount = 0;
-  RasterBandStats<T> stats;
-  if (!(record >> pixelCount >> stats)) return std::nullopt;
-  stats.pixelCount = pixelCount;
-  const StoredStats same = ToStored(stats);
-  const bool stands = same.min == stored.min && same.max == stored.max &&
-                      same.mean == stored.mean && same.std == stored.std;
-  return stands ? std::optional(stats) : std::nullopt;
-}
-
-/// Statistics that GDAL wrote.
-/// @param n  how many pixels there are.
-/// @param allValid  none of them is left out.
-template <typename T>
-RasterBandStats<T> FromStored(const StoredStats& stored, std::uint64_t n, bool allValid) {
-  RasterBandStats<T> stats;
-  const auto min = ParsePixel<T>(stored.min);
-  const auto max = ParsePixel<T>(stored.max);
-  if (!min || !max) return stats;
-  stats.mask = StatsMask::Min | StatsMask::Max | StatsMask::Mean;
-  stats.min = *min;
-  stats.max = *max;
-  stats.mean = CPLAtof(stored.mean.c_str());
-  // GDAL keeps no count. Where nothing can be left out it is known all the same.
-  if (allValid) stats.pixelCount = n;
-  double counted = static_cast<double>(n);
-  if (!allValid) counted *= CPLAtof(stored.validPercent.c_str()) / 100;
-  if (counted < 2) return stats;
-  stats.mask |= StatsMask::Std;
-  stats.std = CPLAtof(stored.std.c_str()) * std::sqrt(counted / (counted - 1));
-  return stats;
-}
 
 /// Our histogram from GDAL's. A bin holds its lower edge, not its upper one.
 template <typename T>
@@ -249,11 +170,8 @@ RasterBandStats<T> Reader<T>::ReadStats(unsigned band) {
     GDALRasterBandH const source = raster_.Band(band);
     const auto stored = ReadStoredStats(source);
     if (!stored) return stats;
-    const auto record = detail::ReadRecord<T>(*stored);
     const bool allValid = std::is_integral_v<T> && (GDALGetMaskFlags(source) & GMF_ALL_VALID) != 0;
-    stats =
-        record ? *record
-               : detail::FromStored<T>(*stored, std::uint64_t{def_.samples} * def_.lines, allValid);
+    stats = FromStored<T>(*stored, std::uint64_t{def_.samples} * def_.lines, allValid);
     stats.band = band;
   }
   return stats;
@@ -268,7 +186,7 @@ bool Reader<T>::WriteStats(const Array<RasterBandStats<T>>& stats) {
         constexpr unsigned kWhole =
             StatsMask::Min | StatsMask::Max | StatsMask::Mean | StatsMask::Std;
         return !raster_.HasBand(band.band) || (band.mask & kWhole) != kWhole ||
-               WriteStoredStats(raster_.Band(band.band), detail::ToStored(band));
+               WriteStoredStats(raster_.Band(band.band), gdal::ToStored(band));
       });
     });
   }

@@ -181,6 +181,7 @@ bool IsKnown(std::uint64_t compression) {
   switch (static_cast<Compression>(compression)) {
     case Compression::kNone:
     case Compression::kLzw:
+    case Compression::kJpeg:
     case Compression::kDeflate:
     case Compression::kOldDeflate:
     case Compression::kZstd:
@@ -203,6 +204,8 @@ bool Decode(Compression compression, const unsigned char* packed, std::size_t pa
       return Inflate(packed, packedBytes, out, bytes);
     case Compression::kZstd:
       return UnpackZstd(packed, packedBytes, out, bytes);
+    case Compression::kJpeg:
+      return false;
   }
   return false;
 }

@@ -8,12 +8,13 @@ namespace lumo::tiff {
 enum class Compression : std::uint16_t {
   kNone = 1,
   kLzw = 5,
+  kJpeg = 7,  // which DecodeJpeg decodes
   kDeflate = 8,
   kOldDeflate = 32946,
   kZstd = 50000
 };
 
-/// Says whether Decode knows a compression.
+/// Says whether the compression is one of these.
 bool IsKnown(std::uint64_t compression);
 
 /// Decodes a block. True when all `bytes` came out of the packed data and nothing was wrong with

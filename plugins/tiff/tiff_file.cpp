@@ -124,6 +124,16 @@ bool File::ReadDoubles(const Directory& directory, Tag tag, std::vector<double>&
   return Get(at->second.offset, values.data(), values.size() * sizeof(double));
 }
 
+bool File::ReadBytes(const Directory& directory, Tag tag, std::vector<unsigned char>& bytes) const {
+  constexpr std::uint16_t kByte = 1, kUndefined = 7;
+  const auto at = directory.find(tag);
+  const bool isUsable = at != directory.end() && at->second.count <= 65535 &&
+                        (at->second.type == kUndefined || at->second.type == kByte);
+  if (!isUsable) return false;
+  bytes.resize(at->second.count);
+  return Get(at->second.offset, bytes.data(), bytes.size());
+}
+
 bool File::ReadText(const Directory& directory, Tag tag, std::string& text) const {
   constexpr std::uint16_t kAscii = 2;
   const auto at = directory.find(tag);

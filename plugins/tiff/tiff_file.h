@@ -36,6 +36,9 @@ enum Tag : std::uint16_t {
   kTileByteCounts = 325,
   kExtraSamples = 338,
   kSampleFormat = 339,
+  kJpegTables = 347,
+  kYCbCrSubsampling = 530,
+  kReferenceBlackWhite = 532,
   kCopyright = 33432,
   kModelPixelScale = 33550,
   kModelTiepoint = 33922,
@@ -79,6 +82,8 @@ class File {
   std::uint64_t Number(const Directory& directory, Tag tag, std::uint64_t absent) const;
   /// All values of a tag that are of the type DOUBLE.
   bool ReadDoubles(const Directory& directory, Tag tag, std::vector<double>& values) const;
+  /// The bytes of a tag of the type UNDEFINED, or BYTE.
+  bool ReadBytes(const Directory& directory, Tag tag, std::vector<unsigned char>& bytes) const;
   /// The characters of a tag up to the first null.
   bool ReadText(const Directory& directory, Tag tag, std::string& text) const;
   /// The text between the header and the first directory, as far as the first bytes of the file go.

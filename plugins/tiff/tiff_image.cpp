@@ -37,6 +37,30 @@ unsigned TypeCode(unsigned format, unsigned bytes) {
   }
 }
 
+/// Takes in what JPEG needs to know. False for a form that GDAL has to read.
+bool FindJpegForm(const File& file, Image& image) {
+  const Directory& directory = *image.directory;
+  auto form = std::make_shared<JpegForm>();
+  form->isYcc = file.Number(directory, kPhotometric, 0) == kYCbCr;
+  form->components = image.byPixel ? image.bands : 1;
+  constexpr unsigned kMostComponents = 4;  // that GDAL writes
+  if (image.elementBytes != 1 || image.sampleFormat != 1 || image.predictor != 1 ||
+      form->components > kMostComponents || !file.ReadBytes(directory, kJpegTables, form->tables)) {
+    return false;
+  }
+  if (form->isYcc) {
+    std::vector<std::uint64_t> sampling;
+    const bool isUsable = image.bands == 3 && image.byPixel &&
+                          file.ReadNumbers(directory, kYCbCrSubsampling, 2, sampling) &&
+                          sampling.size() == 2 && sampling[0] <= 4 && sampling[1] <= 4;
+    if (!isUsable) return false;
+    form->acrossSampling = static_cast<unsigned>(sampling[0]);
+    form->downSampling = static_cast<unsigned>(sampling[1]);
+  }
+  image.jpeg = form;
+  return true;
+}
+
 }  // namespace
 
 unsigned Image::DataType() const {
@@ -70,6 +94,11 @@ std::optional<Image> FindImage(const File& file, const Directory& directory) {
   image.byPixel = planar == 1 && bands > 1;
   image.isTiled = directory.contains(kTileOffsets);
   image.directory = &directory;
+  const bool isJpeg = image.compression == Compression::kJpeg;
+  const bool hasJpegTags = directory.contains(kJpegTables) ||
+                           directory.contains(kYCbCrSubsampling) ||
+                           directory.contains(kReferenceBlackWhite);
+  if (isJpeg ? !FindJpegForm(file, image) : hasJpegTags) return std::nullopt;
   if (image.isTiled == directory.contains(kStripOffsets)) return std::nullopt;
   const std::uint64_t width = image.isTiled ? number(kTileWidth, 0) : samples;
   const std::uint64_t height =

@@ -4,8 +4,12 @@
 
 #include "tiff/tiff_codec.h"
 #include "tiff/tiff_file.h"
+#include "tiff/tiff_jpeg.h"
 
 namespace lumo::tiff {
+
+/// Meanings of the tag Photometric.
+enum Photometric : std::uint16_t { kGray = 1, kRgb = 2, kYCbCr = 6 };
 
 /// How the pixels of one directory lie in its file.
 struct Image {
@@ -18,6 +22,7 @@ struct Image {
   bool isTiled = false;
   unsigned blockWidth = 0, blockHeight = 0;
   const Directory* directory = nullptr;
+  std::shared_ptr<const JpegForm> jpeg;  ///< of that compression
 
   unsigned BlocksAcross() const { return (samples + blockWidth - 1) / blockWidth; }
   unsigned BlocksDown() const { return (lines + blockHeight - 1) / blockHeight; }

@@ -104,14 +104,22 @@ std::int32_t Reader<T>::StatsMask() {
 
 template <typename T>
 bool Reader<T>::StatsExist(unsigned band) {
-  RasterReader<T>* const inner = source_.HasStats() ? Inner() : Opened();
-  return inner != nullptr && inner->StatsExist(band);
+  if (RasterReader<T>* const inner = Opened()) return inner->StatsExist(band);
+  return ReadStats(band).mask != lumo::StatsMask::None;
 }
 
 template <typename T>
 RasterBandStats<T> Reader<T>::ReadStats(unsigned band) {
-  RasterReader<T>* const inner = source_.HasStats() ? Inner() : Opened();
-  return inner != nullptr ? inner->ReadStats(band) : RasterBandStats<T>();
+  if (RasterReader<T>* const inner = Opened()) return inner->ReadStats(band);
+  RasterBandStats<T> stats;
+  if constexpr (std::is_arithmetic_v<T>) {
+    const auto stored = band < def_.bands ? source_.Stored().Stats(band) : std::nullopt;
+    if (!stored) return stats;
+    const bool allValid = std::is_integral_v<T> && !source_.NoData();
+    stats = gdal::FromStored<T>(*stored, std::uint64_t{def_.samples} * def_.lines, allValid);
+    stats.band = band;
+  }
+  return stats;
 }
 
 template <typename T>
@@ -122,7 +130,7 @@ bool Reader<T>::WriteStats(const Array<RasterBandStats<T>>& stats) {
 
 template <typename T>
 Array<RasterBandHistogram<T>> Reader<T>::Histogram(unsigned band) {
-  RasterReader<T>* const inner = Opened();
+  RasterReader<T>* const inner = source_.Stored().HasHistograms() ? Inner() : Opened();
   return inner != nullptr ? inner->Histogram(band) : Array<RasterBandHistogram<T>>();
 }
 

@@ -84,20 +84,26 @@ bool MayBeHeader(std::string_view name) {
 
 }  // namespace
 
-bool StandsAlone(const std::string& path) {
+Company CompanyOf(const std::string& path) {
   const fs::path file(path);
   const ListingPtr listing = FindListing(file.parent_path());
   const std::string stem = LowerCase(file.stem().string());
   // These have headers that begin in another way.
-  if (listing == nullptr || stem.empty() || stem.starts_with("img")) return false;
+  if (listing == nullptr || stem.empty() || stem.starts_with("img")) return Company::kOthers;
   constexpr std::size_t kAlike = 3;
+  const std::string side = LowerCase(file.filename().string()) + ".aux.xml";
+  bool hasSideFile = false;
   const auto isNear = [&](std::string_view name) {
     const bool goesOn = name.size() > stem.size() &&
                         std::isalnum(static_cast<unsigned char>(name[stem.size()])) != 0;
-    return !goesOn;
+    const bool isSide = name == side && !hasSideFile;
+    hasSideFile = hasSideFile || isSide;
+    return !goesOn && !isSide;
   };
-  return !AnyWith(*listing, stem, isNear) &&
-         !AnyWith(*listing, stem.substr(0, kAlike), MayBeHeader);
+  if (AnyWith(*listing, stem, isNear) || AnyWith(*listing, stem.substr(0, kAlike), MayBeHeader)) {
+    return Company::kOthers;
+  }
+  return hasSideFile ? Company::kSideFile : Company::kNone;
 }
 
 }  // namespace lumo::tiff

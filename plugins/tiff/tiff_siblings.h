@@ -4,12 +4,18 @@
 
 namespace lumo::tiff {
 
-/// True when nothing beside a TIFF file may describe it: no file whose name begins like its own,
-/// and none of the headers that vendors put beside their scenes. What lies there is GDAL's to
-/// judge.
+/// Tells which files beside a TIFF file may describe it.
+enum class Company {
+  kNone,
+  kSideFile,  ///< nothing but `NAME.aux.xml`, where GDAL stores values
+  kOthers     ///< what lies there is GDAL's to judge
+};
+
+/// Looks for files whose names begin like that of a TIFF file, and for the headers that vendors put
+/// beside their scenes.
 ///
 /// The names in a folder are kept until the folder changes, so that thousands of files in one
 /// folder don't cost as many looks at each of them. Threads: any number.
-bool StandsAlone(const std::string& path);
+Company CompanyOf(const std::string& path);
 
 }  // namespace lumo::tiff

@@ -31,15 +31,15 @@ constexpr NamedTag kTexts[] = {{kImageDescription, "TIFFTAG_IMAGEDESCRIPTION"},
 /// Tags that are understood here. A file with another one is GDAL's.
 bool IsKnown(std::uint16_t tag) {
   static constexpr std::uint16_t kTags[] = {
-      kSubfileType,     kImageWidth,          kImageLength,     kBitsPerSample,
-      kCompression,     kPhotometric,         kFillOrder,       kImageDescription,
-      kStripOffsets,    kOrientation,         kSamplesPerPixel, kRowsPerStrip,
-      kStripByteCounts, kPlanarConfiguration, kSoftware,        kDateTime,
-      kArtist,          kHostComputer,        kPredictor,       kTileWidth,
-      kTileLength,      kTileOffsets,         kTileByteCounts,  kExtraSamples,
-      kSampleFormat,    kCopyright,           kModelPixelScale, kModelTiepoint,
-      kGeoKeyDirectory, kGeoDoubleParams,     kGeoAsciiParams,  kGdalMetadata,
-      kNoData};
+      kSubfileType,     kImageWidth,          kImageLength,      kBitsPerSample,
+      kCompression,     kPhotometric,         kFillOrder,        kImageDescription,
+      kStripOffsets,    kOrientation,         kSamplesPerPixel,  kRowsPerStrip,
+      kStripByteCounts, kPlanarConfiguration, kSoftware,         kDateTime,
+      kArtist,          kHostComputer,        kPredictor,        kTileWidth,
+      kTileLength,      kTileOffsets,         kTileByteCounts,   kExtraSamples,
+      kSampleFormat,    kCopyright,           kModelPixelScale,  kModelTiepoint,
+      kGeoKeyDirectory, kGeoDoubleParams,     kGeoAsciiParams,   kGdalMetadata,
+      kNoData,          kJpegTables,          kYCbCrSubsampling, kReferenceBlackWhite};
   return std::find(std::begin(kTags), std::end(kTags), tag) != std::end(kTags);
 }
 
@@ -53,12 +53,12 @@ bool HasSettings() {
   return false;
 }
 
-constexpr unsigned kGray = 1, kRgb = 2;  // of the tag Photometric
-
 /// Says whether the bands mean what a plain raster's do: colours, or numbers.
-bool FindMeaning(const File& file, const Directory& directory, unsigned bands, bool& isRgb) {
+bool FindMeaning(const File& file, const Image& image, bool& isRgb) {
+  const Directory& directory = *image.directory;
+  const unsigned bands = image.bands;
   const std::uint64_t photometric = file.Number(directory, kPhotometric, 0);
-  isRgb = photometric == kRgb;
+  isRgb = photometric == kRgb || (image.jpeg != nullptr && image.jpeg->isYcc);
   if (photometric != kGray && !(isRgb && bands >= 3)) return false;
   const unsigned extra = bands - (isRgb ? 3 : 1);
   std::vector<std::uint64_t> kinds;
@@ -67,8 +67,10 @@ bool FindMeaning(const File& file, const Directory& directory, unsigned bands, b
          std::all_of(kinds.begin(), kinds.end(), [](std::uint64_t kind) { return kind == 0; });
 }
 
-const char* WordOf(Compression compression) {
-  switch (compression) {
+const char* WordOf(const Image& image) {
+  switch (image.compression) {
+    case Compression::kJpeg:
+      return image.jpeg->isYcc ? "YCbCr JPEG" : "JPEG";
     case Compression::kLzw:
       return "LZW";
     case Compression::kDeflate:
@@ -115,41 +117,29 @@ std::optional<bool> IsCloudOptimised(const File& file) {
   return words.find("LAYOUT=IFDS_BEFORE_DATA") != words.npos;
 }
 
-/// Says whether the items that GDAL keeps in a file are statistics of its bands, and nothing else.
-bool HoldsOnlyStats(std::string_view text) {
-  const auto take = [&text](std::string_view start) {
-    if (!text.starts_with(start)) return false;
-    text.remove_prefix(start.size());
-    return true;
-  };
-  const auto takeUpTo = [&text](std::string_view end, std::string_view forbidden) {
-    const std::size_t at = text.find(end);
-    if (at == text.npos || text.substr(0, at).find_first_of(forbidden) != text.npos) return false;
-    text.remove_prefix(at + end.size());
-    return true;
-  };
-  const auto skipSpace = [&text] {
-    text.remove_prefix(std::min(text.find_first_not_of(" \n"), text.size()));
-  };
-  if (!take("<GDALMetadata>")) return false;
-  for (skipSpace(); !take("</GDALMetadata>"); skipSpace()) {
-    const bool isStat = take("<Item name=\"STATISTICS_") && takeUpTo("\" sample=\"", "<>&\" ") &&
-                        takeUpTo("\">", "<>&\" ") && takeUpTo("</Item>", "<>&");
-    if (!isStat) return false;
-  }
-  skipSpace();
-  return text.empty();
+/// The text of a whole file. False when it can't be read, or is too long for what is looked for.
+bool ReadWhole(const std::string& path, std::string& text) {
+  constexpr std::uint64_t kMostBytes = 4 << 20;
+  const auto file =
+      platform::RandomAccessFile::Open(path, platform::RandomAccessFile::Access::kRead);
+  std::uint64_t size = 0;
+  if (file == nullptr || !file->GetSize(size) || size > kMostBytes) return false;
+  text.resize(size);
+  return file->Read(0, text.data(), text.size());
 }
 
 }  // namespace
 
 std::unique_ptr<Source> Source::Open(const std::string& path, const String& formatKey,
                                      Opener opener) {
-  if (HasSettings() || !StandsAlone(path)) return nullptr;
+  const Company company = HasSettings() ? Company::kOthers : CompanyOf(path);
+  if (company == Company::kOthers) return nullptr;
   std::unique_ptr<File> file = File::Open(path);
   if (file == nullptr) return nullptr;
   std::unique_ptr<Source> source(new Source(std::move(file), std::move(opener)));
-  return source->FindLevels() && source->Describe(formatKey) ? std::move(source) : nullptr;
+  const bool isOwn = source->FindLevels() && source->Describe(formatKey) &&
+                     (company == Company::kNone || source->TakeSideFile());
+  return isOwn ? std::move(source) : nullptr;
 }
 
 bool Source::FindLevels() {
@@ -162,8 +152,9 @@ bool Source::FindLevels() {
     const bool isFirst = &directory == &directories.front();
     if (directory.contains(kGdalMetadata)) {
       std::string text;
-      hasStats_ = true;
-      if (!isFirst || !file_->ReadText(directory, kGdalMetadata, text) || !HoldsOnlyStats(text)) {
+      const auto bands = static_cast<unsigned>(file_->Number(directory, kSamplesPerPixel, 1));
+      if (!isFirst || !file_->ReadText(directory, kGdalMetadata, text) ||
+          !stored_.TakeTag(text, bands)) {
         return false;
       }
     }
@@ -196,12 +187,18 @@ bool Source::FindLevels() {
   return true;
 }
 
+/// Takes the values in the file beside this one; those in the file itself were taken before.
+bool Source::TakeSideFile() {
+  std::string text;
+  return ReadWhole(Path() + ".aux.xml", text) && stored_.TakeSideFile(text, def_.bands);
+}
+
 bool Source::Describe(const String& formatKey) {
   const Image& image = levels_.at(0);
   const Directory& directory = *image.directory;
   bool isRgb = false;
   const std::optional<bool> isCloudOptimised = IsCloudOptimised(*file_);
-  if (!FindMeaning(*file_, directory, image.bands, isRgb) || !isCloudOptimised ||
+  if (!FindMeaning(*file_, image, isRgb) || !isCloudOptimised ||
       !ReadNoData(*file_, image, noData_)) {
     return false;
   }
@@ -235,7 +232,14 @@ bool Source::Describe(const String& formatKey) {
     item(named.name, text, true);
   }
   structure("INTERLEAVE", image.byPixel ? "PIXEL" : "BAND");
-  if (const char* const word = WordOf(image.compression)) structure("COMPRESSION", word);
+  if (const char* const word = WordOf(image)) structure("COMPRESSION", word);
+  if (image.jpeg != nullptr) {
+    const std::optional<JpegTables> tables = FindJpegTables(*image.jpeg);
+    if (!tables) return false;
+    structure("JPEGTABLESMODE", std::to_string(tables->mode));
+    structure("JPEG_QUALITY", std::to_string(tables->quality));
+    if (image.jpeg->isYcc) structure("SOURCE_COLOR_SPACE", "YCbCr");
+  }
   if (image.predictor != 1) structure("PREDICTOR", std::to_string(image.predictor));
   if (*isCloudOptimised) structure("LAYOUT", "COG");
   const char* const colors[] = {"Red", "Green", "Blue"};

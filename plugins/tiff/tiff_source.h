@@ -4,6 +4,7 @@
 
 #include "data/data_connection.h"
 #include "raster/raster_def.h"
+#include "tiff/tiff_stats.h"
 #include "tiff/tiff_window.h"
 
 namespace lumo::tiff {
@@ -40,8 +41,8 @@ class Source {
 
   /// GDAL's connection, empty with the fault set when the file can't be opened so.
   RasterDataConnectionPtr Inner();
-  /// True when the file holds statistics, which GDAL's connection reads.
-  bool HasStats() const { return hasStats_; }
+  /// The values of its bands that GDAL stored.
+  const StoredItems& Stored() const { return stored_; }
   /// True once Inner was asked for.
   bool HasInner() const { return bool(inner_); }
 
@@ -50,6 +51,7 @@ class Source {
       : file_(std::move(file)), opener_(std::move(opener)) {}
   bool Describe(const String& formatKey);
   bool FindLevels();
+  bool TakeSideFile();
 
   const std::unique_ptr<File> file_;
   const Opener opener_;
@@ -57,7 +59,7 @@ class Source {
   std::optional<double> noData_;
   std::map<unsigned, Image> levels_;
   std::map<unsigned, std::unique_ptr<Window>> windows_;
-  bool hasStats_ = false;
+  StoredItems stored_;
   std::optional<bool> canWrite_;
   RasterDataConnectionPtr inner_;
 };

@@ -4,7 +4,7 @@
 #include <atomic>
 #include <cstring>
 
-#include "tasks/parallel.h"
+#include "tasks/crew.h"
 
 namespace lumo::tiff {
 namespace {
@@ -86,8 +86,11 @@ bool Window::DecodeBlock(std::uint64_t block, unsigned lines, unsigned char* out
   const std::size_t rowBytes = image_.RowBytes(), bytes = lines * rowBytes;
   thread_local std::vector<unsigned char> packed;
   if (packed.size() < packedBytes) packed.resize(packedBytes);
-  if (!file_.Handle().Read(offsets_[block], packed.data(), packedBytes) ||
-      !Decode(image_.compression, packed.data(), packedBytes, out, bytes)) {
+  if (!file_.Handle().Read(offsets_[block], packed.data(), packedBytes)) return false;
+  if (image_.jpeg != nullptr) {
+    return DecodeJpeg(*image_.jpeg, image_.blockWidth, lines, packed.data(), packedBytes, out);
+  }
+  if (!Decode(image_.compression, packed.data(), packedBytes, out, bytes)) {
     return false;
   }
   if (image_.predictor == 1) return true;
@@ -220,11 +223,7 @@ bool Window::Read(const Rect& rect, const Array<unsigned>& bands, unsigned char*
       if (!ReadPiece(pieces[i])) isRead = false;
     }
   };
-  if (tasks == 1) {
-    run(0);
-  } else {
-    ParallelFor(tasks, nullptr, run);
-  }
+  RunByCrew(tasks, run);
   return isRead;
 }
 

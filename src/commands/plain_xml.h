@@ -13,7 +13,7 @@ namespace lumo {
 /// Reads a document of elements, attributes and texts, and hands its events to `target`. False,
 /// with nothing handed over, for one that holds anything else or is not well formed.
 /// @param document  UTF-8.
-bool ReadPlainXml(std::string_view document, XMLSimpleParser& target);
+VEXG_EXPORT bool ReadPlainXml(std::string_view document, XMLSimpleParser& target);
 
 /// Writes a tree as XmlEngine::Write does. False for one with a character that is written in a way
 /// of its own, or a name beyond ASCII.

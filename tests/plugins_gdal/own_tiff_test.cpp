@@ -122,6 +122,17 @@ void ExpectSamePixels(RasterReader<T>& ours, RasterReader<T>& theirs, unsigned l
   }
 }
 
+/// Compares statistics by all that they hold, by their texts and beyond.
+template <typename T>
+void ExpectSameStats(const RasterBandStats<T>& ours, const RasterBandStats<T>& theirs) {
+  std::ostringstream own, other;
+  own << ours, other << theirs;
+  EXPECT_EQ(own.str(), other.str());
+  EXPECT_EQ(ours.mask, theirs.mask);
+  EXPECT_EQ(ours.band, theirs.band);
+  EXPECT_EQ(ours.pixelCount, theirs.pixelCount);
+}
+
 /// Compares a file both ways. @return whether the library reads it itself.
 bool ExpectSame(const std::string& path) {
   SCOPED_TRACE(path);
@@ -146,8 +157,11 @@ bool ExpectSame(const std::string& path) {
       EXPECT_EQ(own->HasNoDataValue(band), other->HasNoDataValue(band));
       EXPECT_EQ(own->HasPalette(band), other->HasPalette(band));
       EXPECT_EQ(own->StatsExist(band), other->StatsExist(band));
-      EXPECT_EQ(own->ReadStats(band).mask, other->ReadStats(band).mask);
-      EXPECT_EQ(own->ReadStats(band).mean, other->ReadStats(band).mean);
+      if constexpr (std::is_arithmetic_v<T>) {
+        ExpectSameStats(own->ReadStats(band), other->ReadStats(band));
+        const auto mine = own->Histogram(band), his = other->Histogram(band);
+        EXPECT_TRUE(std::equal(mine.begin(), mine.end(), his.begin(), his.end()));
+      }
     }
     for (int level = 0; level <= other->PyramidLevelMax(); ++level) {
       if (level == 0 || level >= other->PyramidLevelMin()) {
@@ -247,6 +261,37 @@ TEST(OwnTiff, IsReadAsGdalReadsIt) {
   EXPECT_GT(number, 100);
 }
 
+/// JPEG in its forms; the bands of each are grey, or colours that may be stored as such or not.
+TEST(OwnTiff, JpegIsDecodedAsByGdal) {
+  const test::TemporaryDirectory directory;
+  const std::vector<std::vector<std::string>> blocks = {
+      {"TILED=YES", "BLOCKXSIZE=64", "BLOCKYSIZE=32"}, {"BLOCKYSIZE=16"}, {"BLOCKYSIZE=149"}};
+  const std::vector<std::pair<unsigned, std::vector<std::string>>> forms = {
+      {1, {}},
+      {3, {"PHOTOMETRIC=YCBCR"}},
+      {3, {"PHOTOMETRIC=RGB"}},
+      {3, {"PHOTOMETRIC=MINISBLACK"}},
+      {5, {"INTERLEAVE=BAND", "PHOTOMETRIC=MINISBLACK"}},
+      {3, {"INTERLEAVE=BAND", "PHOTOMETRIC=RGB"}}};
+  int number = 0;
+  for (const auto& block : blocks) {
+    for (const auto& [bands, options] : forms) {
+      for (const char* const quality : {"JPEG_QUALITY=75", "JPEG_QUALITY=23", "JPEG_QUALITY=100"}) {
+        Layout layout{GDT_Byte, block, bands};
+        layout.options.insert(layout.options.end(), options.begin(), options.end());
+        layout.options.insert(layout.options.end(), {"COMPRESS=JPEG", quality});
+        layout.hasLevels = number % 3 == 0;
+        layout.noData = number % 4 == 1 ? "7" : nullptr;
+        const std::string path =
+            (directory.Path() / ("j" + std::to_string(number++) + "x.tif")).string();
+        Make(path, layout, number);
+        EXPECT_TRUE(ExpectSame(path))
+            << "GDAL had to read it: " << number << " " << bands << " " << quality;
+      }
+    }
+  }
+}
+
 /// Systems of all kinds: in feet and degrees, with other meridians, withdrawn ones.
 TEST(OwnTiff, SystemsOfTheRegistryAreThoseOfGdal) {
   GDALAllRegister();
@@ -278,6 +323,76 @@ TEST(OwnTiff, SystemsOfTheRegistryAreThoseOfGdal) {
   EXPECT_GT(own, all / 3);
 }
 
+/// Each case stores statistics in another way, or something that isn't statistics of all pixels.
+TEST(OwnTiff, StoredStatisticsAreThoseOfGdal) {
+  const test::TemporaryDirectory directory;
+  const auto set = [](GDALDatasetH file, const char* name, const char* text, int band = 2) {
+    GDALSetMetadataItem(GDALGetRasterBand(file, band), name, text, nullptr);
+  };
+  const auto compute = [](GDALDatasetH file, bool isApproximate) {
+    double n = 0;
+    GDALComputeRasterStatistics(GDALGetRasterBand(file, 1), isApproximate, &n, &n, &n, &n, nullptr,
+                                nullptr);
+  };
+  using Store = std::function<void(GDALDatasetH)>;
+  const struct {
+    const char* name;
+    bool isOwn;
+    Store store;
+  } cases[] = {
+      {"computed", true, [&](GDALDatasetH file) { compute(file, false); }},
+      {"approximate", true, [&](GDALDatasetH file) { compute(file, true); }},
+      {"some are missing", true, [&](GDALDatasetH file) { set(file, "STATISTICS_MEAN", "3"); }},
+      {"odd texts", true,
+       [&](GDALDatasetH file) {
+         compute(file, false);
+         set(file, "STATISTICS_MEAN", " +1e400 and more");
+         set(file, "STATISTICS_STDDEV", "-1.#IND");
+         set(file, "STATISTICS_MINIMUM", "  3.5");
+         set(file, "STATISTICS_MAXIMUM", "260");
+         set(file, "STATISTICS_APPROXIMATE", "Off");
+         set(file, "STATISTICS_VALID_PERCENT", "97.3");
+         set(file, "STATISTICS_MEAN", "7", 1);  // beside the others of this band
+       }},
+      {"marks in a text", true, [&](GDALDatasetH file) { set(file, "STATISTICS_MEAN", "<&>"); }},
+      {"another item", false, [&](GDALDatasetH file) { set(file, "SENSOR", "here"); }},
+      {"a scale", false,
+       [](GDALDatasetH file) { GDALSetRasterScale(GDALGetRasterBand(file, 1), 2); }},
+      {"a name", false,
+       [](GDALDatasetH file) { GDALSetDescription(GDALGetRasterBand(file, 1), "Red"); }},
+      {"a histogram", true,
+       [&](GDALDatasetH file) {
+         compute(file, false);
+         GUIntBig counts[] = {1, 2, 3};
+         GDALSetDefaultHistogramEx(GDALGetRasterBand(file, 2), -0.5, 2.5, 3, counts);
+       }},
+  };
+  int number = 0;
+  for (const GDALDataType type : {GDT_Byte, GDT_Int16, GDT_Float32}) {
+    for (const auto& each : cases) {
+      for (const int how : {0, 1, 2}) {  // beside the file, in the file, in both
+        SCOPED_TRACE(std::string(each.name) + " " + std::to_string(how));
+        const std::string path =
+            (directory.Path() / ("v" + std::to_string(number++) + "x.tif")).string();
+        const bool hasNoData = number % 3 == 0;
+        Make(path, {type, {}, 3, 32633, hasNoData ? "7" : nullptr}, number);
+        const auto store = [&](unsigned flags, const Store& body) {
+          GDALDatasetH const file = GDALOpenEx(path.c_str(), flags, nullptr, nullptr, nullptr);
+          body(file);
+          GDALClose(file);
+        };
+        if (how != 0) store(GDAL_OF_RASTER | GDAL_OF_UPDATE, each.store);
+        if (how == 2) {
+          store(GDAL_OF_RASTER, [&](GDALDatasetH file) { set(file, "STATISTICS_MAXIMUM", "9"); });
+        } else if (how == 0) {
+          store(GDAL_OF_RASTER, each.store);
+        }
+        EXPECT_EQ(ExpectSame(path), each.isOwn);
+      }
+    }
+  }
+}
+
 TEST(OwnTiff, LeavesToGdalWhatItDoesNotKnow) {
   const test::TemporaryDirectory directory;
   const auto path = [&](const char* name) { return (directory.Path() / name).string(); };
@@ -285,7 +400,7 @@ TEST(OwnTiff, LeavesToGdalWhatItDoesNotKnow) {
     Make(path(name), layout, 1);
     return ExpectSame(path(name));
   };
-  EXPECT_FALSE(isOwn("jpeg.tif", {GDT_Byte, {"COMPRESS=JPEG", "PHOTOMETRIC=YCBCR", "TILED=YES"}}));
+  EXPECT_FALSE(isOwn("cmyk.tif", {GDT_Byte, {"COMPRESS=JPEG", "PHOTOMETRIC=CMYK"}, 4}));
   EXPECT_FALSE(isOwn("packed.tif", {GDT_Byte, {"COMPRESS=PACKBITS"}}));
   EXPECT_FALSE(isOwn("bits.tif", {GDT_Byte, {"NBITS=4"}}));
   EXPECT_FALSE(isOwn("signed.tif", {GDT_Byte, {"PIXELTYPE=SIGNEDBYTE"}, 1}));
@@ -311,14 +426,41 @@ TEST(OwnTiff, LeavesToGdalWhatItDoesNotKnow) {
   }
 }
 
+/// Reads all of a damaged file both ways.
+template <typename T>
+void ExpectSameOutcome(const RasterDataConnectionPtr& ours, const RasterDataConnectionPtr& theirs) {
+  const RasterReaderPtr<T> own = test::ReaderOf<T>(ours), other = test::ReaderOf<T>(theirs);
+  ASSERT_EQ(bool(own), bool(other));
+  if (!own) return;
+  Array<unsigned> bands{ArrayDims(other->Bands())};
+  for (unsigned i = 0; i < bands.GetCount(); ++i) bands[i] = i;
+  const std::size_t count = std::size_t{other->Samples(0)} * other->Lines(0) * bands.GetCount();
+  if (count > 1 << 24) return;
+  std::vector<T> a(count), b(count);
+  std::vector<unsigned char> state(count);
+  const bool isOurs =
+      own->ReadPixels(0, 0, other->Samples(0), other->Lines(0), bands, 0, a.data(), state.data());
+  const String ourRead = TakeFault();
+  const bool isTheirs =
+      other->ReadPixels(0, 0, other->Samples(0), other->Lines(0), bands, 0, b.data(), state.data());
+  const String theirRead = TakeFault();
+  EXPECT_EQ(isOurs, isTheirs) << ourRead.ToUTF8() << " / " << theirRead.ToUTF8();
+  if (isOurs && isTheirs) {
+    EXPECT_EQ(a, b);
+  } else if (!isOurs && !isTheirs) {
+    EXPECT_EQ(ourRead, theirRead);
+  }
+}
+
 TEST(OwnTiff, DamageIsWhatGdalSaysOfIt) {
   const test::TemporaryDirectory directory;
   const std::string path = (directory.Path() / "damaged.tif").string();
-  for (const char* const codec : {"NONE", "DEFLATE", "LZW", "ZSTD"}) {
+  for (const char* const codec : {"NONE", "DEFLATE", "LZW", "ZSTD", "JPEG"}) {
     for (int seed = 0; seed < 12; ++seed) {
+      const bool isJpeg = std::string(codec) == "JPEG";
       Make(
           path,
-          {GDT_UInt16,
+          {isJpeg ? GDT_Byte : GDT_UInt16,
            {std::string("COMPRESS=").append(codec), "TILED=YES", "BLOCKXSIZE=64", "BLOCKYSIZE=64"}},
           seed);
       const auto size = static_cast<unsigned>(fs::file_size(path));
@@ -339,27 +481,10 @@ TEST(OwnTiff, DamageIsWhatGdalSaysOfIt) {
       const String theirFault = TakeFault();
       ASSERT_EQ(bool(ours), bool(theirs));
       EXPECT_EQ(ourFault, theirFault);
-      const RasterReaderPtr<std::uint16_t> own = test::ReaderOf<std::uint16_t>(ours),
-                                           other = test::ReaderOf<std::uint16_t>(theirs);
-      ASSERT_EQ(bool(own), bool(other));
-      if (!own) continue;
-      Array<unsigned> bands{ArrayDims(other->Bands())};
-      for (unsigned i = 0; i < bands.GetCount(); ++i) bands[i] = i;
-      const std::size_t count = std::size_t{other->Samples(0)} * other->Lines(0) * bands.GetCount();
-      if (count > 1 << 24) continue;
-      std::vector<std::uint16_t> a(count), b(count);
-      std::vector<unsigned char> state(count);
-      const bool isOurs = own->ReadPixels(0, 0, other->Samples(0), other->Lines(0), bands, 0,
-                                          a.data(), state.data());
-      const String ourRead = TakeFault();
-      const bool isTheirs = other->ReadPixels(0, 0, other->Samples(0), other->Lines(0), bands, 0,
-                                              b.data(), state.data());
-      const String theirRead = TakeFault();
-      EXPECT_EQ(isOurs, isTheirs) << ourRead.ToUTF8() << " / " << theirRead.ToUTF8();
-      if (isOurs && isTheirs) {
-        EXPECT_EQ(a, b);
-      } else if (!isOurs && !isTheirs) {
-        EXPECT_EQ(ourRead, theirRead);
+      if (isJpeg) {
+        ExpectSameOutcome<std::uint8_t>(ours, theirs);
+      } else {
+        ExpectSameOutcome<std::uint16_t>(ours, theirs);
       }
     }
   }

@@ -2,6 +2,7 @@
 #include <cmath>
 #include <filesystem>
 #include <gdal_alg.h>
+#include <random>
 #include <set>
 #include <thread>
 
@@ -295,6 +296,68 @@ TEST(GdalReading, ServesManyThreadsAtOnce) {
   }
   threads.clear();
   EXPECT_EQ(wrong, 0);
+}
+
+/// Blocks that several handles decode at once: in the order of the file, as statistics ask for
+/// them, and anywhere; of sides that are no multiples of the blocks.
+TEST(GdalReading, SeveralHandlesGiveTheSamePixels) {
+  const test::TemporaryDirectory directory;
+  constexpr int kWidth = 700, kHeight = 413, kBands = 3;
+  const struct {
+    const char* driver;
+    GDALDataType type;
+    std::vector<std::string> options;
+  } files[] = {
+      {"JP2OpenJPEG",
+       GDT_UInt16,
+       {"BLOCKXSIZE=128", "BLOCKYSIZE=128", "QUALITY=100", "REVERSIBLE=YES"}},
+      {"GTiff", GDT_Byte, {"COMPRESS=PACKBITS", "TILED=YES", "BLOCKXSIZE=128", "BLOCKYSIZE=128"}},
+      {"GTiff", GDT_UInt16, {"COMPRESS=DEFLATE", "INTERLEAVE=BAND", "ENDIANNESS=BIG"}},
+      {"GTiff", GDT_Int16, {"COMPRESS=LZW", "INTERLEAVE=PIXEL", "ENDIANNESS=BIG", "BLOCKYSIZE=20"}},
+  };
+  std::mt19937 random(9);
+  for (const auto& file : files) {
+    SCOPED_TRACE(file.driver + file.options.front());
+    const std::string path = (directory.Path() / (file.driver + file.options.front())).string();
+    {
+      GDALAllRegister();
+      const std::unique_ptr<void, decltype(&GDALClose)> memory(
+          GDALCreate(GDALGetDriverByName("MEM"), "", kWidth, kHeight, kBands, file.type, nullptr),
+          &GDALClose);
+      std::vector<unsigned short> values(std::size_t{kWidth} * kHeight);
+      for (int band = 1; band <= kBands; ++band) {
+        for (unsigned short& value : values) value = static_cast<unsigned short>(random() % 250);
+        ASSERT_EQ(GDALRasterIO(GDALGetRasterBand(memory.get(), band), GF_Write, 0, 0, kWidth,
+                               kHeight, values.data(), kWidth, kHeight, GDT_UInt16, 0, 0),
+                  CE_None);
+      }
+      CPLStringList options;
+      for (const std::string& option : file.options) options.AddString(option.c_str());
+      GDALClose(GDALCreateCopy(GDALGetDriverByName(file.driver), path.c_str(), memory.get(), FALSE,
+                               options.List(), nullptr, nullptr));
+    }
+    const Peer peer(path);
+    ASSERT_TRUE(peer);
+    const PeerLevel want(peer, -1);
+    const auto source = OpenSource({path});
+    const bool hasType = test::WithType(source, [&]<typename T>(RasterReader<T>& reader) {
+      for (const unsigned side : {128U, 300U}) {
+        for (unsigned top = 0; top < kHeight; top += side) {
+          for (unsigned left = 0; left < kWidth; left += side) {
+            const unsigned right = std::min(left + side, 700U), bottom = std::min(top + side, 413U);
+            ExpectPeersBlock(reader, want, 0,
+                             Block<T>{{left, top, right - 1, bottom - 1}, {0, 1, 2}, {}, {}});
+          }
+        }
+      }
+      for (int i = 0; i < 30; ++i) {
+        const unsigned left = random() % 500, top = random() % 250;
+        const unsigned right = left + 130 + random() % 70, bottom = top + 126 + random() % 36;
+        ExpectPeersBlock(reader, want, 0, Block<T>{{left, top, right, bottom}, {2, 0}, {}, {}});
+      }
+    });
+    EXPECT_TRUE(hasType);
+  }
 }
 
 }  // namespace
