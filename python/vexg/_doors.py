@@ -14,11 +14,16 @@ class LocalDoor:
     def run(self, draft, task=None):
         """Runs a job; gives its Results. Raises Error for the first step that failed, or where the
         task was aborted."""
-        abort, progress = (task.abort, task.progress) if task is not None else (None, None)
-        document = library.run(draft.write(), abort, progress)
-        if task is not None and task.is_aborted:
+        return Results(self.run_document(draft.write(), task), draft)
+
+    def run_document(self, document, task=None):
+        """Runs a job document, and gives the result document."""
+        if task is None:
+            return library.run(document)
+        result = library.run(document, task.abort, task.progress)
+        if task.is_aborted:
             raise Error("aborted")
-        return Results(document, draft)
+        return result
 
     def describe(self, node):
         """The description of a raster, as docs/c-door.md tells it."""
@@ -29,10 +34,8 @@ class LocalDoor:
 
     def _explain(self, node):
         """The failure of a chain, with the command that failed."""
-        draft = Draft()
-        draft.open(node)
         try:
-            self.run(draft)
+            Results(library.run(Draft().write([node])), Draft())
         except Error as failure:
             return failure
         return Error("the raster could not be opened")

@@ -23,9 +23,11 @@ class Node:
         command: the class of the command.
         inputs: a tuple of (name, value); a value is a text, a Node or a tuple of Nodes.
         output: the output that gives the raster.
+        keep: the Workspace of its file; None for none.
+        recipe: the Drafts that made its file, in their order.
     """
 
-    __slots__ = ("command", "inputs", "output", "__weakref__", "_document")
+    __slots__ = ("command", "inputs", "output", "keep", "recipe", "__weakref__", "_document")
     _known = weakref.WeakValueDictionary()
     _lock = threading.Lock()
 
@@ -36,7 +38,7 @@ class Node:
             if node is None:
                 node = super().__new__(cls)
                 node.command, node.inputs, node.output = key
-                node._document = None
+                node.keep, node.recipe, node._document = None, (), None
                 cls._known[key] = node
         return node
 
@@ -74,9 +76,7 @@ class Node:
     def document(self):
         """The job document that names the raster, in UTF-8."""
         if self._document is None:
-            draft = Draft()
-            draft.open(self)
-            self._document = draft.write(False).encode()
+            self._document = Draft().write([self], closes=False).encode()
         return self._document
 
     def with_sources(self, change):
@@ -155,20 +155,75 @@ def _as_block(array):
 
 class Draft:
     """A job document in the making. Its steps run one after the other, each whatever became of those
-    before it, and what it opens is closed at its end."""
+    before it, and what they open is closed at its end.
+
+    Attributes:
+        steps: tuples of name, command, inputs and outputs.
+    """
 
     def __init__(self):
-        self._steps = []  # (name, command, text)
-        self._opened = {}  # variables by node
-        self._commands = {}  # classes by the names of steps
+        self.steps = []
 
     def step(self, name, command, inputs, outputs=None):
         """Adds a command.
 
         Args:
-            inputs: a dictionary of values; None leaves an input out, and a Node is opened first.
+            inputs: a dictionary of values; None leaves an input out, a Node is opened first, and a text
+                that begins with a dollar sign is a variable.
             outputs: a dictionary from outputs to variables, without the dollar sign.
         """
+        self.steps.append((name, command, dict(inputs), dict(outputs or {})))
+
+    def extend(self, other, prefix):
+        """Adds the steps of another draft, whose names and variables get a prefix."""
+        def renamed(value):
+            return f"${prefix}{value[1:]}" if isinstance(value, str) and value.startswith("$") else value
+
+        for name, command, inputs, outputs in other.steps:
+            self.steps.append((prefix + name, command, {key: renamed(value) for key, value in inputs.items()},
+                               {key: prefix + variable for key, variable in outputs.items()}))
+
+    def nodes(self):
+        """The nodes that its steps work on."""
+        for _, _, inputs, _ in self.steps:
+            for value in inputs.values():
+                if isinstance(value, Node):
+                    yield value
+                elif isinstance(value, (tuple, list)):
+                    yield from (each for each in value if isinstance(each, Node))
+
+    def write(self, opened=(), closes=True, channel=""):
+        """The document.
+
+        Args:
+            opened: nodes that are opened behind the steps.
+            closes: whether what was opened is closed at the end.
+            channel: the element of a channel, for a server.
+        """
+        writer = _Writer()
+        for step in self.steps:
+            writer.add(*step)
+        for node in opened:
+            writer.open(node)
+        if closes:
+            writer.close()
+        return f'<Job Checks="Strict"><Reasons/>{channel}{"".join(writer.commands)}</Job>'
+
+    def command_of(self, step):
+        """The class of the command of a step; empty for one that opens or closes."""
+        return next((command for name, command, _, _ in self.steps if name == step), "")
+
+
+class _Writer:
+    """Writes the commands of a document."""
+
+    def __init__(self):
+        self.commands = []
+        self._last = None
+        self._opened = {}  # variables by node
+
+    def add(self, name, command, inputs, outputs):
+        """Adds a command, behind those that open what it works on."""
         parts, kinds = [], None
         for key, value in inputs.items():
             if value is None:
@@ -177,51 +232,32 @@ class Draft:
                 parts.append(f'<Input {key}="{self.open(value)}"/>')
                 continue
             if isinstance(value, (tuple, list)) and value and isinstance(value[0], Node):
-                variables = " ".join(self.open(node) for node in value)
+                variables = " ".join([self.open(node) for node in value])
                 parts.append(f'<Input expand="1" {key}="{variables}"/>')
                 continue
             if not isinstance(value, str):
                 kinds = kinds if kinds is not None else input_kinds(command)
                 value = _values.text_of(value, kinds.get(key, ""))
             parts.append(f'<Input {key}="{_values.escape(value)}"/>')
-        for key, variable in (outputs or {}).items():
+        for key, variable in outputs.items():
             parts.append(f'<Output {key}="${variable}"/>')
-        depends = f'<DependsOn Name="{self._steps[-1]}"/>' if self._steps else ""
-        self._steps.append(name)
-        self._commands[name] = (
-            command, f'<Command Name="{name}" ID="{command}">{depends}{"".join(parts)}</Command>')
-        return name
+        depends = f'<DependsOn Name="{self._last}"/>' if self._last is not None else ""
+        self.commands.append(f'<Command Name="{name}" ID="{command}">{depends}{"".join(parts)}</Command>')
+        self._last = name
 
     def open(self, node):
         """Adds the commands that open a chain; gives the variable of its raster."""
         for each in node.everything():
-            if each in self._opened:
-                continue
-            name = f"n{len(self._opened)}"
-            self.step(name, each.command, dict(each.inputs), {each.output: name})
-            self._opened[each] = f"${name}"
+            if each not in self._opened:
+                name = f"n{len(self._opened)}"
+                self.add(f"{name}.{each.command}", each.command, dict(each.inputs), {each.output: name})
+                self._opened[each] = f"${name}"
         return self._opened[node]
 
-    def close_opened(self):
+    def close(self):
         """Adds the commands that close all that was opened, the last one first."""
-        for variable in reversed(list(self._opened.values())):
-            self.step("close." + variable[1:], "CloseRasterCommand", {"URI": variable})
-
-    def write(self, closes=True, channel=""):
-        """The document.
-
-        Args:
-            closes: whether what was opened is closed at the end.
-            channel: the element of a channel, for a server.
-        """
-        if closes:
-            self.close_opened()
-        body = "".join(text for _, text in self._commands.values())
-        return f'<Job Checks="Strict"><Reasons/>{channel}{body}</Job>'
-
-    def command_of(self, step):
-        """The class of the command of a step."""
-        return self._commands.get(step, ("", ""))[0]
+        for variable in reversed(self._opened.values()):
+            self.add("close." + variable[1:], "CloseRasterCommand", {"URI": variable}, {})
 
 
 class Results:
@@ -243,7 +279,7 @@ class Results:
             reason = command.get("Reason", "aborted" if result == "Aborted" else "failed")
             # What is skipped failed for the failure of another one, which stands before it.
             if failed is None:
-                failed = Error(reason, draft.command_of(name), name)
+                failed = Error(reason, draft.command_of(name) or name.partition(".")[2], name)
         if failed is not None:
             raise failed
 

@@ -1,7 +1,6 @@
 """Tables: pandas where it is installed, else plain lists."""
 
 import csv
-import sqlite3
 import struct
 
 import numpy
@@ -88,53 +87,6 @@ def _fields(head, is_byte):
     return [*fields[:4], value]
 
 
-class Layer:
-    """A layer of a GeoPackage file, which is read with what Python brings.
-
-    Attributes:
-        wkb: the shapes of the records as WKB, in their order.
-        columns: the other fields by name.
-        crs: the coordinate system as WKT; None for none.
-    """
-
-    def __init__(self, file):
-        connection = sqlite3.connect(f"file:{file}?mode=ro", uri=True)
-        try:
-            self._read(connection)
-        except sqlite3.Error as fault:
-            raise Error(f"{file}: {fault}") from None
-        finally:
-            connection.close()
-
-    def _read(self, connection):
-        name, geometry, system = connection.execute(
-            "SELECT table_name, column_name, srs_id FROM gpkg_geometry_columns").fetchone()
-        row = connection.execute(
-            "SELECT definition, organization, organization_coordsys_id FROM gpkg_spatial_ref_sys WHERE srs_id = ?",
-            (system,)).fetchone()
-        self.crs = None
-        if row is not None and system > 0:
-            self.crs = f"{row[1]}:{row[2]}" if row[1].upper() == "EPSG" else row[0]
-        quoted = name.replace('"', '""')
-        key = [column[1] for column in connection.execute(f'PRAGMA table_info("{quoted}")') if column[5]]
-        cursor = connection.execute(f'SELECT * FROM "{quoted}"')
-        names = [column[0] for column in cursor.description]
-        rows = cursor.fetchall()
-        by_name = dict(zip(names, zip(*rows))) if rows else {column: () for column in names}
-        self.wkb = [_wkb_of(blob) for blob in by_name.pop(geometry)]
-        for column in key:
-            by_name.pop(column, None)
-        self.columns = {column: list(values) for column, values in by_name.items()}
-
-
-def _wkb_of(blob):
-    """The WKB behind the header of a shape of a GeoPackage (OGC 12-128r17, clause 2.1.3)."""
-    if blob is None:
-        return None
-    envelope = (0, 32, 48, 48, 64)[(blob[3] >> 1) & 7]
-    return blob[8 + envelope:]
-
-
 def coordinates_of(wkb):
     """The type and the coordinates of a WKB shape, as GeoJSON has them."""
     shape, _ = _read_shape(wkb, 0)
@@ -181,12 +133,20 @@ def _read_shape(wkb, at):
     raise Error(f"shapes of kind {kind} can't be read")
 
 
-def geo_table(layer):
-    """A GeoDataFrame of a layer where geopandas is installed; else a DataFrame with a column of WKB, or
-    a list of dictionaries."""
+def geo_table(columns, wkb, crs):
+    """A GeoDataFrame of columns and shapes where geopandas is installed; else a DataFrame with a column of
+    WKB, or a list of dictionaries."""
     try:
         import geopandas
     except ImportError:
-        return table({**layer.columns, "geometry": layer.wkb}, None)
-    shapes = geopandas.GeoSeries.from_wkb(layer.wkb, crs=layer.crs)
-    return geopandas.GeoDataFrame(layer.columns, geometry=shapes)
+        return table({**columns, "geometry": wkb}, None)
+    shapes = geopandas.GeoSeries.from_wkb(wkb, crs=crs)
+    return geopandas.GeoDataFrame(columns, geometry=shapes)
+
+
+def labelled(labels, columns):
+    """A DataFrame of columns indexed by labels, or a list of dictionaries."""
+    pandas = _pandas()
+    if pandas is None:
+        return table({"label": labels.tolist(), **{name: values.tolist() for name, values in columns.items()}}, None)
+    return pandas.DataFrame(columns, index=pandas.Index(labels, name="label"))

@@ -126,7 +126,9 @@ class Raster(_formula.Arithmetic):
     @property
     def nodata_values(self):
         """The no-data value of each band; None for one that has none."""
-        return [float(value) if isinstance(value, str) else value for value in self._describe()["noData"]]
+        is_whole = self.dtype.kind in "iu"
+        return [None if value is None else int(value) if is_whole and value == int(value) else float(value)
+                for value in self._describe()["noData"]]
 
     @property
     def names(self):
