@@ -10,6 +10,7 @@ command gives stays open until CloseRasterCommand closes it. `commands.pyi` has 
 what they mean; docs/commands.md for people.
 """
 
+from . import _values
 from ._doors import job_node, local
 from ._jobs import Draft, declarations
 from ._watch import watch
@@ -36,7 +37,11 @@ def run(command, *, server=None, progress=False, **inputs):
     if missing:
         raise TypeError(f"{command} needs {', '.join(missing)}")
 
-    def opened(value):
+    kinds = {entry["name"]: entry["kind"] for entry in known["inputs"]}
+
+    def opened(name, value):
+        if kinds[name] == "URI" and isinstance(value, str) and not value.startswith("["):
+            return _values.uri_text(value)
         if isinstance(value, Raster):
             return job_node(value._chain())
         if isinstance(value, (list, tuple)) and value and isinstance(value[0], Raster):
@@ -44,7 +49,7 @@ def run(command, *, server=None, progress=False, **inputs):
         return value
 
     draft = Draft()
-    draft.step("command", command, {name: opened(value) for name, value in inputs.items()})
+    draft.step("command", command, {name: opened(name, value) for name, value in inputs.items()})
     door = local if server is None else server._door
     return watch(lambda task: door.run(draft, task), progress, command).values("command")
 

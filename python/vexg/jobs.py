@@ -44,7 +44,8 @@ class Job:
         self._draft = draft
         self.document = draft.write([] if output is not None else [node], closes=output is not None)
         for workspace in workspaces:
-            self.document = self.document.replace(workspace.folder, os.path.abspath(os.fspath(folder)))
+            place = os.path.join(os.path.abspath(os.fspath(folder)), os.path.basename(workspace.folder))
+            self.document = self.document.replace(workspace.folder + "/", place + ".")
 
     def _collect(self, node, draft, workspaces, done):
         """Adds the jobs that made the files that a chain stands on, each once."""

@@ -1,24 +1,21 @@
 """Rasters: sources and views, which read nothing until somebody asks for pixels."""
 
 import math
-import operator
+import os
 
 import numpy
 
 from . import _formula, _values
+from ._description import Described
 from ._doors import job_node, local
 from ._jobs import ArrayNode, Draft, Node, files_of, source_node
+from ._pixels import Pixels
+from ._views import Views
 from ._watch import watch
 from .errors import Error
 
-_ORDERS = {"BIP": 0, "BIL": 1, "BSQ": 2}
-_AXES = {0: (1, 2, 0), 1: (1, 0, 2), 2: (0, 1, 2)}  # memory's axes among bands, lines, samples
-_BACK = {0: (2, 0, 1), 1: (1, 0, 2), 2: (0, 1, 2)}  # bands, lines, samples among memory's axes
-_SMALL = 8 << 20  # bytes that are read at once, without a look at interrupts
-_NOT_VALID = 7  # the bits of a state byte
 
-
-class Raster(_formula.Arithmetic):
+class Raster(Described, Pixels, Views, _formula.Arithmetic):
     """A raster of bands, lines and samples: a source, or a view on others.
 
     Making one reads no pixels, and costs nothing but its checks. `shape`, `dtype` and so on are
@@ -38,8 +35,6 @@ class Raster(_formula.Arithmetic):
         self._info = None
         self._is_closed = False
 
-    # Making ------------------------------------------------------------------------------------
-
     def _chain(self):
         """The node of the raster, which a formula makes at its first use."""
         if self._is_closed:
@@ -50,7 +45,11 @@ class Raster(_formula.Arithmetic):
         """The raster that a command shows of this one."""
         inputs = (("SrcURI", self._chain()),) + tuple(
             (name, _values.text_of(value)) for name, value in inputs.items() if value is not None)
-        return Raster(Node(command, inputs, output), self._door)
+        return self._shown(Node(command, inputs, output))
+
+    def _shown(self, node):
+        """The raster of a node at the same door."""
+        return Raster(node, self._door)
 
     def _describe(self):
         if self._info is None:
@@ -69,186 +68,6 @@ class Raster(_formula.Arithmetic):
     def __exit__(self, *_):
         self.close()
 
-    # What it is --------------------------------------------------------------------------------
-
-    @property
-    def shape(self):
-        """Bands, lines and samples."""
-        info = self._describe()
-        return info["bands"], info["lines"], info["samples"]
-
-    @property
-    def dtype(self):
-        """The numpy type of the pixels."""
-        return _values.DTYPES[self._describe()["type"]]
-
-    ndim = 3
-
-    @property
-    def size(self):
-        """How many values there are."""
-        bands, lines, samples = self.shape
-        return bands * lines * samples
-
-    @property
-    def nbytes(self):
-        """Their bytes."""
-        return self.size * self.dtype.itemsize
-
-    def __len__(self):
-        return self.shape[0]
-
-    @property
-    def count(self):
-        """How many bands there are."""
-        return self.shape[0]
-
-    @property
-    def height(self):
-        """How many lines there are."""
-        return self.shape[1]
-
-    @property
-    def width(self):
-        """How many samples a line has."""
-        return self.shape[2]
-
-    @property
-    def format(self):
-        """The key of the format of the source."""
-        return self._describe()["format"]
-
-    @property
-    def nodata(self):
-        """The no-data value of the first band; None when it has none."""
-        return self.nodata_values[0]
-
-    @property
-    def nodata_values(self):
-        """The no-data value of each band; None for one that has none."""
-        is_whole = self.dtype.kind in "iu"
-        return [None if value is None else int(value) if is_whole and value == int(value) else float(value)
-                for value in self._describe()["noData"]]
-
-    @property
-    def names(self):
-        """The names of the bands; "" for one without."""
-        details = self._describe()["details"]
-        return [details.get(f"Bands/{band}/Description", "") for band in range(self.count)]
-
-    @property
-    def details(self):
-        """All that is known beside size, type and place, by paths such as "Bands/0/Unit"."""
-        return dict(self._describe()["details"])
-
-    @property
-    def categories(self):
-        """The names of the values of the first band from 0 on; an empty list for none."""
-        text = self._describe()["details"].get("Bands/0/Categories", "")
-        return text.split("\n") if text else []
-
-    @property
-    def colormap(self):
-        """The colours of the values of the first band as an array of red, green, blue and alpha; None
-        when it has none."""
-        palette = self._describe()["palettes"][0]
-        return None if palette is None else numpy.array(palette, dtype="uint8")
-
-    @property
-    def transform(self):
-        """The six numbers of the grid in the order of rasterio's Affine, (a, b, c, d, e, f): x = a *
-        sample + b * line + c, y = d * sample + e * line + f; None without a plain grid."""
-        grid = self._grid()
-        return None if grid is None else (grid[1], grid[2], grid[0], grid[4], grid[5], grid[3])
-
-    def _grid(self):
-        reference = self._describe()["geoRef"]
-        return None if reference is None else reference["transform"]
-
-    @property
-    def crs(self):
-        """The coordinate system: "EPSG:n" where it has a number, else WKT; None without."""
-        reference = self._describe()["geoRef"]
-        if reference is None or reference["crs"] is None:
-            return None
-        return f"EPSG:{reference['epsg']}" if reference["epsg"] else reference["crs"]
-
-    @property
-    def crs_wkt(self):
-        """The coordinate system as WKT 2; None without."""
-        reference = self._describe()["geoRef"]
-        return None if reference is None else reference["crs"]
-
-    @property
-    def bounds(self):
-        """Left, bottom, right and top on the map, as a grid with north up has them; of a turned grid
-        the box around it. None without a plain grid."""
-        corners = self._corners()
-        if corners is None:
-            return None
-        return tuple(corners.min(axis=0)) + tuple(corners.max(axis=0))
-
-    def _corners(self):
-        grid = self._grid()
-        if grid is None:
-            return None
-        x0, xx, xy, y0, yx, yy = grid
-        _, lines, samples = self.shape
-        ends = numpy.array([(0, 0), (samples, 0), (samples, lines), (0, lines)], dtype=float)
-        return numpy.stack([x0 + xx * ends[:, 0] + xy * ends[:, 1],
-                            y0 + yx * ends[:, 0] + yy * ends[:, 1]], axis=1)
-
-    @property
-    def levels(self):
-        """The numbers of the reduced levels that can be read: a level halves the one before."""
-        pyramid = self._describe()["pyramid"]
-        return [] if pyramid is None else list(range(max(pyramid["min"], 1), pyramid["max"] + 1))
-
-    @property
-    def files(self):
-        """The files that it stands on."""
-        return files_of(self._chain())
-
-    @property
-    def __geo_interface__(self):
-        """The outline as a GeoJSON feature, in the raster's own coordinate system."""
-        corners = self._corners()
-        if corners is None:
-            raise Error("the raster has no plain grid")
-        ring = [tuple(corner) for corner in corners.tolist()]
-        properties = {"crs": self.crs, "bands": self.count, "dtype": str(self.dtype)}
-        return {"type": "Feature", "properties": properties, "bbox": list(self.bounds),
-                "geometry": {"type": "Polygon", "coordinates": [ring + ring[:1]]}}
-
-    def __repr__(self):
-        if self._is_closed:
-            return "<vexg.Raster, closed>"
-        try:
-            bands, lines, samples = self.shape
-            where = f", {self.crs}" if self.crs else ""
-            return f"<vexg.{type(self).__name__} {bands} x {lines} x {samples} {self.dtype}{where}>"
-        except Error as failure:
-            return f"<vexg.{type(self).__name__}: {failure}>"
-
-    def _repr_html_(self):
-        from . import _display
-
-        return _display.html_of(self)
-
-    def quicklook(self, size=512, bands=None, stretch=(2, 98)):
-        """A picture of it as the bytes of a PNG.
-
-        Args:
-            size: pixels of the longer side at most.
-            bands: one, or three for red, green and blue; by default those that look natural.
-            stretch: the percentiles of the values shown that become black and white.
-        """
-        from . import _display
-
-        return _display.png_of(self, size, bands, stretch)
-
-    # Values ------------------------------------------------------------------------------------
-
     def __getstate__(self):
         return {"_node": self._chain(), "_door": self._door, "_info": None, "_is_closed": False}
 
@@ -256,8 +75,6 @@ class Raster(_formula.Arithmetic):
         self.__dict__.update(state)
 
     def __dask_tokenize__(self):
-        import os
-
         stamps = []
         for file in files_of(self._chain()):
             try:
@@ -266,402 +83,6 @@ class Raster(_formula.Arithmetic):
             except OSError:
                 stamps.append((file,))
         return type(self).__name__, self._chain().document(), tuple(stamps)
-
-    # Pixels ------------------------------------------------------------------------------------
-
-    def read(self, bands=None, window=None, *, out=None, masked=False, order=None, progress=False):
-        """Reads pixels into a numpy array.
-
-        Args:
-            bands: a number, for an array of lines and samples, or several, in the order wanted; all
-                by default.
-            window: ((first line, end line), (first sample, end sample)), two slices, or a Window of
-                rasterio; all by default.
-            out: an array that gets the pixels, of the right shape and the raster's dtype.
-            masked: True for a masked array, whose mask tells the pixels that are not valid: those of
-                a no-data value, a mask or outside a region.
-            order: of the axes in memory. By default that of the source, which costs least: the
-                array is a transposed view where that isn't bands first. "C" for a plain array.
-            progress: True for a bar, or a function that gets the fraction done.
-        """
-        info = self._describe()
-        numbers, is_one = self._bands_of(bands, info["bands"])
-        left, top, right, bottom = rect_of(window, info["lines"], info["samples"])
-        shape = (len(numbers), bottom - top + 1, right - left + 1)
-        dtype = _values.DTYPES[info["type"]]
-        pixels, memory, copy_to = self._memory_for(shape, dtype, out, order, info, is_one)
-        states = numpy.empty(_shape_in(shape, memory), dtype="uint8") if masked else None
-        self._fill((left, top, right, bottom), numbers, memory, info["code"], pixels, states, progress)
-        array = pixels.transpose(_BACK[memory])
-        if copy_to is not None:
-            copy_to[...] = array[0] if is_one and copy_to.ndim == 2 else array
-            array = copy_to if copy_to.ndim == 3 else copy_to[None]
-        if masked:
-            array = self._masked(array, states.transpose(_BACK[memory]))
-        if out is not None and not masked:
-            return out
-        return array[0] if is_one else array
-
-    def _fill(self, rect, numbers, memory, code, pixels, states, progress):
-        node = self._chain()
-
-        def fill(task):
-            self._door.read(node, rect, numbers, memory, code, pixels, states, task)
-
-        if pixels.nbytes <= _SMALL and not progress:
-            fill(None)
-        else:
-            watch(fill, progress, "reading")
-
-    @staticmethod
-    def _memory_for(shape, dtype, out, order, info, is_one):
-        """The array to fill with its axes as in memory, their order, and the array that gets a copy
-        of it in the end, or None."""
-        if order not in (None, "C", "BSQ", "BIL", "BIP"):
-            raise ValueError(f"order is None, \"C\", \"BSQ\", \"BIL\" or \"BIP\", and not {order!r}")
-        memory = _ORDERS.get("BSQ" if order == "C" else order or info["interleave"], 2)
-        if shape[0] == 1:
-            memory = 2
-        if out is None:
-            return numpy.empty(_shape_in(shape, memory), dtype=dtype), memory, None
-        wanted = shape[1:] if is_one and out.ndim == 2 else shape
-        if out.shape != wanted:
-            raise ValueError(f"out has the shape {out.shape}, and the pixels have {wanted}")
-        if out.dtype != dtype:
-            raise TypeError(f"out has the dtype {out.dtype}, and the pixels have {dtype}")
-        if not out.flags.writeable:
-            raise ValueError("out can't be written")
-        whole = out if out.ndim == 3 else out[None]
-        for memory in (memory, 2, 0, 1):
-            block = whole.transpose(_AXES[memory])
-            if block.flags.c_contiguous and out.dtype.isnative:
-                return block, memory, None
-        return numpy.empty(_shape_in(shape, memory), dtype=dtype), memory, out
-
-    def _masked(self, array, states):
-        values = self.nodata_values
-        result = numpy.ma.masked_array(array, (states & _NOT_VALID) != 0)
-        if values and values[0] is not None:
-            result.fill_value = values[0]
-        return result
-
-    @staticmethod
-    def _bands_of(bands, count):
-        """The bands as an array, and whether one was named by itself."""
-        if bands is None:
-            return numpy.arange(count, dtype="uint32"), False
-        is_one = isinstance(bands, (int, numpy.integer))
-        numbers = [bands] if is_one else list(bands)
-        if not numbers:
-            raise ValueError("bands names none")
-        checked = [operator.index(number) for number in numbers]
-        for number in checked:
-            if not -count <= number < count:
-                raise IndexError(f"there is no band {number}; the raster has {count}, from 0")
-        return numpy.array([number % count for number in checked], dtype="uint32"), is_one
-
-    def __array__(self, dtype=None):
-        array = self.read(order="C")
-        return array if dtype is None else array.astype(dtype, copy=False)
-
-    def __getitem__(self, key):
-        """Bands alone give a view: scene[0], scene[[2, 1, 0]], scene[1:3]. With lines and samples the
-        pixels are read: scene[0, :512, ::8], as of a numpy array. Steps are taken from a level of
-        the pyramid that holds just these pixels, where there is one."""
-        if key is Ellipsis:
-            return self.read()
-        if not isinstance(key, tuple):
-            return self.bands(*self._chosen_bands(key))
-        if Ellipsis in [part for part in key if part is Ellipsis]:
-            at = next(i for i, part in enumerate(key) if part is Ellipsis)
-            key = key[:at] + (slice(None),) * (4 - len(key)) + key[at + 1:]
-        if len(key) > 3:
-            raise IndexError("a raster has three axes: bands, lines and samples")
-        key = key + (slice(None),) * (3 - len(key))
-        bands, lines, samples = self.shape
-        rows, has_rows = _range_of(key[1], lines, "line")
-        columns, has_columns = _range_of(key[2], samples, "sample")
-        numbers = self._chosen_bands(key[0])
-        if not numbers or not rows or not columns:
-            array = numpy.empty((len(numbers), len(rows), len(columns)), dtype=self.dtype)
-        else:
-            array = self._strided(numbers, rows, columns)
-        is_band = isinstance(key[0], (int, numpy.integer))
-        return array[(0 if is_band else slice(None), slice(None) if has_rows else 0,
-                      slice(None) if has_columns else 0)]
-
-    def _chosen_bands(self, key):
-        if isinstance(key, slice):
-            return list(range(*key.indices(self.count)))
-        if isinstance(key, (int, numpy.integer)):
-            return [int(self._bands_of(key, self.count)[0][0])]
-        if isinstance(key, numpy.ndarray) and key.dtype == bool:
-            key = numpy.flatnonzero(key)
-        if isinstance(key, (list, numpy.ndarray, range)):
-            return [int(band) for band in self._bands_of(list(key), self.count)[0]] if len(key) else []
-        raise TypeError(f"{key!r} names no bands: they are chosen by numbers, slices and lists")
-
-    def _strided(self, numbers, rows, columns):
-        """The pixels at some lines and samples, each at even distances."""
-        flips = (slice(None, None, -1 if rows.step < 0 else 1), slice(None, None, -1 if columns.step < 0 else 1))
-        rows = rows if rows.step > 0 else rows[::-1]
-        columns = columns if columns.step > 0 else columns[::-1]
-        level = self._level_for(rows, columns)
-        source, by = (self, 1) if level == 0 else (self.level(level), 2**level)
-        window = (rows[0] // by, rows[-1] // by + 1), (columns[0] // by, columns[-1] // by + 1)
-        if (rows.step, columns.step) == (by, by):
-            array = source.read(numbers, window)
-        else:
-            array = source._every(numbers, rows, columns)
-        return array[(slice(None),) + flips]
-
-    def _every(self, numbers, rows, columns):
-        """The pixels at every n-th line and sample, read in strips of a few MiB."""
-        array = numpy.empty((len(numbers), len(rows), len(columns)), dtype=self.dtype)
-        width = columns[-1] + 1 - columns[0]
-        lines = max(1, (4 << 20) // (width * len(numbers) * self.dtype.itemsize))
-        together = max(1, lines // rows.step)  # of the lines that are kept
-        for first in range(0, len(rows), together):
-            part = rows[first:first + together]
-            strip = self.read(numbers, ((part[0], part[-1] + 1), (columns[0], columns[-1] + 1)))
-            array[:, first:first + len(part)] = strip[:, ::rows.step, ::columns.step]
-        return array
-
-    def _level_for(self, rows, columns):
-        """The level of the pyramid that holds just the pixels asked for; 0 for none."""
-        pyramid = self._describe()["pyramid"]
-        step = rows.step
-        if pyramid is None or columns.step != step or step < 2 or step & (step - 1):
-            return 0
-        # Only levels of every n-th pixel hold what a slice of numpy would.
-        if pyramid["type"] != "ORVA" or rows[0] % step or columns[0] % step:
-            return 0
-        level = step.bit_length() - 1
-        return level if pyramid["min"] <= level <= pyramid["max"] else 0
-
-    def blocks(self, size=None):
-        """The windows that cover it, in the order in which they are best read.
-
-        Args:
-            size: lines and samples of a window; by default blocks of the source, of about 4 MiB.
-        """
-        bands, lines, samples = self.shape
-        if size is None:
-            size = self._good_chunks()
-        for top in range(0, lines, size[0]):
-            for left in range(0, samples, size[1]):
-                yield (top, min(top + size[0], lines)), (left, min(left + size[1], samples))
-
-    def _good_chunks(self, wanted=4 << 20):
-        """Lines and samples of blocks of about so many bytes, in whole tiles of the source."""
-        bands, lines, samples = self.shape
-        pixel = max(1, bands * self.dtype.itemsize)
-        width, height = self._describe()["tiles"]
-        if height > 1 and 0 < width < samples:
-            side = max(1, int(math.sqrt(wanted / pixel / (width * height))))
-            return min(lines, side * height), min(samples, side * width)
-        height = max(height, 1)
-        return min(lines, max(1, wanted // (pixel * samples * height)) * height), samples
-
-    # Views -------------------------------------------------------------------------------------
-
-    def clip(self, bounds=None, window=None, *, crs=None):
-        """Shows a rectangle of it.
-
-        Args:
-            bounds: left, bottom, right and top on the map; the pixels are those that it touches.
-            window: as of read, in place of bounds.
-            crs: the coordinate system of bounds; the raster's own by default.
-        """
-        if (bounds is None) == (window is None):
-            raise TypeError("clip takes either bounds or a window")
-        _, lines, samples = self.shape
-        rect = rect_of(window, lines, samples) if bounds is None else self._rect_in(bounds, crs)
-        return self._view("CreateSpatialSubsetRasterCommand",
-                          {"SubRect": " ".join(map(str, rect)), "Placing": "Exact"})
-
-    def _rect_in(self, bounds, crs):
-        left, bottom, right, top = (float(bound) for bound in bounds)
-        if not (left < right and bottom < top):
-            raise ValueError(f"bounds are left, bottom, right and top, and not {bounds}")
-        grid = self._grid()
-        if grid is None:
-            raise Error("the raster has no plain grid; give a window")
-        # Points along the sides, since those of another system are bent.
-        t = numpy.linspace(0, 1, 21)
-        x = numpy.concatenate([left + (right - left) * t, 0 * t + right, left + (right - left) * t, 0 * t + left])
-        y = numpy.concatenate([0 * t + bottom, bottom + (top - bottom) * t, 0 * t + top, bottom + (top - bottom) * t])
-        points = numpy.stack([x, y], axis=1)
-        if crs is not None and str(crs) != self.crs:
-            points = transform_points(points, crs, self.crs_wkt, door=self._door)
-            if not numpy.isfinite(points).all():
-                raise Error("the bounds can't be carried to the raster")
-        x0, xx, xy, y0, yx, yy = grid
-        pixels = (points - (x0, y0)) @ numpy.linalg.inv(numpy.array([[xx, xy], [yx, yy]])).T
-        _, lines, samples = self.shape
-        low, high = pixels.min(axis=0), pixels.max(axis=0)
-        # A side on the border of pixels, but for rounding, touches those within alone.
-        first = numpy.floor(low + 1e-5)
-        last = numpy.maximum(numpy.ceil(high - 1e-5) - 1, first)
-        if (last < 0).any() or first[0] >= samples or first[1] >= lines:
-            raise Error(f"the bounds lie outside the raster, from sample {first[0]:.0f} and line {first[1]:.0f} "
-                        f"to {last[0]:.0f} and {last[1]:.0f} of {samples} by {lines}")
-        first = numpy.clip(first, 0, (samples - 1, lines - 1)).astype(int)
-        last = numpy.clip(last, 0, (samples - 1, lines - 1)).astype(int)
-        return int(first[0]), int(first[1]), int(last[0]), int(last[1])
-
-    def bands(self, *bands):
-        """Shows some bands of it, in the order given; one may come twice."""
-        if len(bands) == 1 and isinstance(bands[0], (list, tuple, range, numpy.ndarray)):
-            bands = bands[0]
-        numbers, _ = self._bands_of(bands, self.count)
-        return self._view("CreateSpectralSubsetRasterCommand", {"Bands": _values.array_text(numbers)})
-
-    def stack(self, *others, dtype=None):
-        """Shows the bands of it and those of others, of the same size, as one raster.
-
-        Args:
-            dtype: of all; by default the one that numpy would choose, where they differ.
-        """
-        return stack(self, *others, dtype=dtype)
-
-    def level(self, number):
-        """Shows a level of its pyramid; 0 is the raster itself."""
-        if number == 0:
-            return self
-        if number not in self.levels:
-            raise Error(f"there is no level {number}; there are {self.levels or 'none'}")
-        node = Node("GetRasterPyramidCommand", (("URI", self._chain()), ("Level", str(int(number))),
-                                                ("Placing", "Exact")), "PyramidURI")
-        return Raster(node, self._door)
-
-    def skip(self, lines, samples=None):
-        """Shows every n-th line and sample."""
-        return self._view("CreateSkipRasterCommand", {"SkipX": samples or lines, "SkipY": lines})
-
-    def with_nodata(self, *values, keep=False):
-        """Shows it with some values as no data.
-
-        Args:
-            values: the first is the no-data value of the result; none at all for every pixel valid.
-            keep: whether what the source says is no data stays so.
-        """
-        if not values:
-            return self._view("CreateNoDataRasterCommand",
-                              {"NoDataValues": "1:1 [0] ", "RemoveAll": "1", "Description": "Exact"})
-        return self._view("CreateNoDataRasterCommand",
-                          {"NoDataValues": _values.array_text(list(values)), "Replace": not keep,
-                           "Description": "Exact"})
-
-    def mask(self, *values, band=0, by=None, inverse=False):
-        """Shows it without the pixels where a band has one of some values.
-
-        Args:
-            band: the band whose values are looked at.
-            by: another raster of the same size that has the band.
-            inverse: True to leave out all other pixels instead.
-        """
-        looked = (by if by is not None else self)[int(band)]
-        mask = Node("CreateRasterMaskCommand", (
-            ("SrcURI", looked._chain()), ("MaskBands", "1:1 [0] "),
-            ("MaskValues", f"1:1 [{_values.array_text(list(values))} ]"),
-            ("Inversed", "1" if inverse else "0")))
-        return Raster(Node("CreateMaskedRasterCommand", (("SrcURI", self._chain()), ("MaskURI", mask))), self._door)
-
-    def region(self, shapes, layer=None, where=None, coordinates="Map"):
-        """Shows it without the pixels outside the shapes of a vector file.
-
-        Args:
-            layer: by its name or number; all by default.
-            where: "FIELD=VALUE": only records with that value.
-            coordinates: "Map" or "Pixel".
-        """
-        import os
-
-        inputs = [("Vectors", os.path.abspath(os.fspath(shapes)))]
-        inputs += [("Layer", str(layer))] if layer is not None else []
-        inputs += [("Where", where)] if where is not None else []
-        shape = Node("CreateGeometryROIDefCommand",
-                     tuple(inputs) + (("ScanRules", "Steady"), ("Coordinates", coordinates)))
-        return Raster(Node("CreateROIRasterCommand", (("SrcURI", self._chain()), ("ROIDefURI", shape))), self._door)
-
-    def astype(self, dtype):
-        """Shows it with pixels of another type. Results for integers are rounded; values that don't
-        fit are not valid."""
-        if numpy.dtype(dtype) == self.dtype:
-            return self
-        return _formula.cast(self, dtype)
-
-    def real(self):
-        """Shows the real parts of complex pixels."""
-        return self._view("CreateComplexRealRasterCommand", {})
-
-    def imag(self):
-        """Shows the imaginary parts of complex pixels."""
-        return self._view("CreateComplexImagRasterCommand", {})
-
-    def magnitude(self):
-        """Shows the magnitudes of complex pixels."""
-        return self._view("CreateComplexMagnitudeRasterCommand", {})
-
-    def phase(self):
-        """Shows the phases of complex pixels."""
-        return self._view("CreateComplexPhaseRasterCommand", {})
-
-    def warp(self, to=None, *, like=None, pixel_size=None, resampling="nearest", method="polynomial", nodata=None):
-        """Shows it in another coordinate system, or on the grid of another raster.
-
-        Args:
-            to: "EPSG:n", WKT or a PROJ text.
-            like: a raster whose grid it gets, in place of `to`.
-            pixel_size: in units of the system; by default there are about as many pixels.
-            resampling: "nearest", "linear" or "cubic".
-            method: "polynomial", within an eighth of a pixel, or "rigorous".
-            nodata: of the result; by default the source's.
-        """
-        if (to is None) == (like is None):
-            raise TypeError("warp takes either a coordinate system or a raster with a grid")
-        if like is not None:
-            reference = like._describe()["geoRef"]
-            grid = reference["text"] if reference and reference["transform"] else None
-            if grid is None:
-                raise Error("the raster has no plain grid to be taken over")
-        else:
-            draft = Draft()
-            draft.step("grid", "FitRasterGridCommand",
-                       {"URI": job_node(self._chain()), "CoordSys": str(to), "PixelSize": pixel_size})
-            grid = self._door.run(draft).text("grid", "GeoRef")
-        return self._view("CreateProjectedRasterCommand", {
-            "GeoRef": grid, "ReprojectionMethod": method.capitalize(),
-            "ResamplingMethod": resampling.capitalize(), "Grid": "Exact", "Sampling": "Centred",
-            "NoData": nodata})
-
-    def reflectance(self, **constants):
-        """Shows top-of-atmosphere reflectance; see calibrate for the constants."""
-        return self.calibrate("reflectance", **constants)
-
-    def radiance(self, **constants):
-        """Shows at-sensor radiance; see calibrate for the constants."""
-        return self.calibrate("radiance", **constants)
-
-    def temperature(self, **constants):
-        """Shows brightness temperature in kelvin; see calibrate for the constants."""
-        return self.calibrate("temperature", **constants)
-
-    def calibrate(self, quantity, *, metadata=None, **constants):
-        """Shows a physical quantity: "radiance", "reflectance" or "temperature". The values are those
-        of the commands that calibrate whole files, and are computed where they are read.
-
-        Args:
-            metadata: the header of the scene, from which constants are taken that are not given.
-            constants: gain, offset, irradiance, k1, k2 (a number, or one for each band),
-                sun_elevation in degrees, distance in astronomical units, scale.
-        """
-        from . import _calibration
-
-        return _calibration.calibrate(self, quantity, metadata, constants)
-
-    # Work --------------------------------------------------------------------------------------
 
     def _job(self, command, inputs, *, progress=False, label="", uri="URI", door=None):
         """Runs one command on it, and gives its outputs as a dictionary."""
@@ -682,9 +103,14 @@ class Raster(_formula.Arithmetic):
 
         command = "GetExtendedRasterStatsCommand" if extended else "GetBasicRasterStatsCommand"
         found = self._job(command, {"Wait": "Always"}, progress=progress, label="statistics")
-        columns = {"min": "Min", "max": "Max", "mean": "Mean", "std": "Std", "sum": "Sum",
-                   "rms": "RMS", "count": "Count"}
-        return _tables.table({name: found[output] for name, output in columns.items()}, "band")
+        # The extremes are pixels, whose text has the digits of their type.
+        columns = {"min": self._pixels_of(found["Min"]), "max": self._pixels_of(found["Max"])}
+        others = {"mean": "Mean", "std": "Std", "sum": "Sum", "rms": "RMS", "count": "Count"}
+        columns.update({name: found[output].tolist() for name, output in others.items()})
+        return _tables.table(columns, "band")
+
+    def _pixels_of(self, numbers):
+        return numbers.astype(self.dtype).tolist()
 
     def covariance(self, *, progress=False):
         """The covariances of its bands, an array of bands by bands over pixels that are valid in both."""
@@ -696,14 +122,19 @@ class Raster(_formula.Arithmetic):
         them.
 
         Args:
-            bins: how many; by default 256, or fewer of whole numbers.
+            bins: how many; by default 256, or fewer of whole numbers. A whole number v stands for all from
+                v up to v + 1, so that the last edge is 1 above the largest value.
             range: the smallest and the largest value that counts; all by default.
         """
         from . import _tables
 
-        low, high = range if range is not None else (None, None)
-        found = self._job("FitRasterHistogramCommand", {"LowerBound": low, "UpperBound": high, "BinCount": bins,
-                                                        "Wait": "Always"}, progress=progress, label="histograms")
+        inputs = {"BinCount": bins, "Wait": "Always"}
+        if range is not None:
+            inputs["LowerBound"], inputs["UpperBound"] = range
+        else:
+            stats = self._job("GetBasicRasterStatsCommand", {"Wait": "Always"}, progress=progress, label="statistics")
+            inputs["Lowest"], inputs["Highest"] = stats["Min"], stats["Max"]
+        found = self._job("FitRasterHistogramCommand", inputs, progress=progress, label="histograms")
         return _tables.histograms_of(found["Histograms"], self.dtype)
 
     def pyramid(self, levels=None, *, progress=False):
@@ -819,60 +250,6 @@ class FormulaRaster(Raster):
         return super().__repr__().replace("FormulaRaster", "Raster")
 
 
-def _shape_in(shape, memory):
-    """The shape of an array of bands, lines and samples with its axes as in memory."""
-    return tuple(shape[axis] for axis in _AXES[memory])
-
-
-def _range_of(key, length, name):
-    """The places that an index or a slice names, and whether the axis stays."""
-    if isinstance(key, slice):
-        return range(*key.indices(length)), True
-    try:
-        at = operator.index(key)
-    except TypeError:
-        raise TypeError(f"{key!r} chooses no {name}s: give a number or a slice") from None
-    if not -length <= at < length:
-        raise IndexError(f"there is no {name} {at}; the raster has {length}, from 0")
-    at %= length
-    return range(at, at + 1), False
-
-
-def rect_of(window, lines, samples):
-    """Left, top, right and bottom of a window, inclusive. Raises Error for one that is not inside."""
-    if window is None:
-        return 0, 0, samples - 1, lines - 1
-    if hasattr(window, "col_off"):  # a Window of rasterio
-        top, left = window.row_off, window.col_off
-        bottom, right = top + window.height, left + window.width
-    else:
-        try:
-            rows, columns = window
-            top, bottom = _ends_of(rows, lines)
-            left, right = _ends_of(columns, samples)
-        except (TypeError, ValueError):
-            raise ValueError(
-                f"a window is ((first line, end), (first sample, end)), and not {window!r}") from None
-    if not (top == int(top) and left == int(left) and bottom == int(bottom) and right == int(right)):
-        raise ValueError(f"a window has whole lines and samples, and not {window!r}")
-    top, left, bottom, right = int(top), int(left), int(bottom), int(right)
-    if not (0 <= top < bottom <= lines and 0 <= left < right <= samples):
-        raise Error(f"the window of lines {top} to {bottom} and samples {left} to {right} is not inside the "
-                    f"raster's {lines} by {samples}")
-    return left, top, right - 1, bottom - 1
-
-
-def _ends_of(part, length):
-    if isinstance(part, slice):
-        if part.step not in (None, 1):
-            raise ValueError("a window has no steps")
-        start = 0 if part.start is None else part.start
-        stop = length if part.stop is None else part.stop
-        return start, stop
-    start, stop = part
-    return start, stop
-
-
 def open(file, *, format=None, subdataset=None, server=None):
     """Opens a raster file of any format that vexg reads, with the pyramid file beside it.
 
@@ -971,5 +348,3 @@ def transform_points(points, from_crs, to_crs, *, door=local):
     draft.step("points", "TransformPointsCommand",
                {"Points": _values.array_text(points), "From": str(from_crs), "To": str(to_crs)})
     return _values.parse_array(door.run(draft).text("points", "Points"), float)
-
-

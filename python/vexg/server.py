@@ -20,7 +20,7 @@ from . import _values
 from ._jobs import ArrayNode, Draft, Results
 from .errors import Error
 
-_PATIENCE = 30.0  # seconds that a server gets to come
+_PATIENCE = 30.0  # seconds that a server that was started gets to come
 _LOOK = 0.05  # seconds between two looks at a job that runs
 _KEPT = 64  # rasters that are kept open
 _PIECE = 32 << 20  # bytes of pixels that travel at once
@@ -201,7 +201,7 @@ class ServerDoor:
     def __init__(self, name, process=None):
         self._name = name
         self._process = process
-        self._pipe = _ask(name, "@NEW", process=process, patience=_PATIENCE)
+        self._pipe = _ask(name, "@NEW", process=process, patience=_PATIENCE if process is not None else 0.0)
         if self._pipe == "@ERROR":
             raise Error(f"the server {name} takes no client")
         self._lock = threading.Lock()

@@ -1,6 +1,7 @@
 """Polygons of rasters, and tables of shapes."""
 
 import os
+import pathlib
 
 import numpy
 
@@ -102,7 +103,7 @@ def polygonize(raster, *, band=0, min_size=None, progress=False):
 def read_fxv(file):
     """The polygons of an FXV file (docs/file-formats.md): their labels, and for each its rings as arrays
     of x and y in pixels, the outer one first."""
-    data = open(file, "rb").read()
+    data = pathlib.Path(file).read_bytes()
     if data[:5] != b"FXV50":
         raise Error(f"{file}: is no file of polygons")
     order = ">" if data[5] else "<"

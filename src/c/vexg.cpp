@@ -9,7 +9,6 @@
 #include <string>
 
 #include "c/block_transfer.h"
-#include "raster/raster_description.h"
 #include "c/raster_store.h"
 #include "commands/catalog.h"
 #include "commands/command_json.h"
@@ -20,6 +19,7 @@
 #include "foundation/library.h"
 #include "foundation/thread_roll.h"
 #include "platform/process.h"
+#include "raster/raster_description.h"
 #include "tasks/thread_limit.h"
 
 using namespace lumo;
