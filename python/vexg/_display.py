@@ -94,7 +94,7 @@ def html_of(raster):
     cells = "".join(f"<tr><th style='text-align:left'>{html.escape(str(name))}</th>"
                     f"<td style='text-align:left'>{html.escape(str(value))}</td></tr>" for name, value in rows)
     picture = ""
-    # What would have to be computed for a picture may take long; what a level holds doesn't.
+    # A picture may take long where all pixels have to be computed for it.
     if raster.size <= 64 << 20 or raster.levels:
         try:
             data = base64.b64encode(png_of(raster, _SIDE, None, (2, 98))).decode()

@@ -134,7 +134,7 @@ class Arithmetic:
                 return -inputs[0]
             if ufunc in (numpy.rint,):
                 return _call("round", inputs[0])
-        # What a formula doesn't have is computed by numpy, on the pixels.
+        # Other functions are computed by numpy, on the pixels.
         arrays = [numpy.asarray(each) if isinstance(each, Arithmetic) else each for each in inputs]
         return getattr(ufunc, method)(*arrays, **options)
 

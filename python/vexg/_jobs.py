@@ -277,7 +277,7 @@ class Results:
             if result == "Success":
                 continue
             reason = command.get("Reason", "aborted" if result == "Aborted" else "failed")
-            # What is skipped failed for the failure of another one, which stands before it.
+            # A step that was skipped has failed for another one, which stands before it.
             if failed is None:
                 failed = Error(reason, draft.command_of(name) or name.partition(".")[2], name)
         if failed is not None:

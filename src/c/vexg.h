@@ -12,8 +12,8 @@
 ///   - a job document, whose commands open sources and stand views on them: the raster is the URI
 ///     that the last command gives. Nothing else may stand in it, so that it can run again;
 ///   - "[URI]", an object that a job of vexg_run has opened and not closed yet.
-/// What the first two name stays open in a store of VEXG_KEPT_RASTERS, of which the one that was
-/// used longest ago goes first. A source whose files have changed since is opened anew.
+/// Rasters of the first two kinds stay open in a store of VEXG_KEPT_RASTERS, of which the one that
+/// was used longest ago goes first. A source whose files have changed since is opened anew.
 ///
 /// Ownership: texts that a function returns, and faults, belong to the caller, who gives them to
 ///            vexg_free. A raster's memory is borrowed for the length of a call.
