@@ -47,6 +47,13 @@ foreach(line "TIFF +raster +libvexgdal.so +yes +yes" "Plane +raster +libvexgform
   endif()
 endforeach()
 
+# A program in C, which sees nothing but vexg.h, and reads and writes what the plug-ins give it.
+run(pkg-config --cflags-only-I --libs vexg)
+separate_arguments(flags UNIX_COMMAND "${output}")
+run(${C_COMPILER} -std=c11 -Wall -Wextra -Wpedantic -Werror ${SOURCE}/tests/install/consumer/door.c
+    -o ${BUILD}/install-test/door ${flags} -Wl,-rpath,${libraries})
+expect_success(${BUILD}/install-test/door)
+
 # A view and its command from outside work on a raster of the installed plug-ins.
 file(WRITE ${BUILD}/install-test/mirror.xml [[<Job>
   <Command Name="open" ID="OpenRasterCommand">

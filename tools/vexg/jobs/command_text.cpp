@@ -7,7 +7,6 @@
 
 #include <fmt/format.h>
 #include <fmt/ranges.h>
-#include <nlohmann/json.hpp>
 
 #include "commands/command.h"
 
@@ -42,34 +41,6 @@ std::size_t WidestName(const CommandDeclaration& command) {
     widest = std::max(widest, std::string(output.name).size());
   }
   return widest;
-}
-
-nlohmann::ordered_json AsJson(const CommandDeclaration& command) {
-  nlohmann::ordered_json inputs = nlohmann::ordered_json::array();
-  for (const InputDeclaration& input : command.inputs) {
-    inputs.push_back(
-        {{"name", input.name},
-         {"required", input.presence == Presence::kRequired},
-         {"kind", Describe(input.kind).name},
-         {"form", Describe(input.kind).form},
-         {"unit", input.unit},
-         {"words", input.words == nullptr ? std::vector<const char*>() : input.words()},
-         {"meaning", input.meaning}});
-  }
-  nlohmann::ordered_json outputs = nlohmann::ordered_json::array();
-  for (const OutputDeclaration& output : command.outputs) {
-    outputs.push_back({{"name", output.name},
-                       {"kind", Describe(output.kind).name},
-                       {"form", Describe(output.kind).form},
-                       {"unit", output.unit},
-                       {"returned", output.returned},
-                       {"meaning", output.meaning}});
-  }
-  return {{"name", command.name},
-          {"group", command.group},
-          {"meaning", command.meaning},
-          {"inputs", inputs},
-          {"outputs", outputs}};
 }
 
 std::string AsMarkdown(const CommandDeclaration& command) {
@@ -131,13 +102,6 @@ std::string CommandsAsNames() {
   std::string text;
   for (const auto& entry : GetCommandRegistry()) text += entry.first.ToUTF8() + "\n";
   return text;
-}
-
-std::string CommandsAsJson() {
-  nlohmann::ordered_json all = nlohmann::ordered_json::array();
-  for (const auto& entry : GetCommandRegistry())
-    all.push_back(AsJson(entry.second->GetDeclaration()));
-  return all.dump(2) + "\n";
 }
 
 std::string CommandsAsMarkdown() {

@@ -12,7 +12,6 @@ namespace lumo::host {
 
 std::string CommandsAsList();      ///< a line each, by group
 std::string CommandsAsNames();     ///< a name each, for the completion of a shell
-std::string CommandsAsJson();      ///< everything, as an array of objects
 std::string CommandsAsMarkdown();  ///< everything, as a document
 
 /// All about one command.

@@ -1,5 +1,6 @@
 #include <memory>
 
+#include "commands/command_json.h"
 #include "jobs/command_text.h"
 #include "jobs/result_output.h"
 #include "verb.h"
