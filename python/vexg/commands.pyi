@@ -387,10 +387,12 @@ def CreateAttributeTableCommand(
 class _CreateBandStackRasterCommandOutputs(TypedDict, total=False):
     URI: str
     DataType: str
+    Warning: str
 
 def CreateBandStackRasterCommand(
     *,
     SrcURI: Sequence[str | Raster],
+    Bands: Literal["Told", "Exact"] | None = None,
     server: Server | None = None,
     progress: Progress = False,
 ) -> _CreateBandStackRasterCommandOutputs:
@@ -398,10 +400,14 @@ def CreateBandStackRasterCommand(
 
     Args:
         SrcURI: URI array: the rasters, in order
+        Bands: word: Told: names, units and further details are those of the first raster;
+            Exact: each band keeps its own, and rasters of another size than the first are
+            refused
 
     Returns:
         URI: URI: the raster, by which further commands find it
         DataType: word: its pixel type
+        Warning: text: which rasters lie elsewhere than the first one; absent when none does
     """
     ...
 
@@ -524,6 +530,38 @@ def CreateComplexRealRasterCommand(
 
     Args:
         SrcURI: URI: the raster to stand on
+
+    Returns:
+        URI: URI: the raster, by which further commands find it
+        DataType: word: its pixel type
+    """
+    ...
+
+class _CreateConvertedRasterCommandOutputs(TypedDict, total=False):
+    URI: str
+    DataType: str
+
+def CreateConvertedRasterCommand(
+    *,
+    SrcURI: str | Raster,
+    DataType: Literal["Byte", "Char", "UInt16", "Int16", "UInt32", "Int32", "Single", "Double"] | None = None,
+    Scale: ArrayLike | None = None,
+    Unscale: bool | None = None,
+    server: Server | None = None,
+    progress: Progress = False,
+) -> _CreateConvertedRasterCommandOutputs:
+    """Shows a raster with pixels of another type, or values on another scale. A command of this
+    library's own.
+
+    Args:
+        SrcURI: URI: the raster to stand on
+        DataType: word: pixel type; that of the raster, or Single with Unscale, when absent.
+            Values are rounded for an integer type, and what does not fit is not valid
+        Scale: number array: LO, HI and the values they become, TO-LO and TO-HI: the ends of
+            the range of an integer type or 0 and 1 when these two are absent. What lies
+            outside is cut to the range
+        Unscale: boolean: values are pixel * scale + offset, as the bands of the raster say;
+            false when absent
 
     Returns:
         URI: URI: the raster, by which further commands find it
@@ -880,6 +918,7 @@ def CreateProjectedRasterCommand(
     PyramidLevel: int | None = None,
     Grid: Literal["Told", "Exact", "Computed"] | None = None,
     Sampling: Literal["Told", "Centred", "Corner"] | None = None,
+    Kernel: Literal["Told", "Nearest", "Linear", "Cubic", "Lanczos", "Average", "Mode", "Min", "Max", "Median"] | None = None,
     NoData: float | None = None,
     server: Server | None = None,
     progress: Progress = False,
@@ -901,6 +940,9 @@ def CreateProjectedRasterCommand(
         Sampling: word: Told: linear and cubic weigh from the corners of pixels and round
             toward zero; Centred: they weigh from the centres, round to the nearest, and leave
             out pixels that aren't valid
+        Kernel: word: in place of ResamplingMethod and Sampling, on an exact grid. Told:
+            those; Nearest; Linear, Cubic (-0.5) and Lanczos are stretched over the area that
+            a pixel covers; Average, Mode, Min, Max and Median are of the pixels in it
         NoData: number: the no-data value of all bands, outside the raster too; the raster's
             own when absent
 
@@ -1145,6 +1187,62 @@ def CreateTempRasterCommand(
     Returns:
         URI: URI: the raster, by which further commands find it
         DataType: word: its pixel type
+    """
+    ...
+
+class _CreateTreeLabelsRasterCommandOutputs(TypedDict, total=False):
+    URI: str
+    DataType: str
+    Segments: int
+    MergeValue: float
+
+def CreateTreeLabelsRasterCommand(
+    *,
+    Tree: str | PathLike[str],
+    MergeValue: float | None = None,
+    MergePercent: float | None = None,
+    server: Server | None = None,
+    progress: Progress = False,
+) -> _CreateTreeLabelsRasterCommandOutputs:
+    """Shows the segments of a tree at any cost as a raster of labels, those of a segmentation
+    with Seamless and this MergeValue. A command of this library's own.
+
+    Args:
+        Tree: text: a file that the input Tree of FxTileSegmentMergeCommand made
+        MergeValue: number: cost up to which segments are merged; none unless above 0, as when
+            absent
+        MergePercent: number: percentage of all merges to do, in place of MergeValue
+
+    Returns:
+        URI: URI: the raster, by which further commands find it
+        DataType: word: its pixel type
+        Segments: integer: how many there are
+        MergeValue: number: the cost up to which merges were done
+    """
+    ...
+
+class _CreateTreeLevelsTableCommandOutputs(TypedDict, total=False):
+    Segments: NDArray[Any]
+
+def CreateTreeLevelsTableCommand(
+    *,
+    Tree: str | PathLike[str],
+    MergeValues: ArrayLike,
+    Table: str | PathLike[str],
+    server: Server | None = None,
+    progress: Progress = False,
+) -> _CreateTreeLevelsTableCommandOutputs:
+    """Makes a table of the segments of a tree at several costs, with the segment of the next
+    cost that each lies in. A command of this library's own.
+
+    Args:
+        Tree: text: a file that the input Tree of FxTileSegmentMergeCommand made
+        MergeValues: number array: costs up to which segments are merged, in ascending order
+        Table: text: the file of text to make: level from 1 on, cost, segment, its pixels, and
+            the segment of the next level that it lies in, with commas between
+
+    Returns:
+        Segments: integer array: how many there are of each level
     """
     ...
 
@@ -1833,6 +1931,8 @@ def FxTileSegmentMergeCommand(
     MinSize: int | None = None,
     MaxSize: int | None = None,
     Compactness: float | None = None,
+    Tree: str | PathLike[str] | None = None,
+    MergePercent: float | None = None,
     server: Server | None = None,
     progress: Progress = False,
 ) -> _FxTileSegmentMergeCommandOutputs:
@@ -1871,6 +1971,11 @@ def FxTileSegmentMergeCommand(
             together are not merged, except by MinSize; none when absent
         Compactness: number: with Seamless and MergeAlgorithm 1: costs are divided by the
             length of the common border to the power of this besides, 0 to 10; 0 when absent
+        Tree: text: with Seamless and MergeAlgorithm 1: the file to make of all merges, from
+            which segments of every MergeValue can be made (CreateTreeLabelsRasterCommand);
+            none when absent
+        MergePercent: number: with Tree: percentage of all merges to do, in place of
+            MergeValue
 
     Returns:
         LambdaHistogram: integer array: cumulative counts of the costs of all merges, in 10000
@@ -3113,6 +3218,45 @@ def SetRasterStatsModeCommand(
 
     Returns:
         StatsMode: word: the mode from now on
+    """
+    ...
+
+class _SuggestSegmentScalesCommandOutputs(TypedDict, total=False):
+    MergeValues: NDArray[Any]
+    Segments: NDArray[Any]
+    LocalVariance: NDArray[Any]
+    Rates: NDArray[Any]
+    Peaks: NDArray[Any]
+    Onsets: NDArray[Any]
+    Prominences: NDArray[Any]
+
+def SuggestSegmentScalesCommand(
+    *,
+    Tree: str | PathLike[str],
+    LeastProminence: float | None = None,
+    server: Server | None = None,
+    progress: Progress = False,
+) -> _SuggestSegmentScalesCommandOutputs:
+    """Finds costs at which segments of a tree are likely to be whole objects: peaks of the rate
+    at which the local variance changes with scale (Dragut, Tiede and Levick 2010). A command
+    of this library's own.
+
+    Args:
+        Tree: text: a file that the input Tree of FxTileSegmentMergeCommand made
+        LeastProminence: number: peaks are left out whose prominence is a smaller share of the
+            highest, 0 to 1; 0.1 when absent
+
+    Returns:
+        MergeValues: number array: costs of the levels, a quarter of an octave apart
+        Segments: number array: how many there are at each level
+        LocalVariance: number array: mean over the segments of each level of the standard
+            deviation of their values
+        Rates: number array: its change from the level before, in percent
+        Peaks: number array: costs at the peaks of the rates, the most prominent first
+        Onsets: number array: for each peak the cost of the lowest rate in front of it, at
+            which its objects are whole yet
+        Prominences: number array: how far the rate falls on both sides of each peak, in
+            percent
     """
     ...
 
