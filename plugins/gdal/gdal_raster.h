@@ -6,17 +6,11 @@
 
 #include "gdal_common/source.h"
 #include "raster/raster_def.h"
+#include "tiff_writer/block_layout.h"
 
 namespace lumo::gdal {
 
 class NewRaster;
-
-/// A block of pixels: where it lies in the raster, and in the caller's memory.
-struct BlockPlace {
-  unsigned left, top, width, height;  ///< in pixels of the level
-  const Array<unsigned>& bands;
-  unsigned level;
-};
 
 /// One resolution of a raster, the whole or a reduced one.
 struct RasterLevel {
@@ -101,6 +95,7 @@ class OpenRaster {
   void FindLevels();
   bool Transfer(GDALRWFlag direction, const BlockPlace& place, void* pixels) const;
   const RasterLevel* CheckPlace(const BlockPlace& place) const;
+  bool ReadNewAlpha(const BlockPlace& place, unsigned char* state) const;
   void ForgetStatistics(const Array<unsigned>& bands);
 
   Format format_;

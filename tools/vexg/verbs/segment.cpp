@@ -165,6 +165,8 @@ class SegmentVerb final : public RasterVerb {
     return files;
   }
 
+  std::string GetOverviewMethod() const override { return "Nearest"; }
+
   RasterInfo PlanRaster(JobSession& /*session*/, const JobResults& /*opened*/,
                         const RasterInfo& source) override {
     bands_ = ParseBands(bandsText_, source);
