@@ -20,6 +20,8 @@
 #include "platform/folder_lock.h"
 #include "platform/random_access_file.h"
 #include "platform/temporary_file.h"
+#include "tiff_writer/packed_pixels.h"
+#include "tiff_writer/plain_pixels.h"
 
 namespace lumo::gdal {
 namespace {
@@ -39,7 +41,7 @@ struct Maker {
   bool changesValues = false;  ///< a no-data value would not stay one
 };
 constexpr Maker kMakers[] = {
-    {"GTiff", false, "BIGTIFF=IF_SAFER SPARSE_OK=TRUE"},
+    {"GTiff", false, "SPARSE_OK=TRUE"},
     {"HFA", false, ""},
     {"BMP", true, ""},
     {"NITF", true, "", true},  // corners to the metre or the second
@@ -83,10 +85,40 @@ CPLStringList OptionsOf(const Maker& maker) {
   return CPLStringList(CSLTokenizeString2(maker.options, " ", 0), TRUE);
 }
 
+/// True for a TIFF file whose blocks are packed, or lie in an order of its own.
+bool IsPacked(const RasterDef& def) {
+  return def.creation.IsPacked() || def.creation.layout == FileLayout::kCog;
+}
+
+/// The lines of strips that are large enough to be packed well.
+std::string StripLines(const RasterDef& def, bool byPixel) {
+  constexpr double kStripBytes = 256 << 10;
+  const double row = BytesOf(def) / def.lines / (byPixel ? 1 : def.bands);
+  return std::to_string(std::clamp(static_cast<unsigned>(kStripBytes / row), 1U, def.lines));
+}
+
+/// Says by what GDAL shall choose the kind of the file.
+const char* BigTiffWord(const RasterDef& def) {
+  if (IsPacked(def)) return "YES";  // of the file with the tags
+  switch (def.creation.bigTiff) {
+    case BigTiffChoice::kAuto:
+      return "IF_NEEDED";
+    case BigTiffChoice::kYes:
+      return "YES";
+    case BigTiffChoice::kNo:
+      return "NO";
+    default:
+      return "IF_SAFER";
+  }
+}
+
 void AddLayout(const RasterDef& def, CPLStringList& options) {
   const bool byPixel = def.interleave == Interleave::BIP || def.interleave == Interleave::BIL;
   options.SetNameValue("INTERLEAVE", byPixel ? "PIXEL" : "BAND");
-  if (def.tileWidth <= 1 || def.tileHeight <= 1) return;
+  if (def.tileWidth <= 1 || def.tileHeight <= 1) {
+    if (IsPacked(def)) options.SetNameValue("BLOCKYSIZE", StripLines(def, byPixel).c_str());
+    return;
+  }
   static constexpr unsigned kStep = 16, kMaxTile = 4096;  // sides are multiples of 16
   const auto side = [](unsigned size) {
     return std::to_string((std::min(size, kMaxTile) + kStep - 1) / kStep * kStep);
@@ -149,6 +181,14 @@ RasterDef AsKept(const std::string& driver, const RasterDef& def) {
   RasterDef kept = def;
   const Maker* const maker = FindMaker(driver);
   if (maker != nullptr && maker->changesValues) kept.noData.clear();
+  if (driver != "GTiff") return kept;
+  const CreationOptions& wanted = def.creation;
+  if (wanted.LosesValues()) kept.noData.clear();
+  if (wanted.tile) kept.tileWidth = kept.tileHeight = *wanted.tile;
+  if (wanted.layout != FileLayout::kCog) return kept;
+  constexpr unsigned kUsualTile = 512;
+  if (!wanted.tile) kept.tileWidth = kept.tileHeight = kUsualTile;
+  kept.interleave = Interleave::BIP;
   return kept;
 }
 
@@ -160,6 +200,7 @@ NewRaster::NewRaster(std::string driver, const std::string& path, const RasterDe
       def_(AsKept(driver_, def)),
       older_(platform::IdentifyFile(path)),
       temporary_(TemporaryPath(path)),
+      isPacked_(driver_ == "GTiff" && IsPacked(def_)),
       mask_(platform::TemporaryPathBeside(path), def.samples, def.lines) {}
 
 NewRaster::~NewRaster() {
@@ -227,6 +268,8 @@ bool NewRaster::CheckTarget() const {
   }
   const PixelType type = PixelTypeOf(def_.dataType);
   if (type.type == GDT_Unknown) return Fail("no raster can have this pixel type");
+  const std::string misfit = FindCreationMisfit(def_);
+  if (!misfit.empty()) return Fail(misfit);
   if (driver_ == "JPEG" && type.type != GDT_Byte) {
     return Fail("the format holds bytes only");  // of 16 bits GDAL would keep 12
   }
@@ -290,10 +333,13 @@ DatasetPtr NewRaster::MakeDirectly() {
   CPLStringList options = OptionsOf(*FindMaker(driver_));
   if (type.isSignedByte) options.SetNameValue("PIXELTYPE", "SIGNEDBYTE");
   if (driver_ == "GTiff") {
+    options.SetNameValue("BIGTIFF", BigTiffWord(def_));
     AddLayout(def_, options);
     AddMeaning(def_, options);
   }
-  DatasetPtr dataset(GDALCreate(GDALGetDriverByName(driver_.c_str()), temporary_.c_str(),
+  if (isPacked_) scratch_ = platform::TemporaryPathBeside(path_);
+  const std::string& name = isPacked_ ? scratch_ : temporary_;
+  DatasetPtr dataset(GDALCreate(GDALGetDriverByName(driver_.c_str()), name.c_str(),
                                 static_cast<int>(def_.samples), static_cast<int>(def_.lines),
                                 static_cast<int>(def_.bands), type.type, options.List()));
   if (dataset == nullptr || !Describe(dataset.get()) || messages.HasError()) {
@@ -306,24 +352,54 @@ DatasetPtr NewRaster::MakeDirectly() {
 /// Has the blocks of a TIFF file placed, which for that is closed and opened again.
 DatasetPtr NewRaster::BeginPixels(DatasetPtr dataset) {
   const Messages messages;
-  const std::vector<unsigned char> fill = FillValueOf(def_);
-  const bool byPixel = EQUAL(
+  tiff::BlockLayout layout;
+  layout.samples = def_.samples;
+  layout.lines = def_.lines;
+  layout.bands = def_.bands;
+  layout.element = DataTypeBytes(def_.dataType);
+  layout.byPixel = EQUAL(
       CSLFetchNameValueDef(GDALGetMetadata(dataset.get(), "IMAGE_STRUCTURE"), "INTERLEAVE", "BAND"),
       "PIXEL");
+  layout.isTiled = def_.tileWidth > 1 && def_.tileHeight > 1;
+  int width = 0, height = 0;
+  GDALGetBlockSize(GDALGetRasterBand(dataset.get(), 1), &width, &height);
+  layout.blockWidth = static_cast<unsigned>(width);
+  layout.blockHeight = static_cast<unsigned>(height);
   dataset.reset();
   if (messages.HasError()) {
     Fail(messages.Text());
     return nullptr;
   }
-  if (!TiffPixels::Begin(temporary_, def_, byPixel, fill, pixels_)) {
+  std::unique_ptr<tiff::PlainPixels> plain;
+  const bool isBegun = isPacked_ ? BeginPacked(layout)
+                                 : tiff::PlainPixels::Begin(temporary_, def_, layout.byPixel,
+                                                            FillValueOf(def_), plain);
+  if (!isBegun) {
     ShowFault();
     return nullptr;
   }
-  dataset.reset(
-      GDALOpenEx(temporary_.c_str(), GDAL_OF_RASTER | GDAL_OF_UPDATE, nullptr, nullptr, nullptr));
+  if (plain != nullptr) pixels_ = std::move(plain);
+  dataset.reset(GDALOpenEx(isPacked_ ? scratch_.c_str() : temporary_.c_str(),
+                           GDAL_OF_RASTER | GDAL_OF_UPDATE, nullptr, nullptr, nullptr));
   if (dataset != nullptr && !messages.HasError()) return dataset;
   Fail(messages.Text());
   return nullptr;
+}
+
+bool NewRaster::BeginPacked(const tiff::BlockLayout& layout) {
+  tiff::PackedRaster raster;
+  raster.def = def_;
+  raster.layout = layout;
+  raster.fill = FillValueOf(def_);
+  raster.isFillNoData = !DiffersByBand(def_) && NoDataOf(def_, 0).has_value();
+  raster.hasAlpha = keepsAlpha_;
+  raster.path = temporary_;
+  raster.description = scratch_;
+  raster.getExcluded = [this](const BlockPlace& place, std::vector<unsigned char>& excluded) {
+    return mask_.Read(place, excluded);
+  };
+  pixels_ = tiff::PackedPixels::Begin(std::move(raster));
+  return pixels_ != nullptr;
 }
 
 DatasetPtr NewRaster::MakeForCopy() {
@@ -372,6 +448,7 @@ bool NewRaster::Finish(DatasetPtr dataset) {
     if (messages.HasError()) return Fail(messages.Text());
     if (pixels_ != nullptr && !pixels_->Finish()) return ShowFault();
     pixels_.reset();
+    if (isPacked_) Remove(scratch_);
   }
   return WriteBeside() && WriteMask() && IsWhole() && TakePlace();
 }
@@ -401,6 +478,8 @@ bool NewRaster::WriteBeside() const {
 }
 
 bool NewRaster::WriteMask() {
+  // The levels of a cloud-optimised file have masks, which lie among them.
+  if (def_.creation.layout == FileLayout::kCog) return true;
   return mask_.WriteTo(temporary_, driver_) || ShowFault();
 }
 

@@ -11,7 +11,7 @@
 #include "platform/file_identity.h"
 #include "platform/file_swap.h"
 #include "raster/raster_def.h"
-#include "tiff_pixels.h"
+#include "tiff_writer/new_pixels.h"
 
 namespace lumo::gdal {
 
@@ -23,7 +23,9 @@ namespace lumo::gdal {
 /// something else: in memory, or as a TIFF file beside the place. Failure: false or null, with the
 /// fault set.
 ///
-/// The pixels of a TIFF file are written past GDAL.
+/// The pixels of a TIFF file are written past GDAL (plugins/tiff_writer). Of one whose blocks are
+/// packed, or in an order of its own, GDAL makes a file without pixels beside the place, whose tags
+/// the file gets.
 class NewRaster {
  public:
   /// Whether the format can hold such a raster is found out here.
@@ -48,6 +50,9 @@ class NewRaster {
   /// True when the last band will mark which pixels of the others are valid.
   bool KeepsAlpha() const { return keepsAlpha_; }
 
+  /// True when what GDAL has open is not the file with the pixels.
+  bool IsDescribedBeside() const { return isPacked_ && pixels_ != nullptr; }
+
   /// Takes the pixels that are not valid and don't say so themselves.
   NewMask& Mask() { return mask_; }
 
@@ -64,6 +69,7 @@ class NewRaster {
   bool TrySample(std::string& fault);
   DatasetPtr MakeDirectly();
   DatasetPtr BeginPixels(DatasetPtr dataset);
+  bool BeginPacked(const tiff::BlockLayout& layout);
   DatasetPtr MakeForCopy();
   bool Describe(GDALDatasetH dataset) const;
   bool CopyToFormat(DatasetPtr dataset);
@@ -83,9 +89,11 @@ class NewRaster {
   const RasterDef def_;
   const platform::FileIdentity older_;  // that stands at the place
   const std::string temporary_;         // of the format, beside the place
-  std::unique_ptr<TiffPixels> pixels_;
+  std::unique_ptr<tiff::NewPixels> pixels_;
+  const bool isPacked_;  // a TIFF file that is no plain one
   NewMask mask_;
-  std::string scratch_;  // the TIFF file that the copy is made from
+
+  std::string scratch_;  // the TIFF file that the copy is made from, or that has the tags
   std::vector<std::optional<StoredHistogram>> histograms_;  // which a copy leaves behind
   /// The part that the format is given to keep; the rest goes beside the file.
   enum class Given { kNothing, kBands, kAll } given_ = Given::kAll;

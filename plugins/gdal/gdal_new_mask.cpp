@@ -60,6 +60,21 @@ bool NewMask::Take(const BlockPlace& place, const std::vector<unsigned char>& ex
   return (done && !messages.HasError()) || messages.Fail(scratch_, "a mask can't be written");
 }
 
+bool NewMask::Read(const BlockPlace& place, std::vector<unsigned char>& excluded) const {
+  excluded.clear();
+  if (IsEmpty()) return true;
+  const Messages messages;
+  const auto at = [](unsigned number) { return static_cast<int>(number); };
+  excluded.resize(std::size_t{place.width} * place.height);
+  if (GDALRasterIO(GDALGetRasterBand(mask_.get(), 1), GF_Read, at(place.left), at(place.top),
+                   at(place.width), at(place.height), excluded.data(), at(place.width),
+                   at(place.height), GDT_Byte, 0, 0) != CE_None) {
+    return messages.Fail(scratch_, "a mask can't be read");
+  }
+  for (unsigned char& byte : excluded) byte = byte == 0 ? 1 : 0;
+  return true;
+}
+
 /// Excludes the pixels of a line that hold the no-data values of all bands.
 bool NewMask::Excluded(GDALDatasetH file, int line, std::vector<unsigned char>& row) const {
   const auto width = static_cast<int>(samples_);

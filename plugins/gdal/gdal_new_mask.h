@@ -30,6 +30,10 @@ class NewMask {
   /// @param isWhole   the block has all bands: pixels that it doesn't exclude are valid again.
   bool Take(const BlockPlace& place, const std::vector<unsigned char>& excluded, bool isWhole);
 
+  /// Gets the pixels of a place that are excluded.
+  /// @param excluded  [out] a byte for each, not 0 for those; empty while there is no mask.
+  bool Read(const BlockPlace& place, std::vector<unsigned char>& excluded) const;
+
   /// Gives the mask to a finished raster file: into a TIFF file, beside any other one. Pixels that
   /// hold the no-data values of all bands are excluded as well, since other programs look at the
   /// mask alone.

@@ -407,6 +407,7 @@ void OpenRaster::ForgetStatistics(const Array<unsigned>& bands) {
 bool OpenRaster::ReadMasks(const BlockPlace& place, unsigned char* state) {
   const RasterLevel* const level = CheckPlace(place);
   if (level == nullptr) return false;
+  if (newRaster_ != nullptr && newRaster_->IsDescribedBeside()) return ReadNewAlpha(place, state);
   const Messages messages(Messages::Damage::kIsError);
   const Masks masks(*level, place.bands);
   if (!masks.IsNeeded()) return !messages.HasError() || messages.Fail(Name());
@@ -417,6 +418,31 @@ bool OpenRaster::ReadMasks(const BlockPlace& place, unsigned char* state) {
   }
   isDamaged_ = true;
   return messages.Fail(Name(), "the mask can't be read");
+}
+
+/// Excludes pixels of a raster that is being made, whose alpha band GDAL doesn't see.
+bool OpenRaster::ReadNewAlpha(const BlockPlace& place, unsigned char* state) const {
+  if (!newRaster_->KeepsAlpha()) return true;
+  Array<unsigned> last(ArrayDims(1));
+  last[0] = Bands() - 1;
+  const std::size_t pixels = std::size_t{place.width} * place.height;
+  const unsigned each = DataTypeBytes(dataType_);
+  std::vector<unsigned char> alpha(pixels * each);
+  const BlockPlace place1{place.left, place.top, place.width, place.height, last, 0};
+  if (!newRaster_->ReadPixels(place1, alpha.data())) return false;
+  const Strides strides(interleave_, place, 1);
+  for (unsigned i = 0; i < place.bands.GetCount(); ++i) {
+    if (place.bands[i] == last[0]) continue;
+    for (std::size_t pixel = 0; pixel < pixels; ++pixel) {
+      const unsigned char* const value = &alpha[pixel * each];
+      if (std::any_of(value, value + each, [](unsigned char byte) { return byte != 0; })) continue;
+      unsigned char& byte =
+          state[strides.band * i + strides.line * static_cast<GSpacing>(pixel / place.width) +
+                strides.pixel * static_cast<GSpacing>(pixel % place.width)];
+      byte = static_cast<unsigned char>(byte | PixelValueState::Masked);
+    }
+  }
+  return true;
 }
 
 bool OpenRaster::BuildOverviews(const char* method, unsigned levelMin, unsigned levelMax) {

@@ -6,18 +6,12 @@
 
 #include "gdal_common/source.h"
 #include "raster/raster_def.h"
+#include "tiff_writer/block_layout.h"
 
 namespace lumo::gdal {
 
 class NewRaster;
 class Twins;
-
-/// A block of pixels: where it lies in the raster, and in the caller's memory.
-struct BlockPlace {
-  unsigned left, top, width, height;  ///< in pixels of the level
-  const Array<unsigned>& bands;
-  unsigned level;
-};
 
 /// One resolution of a raster, the whole or a reduced one.
 struct RasterLevel {
@@ -112,6 +106,7 @@ class OpenRaster {
   bool Transfer(GDALRWFlag direction, const BlockPlace& place, const Strides& strides,
                 void* pixels) const;
   const RasterLevel* CheckPlace(const BlockPlace& place) const;
+  bool ReadNewAlpha(const BlockPlace& place, unsigned char* state) const;
   void ForgetStatistics(const Array<unsigned>& bands);
 
   Format format_;

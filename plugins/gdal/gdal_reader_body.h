@@ -301,8 +301,9 @@ bool Reader<T>::WritePixels(unsigned left, unsigned top, unsigned width, unsigne
                             const unsigned char* state) {
   areLevelsOld_ = PyramidExists();
   const BlockPlace place{left, top, width, height, bands, level};
-  return raster_.Write(place, pixels) &&
-         (!raster_.IsNew() || raster_.ExcludeFromNew(place, FindUntold(place, pixels, state)));
+  // The mask goes first, since levels are made of pixels as they come.
+  return (!raster_.IsNew() || raster_.ExcludeFromNew(place, FindUntold(place, pixels, state))) &&
+         raster_.Write(place, pixels);
 }
 
 /// The pixels of a block that are not valid though neither a no-data value nor the alpha band says

@@ -13,7 +13,8 @@ RasterDef::RasterDef(const RasterDef& other)
       dataType(other.dataType),
       format(other.format),
       geoRef(CloneOf(other.geoRef)),
-      metadata(other.metadata) {
+      metadata(other.metadata),
+      creation(other.creation) {
   std::copy(std::begin(other.sourceFields), std::end(other.sourceFields), std::begin(sourceFields));
 }
 

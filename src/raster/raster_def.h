@@ -4,6 +4,7 @@
 
 #include "georef/georef.h"
 #include "metadata/metadata.h"
+#include "raster/creation_options.h"
 #include "raster/raster_enums.h"
 
 namespace lumo {
@@ -46,6 +47,7 @@ struct VEXG_EXPORT RasterDef {
   String format = "Unknown";                 ///< the format's key
   GeoRefPtr geoRef;                          ///< empty when the place isn't known
   Metadata metadata;                         ///< the details of raster_details.h among it
+  CreationOptions creation;                  ///< of a raster that is to be made
 };
 
 /// Describes the pyramid that a raster has, or is to get. A value; the default is no pyramid.

@@ -8,26 +8,36 @@
 namespace lumo {
 namespace {
 
+/// The inputs of a new raster, with the creation options behind them.
+std::vector<InputDeclaration> WithCreationOptions(std::vector<InputDeclaration> inputs) {
+  for (const CreationValue& value : CreationValues()) {
+    inputs.push_back(
+        {value.input, Presence::kOptional, value.kind, value.meaning, "", value.words});
+  }
+  return inputs;
+}
+
 const CommandDeclaration kCreate{
     "CreateRasterCommand", "Rasters", "Makes a new raster in a data source.",
-    RasterDefInputs({{"ConnStr", Presence::kRequired, ValueKind::kTextList, "where it is made"},
-                     {"Format", Presence::kOptional, ValueKind::kText, "key of the format"},
-                     {"Interleave", Presence::kOptional, ValueKind::kWord,
-                      "BIP, BIL, BSQ: the order in the source", "", &WordsIn<Interleave>},
-                     {"Details", Presence::kOptional, ValueKind::kWord,
-                      "of the raster in SrcURI, as far as the format has room for them. Told: "
-                      "none; Names: the names of bands; Bands: all of the bands and the raster, "
-                      "such as units, scales and further items; All: also the place, as control "
-                      "points",
-                      "", &WordsIn<KeptDetails>},
-                     {"Categories", Presence::kOptional, ValueKind::kTextList,
-                      "names of the values of the first band, from 0 on"}}),
+    WithCreationOptions(RasterDefInputs(
+        {{"ConnStr", Presence::kRequired, ValueKind::kTextList, "where it is made"},
+         {"Format", Presence::kOptional, ValueKind::kText, "key of the format"},
+         {"Interleave", Presence::kOptional, ValueKind::kWord,
+          "BIP, BIL, BSQ: the order in the source", "", &WordsIn<Interleave>},
+         {"Details", Presence::kOptional, ValueKind::kWord,
+          "of the raster in SrcURI, as far as the format has room for them. Told: "
+          "none; Names: the names of bands; Bands: all of the bands and the raster, "
+          "such as units, scales and further items; All: also the place, as control "
+          "points",
+          "", &WordsIn<KeptDetails>},
+         {"Categories", Presence::kOptional, ValueKind::kTextList,
+          "names of the values of the first band, from 0 on"}})),
     PublishedOutputs()};
 
 class CreateRasterCommand final : public RasterDefCommand {
   CommandResult Execute() override {
     RasterDef def;
-    if (!CheckInputs() || !ReadRasterDef(def)) return Fail();
+    if (!CheckInputs() || !ReadRasterDef(def) || !ReadCreation(def)) return Fail();
     KeepDetails(def.metadata, Read<KeptDetails>("Details"));
     if (HasInput("Categories")) SetCategories(def.metadata, 0, Read<Array<String>>("Categories"));
     const auto connStrings = Read<Array<String>>("ConnStr");
@@ -37,6 +47,19 @@ class CreateRasterCommand final : public RasterDefCommand {
                   connStrings[connStrings.GetCount() - 1]);
     }
     return Publish(MakeReaderRaster(GetGlobalDataManager().CreateRaster(connStrings, def)));
+  }
+
+  /// Reads the creation options; false, with the fault set, for some that don't fit.
+  bool ReadCreation(RasterDef& def) const {
+    def.creation = {};
+    std::string fault;
+    const auto textOf = [this](const char* input) {
+      return HasInput(input) ? Read<String>(input).ToUTF8() : std::string();
+    };
+    if (ReadCreationOptions(textOf, def.creation, fault)) fault = FindCreationMisfit(def);
+    if (fault.empty()) return true;
+    SetFault(fault);
+    return false;
   }
 };
 

@@ -269,7 +269,7 @@ MadeRaster MakeKept(JobSession& session, const TargetPlace& place, Losses& losse
   raster.put = make({});
   raster.made = LookAt(session, place, losses.GetShownName(), raster.put);
   const bool isKept = CompareCounts(raster.put, raster.made).empty();
-  mayFill = mayFill && place.format != "JPEG";  // where no value stays as it is
+  mayFill = mayFill && !place.LosesValues();  // where no value stays as it is
   const FillValues fill =
       isKept || !mayFill ? FillValues() : ChooseFill(session, place, raster.put, raster.made);
   if (!fill.empty()) {

@@ -5,7 +5,9 @@
 #include "data/format_table.h"
 #include "foundation/text_case.h"
 #include "options/option_values.h"
+#include "raster/creation_options.h"
 #include "raster/pixel_types.h"
+#include "raster/raster_def.h"
 #include "verb.h"
 
 namespace lumo::host {
@@ -31,6 +33,70 @@ bool HoldsAllPixels(const std::string& format) {
   return std::find(std::begin(kFormats), std::end(kFormats), format) != std::end(kFormats);
 }
 
+/// The words that a user types for a value of the creation options: all but the told one.
+std::vector<std::string> WordsOfOption(const CreationValue& value) {
+  std::vector<std::string> words;
+  for (const char* const word : value.words()) {
+    if (std::string(word) != "Told") words.push_back(LowerCase(word));
+  }
+  return words;
+}
+
+/// True for an option of a verb that is there or not.
+bool IsFlag(const CreationValue& value) {
+  return value.kind == ValueKind::kBoolean || std::string(value.input) == "Layout";
+}
+
+/// What a verb does when an option isn't there.
+std::string DefaultTextOf(const CreationValue& value) {
+  static const std::map<std::string, std::string> kTexts = {
+      {"Compress", "zstd"}, {"Predictor", "auto"}, {"Tile", "512"}, {"BigTIFF", "auto"}};
+  const auto found = kTexts.find(value.input);
+  if (found != kTexts.end()) return "; " + found->second + " by default";
+  const bool isOverviews = std::string(value.input) == "Overviews";
+  return isOverviews ? "; average by default, nearest for classes and labels" : "";
+}
+
+/// The word of an input that a user means.
+std::string WordOfInput(const CreationValue& value, const std::string& text) {
+  if (value.words == nullptr) return text;
+  for (const char* const word : value.words()) {
+    if (LowerCase(word) == LowerCase(text)) return word;
+  }
+  return text;
+}
+
+/// The options of a file that the user says nothing of.
+CreationTexts DefaultsOf(const TargetOptions& target, const RasterInfo& raster) {
+  constexpr std::uint64_t kMostTileBytes = 16 << 20;
+  constexpr unsigned kUsualTile = 512, kLeastTile = 64;
+  const bool isByPixel =
+      raster.interleave == Interleave::BIP || raster.interleave == Interleave::BIL;
+  const std::uint64_t pixel =
+      std::uint64_t{DataTypeBytes(raster.dataType)} * (isByPixel ? raster.bands : 1);
+  unsigned side = kUsualTile;
+  while (side > kLeastTile && side * side * pixel > kMostTileBytes) side /= 2;
+  return {{"Compress", target.compatible ? "DEFLATE" : "ZSTD"},
+          {"Predictor", "Auto"},
+          {"Tile", std::to_string(side)},
+          {"BigTIFF", "Auto"}};
+}
+
+bool IsCog(const TargetOptions& target) {
+  return target.cog || LowerCase(target.format) == "cog";
+}
+
+CreationOptions ReadOptions(const CreationTexts& texts) {
+  CreationOptions options;
+  std::string fault;
+  const auto textOf = [&](const char* input) {
+    const auto found = texts.find(input);
+    return found != texts.end() ? found->second : std::string();
+  };
+  if (ReadCreationOptions(textOf, options, fault)) return options;
+  throw HostError(kExitUsage, fault);
+}
+
 }  // namespace
 
 void TargetOptions::AddTo(OptionSet& line, const std::string& meaning) {
@@ -45,6 +111,22 @@ void TargetOptions::AddFormatTo(OptionSet& line) {
       .Shows("KEY");
   line.Add("--strict", strict,
            "Fail, and make nothing, where the format does not keep all that is put in");
+  line.Add(
+      "--cog", cog,
+      "Make a cloud-optimised GeoTIFF, with its reduced levels inside; --format COG is the same");
+  line.Add("--compatible", compatible,
+           "Pack a TIFF file so that all programs can read it: by DEFLATE, not ZSTD");
+  creation.resize(CreationValues().size());
+  for (std::size_t i = 0; i < creation.size(); ++i) {
+    const CreationValue& value = CreationValues()[i];
+    if (IsFlag(value)) continue;
+    std::string help = value.meaning;
+    help.erase(std::min(help.find("; Told: "), help.size()));
+    help[0] = static_cast<char>(std::toupper(static_cast<unsigned char>(help[0])));
+    Option option = line.Add(value.option, creation[i], help + DefaultTextOf(value));
+    if (value.words != nullptr) option.Takes(OneOf(WordsOfOption(value)));
+    if (value.words == nullptr) option.Shows(value.shown);
+  }
 }
 
 std::string ChooseFormat(const TargetOptions& target) {
@@ -55,7 +137,53 @@ std::string ChooseFormat(const TargetOptions& target) {
                                     ": the name's ending tells no format; give --format, one "
                                     "of vexg formats");
   }
+  if (IsCog(target) && LowerCase(target.format) == "cog") return "TIFF";
   return FormatKey("--format", target.format);
+}
+
+void CheckCreation(const TargetOptions& target, const std::string& format) {
+  if (format == "TIFF") return;
+  if (IsCog(target)) {
+    throw HostError(kExitUsage,
+                    "--cog: a cloud-optimised file is a TIFF file, and the format is " + format);
+  }
+  for (std::size_t i = 0; i < target.creation.size(); ++i) {
+    if (target.creation[i].empty()) continue;
+    throw HostError(kExitUsage, std::string(CreationValues()[i].option) +
+                                    ": is of TIFF files, and the format is " + format);
+  }
+  if (target.compatible) {
+    throw HostError(kExitUsage, "--compatible: is of TIFF files, and the format is " + format);
+  }
+}
+
+CreationTexts ChooseCreation(const TargetOptions& target, const std::string& format,
+                             const RasterInfo& raster, const std::string& overviews) {
+  CheckCreation(target, format);
+  if (format != "TIFF") return {};
+  CreationTexts texts = DefaultsOf(target, raster);
+  const bool isCog = IsCog(target);
+  if (isCog) {
+    texts["Layout"] = "COG";
+    texts["Overviews"] = overviews;
+  }
+  for (std::size_t i = 0; i < target.creation.size(); ++i) {
+    const CreationValue& value = CreationValues()[i];
+    if (!target.creation[i].empty()) texts[value.input] = WordOfInput(value, target.creation[i]);
+  }
+  RasterDef def;
+  def.format = String(format);
+  def.bands = raster.bands;
+  def.dataType = raster.dataType;
+  def.interleave = raster.interleave;
+  def.creation = ReadOptions(texts);
+  const std::string misfit = FindCreationMisfit(def);
+  if (!misfit.empty()) throw HostError(kExitUsage, target.output + ": " + misfit);
+  return texts;
+}
+
+bool TargetPlace::LosesValues() const {
+  return format == "JPEG" || ReadOptions(creation).LosesValues();
 }
 
 std::uint64_t BytesInFile(const std::string& format, const RasterInfo& raster) {
@@ -70,6 +198,7 @@ JobWriterCommand& AddCreate(JobDraft& draft, const TargetPlace& place, const Str
   create.AddVariableInput("SrcURI", like);
   create.AddInput("Format", String(place.format));
   create.AddInput("Details", String(details));
+  for (const auto& [input, text] : place.creation) create.AddInput(input.c_str(), String(text));
   if (!noData.empty()) {
     Array<double> values{ArrayDims(static_cast<unsigned>(noData.size()))};
     std::copy(noData.begin(), noData.end(), values.begin());

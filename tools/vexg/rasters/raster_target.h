@@ -1,5 +1,6 @@
 #pragma once
 
+#include <map>
 #include <string>
 #include <vector>
 
@@ -12,9 +13,12 @@ namespace lumo::host {
 /// A raster file to make, as the command line names it.
 struct TargetOptions {
   std::string output;
-  bool isRequired = true;  ///< else the verb may make something else
-  std::string format;      ///< key; empty: the one of the name's ending
-  bool strict = false;     ///< what the format does not keep is a failure
+  bool isRequired = true;             ///< else the verb may make something else
+  std::string format;                 ///< key; empty: the one of the name's ending
+  bool strict = false;                ///< what the format does not keep is a failure
+  std::vector<std::string> creation;  ///< a text for each of CreationValues(); empty for none
+  bool cog = false;                   ///< a cloud-optimised file
+  bool compatible = false;            ///< what all programs can read
 
   /// @param meaning  what the file is, for the help.
   void AddTo(OptionSet& line, const std::string& meaning);
@@ -25,6 +29,18 @@ struct TargetOptions {
 /// The key of the format to make. Throws HostError for none that is known.
 std::string ChooseFormat(const TargetOptions& target);
 
+/// The texts of the creation options, by the names of the inputs.
+using CreationTexts = std::map<std::string, std::string>;
+
+/// Chooses how a raster lies in its file. A TIFF file is packed unless the command line says
+/// otherwise: tiles of 512 pixels, ZSTD with differences; with --compatible DEFLATE.
+/// @param overviews  how levels come about unless the command line says it: a word of
+/// OverviewMethod. Throws HostError for options that don't go with the raster.
+CreationTexts ChooseCreation(const TargetOptions& target, const std::string& format,
+                             const RasterInfo& raster, const std::string& overviews);
+/// Throws HostError for options that don't go with the format; the raster isn't known yet.
+void CheckCreation(const TargetOptions& target, const std::string& format);
+
 /// Bytes that a raster of this size, bands and pixel type takes at least in a file of this format;
 /// 0 when the format compresses, so that the size is not known in advance.
 std::uint64_t BytesInFile(const std::string& format, const RasterInfo& raster);
@@ -33,6 +49,10 @@ std::uint64_t BytesInFile(const std::string& format, const RasterInfo& raster);
 struct TargetPlace {
   std::string file;
   std::string format;
+  CreationTexts creation = {};
+
+  /// True when pixels come back as others than were written.
+  bool LosesValues() const;
 };
 
 /// Adds the command that makes a raster, into the variable "$target". Further inputs are the

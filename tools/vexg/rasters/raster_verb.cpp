@@ -42,6 +42,7 @@ RasterContents RasterVerb::ReadWanted(const JobResults& results) const {
 
 void RasterVerb::CheckOptions() {
   format_ = ChooseFormat(target_);
+  CheckCreation(target_, format_);
 }
 
 void RasterVerb::AddOpening(JobDraft& draft) const {
@@ -60,6 +61,7 @@ void RasterVerb::Plan(JobSession& session, const JobResults& opened) {
     source = PlanArea(session, {URIOf(opened, chain.GetTop()), source});
   }
   planned_ = PlanRaster(session, opened, source);
+  creation_ = ChooseCreation(target_, format_, planned_, GetOverviewMethod());
 }
 
 std::vector<std::string> RasterVerb::GetOutputs() const {
@@ -82,7 +84,7 @@ JobDraft RasterVerb::MakeDraft(const std::string& file, const FillValues& noData
   const String shown = chain.GetTop();
   AddQuery(draft, kShown, shown);
   AddDetailsQuery(draft, kShown, shown);
-  AddToCreate(draft, AddCreate(draft, {file, format_}, shown, GetKeptDetails(), GetNoData(noData)));
+  AddToCreate(draft, AddCreate(draft, PlaceAt(file), shown, GetKeptDetails(), GetNoData(noData)));
   AddMaking(draft, {shown, file, noData});
   AddCloseTarget(draft);
   AddLastQuestions(draft, shown);
@@ -117,7 +119,7 @@ void RasterVerb::MakeFurther(JobSession& session, const Outputs& outputs) {
 void RasterVerb::Make(JobSession& session, const Outputs& outputs) {
   const OutputFile& output = outputs.Get(0);
   Losses losses(output.GetShownName(), format_, target_.strict);
-  MadeRaster raster = MakeKept(session, {output.GetWorkName(), format_}, losses, MayChooseNoData(),
+  MadeRaster raster = MakeKept(session, PlaceAt(output.GetWorkName()), losses, MayChooseNoData(),
                                [&](const FillValues& noData) {
                                  const JobDraft draft = MakeDraft(output.GetWorkName(), noData);
                                  JobResults results;
@@ -131,6 +133,7 @@ void RasterVerb::Make(JobSession& session, const Outputs& outputs) {
                                  return ReadWanted(results);
                                });
   Compare(raster, losses);
+  if (PlaceAt({}).LosesValues()) losses.Add("the values of pixels exactly");
   session.CheckInterrupt();
   losses.Settle();
   MakeFurther(session, outputs);

@@ -47,6 +47,9 @@ class RasterVerb : public FileVerb {
   virtual void AddQuestions(JobDraft& /*draft*/) const {}
   /// Which of the details of what is shown the file gets: a word of KeptDetails.
   virtual const char* GetKeptDetails() const { return "All"; }
+  /// How the levels of a cloud-optimised file come about unless the user says it: a word of
+  /// OverviewMethod. Of numbers that stand for classes it isn't the mean.
+  virtual std::string GetOverviewMethod() const { return "Average"; }
   /// Adds inputs to the command that makes the file, and commands behind it.
   virtual void AddToCreate(JobDraft& /*draft*/, JobWriterCommand& /*create*/) const {}
   /// Holds what the step kMakeStep works on.
@@ -109,9 +112,11 @@ class RasterVerb : public FileVerb {
  private:
   void MakeFurther(JobSession& session, const Outputs& outputs);
   JobDraft MakeDraft(const std::string& file, const FillValues& noData) const;
+  TargetPlace PlaceAt(const std::string& file) const { return {file, format_, creation_}; }
 
   TargetOptions target_;
   std::string format_;
+  CreationTexts creation_;
   RasterInfo planned_;
 };
 

@@ -336,10 +336,18 @@ class AnalyzeVerb final {
     CheckClosed(results);
   }
 
+  /// Where a raster of so many bands is made.
+  TargetPlace PlaceOf(const std::string& file, unsigned bands) const {
+    RasterInfo made = info_;
+    made.bands = bands;
+    return {file, format_, ChooseCreation({}, format_, made, "Nearest")};
+  }
+
   void AddCalibrated(JobDraft& draft, const std::vector<std::string>& files) const {
     AddOpen(draft, "source", scene_);
     const std::vector<double> none(info_.bands, std::numeric_limits<double>::quiet_NaN());
-    JobWriterCommand& create = AddCreate(draft, {files[0], format_}, "$source", "Names", none);
+    JobWriterCommand& create =
+        AddCreate(draft, PlaceOf(files[0], info_.bands), "$source", "Names", none);
     create.AddInput("DataType", DataTypeName(recipe_.calibration->TypeCode()));
     AddCalibration(draft, kMakeStep, *recipe_.calibration, "$source", info_.bands);
     AddCloseTarget(draft);
@@ -351,7 +359,7 @@ class AnalyzeVerb final {
     const bool hasSome = recipe_.segmentBands.has_value();
     if (hasSome) AddBandView(draft, "bands", "$source", segmentBands_);
     const String shown = hasSome ? "$bands" : "$source";
-    AddLabels(AddCreate(draft, {files[0], format_}, shown, "Told", {0.0}), recipe_.segments);
+    AddLabels(AddCreate(draft, PlaceOf(files[0], 1), shown, "Told", {0.0}), recipe_.segments);
     AddFit(draft, recipe_.segments, {shown, shown});
     AddSegment(draft, kMakeStep, recipe_.segments, {shown, shown});
     AddCloseTarget(draft);
@@ -395,7 +403,7 @@ class AnalyzeVerb final {
     const ClassRequest& request = recipe_.classes;
     AddOpen(draft, "labels", {AbsoluteName(Segments()), format_});
     const double noData = static_cast<double>(request.classes.size()) + 1;
-    AddClasses(draft, AddCreate(draft, {files[0], format_}, "$labels", "Told", {noData}),
+    AddClasses(draft, AddCreate(draft, PlaceOf(files[0], 1), "$labels", "Told", {noData}),
                request.classes);
     AddScores(draft, request, "$labels", {files[1], {files.begin() + 2, files.end()}});
     AddPainting(draft, kMakeStep, "$labels", files[1]);

@@ -122,6 +122,8 @@ class ClassifyVerb final : public RasterVerb {
     }
   }
 
+  std::string GetOverviewMethod() const override { return "Nearest"; }
+
   RasterInfo PlanRaster(JobSession& session, const JobResults& opened,
                         const RasterInfo& source) override {
     if (source.dataType != kDataTypeOf<std::int32_t>) {

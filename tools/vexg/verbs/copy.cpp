@@ -91,6 +91,10 @@ class CopyVerb final : public RasterVerb {
     }
   }
 
+  std::string GetOverviewMethod() const override {
+    return palettes_.empty() ? "Average" : "Nearest";
+  }
+
   void Compare(MadeRaster& raster, Losses& losses) const override {
     CompareKept(raster, losses);
     const RasterInfo& made = raster.made.info;
@@ -103,7 +107,6 @@ class CopyVerb final : public RasterVerb {
     if (isOrdered && made.interleave != ParseInterleave(interleave_)) {
       losses.Add("the order " + interleave_);
     }
-    if (GetFormat() == "JPEG") losses.Add("the values of pixels exactly");
   }
 
   std::string bandsText_, interleave_;

@@ -54,6 +54,8 @@ class RasterizeVerb final : public RasterVerb {
     chain.Take("shapes");
   }
 
+  std::string GetOverviewMethod() const override { return "Nearest"; }
+
   RasterInfo PlanRaster(JobSession& /*session*/, const JobResults& /*opened*/,
                         const RasterInfo& source) override {
     return source;

@@ -258,6 +258,8 @@ class SegmentVerb final : public RasterVerb {
     return files;
   }
 
+  std::string GetOverviewMethod() const override { return "Nearest"; }
+
   RasterInfo PlanRaster(JobSession& /*session*/, const JobResults& /*opened*/,
                         const RasterInfo& source) override {
     if (!Is(Action::kSegment)) return source;

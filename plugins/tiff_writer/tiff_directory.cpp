@@ -1,11 +1,11 @@
-#include "tiff_directory.h"
+#include "tiff_writer/tiff_directory.h"
 
 #include <bit>
 #include <cstring>
 #include <map>
 #include <optional>
 
-namespace lumo::gdal {
+namespace lumo::tiff {
 namespace {
 
 /// Places of blocks begin at multiples of this.
@@ -29,6 +29,7 @@ enum Tag : std::uint16_t {
 
 /// Where the values of a tag lie.
 struct Entry {
+  std::uint16_t type = 0;
   unsigned valueBytes = 0;  ///< 2, 4 or 8; 0 for what is no whole number
   std::uint64_t count = 0;
   std::uint64_t offset = 0;
@@ -36,6 +37,12 @@ struct Entry {
 
 unsigned BytesOfType(std::uint16_t type) {
   return type == 3 ? 2 : type == 4 ? 4 : type == 16 ? 8 : 0;  // SHORT, LONG, LONG8
+}
+
+/// Bytes of a value of any type; 0 for an unknown one.
+unsigned BytesOfAnyType(std::uint16_t type) {
+  static constexpr unsigned kBytes[] = {0, 1, 1, 2, 4, 8, 1, 1, 2, 4, 8, 4, 8, 4, 0, 0, 8, 8, 8};
+  return type < std::size(kBytes) ? kBytes[type] : 0;
 }
 
 /// The first directory of a file.
@@ -69,6 +76,17 @@ class Directory {
     std::uint64_t value = 0;
     if (at == entries_.end() || at->second.valueBytes == 0) return absent;
     return Get(at->second.offset, &value, at->second.valueBytes) ? value : absent;
+  }
+
+  /// All tags with their values.
+  bool ReadAll(std::vector<TagValue>& tags) const {
+    for (const auto& [tag, entry] : entries_) {
+      TagValue value{tag, entry.type, entry.count, {}};
+      value.bytes.resize(entry.count * BytesOfAnyType(entry.type));
+      if (!Get(entry.offset, value.bytes.data(), value.bytes.size())) return false;
+      tags.push_back(std::move(value));
+    }
+    return true;
   }
 
   bool Has(Tag tag) const { return entries_.contains(tag); }
@@ -135,7 +153,8 @@ class Directory {
     const unsigned inside = 4 + countBytes;
     constexpr std::uint64_t kMostValues = std::uint64_t{1} << 32;
     if (entry.count > kMostValues) return;
-    if (entry.count * entry.valueBytes <= countBytes) {
+    entry.type = type;
+    if (entry.count * BytesOfAnyType(type) <= countBytes) {
       entry.offset = offset + inside;
     } else {
       std::memcpy(&entry.offset, bytes + inside, countBytes);
@@ -150,7 +169,7 @@ class Directory {
 };
 
 /// Reads the sides of the blocks, and says whether all else is as the layout has it.
-bool IsOfLayout(const Directory& directory, TiffLayout& layout) {
+bool IsOfLayout(const Directory& directory, PlainLayout& layout) {
   layout.isTiled = directory.Has(kTileOffsets);
   const auto side = [&](Tag tag, unsigned absent) {
     return static_cast<unsigned>(directory.Value(tag, absent));
@@ -171,7 +190,7 @@ bool IsOfLayout(const Directory& directory, TiffLayout& layout) {
 
 }  // namespace
 
-Placing PlaceBlocks(platform::RandomAccessFile& file, TiffLayout& layout, std::string& fault) {
+Placing PlaceBlocks(platform::RandomAccessFile& file, PlainLayout& layout, std::string& fault) {
   if constexpr (std::endian::native != std::endian::little) return Placing::kUnsuited;
   Directory directory(file);
   const auto fail = [&] {
@@ -203,4 +222,13 @@ Placing PlaceBlocks(platform::RandomAccessFile& file, TiffLayout& layout, std::s
   return isDone ? Placing::kDone : fail();
 }
 
-}  // namespace lumo::gdal
+bool ReadTags(platform::RandomAccessFile& file, std::vector<TagValue>& tags, std::string& fault) {
+  Directory directory(file);
+  tags.clear();
+  if (directory.Read() && directory.ReadAll(tags)) return true;
+  fault =
+      directory.Fault().empty() ? file.Path() + ": its directory can't be read" : directory.Fault();
+  return false;
+}
+
+}  // namespace lumo::tiff
