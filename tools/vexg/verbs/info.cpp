@@ -1,6 +1,7 @@
 #include <cmath>
 #include <iostream>
 #include <memory>
+#include <optional>
 
 #include <fmt/format.h>
 
@@ -16,6 +17,8 @@ namespace {
 
 struct Options {
   std::vector<std::string> files;
+  bool compare = false;
+  bool wkt = false;
   SourceOptions source;
   RasterJobOptions job;
   bool json = false;
@@ -123,7 +126,54 @@ Json FlagsAsJson(const Array<bool>& flags) {
   return list;
 }
 
-Json AsJson(const std::string& file, const RasterInfo& info) {
+/// What the raster says of its bands, beside RasterInfo.
+struct BandNotes {
+  std::string name, meaning, unit, scale, offset;
+  bool IsEmpty() const {
+    return name.empty() && meaning.empty() && unit.empty() && scale.empty() && offset.empty();
+  }
+};
+
+struct Notes {
+  std::vector<BandNotes> bands;
+  std::optional<unsigned> alpha;  ///< the band that says which pixels count
+  long epsg = 0;                  ///< code of the coordinate system; 0 for none
+};
+
+Notes ReadNotes(const JobResults& results, const RasterInfo& info) {
+  const Json all = Json::parse(results.Find("notes").returns.Find("Description").ToUTF8());
+  const Json& details = all["details"];
+  Notes notes;
+  for (unsigned band = 0; band < info.bands; ++band) {
+    const auto text = [&](const char* name) {
+      return details.value(fmt::format("Bands/{}/{}", band, name), std::string());
+    };
+    notes.bands.push_back(
+        {text("Description"), text("Meaning"), text("Unit"), text("Scale"), text("Offset")});
+    if (notes.bands.back().meaning == "Alpha") notes.alpha = band;
+  }
+  const Json& place = all["geoRef"];
+  if (place.is_object()) notes.epsg = place["epsg"].get<long>();
+  return notes;
+}
+
+Json NotesAsJson(const Notes& notes) {
+  const auto text = [](const std::string& of) { return of.empty() ? Json() : Json(of); };
+  const auto number = [](const std::string& of) {
+    return of.empty() ? Json() : NumberAsJson(ParseValue<double>(String(of)));
+  };
+  Json list = Json::array();
+  for (const BandNotes& band : notes.bands) {
+    list.push_back({{"name", text(band.name)},
+                    {"meaning", text(band.meaning)},
+                    {"unit", text(band.unit)},
+                    {"scale", number(band.scale)},
+                    {"offset", number(band.offset)}});
+  }
+  return list;
+}
+
+Json AsJson(const std::string& file, const RasterInfo& info, const Notes& notes) {
   return {{"file", file},
           {"format", info.format.ToUTF8()},
           {"samples", info.samples},
@@ -134,6 +184,9 @@ Json AsJson(const std::string& file, const RasterInfo& info) {
           {"blockSize", Json::array({info.tiles.width, info.tiles.height})},
           {"noData", NoDataAsJson(info)},
           {"hasPalette", FlagsAsJson(info.hasPalette)},
+          {"bandDetails", NotesAsJson(notes)},
+          {"alphaBand", notes.alpha ? Json(*notes.alpha) : Json()},
+          {"epsg", notes.epsg != 0 ? Json(notes.epsg) : Json()},
           {"canWrite", info.canWrite},
           {"hasPyramid", info.hasPyramid},
           {"pyramidLevels", info.hasPyramid ? Json::array({info.levelMin, info.levelMax}) : Json()},
@@ -155,17 +208,29 @@ std::string BandsAsText(const Json& list) {
   return all;
 }
 
-std::string GeoRefAsText(const RasterInfo& info) {
+/// The code and the name of a system, or for one without a name its projection.
+std::string SystemAsText(const GeoRef& geoRef, const Notes& notes) {
+  if (SystemText(geoRef).GetLength() == 0) return "none";
+  const CoordSysInfo& info = *geoRef.CoordinateSystem().Info();
+  std::string name = info.name.ToUTF8();
+  if (name.empty()) {
+    const std::string projection = info.projectionName.ToUTF8(), datum = info.datumName.ToUTF8();
+    name = fmt::format("without a name{}{}", projection.empty() ? "" : ", " + projection,
+                       datum.empty() ? "" : ", " + datum);
+  }
+  return notes.epsg != 0 ? fmt::format("EPSG:{} {}", notes.epsg, name) : name;
+}
+
+std::string GeoRefAsText(const RasterInfo& info, const Notes& notes, bool wkt) {
   if (!info.geoRef) return "  geo-reference  none\n";
   const GeoRef& geoRef = *info.geoRef;
-  const std::string name = geoRef.CoordinateSystem().Info()->name.ToUTF8();
-  const std::string system = SystemText(geoRef).ToUTF8();
   std::string text = fmt::format("  geo-reference  {}\n", TypeWord(geoRef));
-  text += fmt::format("  system         {}\n", !name.empty()     ? name
-                                               : !system.empty() ? system
-                                                                 : "none");
-  text +=
-      fmt::format("  pixel size     {:.10g} {:.10g}\n", geoRef.PixelSizeX(), geoRef.PixelSizeY());
+  text += fmt::format("  system         {}\n", SystemAsText(geoRef, notes));
+  if (wkt) text += fmt::format("  WKT            {}\n", SystemText(geoRef).ToUTF8());
+  const bool hasUnit = SystemText(geoRef).GetLength() != 0;
+  text += fmt::format("  pixel size     {:.10g} {:.10g}{}{}\n", geoRef.PixelSizeX(),
+                      geoRef.PixelSizeY(), hasUnit ? " " : "",
+                      hasUnit ? geoRef.CoordinateSystem().Info()->unitName.ToUTF8() : "");
   if (geoRef.GetType() != GeoRef::kRpc) {
     text += fmt::format("  tie point      pixel {} {} at {} {}\n", geoRef.TiePixelX(),
                         geoRef.TiePixelY(), geoRef.TieMapX(), geoRef.TieMapY());
@@ -180,27 +245,137 @@ std::string GeoRefAsText(const RasterInfo& info) {
   return text;
 }
 
-std::string AsText(const std::string& file, const RasterInfo& info) {
+/// A line for each band that says something of itself.
+std::string BandsAsText(const Notes& notes) {
+  std::string text;
+  for (std::size_t i = 0; i < notes.bands.size(); ++i) {
+    const BandNotes& band = notes.bands[i];
+    if (band.IsEmpty()) continue;
+    std::string words;
+    const auto add = [&](const std::string& word) {
+      if (!word.empty()) words.append(words.empty() ? "" : ", ").append(Printable(word));
+    };
+    add(band.name);
+    add(band.meaning);
+    if (!band.scale.empty() || !band.offset.empty()) {
+      add(fmt::format("value = pixel * {} + {}", band.scale.empty() ? "1" : band.scale,
+                      band.offset.empty() ? "0" : band.offset));
+    }
+    if (!band.unit.empty()) add("in " + band.unit);
+    text += fmt::format("  {:<14} {}\n", fmt::format("band {}", i), words);
+  }
+  return text;
+}
+
+std::string AsText(const std::string& file, const RasterInfo& info, const Notes& notes, bool wkt) {
   std::string text = fmt::format("{}\n", Printable(file));
   text += fmt::format("  format         {}\n", info.format.ToUTF8());
   text += fmt::format("  size           {} samples, {} lines, {} bands\n", info.samples, info.lines,
                       info.bands);
   text += fmt::format("  pixels         {}, {}\n", DataTypeName(info.dataType).ToUTF8(),
                       FormatValue(info.interleave).ToUTF8());
+  const bool isTiled = info.tiles.height > 1;
+  text += fmt::format("  blocks         {}\n",
+                      isTiled ? fmt::format("{} x {}", info.tiles.width, info.tiles.height)
+                              : std::string("whole lines"));
   text += fmt::format("  no data        {}\n", BandsAsText(NoDataAsJson(info)));
+  text += BandsAsText(notes);
+  if (notes.alpha) {
+    text += fmt::format("  valid pixels   where band {}, alpha, is not 0\n", *notes.alpha);
+  }
   if (info.hasPyramid) {
     text += fmt::format("  pyramid        {}, levels {} to {}\n", info.pyramidType.ToUTF8(),
                         info.levelMin, info.levelMax);
   }
-  return text + GeoRefAsText(info);
+  return text + GeoRefAsText(info, notes, wkt);
 }
 
 JobDraft MakeDraft(const SourceOptions& source) {
   JobDraft draft;
   AddOpenWithPyramid(draft, "raster", source);
   AddQuery(draft, "raster", "$raster");
+  draft.Step("notes", "DescribeRasterCommand").AddInput("URI", String("$raster"));
   draft.Close("close", "$raster");
   return draft;
+}
+
+/// The job that compares two rasters.
+JobDraft MakeComparison(const Options& options) {
+  JobDraft draft;
+  const char* const names[] = {"first", "second"};
+  for (unsigned i = 0; i < 2; ++i) {
+    AddOpen(draft, names[i], {options.files[i], options.source.format, {}});
+    AddQuery(draft, names[i], String(fmt::format("${}", names[i])));
+  }
+  JobWriterCommand& compare = draft.Step("compare", "CompareRasterGridsCommand");
+  compare.AddInput("URI", String("$first"));
+  compare.AddInput("OtherURI", String("$second"));
+  draft.Close("close.second", "$second");
+  draft.Close("close.first", "$first");
+  return draft;
+}
+
+/// How the first raster lies in the second.
+Json ComparisonAsJson(const Options& options, const JobResults& results) {
+  const Map<String, String>& found = results.Find("compare").returns;
+  const RasterInfo first = ReadInfo(results, "first"), second = ReadInfo(results, "second");
+  const auto flag = [&](const char* name) { return ParseValue<bool>(found.Find(name)); };
+  const auto number = [&](const char* name) {
+    return found.HasKey(name) ? NumberAsJson(ParseValue<double>(found.Find(name))) : Json();
+  };
+  constexpr double kRounding = 0.01;  // pixels
+  const bool hasPlace = found.HasKey("LargestOffset");
+  const bool isInPlace = hasPlace ? ParseValue<double>(found.Find("LargestOffset")) <= kRounding
+                                  : first.geoRefText == second.geoRefText;
+  const auto sizeOf = [](const RasterInfo& info) {
+    return Json::array({info.samples, info.lines, info.bands});
+  };
+  return {{"files", options.files},
+          {"sameGrid", flag("SameSize") && flag("SameSystem") && isInPlace},
+          {"sizes", Json::array({sizeOf(first), sizeOf(second)})},
+          {"dataTypes", Json::array({DataTypeName(first.dataType).ToUTF8(),
+                                     DataTypeName(second.dataType).ToUTF8()})},
+          {"sameSystem", flag("SameSystem")},
+          {"shift", hasPlace ? Json::array({number("ShiftX"), number("ShiftY")}) : Json()},
+          {"scale", hasPlace ? Json::array({number("ScaleX"), number("ScaleY")}) : Json()},
+          {"rotation", number("Rotation")},
+          {"largestOffset", number("LargestOffset")}};
+}
+
+std::string ComparisonAsText(const Json& all) {
+  const auto number = [](const Json& of) {
+    return of.is_number() ? fmt::format("{:.6g}", of.get<double>()) : std::string("unknown");
+  };
+  const auto size = [](const Json& of) {
+    return fmt::format("{} samples, {} lines, {} bands", of[0].dump(), of[1].dump(), of[2].dump());
+  };
+  std::string text = fmt::format("{}\n{}\n", Printable(all["files"][0].get<std::string>()),
+                                 Printable(all["files"][1].get<std::string>()));
+  text += fmt::format("  grids          {}\n", all["sameGrid"].get<bool>() ? "the same" : "differ");
+  for (const Json& of : all["sizes"]) text += fmt::format("  size           {}\n", size(of));
+  text += fmt::format("  pixels         {}, {}\n", all["dataTypes"][0].get<std::string>(),
+                      all["dataTypes"][1].get<std::string>());
+  text +=
+      fmt::format("  system         {}\n", all["sameSystem"].get<bool>() ? "the same" : "differ");
+  if (all["shift"].is_null()) return text + "  place          unknown\n";
+  text += fmt::format("  shift          {} samples, {} lines\n", number(all["shift"][0]),
+                      number(all["shift"][1]));
+  text += fmt::format("  scale          {} {}\n", number(all["scale"][0]), number(all["scale"][1]));
+  text += fmt::format("  rotation       {} degrees\n", number(all["rotation"]));
+  return text + fmt::format("  offset         {} pixels at most\n", number(all["largestOffset"]));
+}
+
+int Compare(const Options& options) {
+  if (options.files.size() != 2) throw HostError(kExitUsage, "--compare: takes two rasters");
+  const JobDraft draft = MakeComparison(options);
+  if (options.job.printJob) {
+    std::cout << draft.Write().ToUTF8() << '\n';
+    return kExitSuccess;
+  }
+  JobSession session(options.job);
+  const Json all = ComparisonAsJson(options, session.Run(draft));
+  std::cout << (options.json ? all.dump(2) + "\n" : ComparisonAsText(all));
+  return all["sameGrid"].get<bool>() ? kExitSuccess : kExitFailed;
 }
 
 int PrintJobs(const Options& options) {
@@ -226,10 +401,12 @@ void Tell(JobSession& session, const Options& options, const std::string& file, 
                  : void(text.append(gap).append(VectorAsText(file, layers)));
     return;
   }
-  const RasterInfo info = ReadInfo(
-      session.Run(MakeDraft({file, options.source.format, options.source.subdataset})), "raster");
-  options.json ? all.push_back(AsJson(file, info))
-               : void(text.append(gap).append(AsText(file, info)));
+  const JobResults results =
+      session.Run(MakeDraft({file, options.source.format, options.source.subdataset}));
+  const RasterInfo info = ReadInfo(results, "raster");
+  const Notes notes = ReadNotes(results, info);
+  options.json ? all.push_back(AsJson(file, info, notes))
+               : void(text.append(gap).append(AsText(file, info, notes, options.wkt)));
 }
 
 int Info(const Options& options) {
@@ -264,10 +441,16 @@ const VerbRegistration registration(
           "vector file, which its ending tells, there are \"file\" and \"layers\".");
       line.AddExample("vexg info --json scene.tif");
       line.Add("files", options->files, "Rasters and vector files").IsFile().Required();
+      line.Add(
+          "--compare", options->compare,
+          "Tell how the grid of the first raster lies in that of the second; exit code 1 where "
+          "they differ");
+      line.Add("--wkt", options->wkt, "With the text of the coordinate system");
       line.Add("--json", options->json, "As JSON");
       options->source.AddFormatTo(line);
       options->job.AddTo(line);
-      return VerbRegistration::Work([options] { return Info(*options); });
+      return VerbRegistration::Work(
+          [options] { return options->compare ? Compare(*options) : Info(*options); });
     });
 
 }  // namespace
