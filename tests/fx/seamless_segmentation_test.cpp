@@ -197,6 +197,8 @@ TEST(SeamlessSegmentation, SaysWhatMergingNeedsBeforeAnythingIsWritten) {
   EXPECT_FALSE(SeamlessSegmentation<std::uint8_t>(scene, scene, labels, request).Run());
   EXPECT_THAT(TakeFault().ToUTF8(), testing::HasSubstr("bytes of memory, and may take 1000"));
   EXPECT_EQ(labels->pixels, Labels(3600, 0));
+  // Told bounds: 180 bytes for a segment of 4 bands with its pairs.
+  EXPECT_LE(MemoryOfMerging(1000, 4, request), 180'000U);
   request.mergeValue = 0;  // no graph is made
   EXPECT_TRUE(SeamlessSegmentation<std::uint8_t>(scene, scene, labels, request).Run());
 }
