@@ -1,18 +1,11 @@
 #include "fx/lambda_schedule.h"
 
 #include <algorithm>
-#include <cmath>
 #include <memory>
 
 #include "tasks/parallel.h"
 
 namespace lumo {
-namespace {
-
-constexpr double kCostLimit = 2147483647.0;  // a pair of this cost or more is never merged
-
-}  // namespace
-
 void LambdaSchedule::Begin(std::uint32_t labelCount, std::uint32_t bands) {
   bands_ = bands;
   count_ = labelCount;
@@ -64,18 +57,9 @@ void LambdaSchedule::ForEachPair(std::uint32_t region, Visit&& visit) {
 }
 
 double LambdaSchedule::CostOf(const Pair& pair) const {
-  const double a = RegionOf(pair.ids[0]).area, b = RegionOf(pair.ids[1]).area;
-  if (a == 0 || b == 0 || pair.length == 0) return 0;
-  if (a + b > limits_.mostPixels) return std::numeric_limits<double>::infinity();
-  const double* const u = MeansOf(pair.ids[0]);
-  const double* const v = MeansOf(pair.ids[1]);
-  double sum = 0;
-  for (std::uint32_t band = 0; band < bands_; ++band) {
-    const double difference = u[band] - v[band];
-    sum += difference * difference;
-  }
-  const double cost = a * b / (a + b) * sum / pair.length;
-  return limits_.compactness == 0 ? cost : cost / std::pow(pair.length, limits_.compactness);
+  return MergeCost({RegionOf(pair.ids[0]).area, MeansOf(pair.ids[0])},
+                   {RegionOf(pair.ids[1]).area, MeansOf(pair.ids[1])}, bands_, pair.length,
+                   limits_);
 }
 
 /// Makes a pair the nearest of a region, and queues it when it is that of both of its regions.
@@ -103,7 +87,7 @@ void LambdaSchedule::Push(const Queued& entry) {
 /// The pair of a region that costs least; of equal costs the one with the lowest neighbour.
 std::uint32_t LambdaSchedule::NearestOf(std::uint32_t region) {
   std::uint32_t best = kNone;
-  double bestCost = kCostLimit;
+  double bestCost = kMergeCostLimit;
   ForEachPair(region, [&](std::uint32_t pair) {
     const double cost = pairs_[pair].cost;
     if (!(cost <= bestCost)) return;  // nor is a cost that is no number ever the least
@@ -169,7 +153,7 @@ void LambdaSchedule::JoinMeans(std::uint32_t lower, std::uint32_t higher) {
   double* const u = MeansOf(lower);
   const double* const v = MeansOf(higher);
   for (std::uint32_t band = 0; band < bands_; ++band) {
-    u[band] = a + b != 0 ? b / (a + b) * v[band] + a / (a + b) * u[band] : 0;
+    u[band] = JoinedMean(a, u[band], b, v[band]);
   }
   RegionOf(lower).area = a + b;
 }

@@ -8,24 +8,14 @@
 #include <vector>
 
 #include "fx/label_pairs.h"
+#include "fx/merge_cost.h"
 #include "platform/huge_pages.h"
 
 namespace lumo {
 
-/// Limits how segments grow.
-struct GrowthLimits {
-  /// The pixels of a segment at most: a pair that has more together is not merged.
-  double mostPixels = std::numeric_limits<double>::infinity();
-  /// A cost is divided by l to the power of this besides, l the length of the common boundary:
-  /// above 0, segments with much common boundary merge earlier, which makes them more compact.
-  double compactness = 0;
-};
-
-/// Neighbouring segments of a label image, and the cost of joining them: for segments of a and b
-/// pixels with mean band vectors u and v and a common boundary of l pixel edges
-/// a b / (a + b) * |u - v|^2 / l (Robinson, Redding and Crisp, Implementation of a fast algorithm
-/// for segmenting SAR imagery, 2002). Merges the cheapest pair of mutually nearest segments, one
-/// after the other, with costs brought up to date after each.
+/// Neighbouring segments of a label image, and the cost of joining them (MergeCost). Merges the
+/// cheapest pair of mutually nearest segments, one after the other, with costs brought up to date
+/// after each.
 ///
 /// Ties: a segment's nearest neighbour is the one of the lowest label among equal costs when all
 /// are searched, and the pair that was found first when a cost has changed; of equal costs the pair

@@ -46,6 +46,7 @@ class SeamlessSegmentation {
   bool KeepBasins(const LambdaSchedule& schedule);
   bool CutOwnTree();
   bool MergeRigorously();
+  bool MergeLocally();
   bool Write();
   IPC NextPass() const;
   TileDimensions Strips(unsigned border) const;

@@ -89,6 +89,10 @@ inline void AddTo(LambdaSchedule& schedule, std::uint32_t label, const auto* val
                   const unsigned char* /*states*/, unsigned /*bands*/) {
   schedule.AddPixel(label, values, 1);
 }
+inline void AddTo(LocalMerge& merge, std::uint32_t label, const auto* values,
+                  const unsigned char* /*states*/, unsigned /*bands*/) {
+  merge.AddPixel(label, values);
+}
 inline void AddTo(RigorousMerge& merge, std::uint32_t label, const auto* values,
                   const unsigned char* states, unsigned bands) {
   if (IsUsable(states, bands)) merge.AddPixel(label, values, 1);
@@ -174,7 +178,8 @@ bool SeamlessSegmentation<T>::Merge() {
     SetFault(MemoryFault(watershed_.Count(), needed, request_.memory));
     return false;
   }
-  return request_.isRigorous ? MergeRigorously() : MergeBySchedule();
+  if (request_.isRigorous) return MergeRigorously();
+  return request_.order == MergeOrder::kLocal ? MergeLocally() : MergeBySchedule();
 }
 
 /// Adds all pixels to a graph, in raster order, and finds the neighbours.
@@ -373,6 +378,19 @@ bool SeamlessSegmentation<T>::MergeRigorously() {
   list.pairs.reserve(std::size_t{3} * count);
   if (!Gather(merge, list)) return false;
   if (!IsAborted()) roots_ = merge.Join(list.pairs, request_.mergeValue);
+  return true;
+}
+
+template <typename T>
+bool SeamlessSegmentation<T>::MergeLocally() {
+  const std::uint32_t count = watershed_.Count();
+  watershed_.TakeRanks();
+  LocalMerge merge;
+  merge.Begin(count + 1, merge_->Bands());
+  merge.Limit(request_.growth);
+  merge.ReservePairs(std::size_t{3} * count);
+  if (!Gather(merge, merge)) return false;
+  if (!IsAborted()) roots_ = merge.Join(request_.mergeValue, request_.rounds, ipc_.abort.Get());
   return true;
 }
 

@@ -114,6 +114,14 @@ class SegmentVerb final : public RasterVerb {
              "--merge-value at once")
         .Takes(OneOf({"schedule", "rigorous"}))
         .ShowsDefault();
+    line.Add("--order", request_.order,
+             "global: the cheapest pair anywhere is merged first; local: in rounds, all pairs at "
+             "once "
+             "that cost both of their segments least")
+        .Takes(OneOf({"global", "local"}))
+        .ShowsDefault();
+    line.Add("--rounds", request_.rounds, "With --order local: how many; 12 by default")
+        .Within(1, 1000);
     line.Add("--merge-raster", mergeRaster_,
              "A raster of the same size and pixel type whose bands drive merging, instead of "
              "INPUT's")
