@@ -123,19 +123,37 @@ def speed(bench):
         peers["GRASS i.segment"] = grass_segment(bench, scene, theirs, 0.05)
     bench.compare("watershed and schedule", merged, peers,
                   {"scikit-image": 0.1, "GRASS i.segment": 0.1, "felzenszwalb": 0.2}, [labels, theirs])
-    large, _ = fields(bench, 4000)
-    swap = [large if word == scene else word for word in merged]
-    bench.compare("16 times as many pixels", swap, {"once more": swap}, clean=[labels])
-    print("  two threads", end=": ")
-    times = {threads: min(bench.once(swap, {"LUMO_THREADS_HINT": str(threads)})[0]
+    whole(bench, merged, scene, labels)
+
+
+def two_threads(bench, what, command, labels, aim):
+    """How many times as long a command takes with one thread as with two."""
+    times = {threads: min(bench.once(command, {"LUMO_THREADS_HINT": str(threads)})[0]
                           for _ in range(bench.options.runs) if labels.unlink(missing_ok=True) is None)
              for threads in (1, 2)}
-    print(f"{times[1] / times[2]:.2f} times one")
-    tiled = [*swap, "--tiled"]
-    bench.compare("as a whole, 4000 x 4000 x 6", swap, {"in tiles": tiled}, clean=[labels])
+    ratio = times[1] / times[2]
+    print(f"  {what}: two threads {ratio:.2f} times one (aim {aim}{'' if ratio >= aim else ', MISSED'})")
+
+
+def whole(bench, merged, scene, labels):
+    """A raster as a whole beside tiles and smaller ones, in rounds, with a tree, and its cuts."""
+    on = lambda file, *options: [file if word == scene else word for word in merged] + list(options)
+    large, _ = fields(bench, 4000)
+    bench.compare("as a whole, 4000 x 4000 x 6", on(large), {"in tiles": on(large, "--tiled")}, 1.3, clean=[labels])
+    two_threads(bench, "as a whole", on(large), labels, 1.5)
+    bench.compare("in rounds", on(large, "--order", "local"), {"the cheapest first": on(large)}, clean=[labels])
+    two_threads(bench, "in rounds", on(large, "--order", "local"), labels, 1.5)
+    tree = bench.work / "fields.tree"
+    bench.compare("with a tree", on(large, "--tree", tree), {"without": on(large)}, clean=[labels, tree])
+    bench.once(on(large, "--tree", tree))
+    cut = [bench.vexg, "segment", "cut", tree, labels, "-q", "--merge-value", "100"]
+    bench.compare("a cut", cut, {"a run": on(large)}, clean=[labels])
+    tree.unlink(missing_ok=True)
+    small, _ = bench.compare("as a whole, 1000 x 1000 x 6", merged, {"in tiles": [*merged, "--tiled"]}, 1.3, clean=[labels])
     huge, _ = fields(bench, 10000)
-    bench.compare("as a whole, 10,000 x 10,000 x 6", [huge if word == large else word for word in swap],
-                  {"in tiles": [huge if word == large else word for word in tiled]}, clean=[labels])
+    most, _ = bench.compare("as a whole, 10,000 x 10,000 x 6", on(huge), {"in tiles": on(huge, "--tiled")}, 1.3, clean=[labels])
+    growth = most / small / 100
+    print(f"  a pixel of 10,000 x 10,000 takes {growth:.2f} times one of 1000 x 1000 (aim 1.3{'' if growth <= 1.3 else ', MISSED'})")
     labels.unlink(missing_ok=True)
 
 

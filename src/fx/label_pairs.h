@@ -38,15 +38,9 @@ class VEXG_EXPORT LabelPairs {
     ++pairs_[lastPair_].length;
   }
 
-  /// Counts `length` edges between two labels that differ, in any order.
-  void AddEdges(std::uint32_t a, std::uint32_t b, std::uint32_t length) {
-    pairs_[FindOrAdd(a < b ? KeyOf(a, b) : KeyOf(b, a))].length += length;
-  }
-
-  /// Frees what is needed to add more, and gives the pairs.
-  std::vector<LabelPair> TakePairs() {
-    table_ = {};
-    return std::move(pairs_);
+  /// The number of a pair of two labels that differ, which is added where it isn't there yet.
+  std::uint32_t NumberOf(std::uint32_t a, std::uint32_t b) {
+    return FindOrAdd(a < b ? KeyOf(a, b) : KeyOf(b, a));
   }
 
   /// The pairs so far; the reference is good until the next edge.

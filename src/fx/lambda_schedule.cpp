@@ -1,163 +1,193 @@
 #include "fx/lambda_schedule.h"
 
 #include <algorithm>
-#include <cmath>
+#include <memory>
+
+#include "tasks/parallel.h"
 
 namespace lumo {
-namespace {
-
-constexpr double kCostLimit = 2147483647.0;  // a pair of this cost or more is never merged
-
-}  // namespace
-
 void LambdaSchedule::Begin(std::uint32_t labelCount, std::uint32_t bands) {
   bands_ = bands;
-  regions_.assign(labelCount, {});
-  means_.assign(std::size_t{labelCount} * bands, 0.0);
+  count_ = labelCount;
+  stride_ = BytesOfSegment(bands);
+  regions_.resize(labelCount * stride_);
+  for (std::uint32_t label = 0; label < labelCount; ++label) {
+    std::byte* const at = regions_.data() + label * stride_;
+    (new (at) Region)->rank = label;
+    std::uninitialized_fill_n(reinterpret_cast<double*>(at + sizeof(Region)), bands, 0.0);
+  }
   limits_ = {};
-  ranks_.clear();
   pairs_.clear();
-  queue_ = {};
-  pairTo_.assign(labelCount, kNone);
+  queue_.clear();
+}
+
+void LambdaSchedule::CompareBy(std::vector<std::uint32_t>&& ranks) {
+  for (std::uint32_t label = 0; label < count_; ++label) RegionOf(label).rank = ranks[label];
+  ranks = {};
+}
+
+void LambdaSchedule::AddPair(const LabelPair& pair) {
+  Pair& added = pairs_.emplace_back();
+  added.ids[0] = pair.low;
+  added.ids[1] = pair.high;
+  added.length = pair.length;
 }
 
 void LambdaSchedule::Link(std::uint32_t pair, std::uint32_t region) {
   Pair& linked = pairs_[pair];
-  const unsigned slot = linked.SlotOf(region);
-  const std::uint32_t first = regions_[region].first;
-  linked.next[slot] = first;
-  linked.previous[slot] = kNone;
-  if (first != kNone) pairs_[first].previous[pairs_[first].SlotOf(region)] = pair;
-  regions_[region].first = pair;
+  Region& owner = RegionOf(region);
+  linked.next[linked.SlotOf(region)] = owner.first;
+  owner.first = pair;
 }
 
-void LambdaSchedule::Unlink(std::uint32_t pair, std::uint32_t region) {
-  const Pair& linked = pairs_[pair];
-  const unsigned slot = linked.SlotOf(region);
-  const std::uint32_t next = linked.next[slot], previous = linked.previous[slot];
-  if (next != kNone) pairs_[next].previous[pairs_[next].SlotOf(region)] = previous;
-  if (previous != kNone) {
-    pairs_[previous].next[pairs_[previous].SlotOf(region)] = next;
-  } else {
-    regions_[region].first = next;
-  }
-}
-
+/// Calls `visit(pair)` for the pairs of a region, and takes those out that are none any more.
 template <typename Visit>
 void LambdaSchedule::ForEachPair(std::uint32_t region, Visit&& visit) {
-  for (std::uint32_t pair = regions_[region].first; pair != kNone;) {
-    const std::uint32_t next = pairs_[pair].next[pairs_[pair].SlotOf(region)];
-    visit(pair);
-    pair = next;
+  std::uint32_t* link = &RegionOf(region).first;
+  while (*link != kNone) {
+    Pair& at = pairs_[*link];
+    const unsigned slot = at.SlotOf(region);
+    if (at.length == 0) {
+      *link = at.next[slot];
+      continue;
+    }
+    link = &at.next[slot];
+    visit(static_cast<std::uint32_t>(&at - pairs_.data()));
   }
 }
 
 double LambdaSchedule::CostOf(const Pair& pair) const {
-  const double a = regions_[pair.ids[0]].area, b = regions_[pair.ids[1]].area;
-  if (a == 0 || b == 0 || pair.length == 0) return 0;
-  if (a + b > limits_.mostPixels) return std::numeric_limits<double>::infinity();
-  const double* const u = means_.data() + std::size_t{pair.ids[0]} * bands_;
-  const double* const v = means_.data() + std::size_t{pair.ids[1]} * bands_;
-  double sum = 0;
-  for (std::uint32_t band = 0; band < bands_; ++band) {
-    const double difference = u[band] - v[band];
-    sum += difference * difference;
-  }
-  const double cost = a * b / (a + b) * sum / pair.length;
-  return limits_.compactness == 0 ? cost : cost / std::pow(pair.length, limits_.compactness);
+  return MergeCost({RegionOf(pair.ids[0]).area, MeansOf(pair.ids[0])},
+                   {RegionOf(pair.ids[1]).area, MeansOf(pair.ids[1])}, bands_, pair.length,
+                   limits_);
 }
 
 /// Makes a pair the nearest of a region, and queues it when it is that of both of its regions.
 void LambdaSchedule::Choose(std::uint32_t region, std::uint32_t pair) {
   Pair& chosen = pairs_[pair];
-  regions_[region].minimum = pair;
+  RegionOf(region).minimum = pair;
   if (chosen.isChosen) {
     chosen.isQueued = true;
-    queue_.push({chosen.cost, pair});
+    Push({chosen.cost, pair});
   } else {
     chosen.isChosen = true;
   }
 }
 
-void LambdaSchedule::FindNearest(std::uint32_t region) {
-  std::uint32_t best = kNone, bestRank = 0;
-  double bestCost = kCostLimit;
+/// Puts a pair into the queue, which holds fewer pairs that count than there are segments.
+void LambdaSchedule::Push(const Queued& entry) {
+  if (queue_.size() == queue_.capacity() && queue_.size() >= count_) {
+    std::erase_if(queue_, [this](const Queued& queued) { return !IsCurrent(queued); });
+    std::make_heap(queue_.begin(), queue_.end());
+  }
+  queue_.push_back(entry);
+  std::push_heap(queue_.begin(), queue_.end());
+}
+
+/// The pair of a region that costs least; of equal costs the one with the lowest neighbour.
+std::uint32_t LambdaSchedule::NearestOf(std::uint32_t region) {
+  std::uint32_t best = kNone;
+  double bestCost = kMergeCostLimit;
   ForEachPair(region, [&](std::uint32_t pair) {
     const double cost = pairs_[pair].cost;
     if (!(cost <= bestCost)) return;  // nor is a cost that is no number ever the least
-    const std::uint32_t rank = RankOf(pairs_[pair].Other(region));
-    if (cost == bestCost && (best == kNone || rank > bestRank)) return;
+    if (cost == bestCost && (best == kNone || RankOf(pairs_[pair].Other(region)) >
+                                                  RankOf(pairs_[best].Other(region)))) {
+      return;
+    }
     best = pair;
-    bestRank = rank;
     bestCost = cost;
   });
+  return best;
+}
+
+void LambdaSchedule::FindNearest(std::uint32_t region) {
+  const std::uint32_t best = NearestOf(region);
   if (best != kNone) {
     Choose(region, best);
   } else {
-    regions_[region].minimum = kNone;
+    RegionOf(region).minimum = kNone;
   }
 }
 
 void LambdaSchedule::Build(const std::vector<LabelPair>& pairs) {
-  pairs_.resize(pairs.size());
+  ReservePairs(pairs.size());
+  for (const LabelPair& pair : pairs) AddPair(pair);
+  Build();
+}
+
+void LambdaSchedule::Build() {
+  constexpr unsigned kPart = 1U << 16U;
+  const auto forEach = [](std::size_t count, const auto& work) {
+    const auto parts = static_cast<unsigned>((count + kPart - 1) / kPart);
+    ParallelFor(parts, nullptr, [&](unsigned part) {
+      const std::size_t end = std::min<std::size_t>(count, std::size_t{part + 1} * kPart);
+      for (std::size_t i = std::size_t{part} * kPart; i < end; ++i) {
+        work(static_cast<std::uint32_t>(i));
+      }
+    });
+  };
   for (std::uint32_t i = 0; i < pairs_.size(); ++i) {
-    pairs_[i] = {};
-    pairs_[i].ids[0] = pairs[i].low;
-    pairs_[i].ids[1] = pairs[i].high;
-    pairs_[i].length = pairs[i].length;
-    Link(i, pairs[i].low);
-    Link(i, pairs[i].high);
+    Link(i, pairs_[i].ids[0]);
+    Link(i, pairs_[i].ids[1]);
   }
-  for (std::size_t label = 0; label < regions_.size(); ++label) {
-    const double area = regions_[label].area;
-    if (area == 0) continue;
-    for (std::uint32_t band = 0; band < bands_; ++band) means_[label * bands_ + band] /= area;
-  }
-  for (Pair& pair : pairs_) pair.cost = CostOf(pair);
-  for (std::uint32_t label = 1; label < regions_.size(); ++label) {
-    if (regions_[label].area > 0) FindNearest(label);
+  forEach(count_, [this](std::uint32_t label) {
+    const double area = RegionOf(label).area;
+    if (area == 0) return;
+    double* const means = MeansOf(label);
+    for (std::uint32_t band = 0; band < bands_; ++band) means[band] /= area;
+  });
+  forEach(pairs_.size(), [this](std::uint32_t pair) { pairs_[pair].cost = CostOf(pairs_[pair]); });
+  forEach(count_, [this](std::uint32_t label) {
+    if (label != 0 && RegionOf(label).area > 0) RegionOf(label).minimum = NearestOf(label);
+  });
+  queue_.reserve(count_);
+  for (std::uint32_t label = 1; label < count_; ++label) {
+    const std::uint32_t nearest = RegionOf(label).minimum;
+    if (nearest != kNone) Choose(label, nearest);
   }
 }
 
 void LambdaSchedule::JoinMeans(std::uint32_t lower, std::uint32_t higher) {
-  const double a = regions_[lower].area, b = regions_[higher].area;
-  double* const u = means_.data() + std::size_t{lower} * bands_;
-  const double* const v = means_.data() + std::size_t{higher} * bands_;
+  const double a = RegionOf(lower).area, b = RegionOf(higher).area;
+  double* const u = MeansOf(lower);
+  const double* const v = MeansOf(higher);
   for (std::uint32_t band = 0; band < bands_; ++band) {
-    u[band] = a + b != 0 ? b / (a + b) * v[band] + a / (a + b) * u[band] : 0;
+    u[band] = JoinedMean(a, u[band], b, v[band]);
   }
-  regions_[lower].area = a + b;
+  RegionOf(lower).area = a + b;
 }
 
 /// Gives the pairs of `higher` to `lower`, joining those with common neighbours.
 void LambdaSchedule::TakeOverPairs(std::uint32_t lower, std::uint32_t higher) {
-  ForEachPair(lower, [&](std::uint32_t pair) { pairTo_[pairs_[pair].Other(lower)] = pair; });
-  ForEachPair(higher, [&](std::uint32_t pair) {
-    const std::uint32_t neighbour = pairs_[pair].Other(higher);
-    const std::uint32_t common = pairTo_[neighbour];
-    if (common != kNone) {
-      pairs_[common].length += pairs_[pair].length;
-      Unlink(pair, neighbour);
-    } else {
-      Relabel(pair, higher, lower);
+  ForEachPair(lower,
+              [&](std::uint32_t pair) { RegionOf(pairs_[pair].Other(lower)).pairTo = pair; });
+  for (std::uint32_t pair = RegionOf(higher).first; pair != kNone;) {
+    Pair& taken = pairs_[pair];
+    const unsigned slot = taken.SlotOf(higher);
+    const std::uint32_t next = taken.next[slot];
+    if (taken.length != 0) {
+      const std::uint32_t common = RegionOf(taken.ids[1 - slot]).pairTo;
+      if (common != kNone) {
+        pairs_[common].length += taken.length;
+        taken.length = 0;
+      } else {
+        taken.ids[slot] = lower;
+        Link(pair, lower);
+      }
     }
-  });
-  regions_[higher].first = kNone;
-  ForEachPair(lower, [&](std::uint32_t pair) { pairTo_[pairs_[pair].Other(lower)] = kNone; });
-}
-
-/// Gives a pair of a region to another one; its place in the list of the first is forgotten.
-void LambdaSchedule::Relabel(std::uint32_t pair, std::uint32_t from, std::uint32_t to) {
-  Pair& moved = pairs_[pair];
-  moved.ids[moved.SlotOf(from)] = to;
-  Link(pair, to);
+    pair = next;
+  }
+  RegionOf(higher).first = kNone;
+  ForEachPair(lower,
+              [&](std::uint32_t pair) { RegionOf(pairs_[pair].Other(lower)).pairTo = kNone; });
 }
 
 /// Looks whether the nearest of a neighbour of `lower` has changed by the merge.
 /// @param pair  of the neighbour and `lower`.
 void LambdaSchedule::UpdateNearest(std::uint32_t neighbour, std::uint32_t pair, std::uint32_t lower,
                                    std::uint32_t higher) {
-  const std::uint32_t minimum = regions_[neighbour].minimum;
+  const std::uint32_t minimum = RegionOf(neighbour).minimum;
   if (minimum == kNone) return FindNearest(neighbour);
   Pair& nearest = pairs_[minimum];
   const Pair& changed = pairs_[pair];
@@ -186,8 +216,7 @@ void LambdaSchedule::Join(std::uint32_t pair, Merge& merge) {
   merge.lower = lower;
   merge.higher = higher;
   merge.border = pairs_[pair].length;
-  Unlink(pair, lower);
-  Unlink(pair, higher);
+  pairs_[pair].length = 0;
   JoinMeans(lower, higher);
   TakeOverPairs(lower, higher);
 }
@@ -196,31 +225,57 @@ void LambdaSchedule::Join(std::uint32_t pair, Merge& merge) {
 bool LambdaSchedule::FindCheapest(std::uint32_t region, std::uint32_t& pair, double& cost) const {
   pair = kNone;
   std::uint32_t bestRank = 0;
-  for (std::uint32_t at = regions_[region].first; at != kNone;) {
+  for (std::uint32_t at = RegionOf(region).first; at != kNone;) {
     const Pair& seen = pairs_[at];
+    at = seen.next[seen.SlotOf(region)];
+    if (seen.length == 0) continue;
     const double costs = CostOf(seen);
     const std::uint32_t rank = RankOf(seen.Other(region));
     if (pair == kNone || costs < cost || (!(costs > cost) && rank < bestRank)) {
-      pair = at;
+      pair = static_cast<std::uint32_t>(&seen - pairs_.data());
       cost = costs;
       bestRank = rank;
     }
-    at = seen.next[seen.SlotOf(region)];
   }
   return pair != kNone;
 }
 
+/// Has the processor fetch what the next steps are likely to need, while this one goes on.
+void LambdaSchedule::FetchNext() const {
+  constexpr std::size_t kAhead = 7;  // the three uppermost rows of the heap
+  for (std::size_t i = 1; i < std::min(kAhead, queue_.size()); ++i) {
+    const Pair& pair = pairs_[queue_[i].pair];
+    if (i > 2) {
+      __builtin_prefetch(&pair);
+      continue;
+    }
+    for (const std::uint32_t region : pair.ids) {
+      __builtin_prefetch(&RegionOf(region));
+      __builtin_prefetch(&pairs_[std::min<std::size_t>(RegionOf(region).first, pairs_.size() - 1)]);
+    }
+  }
+}
+
 bool LambdaSchedule::Step(Merge& merge) {
-  while (!queue_.empty() && !IsCurrent(queue_.top())) queue_.pop();
+  const auto pop = [this] {
+    std::pop_heap(queue_.begin(), queue_.end());
+    queue_.pop_back();
+  };
+  while (!queue_.empty() && !IsCurrent(queue_.front())) pop();
   if (queue_.empty()) return false;
-  const Queued top = queue_.top();
-  queue_.pop();
+  const Queued top = queue_.front();
+  pop();
+  FetchNext();
   Pair& merged = pairs_[top.pair];
   merged.isQueued = false;
   merge.lambda = top.cost;
   Join(top.pair, merge);
   const std::uint32_t lower = merge.lower, higher = merge.higher;
-  ForEachPair(lower, [&](std::uint32_t pair) { pairs_[pair].cost = CostOf(pairs_[pair]); });
+  ForEachPair(lower, [&](std::uint32_t pair) {
+    pairs_[pair].cost = CostOf(pairs_[pair]);
+    const std::uint32_t nearest = RegionOf(pairs_[pair].Other(lower)).minimum;
+    if (nearest != kNone) __builtin_prefetch(&pairs_[nearest]);
+  });
   ForEachPair(lower, [&](std::uint32_t pair) {
     UpdateNearest(pairs_[pair].Other(lower), pair, lower, higher);
   });

@@ -3,27 +3,19 @@
 #include <cstddef>
 #include <cstdint>
 #include <limits>
+#include <new>
 #include <queue>
 #include <vector>
 
 #include "fx/label_pairs.h"
+#include "fx/merge_cost.h"
+#include "platform/huge_pages.h"
 
 namespace lumo {
 
-/// Limits how segments grow.
-struct GrowthLimits {
-  /// The pixels of a segment at most: a pair that has more together is not merged.
-  double mostPixels = std::numeric_limits<double>::infinity();
-  /// A cost is divided by l to the power of this besides, l the length of the common boundary:
-  /// above 0, segments with much common boundary merge earlier, which makes them more compact.
-  double compactness = 0;
-};
-
-/// Neighbouring segments of a label image, and the cost of joining them: for segments of a and b
-/// pixels with mean band vectors u and v and a common boundary of l pixel edges
-/// a b / (a + b) * |u - v|^2 / l (Robinson, Redding and Crisp, Implementation of a fast algorithm
-/// for segmenting SAR imagery, 2002). Merges the cheapest pair of mutually nearest segments, one
-/// after the other, with costs brought up to date after each.
+/// Neighbouring segments of a label image, and the cost of joining them (MergeCost). Merges the
+/// cheapest pair of mutually nearest segments, one after the other, with costs brought up to date
+/// after each.
 ///
 /// Ties: a segment's nearest neighbour is the one of the lowest label among equal costs when all
 /// are searched, and the pair that was found first when a cost has changed; of equal costs the pair
@@ -53,7 +45,7 @@ class VEXG_EXPORT LambdaSchedule {
 
   /// Takes numbers by which labels are compared, where not by their own: the lower of a pair is the
   /// one with the lower number. Behind Begin. @param ranks  by label, all different.
-  void CompareBy(std::vector<std::uint32_t>&& ranks) { ranks_ = std::move(ranks); }
+  void CompareBy(std::vector<std::uint32_t>&& ranks);
 
   /// Limits how segments grow; see GrowthLimits. Behind Begin.
   void Limit(const GrowthLimits& limits) { limits_ = limits; }
@@ -63,21 +55,37 @@ class VEXG_EXPORT LambdaSchedule {
   /// @param values  one for each band.
   template <typename T>
   void AddPixel(std::uint32_t label, const T* values, std::size_t bandStride) {
-    double* const sums = means_.data() + std::size_t{label} * bands_;
+    double* const sums = MeansOf(label);
     for (std::uint32_t band = 0; band < bands_; ++band) {
       sums[band] += static_cast<double>(values[band * bandStride]);
     }
-    regions_[label].area += 1.0;
+    RegionOf(label).area += 1.0;
   }
-  /// Computes means and costs, and finds the nearest neighbours. Behind all pixels.
-  /// @param pairs  of neighbours; none has the label 0.
+
+  /// Makes room for pairs of neighbours.
+  void ReservePairs(std::size_t count) { pairs_.reserve(count); }
+  /// Adds a pair of neighbours, behind those that were found before. None has the label 0.
+  void AddPair(const LabelPair& pair);
+  /// Adds to the common boundary of a pair. @param pair  by the order in which pairs were added.
+  void Lengthen(std::size_t pair, std::uint32_t length) { pairs_[pair].length += length; }
+
+  /// Computes means and costs, and finds the nearest neighbours. Behind all pixels and pairs. All
+  /// threads work on many pairs.
+  void Build();
+  /// Adds pairs first.
   void Build(const std::vector<LabelPair>& pairs);
 
   /// The pixels of a segment, and the mean of one of its bands. Behind Build.
-  double AreaOf(std::uint32_t label) const { return regions_[label].area; }
-  double MeanOf(std::uint32_t label, std::uint32_t band) const {
-    return means_[std::size_t{label} * bands_ + band];
+  double AreaOf(std::uint32_t label) const { return RegionOf(label).area; }
+  double MeanOf(std::uint32_t label, std::uint32_t band) const { return MeansOf(label)[band]; }
+
+  /// The bytes that a segment and a pair of neighbours take, less what stands in the queue.
+  static constexpr std::size_t BytesOfSegment(std::uint32_t bands) {
+    return sizeof(Region) + bands * sizeof(double);
   }
+  static constexpr std::size_t BytesOfPair() { return sizeof(Pair); }
+  /// The bytes that the queue takes for each segment at most.
+  static constexpr std::size_t BytesInQueue() { return sizeof(Queued); }
 
   /// Merges the next pair. @return false when there is none.
   bool Step(Merge& merge);
@@ -92,17 +100,21 @@ class VEXG_EXPORT LambdaSchedule {
  private:
   static constexpr std::uint32_t kNone = 0xFFFFFFFF;
 
+  /// A segment; the means of its bands follow it in memory, as they are read with it.
   struct Region {
     double area = 0;
     std::uint32_t minimum = kNone;  // pair
     std::uint32_t first = kNone;    // of its pairs
+    std::uint32_t pairTo = kNone;   // the pair with the region that is merged into
+    std::uint32_t rank = 0;
   };
 
-  /// A pair stands in the lists of both of its regions; slot i of the links belongs to ids[i].
+  /// A pair stands in the lists of both of its regions; slot i of the links belongs to ids[i]. One
+  /// that was merged, or joined to another, has no length any more, and leaves a list when somebody
+  /// goes through it next.
   struct Pair {
     std::uint32_t ids[2] = {};
     std::uint32_t next[2] = {};
-    std::uint32_t previous[2] = {};
     double cost = 0;
     std::uint32_t length = 0;
     bool isChosen = false;
@@ -111,6 +123,7 @@ class VEXG_EXPORT LambdaSchedule {
     unsigned SlotOf(std::uint32_t region) const { return ids[0] == region ? 0 : 1; }
     std::uint32_t Other(std::uint32_t region) const { return ids[0] == region ? ids[1] : ids[0]; }
   };
+  static_assert(sizeof(Region) == 24 && sizeof(Pair) == 32);
 
   /// A pair in the queue. It is out of date when the pair has left the queue since, or has come
   /// back at another cost.
@@ -126,17 +139,32 @@ class VEXG_EXPORT LambdaSchedule {
     const Pair& pair = pairs_[entry.pair];
     return pair.isQueued && pair.cost == entry.cost;
   }
-  std::uint32_t RankOf(std::uint32_t label) const { return ranks_.empty() ? label : ranks_[label]; }
+  Region& RegionOf(std::uint32_t label) {
+    return *std::launder(reinterpret_cast<Region*>(regions_.data() + label * stride_));
+  }
+  const Region& RegionOf(std::uint32_t label) const {
+    return *std::launder(reinterpret_cast<const Region*>(regions_.data() + label * stride_));
+  }
+  double* MeansOf(std::uint32_t label) {
+    return std::launder(
+        reinterpret_cast<double*>(regions_.data() + label * stride_ + sizeof(Region)));
+  }
+  const double* MeansOf(std::uint32_t label) const {
+    return std::launder(
+        reinterpret_cast<const double*>(regions_.data() + label * stride_ + sizeof(Region)));
+  }
+  std::uint32_t RankOf(std::uint32_t label) const { return RegionOf(label).rank; }
   template <typename Visit>
   void ForEachPair(std::uint32_t region, Visit&& visit);
   void Link(std::uint32_t pair, std::uint32_t region);
-  void Unlink(std::uint32_t pair, std::uint32_t region);
-  void Relabel(std::uint32_t pair, std::uint32_t from, std::uint32_t to);
   double CostOf(const Pair& pair) const;
   void Join(std::uint32_t pair, Merge& merge);
   bool FindCheapest(std::uint32_t region, std::uint32_t& pair, double& cost) const;
   void Choose(std::uint32_t region, std::uint32_t pair);
+  std::uint32_t NearestOf(std::uint32_t region);
   void FindNearest(std::uint32_t region);
+  void Push(const Queued& entry);
+  void FetchNext() const;
   void JoinMeans(std::uint32_t lower, std::uint32_t higher);
   void TakeOverPairs(std::uint32_t lower, std::uint32_t higher);
   void UpdateNearest(std::uint32_t neighbour, std::uint32_t pair, std::uint32_t lower,
@@ -154,12 +182,11 @@ class VEXG_EXPORT LambdaSchedule {
 
   GrowthLimits limits_;
   std::uint32_t bands_ = 0;
-  std::vector<Region> regions_;       // by label
-  std::vector<double> means_;         // by label, then band
-  std::vector<std::uint32_t> ranks_;  // by label; empty: they compare as they are
-  std::vector<Pair> pairs_;
-  std::priority_queue<Queued> queue_;
-  std::vector<std::uint32_t> pairTo_;  // by label: the pair of the region that is merged into
+  std::uint32_t count_ = 0;  // of regions
+  std::size_t stride_ = sizeof(Region);
+  std::vector<std::byte, platform::HugePageAllocator<std::byte>> regions_;  // by label
+  std::vector<Pair, platform::HugePageAllocator<Pair>> pairs_;
+  std::vector<Queued> queue_;  // a heap
 };
 
 template <typename Visit>
@@ -167,19 +194,19 @@ void LambdaSchedule::JoinSmall(double least, Visit&& visit) {
   limits_.mostPixels = std::numeric_limits<double>::infinity();
   std::priority_queue<Small> small;
   const auto note = [&](std::uint32_t region) {
-    const double area = regions_[region].area;
+    const double area = RegionOf(region).area;
     if (area > 0 && area < least) small.push({area, RankOf(region), region});
   };
-  for (std::uint32_t region = 1; region < regions_.size(); ++region) note(region);
+  for (std::uint32_t region = 1; region < count_; ++region) note(region);
   while (!small.empty()) {
     const Small top = small.top();
     small.pop();
-    if (regions_[top.region].area != top.area) continue;  // it has joined another, or grown
+    if (RegionOf(top.region).area != top.area) continue;  // it has joined another, or grown
     Merge merge;
     std::uint32_t pair = kNone;
     if (!FindCheapest(top.region, pair, merge.lambda)) continue;
     Join(pair, merge);
-    regions_[merge.higher].area = 0;
+    RegionOf(merge.higher).area = 0;
     note(merge.lower);
     visit(merge);
   }

@@ -5,12 +5,20 @@
 namespace lumo {
 
 std::uint64_t MemoryOfMerging(std::uint64_t basins, unsigned bands, const SegmentRequest& request) {
-  // No more than 3 pairs for each area of a plane; a table of up to 12 places for it.
-  constexpr std::uint64_t kPairs = 3 * sizeof(LabelPair) + 48, kNumbers = 8;
-  const std::uint64_t sums = std::uint64_t{bands} * sizeof(double);
-  constexpr std::uint64_t kScheduled = 3 * 40 + 16 + 8 + 16, kRigorous = 4 + 3 * 4 + 12;
+  constexpr std::uint64_t kPairs = 3;        // no more for each area of a plane
+  constexpr std::uint64_t kNumbers = 4 + 4;  // its number, and the one that stands for its segment
   const std::uint64_t tree = request.tree.empty() ? 0 : sizeof(std::uint32_t) + sizeof(double);
-  return basins * (kPairs + kNumbers + sums + tree + (request.isRigorous ? kRigorous : kScheduled));
+  if (request.order == MergeOrder::kLocal) {
+    return basins *
+           (kNumbers + kPairs * LocalMerge::BytesOfPair() + LocalMerge::BytesOfSegment(bands));
+  }
+  if (!request.isRigorous) {
+    return basins * (kNumbers + tree + kPairs * LambdaSchedule::BytesOfPair() +
+                     LambdaSchedule::BytesOfSegment(bands) + LambdaSchedule::BytesInQueue());
+  }
+  constexpr std::uint64_t kGroups = 6 * sizeof(std::uint32_t);  // pixels, groups, orders
+  const std::uint64_t sums = std::uint64_t{bands} * sizeof(double);
+  return basins * (kNumbers + kPairs * sizeof(LabelPair) + sums + kGroups);
 }
 
 String MemoryFault(std::uint64_t basins, std::uint64_t needed, std::uint64_t allowed) {

@@ -35,8 +35,8 @@ class SeamlessSegmentation {
  private:
   bool FindBasins();
   bool Merge();
-  template <typename Graph>
-  bool Gather(Graph& graph, LabelPairs& pairs);
+  template <typename Graph, typename Pairs>
+  bool Gather(Graph& graph, Pairs& pairs);
   bool MergeBySchedule();
   bool DoSteps(LambdaSchedule& schedule);
   bool BeginTree();
@@ -46,6 +46,7 @@ class SeamlessSegmentation {
   bool KeepBasins(const LambdaSchedule& schedule);
   bool CutOwnTree();
   bool MergeRigorously();
+  bool MergeLocally();
   bool Write();
   IPC NextPass() const;
   TileDimensions Strips(unsigned border) const;

@@ -49,9 +49,49 @@ void ForEachStripEdge(const std::vector<std::int32_t>& labels, std::uint32_t wid
   }
 }
 
+/// The pairs of neighbours of a merge that takes all of them at once.
+struct PairList {
+  std::vector<LabelPair> pairs;
+
+  void AddPair(const LabelPair& pair) { pairs.push_back(pair); }
+  void Lengthen(std::size_t pair, std::uint32_t length) { pairs[pair].length += length; }
+};
+
+/// Joins the pairs of strips to those of the whole. Only a pair of two basins at seams may be found
+/// in several strips.
+template <typename Pairs>
+class PairJoin {
+ public:
+  PairJoin(Pairs& pairs, std::vector<bool>&& atSeams)
+      : pairs_(pairs), atSeams_(std::move(atSeams)) {
+    found_.Begin(0);
+  }
+
+  void Add(const LabelPair& pair) {
+    if (atSeams_[pair.low] && atSeams_[pair.high]) {
+      const std::uint32_t number = found_.NumberOf(pair.low, pair.high);
+      if (number < places_.size()) return pairs_.Lengthen(places_[number], pair.length);
+      places_.push_back(count_);
+    }
+    pairs_.AddPair(pair);
+    ++count_;
+  }
+
+ private:
+  Pairs& pairs_;
+  std::vector<bool> atSeams_;
+  LabelPairs found_;
+  std::vector<std::size_t> places_;  // by number among the pairs found: that among all
+  std::size_t count_ = 0;
+};
+
 inline void AddTo(LambdaSchedule& schedule, std::uint32_t label, const auto* values,
                   const unsigned char* /*states*/, unsigned /*bands*/) {
   schedule.AddPixel(label, values, 1);
+}
+inline void AddTo(LocalMerge& merge, std::uint32_t label, const auto* values,
+                  const unsigned char* /*states*/, unsigned /*bands*/) {
+  merge.AddPixel(label, values);
 }
 inline void AddTo(RigorousMerge& merge, std::uint32_t label, const auto* values,
                   const unsigned char* states, unsigned bands) {
@@ -138,13 +178,15 @@ bool SeamlessSegmentation<T>::Merge() {
     SetFault(MemoryFault(watershed_.Count(), needed, request_.memory));
     return false;
   }
-  return request_.isRigorous ? MergeRigorously() : MergeBySchedule();
+  if (request_.isRigorous) return MergeRigorously();
+  return request_.order == MergeOrder::kLocal ? MergeLocally() : MergeBySchedule();
 }
 
 /// Adds all pixels to a graph, in raster order, and finds the neighbours.
 template <typename T>
-template <typename Graph>
-bool SeamlessSegmentation<T>::Gather(Graph& graph, LabelPairs& pairs) {
+template <typename Graph, typename Pairs>
+bool SeamlessSegmentation<T>::Gather(Graph& graph, Pairs& pairs) {
+  detail::PairJoin<Pairs> join(pairs, watershed_.MarkSeamBasins());
   const RasterIteratorPtr<T> strips(new RasterIterator<T>(merge_, Strips(0)));
   detail::StripProcess process("SeamlessGraph", NextPass());
   const auto tiles = process.Read(strips);
@@ -180,7 +222,7 @@ bool SeamlessSegmentation<T>::Gather(Graph& graph, LabelPairs& pairs) {
       values += bands;
       states += bands;
     }
-    for (const LabelPair& pair : made->pairs) pairs.AddEdges(pair.low, pair.high, pair.length);
+    for (const LabelPair& pair : made->pairs) join.Add(pair);
     return !tree_ || KeepLines(made->labels);
   });
   process.Close();
@@ -198,13 +240,10 @@ bool SeamlessSegmentation<T>::MergeBySchedule() {
     order_.assign(std::size_t{count} + 1, 0);
     squares_.assign(std::size_t{count} + 1, 0);
   }
-  {
-    LabelPairs pairs;
-    pairs.Begin(count);
-    if (!Gather(schedule, pairs)) return false;
-    if (IsAborted()) return true;
-    schedule.Build(pairs.TakePairs());
-  }
+  schedule.ReservePairs(std::size_t{3} * count);  // more pairs of areas touch in no plane
+  if (!Gather(schedule, schedule)) return false;
+  if (IsAborted()) return true;
+  schedule.Build();
   if (tree_ && !KeepBasins(schedule)) return false;
   return DoSteps(schedule) && (!tree_ || IsAborted() || CutOwnTree());
 }
@@ -335,10 +374,23 @@ bool SeamlessSegmentation<T>::MergeRigorously() {
   const std::uint32_t count = watershed_.Count();
   RigorousMerge merge;
   merge.Begin(count, merge_->Bands(), request_.sums);
-  LabelPairs pairs;
-  pairs.Begin(count);
-  if (!Gather(merge, pairs)) return false;
-  if (!IsAborted()) roots_ = merge.Join(pairs.TakePairs(), request_.mergeValue);
+  detail::PairList list;
+  list.pairs.reserve(std::size_t{3} * count);
+  if (!Gather(merge, list)) return false;
+  if (!IsAborted()) roots_ = merge.Join(list.pairs, request_.mergeValue);
+  return true;
+}
+
+template <typename T>
+bool SeamlessSegmentation<T>::MergeLocally() {
+  const std::uint32_t count = watershed_.Count();
+  watershed_.TakeRanks();
+  LocalMerge merge;
+  merge.Begin(count + 1, merge_->Bands());
+  merge.Limit(request_.growth);
+  merge.ReservePairs(std::size_t{3} * count);
+  if (!Gather(merge, merge)) return false;
+  if (!IsAborted()) roots_ = merge.Join(request_.mergeValue, request_.rounds, ipc_.abort.Get());
   return true;
 }
 

@@ -305,6 +305,16 @@ bool SeamlessWatershed::Connect(const AbortFlag* abort) {
   return true;
 }
 
+std::vector<bool> SeamlessWatershed::MarkSeamBasins() const {
+  std::vector<bool> marks(std::size_t{count_} + 1);
+  for (std::size_t strip = 1; strip < strips_.size(); ++strip) {
+    for (const std::int32_t label : strips_[strip].firstLabels) {
+      marks[static_cast<std::size_t>(label)] = true;
+    }
+  }
+  return marks;
+}
+
 bool SeamlessWatershed::Label(unsigned strip, std::int32_t* labels) const {
   const auto drains = drains_.Borrow();
   if (!ReadCells(strip, *drains)) return false;

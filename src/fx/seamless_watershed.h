@@ -69,6 +69,10 @@ class VEXG_EXPORT SeamlessWatershed {
   /// which is the label that Watershed gives. Empties the list.
   std::vector<std::uint32_t> TakeRanks() { return std::move(ranks_); }
 
+  /// Marks the basins, by label, that have pixels in the first line of a strip, but for the first
+  /// strip. The edges of every other basin are those of one strip: ForEachStripEdge.
+  std::vector<bool> MarkSeamBasins() const;
+
   /// Labels a strip: 0 for excluded pixels.
   bool Label(unsigned strip, std::int32_t* labels) const;
   /// The labels of the line above a strip, and below it; null where there is none.

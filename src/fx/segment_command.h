@@ -10,6 +10,9 @@ namespace lumo {
 /// "Sobel", "Intensity".
 VEXG_EXPORT std::span<const EnumWord<SegmentAlgorithm>> WordsOf(SegmentAlgorithm);
 
+/// "Told", "Local".
+VEXG_EXPORT std::span<const EnumWord<MergeOrder>> WordsOf(MergeOrder);
+
 /// The bins in which the costs of merges are counted.
 inline constexpr unsigned kLambdaBins = 10000;
 

@@ -18,6 +18,12 @@ std::span<const EnumWord<SegmentAlgorithm>> WordsOf(SegmentAlgorithm) {
   return kWords;
 }
 
+std::span<const EnumWord<MergeOrder>> WordsOf(MergeOrder) {
+  static constexpr EnumWord<MergeOrder> kWords[] = {{"Told", MergeOrder::kTold},
+                                                    {"Local", MergeOrder::kLocal}};
+  return kWords;
+}
+
 SegmentAlgorithm SegmentCommand::ReadAlgorithm() const {
   return Read<int>("SegmentAlgorithm") == 1 ? SegmentAlgorithm::kSobel
                                             : SegmentAlgorithm::kIntensity;
@@ -94,6 +100,13 @@ const CommandDeclaration kSegmentMerge{
      {"Compactness", Presence::kOptional, ValueKind::kNumber,
       "with Seamless and MergeAlgorithm 1: costs are divided by the length of the common border to "
       "the power of this besides, 0 to 10; 0 when absent"},
+     {"Order", Presence::kOptional, ValueKind::kWord,
+      "with Seamless and MergeAlgorithm 1: the order of merging. Told: the cheapest pair anywhere "
+      "first; Local: in rounds, all pairs at once that cost both of their segments least, and less "
+      "than MergeValue",
+      "", &WordsIn<MergeOrder>},
+     {"Rounds", Presence::kOptional, ValueKind::kInteger,
+      "of Order Local, 1 to 1000; 12 when absent"},
      {"Tree", Presence::kOptional, ValueKind::kText,
       "with Seamless and MergeAlgorithm 1: the file to make of all merges, from which segments of "
       "every MergeValue can be made (CreateTreeLabelsRasterCommand); none when absent"},
@@ -162,8 +175,28 @@ class FxTileSegmentMergeCommand final : public SegmentCommand {
     request.bordersOnly = Read<int>("SegmentBorder") == 1;
     isSeamless_ = Read<bool>("Seamless");
     request.isRigorous = isRigorous_;
-    return ReadGrowth(request) && ReadTree(request) && ReadMemory(segment, request) &&
-           ReadTiles(segment, request);
+    return ReadOrder(request) && ReadGrowth(request) && ReadTree(request) &&
+           ReadMemory(segment, request) && ReadTiles(segment, request);
+  }
+
+  bool ReadOrder(SegmentRequest& request) {
+    const auto refuse = [](const char* fault) {
+      SetFault(fault);
+      return false;
+    };
+    if (HasInput("Order")) request.order = Read<MergeOrder>("Order");
+    const bool isLocal = request.order == MergeOrder::kLocal;
+    if (isLocal && (!isSeamless_ || isRigorous_ || HasInput("MinSize") || HasInput("Tree"))) {
+      return refuse(
+          "Order Local goes with Seamless and MergeAlgorithm 1, without MinSize and Tree");
+    }
+    if (!HasInput("Rounds")) return true;
+    if (!isLocal) return refuse("Rounds goes with Order Local");
+    constexpr int kMost = 1000;
+    const int rounds = Read<int>("Rounds");
+    if (rounds < 1 || rounds > kMost) return refuse("Rounds: 1 to 1000");
+    request.rounds = static_cast<unsigned>(rounds);
+    return true;
   }
 
   bool ReadGrowth(SegmentRequest& request) {

@@ -7,6 +7,7 @@
 #include "foundation/scalar.h"
 #include "fx/lambda_schedule.h"
 #include "fx/level_tasks.h"
+#include "fx/local_merge.h"
 #include "raster/tile_process.h"
 
 // A raster is segmented tile by tile: gradient, stretch and clip, watershed, merging, stitching.
@@ -20,19 +21,25 @@ namespace lumo {
 /// their mean band values.
 enum class SegmentAlgorithm : unsigned char { kSobel, kIntensity };
 
+/// Says in which order segments of a whole raster are merged by costs: the cheapest pair anywhere
+/// first (LambdaSchedule), or in rounds (LocalMerge).
+enum class MergeOrder : unsigned char { kTold, kLocal };
+
 /// Holds the settings of a segmentation.
 struct SegmentRequest {
   SegmentAlgorithm algorithm = SegmentAlgorithm::kSobel;
-  LinearStretch stretch;             ///< from gradients to levels
-  ClipLimits limits;                 ///< of the levels
-  double mergeValue = 0;             ///< threshold of merging; none unless above 0
-  Form sums = Form::kTold;           ///< of the rigorous merge
-  bool bordersOnly = false;          ///< an image of the borders instead of labels
-  unsigned tileBytes = kTileBudget;  ///< of the band values of a tile
-  unsigned tileBorder = 1;           ///< overlap on each side
-  bool isRigorous = false;           ///< merging without tiles: by RigorousMerge
-  double leastPixels = 0;            ///< smaller segments join others, without tiles
-  GrowthLimits growth;               ///< of merging by schedule, without tiles
+  LinearStretch stretch;                  ///< from gradients to levels
+  ClipLimits limits;                      ///< of the levels
+  double mergeValue = 0;                  ///< threshold of merging; none unless above 0
+  Form sums = Form::kTold;                ///< of the rigorous merge
+  bool bordersOnly = false;               ///< an image of the borders instead of labels
+  unsigned tileBytes = kTileBudget;       ///< of the band values of a tile
+  unsigned tileBorder = 1;                ///< overlap on each side
+  bool isRigorous = false;                ///< merging without tiles: by RigorousMerge
+  double leastPixels = 0;                 ///< smaller segments join others, without tiles
+  MergeOrder order = MergeOrder::kTold;   ///< without tiles
+  unsigned rounds = LocalMerge::kRounds;  ///< of the local order
+  GrowthLimits growth;                    ///< of merging by schedule, without tiles
   /// A file to keep the tree of merging by schedule in, without tiles; empty for none.
   std::string tree;
   /// With a tree: the percentage of all merges to do, instead of those up to mergeValue.

@@ -186,6 +186,27 @@ TEST(SeamlessSegmentation, GivesTheSegmentsOfOneTile) {
   CheckScene<float>(20, 3, 1);
 }
 
+TEST(SeamlessSegmentation, LocalOrderDependsOnNoStripsOrThreads) {
+  const auto scene = MakeScene<float>(300, 260, 2, 77);
+  SegmentRequest request;
+  request.stretch = {0, 800, 0, 800};
+  request.limits = ClipLimits::Of(0, 800, 40, 800);
+  request.mergeValue = 5000;
+  request.order = MergeOrder::kLocal;
+  Labels first;
+  for (const unsigned stripLines : {1U, 7U, 64U, 260U}) {
+    for (const unsigned threads : {1U, 2U, 4U}) {
+      const ThreadLimit limit(threads);
+      const MemoryPtr<std::int32_t> labels(new MemoryTestRaster<std::int32_t>(300, 260, 1));
+      request.tileBytes = stripLines * 300 * 2 * sizeof(float);
+      ASSERT_TRUE(SeamlessSegmentation<float>(scene, scene, labels, request).Run());
+      if (first.empty()) first = labels->pixels;
+      EXPECT_EQ(labels->pixels, first) << stripLines << " lines, " << threads << " threads";
+    }
+  }
+  EXPECT_LT(*std::max_element(first.begin(), first.end()), 5000);
+}
+
 TEST(SeamlessSegmentation, SaysWhatMergingNeedsBeforeAnythingIsWritten) {
   const auto scene = MakeScene<std::uint8_t>(60, 60, 1, 1);
   const MemoryPtr<std::int32_t> labels(new MemoryTestRaster<std::int32_t>(60, 60, 1));
@@ -197,6 +218,11 @@ TEST(SeamlessSegmentation, SaysWhatMergingNeedsBeforeAnythingIsWritten) {
   EXPECT_FALSE(SeamlessSegmentation<std::uint8_t>(scene, scene, labels, request).Run());
   EXPECT_THAT(TakeFault().ToUTF8(), testing::HasSubstr("bytes of memory, and may take 1000"));
   EXPECT_EQ(labels->pixels, Labels(3600, 0));
+  // Told bounds: 180 bytes for a segment of 4 bands with its pairs.
+  EXPECT_LE(MemoryOfMerging(1000, 4, request), 180'000U);
+  SegmentRequest local = request;
+  local.order = MergeOrder::kLocal;
+  EXPECT_LE(MemoryOfMerging(1000, 4, local), 180'000U);
   request.mergeValue = 0;  // no graph is made
   EXPECT_TRUE(SeamlessSegmentation<std::uint8_t>(scene, scene, labels, request).Run());
 }

@@ -56,6 +56,14 @@ class AnalyzeTest(FieldScene):
             if name != "accuracy.json":
                 self.assertEqual(again[name] == data, True, name)
 
+    def test_a_recipe_keeps_a_tree(self):
+        self.fine(*self.recipe(segment={"mergePercent": 90, "tree": True}, attributes={"spectral": True},
+                               classify={"samples": "train.geojson", "field": "cover"}), "-q")
+        cut = self.folder / "cut.tif"
+        self.fine("segment", "cut", self.results / "segments.tree", cut, "--merge-percent", 90, "-q")
+        self.assertEqual(cut.read_bytes(), (self.results / "segments.tif").read_bytes())
+        self.fails(2, '"schedule", and without "tiled"', *self.recipe(segment={"tree": True, "tiled": True}))
+
     def test_a_run_goes_on_from_what_is_whole(self):
         verb = self.recipe()
         self.fine(*verb, "-q")

@@ -278,6 +278,50 @@ def merge_schedule(values, labels, pairs, threshold, MinSize=0, MaxSize=float("i
     return result
 
 
+def merge_local(values, labels, pairs, threshold, rounds, most=float("inf"), compactness=0):
+    """In rounds: each region chooses its cheapest pair, and pairs that were chosen twice merge at once."""
+    plain = Schedule(values, labels, pairs, len(values), most, compactness)
+    area, mean, parent = dict(plain.area), plain.mean, {}
+    edges = {tuple(ids): (plain.length[i], i) for i, ids in enumerate(plain.ids)}
+    for _ in range(rounds):
+        choice = {}
+        for (a, b), (length, index) in edges.items():
+            m, n = float(area[a]), float(area[b])
+            total = 0.0
+            for u, v in zip(mean[a], mean[b]):
+                total += (u - v) * (u - v)
+            cost = m * n / (m + n) * total / length
+            if compactness:
+                cost /= float(length) ** compactness
+            if m + n > most or not cost < threshold:
+                continue
+            for label in (a, b):
+                choice[label] = min(choice.get(label, (cost, index, None)), (cost, index, (a, b)), key=lambda c: c[:2]) \
+                    if label in choice else (cost, index, (a, b))
+        merged = {choice[a][2] for a in choice if choice.get(choice[a][2][0]) == choice.get(choice[a][2][1])}
+        if not merged:
+            break
+        into = {}
+        for a, b in merged:
+            m, n = float(area[a]), float(area[b])
+            mean[a] = [n / (m + n) * v + m / (m + n) * u for u, v in zip(mean[a], mean[b])]
+            area[a] += area[b]
+            into[b] = parent[b] = a
+        joined = {}
+        for (a, b), (length, index) in edges.items():
+            a, b = sorted((into.get(a, a), into.get(b, b)))
+            if a != b:
+                before = joined.get((a, b), (0, index))
+                joined[a, b] = (before[0] + length, min(before[1], index))
+        edges = joined
+    result = []
+    for label in labels:
+        while label in parent:
+            label = parent[label]
+        result.append(label)
+    return result
+
+
 def merge_rigorous(values, invalid, labels, excluded, pairs, threshold, count, exact):
     bands, kept = len(values), (lambda value: value) if exact else as_float
     sums, areas = collections.defaultdict(lambda: [0.0] * bands), collections.Counter()

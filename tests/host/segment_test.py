@@ -216,6 +216,33 @@ class SegmentTest(FolderTest):
             with self.subTest(path.name, **arguments):
                 self.assertEqual(got, labels)
 
+    def test_local_order_beside_the_plain_form(self):
+        chance, runs, wanted = random.Random(31), [], []
+        for number in range(30):
+            path, image, invalid = self.make_image(f"image{number}.dat", chance, chance.choice(["Byte", "Single"]), 2)
+            limits = chance.choice([{}, {}, {"MaxSize": 20}, {"Compactness": 0.7}])
+            rounds = chance.choice([1, 2, 3, 12])
+            arguments = {"SegmentAlgorithm": 2, "SegmentValue": 0, "MinGradient": 0, "MaxGradient": 200, "StretchValue": 200,
+                         "MergeValue": chance.choice([5, 1000, 1e9]), "LambdaEstimate": False, "Seamless": True,
+                         "TileMemorySize": chance.choice([1, 100, 100000]), "Order": "Local",
+                         **({"Rounds": rounds} if rounds != 12 else {}), **limits}
+            runs.append((path, arguments))
+            width, height, values = image.width, image.height, image.intensity()[0]
+            out = [hole for row in invalid for hole in row]
+            labels, _ = peer.flood([peer.cut(v / 200 * 200) for row in values for v in row], out, width, height)
+            pairs = peer.adjacency(labels, out, width, height, width, height, False)
+            bands = [[float(v) for row in band for v in row] for band in image.bands]
+            labels = peer.merge_local(bands, labels, pairs, arguments["MergeValue"], rounds,
+                                      limits.get("MaxSize", float("inf")), limits.get("Compactness", 0))
+            numbers = {0: 0}
+            wanted.append([numbers.setdefault(label, len(numbers)) for label in labels])
+        for (path, arguments), got, labels in zip(runs, self.segment_all(runs), wanted):
+            with self.subTest(path.name, **arguments):
+                self.assertEqual(got, labels)
+        for words, more in (("--order local goes with", ["--order", "local", "--tiled"]), ("--rounds goes", ["--rounds", 3]),
+                            ("--order local goes with", ["--order", "local", "--tree", self.folder / "t"])):
+            self.fails(2, words, "segment", path, self.folder / "o.dat", *more)
+
     def test_estimate_gathers_the_costs_of_all_tiles(self):
         chance = random.Random(3)
         width = height = 24

@@ -70,7 +70,7 @@ class Reader {
 
   void ReadSegments(const JsonField& field) {
     field.Allow({"bands", "algorithm", "segmentValue", "segmentPercent", "mergeValue",
-                 "mergePercent", "mergeAlgorithm", "tiled", "tileMemory", "tileBorder"});
+                 "mergePercent", "mergeAlgorithm", "tiled", "tileMemory", "tileBorder", "tree"});
     SegmentRequest& request = recipe_.segments;
     if (field.Has("bands")) recipe_.segmentBands = field.Get("bands");
     if (field.Has("algorithm")) {
@@ -99,6 +99,10 @@ class Reader {
       request.tileMemory = field.Get("tileMemory").Whole(1, 4294967295U);
     }
     request.isTiled = field.FlagOr("tiled", false);
+    recipe_.keepsTree = field.FlagOr("tree", false);
+    if (recipe_.keepsTree && (request.isTiled || request.mergeAlgorithm != "schedule")) {
+      field.Get("tree").Refuse("it goes with \"schedule\", and without \"tiled\"");
+    }
     if (field.Has("tileBorder") && !request.isTiled) {
       field.Get("tileBorder").Refuse("it goes with \"tiled\"");
     }

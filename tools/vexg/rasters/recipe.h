@@ -18,6 +18,7 @@ struct Recipe {
   std::optional<CalibrationRequest> calibration;
   std::string calibrationPlace;  ///< where it stands, for messages
   SegmentRequest segments;
+  bool keepsTree = false;                 ///< the tree of the segments is one of the results
   std::optional<JsonField> segmentBands;  ///< all when absent
   AttributeRequest attributes;
   std::optional<JsonField> attributeBands;

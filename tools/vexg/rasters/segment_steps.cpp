@@ -31,6 +31,15 @@ void SegmentRequest::Check() const {
         "--min-size, --max-size and --compactness go with --merge-algorithm schedule, without "
         "--tiled");
   }
+  const bool isLocal = order == "local";
+  if (isLocal &&
+      (isTiled || isEstimate || mergeAlgorithm != "schedule" || minSize || !tree.empty())) {
+    refuse(
+        "--order local goes with --merge-algorithm schedule, without --tiled, --estimate, --tree "
+        "and "
+        "--min-size");
+  }
+  if (rounds && !isLocal) refuse("--rounds goes with --order local");
   if (!tree.empty() && (isTiled || isEstimate || mergeAlgorithm != "schedule" || minSize)) {
     refuse(
         "--tree goes with --merge-algorithm schedule, without --tiled, --estimate and --min-size");
@@ -47,7 +56,7 @@ bool SegmentRequest::IsSegmenting() const {
   const SegmentRequest none;
   return algorithm != none.algorithm || mergeAlgorithm != none.mergeAlgorithm || segmentValue ||
          segmentPercent || tileMemory || tileBorder || memory != 0 || minSize || maxSize ||
-         compactness || isTiled || isBorders || isEstimate;
+         compactness || order != none.order || rounds || isTiled || isBorders || isEstimate;
 }
 
 void AddFit(JobDraft& draft, const SegmentRequest& request, const SegmentSources& sources) {
@@ -95,6 +104,8 @@ void AddSegment(JobDraft& draft, const char* step, const SegmentRequest& request
     segment.AddInput("TileBorderSize", request.tileBorder.value_or(kBorder));
   } else {
     segment.AddInput("Seamless", true);
+    if (request.order == "local") segment.AddInput("Order", String("Local"));
+    if (request.rounds) segment.AddInput("Rounds", *request.rounds);
     if (request.minSize) segment.AddInput("MinSize", *request.minSize);
     if (request.maxSize) segment.AddInput("MaxSize", *request.maxSize);
     if (request.compactness) segment.AddInput("Compactness", *request.compactness);

@@ -17,6 +17,8 @@ struct SegmentRequest {
   std::uint64_t memory = 0;            ///< bytes for merging, without tiles; 0 for those by default
   std::optional<unsigned> minSize, maxSize;  ///< pixels, without tiles
   std::optional<double> compactness;         ///< a power of border lengths, without tiles
+  std::string order = "global";              ///< of merging by schedule, without tiles; or local
+  std::optional<unsigned> rounds;            ///< of the local order
   std::string tree;                          ///< file of all merges; empty for none
   bool isTiled = false;                      ///< tile by tile, and not as a whole
   bool isBorders = false;                    ///< an image of the borders is made instead

@@ -64,7 +64,8 @@ class AnalyzeVerb final {
     scene_.AddTo(line);
     line.AddNote(
         "A scene becomes a map of classes by a recipe: calibrated.tif where the recipe calibrates, "
-        "segments.tif, the files attributes.*, classes.tif, polygons, and accuracy.json, each when "
+        "segments.tif, segments.tree where the recipe keeps it, the files attributes.*, "
+        "classes.tif, polygons, and accuracy.json, each when "
         "it is whole. A run that broke goes on from the files that are there; what a changed "
         "recipe "
         "makes anew is replaced with --overwrite. --print-job shows all as one document.");
@@ -276,6 +277,10 @@ class AnalyzeVerb final {
 
   std::string Calibrated() const { return InFolder("calibrated.tif"); }
   std::string Segments() const { return InFolder("segments.tif"); }
+  std::vector<std::string> SegmentFiles() const {
+    if (!recipe_.keepsTree) return {Segments()};
+    return {Segments(), InFolder("segments.tree")};
+  }
   std::string Classes() const { return InFolder("classes.tif"); }
 
   /// The scene as it is analyzed.
@@ -308,7 +313,7 @@ class AnalyzeVerb final {
       }
     }
     stages.push_back({"segments",
-                      {Segments()},
+                      SegmentFiles(),
                       {SourceFile()},
                       PartOf(recipe, "segment"),
                       [this](JobDraft& draft, const auto& files) { AddSegments(draft, files); },
@@ -360,8 +365,10 @@ class AnalyzeVerb final {
     if (hasSome) AddBandView(draft, "bands", "$source", segmentBands_);
     const String shown = hasSome ? "$bands" : "$source";
     AddLabels(AddCreate(draft, PlaceOf(files[0], 1), shown, "Told", {0.0}), recipe_.segments);
-    AddFit(draft, recipe_.segments, {shown, shown});
-    AddSegment(draft, kMakeStep, recipe_.segments, {shown, shown});
+    SegmentRequest request = recipe_.segments;
+    if (recipe_.keepsTree) request.tree = files[1];
+    AddFit(draft, request, {shown, shown});
+    AddSegment(draft, kMakeStep, request, {shown, shown});
     AddCloseTarget(draft);
     if (hasSome) draft.Close("close.bands", "$bands");
     draft.Close("close", "$source");

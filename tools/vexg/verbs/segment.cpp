@@ -1,16 +1,12 @@
-#include <cmath>
 #include <optional>
 
-#include <fmt/format.h>
-
 #include "options/option_values.h"
-#include "output/json_number.h"
-#include "pictures/histogram_plot.h"
 #include "pictures/picture_writer.h"
 #include "pictures/quicklook_maker.h"
 #include "raster/pixel_types.h"
 #include "rasters/raster_target.h"
 #include "rasters/raster_verb.h"
+#include "rasters/segment_curves.h"
 #include "rasters/segment_steps.h"
 #include "rasters/tree_steps.h"
 
@@ -19,23 +15,6 @@ namespace {
 
 constexpr const char* kGradientStep = "gradients";
 constexpr const char* kCostStep = "costs";
-
-/// A cumulative curve of gradients, or of what merging costs.
-struct Curve {
-  double low = 0;
-  double binSize = 0;
-  std::vector<double> shares;  // of all, up to the end of each bin
-
-  /// Where a share is reached.
-  double At(double share) const {
-    if (shares.empty() || shares.back() == 0) return 0;  // nothing counts
-    const auto bin = std::lower_bound(shares.begin(), shares.end(), share);
-    const double before = bin == shares.begin() ? 0.0 : *(bin - 1);
-    const double within =
-        bin == shares.end() || *bin <= before ? 0 : (share - before) / (*bin - before);
-    return low + (static_cast<double>(bin - shares.begin()) + within) * binSize;
-  }
-};
 
 class SegmentVerb final : public RasterVerb {
  public:
@@ -114,6 +93,14 @@ class SegmentVerb final : public RasterVerb {
              "--merge-value at once")
         .Takes(OneOf({"schedule", "rigorous"}))
         .ShowsDefault();
+    line.Add("--order", request_.order,
+             "global: the cheapest pair anywhere is merged first; local: in rounds, all pairs at "
+             "once "
+             "that cost both of their segments least")
+        .Takes(OneOf({"global", "local"}))
+        .ShowsDefault();
+    line.Add("--rounds", request_.rounds, "With --order local: how many; 12 by default")
+        .Within(1, 1000);
     line.Add("--merge-raster", mergeRaster_,
              "A raster of the same size and pixel type whose bands drive merging, instead of "
              "INPUT's")
@@ -445,37 +432,10 @@ class SegmentVerb final : public RasterVerb {
                               GetProgressStyle());
       results = session.Run(draft);
     }
-    const auto& fit = results.Find(kFitStep).returns;
-    const auto& gradients = results.Find(kGradientStep).returns;
-    const auto& costs = results.Find(kCostStep).returns;
-    gradients_.low = ParseValue<double>(fit.Find("MinGradient"));
-    gradients_.binSize = ParseValue<double>(gradients.Find("SegmentBinSize"));
-    for (const double share : ParseValue<Array<double>>(gradients.Find("SegmentHistogram"))) {
-      gradients_.shares.push_back(share);
-    }
-    costs_.binSize = ParseValue<double>(costs.Find("LambdaBinSize"));
-    const auto counts = ParseValue<Array<unsigned>>(costs.Find("LambdaHistogram"));
-    const double all = counts.GetCount() == 0 ? 0 : counts[counts.GetCount() - 1];
-    for (const unsigned count : counts) costs_.shares.push_back(all == 0 ? 0 : count / all);
-    if (!picture_.empty()) {
-      HistogramPlot({Plot("gradients", gradients_), Plot("costs", costs_)}).Write(outputs.Get(0));
-    }
-  }
-
-  /// Leaves out the last hundredth, which takes most of the width.
-  static PlottedHistogram Plot(const char* title, const Curve& curve) {
-    PlottedHistogram plot{title, curve.low, curve.binSize > 0 ? curve.binSize : 1, {}};
-    constexpr double kEnd = 0.99, kHeight = 100;  // percent
-    for (const double share : curve.shares) {
-      plot.counts.push_back(static_cast<std::uint64_t>(std::lround(share * kHeight)));
-      if (share >= kEnd) break;
-    }
-    if (plot.counts.empty()) plot.counts.push_back(0);
-    return plot;
-  }
-
-  static Json AsJson(const Curve& curve) {
-    return {{"low", curve.low}, {"binSize", curve.binSize}, {"shares", curve.shares}};
+    curves_ =
+        SegmentCurves::Read(results.Find(kFitStep).returns, results.Find(kGradientStep).returns,
+                            results.Find(kCostStep).returns);
+    if (!picture_.empty()) curves_.Draw(outputs.Get(0));
   }
 
   std::string Describe() const override {
@@ -484,21 +444,8 @@ class SegmentVerb final : public RasterVerb {
       return picture_.empty() ? scales_.AsText() : std::string();
     }
     if (!request_.isEstimate) return {};
-    if (isJson_) {
-      return Json{{"file", GetSource().file},
-                  {"gradients", AsJson(gradients_)},
-                  {"costs", AsJson(costs_)}}
-                 .dump(2) +
-             "\n";
-    }
-    if (!picture_.empty()) return {};
-    std::string text = "percent       gradient     merge cost\n";
-    for (const double percent :
-         {5.0, 10.0, 20.0, 30.0, 40.0, 50.0, 60.0, 70.0, 80.0, 90.0, 95.0, 99.0}) {
-      text += fmt::format("{:>7g} {:>14.6g} {:>14.6g}\n", percent, gradients_.At(percent / 100),
-                          costs_.At(percent / 100));
-    }
-    return text;
+    if (isJson_) return curves_.AsJson(GetSource().file);
+    return picture_.empty() ? curves_.AsText() : std::string();
   }
 
   static constexpr unsigned kFloatBins = 65000;
@@ -515,7 +462,7 @@ class SegmentVerb final : public RasterVerb {
 
   RasterInfo scene_;
   Array<unsigned> bands_;
-  Curve gradients_, costs_;
+  SegmentCurves curves_;
 };
 
 const VerbRegistration registration("segment", "Divides a raster into segments of alike pixels",
