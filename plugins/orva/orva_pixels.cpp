@@ -1,10 +1,14 @@
 #include "orva/orva_pixels.h"
 
+#include <algorithm>
+#include <atomic>
 #include <bit>
 #include <cstring>
 #include <memory>
 
+#include "foundation/fault.h"
 #include "platform/vector_clones.h"
+#include "tasks/crew.h"
 
 namespace lumo::orva {
 namespace {
@@ -218,29 +222,46 @@ void SwapBytes(void* numbers, std::size_t bytes, unsigned numberBytes) {
 bool ReadPixels(const File& file, FlatBlock block, void* pixels, const StretchRead& stretchRead) {
   const Storage storage(file.GetHeader());
   LimitRows(block, storage);
-  std::unique_ptr<char[]> scratch;
-  if (block.Picks()) scratch = MakeScratch(block, storage);
-  GatheringReader reader(file);
-  auto* to = static_cast<char*>(pixels);
-  std::uint64_t element = 0;
-  for (std::uint64_t row = 0; row < block.Rows();) {
-    const Stretch stretch = NextStretch(block, row, storage.elementBytes);
-    if (!ReadRows(reader, block, stretch, storage, block.Picks() ? scratch.get() : to)) {
-      return false;
-    }
-    if (block.Picks()) {
-      ForEachRow(block, stretch, storage.elementBytes, to, scratch.get(),
-                 [&](std::uint64_t at, char* elements, const char* span) {
-                   block.PickBands(at, span, elements, storage.elementBytes);
-                 });
-    }
-    storage.Swap(to, stretch.elements);
-    stretchRead(element, stretch.elements);
-    element += stretch.elements;
-    to += stretch.elements * storage.elementBytes;
-    row += stretch.rows;
+  std::vector<Stretch> stretches;
+  std::vector<std::uint64_t> begins{0};  // elements in front of each
+  for (std::uint64_t row = 0; row < block.Rows(); row += stretches.back().rows) {
+    stretches.push_back(NextStretch(block, row, storage.elementBytes));
+    begins.push_back(begins.back() + stretches.back().elements);
   }
-  return true;
+  const auto count = static_cast<unsigned>(stretches.size());
+  const unsigned tasks = std::min(count, CrewSize());
+  std::vector<String> faults(tasks);
+  std::atomic<bool> isRead{true};
+  RunByCrew(tasks, [&](unsigned task) {
+    std::unique_ptr<char[]> scratch;
+    if (block.Picks()) scratch = MakeScratch(block, storage);
+    GatheringReader reader(file);
+    const unsigned end = static_cast<unsigned>(std::uint64_t{count} * (task + 1) / tasks);
+    for (auto i = static_cast<unsigned>(std::uint64_t{count} * task / tasks); i < end; ++i) {
+      const Stretch& stretch = stretches[i];
+      char* const to = static_cast<char*>(pixels) + begins[i] * storage.elementBytes;
+      if (!isRead) return;
+      if (!ReadRows(reader, block, stretch, storage, block.Picks() ? scratch.get() : to)) {
+        faults[task] = TakeFault();
+        isRead = false;
+        return;
+      }
+      if (block.Picks()) {
+        ForEachRow(block, stretch, storage.elementBytes, to, scratch.get(),
+                   [&](std::uint64_t at, char* elements, const char* span) {
+                     block.PickBands(at, span, elements, storage.elementBytes);
+                   });
+      }
+      storage.Swap(to, stretch.elements);
+      stretchRead(begins[i], stretch.elements);
+    }
+  });
+  for (const String& fault : faults) {
+    if (fault.GetLength() == 0) continue;
+    SetFault(fault);
+    break;
+  }
+  return isRead;
 }
 
 bool WritePixels(File& file, FlatBlock block, const void* pixels) {

@@ -9,7 +9,8 @@
 namespace lumo::orva {
 
 /// Called when a run of a block has been read, in the byte order of this machine: its first element
-/// and their number. Runs come in order and are small enough to lie in the cache yet.
+/// and their number. Runs come on several threads at once, and are small enough to lie in the cache
+/// yet.
 using StretchRead = std::function<void(std::uint64_t first, std::uint64_t count)>;
 
 /// Reads a block, in the interleave of the file. Small gaps in the file are read and dropped, large

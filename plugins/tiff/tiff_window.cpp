@@ -66,6 +66,7 @@ struct Window::Piece {
   unsigned char* to;       // its first pixel
   std::size_t stride;      // bytes from one of its rows to the next
   const Carrier* carrier;
+  bool isKept;  // even where all of the block is needed
 };
 
 bool Window::FindBlocks() {
@@ -100,24 +101,8 @@ bool Window::DecodeBlock(std::uint64_t block, unsigned lines, unsigned char* out
   return true;
 }
 
-Window::Bytes Window::Kept(std::uint64_t block) {
-  const std::lock_guard lock(mutex_);
-  for (auto at = kept_.begin(); at != kept_.end(); ++at) {
-    if (at->first != block) continue;
-    kept_.splice(kept_.begin(), kept_, at);
-    return at->second;
-  }
-  return {};
-}
-
-void Window::Keep(std::uint64_t block, Bytes bytes) {
-  const std::lock_guard lock(mutex_);
-  keptBytes_ += bytes->size();
-  kept_.emplace_front(block, std::move(bytes));
-  while (keptBytes_ > kMostKept && kept_.size() > 1) {
-    keptBytes_ -= kept_.back().second->size();
-    kept_.pop_back();
-  }
+Window::~Window() {
+  if (hasKept_) BlockCache::Get().Drop(group_);
 }
 
 /// Reads a part of a block without compression, straight to its place where rows are long.
@@ -157,7 +142,8 @@ bool Window::ReadPiece(const Piece& piece) {
   const bool isWhole =
       piece.height == piece.lines &&
       (isWholeWidth || piece.left + piece.width == image_.samples % image_.blockWidth);
-  if (isWhole && isWholeWidth && piece.stride == rowBytes && piece.carrier->chosen == nullptr) {
+  const bool isPassing = isWhole && !piece.isKept;
+  if (isPassing && isWholeWidth && piece.stride == rowBytes && piece.carrier->chosen == nullptr) {
     return DecodeBlock(piece.block, piece.lines, piece.to);
   }
   const auto carry = [&](const unsigned char* block) {
@@ -168,16 +154,18 @@ bool Window::ReadPiece(const Piece& piece) {
     return true;
   };
   const std::size_t bytes = piece.lines * rowBytes;
-  if (isWhole) {
+  if (isPassing) {
     thread_local std::vector<unsigned char> decoded;
     if (decoded.size() < bytes) decoded.resize(bytes);
     return DecodeBlock(piece.block, piece.lines, decoded.data()) && carry(decoded.data());
   }
-  if (const Bytes kept = Kept(piece.block)) return carry(kept->data());
-  auto decoded = std::make_shared<std::vector<unsigned char>>(bytes);
-  if (!DecodeBlock(piece.block, piece.lines, decoded->data())) return false;
-  carry(decoded->data());
-  Keep(piece.block, std::move(decoded));
+  BlockCache& cache = BlockCache::Get();
+  if (const Bytes kept = cache.Find(group_, piece.block)) return carry(kept.get());
+  auto decoded = std::make_shared_for_overwrite<unsigned char[]>(bytes);
+  if (!DecodeBlock(piece.block, piece.lines, decoded.get())) return false;
+  carry(decoded.get());
+  hasKept_ = true;
+  cache.Keep(group_, piece.block, std::move(decoded), bytes);
   return true;
 }
 
@@ -192,6 +180,9 @@ bool Window::Read(const Rect& rect, const Array<unsigned>& bands, unsigned char*
   const std::uint64_t perPlane = std::uint64_t{image_.BlocksAcross()} * image_.BlocksDown();
   const unsigned bottom = rect.top + rect.height, right = rect.left + rect.width;
   const unsigned width = image_.blockWidth, height = image_.blockHeight;
+  // Who reads whole rows of an image reads it from top to bottom, as a rule.
+  const bool isAnywhere =
+      rect.width < image_.samples && (rect.left % width != 0 || rect.top % height != 0);
   std::vector<Piece> pieces;
   for (unsigned plane = 0; plane < planes; ++plane) {
     unsigned char* const start = pixels + plane * rowBytes * rect.height;
@@ -208,7 +199,7 @@ bool Window::Read(const Rect& rect, const Array<unsigned>& bands, unsigned char*
         unsigned char* const to =
             start + (top - rect.top) * rowBytes + (left - rect.left) * (rowBytes / rect.width);
         pieces.push_back({block, image_.LinesOf(row), left - column * width, top - row * height,
-                          stop - left, end - top, to, rowBytes, &carrier});
+                          stop - left, end - top, to, rowBytes, &carrier, isAnywhere});
       }
     }
   }

@@ -1,9 +1,7 @@
 #pragma once
 
-#include <list>
-#include <mutex>
-
 #include "foundation/array.h"
+#include "tiff/tiff_block_cache.h"
 #include "tiff/tiff_image.h"
 
 namespace lumo::tiff {
@@ -14,16 +12,18 @@ struct Rect {
 };
 
 /// Reads rectangles of an image, decoding blocks on as many threads as there are. Blocks of which a
-/// rectangle needs a part are kept for the next one, up to kMostKept bytes.
+/// rectangle needs a part are kept for the next ones (BlockCache); of a rectangle that lies
+/// anywhere in the image all blocks are, since others will overlap with it.
 ///
 /// Threads: one at a time.
 /// Failure: false, without a word, for data that are damaged or left out.
 class Window {
  public:
-  static constexpr std::size_t kMostKept = 32 << 20;
-
   /// @param file  outlives the window, as does the directory of `image`.
   Window(const File& file, const Image& image) : file_(file), image_(image) {}
+  ~Window();
+  Window(const Window&) = delete;
+  Window& operator=(const Window&) = delete;
 
   /// Reads a rectangle inside the image, in the image's order of axes: pixel by pixel, or band
   /// after band.
@@ -31,22 +31,19 @@ class Window {
 
  private:
   struct Piece;
-  using Bytes = std::shared_ptr<const std::vector<unsigned char>>;
+  using Bytes = BlockCache::Bytes;
 
   bool FindBlocks();
   bool ReadPiece(const Piece& piece);
   bool ReadPlain(const Piece& piece);
   bool DecodeBlock(std::uint64_t block, unsigned lines, unsigned char* out) const;
-  Bytes Kept(std::uint64_t block);
-  void Keep(std::uint64_t block, Bytes bytes);
 
   const File& file_;
   const Image image_;
   bool areBlocksFound_ = false;
   std::vector<std::uint64_t> offsets_, sizes_;
-  std::mutex mutex_;                                 // of what is kept
-  std::list<std::pair<std::uint64_t, Bytes>> kept_;  // the latest first
-  std::size_t keptBytes_ = 0;
+  const std::uint64_t group_ = BlockCache::Get().NewGroup();
+  std::atomic<bool> hasKept_{false};  // some block, now or before
 };
 
 }  // namespace lumo::tiff

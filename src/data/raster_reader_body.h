@@ -4,6 +4,7 @@
 
 #include "data/raster_reader.h"
 #include "raster/interleave.h"
+#include "raster/pixel_states.h"
 
 namespace lumo {
 
@@ -19,6 +20,30 @@ bool SizeBlock(Array<E>& block, Interleave interleave, const SubRect& rect, unsi
   if (isCleared) std::fill_n(block.GetData(), block.GetCount(), E());
   return true;
 }
+
+/// A block in the order of a source, on its way to another one. Its thread keeps the memory for the
+/// next one, where that isn't much: pages that are new each time cost more than the conversion.
+template <typename E>
+class KeptBlock {
+ public:
+  KeptBlock() { std::swap(block_, Kept()); }
+  ~KeptBlock() {
+    constexpr std::size_t kMostBytes = 8 << 20;
+    if (block_.GetCapacity() * sizeof(E) <= kMostBytes) std::swap(block_, Kept());
+  }
+  KeptBlock(const KeptBlock&) = delete;
+  KeptBlock& operator=(const KeptBlock&) = delete;
+  Array<E>& operator*() { return block_; }
+  Array<E>* operator->() { return &block_; }
+
+ private:
+  static Array<E>& Kept() {
+    thread_local Array<E> kept;
+    return kept;
+  }
+
+  Array<E> block_;
+};
 
 /// True for a format whose plug-in comes with the library and writes every pixel of a block that it
 /// reads.
@@ -58,7 +83,7 @@ bool RasterReader<T>::ReadBlock(const SubRect& rect, const Array<unsigned>& band
   const bool isCleared = (nativeInterleave_ & detail::kFills) == 0;
   const bool isStraight = native == interleave || count == 1;
   if (!detail::SizeBlock(pixels, interleave, rect, count, isCleared) ||
-      !detail::SizeBlock(state, interleave, rect, count, isStraight || isCleared)) {
+      !detail::SizeBlock(state, interleave, rect, count)) {
     return false;
   }
   if (isStraight) {
@@ -68,20 +93,24 @@ bool RasterReader<T>::ReadBlock(const SubRect& rect, const Array<unsigned>& band
     if (!isRead && !isCleared) std::fill_n(pixels.GetData(), pixels.GetCount(), T());
     return isRead;
   }
-  Array<T> nativePixels;
-  Array<unsigned char> nativeState;
-  const bool isRead = detail::SizeBlock(nativePixels, native, rect, count, isCleared) &&
-                      detail::SizeBlock(nativeState, native, rect, count) &&
+  detail::KeptBlock<T> nativePixels;
+  // The states come in the source's order too. There is nothing to convert where all of them are 0.
+  const auto orderStates = [&] {
+    if (!AnyHasState(state.GetData(), state.GetCount(), 0xFF)) return true;
+    detail::KeptBlock<unsigned char> nativeState;
+    if (!detail::SizeBlock(*nativeState, native, rect, count, false)) return false;
+    std::copy(state.begin(), state.end(), nativeState->begin());
+    return ConvertInterleave(nativeState->GetData(), native, state.GetData(), interleave, width,
+                             height, count, 1);
+  };
+  const bool isRead = detail::SizeBlock(*nativePixels, native, rect, count, isCleared) &&
                       ReadPixels(rect.left, rect.top, width, height, wanted, level,
-                                 nativePixels.GetData(), nativeState.GetData()) &&
-                      ConvertInterleave(nativePixels.GetData(), native, pixels.GetData(),
+                                 nativePixels->GetData(), state.GetData()) &&
+                      ConvertInterleave(nativePixels->GetData(), native, pixels.GetData(),
                                         interleave, width, height, count, sizeof(T)) &&
-                      ConvertInterleave(nativeState.GetData(), native, state.GetData(), interleave,
-                                        width, height, count, 1);
-  if (!isRead && !isCleared) {
-    std::fill_n(pixels.GetData(), pixels.GetCount(), T());
-    std::fill_n(state.GetData(), state.GetCount(), static_cast<unsigned char>(0));
-  }
+                      orderStates();
+  if (!isRead && !isCleared) std::fill_n(pixels.GetData(), pixels.GetCount(), T());
+  if (!isRead) std::fill_n(state.GetData(), state.GetCount(), static_cast<unsigned char>(0));
   return isRead;
 }
 

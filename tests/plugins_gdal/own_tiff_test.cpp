@@ -6,6 +6,7 @@
 #include <ogr_srs_api.h>
 #include <random>
 #include <regex>
+#include <thread>
 #include <typeinfo>
 
 #include "foundation/plugin_library.h"
@@ -496,6 +497,55 @@ TEST(OwnTiff, SamplesAreThoseOfGdal) {
     if (entry.path().extension() == ".tif" && ExpectSame(entry.path().string())) ++own;
   }
   EXPECT_GE(own, 7U);
+}
+
+/// Threads with readers of their own and of others, on windows that lie anywhere: the blocks of all
+/// files are in one cache, and go with their file.
+TEST(OwnTiff, WindowsOfManyThreadsDoNotMixFiles) {
+  const test::TemporaryDirectory directory;
+  constexpr int kFiles = 3;
+  std::vector<RasterDataConnectionPtr> shared;
+  std::vector<std::vector<std::uint8_t>> want;
+  const auto path = [&](int file) {
+    return (directory.Path() / ("w" + std::to_string(file) + "x.tif")).string();
+  };
+  const auto read = [](RasterReader<std::uint8_t>& reader, const SubRect& rect) {
+    test::Block<std::uint8_t> block{rect, {0, 1, 2}, {}, {}};
+    EXPECT_TRUE(block.Read(reader));
+    return block.pixels;
+  };
+  for (int file = 0; file < kFiles; ++file) {
+    Make(path(file),
+         {GDT_Byte,
+          {"TILED=YES", "BLOCKXSIZE=32", "BLOCKYSIZE=32", "COMPRESS=LZW", "INTERLEAVE=PIXEL"}},
+         100 + file);
+    shared.push_back(test::OpenSource({path(file)}));
+    const auto peer = OpenBy(GdalFactory(), path(file));
+    want.push_back(read(*test::ReaderOf<std::uint8_t>(peer), {0, 0, 202, 148}));
+  }
+  std::vector<std::jthread> threads;
+  std::atomic<int> wrong{0};
+  for (unsigned t = 0; t < 6; ++t) {
+    threads.emplace_back([&, t] {
+      std::mt19937 random(t);
+      for (int i = 0; i < 60; ++i) {
+        const auto file = static_cast<std::size_t>(random() % kFiles);
+        const auto source =
+            i % 4 == 0 ? test::OpenSource({path(static_cast<int>(file))}) : shared[file];
+        const unsigned left = random() % 150, top = random() % 100;
+        const SubRect rect(left, top, left + random() % 53, top + random() % 49);
+        const auto got = read(*test::ReaderOf<std::uint8_t>(source), rect);
+        std::size_t at = 0;
+        for (unsigned y = rect.top; y <= rect.bottom; ++y) {
+          for (unsigned x = rect.left * 3; x < (rect.right + 1) * 3; ++x) {
+            if (got[at++] != want[file][y * 203 * 3 + x]) ++wrong;
+          }
+        }
+      }
+    });
+  }
+  threads.clear();
+  EXPECT_EQ(wrong, 0);
 }
 
 /// Requests beyond reading go to GDAL, and reads afterwards give what it changed.

@@ -128,23 +128,43 @@ TEST(OrvaPixels, BlocksLargerThanAStretchAndPixelsLargerThanAGap) {
   }
 }
 
+/// Blocks large enough to be read in parts, in every order of the file and the caller; with and
+/// without pixels that are no data, one block after the other in the same arrays.
 TEST(OrvaPixels, ReadsOtherInterleavesThroughTheReader) {
   const TemporaryDirectory directory;
-  Scene scene;
-  scene.interleave = Interleave::BSQ;
-  scene.Write<float>(directory.Path() / "scene");
-  auto source = OpenSource({"ORVA", (directory.Path() / "scene").string()});
-  const auto reader = ReaderOf<float>(source);
-  ASSERT_TRUE(reader);
-  Array<float> pixels;
-  Array<unsigned char> state;
-  const std::vector<unsigned> bands = {3, 1};
-  ASSERT_TRUE(reader->ReadBlock({1, 2, 4, 4}, Block<float>{{}, bands, {}, {}}.BandArray(), 0,
-                                Interleave::BIP, pixels, state));
-  const float* pixel = pixels.begin();
-  VisitBlock(Interleave::BIP, {1, 2, 4, 4}, bands, [&](unsigned s, unsigned l, unsigned b) {
-    ASSERT_EQ(*pixel++, RampValue<float>(s, l, b));
-  });
+  const auto path = (directory.Path() / "scene").string();
+  for (const Interleave stored : kInterleaves) {
+    Scene scene{700, 300, 4, stored, true, 0, "no data values = {none, 77, none, none}\n"};
+    const auto value = [](unsigned s, unsigned l, unsigned b) {
+      return static_cast<std::uint16_t>(s < 350 ? 1000 + s + 7 * l + b : (s + l + b) % 100);
+    };
+    WriteFile(path, scene.Pixels<std::uint16_t>(value));
+    WriteFile(path + ".hdr", scene.Header("UInt16"));
+    auto source = OpenSource({"ORVA", path});
+    const auto reader = ReaderOf<std::uint16_t>(source);
+    ASSERT_TRUE(reader) << TakeFault().ToUTF8();
+    Array<std::uint16_t> pixels;
+    Array<unsigned char> state;
+    for (const Interleave wanted : kInterleaves) {
+      SCOPED_TRACE(FormatValue(stored).ToUTF8() + " to " + FormatValue(wanted).ToUTF8());
+      for (const Case& c : std::vector<Case>{{{0, 0, 699, 299}, {0, 1, 2, 3}},
+                                             {{0, 0, 349, 299}, {0, 1, 2, 3}},
+                                             {{20, 3, 690, 280}, {3, 1}},
+                                             {{351, 2, 354, 4}, {2, 1, 1}}}) {
+        ASSERT_TRUE(reader->ReadBlock(c.rect, Block<std::uint16_t>{{}, c.bands, {}, {}}.BandArray(),
+                                      0, wanted, pixels, state));
+        std::size_t at = 0, wrong = 0;
+        VisitBlock(wanted, c.rect, c.bands, [&](unsigned s, unsigned l, unsigned b) {
+          const std::uint16_t want = value(s, l, b);
+          const int bits = b == 1 && want == 77 ? PixelValueState::NoData : 0;
+          if (pixels[at] != want || state[at] != bits) ++wrong;
+          ++at;
+        });
+        EXPECT_EQ(at, state.GetCount());
+        EXPECT_EQ(wrong, 0U);
+      }
+    }
+  }
 }
 
 /// Marks, by the definition, what a reader is to mark.
