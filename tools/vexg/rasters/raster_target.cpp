@@ -121,7 +121,9 @@ void TargetOptions::AddFormatTo(OptionSet& line) {
     const CreationValue& value = CreationValues()[i];
     if (IsFlag(value)) continue;
     std::string help = value.meaning;
-    help.erase(std::min(help.find("; Told: "), help.size()));
+    for (const char* const inInputs : {"; Auto: ", "; Told: "}) {
+      help.erase(std::min(help.find(inInputs), help.size()));
+    }
     help[0] = static_cast<char>(std::toupper(static_cast<unsigned char>(help[0])));
     Option option = line.Add(value.option, creation[i], help + DefaultTextOf(value));
     if (value.words != nullptr) option.Takes(OneOf(WordsOfOption(value)));
