@@ -108,7 +108,7 @@ bool PackedPixels::MakeFile() {
   }
   const std::string folder = std::filesystem::path(raster_.path).parent_path().string();
   file_ = isCog_ ? platform::RandomAccessFile::CreateUnnamed(folder, &why)
-                 : platform::RandomAccessFile::Create(raster_.path, &why);
+                 : platform::RandomAccessFile::CreateOrEmpty(raster_.path, &why);
   return file_ != nullptr || Fail(why);
 }
 
