@@ -499,7 +499,7 @@ bool PackedPixels::WriteDirectory() {
 
 bool PackedPixels::Finish() {
   std::string why;
-  // What was told of the raster since it was begun.
+  // The description holds whatever was told of the raster since it was begun.
   const auto description = platform::RandomAccessFile::Open(
       raster_.description, platform::RandomAccessFile::Access::kRead, &why);
   if (description == nullptr || !ReadTags(*description, tags_, why)) return Fail(why);
