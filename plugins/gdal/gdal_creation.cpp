@@ -71,6 +71,36 @@ void Remove(const std::string& path) {
   fs::remove(path, ignored);
 }
 
+/// The world file of a raster: the first and the last letter of its ending, and a w.
+std::string WorldName(const std::string& path) {
+  const std::string ending = fs::path(path).extension().string();
+  if (ending.size() < 3) return path + ".wld";
+  const std::string letters{ending[0], ending[1], ending.back(), 'w'};
+  return fs::path(path).replace_extension(letters).string();
+}
+
+/// The text of a world file; empty for a raster without a grid. It counts from the middle of the
+/// first pixel.
+std::string WorldText(const RasterDef& def) {
+  if (!def.geoRef || def.geoRef->GetType() == GeoRef::kRpc) return {};
+  const double samples = def.samples, lines = def.lines;
+  double x = 0, y = 0, right[2] = {}, below[2] = {}, middle[2] = {};
+  const bool isGrid = def.geoRef->PixelToMap(0, 0, x, y) &&
+                      def.geoRef->PixelToMap(samples, 0, right[0], right[1]) &&
+                      def.geoRef->PixelToMap(0, lines, below[0], below[1]) &&
+                      def.geoRef->PixelToMap(0.5, 0.5, middle[0], middle[1]);
+  if (!isGrid) return {};
+  std::string text;
+  for (const double number :
+       {(right[0] - x) / samples, (right[1] - y) / samples, (below[0] - x) / lines,
+        (below[1] - y) / lines, middle[0], middle[1]}) {
+    char line[40];
+    CPLsnprintf(line, sizeof line, "%.15g\n", number);
+    text += line;
+  }
+  return text;
+}
+
 /// With the extension at the end, since drivers choose by it.
 std::string TemporaryPath(const std::string& path) {
   return platform::TemporaryPathBeside(path) + fs::path(path).extension().string();
@@ -209,6 +239,7 @@ NewRaster::~NewRaster() {
     Remove(path);
     for (const char* const suffix : kSideFiles) Remove(path + suffix);
     Remove(fs::path(path).replace_extension(".ige").string());
+    Remove(WorldName(path));
   }
 }
 
@@ -270,6 +301,9 @@ bool NewRaster::CheckTarget() const {
   if (type.type == GDT_Unknown) return Fail("no raster can have this pixel type");
   const std::string misfit = FindCreationMisfit(def_);
   if (!misfit.empty()) return Fail(misfit);
+  if (def_.creation.worldFile && WorldText(def_).empty()) {
+    return Fail("has no grid for a world file");
+  }
   if (driver_ == "JPEG" && type.type != GDT_Byte) {
     return Fail("the format holds bytes only");  // of 16 bits GDAL would keep 12
   }
@@ -474,7 +508,14 @@ bool NewRaster::CopyToFormat(DatasetPtr dataset) {
 bool NewRaster::WriteBeside() const {
   const Messages messages;
   const bool isSet = CompleteBeside(temporary_, driver_, def_, histograms_);
-  return (isSet && !messages.HasError()) || Fail(messages.Text());
+  if (!isSet || messages.HasError()) return Fail(messages.Text());
+  std::string why;
+  if (!def_.creation.worldFile ||
+      platform::WriteNewFile(WorldName(temporary_), WorldText(def_), &why)) {
+    return true;
+  }
+  SetFault(Shown(why));
+  return false;
 }
 
 bool NewRaster::WriteMask() {
@@ -537,6 +578,10 @@ bool NewRaster::MoveFiles(platform::FileSwap& swap, std::string& why) const {
     if (!swap.MoveAside(path_ + suffix, &why)) return false;
   }
   if (!(driver_ == "HFA" ? MoveImagine(swap, why) : swap.MoveIn(temporary_, path_, &why))) {
+    return false;
+  }
+  if (def_.creation.worldFile && !(swap.MoveAside(WorldName(path_), &why) &&
+                                   swap.MoveIn(WorldName(temporary_), WorldName(path_), &why))) {
     return false;
   }
   for (const char* const suffix : kSideFiles) {

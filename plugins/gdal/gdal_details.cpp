@@ -2,8 +2,10 @@
 
 #include <array>
 #include <cpl_conv.h>
+#include <cpl_minixml.h>
 #include <cpl_string.h>
 #include <gdal_pam.h>
+#include <gdal_rat.h>
 #include <locale>
 #include <map>
 #include <memory>
@@ -20,6 +22,8 @@ namespace {
 
 constexpr const char* kItems = "Items/";
 constexpr const char* kPoints = "Points/";
+/// The text of an attribute table that is to be made of the names of values.
+constexpr const char* kOfCategories = "Categories";
 
 /// Names of items that describe a file and its pixels as they lie there, not of the raster.
 bool IsOfFile(const std::string& name) {
@@ -104,6 +108,61 @@ CPLStringList CategoryList(const std::string& lines) {
   return list;
 }
 
+/// The attribute table of a band as XML; empty where it has none that tells more than how often
+/// values are.
+std::string TableOf(GDALRasterBandH band) {
+  constexpr int kMostRows = 65536;
+  GDALRasterAttributeTable* const table = GDALRasterBand::FromHandle(band)->GetDefaultRAT();
+  if (table == nullptr || table->GetRowCount() == 0 || table->GetRowCount() > kMostRows) return {};
+  bool tells = false;
+  for (int i = 0; i < table->GetColumnCount(); ++i) {
+    tells = tells || table->GetTypeOfCol(i) == GFT_String || table->GetUsageOfCol(i) == GFU_Generic;
+  }
+  CPLXMLNode* const tree = tells ? table->Serialize() : nullptr;
+  char* const text = tree != nullptr ? CPLSerializeXMLTree(tree) : nullptr;
+  std::string xml = text != nullptr ? text : "";
+  CPLFree(text);
+  CPLDestroyXMLNode(tree);
+  return xml;
+}
+
+/// Reads one. False for a text that is none.
+bool ReadTable(const std::string& xml, GDALDefaultRasterAttributeTable& table) {
+  CPLXMLNode* const tree = CPLParseXMLString(xml.c_str());
+  const bool done = tree != nullptr && table.XMLInit(tree, "") == CE_None;
+  CPLDestroyXMLNode(tree);
+  return done;
+}
+
+/// Makes one of the names and colours of the values of a band.
+void MakeTable(GDALRasterBand& band, const std::string& categories,
+               GDALDefaultRasterAttributeTable& table) {
+  table.SetTableType(GRTT_THEMATIC);
+  table.CreateColumn("Value", GFT_Integer, GFU_MinMax);
+  table.CreateColumn("Class", GFT_String, GFU_Name);
+  const CPLStringList names = CategoryList(categories);
+  const GDALColorTable* const colors = band.GetColorTable();
+  if (colors != nullptr) {
+    table.CreateColumn("Red", GFT_Integer, GFU_Red);
+    table.CreateColumn("Green", GFT_Integer, GFU_Green);
+    table.CreateColumn("Blue", GFT_Integer, GFU_Blue);
+  }
+  for (int value = 0, row = 0; value < names.size(); ++value) {
+    if (names[value][0] == '\0') continue;
+    table.SetValue(row, 0, value);
+    table.SetValue(row, 1, names[value]);
+    const GDALColorEntry* const color = colors != nullptr && value < colors->GetColorEntryCount()
+                                            ? colors->GetColorEntry(value)
+                                            : nullptr;
+    if (color != nullptr) {
+      table.SetValue(row, 2, color->c1);
+      table.SetValue(row, 3, color->c2);
+      table.SetValue(row, 4, color->c3);
+    }
+    ++row;
+  }
+}
+
 /// The details of a band by their names.
 std::map<std::string, std::string> DetailsOf(GDALRasterBandH band) {
   std::map<std::string, std::string> details;
@@ -114,6 +173,7 @@ std::map<std::string, std::string> DetailsOf(GDALRasterBandH band) {
   enter("Unit", GDALGetRasterUnitType(band));
   enter("Meaning", MeaningOf(band).c_str());
   enter("Categories", CategoriesOf(band).c_str());
+  enter("AttributeTable", TableOf(band).c_str());
   int has = FALSE;
   const double scale = GDALGetRasterScale(band, &has);
   if (has != FALSE && scale != 1) details["Scale"] = TextOf(scale);
@@ -245,6 +305,11 @@ bool SetDetailBeside(GDALPamRasterBand& band, const std::string& name, const std
   if (name == "Categories") {
     return band.Base::SetCategoryNames(CategoryList(text).List()) == CE_None;
   }
+  if (name == "AttributeTable") {
+    if (text == kOfCategories) return true;  // comes last
+    GDALDefaultRasterAttributeTable table;
+    return !ReadTable(text, table) || band.SetDefaultRAT(&table) == CE_None;
+  }
   if (!name.starts_with(items)) return true;
   const std::string item = Decoded(name.substr(items.size()));
   return band.Base::SetMetadataItem(item.c_str(), text.c_str()) == CE_None;
@@ -303,17 +368,26 @@ bool WritePlaceDetails(GDALDatasetH dataset, const RasterDef& def) {
 }
 
 bool CompleteDetails(GDALPamDataset& file, const RasterDef& def) {
-  const Wanted wanted(def);
+  Wanted wanted(def);
   bool done = true;
+  const bool isImagine = file.GetDriver() == GDALGetDriverByName("HFA");
   for (std::size_t i = 0; i < wanted.bands.size(); ++i) {
     if (wanted.bands[i].empty()) continue;
     GDALRasterBand* const band = file.GetRasterBand(static_cast<int>(i) + 1);
     auto* const target = dynamic_cast<GDALPamRasterBand*>(band);
+    // Imagine files have tables of their own, which no file beside them replaces.
+    if (isImagine) wanted.bands[i].erase("AttributeTable");
     const auto has = DetailsOf(GDALRasterBand::ToHandle(band));
     for (const auto& [name, text] : wanted.bands[i]) {
       const auto found = has.find(name);
       if (found != has.end() && found->second == text) continue;
       if (target != nullptr) done = SetDetailBeside(*target, name, text) && done;
+    }
+    const auto table = wanted.bands[i].find("AttributeTable");
+    if (table != wanted.bands[i].end() && table->second == kOfCategories && target != nullptr) {
+      GDALDefaultRasterAttributeTable made;
+      MakeTable(*band, wanted.bands[i]["Categories"], made);
+      done = target->SetDefaultRAT(&made) == CE_None && done;
     }
   }
   for (const auto& [name, text] : wanted.items) {

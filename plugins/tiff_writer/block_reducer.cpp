@@ -57,6 +57,23 @@ T MeanOf(const T* values, unsigned count) {
   }
 }
 
+/// Whether four values have a mean by the short formula.
+template <typename T>
+constexpr bool kHasShortMean = std::is_integral_v<T> && sizeof(T) <= 4;
+
+/// Makes the means of pixels that all count, of two lines.
+/// @param count  pixels of the level.
+template <typename T>
+void ShortMeans(const T* upper, const T* lower, unsigned count, unsigned depth, T* to) {
+  using Sum = std::conditional_t<sizeof(T) == 4, std::int64_t, std::int32_t>;
+  for (unsigned x = 0; x < count; ++x, upper += 2 * depth, lower += 2 * depth, to += depth) {
+    for (unsigned band = 0; band < depth; ++band) {
+      const Sum sum = Sum{upper[band]} + upper[depth + band] + lower[band] + lower[depth + band];
+      to[band] = static_cast<T>((sum + 2) >> 2);  // rounds down, of negative numbers too
+    }
+  }
+}
+
 /// The most frequent of one to four values, of several such the first.
 template <typename T>
 T ModeOf(const std::array<T, 4>& values, unsigned count) {
@@ -105,6 +122,9 @@ void BlockReducer::ReduceAs(const Reduction& work) const {
   const unsigned width = (work.width + 1) / 2, height = (work.height + 1) / 2;
   const bool hasAlpha = hasAlpha_ && depth_ == bands_;
   const unsigned alpha = bands_ - 1;
+  const bool isPlain = method_ != OverviewMethod::kNearest && method_ != OverviewMethod::kMode &&
+                       work.excluded == nullptr && !hasAlpha &&
+                       std::find(hasNoData_.begin(), hasNoData_.end(), true) == hasNoData_.end();
   auto* to = reinterpret_cast<T*>(work.reduced);
   std::array<T, 4> values{};
   std::vector<T> noData(depth_);
@@ -113,7 +133,17 @@ void BlockReducer::ReduceAs(const Reduction& work) const {
   }
   for (unsigned y = 0; y < height; ++y) {
     const unsigned rows = std::min(2U, work.height - 2 * y);
-    for (unsigned x = 0; x < width; ++x, to += depth_) {
+    unsigned done = 0;
+    if constexpr (kHasShortMean<T>) {
+      if (isPlain && rows == 2) {
+        const unsigned char* const upper = work.pixels + 2 * std::size_t{y} * work.line;
+        done = work.width / 2;
+        ShortMeans(reinterpret_cast<const T*>(upper), reinterpret_cast<const T*>(upper + work.line),
+                   done, depth_, to);
+        to += std::size_t{done} * depth_;
+      }
+    }
+    for (unsigned x = done; x < width; ++x, to += depth_) {
       const unsigned columns = std::min(2U, work.width - 2 * x);
       const T* from[4];  // the pixels that are there
       bool counts[4];

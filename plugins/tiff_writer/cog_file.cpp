@@ -87,7 +87,7 @@ class CogWriter {
       isBig_ = true;
       Place();
     }
-    file_ = platform::RandomAccessFile::Create(path, &why);
+    file_ = platform::RandomAccessFile::CreateOrEmpty(path, &why);
     if (file_ != nullptr && WriteHead(&why) && WriteBlocks(&why) && file_->Close(&why)) return true;
     SetFault(why);
     return false;

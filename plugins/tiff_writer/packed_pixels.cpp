@@ -108,7 +108,7 @@ bool PackedPixels::MakeFile() {
   }
   const std::string folder = std::filesystem::path(raster_.path).parent_path().string();
   file_ = isCog_ ? platform::RandomAccessFile::CreateUnnamed(folder, &why)
-                 : platform::RandomAccessFile::Create(raster_.path, &why);
+                 : platform::RandomAccessFile::CreateOrEmpty(raster_.path, &why);
   return file_ != nullptr || Fail(why);
 }
 
@@ -499,7 +499,7 @@ bool PackedPixels::WriteDirectory() {
 
 bool PackedPixels::Finish() {
   std::string why;
-  // What was told of the raster since it was begun.
+  // The description holds whatever was told of the raster since it was begun.
   const auto description = platform::RandomAccessFile::Open(
       raster_.description, platform::RandomAccessFile::Access::kRead, &why);
   if (description == nullptr || !ReadTags(*description, tags_, why)) return Fail(why);

@@ -231,6 +231,7 @@ bool ReadCreationOptions(const std::function<std::string(const char* input)>& te
 }
 
 std::string FindCreationMisfit(const RasterDef& def) {
+  if (def.format == "ORVA" && def.creation.worldFile) return "the format ORVA takes no world file";
   CreationOptions ofTiff = def.creation;
   ofTiff.worldFile = false;
   if (def.format != "TIFF" && !ofTiff.IsTold()) {

@@ -106,6 +106,7 @@ void SetCategories(Metadata& metadata, unsigned band, const Array<String>& names
     text += line + '\n';
   }
   if (!text.empty()) metadata.Set(BandDetailPath(band, "Categories"), String(text));
+  metadata.Set(BandDetailPath(band, "AttributeTable"), String("Categories"));
 }
 
 std::vector<std::string> FindCategories(const Metadata& metadata, unsigned band) {

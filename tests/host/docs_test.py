@@ -50,7 +50,7 @@ class Documents(PipeTest):
             shell = subprocess.run(["bash", "-c", script], cwd=folder, capture_output=True, text=True, timeout=60)
             self.assertEqual(shell.returncode, 0, shell.stderr)
             self.assertEqual(sorted(path.name for path in pathlib.Path(folder).iterdir()),
-                             ["areas.csv", "areas.gpkg", "fields.csv", "fields.shape.fxa", "fields.spectral.fxa",
+                             ["areas.csv", "areas.gpkg", "cloud.tif", "fields.csv", "fields.shape.fxa", "fields.spectral.fxa",
                               "geographic.tif", "histogram.png", "labels.tif", "part.npy", "part.tif", "ratio.tif",
                               "reflectance.tif", "scene.dat", "scene.dat.hdr", "scene.png", "scene.tif", "scene.tif.pyr",
                               "segments.tif"])

@@ -138,9 +138,13 @@ bool IsSameSystem(const std::string& a, const std::string& b) {
 /// The user's name for a kind of detail; null for what is compared elsewhere.
 const char* KindOf(const std::string& name) {
   static constexpr std::pair<const char*, const char*> kKinds[] = {
-      {"/NoDataValue", nullptr},           {"/Description", "the names of bands"},
-      {"/Unit", "the units of bands"},     {"/Scale", "the scales of bands"},
-      {"/Offset", "the offsets of bands"}, {"/Meaning", "the alpha band as such"}};
+      {"/NoDataValue", nullptr},
+      {"/Description", "the names of bands"},
+      {"/Unit", "the units of bands"},
+      {"/Scale", "the scales of bands"},
+      {"/Offset", "the offsets of bands"},
+      {"/Meaning", "the alpha band as such"},
+      {"/AttributeTable", "the attribute tables of bands"}};
   if (name.starts_with("Points/")) return "the ground control points";
   if (name == "Grid") return "the sheared grid";
   if (name == "CoordSys") return "the coordinate system";

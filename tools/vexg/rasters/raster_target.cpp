@@ -2,6 +2,8 @@
 
 #include <algorithm>
 
+#include <fmt/format.h>
+
 #include "data/format_table.h"
 #include "foundation/text_case.h"
 #include "options/option_values.h"
@@ -47,14 +49,24 @@ bool IsFlag(const CreationValue& value) {
   return value.kind == ValueKind::kBoolean || std::string(value.input) == "Layout";
 }
 
-/// What a verb does when an option isn't there.
+/// Says how a verb goes on without an option.
 std::string DefaultTextOf(const CreationValue& value) {
   static const std::map<std::string, std::string> kTexts = {
       {"Compress", "zstd"}, {"Predictor", "auto"}, {"Tile", "512"}, {"BigTIFF", "auto"}};
   const auto found = kTexts.find(value.input);
-  if (found != kTexts.end()) return "; " + found->second + " by default";
+  if (found != kTexts.end()) return fmt::format("; {} by default", found->second);
   const bool isOverviews = std::string(value.input) == "Overviews";
   return isOverviews ? "; average by default, nearest for classes and labels" : "";
+}
+
+/// The help of an option: the meaning of the input without the words that verbs don't take.
+std::string HelpOf(const CreationValue& value) {
+  std::string_view meaning = value.meaning;
+  for (const std::string_view inInputs : {"; Auto: ", "; Told: "}) {
+    meaning = meaning.substr(0, meaning.find(inInputs));
+  }
+  const int first = std::toupper(static_cast<unsigned char>(meaning.front()));
+  return fmt::format("{}{}{}", static_cast<char>(first), meaning.substr(1), DefaultTextOf(value));
 }
 
 /// The word of an input that a user means.
@@ -116,14 +128,13 @@ void TargetOptions::AddFormatTo(OptionSet& line) {
       "Make a cloud-optimised GeoTIFF, with its reduced levels inside; --format COG is the same");
   line.Add("--compatible", compatible,
            "Pack a TIFF file so that all programs can read it: by DEFLATE, not ZSTD");
+  line.Add("--world-file", worldFile,
+           "Also make a world file with the grid beside it: .tfw, .pgw ...");
   creation.resize(CreationValues().size());
   for (std::size_t i = 0; i < creation.size(); ++i) {
     const CreationValue& value = CreationValues()[i];
     if (IsFlag(value)) continue;
-    std::string help = value.meaning;
-    help.erase(std::min(help.find("; Told: "), help.size()));
-    help[0] = static_cast<char>(std::toupper(static_cast<unsigned char>(help[0])));
-    Option option = line.Add(value.option, creation[i], help + DefaultTextOf(value));
+    Option option = line.Add(value.option, creation[i], HelpOf(value));
     if (value.words != nullptr) option.Takes(OneOf(WordsOfOption(value)));
     if (value.words == nullptr) option.Shows(value.shown);
   }
@@ -142,30 +153,37 @@ std::string ChooseFormat(const TargetOptions& target) {
 }
 
 void CheckCreation(const TargetOptions& target, const std::string& format) {
+  if (format == "ORVA" && target.worldFile) {
+    throw HostError(kExitUsage, "--world-file: the format ORVA takes no world file");
+  }
   if (format == "TIFF") return;
   if (IsCog(target)) {
-    throw HostError(kExitUsage,
-                    "--cog: a cloud-optimised file is a TIFF file, and the format is " + format);
+    throw HostError(
+        kExitUsage,
+        fmt::format("--cog: a cloud-optimised file is a TIFF file, and the format is {}", format));
   }
   for (std::size_t i = 0; i < target.creation.size(); ++i) {
     if (target.creation[i].empty()) continue;
-    throw HostError(kExitUsage, std::string(CreationValues()[i].option) +
-                                    ": is of TIFF files, and the format is " + format);
+    throw HostError(kExitUsage, fmt::format("{}: is of TIFF files, and the format is {}",
+                                            CreationValues()[i].option, format));
   }
   if (target.compatible) {
-    throw HostError(kExitUsage, "--compatible: is of TIFF files, and the format is " + format);
+    throw HostError(kExitUsage,
+                    fmt::format("--compatible: is of TIFF files, and the format is {}", format));
   }
 }
 
 CreationTexts ChooseCreation(const TargetOptions& target, const std::string& format,
                              const RasterInfo& raster, const std::string& overviews) {
   CheckCreation(target, format);
-  if (format != "TIFF") return {};
-  CreationTexts texts = DefaultsOf(target, raster);
+  CreationTexts texts;
+  if (format == "TIFF") texts = DefaultsOf(target, raster);
+  if (target.worldFile) texts.emplace("WorldFile", "1");
+  if (format != "TIFF") return texts;
   const bool isCog = IsCog(target);
   if (isCog) {
-    texts["Layout"] = "COG";
-    texts["Overviews"] = overviews;
+    texts.emplace("Layout", "COG");
+    texts.emplace("Overviews", overviews);
   }
   for (std::size_t i = 0; i < target.creation.size(); ++i) {
     const CreationValue& value = CreationValues()[i];
@@ -178,7 +196,7 @@ CreationTexts ChooseCreation(const TargetOptions& target, const std::string& for
   def.interleave = raster.interleave;
   def.creation = ReadOptions(texts);
   const std::string misfit = FindCreationMisfit(def);
-  if (!misfit.empty()) throw HostError(kExitUsage, target.output + ": " + misfit);
+  if (!misfit.empty()) throw HostError(kExitUsage, fmt::format("{}: {}", target.output, misfit));
   return texts;
 }
 

@@ -19,6 +19,7 @@ struct TargetOptions {
   std::vector<std::string> creation;  ///< a text for each of CreationValues(); empty for none
   bool cog = false;                   ///< a cloud-optimised file
   bool compatible = false;            ///< what all programs can read
+  bool worldFile = false;             ///< with the grid in a world file beside it
 
   /// @param meaning  what the file is, for the help.
   void AddTo(OptionSet& line, const std::string& meaning);

@@ -2,6 +2,10 @@
 
 #include <filesystem>
 
+#include <fmt/format.h>
+
+#include "output/stac_item.h"
+#include "pictures/palette_reading.h"
 #include "rasters/raster_target.h"
 
 namespace lumo::host {
@@ -14,12 +18,19 @@ void RasterVerb::AddFilesTo(OptionSet& line, const std::string& meaning, bool is
 
 void RasterVerb::AddOutputTo(OptionSet& line, const std::string& meaning) {
   target_.AddTo(line, meaning);
+  AddStacTo(line);
   AddOverwriteTo(line, "files that are there");
 }
 
 void RasterVerb::AddFormatTo(OptionSet& line) {
   target_.AddFormatTo(line);
+  AddStacTo(line);
   AddOverwriteTo(line, "files that are there");
+}
+
+void RasterVerb::AddStacTo(OptionSet& line) {
+  line.Add("--stac", stac_,
+           "Also make a STAC item, which describes the raster, beside it: NAME.stac.json");
 }
 
 void RasterVerb::AddSource(RasterChain& chain) const {
@@ -67,6 +78,7 @@ void RasterVerb::Plan(JobSession& session, const JobResults& opened) {
 std::vector<std::string> RasterVerb::GetOutputs() const {
   std::vector<std::string> outputs{target_.output};
   for (const std::string& file : GetFurtherOutputs()) outputs.push_back(file);
+  if (stac_) outputs.push_back(StacNameOf(target_.output));
   return outputs;
 }
 
@@ -116,6 +128,39 @@ void RasterVerb::MakeFurther(JobSession& session, const Outputs& outputs) {
   session.Run(draft);
 }
 
+/// Writes the STAC item, the last of the outputs.
+void RasterVerb::MakeStac(JobSession& session, const Outputs& outputs,
+                          const RasterContents& made) const {
+  const OutputFile& output = outputs.Get(0);
+  StacRaster raster{std::filesystem::path(output.GetName()).filename().string(),
+                    creation_.count("Layout") != 0, made, std::vector<Palette>(made.info.bands),
+                    std::vector<Array<String>>(made.info.bands)};
+  raster.contents.info.format = String(format_);
+  JobDraft open;
+  AddOpen(open, "made", {output.GetWorkName(), format_});
+  for (unsigned band = 0; band < made.info.bands; ++band) {
+    JobWriterCommand& ask =
+        open.Step(fmt::format("categories{}", band), "GetRasterCategoriesCommand");
+    ask.AddInput("URI", String("$made"));
+    ask.AddInput("Band", band);
+  }
+  const JobResults opened = session.Run(open);
+  const String uri = opened.Find("made").returns.Find("URI");
+  for (unsigned band = 0; band < made.info.bands; ++band) {
+    const String step(fmt::format("categories{}", band));
+    raster.categories[band] =
+        ParseValue<Array<String>>(opened.Find(step).returns.Find("Categories"));
+    if (made.info.hasPalette[band]) raster.palettes[band] = ReadPalette(session, uri, band);
+  }
+  JobDraft close;
+  close.Close("close", uri);
+  session.Run(close);
+  const std::string text = StacItemOf(raster).dump(2) + "\n";
+  FileWriter writer(outputs.Get(GetOutputs().size() - 1));
+  writer.Write(text.data(), text.size());
+  writer.Close();
+}
+
 void RasterVerb::Make(JobSession& session, const Outputs& outputs) {
   const OutputFile& output = outputs.Get(0);
   Losses losses(output.GetShownName(), format_, target_.strict);
@@ -137,6 +182,7 @@ void RasterVerb::Make(JobSession& session, const Outputs& outputs) {
   session.CheckInterrupt();
   losses.Settle();
   MakeFurther(session, outputs);
+  if (stac_) MakeStac(session, outputs, raster.made);
   for (const std::string& ending : GetLeftovers()) {
     std::error_code fault;  // what stays there would take its place with the raster
     std::filesystem::remove(output.GetWorkName() + ending, fault);

@@ -111,12 +111,15 @@ class RasterVerb : public FileVerb {
 
  private:
   void MakeFurther(JobSession& session, const Outputs& outputs);
+  void MakeStac(JobSession& session, const Outputs& outputs, const RasterContents& made) const;
+  void AddStacTo(OptionSet& line);
   JobDraft MakeDraft(const std::string& file, const FillValues& noData) const;
   TargetPlace PlaceAt(const std::string& file) const { return {file, format_, creation_}; }
 
   TargetOptions target_;
   std::string format_;
   CreationTexts creation_;
+  bool stac_ = false;  // a STAC item beside the raster
   RasterInfo planned_;
 };
 

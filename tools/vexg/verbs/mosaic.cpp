@@ -194,7 +194,8 @@ class MosaicVerb final : public RasterVerb {
   }
 
   std::vector<std::string> GetOutputs() const override {
-    if (Is("create") || Is("build")) return {file_};
+    if (Is("build")) return RasterVerb::GetOutputs();
+    if (Is("create")) return {file_};
     return Is("show") || Is("export") ? more_ : std::vector<std::string>();
   }
 
