@@ -74,6 +74,8 @@ class NumbersTest(FolderTest):
             areas[label] = areas.get(label, 0) + area_of(shape)
         for label in range(1, 5):
             self.assertEqual(areas[label], 4 * (labels == label).sum())
+        data, offsets = raster.polygons().wkb_column()
+        self.assertEqual([data[a:b] for a, b in zip(offsets, offsets[1:])], raster.polygons().wkb)
         told = raster.polygons().__geo_interface__
         self.assertEqual(len(told["features"]), len(raster.polygons()))
         corners = numpy.array(told["features"][0]["geometry"]["coordinates"][0])
