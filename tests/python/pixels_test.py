@@ -293,6 +293,38 @@ class ViewTest(FolderTest):
         with self.assertRaisesRegex(TypeError, "gian"):
             self.scene.radiance(gian=1)
 
+    def test_constants_of_headers(self):
+        """The MTL of a Landsat scene gives the reflectance of its own factors (USGS Landsat 8 data users
+        handbook, section 5), and other headers that of the program."""
+        factors = {1: (0.012, -60.0, 2.0e-5, -0.1), 2: (0.0125, -62.5, 2.0e-5, -0.1), 3: (0.013, -65, 2.1e-5, -0.105)}
+        lines = ["GROUP = L1_METADATA_FILE", "  SUN_ELEVATION = 51.25", "  EARTH_SUN_DISTANCE = 1.0105"]
+        for band, values in factors.items():
+            for name, value in zip(("RADIANCE_MULT", "RADIANCE_ADD", "REFLECTANCE_MULT", "REFLECTANCE_ADD"), values):
+                lines.append(f"  {name}_BAND_{band} = {value!r}")
+        mtl = self.folder / "LC08_MTL.txt"
+        mtl.write_text("\n".join(lines) + "\nEND\n")
+        counts = numpy.arange(5001, 65000, 1713, dtype="uint16").reshape(4, 9)
+        raster = vexg.from_array(numpy.stack([counts, counts]))
+        got = raster.reflectance(metadata=mtl, metadata_bands=[3, 1]).read()
+        for values, band in zip(got, (3, 1)):
+            _, _, gain, offset = factors[band]
+            numpy.testing.assert_allclose(values, (gain * counts + offset) / numpy.sin(numpy.radians(51.25)), rtol=1e-5)
+        with self.assertRaisesRegex(vexg.Error, "metadata_bands"):
+            raster.reflectance(metadata=mtl)
+        with self.assertRaisesRegex(vexg.Error, "tells? "):
+            raster.reflectance(metadata=self.folder / "scene.foo")
+        header = DATA / "sidecars" / "wv03.IMD"
+        bands = 8
+        raster = vexg.from_array(numpy.full((bands, 3, 4), 700, dtype="uint16")).save(self.folder / "wv.tif")
+        file = self.folder / "radiance.tif"
+        done = subprocess.run([VEXG, "calibrate", "radiance", self.folder / "wv.tif", file, "--from-metadata", header],
+                              capture_output=True, text=True)
+        if done.returncode == 0:
+            numpy.testing.assert_array_equal(raster.radiance(metadata=header).read(), vexg.open(file).read())
+        else:
+            with self.assertRaises((vexg.Error, ValueError)):
+                raster.radiance(metadata=header)
+
     def test_warps_as_the_program_makes_them(self):
         file = self.folder / "warped.tif"
         subprocess.run([VEXG, "warp", SCENE, file, "--to", "EPSG:4326", "--resampling", "linear"], check=True,
