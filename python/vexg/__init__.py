@@ -17,7 +17,7 @@ from .raster import Raster, from_array, open, stack, transform_points
 _LATE = {
     "Polygons": "vectors", "Segments": "segments", "Classes": "segments", "segment": "segments",
     "Server": "server", "mosaic": "mosaics", "job": "jobs", "Job": "jobs", "rasterize": "vectors",
-    "open_labels": "segments", "formats": "_saving",
+    "open_labels": "segments", "formats": "_saving", "create": "_writing",
 }  # fmt: skip
 
 

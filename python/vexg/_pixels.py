@@ -12,7 +12,7 @@ from .errors import Error
 _ORDERS = {"BIP": 0, "BIL": 1, "BSQ": 2}
 _AXES = {0: (1, 2, 0), 1: (1, 0, 2), 2: (0, 1, 2)}  # memory's axes among bands, lines, samples
 _BACK = {0: (2, 0, 1), 1: (1, 0, 2), 2: (0, 1, 2)}  # bands, lines, samples among memory's axes
-_SMALL = 8 << 20  # bytes that are read at once, without a look at interrupts
+_SMALL = 4 << 20  # bytes that are read at once, without a look at interrupts
 _NOT_VALID = 7  # the bits of a state byte
 
 

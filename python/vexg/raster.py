@@ -53,7 +53,9 @@ class Raster(Described, Pixels, Views, _formula.Arithmetic):
 
     def _describe(self):
         if self._info is None:
-            self._info = self._door.describe(self._chain())
+            # Opening may take long, and a mask looks at all pixels: an interrupt is to come out of it.
+            node = self._chain()
+            self._info = watch(lambda task: self._door.describe(node))
         return self._info
 
     def close(self):

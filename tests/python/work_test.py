@@ -168,6 +168,39 @@ class SavingTest(FolderTest):
         numpy.testing.assert_array_equal(vexg.open(file).read(), scene.read([1]))
         self.assertEqual((new.levels, self.left()), ([], ["a.tif"]))  # the pyramid was of other pixels
 
+    def test_files_written_block_by_block(self):
+        scene = vexg.open(SCENE)
+        pixels = scene.read(order="C")
+        for name in ("a.tif", "a.dat"):
+            with vexg.create(self.folder / name, like=scene, dtype="float32", nodata=-1) as out:
+                self.assertEqual((out.shape, out.dtype), (scene.shape, numpy.dtype("float32")))
+                for rows, columns in scene.blocks((100, 90)):
+                    block = scene.read(window=(rows, columns)) / numpy.float32(4)
+                    out.write(numpy.ma.masked_equal(block, 15), (rows, columns))
+                out[2, 5:7, 10:20] = numpy.zeros((2, 10))
+                self.assertNotIn(name, self.left())
+            want = pixels / numpy.float32(4)
+            want[want == 15] = -1
+            want[2, 5:7, 10:20] = 0
+            made = vexg.open(self.folder / name)
+            numpy.testing.assert_array_equal(made.read(), want)
+            numpy.testing.assert_allclose(made.bounds, scene.bounds)
+        self.assertEqual(vexg.create(self.folder / "b.tif", shape=(1, 3, 4), transform=(1, 0, 5, 0, -1, 9),
+                                     crs="EPSG:32633").close().bounds, (5, 6, 9, 9))
+        with self.assertRaises(ZeroDivisionError), vexg.create(self.folder / "c.tif", shape=(1, 3, 4)) as out:
+            out.write(numpy.zeros((3, 4), "uint8"))
+            1 / 0
+        with vexg.create(self.folder / "d.dat", shape=(2, 3, 4)) as out:
+            for kind, wrong in ((ValueError, (numpy.zeros((2, 3, 5), "uint8"),)), (TypeError, (numpy.zeros((2, 3, 4)),)),
+                                (vexg.Error, (numpy.zeros((2, 2, 2), "uint8"), ((2, 4), (0, 2)))),
+                                (IndexError, (numpy.zeros((1, 3, 4), "uint8"), None, 2)),
+                                (ValueError, (numpy.ma.masked_all((2, 3, 4), "uint8"),))):
+                with self.assertRaises(kind):
+                    out.write(*wrong)
+        with self.assertRaisesRegex(vexg.Error, "closed"):
+            out.write(numpy.zeros((2, 3, 4), "uint8"))
+        self.assertEqual(self.left(), ["a.dat", "a.dat.hdr", "a.tif", "b.tif", "d.dat", "d.dat.hdr"])
+
     def test_options_of_the_format(self):
         made = vexg.open(SCENE).save(self.folder / "a.dat", interleave="bsq")
         self.assertEqual(made._describe()["interleave"], "BSQ")
