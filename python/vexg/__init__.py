@@ -12,7 +12,7 @@ docs/python.md is the guide. Nothing of the library is loaded before its first u
 from ._formula import calc, where
 from ._library import library as _library
 from .errors import Error
-from .raster import Raster, from_array, open, stack, transform_points
+from .raster import Raster, from_array, open, stack, transform_points, view
 
 _LATE = {
     "Polygons": "vectors", "Segments": "segments", "Classes": "segments", "segment": "segments",
@@ -44,4 +44,4 @@ def threads(count=0):
 
 
 __all__ = ["Error", "Raster", "calc", "from_array", "open", "stack", "threads", "transform_points",
-           "where", *_LATE]
+           "view", "where", *_LATE]

@@ -267,6 +267,29 @@ def open(file, *, format=None, subdataset=None, server=None):
     return raster
 
 
+def view(command, *, server=None, output="URI", **inputs):
+    """The raster that a command of the library shows, for those that have no method here. Nothing runs
+    before the raster is asked for something.
+
+    Args:
+        command: its class, such as "CreateVirtualRasterCommand".
+        output: the output that gives the raster.
+        inputs: by name; a Raster, or a list of them, where a URI is asked for.
+    """
+    rasters = [each for value in inputs.values() for each in (value if isinstance(value, (list, tuple)) else [value])
+               if isinstance(each, Raster)]
+    door = door_of(rasters) if rasters else local if server is None else server._door
+
+    def node_of(value):
+        if isinstance(value, Raster):
+            return value._chain()
+        if isinstance(value, (list, tuple)) and value and isinstance(value[0], Raster):
+            return tuple(each._chain() for each in value)
+        return _values.text_of(value)
+
+    return Raster(Node(command, tuple((name, node_of(value)) for name, value in inputs.items()), output), door)
+
+
 def from_array(array, *, like=None, transform=None, crs=None, nodata=None):
     """A raster of a numpy array, which is not copied unless its axes are not in one block of memory.
 

@@ -278,6 +278,13 @@ class ServerDoor:
             uris = self._opened.pop(node, [])
         self._close_all(uris)
 
+    def close_all(self):
+        """Lets go of all rasters that were read; they open again as they are asked for."""
+        with self._lock:
+            opened, self._opened = self._opened, OrderedDict()
+        for uris in opened.values():
+            self._close_all(uris)
+
     def describe(self, node):
         """The description of a raster."""
         draft = Draft()
