@@ -110,7 +110,9 @@ class Pixels:
                 raise IndexError(f"there is no band {number}; the raster has {count}, from 0")
         return numpy.array([number % count for number in checked], dtype="uint32"), is_one
 
-    def __array__(self, dtype=None):
+    def __array__(self, dtype=None, copy=None):
+        if copy is False:
+            raise ValueError("a raster can't be had as an array without a copy")
         array = self.read(order="C")
         return array if dtype is None else array.astype(dtype, copy=False)
 
