@@ -13,6 +13,7 @@ import time
 import class_peers
 import mosaic_peers
 import opening_peers
+import python_peers
 import segment_peers
 
 BANDS = 6
@@ -514,7 +515,8 @@ SECTIONS = {"open": opening_peers.opening, "read": opening_peers.reading, "stats
             "mosaic": mosaic_peers.mosaic, "polygons": polygons,
             "zones": zones, "segments": segment_peers.speed, "segment-quality": segment_peers.quality,
             "attributes": attributes, "classes": lambda bench: class_peers.speed(bench, make_regions),
-            "class-quality": class_peers.quality, "memory": memory}
+            "class-quality": class_peers.quality, "memory": memory,
+            "python": python_peers.python}
 
 
 def main():

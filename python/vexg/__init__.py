@@ -9,16 +9,15 @@
 docs/python.md is the guide. Nothing of the library is loaded before its first use.
 """
 
-from . import _saving
 from ._formula import calc, where
 from ._library import library as _library
 from .errors import Error
-from .raster import Raster, from_array, open, stack, transform_points
+from .raster import Raster, from_array, open, stack, transform_points, view
 
 _LATE = {
     "Polygons": "vectors", "Segments": "segments", "Classes": "segments", "segment": "segments",
     "Server": "server", "mosaic": "mosaics", "job": "jobs", "Job": "jobs", "rasterize": "vectors",
-    "open_labels": "segments", "open_vectors": "vectors",
+    "open_labels": "segments", "formats": "_saving", "create": "_writing",
 }  # fmt: skip
 
 
@@ -38,16 +37,11 @@ def __dir__():
     return sorted({*globals(), *_LATE, "commands", "__version__"})
 
 
-def formats():
-    """The formats that can be read or made here, as a table."""
-    return _saving.formats()
-
-
 def threads(count=0):
     """Bounds the threads that work at once in this process; 0 takes the bound away. Gives how many there
     are now at most."""
     return _library.thread_limit(count)
 
 
-__all__ = ["Error", "Raster", "calc", "formats", "from_array", "open", "stack", "threads", "transform_points",
-           "where", *_LATE]
+__all__ = ["Error", "Raster", "calc", "from_array", "open", "stack", "threads", "transform_points",
+           "view", "where", *_LATE]

@@ -3,7 +3,7 @@
 import math
 import os
 
-from . import _formula
+from . import _formula, _mtl
 from ._jobs import Draft, Node
 from ._values import type_word
 from .errors import Error
@@ -25,14 +25,17 @@ def calibrate(raster, quantity, metadata, constants):
 
     if quantity not in _NEEDED:
         raise ValueError(f"{quantity!r} is none of {', '.join(_NEEDED)}")
-    known = {*_BANDS, *_SCENE, "scale", "dtype"}
+    known = {*_BANDS, *_SCENE, "scale", "dtype", "metadata_bands"}
     for name in constants:
         if name not in known:
             raise TypeError(f"there is no constant {name!r}; there are {', '.join(sorted(known))}")
     scale = float(constants.pop("scale", 1.0))
     word = type_word(constants.pop("dtype", "float32"))
+    metadata_bands = constants.pop("metadata_bands", None)
     if metadata is not None:
-        constants = {**constants_of(metadata, raster._door), **constants}
+        told = (_mtl.constants_of(metadata, metadata_bands, raster.count) if _mtl.is_mtl(metadata)
+                else constants_of(metadata, raster._door))
+        constants = {**told, **constants}
     missing = [name for name in _NEEDED[quantity] if name not in constants]
     if missing:
         raise Error(f"{quantity} needs {', '.join(missing)}, which "
@@ -78,9 +81,33 @@ def _for_bands(name, value, count):
     return values
 
 
+_FORMATS = {
+    ".imd": "DGIMD", ".rpb": "DGRPB", ".til": "DGTIL", ".tif": "TIFF", ".tiff": "TIFF", ".img": "Erdas",
+    ".grb": "GRIB", ".grb2": "GRIB", ".grib": "GRIB", ".grib2": "GRIB", ".hdr": "ORVA",
+}  # fmt: skip
+
+
+def _metadata_source(text):
+    """The connection strings of a header: FORMAT:FILE, or a name that tells the format."""
+    text = os.fspath(text)
+    format, colon, file = text.partition(":")
+    if colon and format.isupper() and format.isalnum():
+        return f"{format}|{os.path.abspath(file)}"
+    ending = os.path.splitext(text)[1].lower()
+    format = _FORMATS.get(ending)
+    if ending in (".xml", ".gml"):
+        with open(text, "rb") as head:
+            start = head.read(1 << 16)
+        format = ("PLEIADESRPC" if b"<Rational_Function_Model" in start else
+                  "PLEIADESDIM" if b"<Dimap_Document" in start else "GML" if b"FeatureCollection" in start else None)
+    if format is None:
+        raise Error(f"{text}: the name doesn't tell what metadata these are; write FORMAT:FILE, such as DGIMD:{text}")
+    return f"{format}|{os.path.abspath(text)}"
+
+
 def constants_of(metadata, door):
     """The constants that the header of a scene tells, by their names here."""
-    node = Node("CreateMetadataCommand", (("ConnStr", os.path.abspath(os.fspath(metadata))),))
+    node = Node("CreateMetadataCommand", (("ConnStr", _metadata_source(metadata)),))
     draft = Draft()
     draft.step("constants", "GetMetadataCalibrationCommand", {"URI": node})
     found = door.run(draft).values("constants")

@@ -23,7 +23,8 @@ def png_bytes(image):
         return struct.pack(">I", len(body)) + name + body + struct.pack(">I", zlib.crc32(name + body))
 
     head = struct.pack(">IIBBBBB", width, height, 8, kind, 0, 0, 0)
-    return b"\x89PNG\r\n\x1a\n" + chunk(b"IHDR", head) + chunk(b"IDAT", zlib.compress(rows.tobytes(), 6)) + chunk(b"IEND", b"")
+    body = zlib.compress(rows.tobytes(), 6)
+    return b"\x89PNG\r\n\x1a\n" + chunk(b"IHDR", head) + chunk(b"IDAT", body) + chunk(b"IEND", b"")
 
 
 def _natural(raster):

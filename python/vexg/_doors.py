@@ -64,6 +64,10 @@ class LocalDoor:
         """Lets go of a raster that was read."""
         library.close(node.document())
 
+    def close_all(self):
+        """Lets go of all rasters that were read; they open again as they are asked for."""
+        library.close(None)
+
     def __reduce__(self):
         return "local"
 
@@ -78,8 +82,3 @@ def job_node(node):
     """The chain for a job, whose arrays in memory have names of their own: what was computed from
     the pixels of one before doesn't hold any more."""
     return node.with_sources(lambda each: each.fresh() if isinstance(each, ArrayNode) else None)
-
-
-def has_arrays(node):
-    """Whether a chain stands on an array in memory."""
-    return any(isinstance(each, ArrayNode) for each in node.everything())

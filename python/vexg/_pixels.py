@@ -12,7 +12,7 @@ from .errors import Error
 _ORDERS = {"BIP": 0, "BIL": 1, "BSQ": 2}
 _AXES = {0: (1, 2, 0), 1: (1, 0, 2), 2: (0, 1, 2)}  # memory's axes among bands, lines, samples
 _BACK = {0: (2, 0, 1), 1: (1, 0, 2), 2: (0, 1, 2)}  # bands, lines, samples among memory's axes
-_SMALL = 8 << 20  # bytes that are read at once, without a look at interrupts
+_SMALL = 4 << 20  # bytes that are read at once, without a look at interrupts
 _NOT_VALID = 7  # the bits of a state byte
 
 
@@ -110,7 +110,9 @@ class Pixels:
                 raise IndexError(f"there is no band {number}; the raster has {count}, from 0")
         return numpy.array([number % count for number in checked], dtype="uint32"), is_one
 
-    def __array__(self, dtype=None):
+    def __array__(self, dtype=None, copy=None):
+        if copy is False:
+            raise ValueError("a raster can't be had as an array without a copy")
         array = self.read(order="C")
         return array if dtype is None else array.astype(dtype, copy=False)
 

@@ -234,8 +234,6 @@ class _Making:
 
 def build_pyramid(raster, levels, progress):
     """Builds the pyramid file of a source; see Raster.pyramid."""
-    from ._doors import local
-
     node = raster._chain()
     inputs = dict(node.inputs)
     name = inputs.get("ConnStr", "").split("|")
@@ -253,9 +251,8 @@ def build_pyramid(raster, levels, progress):
         "URI": opening, "PyramidType": "ORVA", "PyramidResamplingMethod": "Nearest", "PyramidLevelMin": 1,
         "PyramidLevelMax": levels, "PyramidCanBuild": True,
         "TileDimensions": "128 128 0 0 0 0 0 Invariable", "Bins": "Exact"})
-    # The raster may be open without a pyramid: whoever opens it then shares that.
-    if raster._door is local:
-        local.close(node)
+    # The raster may be open without a pyramid, for views too: whoever opens it then shares that.
+    raster._door.close_all()
     watch(lambda task: raster._door.run(draft, task), progress, "pyramid")
     raster._node = source_node(name[0])
     raster._info = None

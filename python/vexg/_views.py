@@ -204,9 +204,11 @@ class Views:
         of the commands that calibrate whole files, and are computed where they are read.
 
         Args:
-            metadata: the header of the scene, from which constants are taken that are not given.
-            constants: gain, offset, irradiance, k1, k2 (a number, or one for each band),
-                sun_elevation in degrees, distance in astronomical units, scale.
+            metadata: the header of the scene, from which constants are taken that are not given: the MTL of
+                a Landsat scene, or one that `vexg calibrate --from-metadata` takes.
+            constants: gain, offset, irradiance, k1, k2 (a number, or one for each band), sun_elevation in
+                degrees, distance in astronomical units, scale; metadata_bands, the numbers of the bands in
+                an MTL where that has more.
         """
         from . import _calibration
 

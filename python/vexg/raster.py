@@ -53,7 +53,9 @@ class Raster(Described, Pixels, Views, _formula.Arithmetic):
 
     def _describe(self):
         if self._info is None:
-            self._info = self._door.describe(self._chain())
+            # Opening may take long, and a mask looks at all pixels: an interrupt is to come out of it.
+            node = self._chain()
+            self._info = watch(lambda task: self._door.describe(node))
         return self._info
 
     def close(self):
@@ -263,6 +265,29 @@ def open(file, *, format=None, subdataset=None, server=None):
     raster = Raster(source_node(file, format, **pieces), server._door if server is not None else local)
     raster._describe()
     return raster
+
+
+def view(command, *, server=None, output="URI", **inputs):
+    """The raster that a command of the library shows, for those that have no method here. Nothing runs
+    before the raster is asked for something.
+
+    Args:
+        command: its class, such as "CreateVirtualRasterCommand".
+        output: the output that gives the raster.
+        inputs: by name; a Raster, or a list of them, where a URI is asked for.
+    """
+    rasters = [each for value in inputs.values() for each in (value if isinstance(value, (list, tuple)) else [value])
+               if isinstance(each, Raster)]
+    door = door_of(rasters) if rasters else local if server is None else server._door
+
+    def node_of(value):
+        if isinstance(value, Raster):
+            return value._chain()
+        if isinstance(value, (list, tuple)) and value and isinstance(value[0], Raster):
+            return tuple(each._chain() for each in value)
+        return _values.text_of(value)
+
+    return Raster(Node(command, tuple((name, node_of(value)) for name, value in inputs.items()), output), door)
 
 
 def from_array(array, *, like=None, transform=None, crs=None, nodata=None):

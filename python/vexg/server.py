@@ -12,6 +12,7 @@ import struct
 import subprocess
 import threading
 import time
+import xml.etree.ElementTree as ElementTree
 from collections import OrderedDict
 
 import numpy
@@ -166,6 +167,24 @@ def _ask(name, text, *, process=None, patience=0.0, look=None):
     return bytes(data[4:]).split(b"\0", 1)[0].decode()
 
 
+def _left_open(result):
+    """The URIs that an aborted job has opened, and whose closing did not run any more."""
+    opened, closed = {}, set()
+    for command in ElementTree.fromstring(result).findall("Command"):
+        name, returned = command.get("Name", ""), command.find("Return")
+        if command.get("Result") != "Success":
+            continue
+        if name.endswith("finish") or ".CloseRasterCommand" in name or name.startswith("close."):
+            closed.add(name)
+        elif returned is not None:
+            uri = returned.get("URI") or returned.get("PyramidURI")
+            if uri is not None:
+                opened[name] = _values.value_of(uri, "URI")
+    return [uri for name, uri in reversed(opened.items())
+            if "close." + name.partition(".")[0] not in closed
+            and not (name.endswith("target") and name[:-6] + "finish" in closed)]
+
+
 class _Memory:
     """A block of named memory that a server fills, or by which it is watched."""
 
@@ -244,6 +263,7 @@ class ServerDoor:
 
         result = _ask(self._pipe, document, look=look)
         if task.is_aborted:
+            self._close_all(_left_open(result))
             raise Error("aborted")
         return result
 
@@ -277,6 +297,13 @@ class ServerDoor:
         with self._lock:
             uris = self._opened.pop(node, [])
         self._close_all(uris)
+
+    def close_all(self):
+        """Lets go of all rasters that were read; they open again as they are asked for."""
+        with self._lock:
+            opened, self._opened = self._opened, OrderedDict()
+        for uris in opened.values():
+            self._close_all(uris)
 
     def describe(self, node):
         """The description of a raster."""

@@ -54,6 +54,14 @@ class Polygons:
         """The polygons as WKB, in the order of their labels, each a bytes object."""
         return wkb_of(self._find()[1], self._raster._grid())
 
+    def wkb_column(self):
+        """The polygons as WKB in one piece, as columns of Arrow have them: the bytes, and an array of one
+        offset more than there are polygons, between which each lies."""
+        shapes = self.wkb
+        offsets = numpy.zeros(len(shapes) + 1, dtype="int64")
+        numpy.cumsum([len(shape) for shape in shapes], out=offsets[1:])
+        return b"".join(shapes), offsets
+
     @property
     def __geo_interface__(self):
         """All polygons as a GeoJSON feature collection, in the raster's coordinate system."""

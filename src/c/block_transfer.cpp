@@ -82,7 +82,12 @@ class Transfer {
         height_(block.rect.bottom - block.rect.top + 1) {}
 
   bool Read() {
-    return ForEachPiece([this](const Piece& piece) { return ReadPiece(piece); });
+    // A raster always gives states: memory for them that was touched before costs least.
+    static thread_local Array<std::uint8_t> kept;
+    states_ = std::move(kept);
+    const bool isRead = ForEachPiece([this](const Piece& piece) { return ReadPiece(piece); });
+    if (states_.GetCapacity() <= 2 * kPieceBytes) kept = std::move(states_);
+    return isRead;
   }
   bool Write() {
     return ForEachPiece([this](const Piece& piece) { return WritePiece(piece); });

@@ -9,6 +9,7 @@
 #include <string>
 
 #include "c/block_transfer.h"
+#include "c/lent_controls.h"
 #include "c/raster_store.h"
 #include "commands/catalog.h"
 #include "commands/command_json.h"
@@ -118,28 +119,41 @@ auto WithRaster(const char* text, const Use& use) -> decltype(use(std::declval<B
   return use(*named->Raster());
 }
 
-AbortFlagPtr FlagAt(std::uint8_t* abort) {
-  return abort != nullptr ? AbortFlagPtr(new ExternalAbortFlag<unsigned char>(abort))
-                          : AbortFlagPtr(new AbortFlag);
-}
+/// The flag and the report of a caller, for as long as its call lasts.
+class LentControls {
+ public:
+  LentControls(std::uint8_t* abort, double* progress)
+      : abort_(new LentAbortFlag(abort)), progress_(new LentProgressReport(progress)) {}
+  ~LentControls() {
+    abort_->Return();
+    progress_->Return();
+  }
+  LentControls(const LentControls&) = delete;
+  LentControls& operator=(const LentControls&) = delete;
 
-IPCPtr MakeIPC(std::uint8_t* abort, double* progress) {
-  return IPCPtr(new IPC(abort != nullptr ? FlagAt(abort) : AbortFlagPtr(new StandardAbortFlag),
-                        progress != nullptr
-                            ? ProgressReportPtr(new ExternalProgressReport<double>(progress))
-                            : ProgressReportPtr(new StandardProgressReport)));
-}
+  IPCPtr MakeIPC() const {
+    return IPCPtr(new IPC(AbortFlagPtr(abort_), ProgressReportPtr(progress_)));
+  }
 
-/// Runs a job; files that an aborted one was making are given up once they are closed.
+ private:
+  Pointer<LentAbortFlag> abort_;
+  Pointer<LentProgressReport> progress_;
+};
+
+/// Runs a job. What an aborted one has opened is closed, since the commands that would have done so
+/// did not run any more, and files that it was making are given up.
 String RunDocument(const String& document, std::uint8_t* abort, double* progress) {
   catalog::Session session(platform::ProcessNumber());
   const catalog::SessionScope scope(&session);
+  const LentControls controls(abort, progress);  // which the job still tells of its end
   Job job;
   JobParser(job).Parse(document);
-  if (abort != nullptr || progress != nullptr) job.ipc = MakeIPC(abort, progress);
+  if (abort != nullptr || progress != nullptr) job.ipc = controls.MakeIPC();
   session.BeginJob();
   RunJob(job);
-  session.EndJob(job.GetIPC().abort->IsSet());
+  const bool isAborted = job.GetIPC().abort->IsSet();
+  session.EndJob(isAborted);
+  if (isAborted) session.ReleaseAll();
   return JobResultWriter(job).Write();
 }
 
@@ -173,7 +187,7 @@ char* vexg_run(const char* document, uint8_t* abort, double* progress, char** fa
 int vexg_read(const char* raster, const vexg_block* block, uint8_t* abort, char** fault) {
   return Enter(fault, "the block could not be read", [&] {
     return int{WithRaster(raster, [&](BasicRaster& found) {
-      return block != nullptr && ReadBlock(found, *block, *FlagAt(abort));
+      return block != nullptr && ReadBlock(found, *block, LentAbortFlag(abort));
     })};
   });
 }
@@ -181,7 +195,7 @@ int vexg_read(const char* raster, const vexg_block* block, uint8_t* abort, char*
 int vexg_write(const char* raster, const vexg_block* block, uint8_t* abort, char** fault) {
   return Enter(fault, "the block could not be written", [&] {
     return int{WithRaster(raster, [&](BasicRaster& found) {
-      return block != nullptr && WriteBlock(found, *block, *FlagAt(abort));
+      return block != nullptr && WriteBlock(found, *block, LentAbortFlag(abort));
     })};
   });
 }

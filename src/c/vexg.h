@@ -80,7 +80,8 @@ VEXG_C_EXPORT const char* vexg_version(void);
 /// @return 1, or 0 with a fault.
 VEXG_C_EXPORT int vexg_init(char** fault);
 
-/// Runs a job document and waits for its end.
+/// Runs a job document and waits for its end. What it opens and doesn't close stays open, unless it
+/// was aborted.
 /// @param abort     a byte that any thread may set to 1 to abort the job; NULL for none. It goes
 ///                  before a channel that the document names.
 /// @param progress  gets the fraction done, 0 to 1, while the job runs; NULL for none.

@@ -26,8 +26,8 @@ class DocumentsTest(FolderTest):
                 with self.subTest(document, block=block.splitlines()[:4]):
                     for made in ("ndvi.tif", "part.tif", "ratio.tif"):
                         (self.folder / made).unlink(missing_ok=True)
-                    done = subprocess.run([sys.executable, "-c", block], cwd=self.folder, capture_output=True, text=True,
-                                          env=os.environ)
+                    done = subprocess.run([sys.executable, "-c", block], cwd=self.folder, env=os.environ,
+                                          capture_output=True, text=True)
                     self.assertEqual(done.returncode, 0, done.stderr)
                     ran += 1
         self.assertGreater(ran, 6)

@@ -270,6 +270,35 @@ class ProcessTest(FolderTest):
             vexg.Server("no-such-server-anywhere", start=False)
         self.assertFalse(list(pathlib.Path("/dev/shm").glob(f"vexg-python-{os.getpid()}-*")))
 
+    def test_an_interrupted_job_leaves_nothing_open(self):
+        code, out, err = finish(start(self.LOAD + """
+        import threading
+        from vexg import commands
+
+        def count(server, scene):
+            scene._door.close_all()  # what was read is kept open on purpose
+            return len(commands.ListOpenObjectsCommand(server=server)["URIs"])
+
+        def interrupt(scene, server):
+            wide = scene.stack(*[scene / n for n in range(1, 40)])
+            wide.shape
+            before = count(server, scene)
+            for turn in range(4):
+                threading.Timer(0.03 + 0.02 * turn, lambda: os.kill(os.getpid(), signal.SIGINT)).start()
+                try:
+                    while True:
+                        (wide + turn).save(f"{sys.argv[2]}/{turn}.tif", overwrite=True)
+                except KeyboardInterrupt:
+                    pass
+            time.sleep(0.5)
+            print(count(server, scene) - before)
+
+        interrupt(vexg.open(sys.argv[1]), None)
+        with vexg.Server() as server:
+            interrupt(vexg.open(sys.argv[1], server=server), server)
+        """, SCENE, self.folder))
+        self.assertEqual((code, out), (0, "0\n0\n"), err)
+
     def test_an_interrupt_of_a_job_in_a_server(self):
         code, out, err = finish(start(self.LOAD + """
         import threading

@@ -80,11 +80,13 @@ class ReadTest(FolderTest):
         copy = vexg.open(SCENE).save(self.folder / "scene.dat")
         whole = copy.read(order="C")
         self.assertEqual(copy.levels, [])
+        first = copy[0].read()  # a view that keeps the file open without a pyramid
         copy.pyramid(levels=3)
+        numpy.testing.assert_array_equal(copy[0].read(), first)
         self.assertEqual(copy.levels, [1, 2, 3])
         for rows, columns in [(slice(None, None, 8), slice(None, None, 8)), (slice(4, None, 4), slice(8, 300, 4)),
                               (slice(3, None, 4), slice(None, None, 4)), (slice(None, None, 2), slice(None, None, 4)),
-                              (slice(None, None, -2), slice(0, None, 2)), (slice(None, None, 16), slice(None, None, 16))]:
+                              (slice(None, None, -2), slice(0, None, 2)), (slice(0, None, 16), slice(0, None, 16))]:
             numpy.testing.assert_array_equal(copy[1:4, rows, columns], whole[1:4, rows, columns])
         level = copy.level(2)
         numpy.testing.assert_array_equal(level.read(), whole[:, ::4, ::4][:, :level.height, :level.width])
@@ -265,6 +267,16 @@ class ViewTest(FolderTest):
         with self.assertRaises(vexg.Error):
             self.scene.clip(window=((0, 400), (0, 10)))
 
+    def test_views_of_commands_without_a_method(self):
+        shown = vexg.view("CreateSubsetRasterCommand", SrcURI=self.scene, SubRect="3 4 10 20", Bands=[2, 0])
+        numpy.testing.assert_array_equal(shown.read(), self.pixels[[2, 0], 4:21, 3:11])
+        pixel = shown.clip(window=((0, 1), (0, 1)))
+        both = vexg.view("CreateBandStackRasterCommand", SrcURI=[self.scene[0], pixel])
+        with self.assertRaises(vexg.Error):
+            both.read()
+        with self.assertRaisesRegex(vexg.Error, "NoSuchCommand"):
+            vexg.view("NoSuchCommand", SrcURI=self.scene).shape
+
     def test_no_data_and_masks(self):
         view = self.scene.with_nodata(60, 70)[0].read(masked=True)[0]
         numpy.testing.assert_array_equal(view.mask, numpy.isin(self.pixels[0], (60, 70)))
@@ -284,14 +296,46 @@ class ViewTest(FolderTest):
         for quantity, (given, options) in constants.items():
             with self.subTest(quantity):
                 file = self.folder / f"{quantity}.tif"
-                subprocess.run([VEXG, "calibrate", quantity, SCENE, file, "--gain", "0.775", "--offset=-36.2", *options],
-                               check=True, capture_output=True)
+                subprocess.run([VEXG, "calibrate", quantity, SCENE, file, "--gain", "0.775", "--offset=-36.2",
+                                *options], check=True, capture_output=True)
                 numpy.testing.assert_array_equal(self.scene.calibrate(quantity, **given).read(),
                                                  vexg.open(file).read())
         with self.assertRaisesRegex(vexg.Error, "sun_elevation"):
             self.scene.reflectance(gain=1, offset=0, irradiance=1, distance=1)
         with self.assertRaisesRegex(TypeError, "gian"):
             self.scene.radiance(gian=1)
+
+    def test_constants_of_headers(self):
+        """The MTL of a Landsat scene gives the reflectance of its own factors (USGS Landsat 8 data users
+        handbook, section 5), and other headers that of the program."""
+        factors = {1: (0.012, -60.0, 2.0e-5, -0.1), 2: (0.0125, -62.5, 2.0e-5, -0.1), 3: (0.013, -65, 2.1e-5, -0.105)}
+        lines = ["GROUP = L1_METADATA_FILE", "  SUN_ELEVATION = 51.25", "  EARTH_SUN_DISTANCE = 1.0105"]
+        for band, values in factors.items():
+            for name, value in zip(("RADIANCE_MULT", "RADIANCE_ADD", "REFLECTANCE_MULT", "REFLECTANCE_ADD"), values):
+                lines.append(f"  {name}_BAND_{band} = {value!r}")
+        mtl = self.folder / "LC08_MTL.txt"
+        mtl.write_text("\n".join(lines) + "\nEND\n")
+        counts = numpy.arange(5001, 65000, 1713, dtype="uint16").reshape(4, 9)
+        raster = vexg.from_array(numpy.stack([counts, counts]))
+        got = raster.reflectance(metadata=mtl, metadata_bands=[3, 1]).read()
+        for values, band in zip(got, (3, 1)):
+            _, _, gain, offset = factors[band]
+            numpy.testing.assert_allclose(values, (gain * counts + offset) / numpy.sin(numpy.radians(51.25)), rtol=1e-5)
+        with self.assertRaisesRegex(vexg.Error, "metadata_bands"):
+            raster.reflectance(metadata=mtl)
+        with self.assertRaisesRegex(vexg.Error, "tells? "):
+            raster.reflectance(metadata=self.folder / "scene.foo")
+        header = DATA / "sidecars" / "wv03.IMD"
+        bands = 8
+        raster = vexg.from_array(numpy.full((bands, 3, 4), 700, dtype="uint16")).save(self.folder / "wv.tif")
+        file = self.folder / "radiance.tif"
+        done = subprocess.run([VEXG, "calibrate", "radiance", self.folder / "wv.tif", file, "--from-metadata", header],
+                              capture_output=True, text=True)
+        if done.returncode == 0:
+            numpy.testing.assert_array_equal(raster.radiance(metadata=header).read(), vexg.open(file).read())
+        else:
+            with self.assertRaises((vexg.Error, ValueError)):
+                raster.radiance(metadata=header)
 
     def test_warps_as_the_program_makes_them(self):
         file = self.folder / "warped.tif"
