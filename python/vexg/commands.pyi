@@ -316,6 +316,44 @@ def CloseRasterMaskCommand(
     """
     ...
 
+class _CompareRasterGridsCommandOutputs(TypedDict, total=False):
+    SameSize: bool
+    SameSystem: bool
+    ShiftX: float
+    ShiftY: float
+    ScaleX: float
+    ScaleY: float
+    Rotation: float
+    LargestOffset: float
+
+def CompareRasterGridsCommand(
+    *,
+    URI: str | Raster,
+    OtherURI: str | Raster,
+    server: Server | None = None,
+    progress: Progress = False,
+) -> _CompareRasterGridsCommandOutputs:
+    """Tells how the grid of a raster lies in that of another one. A command of this library's
+    own.
+
+    Args:
+        URI: URI: the raster
+        OtherURI: URI: the other one
+
+    Returns:
+        SameSize: boolean: both have as many samples and lines
+        SameSystem: boolean: both have one coordinate system, or none
+        ShiftX: number: sample of the other raster where the upper left corner of this one
+            lies; absent, as all that follow, where one has no place or can't be carried
+        ShiftY: number: the line there
+        ScaleX: number: pixels of the other raster along the upper edge, for each pixel
+        ScaleY: number: the same along the left edge
+        Rotation: number: degrees, clockwise, by which the upper edge is turned
+        LargestOffset: number: pixels of the other raster by which a place in the raster is
+            off at most, when pixels are taken by their sample and line
+    """
+    ...
+
 class _CopyRasterCommandOutputs(TypedDict, total=False):
     ValidPixels: NDArray[Any]
 
@@ -994,6 +1032,14 @@ def CreateRasterCommand(
     HasNoDataValue: ArrayLike | None = None,
     NoDataValue: ArrayLike | None = None,
     GeoRef: str | None = None,
+    Compress: Literal["Told", "None", "DEFLATE", "ZSTD", "LZW", "LZMA", "WebP", "JPEG"] | None = None,
+    Level: int | None = None,
+    Predictor: Literal["Told", "Auto", "None", "2", "3"] | None = None,
+    Tile: str | PathLike[str] | None = None,
+    BigTIFF: Literal["Told", "Auto", "Yes", "No"] | None = None,
+    Layout: Literal["Told", "COG"] | None = None,
+    Overviews: Literal["Told", "Average", "Nearest", "Mode", "None"] | None = None,
+    WorldFile: bool | None = None,
     server: Server | None = None,
     progress: Progress = False,
 ) -> _CreateRasterCommandOutputs:
@@ -1015,6 +1061,20 @@ def CreateRasterCommand(
         HasNoDataValue: boolean array: for each band, whether it has a no-data value
         NoDataValue: number array: no-data values of the bands, which have one then
         GeoRef: geo-reference: the geo-reference
+        Compress: word: how the blocks of a TIFF file are packed; Told: not at all
+        Level: integer: effort of the compression, of WebP, which loses nothing without it,
+            and JPEG the quality; the codec's usual one when absent
+        Predictor: word: which differences are packed in the place of values: 2 of whole
+            numbers, 3 of floating-point numbers; Auto: those that suit the pixel type; Told:
+            none
+        Tile: text: side of the tiles of a TIFF file in pixels, a multiple of 16, or strip
+        BigTIFF: word: whether a TIFF file may take more than 4 GiB; Auto: where it needs to;
+            Told: where it might
+        Layout: word: COG: a cloud-optimised TIFF file, with its reduced levels in front;
+            Told: pixels alone
+        Overviews: word: how a pixel of a level of a COG comes from four: their mean, the
+            upper left one, or the most frequent value; Told: the mean; None: no levels
+        WorldFile: boolean: whether the grid also lies in a world file beside the raster
 
     Returns:
         URI: URI: the raster, by which further commands find it
@@ -1931,6 +1991,8 @@ def FxTileSegmentMergeCommand(
     MinSize: int | None = None,
     MaxSize: int | None = None,
     Compactness: float | None = None,
+    Order: Literal["Told", "Local"] | None = None,
+    Rounds: int | None = None,
     Tree: str | PathLike[str] | None = None,
     MergePercent: float | None = None,
     server: Server | None = None,
@@ -1971,6 +2033,10 @@ def FxTileSegmentMergeCommand(
             together are not merged, except by MinSize; none when absent
         Compactness: number: with Seamless and MergeAlgorithm 1: costs are divided by the
             length of the common border to the power of this besides, 0 to 10; 0 when absent
+        Order: word: with Seamless and MergeAlgorithm 1: the order of merging. Told: the
+            cheapest pair anywhere first; Local: in rounds, all pairs at once that cost both
+            of their segments least, and less than MergeValue
+        Rounds: integer: of Order Local, 1 to 1000; 12 when absent
         Tree: text: with Seamless and MergeAlgorithm 1: the file to make of all merges, from
             which segments of every MergeValue can be made (CreateTreeLabelsRasterCommand);
             none when absent
