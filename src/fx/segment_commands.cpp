@@ -233,7 +233,8 @@ class FxTileSegmentMergeCommand final : public SegmentCommand {
       return refuse(HasInput("Tree") ? "Tree: there is no name of a file"
                                      : "MergePercent goes with Tree");
     }
-    if (!isSeamless_ || isRigorous_ || Read<bool>("LambdaEstimate")) {
+    const bool isSchedule = !HasInput("MergeAlgorithm") || Read<int>("MergeAlgorithm") == 1;
+    if (!isSeamless_ || !isSchedule || Read<bool>("LambdaEstimate")) {
       return refuse("Tree goes with Seamless and MergeAlgorithm 1, and without an estimate");
     }
     if (request.leastPixels > 0) return refuse("Tree goes without MinSize");

@@ -59,7 +59,7 @@ class SegmentVerb final : public RasterVerb {
     line.Add("--estimate", request_.isEstimate,
              "Say what percentages stand for, and make no labels");
     line.Add("--suggest", isSuggest_, "Say which costs suit a tree, and make no labels");
-    line.AllowOneOf({"--estimate", "--suggest", "--tiled"});
+    line.AllowOneOf({"--estimate", "--suggest"});
     line.Add("--output,-o", picture_,
              "With --estimate and --suggest: a picture of the curves, a PNG or JPEG; with levels: "
              "the files "
