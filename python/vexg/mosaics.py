@@ -19,7 +19,7 @@ def mosaic(scenes, file=None, *, grid=None, like=None, pixel_size=None, resampli
     """Joins scenes into one raster: footprints, colours, seams.
 
     Args:
-        scenes: files, or a pattern such as "scenes/*.tif", in their order: of pixels that several have
+        scenes: files, or a pattern such as ``scenes/*.tif``, in their order: of pixels that several have
             the first one's are shown.
         file: the definition to make, which ends in .vmosaic; its side files lie beside it. By default a
             temporary one, which goes with the raster.
