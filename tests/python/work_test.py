@@ -285,6 +285,9 @@ class ObjectsTest(FolderTest):
         self.assertEqual(kept.shape, mosaic.shape)
         with self.assertRaises(vexg.Error):
             vexg.mosaic(scenes, self.folder / "kept.vmosaic")
+        with self.assertRaises(vexg.Error):
+            vexg.mosaic(scenes, self.folder / "no.vmosaic", grid="EPSG:4326", pixel_size=-1)
+        self.assertFalse((self.folder / "no.vmosaic").exists())
 
 
 @needs_data
