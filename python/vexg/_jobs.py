@@ -332,6 +332,16 @@ def named_inputs(command, options):
     return found
 
 
+def name_of(file):
+    """The name of a file as a text. Raises Error for one that a document can't carry."""
+    text = os.fspath(file)
+    try:
+        text.encode()
+    except (UnicodeEncodeError, AttributeError):
+        raise Error(f"{file!r}: the name is no UTF-8") from None
+    return text
+
+
 def source_node(file, format=None, levels="Best", **pieces):
     """The node that opens a file, with the pyramid file beside it.
 
@@ -339,7 +349,7 @@ def source_node(file, format=None, levels="Best", **pieces):
         file: a path, an address, or a connection string with pieces behind bars.
         pieces: further ones as NAME=VALUE.
     """
-    text = os.fspath(file)
+    text = name_of(file)
     name, _, rest = text.partition("|")
     if not name:
         raise ValueError("a file's name is empty")

@@ -10,7 +10,7 @@ import numpy
 
 from . import _values
 from ._doors import job_node
-from ._jobs import Draft, Node, files_of, named_inputs, source_node
+from ._jobs import Draft, Node, files_of, name_of, named_inputs, source_node
 from ._watch import watch
 from .errors import Error
 
@@ -39,7 +39,7 @@ class Staged:
         Args:
             inputs: files that may not be replaced.
         """
-        self.target = pathlib.Path(os.path.abspath(os.fspath(file)))
+        self.target = pathlib.Path(os.path.abspath(name_of(file)))
         if "|" in str(self.target):
             raise ValueError(f"{file}: a name can't hold a bar")
         folder = self.target.parent

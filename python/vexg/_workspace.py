@@ -1,10 +1,17 @@
 """Folders for files that results stand on, which go when nothing stands on them any more."""
 
+import os
 import shutil
 import tempfile
 import weakref
 
 from ._jobs import source_node
+
+
+def _remove(folder, maker):
+    """Removes a folder; not in a process that was forked from the one that made it."""
+    if os.getpid() == maker:
+        shutil.rmtree(folder, ignore_errors=True)
 
 
 class Workspace:
@@ -18,7 +25,7 @@ class Workspace:
     def __init__(self):
         self.parts = []
         self.folder = tempfile.mkdtemp(prefix="vexg-")
-        self._end = weakref.finalize(self, shutil.rmtree, self.folder, True)
+        self._end = weakref.finalize(self, _remove, self.folder, os.getpid())
 
     def path(self, name):
         """The path of a file in it."""

@@ -16,8 +16,7 @@ def job(raster, output=None, *, format=None, folder=None):
         output: the file that the job writes it to. By default the job opens the raster, for a client
             that asks for its pixels, and does nothing else.
         format: the key of the format of the output; by default that of the name's ending.
-        folder: where files in between are made, such as segments, for the folder that they had here;
-            needed where there are some.
+        folder: where files in between are made, such as segments; the current one by default.
     """
     return Job(raster, output, format, folder)
 
@@ -33,8 +32,6 @@ class Job:
         draft, workspaces = Draft(), []
         node = raster._chain()
         self._collect(node, draft, workspaces, set())
-        if workspaces and folder is None:
-            raise Error("the job makes files in between; give folder, where they may lie")
         if output is not None:
             draft.step("target", "CreateRasterCommand", {
                 "ConnStr": os.path.abspath(os.fspath(output)), "SrcURI": node, "Details": "All",
@@ -44,7 +41,7 @@ class Job:
         self._draft = draft
         self.document = draft.write([] if output is not None else [node], closes=output is not None)
         for workspace in workspaces:
-            place = os.path.join(os.path.abspath(os.fspath(folder)), os.path.basename(workspace.folder))
+            place = os.path.join(os.path.abspath(os.fspath(folder or ".")), os.path.basename(workspace.folder))
             self.document = self.document.replace(workspace.folder + "/", place + ".")
 
     def _collect(self, node, draft, workspaces, done):

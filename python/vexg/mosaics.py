@@ -19,7 +19,7 @@ def mosaic(scenes, file=None, *, grid=None, like=None, pixel_size=None, resampli
     """Joins scenes into one raster: footprints, colours, seams.
 
     Args:
-        scenes: files, or a pattern such as "scenes/*.tif", in their order: of pixels that several have
+        scenes: files, or a pattern such as ``scenes/*.tif``, in their order: of pixels that several have
             the first one's are shown.
         file: the definition to make, which ends in .vmosaic; its side files lie beside it. By default a
             temporary one, which goes with the raster.
@@ -55,7 +55,17 @@ def mosaic(scenes, file=None, *, grid=None, like=None, pixel_size=None, resampli
         draft.step("match", "MosaicStatsCommand", {"MosaicURI": opened, "Level": 0})
     if seams:
         draft.step("seams", "MosaicAutoSeamGenCommand", {"MosaicURI": opened, "Sides": "Exact"})
-    watch(lambda task: door.run(draft, task), progress, "mosaic")
+    was_there = os.path.exists(name)
+
+    def make(task):
+        try:
+            door.run(draft, task)
+        except BaseException:
+            if not was_there and os.path.exists(name):
+                os.remove(name)  # a definition whose scenes are not all looked at
+            raise
+
+    watch(make, progress, "mosaic")
     if workspace is not None:
         node.keep, node.recipe = workspace, (draft,)
     return Raster(node, door)

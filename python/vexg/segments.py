@@ -123,7 +123,8 @@ class Segments(Raster):
             geometry = _has_geopandas()
         if not geometry:
             return _tables.labelled(labels, columns)
-        return _tables.geo_table({"label": labels, **columns}, self._shapes_of(labels, progress), self.crs)
+        table = _tables.geo_table({"label": labels, **columns}, self._shapes_of(labels, progress), self.crs)
+        return table if isinstance(table, list) else table.set_index("label")
 
     def _compute(self, kinds, bands, kernel, progress):
         for kind in kinds:

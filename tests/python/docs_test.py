@@ -34,5 +34,16 @@ class DocumentsTest(FolderTest):
         self.assertEqual([path.name for path in self.folder.iterdir() if path.name.startswith(".")], [])
 
 
+class ReferenceTest(FolderTest):
+    @needs("sphinx")
+    def test_the_reference_is_made_of_the_docstrings(self):
+        made = subprocess.run([sys.executable, "-m", "sphinx", "-W", "--keep-going", "-q", SOURCE / "python" / "reference",
+                               self.folder / "html"], capture_output=True, text=True)
+        self.assertEqual(made.returncode, 0, made.stderr)
+        text = (self.folder / "html" / "index.html").read_text()
+        for name in ("vexg.open", "vexg.Raster.read", "vexg.Raster.clip", "vexg.Segments.classify", "vexg.Server.close"):
+            self.assertIn(f'id="{name}"', text)
+
+
 if __name__ == "__main__":
     unittest.main()

@@ -56,6 +56,7 @@ class MisuseTest(FolderTest):
             "a line that isn't there": (IndexError, lambda: scene[0, 352]),
             "a level that isn't there": (vexg.Error, lambda: scene.level(9)),
             "no file": (vexg.Error, lambda: vexg.open(self.folder / "no.tif")),
+            "a name that is no text": (vexg.Error, lambda: vexg.open(os.fsdecode(b"/tmp/a\xff.tif"))),
             "no raster": (vexg.Error, lambda: vexg.open(__file__)),
             "an unknown system": (vexg.Error, lambda: scene.warp("EPSG:0")),
             "a formula that can't be": (vexg.Error, lambda: vexg.calc("b0 +", scene).read()),
@@ -170,16 +171,17 @@ class ProcessTest(FolderTest):
             os._exit(0 if vexg.open(sys.argv[1]).read().shape == (6, 352, 349) else 1)
         print(os.waitpid(child, 0)[1])
         scene = vexg.open(sys.argv[1])
+        segments = scene.segment(merge=50)  # in a folder of the parent's
         child = os.fork()
         if child == 0:
             try:
                 scene.read()
             except vexg.Error as fault:
-                os._exit(7 if "forked" in str(fault) else 1)
-            os._exit(2)
-        print(os.waitstatus_to_exitcode(os.waitpid(child, 0)[1]), scene.read().shape)
+                sys.exit(7 if "forked" in str(fault) else 1)
+            sys.exit(2)
+        print(os.waitstatus_to_exitcode(os.waitpid(child, 0)[1]), scene.read().shape, segments.read().shape)
         """, SCENE))
-        self.assertEqual((code, out.split("\n")[:2]), (0, ["0", "7 (6, 352, 349)"]), err)
+        self.assertEqual((code, out.split("\n")[:2]), (0, ["0", "7 (6, 352, 349) (1, 352, 349)"]), err)
 
     def test_the_interpreter_ends_during_a_job(self):
         for end in ("sys.exit(3)", "raise SystemExit(3)"):

@@ -33,11 +33,6 @@ class DeclarationsTest(unittest.TestCase):
         for name in wanted:
             self.assertIn(f" {name}(", header.replace("*", " "))
 
-    @unittest.skipUnless(shutil.which("abidiff"), "abigail-tools is not installed")
-    def test_a_library_is_its_own_interface(self):
-        library = BUILD / "lib" / "libvexg.so"
-        subprocess.run(["abidiff", "--headers-dir1", SOURCE / "src" / "c", library, library], check=True)
-
 
 @needs_data
 @needs("build", "wheel", "setuptools", "venv", "pip")

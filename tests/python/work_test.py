@@ -265,8 +265,10 @@ class ObjectsTest(FolderTest):
         classes = vexg.open(SCENE).segment(merge=90).classify(self.folder / "samples.geojson")
         job = vexg.job(classes, self.folder / "classes.tif", folder=self.folder)
         job.save(self.folder / "chain.xml")
-        with self.assertRaises(vexg.Error):
-            vexg.job(classes, self.folder / "classes.tif")
+        with self.assertRaisesRegex(vexg.Error, "array in memory"):
+            vexg.job(vexg.from_array(numpy.zeros((2, 3))))
+        vexg.job(classes).save(self.folder / "here.xml")
+        self.assertIn(os.path.join(os.getcwd(), "vexg-"), (self.folder / "here.xml").read_text())
         ran = subprocess.run([VEXG, "run", self.folder / "chain.xml"], capture_output=True, text=True)
         self.assertEqual(ran.returncode, 0, ran.stderr)
         numpy.testing.assert_array_equal(vexg.open(self.folder / "classes.tif").read(), classes.read())
@@ -285,6 +287,9 @@ class ObjectsTest(FolderTest):
         self.assertEqual(kept.shape, mosaic.shape)
         with self.assertRaises(vexg.Error):
             vexg.mosaic(scenes, self.folder / "kept.vmosaic")
+        with self.assertRaises(vexg.Error):
+            vexg.mosaic(scenes, self.folder / "no.vmosaic", grid="EPSG:4326", pixel_size=-1)
+        self.assertFalse((self.folder / "no.vmosaic").exists())
 
 
 @needs_data
