@@ -25,6 +25,10 @@ LAYOUTS = {
 }
 
 
+# Files as the peers make them, without compression.
+PLAIN = ["--compress", "none"]
+
+
 def make_scene(path, size, type_name, options):
     """A scene of noise on slopes; the same pixels for every layout."""
     # In a process of its own: who starts a peer is small, so that the peer's peak memory is its own.
@@ -182,7 +186,8 @@ def calibrate(bench):
             options = [f"--co={option}" for option in LAYOUTS[layout]]
             bench.compare(
                 f"radiance {type_name} {layout}",
-                [bench.vexg, "calibrate", "radiance", scene, target, "--gain", "0.5", "--offset", "-3"],
+                [bench.vexg, "calibrate", "radiance", scene, target, "--gain", "0.5", "--offset", "-3",
+                 *PLAIN],
                 {"gdal_calc": ["gdal_calc.py", "--quiet", "-A", scene, "--allBands=A", f"--outfile={target}",
                                "--type=Float32", "--calc=maximum(A*0.5-3.0,0)", *options],
                  "rasterio": [sys.executable, script, scene, target, "0.5", "-3"]},
@@ -217,7 +222,7 @@ def calc(bench):
     for type_name in TYPES:
         for layout in ("tiled", "strips", "by band"):
             scene = bench.scene(type_name, layout)
-            ours = [bench.vexg, "calc", target, "(b3 - b2) / (b3 + b2)", scene, "-q"]
+            ours = [bench.vexg, "calc", target, "(b3 - b2) / (b3 + b2)", scene, "-q", *PLAIN]
             peer = [sys.executable, script, scene, theirs]
             bench.once(ours)
             bench.once(peer)
@@ -247,7 +252,8 @@ def memory(bench):
             scene = bench.scene("UInt16", "tiled", size)
             command = [bench.vexg, *verb, scene]
             if verb[0] == "calibrate":
-                command = [bench.vexg, "calibrate", "radiance", scene, target, "--gain", "0.5", "--offset", "-3"]
+                command = [bench.vexg, "calibrate", "radiance", scene, target, "--gain", "0.5", "--offset", "-3",
+                 *PLAIN]
             if verb[0] == "pyramid":
                 command = [bench.vexg, "pyramid", "build", scene, "--levels", "1-5", "-q", "--output",
                            bench.work / "levels.pyr"]
@@ -290,8 +296,25 @@ def warp(bench):
                                scene, theirs]
                     bench.compare(f"warp {type_name} {method} {word}, {threads}",
                                   [*vexg, "warp", scene, made, "--to", grid, "--method", method, "--resampling",
-                                   word, "--overwrite", "-q"],
+                                   word, "--overwrite", "-q", *PLAIN],
                                   {"gdalwarp": command}, {"gdalwarp": of_method.get(resampling)})
+
+
+def outputs(bench):
+    """Packed and cloud-optimised copies, by the same codec and level with all threads on both sides."""
+    copy, theirs = bench.work / "packed.tif", bench.work / "gdal-packed.tif"
+    gdal = ["gdal_translate", "-q", "-co", "COMPRESS=ZSTD", "-co", "NUM_THREADS=ALL_CPUS"]
+    for type_name in ("Byte", "UInt16", "Float32"):
+        scene = bench.scene(type_name, "tiled")
+        predictor = "3" if type_name == "Float32" else "2"
+        tiles = ["-co", "TILED=YES", "-co", "BLOCKXSIZE=512", "-co", "BLOCKYSIZE=512", "-co", "ZSTD_LEVEL=3", "-co",
+                 f"PREDICTOR={predictor}"]
+        bench.compare(f"copy {type_name} by ZSTD", [bench.vexg, "copy", scene, copy, "-q"],
+                      {"gdal_translate": [*gdal, scene, theirs], "the same tiles": [*gdal, *tiles, scene, theirs]},
+                      {"gdal_translate": 1.0, "the same tiles": 1.0}, [copy, theirs])
+        cog = [*gdal, "-of", "COG", "-co", "PREDICTOR=YES", "-co", "LEVEL=3", "-co", "RESAMPLING=AVERAGE"]
+        bench.compare(f"cloud-optimised copy {type_name}", [bench.vexg, "copy", scene, copy, "-q", "--cog"],
+                      {"gdal_translate": [*cog, scene, theirs]}, {"gdal_translate": 0.7}, [copy, theirs])
 
 
 def make_labels(path, size):
@@ -379,7 +402,7 @@ def zones(bench):
         maker.join()
     scene = bench.scene("Byte", "tiled")
     drawn, theirs = bench.work / "drawn.tif", bench.work / "gdal-drawn.tif"
-    ours = [bench.vexg, "rasterize", shapes, drawn, "--like", scene, "--field", "class", "-q"]
+    ours = [bench.vexg, "rasterize", shapes, drawn, "--like", scene, "--field", "class", "-q", *PLAIN]
     peer = ["gdal_rasterize", "-q", "-a", "class", "-ot", "Byte", "-te", 600000, 5000000 - 30 * size,
             600000 + 30 * size, 5000000, "-ts", size, size, shapes, theirs]
     for path in (drawn, theirs):
@@ -511,7 +534,7 @@ def grass_windows(bench, scene):
 
 
 SECTIONS = {"open": opening_peers.opening, "read": opening_peers.reading, "stats": stats, "hist": hist,
-            "calibrate": calibrate, "calc": calc, "pyramid": pyramid, "warp": warp,
+            "calibrate": calibrate, "calc": calc, "pyramid": pyramid, "warp": warp, "outputs": outputs,
             "mosaic": mosaic_peers.mosaic, "polygons": polygons,
             "zones": zones, "segments": segment_peers.speed, "segment-quality": segment_peers.quality,
             "attributes": attributes, "classes": lambda bench: class_peers.speed(bench, make_regions),

@@ -2,7 +2,7 @@
 # Runs vexg beside public tools that do the same work, in one go, and prints medians and ratios.
 # Usage: bench/peers.sh [--size N] [--runs N] [--work FOLDER] [SECTION...]
 #   sections: open read stats hist calibrate calc pyramid warp mosaic polygons zones segments segment-quality
-#   attributes classes class-quality memory python; all by default. Installs the peers if they are missing. Random windows
+#   attributes classes class-quality memory outputs python; all by default. Installs the peers if they are missing. Random windows
 #   need a build with -DVEXG_BUILD_BENCH=ON.
 set -euo pipefail
 cd "$(dirname "${BASH_SOURCE[0]}")/.."

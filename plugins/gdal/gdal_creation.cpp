@@ -14,7 +14,9 @@
 #include "gdal_georef.h"
 #include "gdal_no_data.h"
 #include "gdal_side_file.h"
+#include "gdal_tiff_options.h"
 #include "gdal_types.h"
+#include "gdal_world_file.h"
 #include "orva/orva_file.h"
 #include "platform/file_swap.h"
 #include "platform/folder_lock.h"
@@ -71,91 +73,13 @@ void Remove(const std::string& path) {
   fs::remove(path, ignored);
 }
 
-/// The world file of a raster: the first and the last letter of its ending, and a w.
-std::string WorldName(const std::string& path) {
-  const std::string ending = fs::path(path).extension().string();
-  if (ending.size() < 3) return path + ".wld";
-  const std::string letters{ending[0], ending[1], ending.back(), 'w'};
-  return fs::path(path).replace_extension(letters).string();
-}
-
-/// The text of a world file; empty for a raster without a grid. It counts from the middle of the
-/// first pixel.
-std::string WorldText(const RasterDef& def) {
-  if (!def.geoRef || def.geoRef->GetType() == GeoRef::kRpc) return {};
-  const double samples = def.samples, lines = def.lines;
-  double x = 0, y = 0, right[2] = {}, below[2] = {}, middle[2] = {};
-  const bool isGrid = def.geoRef->PixelToMap(0, 0, x, y) &&
-                      def.geoRef->PixelToMap(samples, 0, right[0], right[1]) &&
-                      def.geoRef->PixelToMap(0, lines, below[0], below[1]) &&
-                      def.geoRef->PixelToMap(0.5, 0.5, middle[0], middle[1]);
-  if (!isGrid) return {};
-  std::string text;
-  for (const double number :
-       {(right[0] - x) / samples, (right[1] - y) / samples, (below[0] - x) / lines,
-        (below[1] - y) / lines, middle[0], middle[1]}) {
-    char line[40];
-    CPLsnprintf(line, sizeof line, "%.15g\n", number);
-    text += line;
-  }
-  return text;
-}
-
 /// With the extension at the end, since drivers choose by it.
 std::string TemporaryPath(const std::string& path) {
   return platform::TemporaryPathBeside(path) + fs::path(path).extension().string();
 }
 
-/// A floating-point number: no size is too large for it.
-double BytesOf(const RasterDef& def) {
-  return 1.0 * def.samples * def.lines * def.bands * DataTypeBytes(def.dataType);
-}
-
 CPLStringList OptionsOf(const Maker& maker) {
   return CPLStringList(CSLTokenizeString2(maker.options, " ", 0), TRUE);
-}
-
-/// True for a TIFF file whose blocks are packed, or lie in an order of its own.
-bool IsPacked(const RasterDef& def) {
-  return def.creation.IsPacked() || def.creation.layout == FileLayout::kCog;
-}
-
-/// The lines of strips that are large enough to be packed well.
-std::string StripLines(const RasterDef& def, bool byPixel) {
-  constexpr double kStripBytes = 256 << 10;
-  const double row = BytesOf(def) / def.lines / (byPixel ? 1 : def.bands);
-  return std::to_string(std::clamp(static_cast<unsigned>(kStripBytes / row), 1U, def.lines));
-}
-
-/// Says by what GDAL shall choose the kind of the file.
-const char* BigTiffWord(const RasterDef& def) {
-  if (IsPacked(def)) return "YES";  // of the file with the tags
-  switch (def.creation.bigTiff) {
-    case BigTiffChoice::kAuto:
-      return "IF_NEEDED";
-    case BigTiffChoice::kYes:
-      return "YES";
-    case BigTiffChoice::kNo:
-      return "NO";
-    default:
-      return "IF_SAFER";
-  }
-}
-
-void AddLayout(const RasterDef& def, CPLStringList& options) {
-  const bool byPixel = def.interleave == Interleave::BIP || def.interleave == Interleave::BIL;
-  options.SetNameValue("INTERLEAVE", byPixel ? "PIXEL" : "BAND");
-  if (def.tileWidth <= 1 || def.tileHeight <= 1) {
-    if (IsPacked(def)) options.SetNameValue("BLOCKYSIZE", StripLines(def, byPixel).c_str());
-    return;
-  }
-  static constexpr unsigned kStep = 16, kMaxTile = 4096;  // sides are multiples of 16
-  const auto side = [](unsigned size) {
-    return std::to_string((std::min(size, kMaxTile) + kStep - 1) / kStep * kStep);
-  };
-  options.SetNameValue("TILED", "YES");
-  options.SetNameValue("BLOCKXSIZE", side(def.tileWidth).c_str());
-  options.SetNameValue("BLOCKYSIZE", side(def.tileHeight).c_str());
 }
 
 /// True when not all bands have the same no-data value.

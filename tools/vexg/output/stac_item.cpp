@@ -125,7 +125,8 @@ void AddGeometry(const RasterInfo& info, Json& item) {
   for (unsigned i = 0; i < border.size(); ++i) {
     const double longitude = points[2 * i], latitude = points[2 * i + 1];
     if (!std::isfinite(longitude) || !std::isfinite(latitude)) return;
-    const bool crosses = i > 0 && std::abs(longitude - points[2 * i - 2]) > 180;
+    const bool crosses =
+        std::abs(longitude) > 180 || (i > 0 && std::abs(longitude - points[2 * i - 2]) > 180);
     if (crosses) return;  // a polygon across the 180th meridian would enclose the rest of the Earth
     ring.push_back(NumbersAsJson({longitude, latitude}));
     west = std::min(west, longitude), east = std::max(east, longitude);
