@@ -98,11 +98,11 @@ class Crew {
     std::unique_lock lock(mutex_);
     for (;;) {
       ++idle_;
-      const bool isCalled =
-          called_.wait_for(lock, kPatience, [this] { return FindJob() != nullptr; });
+      // Found once: others take the last parts of a job meanwhile.
+      Job* job = nullptr;
+      called_.wait_for(lock, kPatience, [&] { return (job = FindJob()) != nullptr; });
       --idle_;
-      if (!isCalled) break;
-      Job* const job = FindJob();
+      if (job == nullptr) break;
       ++job->helpers;
       lock.unlock();
       Work(*job);
