@@ -1,8 +1,11 @@
 #include "data/data_connection.h"
+#include "foundation/own_plugin.h"
 #include "gdal_common/library.h"
 #include "gdal_factory.h"
 #include "vector_sink.h"
 #include "vector_source.h"
+
+VEXG_OWN_PLUGIN;
 
 namespace {
 

@@ -1,12 +1,15 @@
 #include <filesystem>
 
 #include "foundation/fault.h"
+#include "foundation/own_plugin.h"
 #include "foundation/thrown.h"
 #include "georef/coordsys_log.h"
 #include "proj_context.h"
 #include "proj_coordsys.h"
 
 // The four functions of the plug-in contract. No exception leaves them.
+
+VEXG_OWN_PLUGIN;
 
 namespace {
 

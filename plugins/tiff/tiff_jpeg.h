@@ -6,7 +6,7 @@
 
 namespace lumo::tiff {
 
-/// What the blocks of a JPEG-compressed image have in common.
+/// Describes what the blocks of a JPEG-compressed image have in common.
 struct JpegForm {
   std::vector<unsigned char> tables;  ///< a stream of tables that are left out of the blocks
   unsigned components = 1;

@@ -7,8 +7,8 @@
 
 namespace lumo::tiff {
 
-/// What GDAL stores of the bands of a file: in a tag of it, and in a file beside it, which goes
-/// first.
+/// Holds the values that GDAL stores of the bands of a file: in a tag of it, and in a file beside
+/// it, which goes first.
 ///
 /// Failure: false for a text that holds anything else, or isn't written as GDAL writes it.
 class StoredItems {

@@ -18,10 +18,13 @@
 #include <xercesc/util/XMLUni.hpp>
 
 #include "commands/xml_engine.h"
+#include "foundation/own_plugin.h"
 #include "foundation/thrown.h"
 #include "platform/memory_shortage.h"
 #include "tree_writer.h"
 #include "xml_runtime.h"
+
+VEXG_OWN_PLUGIN;
 
 namespace lumo {
 namespace {

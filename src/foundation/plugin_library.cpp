@@ -96,9 +96,15 @@ platform::Module LoadPlugin(const std::string& name, std::string& fault) {
   platform::Module module;
   std::size_t i = 0;
   while (i < paths.size() && changes[i] == fs::file_time_type::min()) ++i;
-  module = platform::Module::Load(i < paths.size() ? paths[i] : name, &fault);
+  module = LoadPluginFile(i < paths.size() ? paths[i] : name, fault);
   if (!module.IsLoaded()) failures[paths] = {changes, fault};
   return module;
+}
+
+platform::Module LoadPluginFile(const std::string& path, std::string& fault) {
+  using Binding = platform::Module::Binding;
+  return platform::Module::Load(path, &fault,
+                                HasOwnMark(path) ? Binding::kAtCall : Binding::kAtLoad);
 }
 
 }  // namespace lumo

@@ -20,4 +20,9 @@ VEXG_EXPORT std::vector<std::string> PluginDirectories();
 /// @param fault  [out] why it could not be loaded.
 VEXG_EXPORT platform::Module LoadPlugin(const std::string& name, std::string& fault);
 
+/// Loads a plug-in from a file. One that comes with the library (VEXG_OWN_PLUGIN) is linked as its
+/// functions are called: of the tens of thousands that GDAL and PROJ bring along few ever are.
+/// @param fault  [out] why it could not be loaded.
+VEXG_EXPORT platform::Module LoadPluginFile(const std::string& path, std::string& fault);
+
 }  // namespace lumo

@@ -4,6 +4,8 @@
 #include <chrono>
 #include <iterator>
 
+#include "platform/per_process.h"
+
 namespace lumo {
 namespace {
 
@@ -16,8 +18,8 @@ const JoinAtEnd gJoinAtEnd;
 }  // namespace
 
 ThreadRoll& ThreadRoll::Get() {
-  static auto& roll = *new ThreadRoll;
-  return roll;
+  static platform::PerProcess<ThreadRoll> roll;
+  return roll.Get();
 }
 
 /// The kept threads that have left; under the lock.

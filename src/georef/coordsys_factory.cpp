@@ -43,7 +43,8 @@ bool CoordSysFuncPtrs::LoadFuncPtrs(const String& directory) {
     return false;
   }
   const std::string path = directory.ToUTF8() + "/" + platform::ModuleFileName("vexpe");
-  module_ = platform::Module::Load(path);
+  std::string fault;
+  module_ = LoadPluginFile(path, fault);
   if (!module_.IsLoaded()) {
     LogCoordSys(CoordSysLog::kErrors, "CoordSysFuncPtrs::LoadFuncPtrs - error loading vexpe dll.");
     return false;

@@ -22,9 +22,10 @@ bool IsOfMemory(const std::string& why) {
 
 }  // namespace
 
-Module Module::Load(const std::string& path, std::string* fault) {
+Module Module::Load(const std::string& path, std::string* fault, Binding binding) {
   Module module;
-  module.handle_ = dlopen(path.c_str(), RTLD_NOW | RTLD_LOCAL);
+  module.handle_ =
+      dlopen(path.c_str(), (binding == Binding::kAtCall ? RTLD_LAZY : RTLD_NOW) | RTLD_LOCAL);
   if (module.handle_ != nullptr) return module;
   const char* const told = dlerror();
   std::string why = told != nullptr ? told : path;

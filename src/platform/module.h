@@ -12,12 +12,19 @@ class VEXG_EXPORT Module {
  public:
   Module() = default;
 
-  /// Loads a library.
+  /// When the functions that a library takes from others are looked for.
+  enum class Binding {
+    kAtLoad,  ///< one that isn't there is a fault of the load
+    kAtCall   ///< quick, and ends the process where one isn't there
+  };
+
+  /// Loads a library, and those that it needs.
   /// @param path  UTF-8: a file's path, or a bare file name, for which the system's own rules of
   ///              search hold.
   /// @param fault  [out] why it could not be loaded, one line; untouched on success. May be null.
   /// @return a Module that IsLoaded() unless the file is missing or can't be loaded.
-  static Module Load(const std::string& path, std::string* fault = nullptr);
+  static Module Load(const std::string& path, std::string* fault = nullptr,
+                     Binding binding = Binding::kAtLoad);
 
   bool IsLoaded() const { return handle_ != nullptr; }
 

@@ -10,7 +10,7 @@
 #include <thread>
 
 #include "foundation/library.h"
-#include "platform/process.h"
+#include "platform/per_process.h"
 
 namespace lumo {
 namespace {
@@ -30,16 +30,8 @@ struct Job {
 class Crew {
  public:
   static Crew& Get() {
-    static std::atomic<Crew*> crew{nullptr};
-    const int process = platform::ProcessNumber();
-    Crew* known = crew;
-    while (known == nullptr || known->process_ != process) {
-      // That of a parent has no threads here, and a lock that nobody may let go.
-      auto* const fresh = new Crew(process);
-      if (crew.compare_exchange_strong(known, fresh)) return *fresh;
-      delete fresh;
-    }
-    return *known;
+    static platform::PerProcess<Crew> crew;
+    return crew.Get();
   }
 
   void Run(Job& job) {
@@ -52,8 +44,6 @@ class Crew {
   }
 
  private:
-  explicit Crew(int process) : process_(process) {}
-
   void Announce(Job& job) {
     const unsigned wanted = std::min(job.count, CrewSize()) - 1;
     unsigned fresh = 0;
@@ -98,11 +88,11 @@ class Crew {
     std::unique_lock lock(mutex_);
     for (;;) {
       ++idle_;
-      const bool isCalled =
-          called_.wait_for(lock, kPatience, [this] { return FindJob() != nullptr; });
+      // Found once: others take the last parts of a job meanwhile.
+      Job* job = nullptr;
+      called_.wait_for(lock, kPatience, [&] { return (job = FindJob()) != nullptr; });
       --idle_;
-      if (!isCalled) break;
-      Job* const job = FindJob();
+      if (job == nullptr) break;
       ++job->helpers;
       lock.unlock();
       Work(*job);
@@ -112,7 +102,6 @@ class Crew {
     --threads_;
   }
 
-  const int process_;
   std::mutex mutex_;
   std::condition_variable called_, done_;
   std::deque<Job*> jobs_;

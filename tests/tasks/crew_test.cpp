@@ -56,6 +56,19 @@ TEST(Crew, GivesAnExceptionToItsCallerAlone) {
   EXPECT_EQ(others, 800);
 }
 
+/// Helpers come to jobs whose last part has just been taken.
+TEST(Crew, ServesManyShortJobs) {
+  std::atomic<unsigned> runs{0};
+  std::vector<std::thread> callers;
+  for (int caller = 0; caller < 4; ++caller) {
+    callers.emplace_back([&] {
+      for (int i = 0; i < 20000; ++i) RunByCrew(3, [&](unsigned) { ++runs; });
+    });
+  }
+  for (std::thread& caller : callers) caller.join();
+  EXPECT_EQ(runs, 4U * 20000 * 3);
+}
+
 TEST(Crew, UsesOtherThreadsWhereThereAreAny) {
   if (CrewSize() == 1) GTEST_SKIP() << "one thread";
   // Two parts that each wait for the other need two threads.
