@@ -70,23 +70,56 @@ class ReflectanceFormula final : public CalibrationFormula {
   const double scale_;
 };
 
+VEXG_VECTOR_CLONES
+void ComputeRescaled(double* values, std::size_t count, const double* gains, const double* offsets,
+                     double sine, double scale) {
+  for (std::size_t i = 0; i < count; ++i) {
+    const double r = values[i] * gains[i] + offsets[i];
+    values[i] = r > 0.0 ? r * scale / sine : 0.0;
+  }
+}
+
+class RescaledReflectanceFormula final : public CalibrationFormula {
+ public:
+  RescaledReflectanceFormula(const Array<double>& gains, const Array<double>& offsets,
+                             double sunElevationDegrees, double scale)
+      : CalibrationFormula(gains, offsets),
+        sine_(std::sin(sunElevationDegrees * kPiOfDegrees / 180.0)),
+        scale_(scale) {}
+
+ private:
+  void Compute(double* values, std::size_t count) const override {
+    ComputeRescaled(values, count, Gains(), Offsets(), sine_, scale_);
+  }
+
+  const double sine_;
+  const double scale_;
+};
+
 class TemperatureFormula final : public CalibrationFormula {
  public:
   TemperatureFormula(const Array<double>& gains, const Array<double>& offsets,
-                     const Array<double>& k1, const Array<double>& k2, double scale)
-      : CalibrationFormula(gains, offsets), k1_(Repeat(k1)), k2_(Repeat(k2)), scale_(scale) {}
+                     const Array<double>& k1, const Array<double>& k2, double scale, double shift)
+      : CalibrationFormula(gains, offsets),
+        k1_(Repeat(k1)),
+        k2_(Repeat(k2)),
+        scale_(scale),
+        shift_(shift),
+        ofNone_(shift == 0.0 ? 0.0 : shift * scale) {}
 
  private:
   void Compute(double* values, std::size_t count) const override {
     for (std::size_t i = 0; i < count; ++i) {
       const double r = values[i] * Gains()[i] + Offsets()[i];
-      values[i] = r > 0.0 ? k2_[i] / std::log(k1_[i] / r + 1.0) * scale_ : 0.0;
+      values[i] = r > 0.0 ? (k2_[i] / std::log(k1_[i] / r + 1.0) + shift_) * scale_ : ofNone_;
     }
   }
 
   const std::vector<double> k1_;
   const std::vector<double> k2_;
   const double scale_;
+  const double shift_;
+  const double ofNone_;  // the result for 0 K
 };
 
 }  // namespace
@@ -133,8 +166,16 @@ std::unique_ptr<CalibrationFormula> MakeReflectanceFormula(const Array<double>& 
 std::unique_ptr<CalibrationFormula> MakeTemperatureFormula(const Array<double>& gains,
                                                            const Array<double>& offsets,
                                                            const Array<double>& k1,
-                                                           const Array<double>& k2, double scale) {
-  return std::make_unique<TemperatureFormula>(gains, offsets, k1, k2, scale);
+                                                           const Array<double>& k2, double scale,
+                                                           double shift) {
+  return std::make_unique<TemperatureFormula>(gains, offsets, k1, k2, scale, shift);
+}
+
+std::unique_ptr<CalibrationFormula> MakeRescaledReflectanceFormula(const Array<double>& gains,
+                                                                   const Array<double>& offsets,
+                                                                   double sunElevationDegrees,
+                                                                   double scale) {
+  return std::make_unique<RescaledReflectanceFormula>(gains, offsets, sunElevationDegrees, scale);
 }
 
 }  // namespace lumo

@@ -58,15 +58,22 @@ VEXG_EXPORT std::unique_ptr<CalibrationFormula> MakeReflectanceFormula(
     const Array<double>& gains, const Array<double>& offsets, const Array<double>& solarIrradiance,
     double sunElevationDegrees, double earthSunDistance, double scale);
 
-/// Brightness temperature, kelvin: S * K2 / ln(K1 / r + 1); 0 where r isn't above 0 (the same
-/// source, equation 3).
+/// Top-of-atmosphere reflectance out of counts that are scaled as reflectance: S * r /
+/// sin(elevation); 0 where r isn't above 0 (USGS, Landsat 8-9 Data Users Handbook, LSDS-1574,
+/// section 5).
+/// @param sunElevationDegrees  above the horizon; 90 where r is the reflectance already.
+VEXG_EXPORT std::unique_ptr<CalibrationFormula> MakeRescaledReflectanceFormula(
+    const Array<double>& gains, const Array<double>& offsets, double sunElevationDegrees,
+    double scale);
+
+/// Brightness temperature: S * (K2 / ln(K1 / r + 1) + shift), with 0 in place of the temperature
+/// where r isn't above 0 (the source of reflectance, equation 3).
 /// @param k1     of each band, in the unit of r.
 /// @param k2     of each band, kelvin.
 /// @param scale  S, in the precision of the output.
-VEXG_EXPORT std::unique_ptr<CalibrationFormula> MakeTemperatureFormula(const Array<double>& gains,
-                                                                       const Array<double>& offsets,
-                                                                       const Array<double>& k1,
-                                                                       const Array<double>& k2,
-                                                                       double scale);
+/// @param shift  from kelvins to the unit of the result: 0, or -273.15 for degrees Celsius.
+VEXG_EXPORT std::unique_ptr<CalibrationFormula> MakeTemperatureFormula(
+    const Array<double>& gains, const Array<double>& offsets, const Array<double>& k1,
+    const Array<double>& k2, double scale, double shift = 0.0);
 
 }  // namespace lumo

@@ -3,9 +3,12 @@
 #include <algorithm>
 #include <chrono>
 #include <cmath>
+#include <limits>
 #include <numbers>
 
-#include "commands/command.h"
+#include <fmt/format.h>
+
+#include "commands/value_text.h"
 
 namespace lumo {
 namespace {
@@ -78,6 +81,127 @@ void TakeGains(const Metadata& metadata, SceneCalibration& scene) {
   if (counts.empty()) TakeBandSections(metadata, scene);
 }
 
+constexpr double kNotTold = std::numeric_limits<double>::quiet_NaN();
+
+/// Empties a list of which nothing is told.
+void DropUntold(std::vector<double>& values) {
+  if (std::all_of(values.begin(), values.end(), [](double v) { return std::isnan(v); })) {
+    values.clear();
+  }
+}
+
+/// One of the constants of a band that has a section of its own.
+struct OfSection {
+  const char* name;
+  std::vector<double> SceneCalibration::*values;
+};
+constexpr OfSection kOfSections[] = {{"RadianceGain", &SceneCalibration::gains},
+                                     {"RadianceOffset", &SceneCalibration::offsets},
+                                     {"ReflectanceGain", &SceneCalibration::reflectanceGains},
+                                     {"ReflectanceOffset", &SceneCalibration::reflectanceOffsets},
+                                     {"K1", &SceneCalibration::k1},
+                                     {"K2", &SceneCalibration::k2}};
+
+/// Takes what the sections of bands tell, as those of Landsat scenes do. False without one.
+bool TakeRescaling(const Metadata& metadata, SceneCalibration& scene) {
+  for (const char* const band : {"B1", "B2", "B3", "B4", "B5", "B6", "B6_VCID_1", "B6_VCID_2", "B7",
+                                 "B8", "B9", "B10", "B11"}) {
+    const String place = String("/Bands/") + band + "/";
+    if (!metadata.Exists(place + "RadianceGain/") && !metadata.Exists(place + "ReflectanceGain/")) {
+      continue;
+    }
+    scene.bandNames.emplace_back(band);
+    scene.bandFiles.emplace_back();
+    metadata.Get(place + "File/", scene.bandFiles.back());
+    for (const OfSection& constant : kOfSections) {
+      double value = kNotTold;
+      metadata.Get(place + constant.name + "/", value);
+      (scene.*constant.values).push_back(value);
+    }
+  }
+  for (const OfSection& constant : kOfSections) DropUntold(scene.*constant.values);
+  return !scene.bandNames.empty();
+}
+
+/// The values of the bands, by the numbers that a list has for them; in its order where the list
+/// has none.
+std::vector<double> ValuesById(const Metadata& metadata, const char* values, const char* ids,
+                               const std::vector<String>& bandIds) {
+  const auto list = ReadList<double>(metadata, values);
+  const auto listIds = ReadList<String>(metadata, ids);
+  if (listIds.empty() && list.size() == bandIds.size()) return list;
+  std::vector<double> ordered(bandIds.size(), kNotTold);
+  for (std::size_t i = 0; i < std::min(list.size(), listIds.size()); ++i) {
+    const auto at = std::find(bandIds.begin(), bandIds.end(), listIds[i]);
+    if (at != bandIds.end()) ordered[static_cast<std::size_t>(at - bandIds.begin())] = list[i];
+  }
+  DropUntold(ordered);
+  return ordered;
+}
+
+/// Takes reflectances that are counts with an offset divided by one number, as those of Sentinel-2
+/// are. False without that number.
+bool TakeQuantification(const Metadata& metadata, SceneCalibration& scene) {
+  double quantification = 0.0;
+  if (!metadata.Get("/Radiometry/ReflectanceQuantification/", quantification) ||
+      !(quantification > 0.0)) {
+    return false;
+  }
+  scene.bandNames = ReadList<String>(metadata, "/Bands/SpectralNames/");
+  auto ids = ReadList<String>(metadata, "/Bands/SpectralIds/");
+  if (scene.bandNames.empty() || ids.size() != scene.bandNames.size()) {
+    scene.bandNames = {"B1", "B2",  "B3", "B4",  "B5",  "B6", "B7",
+                       "B8", "B8A", "B9", "B10", "B11", "B12"};
+    ids.clear();
+    for (unsigned id = 0; id < scene.bandNames.size(); ++id)
+      ids.push_back(String::Format("%u", id));
+  }
+  scene.instrument = "MSI";
+  scene.isSunIn = true;
+  scene.irradiances =
+      ValuesById(metadata, "/Radiometry/SolarIrradiances/", "/Radiometry/SolarIrradianceIds/", ids);
+  scene.reflectanceGains.assign(ids.size(), 1.0 / quantification);
+  scene.reflectanceOffsets = ValuesById(metadata, "/Radiometry/ReflectanceCountOffsets/",
+                                        "/Radiometry/ReflectanceCountOffsetIds/", ids);
+  const bool hasOffsets = metadata.Exists("/Radiometry/ReflectanceCountOffsets/");
+  if (!hasOffsets) scene.reflectanceOffsets.assign(ids.size(), 0.0);
+  for (double& offset : scene.reflectanceOffsets) offset /= quantification;
+  return true;
+}
+
+/// Takes when the scene was taken, and where the sun stood.
+void TakeSun(const Metadata& metadata, SceneCalibration& scene) {
+  double value = 0.0;
+  if (metadata.Get("/Acquisition/SunElevation/", value)) {
+    scene.sunElevation = value;
+  } else if (metadata.Get("/Acquisition/SunZenith/", value)) {
+    scene.sunElevation = 90.0 - value;
+  }
+  if (metadata.Get("/Acquisition/EarthSunDistance/", value)) {
+    scene.earthSunDistance = value;
+  } else if (metadata.Get("/Acquisition/SunDistanceFactor/", value) && value > 0.0) {
+    scene.earthSunDistance = 1.0 / std::sqrt(value);
+  }
+  String time;
+  for (const char* const path : {"/Acquisition/Time/", "/Acquisition/Date/"}) {
+    if (!scene.earthSunDistance && metadata.Get(path, time)) {
+      scene.earthSunDistance = EarthSunDistance(time);
+    }
+  }
+}
+
+/// Level 2 holds what a surface is like; its pixels have scales of their own.
+String FaultOfLevel(const Metadata& metadata) {
+  String level;
+  if (!metadata.Get("/Product/Level/", level)) return {};
+  const std::string text = level.ToUTF8();
+  if (!text.starts_with("L2") && !text.starts_with("Level-2")) return {};
+  return String(
+      fmt::format("the scene is of level {}, whose pixels are of the surface and no "
+                  "counts of the sensor",
+                  text));
+}
+
 /// The number that all of `text` is.
 bool ReadPart(const std::string& text, double& number) {
   std::istringstream in = MakeTextReader(String(text));
@@ -114,44 +238,6 @@ std::optional<double> DaysSince2000(const std::string& text) {
          seconds / 86400.0;
 }
 
-const CommandDeclaration kGetCalibration{
-    "GetMetadataCalibrationCommand",
-    "Metadata",
-    "Gives what metadata say that calibration needs. What they do not say is absent.",
-    {{"URI", Presence::kRequired, ValueKind::kURI, "the metadata"}},
-    {{"BandNames", ValueKind::kTextList, "of the bands below, in their order"},
-     {"Gain", ValueKind::kNumberArray, "radiance of one count of each band", "W/(m2 sr um)"},
-     {"Offset", ValueKind::kNumberArray, "radiance of count 0 of each band", "W/(m2 sr um)"},
-     {"SolarIrradiance", ValueKind::kNumberArray, "for each band", "W/(m2 um)"},
-     {"SunElevation", ValueKind::kNumber, "above the horizon", "degrees"},
-     {"EarthSunDistance", ValueKind::kNumber, "on the day", "astronomical units"}}};
-
-class GetMetadataCalibrationCommand final : public Command {
-  CommandResult Execute() override {
-    if (!CheckInputs()) return Fail();
-    const MetadataPtr metadata(CatalogFind(Read<URI>("URI")));
-    if (!metadata) return Fail("URI: no such metadata is open");
-    const SceneCalibration scene = ReadSceneCalibration(*metadata);
-    WriteList("BandNames", scene.bandNames);
-    WriteList("Gain", scene.gains);
-    WriteList("Offset", scene.offsets);
-    WriteList("SolarIrradiance", scene.irradiances);
-    if (scene.sunElevation) Write("SunElevation", *scene.sunElevation);
-    if (scene.earthSunDistance) Write("EarthSunDistance", *scene.earthSunDistance);
-    return Succeed();
-  }
-
-  template <typename T>
-  void WriteList(const char* name, const std::vector<T>& values) {
-    if (values.empty()) return;
-    Array<T> array{ArrayDims(static_cast<unsigned>(values.size()))};
-    std::copy(values.begin(), values.end(), array.begin());
-    Write(name, array);
-  }
-};
-
-const CommandFactoryT<GetMetadataCalibrationCommand> factory(kGetCalibration);
-
 }  // namespace
 
 std::optional<double> EarthSunDistance(const String& time) {
@@ -163,17 +249,30 @@ std::optional<double> EarthSunDistance(const String& time) {
 
 SceneCalibration ReadSceneCalibration(const Metadata& metadata) {
   SceneCalibration scene;
-  TakeGains(metadata, scene);
-  TakeIrradiances(metadata, scene);
-  double elevation = 0.0;
-  if (metadata.Get("/Acquisition/SunElevation/", elevation)) scene.sunElevation = elevation;
-  String time;
-  for (const char* const path : {"/Acquisition/Time/", "/Acquisition/Date/"}) {
-    if (!scene.earthSunDistance && metadata.Get(path, time)) {
-      scene.earthSunDistance = EarthSunDistance(time);
-    }
+  if (TakeRescaling(metadata, scene)) {
+    metadata.Get("/Sensor/Instrument/", scene.instrument);
+  } else if (!TakeQuantification(metadata, scene)) {
+    TakeGains(metadata, scene);
+    TakeIrradiances(metadata, scene);
   }
+  scene.fault = FaultOfLevel(metadata);
+  TakeSun(metadata, scene);
   return scene;
+}
+
+void DeriveRadiances(SceneCalibration& scene) {
+  const std::size_t bands = scene.reflectanceGains.size();
+  if (!scene.gains.empty() || !scene.isSunIn || scene.irradiances.size() != bands ||
+      scene.reflectanceOffsets.size() != bands || !scene.sunElevation || !scene.earthSunDistance) {
+    return;
+  }
+  const double distance = *scene.earthSunDistance;
+  for (std::size_t i = 0; i < bands; ++i) {
+    const double whole = scene.irradiances[i] * std::sin(*scene.sunElevation * kDegree) /
+                         (std::numbers::pi * distance * distance);
+    scene.gains.push_back(scene.reflectanceGains[i] * whole);
+    scene.offsets.push_back(scene.reflectanceOffsets[i] * whole);
+  }
 }
 
 }  // namespace lumo

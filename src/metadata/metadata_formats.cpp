@@ -14,6 +14,9 @@ constexpr MetadataFormat kFormats[] = {
     {"GML", "mdf_gml.txt", kGmlMetadataReader, "XmlFile"},
     {"PLEIADESDIM", "mdf_pleiades_dim.txt", kPleiadesDimMetadataReader, "XmlFile"},
     {"PLEIADESRPC", "mdf_pleiades_rpc.txt", kXmlMetadataReader, "XmlFile"},
+    // Of this library's own:
+    {"LANDSAT", "mdf_landsat_mtl.txt", kLandsatMetadataReader, "NotRequired"},
+    {"SENTINEL2", "mdf_sentinel2.txt", kXmlMetadataReader, "XmlFile"},
 };
 
 }  // namespace

@@ -15,6 +15,7 @@ enum eMetadataReader : std::int32_t {
   kGdalMetadataReader = 4,  ///< the format's plug-in, through a data connection
   kGmlMetadataReader = 5,
   kPleiadesDimMetadataReader = 6,
+  kLandsatMetadataReader = 7,  ///< of this library's own
 };
 
 /// One row of the table of metadata formats.

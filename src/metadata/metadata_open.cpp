@@ -110,6 +110,9 @@ bool ReadSource(const MetadataFormat& format, const Array<String>& strings, cons
     case kPleiadesDimMetadataReader:
       return (may && PleiadesDimMetadataReader().Read(strings, mdfPath, *store)) ||
              Fail("Metadata::Open failed. Failed to parse pleiades dim xml input.\n");
+    case kLandsatMetadataReader:
+      return (may && LandsatMetadataReader().Read(strings, mdfPath, *store)) ||
+             Fail("Metadata::Open failed. Failed to parse landsat input.\n");
     default:
       return false;
   }

@@ -3,6 +3,7 @@
 #include <algorithm>
 
 #include "foundation/fault.h"
+#include "metadata/json_metadata_parser.h"
 #include "metadata/mdf_file.h"
 #include "metadata/metadata_parse_log.h"
 #include "metadata/metadata_text.h"
@@ -75,6 +76,30 @@ bool HasInput(const Array<String>& connStrings) {
   return false;
 }
 
+/// Puts the text of each element of an XML document to the path of the element.
+void TakeTextsUp(MetadataContainer& collection, const MetadataContainer& inner,
+                 const String& path) {
+  std::vector<std::pair<String, String>> texts;
+  for (const auto& [name, child] : inner.GetChildren()) {
+    const auto* const element = dynamic_cast<const MetadataContainer*>(child.get());
+    if (element == nullptr) continue;
+    String text;
+    if (element->Count() == 1 && FindText(*element, "__text__", text)) {
+      texts.emplace_back(path + name + "/", text);
+    } else {
+      TakeTextsUp(collection, *element, path + name + "/");
+    }
+  }
+  for (const auto& [place, text] : texts) {
+    collection.Remove(place);
+    collection.Put(place, std::make_unique<MetadataString>(std::vector<String>{text}));
+  }
+}
+
+void TakeTextsUp(MetadataContainer& collection) {
+  TakeTextsUp(collection, collection, "/");
+}
+
 MdfFormat MakeFormat(const Array<String>& connStrings) {
   MdfFormat format;
   format.input = connStrings[0];
@@ -144,6 +169,39 @@ bool PleiadesDimMetadataReader::Translate(const MdfEntry& entry, MetadataContain
     return TranslateCode(entry, source, target);
   }
   return MetadataDefFileTranslator::Translate(entry, source, target, format);
+}
+
+bool LandsatMetadataReader::Read(const Array<String>& connStrings, const String& mdfPath,
+                                 MetadataContainer& target) {
+  if (!HasInput(connStrings)) return false;
+  MdfFormat format = MakeFormat(connStrings);
+  format.xmlInputType = "XmlFile";
+  std::vector<MdfEntry> entries;
+  if (!ReadMdfFile(mdfPath, format, entries)) return false;
+  const String& path = connStrings[1];
+  std::string bytes, fault;
+  if (!ReadMetadataFile(path.ToUTF8(), bytes, fault)) {
+    SetFault(fault);
+    return false;
+  }
+  MetadataContainer collection;
+  const std::size_t start = bytes.find_first_not_of("\xEF\xBB\xBF \t\r\n");
+  const char first = start == bytes.npos ? ' ' : bytes[start];
+  const bool isRead =
+      first == '{' ? JsonMetadataParser(collection, format, path).ParseText(bytes)
+      : first == '<'
+          ? XmlMetadataParser(collection, format, path).Parse()
+          : TextMetadataParser(collection, format, path).ParseText(DecodeMetadataText(bytes));
+  if (!isRead) return false;
+  if (first == '<') TakeTextsUp(collection);
+  if (collection.Find("/L1_METADATA_FILE/") == nullptr &&
+      collection.Find("/LANDSAT_METADATA_FILE/") == nullptr) {
+    SetFault(path.ToUTF8() +
+             ": neither L1_METADATA_FILE nor LANDSAT_METADATA_FILE is in it, as it is in the "
+             "metadata of a Landsat scene");
+    return false;
+  }
+  return TranslateAll(entries, &collection, &target, &format);
 }
 
 bool CollectedMetadataReader::Read(MetadataContainer& collection, const String& mdfPath,

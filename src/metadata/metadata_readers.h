@@ -73,6 +73,13 @@ class VEXG_EXPORT PleiadesDimMetadataReader final : MetadataReader {
                  const MdfFormat& format) override;
 };
 
+/// Reads the metadata of a Landsat scene, in the form that the file has: text, JSON or XML, all
+/// with the paths of the text. A file without a section of such metadata is refused.
+class VEXG_EXPORT LandsatMetadataReader final : MetadataReader {
+ public:
+  bool Read(const Array<String>& connStrings, const String& mdfPath, MetadataContainer& target);
+};
+
 /// Reads texts that a plug-in has collected, with lists that blanks separate.
 class VEXG_EXPORT CollectedMetadataReader final : MetadataReader {
  public:

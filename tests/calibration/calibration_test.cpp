@@ -1,7 +1,12 @@
 #include <cmath>
+#include <cstring>
+#include <random>
 
+#include "calibration/calibrated_raster.h"
 #include "calibration/value_conversion.h"
 #include "commands/catalog.h"
+#include "raster/block_strides.h"
+#include "raster/valid_pixels.h"
 #include "support/run_command.h"
 #include "support/test_rasters.h"
 
@@ -141,6 +146,158 @@ TEST(Calibration, RefusesWhatDoesNotFitAndWritesNothing) {
               testing::HasSubstr("another size"));
   catalog::Remove(small);
   for (const float pixel : scene.target->pixels) ASSERT_EQ(pixel, 7.0f);
+}
+
+Array<double> ListOf(std::initializer_list<double> values) {
+  Array<double> list{ArrayDims(static_cast<unsigned>(values.size()))};
+  std::copy(values.begin(), values.end(), list.begin());
+  return list;
+}
+
+CalibrationConstants ConstantsOf(CalibrationQuantity quantity) {
+  CalibrationConstants constants;
+  constants.quantity = quantity;
+  constants.gains = ListOf({0.5, 1.25, -0.1});
+  constants.offsets = ListOf({-3, -70.5, 12});
+  if (quantity == CalibrationQuantity::kReflectance) {
+    constants.irradiances = ListOf({1969, 1840, 1551});
+  }
+  constants.sunElevation = 51.5;
+  constants.earthSunDistance = 1.0138;
+  constants.k1 = ListOf({10, 600, 774});
+  constants.k2 = ListOf({1000, 1200, 1321});
+  constants.scale = 2.7;
+  return constants;
+}
+
+/// Reads blocks of a view of all places, bands and interleaves, and compares them with what a told
+/// command put into the target.
+template <typename TIn, typename TOut>
+void ExpectSameBits(const Scene<TIn, TOut>& scene, CalibrationQuantity quantity, unsigned seed) {
+  using Made = Scene<TIn, TOut>;
+  CalibratedRaster<TOut> view(BasicRasterPtr(scene.source), ConstantsOf(quantity));
+  ASSERT_TRUE(view.IsValid());
+  std::mt19937 random(seed);
+  const auto pick = [&](unsigned most) { return static_cast<unsigned>(random() % most); };
+  for (const Interleave order : {Interleave::BIP, Interleave::BIL, Interleave::BSQ}) {
+    const unsigned left = pick(Made::kSamples), top = pick(Made::kLines);
+    const SubRect rect{left, top, left + pick(Made::kSamples - left),
+                       top + pick(Made::kLines - top)};
+    Array<unsigned> bands{ArrayDims(1 + pick(4))};
+    for (unsigned& band : bands) band = pick(Made::kBands);
+    if (order == Interleave::BIP && pick(2) == 0) {
+      bands.Resize(ArrayDims(3));
+      for (unsigned band = 0; band < 3; ++band) bands[band] = band;
+    }
+    Array<TOut> pixels;
+    Array<unsigned char> states;
+    ASSERT_TRUE(view.GetSubRect(rect, bands, order, pixels, states));
+    const BlockStrides strides(order, rect.Width(), rect.Height(), bands.GetCount());
+    for (unsigned y = 0; y < rect.Height(); ++y) {
+      for (unsigned x = 0; x < rect.Width(); ++x) {
+        for (unsigned i = 0; i < bands.GetCount(); ++i) {
+          const std::size_t at = x * strides.pixel + y * strides.line + i * strides.band;
+          const std::size_t made =
+              ((top + y) * std::size_t{Made::kSamples} + left + x) * Made::kBands + bands[i];
+          ASSERT_EQ(std::memcmp(&pixels[at], &scene.target->pixels[made], sizeof(TOut)), 0)
+              << "seed " << seed << ", element " << made;
+          ASSERT_EQ(states[at], scene.target->states[made]);
+        }
+      }
+    }
+  }
+}
+
+TEST(CalibratedRaster, HasTheBitsThatTheCommandsMakeInAnyBlock) {
+  const struct {
+    CalibrationQuantity quantity;
+    const char* command;
+  } cases[] = {{CalibrationQuantity::kRadiance, "CalibrateRasterRadianceCommand"},
+               {CalibrationQuantity::kReflectance, "CalibrateRasterTOAReflectanceCommand"},
+               {CalibrationQuantity::kTemperature, "CalibrateRasterBrightnessTemperatureCommand"}};
+  const auto compare = [&]<typename TIn, typename TOut>(TIn, TOut) {
+    for (const auto& c : cases) {
+      const Scene<TIn, TOut> scene;
+      ASSERT_TRUE(RunCommand(c.command, scene.Inputs({{"SolarIrradiance", "1:3 [1969 1840 1551] "},
+                                                      {"SunElevation", "51.5"},
+                                                      {"EarthSunDistance", "1.0138"},
+                                                      {"K1", "1:3 [10 600 774] "},
+                                                      {"K2", "1:3 [1000 1200 1321] "},
+                                                      {"ScaleFactor", "2.7"}}))
+                      .Succeeded());
+      for (unsigned seed = 1; seed <= 8; ++seed) ExpectSameBits(scene, c.quantity, seed);
+    }
+  };
+  const auto forEach = [&]<typename... Ts>(TypeList<Ts...>) {
+    const auto toAll = [&]<typename TIn>(TIn in) { (compare(in, Ts()), ...); };
+    (toAll(Ts()), ...);
+  };
+  forEach(EightTypes{});
+}
+
+TEST(CalibratedRaster, KnowsReflectanceOfRescaledCountsAndCelsius) {
+  const Scene<std::int16_t, double> scene;
+  const struct {
+    std::map<std::string, std::string> inputs;
+    std::function<double(double r, unsigned band)> formula;
+    double none;  // where r isn't above 0
+  } cases[] = {{{{"Quantity", "Reflectance"}, {"SunElevation", "30"}, {"ScaleFactor", "10000"}},
+                [](double r, unsigned) { return r * 10000 / 0.5; },
+                0.0},
+               {{{"Quantity", "Reflectance"}}, [](double r, unsigned) { return r; }, 0.0},
+               {{{"Quantity", "Temperature"},
+                 {"K1", "1:3 [10 600 774] "},
+                 {"K2", "1:3 [1000 1200 1321] "},
+                 {"Unit", "Celsius"},
+                 {"ScaleFactor", "10"}},
+                [](double r, unsigned band) {
+                  constexpr double kK1[] = {10, 600, 774}, kK2[] = {1000, 1200, 1321};
+                  return 10 * (kK2[band] / std::log(kK1[band] / r + 1) - 273.15);
+                },
+                -2731.5}};
+  for (const auto& c : cases) {
+    auto inputs = scene.Inputs(c.inputs);
+    inputs["SrcURI"] = inputs["SourceURI"];
+    inputs.erase("SourceURI");
+    inputs.erase("CalibratedURI");
+    inputs["DataType"] = "Double";
+    const auto outcome = RunCommand("CreateCalibratedRasterCommand", inputs);
+    ASSERT_TRUE(outcome.Succeeded()) << outcome.reason;
+    const RasterPtr<double> view(
+        BasicRasterPtr(catalog::Find(ParseValue<URI>(String(outcome.outputs.at("URI"))))));
+    ASSERT_TRUE(view);
+    Array<double> pixels;
+    Array<unsigned char> states;
+    const SubRect all{0, 0, view->Samples() - 1, view->Lines() - 1};
+    ASSERT_TRUE(view->GetSubRect(all, AllBands(*view), Interleave::BIP, pixels, states));
+    for (std::size_t i = 0; i < scene.source->pixels.size(); ++i) {
+      const unsigned band = i % 3;
+      const double r = scene.source->pixels[i] * kGains[band] + kOffsets[band];
+      const double want = scene.source->states[i] != 0 ? 0.0 : r > 0 ? c.formula(r, band) : c.none;
+      ASSERT_NEAR(pixels[i], want, 1e-12 * std::abs(want)) << i;
+    }
+    catalog::Remove(BasicRasterPtr(view));
+  }
+}
+
+TEST(CalibratedRaster, RefusesWhatIsMissing) {
+  const Scene<std::uint8_t, float> scene;
+  const struct {
+    std::map<std::string, std::string> inputs;
+    const char* want;
+  } cases[] = {{{{"Quantity", "Temperature"}, {"K1", "1:3 [1 1 1] "}}, "K2"},
+               {{{"Quantity", "Reflectance"}, {"SolarIrradiance", "1:3 [1 1 1] "}}, "SunElevation"},
+               {{{"Quantity", "Radiance"}, {"Gain", "1:2 [1 1] "}}, "Gain: the raster has 3 bands"},
+               {{{"Quantity", "Colour"}}, "Quantity"},
+               {{{"Quantity", "Radiance"}, {"Unit", "K"}}, "Unit"},
+               {{{"Quantity", "Radiance"}, {"DataType", "ComplexSingle"}}, "DataType"}};
+  for (const auto& c : cases) {
+    auto inputs = scene.Inputs(c.inputs);
+    inputs["SrcURI"] = inputs["SourceURI"];
+    const auto outcome = RunCommand("CreateCalibratedRasterCommand", inputs);
+    EXPECT_EQ(outcome.result, CommandResult::kFailed) << c.want;
+    EXPECT_THAT(outcome.reason, testing::HasSubstr(c.want));
+  }
 }
 
 }  // namespace

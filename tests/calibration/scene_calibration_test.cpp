@@ -1,5 +1,6 @@
 #include "calibration/scene_calibration.h"
 
+#include "calibration/scene_bands.h"
 #include "commands/catalog.h"
 #include "support/metadata_support.h"
 #include "support/run_command.h"
@@ -110,6 +111,62 @@ TEST(SceneCalibration, TurnsCountsPerRadianceAndOrdersIrradiancesByBand) {
   EXPECT_TRUE(ReadSceneCalibration(metadata).irradiances.empty());
   set("/Radiometry/CountsPerRadiance", 10.0, 0.0);
   EXPECT_TRUE(ReadSceneCalibration(metadata).gains.empty());
+}
+
+TEST(SceneBands, AreToldByWhatIsPlainAlone) {
+  SceneCalibration scene;
+  scene.instrument = "ETM";
+  for (const char* const band : {"B1", "B2", "B3", "B4", "B5", "B6_VCID_1", "B6_VCID_2", "B7"}) {
+    scene.bandNames.emplace_back(band);
+    scene.bandFiles.emplace_back("LE07_L1TP_012031_20020714_20200916_02_T1_" + String(band) +
+                                 ".TIF");
+    scene.k1.push_back(std::string(band).size() > 2 ? 666.09 : NAN);
+  }
+  using Names = std::vector<std::string>;
+  const struct {
+    const char* file;
+    Names names;
+    Names chosen;
+    bool isThermal;
+    std::vector<std::size_t> want;  // none: in doubt
+  } cases[] = {
+      {"LE07_L1TP_012031_20020714_20200916_02_T1_B6_VCID_2.TIF", {""}, {}, false, {6}},
+      {"le07_b07.jp2", {""}, {}, false, {7}},
+      {"B7", {""}, {}, false, {7}},
+      {"band 3.tif", {""}, {}, false, {2}},
+      {"my.b4.copy.tif", {""}, {}, false, {3}},
+      {"B3_and_B03.tif", {""}, {}, false, {2}},
+      {"B3_B4.tif", {""}, {}, false, {}},
+      {"ab4.tif", {""}, {}, false, {}},
+      {"B6.tif", {""}, {}, false, {}},    // of two gains
+      {"B432.tif", {""}, {}, false, {}},  // bands 4, 3, 2, perhaps
+      {"x_ST_B6_VCID_1.TIF", {""}, {}, true, {}},
+      {"x_B3.tif", {"B4"}, {}, false, {2}},
+      {"x.tif", {"B4"}, {}, false, {3}},
+      {"x_B3.tif", {"", ""}, {"5", "B02"}, false, {4, 1}},
+      {"x.tif", {"", ""}, {"6_vcid_1", "band_6_VCID_2"}, false, {5, 6}},
+      {"x.tif", {"", ""}, {"6", "1"}, false, {}},
+      {"x.tif", {"", ""}, {"1"}, false, {}},
+      {"x.tif", {"B5", "Band 3 (red)"}, {}, false, {4, 2}},
+      {"x.tif", {"B5", ""}, {}, false, {}},
+      {"x.tif", {"B5", "band 5"}, {}, false, {}},
+      {"x.tif", {"Band 1", "Band 2"}, {}, false, {}},
+      {"x.tif", {"Band 1", "Band 2"}, {}, true, {5, 6}},
+      {"x.tif", {"Band 2", "Band 1"}, {}, false, {1, 0}},
+      {"x.tif", {"", "", "", "", "", ""}, {}, false, {0, 1, 2, 3, 4, 7}},
+      {"x.tif", {"", "", "", "", "", "", ""}, {}, false, {}},
+      {"x.tif", {"", "", "", "", "", "", "", ""}, {}, false, {0, 1, 2, 3, 4, 5, 6, 7}},
+  };
+  for (const auto& c : cases) {
+    SCOPED_TRACE(std::string(c.file) + ", " + c.names[0]);
+    BandsOfRaster raster;
+    raster.file = c.file;
+    raster.names = c.names;
+    const SceneBands found = FindSceneBands(scene, raster, c.chosen, c.isThermal);
+    EXPECT_EQ(found.bands, c.want) << found.doubt;
+    EXPECT_EQ(found.doubt.empty(), !c.want.empty());
+    EXPECT_EQ(found.how.empty() && found.doubt.empty(), false);
+  }
 }
 
 }  // namespace

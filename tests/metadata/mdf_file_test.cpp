@@ -172,7 +172,7 @@ TEST(MdfFile, TheDefinitionFilesOfTheLibraryAreWellFormed) {
     EXPECT_FALSE(entries.empty()) << file.path();
     ++files;
   }
-  EXPECT_EQ(files, 8U);
+  EXPECT_EQ(files, 10U);
 }
 
 }  // namespace

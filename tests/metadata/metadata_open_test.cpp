@@ -74,7 +74,7 @@ TEST_F(MetadataOpen, FormatsHaveAFileAReaderAndAWord) {
   EXPECT_EQ(file.ToUTF8() + " " + extra.ToUTF8(), "mdf_gdal.txt HFA");
   EXPECT_EQ(reader, kGdalMetadataReader);
   EXPECT_FALSE(GMetadataByFrmtName("ERDAS", file, reader, extra));
-  EXPECT_EQ(GetMetadataFormats().size(), 10U);
+  EXPECT_EQ(GetMetadataFormats().size(), 12U);
 }
 
 TEST_F(MetadataOpen, OrvaTurnsPointsAndKeepsTheSystemWhole) {

@@ -1,11 +1,11 @@
 #include "rasters/metadata_source.h"
 
-#include <algorithm>
 #include <filesystem>
 #include <fstream>
 #include <map>
 
 #include "data/format_table.h"
+#include "foundation/text_case.h"
 #include "metadata/metadata_formats.h"
 #include "rasters/raster_source.h"
 #include "verb.h"
@@ -19,10 +19,7 @@ constexpr const char* kHeaderEnding = ".hdr";
 
 /// The ending of a name in lower case, with its dot.
 std::string EndingOf(const std::string& file) {
-  std::string ending = fs::path(file).extension().string();
-  std::transform(ending.begin(), ending.end(), ending.begin(),
-                 [](unsigned char c) { return static_cast<char>(std::tolower(c)); });
-  return ending;
+  return LowerCase(fs::path(file).extension().string());
 }
 
 /// The format of an XML file by the words near its beginning; empty for others.
@@ -34,6 +31,11 @@ std::string FormatOfXml(const std::string& file) {
   const auto holds = [&](const char* word) { return start.find(word) != start.npos; };
   if (holds("<Rational_Function_Model")) return "PLEIADESRPC";
   if (holds("<Dimap_Document")) return "PLEIADESDIM";
+  if (holds("<LANDSAT_METADATA_FILE")) return "LANDSAT";
+  for (const char* const word :
+       {"Level-1C_User_Product", "Level-2A_User_Product", "Level-1C_Tile_ID", "Level-2A_Tile_ID"}) {
+    if (holds(word)) return "SENTINEL2";
+  }
   return holds("FeatureCollection") ? "GML" : "";
 }
 
@@ -43,6 +45,10 @@ std::string DetectFormat(const std::string& file) {
       {".tiff", "TIFF"}, {".img", "Erdas"},  {".grb", "GRIB"},  {".grb2", "GRIB"},
       {".grib", "GRIB"}, {".grib2", "GRIB"}, {".hdr", "ORVA"}};
   const std::string ending = EndingOf(file);
+  const std::string name = LowerCase(fs::path(file).filename().string());
+  for (const char* const end : {"mtl.txt", "mtl.json"}) {
+    if (name.ends_with(end)) return "LANDSAT";
+  }
   const auto known = kFormats.find(ending);
   if (known != kFormats.end()) return known->second;
   if (ending == ".xml" || ending == ".gml") {

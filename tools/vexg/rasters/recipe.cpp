@@ -51,7 +51,8 @@ class Reader {
 
   void ReadCalibration(const JsonField& field) {
     field.Allow({"quantity", "metadata", "gain", "offset", "irradiance", "k1", "k2", "sunElevation",
-                 "distance", "scale"});
+                 "distance", "scale", "reflectanceGain", "reflectanceOffset", "metadataBands",
+                 "unit"});
     CalibrationRequest& request = recipe_.calibration.emplace();
     recipe_.calibrationPlace = field.Where();
     request.quantity = field.Get("quantity").OneOf({"radiance", "reflectance", "temperature"});
@@ -63,6 +64,14 @@ class Reader {
     request.irradiance = Numbers(field, "irradiance");
     request.k1 = Numbers(field, "k1");
     request.k2 = Numbers(field, "k2");
+    request.reflectanceGain = Numbers(field, "reflectanceGain");
+    request.reflectanceOffset = Numbers(field, "reflectanceOffset");
+    if (field.Has("metadataBands")) {
+      for (const JsonField& band : field.Get("metadataBands").List()) {
+        request.metadataBands.push_back(band.Text());
+      }
+    }
+    if (field.Has("unit")) request.unit = field.Get("unit").OneOf({"kelvin", "celsius"});
     request.sunElevation = NumberIn(field, "sunElevation");
     request.distance = NumberIn(field, "distance");
     request.scale = field.NumberOr("scale", 1);

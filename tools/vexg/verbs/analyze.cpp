@@ -196,7 +196,8 @@ class AnalyzeVerb final {
     AddOpen(draft, "source", scene_);
     AddQuery(draft, "source", "$source");
     if (recipe_.calibration && !recipe_.calibration->metadata.empty()) {
-      AddConstants(draft, ParseMetadataSource(recipe_.calibration->metadata));
+      const CalibrationRequest& calibration = *recipe_.calibration;
+      AddConstants(draft, calibration, ParseMetadataSource(calibration.metadata), "$source");
     }
     const bool hasSamples = !recipe_.rules.has_value();
     if (hasSamples) AddSampleQuery(draft, kSamples, recipe_.classes.samples);
@@ -219,7 +220,9 @@ class AnalyzeVerb final {
     CalibrationRequest& calibration = *recipe_.calibration;
     try {
       calibration.RefuseUseless();
-      if (!calibration.metadata.empty()) Say(TakeConstants(calibration, results));
+      if (!calibration.metadata.empty()) {
+        for (const std::string& line : TakeConstants(calibration, results)) Say(line);
+      }
       calibration.CheckConstants();
     } catch (const HostError& error) {
       throw HostError(error.code, recipe_.calibrationPlace + ": " + error.what());

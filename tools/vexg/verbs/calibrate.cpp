@@ -23,20 +23,32 @@ class CalibrateVerb final : public RasterVerb {
     line.AddNote(
         "Constants are one value for each band, or one for all. Radiance is DN * gain + offset, 0 "
         "where that is below 0; reflectance is that at the top of the atmosphere; temperature is "
-        "that of a black body, in the unit of K2. The result is --scale times as large. Pixels "
+        "that of a black body, in kelvins or degrees Celsius. The result is --scale times as "
+        "large. Pixels "
         "that are not valid stay so; in a result of Single or Double they are NaN.");
     line.AddExample(
         "vexg calibrate reflectance scene.tif reflectance.tif --gain 0.76,0.8,0.62 --offset "
         "-1.5,-2.8,-1.2 --irradiance 1970,1843,1555 --sun-elevation 49.6 --distance 1.012");
+    line.AddExample(
+        "vexg calibrate temperature LC08_B10.TIF kelvin.tif --from-metadata LC08_MTL.txt");
     AddAreaTo(line);
     line.Add("--from-metadata", request_.metadata,
              "Takes what isn't given here from the metadata of this file, and says what it "
              "took")
         .Shows("FILE|FORMAT:FILE");
+    line.Add("--metadata-bands", metadataBands_,
+             "Which bands of the metadata those of the raster are, where their names don't tell it")
+        .Shows("B[,B...]");
     AddConstant(line, "--gain", request_.gain, "Factor on the digital numbers");
     AddConstant(line, "--offset", request_.offset, "Added to them then");
     AddConstant(line, "--irradiance", request_.irradiance,
                 "Solar irradiance outside the atmosphere, in the unit of radiance (reflectance)");
+    AddConstant(
+        line, "--reflectance-gain", request_.reflectanceGain,
+        "In the place of --gain, --irradiance and --distance: factor that makes reflectance "
+        "times the sine of --sun-elevation (reflectance)");
+    AddConstant(line, "--reflectance-offset", request_.reflectanceOffset,
+                "Added then (reflectance)");
     line.Add("--sun-elevation", request_.sunElevation,
              "Of the sun above the horizon, in degrees (reflectance)")
         .Shows("DEG")
@@ -47,6 +59,9 @@ class CalibrateVerb final : public RasterVerb {
         .Takes(NumberWithUnit({"astronomical units", "au", "ua"}));
     AddConstant(line, "--k1", request_.k1, "First thermal constant (temperature)");
     AddConstant(line, "--k2", request_.k2, "Second thermal constant, in kelvins (temperature)");
+    line.Add("--unit", request_.unit, "Of the result: kelvin or celsius (temperature)")
+        .Takes(OneOf({"kelvin", "celsius"}))
+        .ShowsDefault();
     line.Add("--scale", request_.scale, "Factor on the result").ShowsDefault();
     line.Add("--type", request_.type, "Pixel type of the result")
         .Takes(EightTypeName())
@@ -57,6 +72,7 @@ class CalibrateVerb final : public RasterVerb {
   bool HasMetadata() const { return !request_.metadata.empty(); }
 
   void CheckOptions() override {
+    if (!metadataBands_.empty()) request_.metadataBands = SplitList(metadataBands_);
     request_.RefuseUseless();
     if (HasMetadata()) {
       metadata_ = ParseMetadataSource(request_.metadata);
@@ -71,15 +87,15 @@ class CalibrateVerb final : public RasterVerb {
   }
 
   void AddQuestions(JobDraft& draft) const override {
-    if (HasMetadata()) AddConstants(draft, metadata_);
+    if (HasMetadata()) AddConstants(draft, request_, metadata_, "$source");
   }
 
   RasterInfo PlanRaster(JobSession& /*session*/, const JobResults& opened,
                         const RasterInfo& source) override {
     if (HasMetadata()) {
-      const std::string taken = TakeConstants(request_, opened);
+      const std::vector<std::string> taken = TakeConstants(request_, opened);
       request_.CheckConstants();
-      Say(taken);
+      for (const std::string& line : taken) Say(line);
     }
     request_.CheckScale();
     RasterInfo planned = source;
@@ -105,20 +121,13 @@ class CalibrateVerb final : public RasterVerb {
     return FillValues(bands_, std::numeric_limits<double>::quiet_NaN());
   }
 
-  void AddLastQuestions(JobDraft& draft, const String& shown) const override {
-    if (!request_.IsReal()) AddValidityQuery(draft, kShown, shown);
-  }
-
-  /// No results that are pixels with data are NaN: of floating-point types nothing need be counted.
   RasterContents ReadWanted(const JobResults& results) const override {
-    RasterContents wanted = ReadContents(results, kShown);
+    RasterContents wanted = RasterVerb::ReadWanted(results);
     wanted.info.dataType = request_.TypeCode();
     std::erase_if(wanted.details, [](const std::string& detail) {
       return detail.find("/Description=") == detail.npos;
     });
-    if (!request_.IsReal()) {
-      wanted.valid = ReadValidPixels(results, std::string(kShown) + ".validity");
-    }
+    if (request_.IsReal()) wanted.valid.clear();  // no pixel with data is NaN: nothing to compare
     return wanted;
   }
 
@@ -130,6 +139,7 @@ class CalibrateVerb final : public RasterVerb {
   }
 
   CalibrationRequest request_;
+  std::string metadataBands_;
   MetadataSource metadata_;
   unsigned bands_ = 0;
 };
