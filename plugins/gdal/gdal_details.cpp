@@ -112,6 +112,7 @@ CPLStringList CategoryList(const std::string& lines) {
 /// values are.
 std::string TableOf(GDALRasterBandH band) {
   constexpr int kMostRows = 65536;
+  if (band == nullptr) return {};  // of a file that can't be read any more
   GDALRasterAttributeTable* const table = GDALRasterBand::FromHandle(band)->GetDefaultRAT();
   if (table == nullptr || table->GetRowCount() == 0 || table->GetRowCount() > kMostRows) return {};
   bool tells = false;
