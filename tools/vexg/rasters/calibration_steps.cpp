@@ -337,6 +337,7 @@ void AddCalibration(JobDraft& draft, const char* step, const CalibrationRequest&
   copy.AddInput("SrcURI", variable);
   copy.AddInput("DstURI", String("$target"));
   copy.AddInput("Invalid", String("NoData"));
+  copy.AddInput("Blocks", String("Stream"));
   draft.Close("close.calibrated", variable);
 }
 
