@@ -411,6 +411,55 @@ def CreateBandStackRasterCommand(
     """
     ...
 
+class _CreateCalibratedRasterCommandOutputs(TypedDict, total=False):
+    URI: str
+    DataType: str
+
+def CreateCalibratedRasterCommand(
+    *,
+    SrcURI: str | Raster,
+    Quantity: Literal["Radiance", "Reflectance", "Temperature"],
+    Gain: ArrayLike,
+    Offset: ArrayLike,
+    SolarIrradiance: ArrayLike | None = None,
+    SunElevation: float | None = None,
+    EarthSunDistance: float | None = None,
+    K1: ArrayLike | None = None,
+    K2: ArrayLike | None = None,
+    Unit: Literal["Kelvin", "Celsius"] | None = None,
+    ScaleFactor: float | None = None,
+    DataType: Literal["Byte", "Char", "UInt16", "Int16", "UInt32", "Int32", "Single", "Double"] | None = None,
+    server: Server | None = None,
+    progress: Progress = False,
+) -> _CreateCalibratedRasterCommandOutputs:
+    """Shows the physical values of a raster of digital numbers: DN * Gain + Offset, and what
+    follows from it. A command of this library's own.
+
+    Args:
+        SrcURI: URI: the raster to stand on
+        Quantity: word: of the values that are shown: Radiance, Reflectance or Temperature
+        Gain: number array: for each band
+        Offset: number array: for each band
+        SolarIrradiance: number array: for each band, with Reflectance; when absent Gain and
+            Offset make reflectance, and not radiance, which is divided by the sine of
+            SunElevation alone
+        SunElevation: number in degrees: above the horizon, with Reflectance; 90 when absent
+            with no SolarIrradiance
+        EarthSunDistance: number in astronomical units: on the day, with SolarIrradiance
+        K1: number array: with Temperature: first thermal constant of each band, in the unit
+            of radiance
+        K2: number array in K: with Temperature: second thermal constant of each band
+        Unit: word: of Temperature: Kelvin, as it is when absent, or Celsius
+        ScaleFactor: number: factor on the result; 1 when absent
+        DataType: word: pixel type; Single when absent. Values for integers are cut, and keep
+            their low bits
+
+    Returns:
+        URI: URI: the raster, by which further commands find it
+        DataType: word: its pixel type
+    """
+    ...
+
 def CreateClassStyleCommand(
     *,
     Style: str | PathLike[str],
@@ -994,6 +1043,14 @@ def CreateRasterCommand(
     HasNoDataValue: ArrayLike | None = None,
     NoDataValue: ArrayLike | None = None,
     GeoRef: str | None = None,
+    Compress: Literal["Told", "None", "DEFLATE", "ZSTD", "LZW", "LZMA", "WebP", "JPEG"] | None = None,
+    Level: int | None = None,
+    Predictor: Literal["Told", "Auto", "None", "2", "3"] | None = None,
+    Tile: str | PathLike[str] | None = None,
+    BigTIFF: Literal["Told", "Auto", "Yes", "No"] | None = None,
+    Layout: Literal["Told", "COG"] | None = None,
+    Overviews: Literal["Told", "Average", "Nearest", "Mode", "None"] | None = None,
+    WorldFile: bool | None = None,
     server: Server | None = None,
     progress: Progress = False,
 ) -> _CreateRasterCommandOutputs:
@@ -1015,6 +1072,20 @@ def CreateRasterCommand(
         HasNoDataValue: boolean array: for each band, whether it has a no-data value
         NoDataValue: number array: no-data values of the bands, which have one then
         GeoRef: geo-reference: the geo-reference
+        Compress: word: how the blocks of a TIFF file are packed; Told: not at all
+        Level: integer: effort of the compression, of WebP, which loses nothing without it,
+            and JPEG the quality; the codec's usual one when absent
+        Predictor: word: which differences are packed in the place of values: 2 of whole
+            numbers, 3 of floating-point numbers; Auto: those that suit the pixel type; Told:
+            none
+        Tile: text: side of the tiles of a TIFF file in pixels, a multiple of 16, or strip
+        BigTIFF: word: whether a TIFF file may take more than 4 GiB; Auto: where it needs to;
+            Told: where it might
+        Layout: word: COG: a cloud-optimised TIFF file, with its reduced levels in front;
+            Told: pixels alone
+        Overviews: word: how a pixel of a level of a COG comes from four: their mean, the
+            upper left one, or the most frequent value; Told: the mean; None: no levels
+        WorldFile: boolean: whether the grid also lies in a world file beside the raster
 
     Returns:
         URI: URI: the raster, by which further commands find it
@@ -2091,27 +2162,58 @@ class _GetMetadataCalibrationCommandOutputs(TypedDict, total=False):
     Gain: NDArray[Any]
     Offset: NDArray[Any]
     SolarIrradiance: NDArray[Any]
+    ReflectanceGain: NDArray[Any]
+    ReflectanceOffset: NDArray[Any]
+    ReflectanceSun: bool
+    K1: NDArray[Any]
+    K2: NDArray[Any]
     SunElevation: float
     EarthSunDistance: float
+    BandsFrom: str
+    Doubt: str
+    Warning: str
 
 def GetMetadataCalibrationCommand(
     *,
     URI: str | Raster,
+    RasterURI: str | Raster | None = None,
+    Bands: str | Sequence[str | PathLike[str]] | None = None,
+    Quantity: Literal["Radiance", "Reflectance", "Temperature"] | None = None,
+    SunElevation: float | None = None,
     server: Server | None = None,
     progress: Progress = False,
 ) -> _GetMetadataCalibrationCommandOutputs:
-    """Gives what metadata say that calibration needs. What they do not say is absent.
+    """Gives what metadata say that calibration needs. What they do not say is absent, and NaN
+    where they say it of other bands only.
 
     Args:
         URI: URI: the metadata
+        RasterURI: URI: the raster whose bands the lists are of, as far as it can be told
+            which bands of the metadata these are; the lists are of the bands of the metadata
+            when absent
+        Bands: text list: which bands of the metadata those of the raster are: 4, B04,
+            6_VCID_1
+        Quantity: word: for which the constants are, Radiance, Reflectance or Temperature;
+            where it is that, as many bands as have thermal constants are those
+        SunElevation: number in degrees: in the place of what the metadata say
 
     Returns:
         BandNames: text list: of the bands below, in their order
         Gain: number array in W/(m2 sr um): radiance of one count of each band
         Offset: number array in W/(m2 sr um): radiance of count 0 of each band
         SolarIrradiance: number array in W/(m2 um): for each band
+        ReflectanceGain: number array: reflectance of one count of each band
+        ReflectanceOffset: number array: reflectance of count 0 of each band
+        ReflectanceSun: boolean: with ReflectanceGain: the elevation of the sun is in it; else
+            it is to be divided by its sine
+        K1: number array in W/(m2 sr um): first thermal constant of each band
+        K2: number array in K: second thermal constant of each band
         SunElevation: number in degrees: above the horizon
         EarthSunDistance: number in astronomical units: on the day
+        BandsFrom: text: what told which bands those of the raster are
+        Doubt: text: why that isn't known, or no constants hold for them; the lists are absent
+            then, but for names to choose from
+        Warning: text: what is odd about it
     """
     ...
 
