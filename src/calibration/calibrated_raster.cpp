@@ -10,7 +10,8 @@
 #include "tasks/scratch_pool.h"
 
 namespace lumo {
-namespace {
+
+namespace detail {
 
 /// A block of digital numbers of some type, pixel-interleaved.
 class NumberBlock {
@@ -25,6 +26,15 @@ class NumberBlock {
  protected:
   Array<unsigned char> states_;
 };
+
+}  // namespace detail
+
+namespace {
+
+using detail::NumberBlock;
+
+// A larger block of digital numbers doesn't wait for the next read.
+constexpr std::uint64_t kMostKept = std::uint64_t{1} << 23U;
 
 template <typename S>
 class NumberBlockOf final : public NumberBlock {
@@ -50,15 +60,12 @@ bool VisitTyped(const BasicRasterPtr& raster, const Body& body) {
          });
 }
 
-/// Reads a block; null where that fails.
-std::unique_ptr<NumberBlock> ReadBlock(const BasicRasterPtr& raster, const SubRect& rect,
-                                       const Array<unsigned>& bands) {
+std::unique_ptr<NumberBlock> MakeBlock(unsigned dataType) {
   std::unique_ptr<NumberBlock> block;
-  DispatchType(EightTypes{}, raster->DataType(), [&]<typename S>() {
+  DispatchType(EightTypes{}, dataType, [&]<typename S>() {
     block = std::make_unique<NumberBlockOf<S>>();
     return true;
   });
-  if (block && !block->Read(raster, rect, bands)) block.reset();
   return block;
 }
 
@@ -93,6 +100,11 @@ CalibratedRaster<T>::CalibratedRaster(const BasicRasterPtr& raster,
                                       const CalibrationConstants& constants)
     : raster_(raster), constants_(constants) {
   if (!SetUp()) def_.Clear();
+}
+
+template <typename T>
+CalibratedRaster<T>::~CalibratedRaster() {
+  this->StopComputing();
 }
 
 template <typename T>
@@ -141,7 +153,7 @@ bool CalibratedRaster<T>::IsAllBands(const Array<unsigned>& bands) const {
 
 template <typename T>
 bool CalibratedRaster<T>::IsValid() const {
-  return Object::IsValid() && def_.bands != 0 && raster_->IsValid();
+  return def_.bands != 0 && raster_->IsValid();
 }
 
 template <typename T>
@@ -192,19 +204,25 @@ bool CalibratedRaster<T>::GetSubRect(const SubRect& rect, const Array<unsigned>&
   for (const unsigned band : shape.bands) {
     if (band >= def_.bands) return false;
   }
-  const std::unique_ptr<NumberBlock> block = ReadBlock(raster_, rect, shape.bands);
-  if (!block) return false;
+  const auto borrowed = blocks_.Borrow();
+  std::unique_ptr<NumberBlock>& block = *borrowed;
+  if (!block) block = MakeBlock(raster_->DataType());
+  if (!block || !block->Read(raster_, rect, shape.bands)) return false;
   const auto some = IsAllBands(shape.bands) ? nullptr : MakeFormula(shape.bands);
   const CalibrationFormula& formula = some ? *some : *formula_;
+  bool done = true;
   if (interleave == Interleave::BIP || shape.count == 1) {
     Compute(*block, formula, shape, pixels.GetData());
     std::copy_n(block->States().GetData(), shape.dims.count, state.GetData());
-    return true;
+  } else {
+    Array<T> computed;
+    done = computed.Resize(ArrayDims(static_cast<unsigned>(shape.dims.count)));
+    if (done) Compute(*block, formula, shape, computed.GetData());
+    done = done &&
+           shape.Convert(computed, block->States(), Interleave::BIP, pixels, state, interleave);
   }
-  Array<T> computed{ArrayDims(static_cast<unsigned>(shape.dims.count))};
-  if (computed.GetCount() != shape.dims.count) return false;
-  Compute(*block, formula, shape, computed.GetData());
-  return shape.Convert(computed, block->States(), Interleave::BIP, pixels, state, interleave);
+  if (shape.dims.count > kMostKept) block.reset();
+  return done;
 }
 
 VEXG_INSTANCES(EIGHT, CalibratedRaster);

@@ -4,9 +4,14 @@
 
 #include "calibration/calibration_constants.h"
 #include "raster/raster_def.h"
+#include "tasks/scratch_pool.h"
 #include "views/computed_raster.h"
 
 namespace lumo {
+
+namespace detail {
+class NumberBlock;
+}
 
 /// Shows the physical values of a raster of digital numbers, with pixels of type T. Nothing is
 /// kept; a pixel has the same bits whatever block it is read in, those that Calibrate gives it (see
@@ -31,7 +36,7 @@ template <typename T>
 class CalibratedRaster final : public ComputedRaster<T> {
  public:
   CalibratedRaster(const BasicRasterPtr& raster, const CalibrationConstants& constants);
-  ~CalibratedRaster() override { this->StopComputing(); }
+  ~CalibratedRaster() override;
 
   URI GetURI() const override { return this->DefaultURI("CalibratedRaster"); }
   bool IsValid() const override;
@@ -59,8 +64,9 @@ class CalibratedRaster final : public ComputedRaster<T> {
 
   const BasicRasterPtr raster_;
   const CalibrationConstants constants_;
-  RasterDef def_;                                // cleared where the view is not valid
-  std::unique_ptr<CalibrationFormula> formula_;  // of all bands
+  RasterDef def_;                                             // cleared where the view is not valid
+  std::unique_ptr<CalibrationFormula> formula_;               // of all bands
+  ScratchPool<std::unique_ptr<detail::NumberBlock>> blocks_;  // memory for what is read
 };
 
 VEXG_EXTERN(EIGHT, CalibratedRaster);

@@ -16,7 +16,7 @@ struct SceneBands {
   std::string warning;             ///< what is odd about it; empty for nothing
 };
 
-/// What of a raster tells which bands it has.
+/// Holds the names of a raster that tell which bands it has.
 struct BandsOfRaster {
   explicit BandsOfRaster(const BasicRaster& raster);
   BandsOfRaster() = default;

@@ -58,7 +58,7 @@ class GetMetadataCalibrationCommand final : public RasterCommand {
     if (HasInput("SunElevation")) scene.sunElevation = Read<double>("SunElevation");
     DeriveRadiances(scene);
     std::string doubt = scene.fault.ToUTF8();
-    // What other metadata list comes in their order, as it always has.
+    // Other metadata list their bands in the order of the pixels.
     const bool isOfBands = scene.instrument.GetLength() != 0 || HasInput("Bands");
     if (doubt.empty() && HasInput("RasterURI") && isOfBands) {
       const BasicRasterPtr raster = FindRaster("RasterURI");

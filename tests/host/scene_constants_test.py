@@ -283,6 +283,7 @@ class SceneConstants(FolderTest):
             sun = math.sin(math.radians(50))
             return new(band, count) * (1900.5 - 100 * MSI.index(band)) * sun * FACTOR / math.pi
         self.refuses("radiance follows from it with --sun-elevation", "radiance", ten, mtd)
+        self.refuses("--sun-elevation: the sun stands", "radiance", ten, mtd, "--sun-elevation", "-5")
         self.expect("radiance", ten, mtd, ["B4", "B3", "B2", "B8"], radiance_of, "--sun-elevation", "50")
         self.expect("reflectance", ten, write_msi(self.folder, has_offsets=False), ["B4", "B3", "B2", "B8"], plain)
         self.refuses("level Level-2A", "reflectance", ten, write_msi(self.folder, level="Level-2A"))

@@ -126,13 +126,13 @@ void QuestionOdd(const CalibrationRequest& request) {
 
 /// Refuses constants that give no image.
 void RefuseImpossible(const CalibrationRequest& request) {
-  if (request.quantity != "reflectance") return;
   const auto refuse = [&](const char* option, const char* why) {
     Refuse(NameOf(request, option) + ": " + why);
   };
-  if (!(*request.sunElevation > 0 && *request.sunElevation <= 90)) {
+  if (request.sunElevation && !(*request.sunElevation > 0 && *request.sunElevation <= 90)) {
     refuse("--sun-elevation", "the sun stands 0 to 90 degrees above the horizon, and not on it");
   }
+  if (request.quantity != "reflectance") return;
   if (request.UsesReflectances()) return;
   if (!(*request.distance > 0)) refuse("--distance", "it is above 0");
   for (const double irradiance : request.irradiance) {
@@ -337,6 +337,7 @@ void AddCalibration(JobDraft& draft, const char* step, const CalibrationRequest&
   copy.AddInput("SrcURI", variable);
   copy.AddInput("DstURI", String("$target"));
   copy.AddInput("Invalid", String("NoData"));
+  copy.AddInput("Blocks", String("Stream"));
   draft.Close("close.calibrated", variable);
 }
 
