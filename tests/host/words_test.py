@@ -19,7 +19,7 @@ class Words(FolderTest):
                  ["stats", raster, "--bnads", "0"]),
                 ("stats has no option --bnads; did you mean --bands?", ["stats", raster, "--bnads=0"]),
                 ("see vexg stats --help", ["stats"]),
-                ('"bilinr" is none of nearest, linear, cubic', ["warp", raster, "x.tif", "--to", "4326",
+                ('"bilinr" is none of nearest, bilinear, cubic', ["warp", raster, "x.tif", "--to", "4326",
                                                                 "--resampling", "bilinr"]),
                 ('there is no format "TIFFF"; did you mean TIFF?', ["copy", raster, self.folder / "x.tif",
                                                                     "--format", "TIFFF"]),
