@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <cctype>
+#include <cpl_string.h>
 #include <filesystem>
 #include <string_view>
 #include <utility>
@@ -57,11 +58,12 @@ std::string FindSubdataset(GDALDatasetH dataset, const Source& source) {
   const std::string& wanted = source.subdataset;
   const bool isNumber = std::all_of(wanted.begin(), wanted.end(),
                                     [](unsigned char c) { return std::isdigit(c) != 0; });
+  // Some drivers know the list as a whole alone.
+  CSLConstList const list = GDALGetMetadata(dataset, "SUBDATASETS");
   int count = 0;
   for (;; ++count) {
     const std::string number = std::to_string(count + 1);
-    const char* const name =
-        GDALGetMetadataItem(dataset, ("SUBDATASET_" + number + "_NAME").c_str(), "SUBDATASETS");
+    const char* const name = CSLFetchNameValue(list, ("SUBDATASET_" + number + "_NAME").c_str());
     if (name == nullptr) break;
     if (isNumber ? number == wanted : std::string(name).ends_with(wanted)) return name;
   }

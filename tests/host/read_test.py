@@ -166,6 +166,30 @@ class Read(PipeTest, FolderTest):
 
 
 @needs_data
+@needs_gdal
+class FurtherFormats(FolderTest):
+    def test_read_what_gdal_put_into_them(self):
+        drivers = subprocess.run(["gdalinfo", "--formats"], capture_output=True, text=True, check=True).stdout
+        scene = DATA / "landsat7_u16_tiled.tif"
+        for driver, ending, options in (("VRT", "vrt", []), ("netCDF", "nc", []), ("netCDF", "4.nc", ["-co", "FORMAT=NC4"]),
+                                        ("Zarr", "zarr", [])):
+            if f" {driver} " not in drivers:
+                continue
+            with self.subTest(driver + ending):
+                one = self.folder / f"one.{ending}"
+                subprocess.run(["gdal_translate", "-q", "-b", "3", "-of", driver, *options, scene, one], check=True)
+                self.assertEqual(json.loads(self.fine("info", one, "--json"))["format"], driver)
+                self.fine("read", one, "-o", self.folder / "one.npy", "--overwrite")
+                self.assertEqual(read_npy(self.folder / "one.npy")[2], gdal_pixels(scene, "-b", "3"))
+                if driver == "netCDF":  # a band is an array of the file
+                    many = self.folder / f"many.{ending}"
+                    subprocess.run(["gdal_translate", "-q", "-of", driver, *options, scene, many], check=True)
+                    self.fine("read", f"{many}|SUBDATASET=2", "-o", self.folder / "two.npy", "--overwrite")
+                    self.assertEqual(read_npy(self.folder / "two.npy")[2], gdal_pixels(scene, "-b", "2"))
+                    self.fails(1, "name one by", "info", many)
+
+
+@needs_data
 class Quicklook(FolderTest):
     def look(self, *arguments):
         self.fine("quicklook", *arguments[:1], self.folder / "o.png", "--overwrite", *arguments[1:])
