@@ -42,7 +42,7 @@ class Guide(PipeTest, FolderTest):
         blocks = re.findall(r"^```sh\n(.*?)^```", (GUIDE / name).read_text(), re.DOTALL | re.MULTILINE)
         self.assertTrue(blocks, name)
         environment = dict(os.environ, PATH=f"{BUILD / 'bin'}:{os.environ['PATH']}")
-        # What a page that fails has started ends with it.
+        # A server of a page that fails ends with it.
         script = "set -e\ntrap 'kill $(jobs -p) 2>/dev/null || true' EXIT\n" + "".join(blocks)
         shell = subprocess.run(["bash", "-c", script], cwd=self.folder, env=environment,
                                capture_output=True, text=True, timeout=120)

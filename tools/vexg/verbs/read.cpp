@@ -259,7 +259,7 @@ class ReadVerb final : public FileVerb {
     if (states) states->Close();
   }
 
-  /// What is read, in the order of the output where that matters.
+  /// The parts that are read, in the order of the output where that matters.
   std::vector<Part> GetParts() const {
     std::vector<Part> parts;
     const unsigned atOnce = BandsAtOnce();
