@@ -48,6 +48,16 @@ extern "C" VEXG_EXPORT lumo::DataConnectionFactory* CreateDataConnectionFactory(
   return lumo::MakeTiffFactory(*record, &FindTiffByGdal);
 }
 
+/// The formats by GDAL beside those of the table; the link libvexgformat_gdal.so brings them.
+extern "C" VEXG_EXPORT const lumo::FormatDescription* DescribeFormats(std::uint32_t* count) {
+  static constexpr lumo::FormatDescription kFormats[] = {
+      {"VRT", "VRT", lumo::DataSourceKind::kRaster},
+      {"netCDF", "netCDF", lumo::DataSourceKind::kRaster},
+      {"Zarr", "Zarr", lumo::DataSourceKind::kRaster}};
+  *count = static_cast<std::uint32_t>(std::size(kFormats));
+  return kFormats;
+}
+
 /// The entry point for files of records.
 extern "C" VEXG_EXPORT lumo::VectorRecordFactory* CreateVectorRecordFactory() {
   auto* const create =

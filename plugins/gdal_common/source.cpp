@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <cctype>
+#include <cpl_string.h>
 #include <filesystem>
 #include <string_view>
 #include <utility>
@@ -12,6 +13,7 @@
 #include "gdal_common/file_guard.h"
 #include "gdal_common/hdf5_files.h"
 #include "gdal_common/messages.h"
+#include "gdal_common/vrt_sources.h"
 
 namespace lumo::gdal {
 namespace {
@@ -56,11 +58,12 @@ std::string FindSubdataset(GDALDatasetH dataset, const Source& source) {
   const std::string& wanted = source.subdataset;
   const bool isNumber = std::all_of(wanted.begin(), wanted.end(),
                                     [](unsigned char c) { return std::isdigit(c) != 0; });
+  // Some drivers know the list as a whole alone.
+  CSLConstList const list = GDALGetMetadata(dataset, "SUBDATASETS");
   int count = 0;
   for (;; ++count) {
     const std::string number = std::to_string(count + 1);
-    const char* const name =
-        GDALGetMetadataItem(dataset, ("SUBDATASET_" + number + "_NAME").c_str(), "SUBDATASETS");
+    const char* const name = CSLFetchNameValue(list, ("SUBDATASET_" + number + "_NAME").c_str());
     if (name == nullptr) break;
     if (isNumber ? number == wanted : std::string(name).ends_with(wanted)) return name;
   }
@@ -74,9 +77,15 @@ std::string FindSubdataset(GDALDatasetH dataset, const Source& source) {
   return {};
 }
 
+/// True for a format whose files the HDF5 library may open.
 bool IsHdf5(const Format& format) {
-  return std::any_of(format.drivers.begin(), format.drivers.end(),
-                     [](const std::string& driver) { return driver.starts_with("HDF5"); });
+  return std::any_of(format.drivers.begin(), format.drivers.end(), [](const std::string& driver) {
+    return driver.starts_with("HDF5") || driver == "netCDF";
+  });
+}
+
+bool IsVirtual(const Format& format) {
+  return format.drivers == std::vector<std::string>{"VRT"};
 }
 
 /// The file behind a source's name, which may have the form HDF5:"file"://place.
@@ -164,6 +173,7 @@ bool IsOfFormat(const Source& source, const Format& format, unsigned openFlags) 
 
 DatasetPtr OpenDataset(const Source& source, const Format& format, unsigned openFlags) {
   if (AreFilesLimited() && IsHdf5(format) && !MayReachHdf5Files(FileOf(source))) return nullptr;
+  if (IsVirtual(format) && !MayUseVrtSources(source.name)) return nullptr;
   DatasetPtr dataset = OpenName(source.name, source, format, openFlags);
   if (dataset == nullptr || source.subdataset.empty()) return dataset;
   const std::string inner = FindSubdataset(dataset.get(), source);

@@ -2402,6 +2402,31 @@ def GetRasterPaletteCommand(
     """
     ...
 
+class _GetRasterPercentilesCommandOutputs(TypedDict, total=False):
+    Percentiles: NDArray[Any]
+
+def GetRasterPercentilesCommand(
+    *,
+    URI: str | Raster,
+    Percents: ArrayLike,
+    Bands: ArrayLike | None = None,
+    server: Server | None = None,
+    progress: Progress = False,
+) -> _GetRasterPercentilesCommandOutputs:
+    """Gives percentiles of the valid pixels of each band, exactly. A command of this library's
+    own.
+
+    Args:
+        URI: URI: the raster
+        Percents: number array: 0 to 100, 128 of them at most; 50 is the median
+        Bands: integer array: from 0; all when absent
+
+    Returns:
+        Percentiles: number array: bands by percentages; between the values at the two ranks
+            next to (n - 1) p / 100, and nan in a band without a valid pixel
+    """
+    ...
+
 class _GetRasterPyramidCommandOutputs(TypedDict, total=False):
     PyramidURI: str
 

@@ -70,7 +70,8 @@ bool SourceHead::MayBeOf(const FormatRecord& row) const {
     return ending_ != ".tif" && ending_ != ".tiff" && ending_ != ".jpg" && ending_ != ".jpeg" &&
            ending_ != ".png" && ending_ != ".gif" && ending_ != ".img";
   if (name == "NITF" || name == "JPEG2000" || name == "DTED" || name == "MrSID" || name == "BMP" ||
-      name == "MemoryRaster" || name == "Pyramid") {
+      name == "MemoryRaster" || name == "Pyramid" || name == "VRT" || name == "netCDF" ||
+      name == "Zarr") {
     return false;
   }
   return std::none_of(std::begin(kMarks), std::end(kMarks),

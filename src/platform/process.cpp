@@ -13,6 +13,10 @@ bool ErrorOutputIsTerminal() {
   return isatty(STDERR_FILENO) == 1;
 }
 
+bool OutputIsTerminal() {
+  return isatty(STDOUT_FILENO) == 1;
+}
+
 unsigned TerminalColumns() {
   constexpr unsigned kUsual = 80;
   winsize size{};

@@ -7,6 +7,9 @@ namespace lumo::platform {
 /// True when standard error is a terminal that somebody may be watching.
 VEXG_EXPORT bool ErrorOutputIsTerminal();
 
+/// True when standard output is a terminal.
+VEXG_EXPORT bool OutputIsTerminal();
+
 /// Columns of the terminal at standard error; 80 when it does not say.
 VEXG_EXPORT unsigned TerminalColumns();
 

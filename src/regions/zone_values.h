@@ -3,6 +3,7 @@
 #include "raster/raster_enums.h"
 #include "regions/value_counter.h"
 #include "regions/zonal_figures.h"
+#include "stats/quantile_rank.h"
 
 namespace lumo {
 
@@ -137,17 +138,16 @@ template <typename T>
 double ZoneValues<T>::Quantile(double percent, bool isWeighted) {
   const auto& entries = values_.GetEntries();
   if (entries.empty()) return std::nan("");
-  const double rank = isWeighted ? 0 : (weight_ - 1) * percent / 100;
-  const double wanted = isWeighted ? weight_ * percent / 100 * (1 - 1e-12) : std::floor(rank) + 1;
+  const QuantileRank place(isWeighted ? 1 : weight_, percent);
+  const double wanted =
+      isWeighted ? weight_ * percent / 100 * (1 - 1e-12) : static_cast<double>(place.rank) + 1;
   double below = 0;
   std::size_t i = 0;
   while (i + 1 < entries.size() && below + entries[i].weight < wanted) below += entries[i++].weight;
-  const auto value = static_cast<double>(entries[i].value);
-  const double part = rank - std::floor(rank);
-  if (isWeighted || part == 0) return value;
   const bool isLastOfItsValue = below + entries[i].weight < wanted + 1;
   const std::size_t next = isLastOfItsValue && i + 1 < entries.size() ? i + 1 : i;
-  return value + part * (static_cast<double>(entries[next].value) - value);
+  return place.Between(static_cast<double>(entries[i].value),
+                       static_cast<double>(entries[next].value));
 }
 
 /// The least of the values of the greatest weight; of the smallest where `sign` is -1.

@@ -25,8 +25,8 @@ void LookForPluginsIn(const fs::path& directory) {
 
 TEST(PluginLibrary, TheExampleServesItsFormat) {
   LookForPluginsIn(Built("examples/plugins"));
-  ASSERT_EQ(FormatCount(), kFormatCount + 1);
-  EXPECT_EQ(GetFormat(kFormatCount).name, String("Plane"));
+  ASSERT_GT(FormatCount(), kFormatCount);  // beside those that come with the library
+  ASSERT_NE(FindFormat("Plane"), nullptr);
   const RasterDataConnectionPtr plane(
       GetGlobalDataManager().Connect(ConnStrings({"plane:5x4"}), {}, {}));
   ASSERT_TRUE(plane) << TakeFault().ToUTF8();

@@ -79,7 +79,7 @@ class Documents(PipeTest):
                          "copy docs/commands.md from the build folder")
 
     def test_links_lead_somewhere(self):
-        for document in [SOURCE / "README.md", SOURCE / "CONTRIBUTING.md", *SOURCE.glob("docs/*.md")]:
+        for document in [SOURCE / "README.md", SOURCE / "CONTRIBUTING.md", *SOURCE.glob("docs/**/*.md")]:
             for link in re.findall(r"\]\(([^)#:]+)\)", document.read_text()):
                 self.assertTrue((document.parent / link).exists(), f"{document.name}: {link}")
 

@@ -69,13 +69,15 @@ class Info(FolderTest):
 class Formats(FolderTest):
     def test_are_tried(self):
         formats = {entry["format"]: entry for entry in json.loads(self.fine("formats", "--json"))}
-        self.assertEqual(len(formats), 27)
+        self.assertEqual(len(formats), 30)
+        for key in ("VRT", "netCDF", "Zarr"):
+            self.assertEqual([formats[key][what] for what in ("loads", "reads", "writes")], [True, True, False], key)
         for key in ("ORVA", "TIFF"):
             self.assertTrue(all(formats[key][what] for what in ("loads", "reads", "writes")), key)
         self.assertFalse(formats["GDBRaster"]["loads"])
         self.assertTrue(formats["GDBRaster"]["fault"])
         self.assertEqual(formats["Shapefile"]["kind"], "vector")
-        self.assertEqual(len(self.fine("formats").splitlines()), 28)
+        self.assertEqual(len(self.fine("formats").splitlines()), 31)
 
 
 @needs_data

@@ -10,7 +10,7 @@ import unittest
 import xml.etree.ElementTree as ElementTree
 import zlib
 
-from support import (DATA, FolderTest, PipeTest, gdal_pixels, needs_data, needs_gdal, read_npy, read_png,
+from support import (DATA, VEXG, FolderTest, PipeTest, gdal_pixels, needs_data, needs_gdal, read_npy, read_png,
                      run, start, table, write_orva)
 
 
@@ -43,6 +43,44 @@ class Blocks(FolderTest):
         by_line = b"".join(self.pixels[y * width * bands + band:(y + 1) * width * bands:bands]
                            for y in range(height) for band in range(bands))
         self.assertEqual(self.read("--interleave", "bil"), ("|u1", (height, bands, width), by_line))
+
+    def test_standard_output_and_raw_files_have_the_same_bytes(self):
+        def stream(*options):
+            with subprocess.Popen([VEXG, "read", self.file, "-o", "-", "-q", *options], stdout=subprocess.PIPE,
+                                  stderr=subprocess.PIPE) as process:
+                out, err = process.communicate(timeout=60)
+            self.assertEqual((process.returncode, err), (0, b""), options)
+            return out
+
+        for options in ([], ["--interleave", "bil", "--bands", "3,0"], ["--interleave", "bsq", "--rect", "7,9,2900,1500"]):
+            with self.subTest(options):
+                self.read(*options)
+                npy = (self.folder / "out.npy").read_bytes()
+                self.assertEqual(stream(*options), npy)
+                raw = self.folder / "out.raw"
+                self.fine("read", self.file, "-o", raw, "--overwrite", "-q", *options)
+                self.assertEqual(raw.read_bytes(), read_npy(self.folder / "out.npy")[2])
+                self.assertEqual(stream("--raw", *options), raw.read_bytes())
+        # The mask of bands that come one by one.
+        masks = [self.folder / "m1.npy", self.folder / "m2.npy"]
+        source = DATA / "rgb1.tif" if DATA.is_dir() else self.file
+        for out, mask in zip(("-", self.folder / "out.npy"), masks):
+            code = subprocess.run([VEXG, "read", source, "-o", out, "--interleave", "bsq", "--mask", mask, "--overwrite"],
+                                  stdout=subprocess.DEVNULL).returncode
+            self.assertEqual(code, 0)
+        self.assertEqual(masks[0].read_bytes(), masks[1].read_bytes())
+        self.assertEqual(sorted(path.name for path in self.folder.iterdir()),
+                         ["large", "large.hdr", "m1.npy", "m2.npy", "out.npy", "out.raw"])
+
+    def test_standard_output_that_fails(self):
+        with open("/dev/full", "wb") as full:
+            process = subprocess.run([VEXG, "read", self.file, "-o", "-"], stdout=full, stderr=subprocess.PIPE)
+        self.assertEqual((process.returncode, process.stderr.count(b"\n")), (1, 1))
+        self.assertIn(b"standard output can't be written", process.stderr)
+        shell = subprocess.run(f"'{VEXG}' read '{self.file}' -o - | head -c 10 | wc -c", shell=True, capture_output=True,
+                               text=True, timeout=60)
+        self.assertEqual((shell.stdout.strip(), shell.stderr), ("10", ""))
+        self.fails(2, "--raw", "read", self.file, "-o", self.folder / "o.npy", "--raw")
 
     def test_rectangles_and_bands(self):
         width, _, bands = self.size
@@ -128,6 +166,30 @@ class Read(PipeTest, FolderTest):
 
 
 @needs_data
+@needs_gdal
+class FurtherFormats(FolderTest):
+    def test_read_what_gdal_put_into_them(self):
+        drivers = subprocess.run(["gdalinfo", "--formats"], capture_output=True, text=True, check=True).stdout
+        scene = DATA / "landsat7_u16_tiled.tif"
+        for driver, ending, options in (("VRT", "vrt", []), ("netCDF", "nc", []), ("netCDF", "4.nc", ["-co", "FORMAT=NC4"]),
+                                        ("Zarr", "zarr", [])):
+            if f" {driver} " not in drivers:
+                continue
+            with self.subTest(driver + ending):
+                one = self.folder / f"one.{ending}"
+                subprocess.run(["gdal_translate", "-q", "-b", "3", "-of", driver, *options, scene, one], check=True)
+                self.assertEqual(json.loads(self.fine("info", one, "--json"))["format"], driver)
+                self.fine("read", one, "-o", self.folder / "one.npy", "--overwrite")
+                self.assertEqual(read_npy(self.folder / "one.npy")[2], gdal_pixels(scene, "-b", "3"))
+                if driver == "netCDF":  # a band is an array of the file
+                    many = self.folder / f"many.{ending}"
+                    subprocess.run(["gdal_translate", "-q", "-of", driver, *options, scene, many], check=True)
+                    self.fine("read", f"{many}|SUBDATASET=2", "-o", self.folder / "two.npy", "--overwrite")
+                    self.assertEqual(read_npy(self.folder / "two.npy")[2], gdal_pixels(scene, "-b", "2"))
+                    self.fails(1, "name one by", "info", many)
+
+
+@needs_data
 class Quicklook(FolderTest):
     def look(self, *arguments):
         self.fine("quicklook", *arguments[:1], self.folder / "o.png", "--overwrite", *arguments[1:])
@@ -139,7 +201,7 @@ class Quicklook(FolderTest):
         plain = self.folder / "plain.tif"
         subprocess.run(["gdal_translate", "-q", scene, plain], check=True)
         for file, samples, lines, options in ((plain, 349, 352, []), (scene, 175, 176, ["-oo", "OVERVIEW_LEVEL=0"])):
-            width, height, channels, pixels = self.look(file, "--size", "100")
+            width, height, channels, pixels = self.look(file, "--size", "100", "--resampling", "nearest")
             self.assertEqual((width, height, channels), (99, 100, 3))
             source = gdal_pixels(file, "-b", "3", "-b", "2", "-b", "1", *options)
             picked = [source[((2 * y + 1) * lines // 200 * samples + (2 * x + 1) * samples // 198) * 3:][:3]
@@ -150,6 +212,40 @@ class Quicklook(FolderTest):
                 for i, pixel in enumerate(picked):
                     want = min(max((pixel[band] - low) / (high - low) * 255, 0), 255)
                     self.assertLessEqual(abs(pixels[3 * i + band] - want), 0.5 + 1e-9)
+
+    def test_a_reduced_picture_shows_means_of_the_area_of_its_pixels(self):
+        chance = random.Random(5)
+        for width, height, size in ((35, 20, 7), (35, 20, 8), (9, 31, 12)):
+            pixels = [[chance.randrange(256) for _ in range(width)] for _ in range(height)]
+            holes = chance.sample(range(width * height), 200)
+            for at in holes:
+                pixels[at // width][at % width] = 255
+            file = write_orva(self.folder / "flat", width, height, 1, b"".join(map(bytes, pixels)))
+            w, h, channels, shown = self.look(file, "--size", size, "--stretch", "none", "--no-data", "255")
+            self.assertEqual((w, h), (max(1, round(width * size / max(width, height))),
+                                      max(1, round(height * size / max(width, height)))))
+
+            def share(i, count, at, extent):
+                return max(0, min((i + 1) / count, (at + 1) / extent) - max(i / count, at / extent))
+
+            for y in range(h):
+                for x in range(w):
+                    parts = [(share(x, w, i, width) * share(y, h, j, height), pixels[j][i])
+                             for j in range(height) for i in range(width) if pixels[j][i] != 255]
+                    weight = sum(part for part, _ in parts)
+                    at = (y * w + x) * channels
+                    if weight < 1e-12:
+                        self.assertEqual(shown[at + channels - 1], 0)
+                    else:
+                        self.assertLessEqual(abs(shown[at] - sum(part * v for part, v in parts) / weight), 0.5 + 1e-6)
+
+    def test_codes_are_not_averaged(self):
+        colors = [(255, 0, 0), (0, 128, 0), (10, 20, 30)]
+        file = write_indexed_png(self.folder / "codes.png", 8, 8, [0, 2] * 32, colors)
+        width, height, _, shown = self.look(file, "--size", "4")
+        self.assertEqual((width, height, {shown[i:i + 3] for i in range(0, len(shown), 3)}), (4, 4, {bytes(colors[2])}))
+        self.fails(2, "have no mean", "quicklook", file, self.folder / "o.png", "--overwrite", "--size", "4",
+                   "--resampling", "average")
 
     @needs_gdal
     def test_without_a_stretch_shows_values(self):
@@ -192,7 +288,8 @@ class Decimation(FolderTest):
         # All other lines are missing from the disk's point of view: reading them would still give
         # zeros, so what is asked for is looked at instead.
         file = write_orva(self.folder / "tall", 8, 100000, 1)
-        job = self.fine("quicklook", file, self.folder / "o.png", "--size", "50", "--print-job")
+        job = self.fine("quicklook", file, self.folder / "o.png", "--size", "50", "--resampling", "nearest",
+                        "--print-job")
         rects = re.findall(r'SubRect="(\d+) (\d+) (\d+) (\d+)"', job)
         self.assertEqual([int(rect[1]) for rect in rects], [1000 + 2000 * i for i in range(50)])
         self.assertTrue(all(rect[1] == rect[3] for rect in rects))
@@ -207,7 +304,7 @@ class Decimation(FolderTest):
                                ("--rect", ["--rect", "1,2,3"]), ("--bands", ["--bands", "a"]),
                                ("no band 7", ["--bands", "7"]), ("--interleave", ["--interleave", "x"])]:
             self.fails(2, words, "read", file, "-o", self.folder / "o.npy", *options)
-        self.fails(2, ".npy or .png", "read", file, "-o", self.folder / "o.tif")
+        self.fails(2, ".npy, .raw or .png", "read", file, "-o", self.folder / "o.tif")
         wide = write_orva(self.folder / "wide", 4, 4, 5)
         self.fails(2, "a PNG holds", "read", wide, "-o", self.folder / "o.png")
 

@@ -165,6 +165,43 @@ class Roots(PipeTest, FolderTest):
         after = self.snapshot()
         self.assertEqual({path: after[path] for path in before}, before)
 
+    def test_sources_of_virtual_rasters(self):
+        self.serve("test", "--root", self.inside)
+        secret = self.tiff(self.outside / "secret.tif")
+        (self.outside / "secret.raw").write_bytes(SECRET)
+        near = self.tiff(self.inside / "near.tif")
+        warped = self.inside / "warped.vrt"
+        gdal("gdalwarp", "-q", "-of", "VRT", "-to", "SRC_METHOD=NO_GEOTRANSFORM", "-ts", "4", "4", near, warped)
+
+        def virtual(name, source, relative=0, kind="SimpleSource"):
+            path = self.inside / name
+            path.write_text(f"""<VRTDataset rasterXSize="4" rasterYSize="4"><VRTRasterBand dataType="Byte" band="1"><{kind}>
+                <SourceFilename relativeToVRT="{relative}">{source}</SourceFilename><SourceBand>1</SourceBand>
+                <SrcRect xOff="0" yOff="0" xSize="4" ySize="4"/><DstRect xOff="0" yOff="0" xSize="4" ySize="4"/>
+                </{kind}></VRTRasterBand></VRTDataset>""")
+            return path
+
+        for source in (virtual("plain.vrt", near), virtual("beside.vrt", "near.tif", 1), virtual("nested.vrt", "plain.vrt", 1)):
+            self.assertEqual(self.read(source), (0, "", SECRET), source)
+        self.assertEqual(self.read(warped)[0], 0)
+        outside = virtual("outside.vrt", secret)
+        linked = self.inside / "linked.tif"
+        linked.symlink_to(secret)
+        raw = self.inside / "raw.vrt"
+        raw.write_text(f"""<VRTDataset rasterXSize="4" rasterYSize="4"><VRTRasterBand dataType="Byte" band="1"
+            subClass="VRTRawRasterBand"><SourceFilename>{self.outside / "secret.raw"}</SourceFilename></VRTRasterBand></VRTDataset>""")
+        for source in (outside, virtual("up.vrt", "../out/secret.tif", 1), virtual("link.vrt", linked),
+                       virtual("mean.vrt", secret, kind="ComplexSource"), virtual("deep.vrt", outside), raw):
+            self.refused(source)
+        # Names that are no files: memory, addresses, files inside others, and a raster that names itself.
+        self.memory = ctypes.create_string_buffer(SECRET)
+        place = ctypes.addressof(self.memory)
+        for source in (f"MEM:::DATAPOINTER={place},PIXELS=4,LINES=4", "/vsicurl/http://localhost:1/x.tif",
+                       f"/vsisubfile/0,{near}", "WMS:http://localhost:1/?", "loop.vrt"):
+            with self.subTest(source):
+                code, err, pixels = self.read(virtual("loop.vrt", source, int(source == "loop.vrt")))
+                self.assertEqual((code, pixels, err.count("\n")), (1, b"", 1), err)
+
     def test_nothing_is_written_outside(self):
         self.serve("test", "--root", self.inside)
         target = self.outside / "target"

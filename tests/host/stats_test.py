@@ -4,6 +4,7 @@ import array
 import json
 import math
 import pathlib
+import random
 import re
 import shutil
 import subprocess
@@ -19,7 +20,7 @@ class RasterTest(FolderTest):
     def values(self, file, band, *options):
         """The valid pixels of a band, by vexg read; all of them with NaN in the others' place."""
         self.fine("read", file, "--bands", band, "-o", self.folder / "v.npy", "--mask", self.folder / "m.npy",
-                  "--overwrite")
+                  "--overwrite", *options)
         kind, _, data = read_npy(self.folder / "v.npy")
         _, _, mask = read_npy(self.folder / "m.npy")
         codes = {"|u1": "B", "<u2": "H", "<i2": "h", "<f4": "f", "<f8": "d"}
@@ -94,6 +95,25 @@ class Stats(RasterTest):
         zeros = write_orva(self.folder / "zeros.dat", 3, 2, 1)
         self.assertEqual(self.stats(zeros)[0]["max"], 0)
 
+    def test_percentiles_of_valid_pixels_are_those_of_their_order(self):
+        for file, options in (("landsat7_f32_strip.tif", ["--bands", "1"]), ("float_raster_with_nodata.tif", []),
+                              ("dem_int16.tif", ["--rect", "3,5,60,71", "-q"]), ("rgb1.tif", ["--bands", "2,0"])):
+            with self.subTest(file):
+                plain = self.stats(DATA / file, *options)
+                found = self.stats(DATA / file, *options, "--median", "--percentiles", "0,2.5,98,100,2.5")
+                for before, band in zip(plain, found, strict=True):
+                    self.assertEqual({name: band[name] for name in before}, before)
+                    self.assertEqual(list(band)[len(before):], ["median", "p0", "p2.5", "p98", "p100"])
+                    area = options if "--rect" in options else []
+                    valid = sorted(v for v in self.values(DATA / file, band["band"], *area) if v == v)
+                    for name, percent in (("median", 50), ("p0", 0), ("p2.5", 2.5), ("p98", 98), ("p100", 100)):
+                        self.assertAlmostEqual(band[name], quantile(valid, percent), delta=1e-12 * abs(band[name]))
+        code, out, _ = run("stats", str(DATA / "all-nodata.tif"), "--median")
+        self.assertEqual((code, out.splitlines()[1].split()[-1], out.splitlines()[2].split()[-1]), (0, "median", "-"))
+        self.assertIsNone(self.stats(DATA / "all-nodata.tif", "--median")[0]["median"])
+        for text in ("101", "-1", "x", "", "1,,2", "nan", "1e1x"):
+            self.fails(2, "--percentiles", "stats", DATA / "rgb1.tif", f"--percentiles={text or ','}", "--json")
+
     def test_save_stores_them_where_the_format_keeps_them(self):
         for name in ("landsat7_u16_tiled.tif", "float_nan.tif", "landsat7.img", "flat.dat"):
             with self.subTest(name):
@@ -124,6 +144,41 @@ class Stats(RasterTest):
                 self.assertEqual((code, out), (want, ""))
                 self.assertIn(words, err)
                 self.assertEqual(err.count("\n"), 1)
+
+
+def quantile(values, percent):
+    """Between the two values next to the rank (n - 1) p / 100, of values in their order."""
+    rank = (len(values) - 1) * percent / 100
+    low = int(rank)
+    part = rank - low
+    return values[low] if part == 0 else values[low] + part * (values[low + 1] - values[low])
+
+
+class Percentiles(RasterTest):
+    """Of every pixel type in three bands, and of more different numbers than are kept one by one."""
+
+    def test_all_pixel_types(self):
+        chance = random.Random(11)
+        for kind, code in (("Byte", "B"), ("Int16", "h"), ("UInt16", "H"), ("Int32", "i"), ("UInt32", "I"),
+                           ("Int64", "q"), ("UInt64", "Q"), ("Single", "f"), ("Double", "d")):
+            with self.subTest(kind):
+                samples = 30_000 if code == "f" else 500
+                bits = 8 * array.array(code).itemsize
+                if code in "fd":
+                    draw = lambda: chance.gauss(0, 1e20) if chance.random() < 0.95 else chance.choice((-3.5, 0.0, -0.0))
+                else:
+                    low = -(1 << (bits - 1)) if code.islower() else 0
+                    draw = lambda: low + chance.getrandbits(chance.choice((bits, bits // 2)))
+                pixels = array.array(code, (draw() for _ in range(3 * samples * 10)))
+                if code in "fd":
+                    pixels[0], pixels[3], pixels[6] = math.nan, math.inf, -math.inf
+                file = write_orva(self.folder / kind, samples, 10, 3, pixels.tobytes(), kind)
+                bands = self.stats(file, "--percentiles", "0,1,37.5,50,100")
+                for i, band in enumerate(bands):
+                    valid = sorted(value for value in pixels[i::3] if math.isfinite(value))
+                    for percent in (0, 1, 37.5, 50, 100):
+                        want = float(quantile(valid, percent))
+                        self.assertAlmostEqual(band[f"p{percent:g}"], want, delta=1e-12 * abs(want), msg=percent)
 
 
 @needs_data

@@ -39,11 +39,12 @@ std::string Shape(const SubRect& rect, unsigned bands, Interleave interleave) {
   }
 }
 
-/// Magic, version, and the dictionary, filled with blanks so that the elements begin at a multiple
-/// of 64.
-std::string Header(unsigned dataType, const std::string& shape) {
+}  // namespace
+
+std::string MakeNpyHeader(unsigned dataType, const SubRect& rect, unsigned bands,
+                          Interleave interleave) {
   std::string dictionary = fmt::format("{{'descr': '{}', 'fortran_order': False, 'shape': {}, }}",
-                                       TypeText(dataType), shape);
+                                       TypeText(dataType), Shape(rect, bands, interleave));
   constexpr std::size_t kPreamble = 10;
   constexpr std::size_t kAlign = 64;
   dictionary.append(kAlign - 1 - (kPreamble + dictionary.size()) % kAlign, ' ').append("\n");
@@ -53,16 +54,15 @@ std::string Header(unsigned dataType, const std::string& shape) {
   return header + dictionary;
 }
 
-}  // namespace
-
 NpyWriter::NpyWriter(const OutputFile& output, unsigned dataType, const SubRect& rect,
-                     unsigned bands, Interleave interleave)
+                     unsigned bands, Interleave interleave, bool isRaw)
     : file_(output),
       elementBytes_(DataTypeBytes(dataType)),
       rect_(rect),
       bands_(bands),
       interleave_(interleave) {
-  const std::string header = Header(dataType, Shape(rect, bands, interleave));
+  if (isRaw) return;
+  const std::string header = MakeNpyHeader(dataType, rect, bands, interleave);
   file_.Write(header.data(), header.size());
   start_ = header.size();
 }
@@ -77,7 +77,7 @@ void NpyWriter::WriteRun(std::uint64_t element, const unsigned char*& pixels, st
   pixels += count * elementBytes_;
 }
 
-void NpyWriter::Write(const SubRect& rect, const unsigned char* pixels) {
+void NpyWriter::Write(const SubRect& rect, const BandSpan& bands, const unsigned char* pixels) {
   const std::uint64_t width = rect_.Width();
   const std::uint64_t x = rect.left - rect_.left;
   const std::uint64_t y = rect.top - rect_.top;
@@ -86,7 +86,7 @@ void NpyWriter::Write(const SubRect& rect, const unsigned char* pixels) {
   const unsigned runs = wholeLines ? 1 : rect.Height();
   const std::uint64_t run = std::uint64_t{rect.Width()} * (wholeLines ? rect.Height() : 1);
   if (interleave_ == Interleave::BSQ) {
-    for (unsigned band = 0; band < bands_; ++band) {
+    for (unsigned band = bands.first; band < bands.first + bands.count; ++band) {
       for (unsigned i = 0; i < runs; ++i) {
         WriteRun((std::uint64_t{band} * rect_.Height() + y + i) * width + x, pixels, run);
       }

@@ -1,5 +1,7 @@
 #include "pictures/quicklook_maker.h"
 
+#include <algorithm>
+
 #include "pictures/picture_writer.h"
 #include "pictures/text_image.h"
 #include "verb.h"
@@ -13,6 +15,7 @@ void ReadPixels(JobSession& session, const ShownRaster& raster, const Array<unsi
   reader.ReadAll(picture.GetBlocks(), bands, Interleave::BIP, progress, [&](const SubRect& block) {
     picture.Take(block, reader.GetPixels(), reader.GetStates());
   });
+  picture.Finish();
 }
 
 /// A picture with a list of colours on its right.
@@ -100,16 +103,22 @@ Array<unsigned> ChoosePictureBands(const std::string& text, const RasterInfo& in
   throw HostError(kExitUsage, "--bands: a picture shows one band or three");
 }
 
+PictureSampling ChooseSampling(const RasterInfo& info, const Array<unsigned>& bands) {
+  const bool hasCodes =
+      std::any_of(bands.begin(), bands.end(), [&](unsigned band) { return info.hasPalette[band]; });
+  return hasCodes ? PictureSampling::kNearest : PictureSampling::kAverage;
+}
+
 void MakeQuicklook(JobSession& session, const QuicklookRequest& request, const OutputFile& output,
                    ProgressStyle progress) {
-  QuicklookPicture picture(request.raster.info, request.size, request.bands);
+  QuicklookPicture picture(request.raster.info, request.size, request.bands, request.sampling);
   ReadPixels(session, request.raster, request.bands, progress, picture);
   QuicklookPicture::Bytes bytes =
       request.palette ? picture.Draw(*request.palette) : picture.Draw(request.stretch);
   for (const Outlines& outlines : request.outlines) {
     Array<unsigned> first{ArrayDims(1)};
     first[0] = 0;
-    QuicklookPicture labels(outlines.labels.info, request.size, first);
+    QuicklookPicture labels(outlines.labels.info, request.size, first, PictureSampling::kNearest);
     ReadPixels(session, outlines.labels, first, progress, labels);
     labels.DrawOutlines(outlines.colour, bytes);
   }

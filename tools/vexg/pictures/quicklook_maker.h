@@ -36,11 +36,16 @@ struct QuicklookRequest {
   std::optional<Palette> palette;    ///< its colours, instead of the stretch, of one band
   std::vector<Outlines> outlines{};  ///< drawn over it, one after the other
   std::vector<LegendRow> legend{};   ///< drawn beside it
+  PictureSampling sampling = PictureSampling::kAverage;
 };
 
 /// The bands shown: those that a text asks for, else red, green and blue where there are three or
 /// more. Throws HostError for other bands than one or three.
 Array<unsigned> ChoosePictureBands(const std::string& text, const RasterInfo& info);
+
+/// How a picture of the bands takes its pixels unless told: averages, but for bands with a palette,
+/// whose codes have no mean.
+PictureSampling ChooseSampling(const RasterInfo& info, const Array<unsigned>& bands);
 
 /// Reads a raster, draws the picture and writes it. Throws HostError.
 void MakeQuicklook(JobSession& session, const QuicklookRequest& request, const OutputFile& output,

@@ -96,7 +96,7 @@ Line LineOf(const std::vector<double>& values, const QuicklookPicture::Stretch& 
 }  // namespace
 
 QuicklookPicture::QuicklookPicture(const RasterInfo& info, unsigned size,
-                                   const Array<unsigned>& bands)
+                                   const Array<unsigned>& bands, PictureSampling sampling)
     : info_(info), bands_(bands) {
   const unsigned longer = std::max(info.samples, info.lines);
   const auto scaled = [&](unsigned extent) {
@@ -106,10 +106,14 @@ QuicklookPicture::QuicklookPicture(const RasterInfo& info, unsigned size,
   };
   columns_ = Middles(info.samples, scaled(info.samples));
   lines_ = Middles(info.lines, scaled(info.lines));
-  values_.assign(bands.GetCount(), std::vector<double>(columns_.size() * lines_.size(), NAN));
+  averages_ = sampling == PictureSampling::kAverage && longer > size;
+  const std::size_t count = columns_.size() * lines_.size();
+  values_.assign(bands.GetCount(), std::vector<double>(count, averages_ ? 0 : NAN));
+  if (averages_) weights_.assign(bands.GetCount(), std::vector<double>(count, 0));
 }
 
 std::vector<SubRect> QuicklookPicture::GetBlocks() const {
+  if (averages_) return CutIntoBlocks(info_, info_.GetRect(), bands_.GetCount(), false);
   const unsigned tileWidth = std::clamp(info_.tiles.width, 1U, info_.samples);
   const unsigned tileHeight = std::clamp(info_.tiles.height, 1U, info_.lines);
   const bool hasTiles = tileWidth > 1 && tileWidth < info_.samples;
@@ -146,10 +150,61 @@ void QuicklookPicture::TakeTyped(const SubRect& block, const T* pixels,
   }
 }
 
+std::vector<QuicklookPicture::Shares> QuicklookPicture::ShareOut(unsigned extent, unsigned count) {
+  std::vector<Shares> shares(extent);
+  for (std::uint64_t x = 0; x < extent; ++x) {
+    const std::uint64_t at = x * count / extent;
+    const std::uint64_t end = (x + 1) * count, edge = (at + 1) * extent;
+    const double rest = end > edge ? static_cast<double>(end - edge) / count : 0;
+    shares[x] = {static_cast<unsigned>(at), 1 - rest, rest};
+  }
+  return shares;
+}
+
+/// Adds the pixels of a block to those of the picture that they lie in.
+template <typename T>
+void QuicklookPicture::AddTyped(const SubRect& block, const T* pixels,
+                                const unsigned char* states) {
+  const unsigned bands = bands_.GetCount();
+  const std::size_t width = columns_.size();
+  const std::vector<Shares> columns = ShareOut(info_.samples, GetWidth());
+  const std::vector<Shares> rows = ShareOut(info_.lines, GetHeight());
+  for (unsigned y = block.top; y <= block.bottom; ++y) {
+    for (unsigned x = block.left; x <= block.right; ++x, pixels += bands, states += bands) {
+      const Shares& row = rows[y];
+      const Shares& column = columns[x];
+      const std::size_t at = std::size_t{row.at} * width + column.at;
+      for (unsigned band = 0; band < bands; ++band) {
+        const double value = AsDouble(pixels[band]);
+        if (!IsValidState(states[band]) || !std::isfinite(value)) continue;
+        const auto add = [&](std::size_t to, double weight) {
+          values_[band][to] += weight * value;
+          weights_[band][to] += weight;
+        };
+        add(at, row.first * column.first);
+        if (column.rest > 0) add(at + 1, row.first * column.rest);
+        if (row.rest > 0) add(at + width, row.rest * column.first);
+        if (row.rest > 0 && column.rest > 0) add(at + width + 1, row.rest * column.rest);
+      }
+    }
+  }
+}
+
+void QuicklookPicture::Finish() {
+  if (!averages_) return;
+  for (std::size_t band = 0; band < values_.size(); ++band) {
+    for (std::size_t i = 0; i < values_[band].size(); ++i) {
+      const double weight = weights_[band][i];
+      values_[band][i] = weight > 0 ? values_[band][i] / weight : NAN;
+    }
+  }
+}
+
 void QuicklookPicture::Take(const SubRect& block, const unsigned char* pixels,
                             const unsigned char* states) {
   DispatchType(TwelveTypes{}, info_.dataType, [&]<typename T>() {
-    TakeTyped(block, reinterpret_cast<const T*>(pixels), states);
+    const auto* const typed = reinterpret_cast<const T*>(pixels);
+    averages_ ? AddTyped(block, typed, states) : TakeTyped(block, typed, states);
     return true;
   });
 }

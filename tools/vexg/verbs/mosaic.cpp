@@ -443,7 +443,8 @@ class MosaicVerb final : public RasterVerb {
     JobDraft draft;
     AddLabels(draft, mosaic_);
     const JobResults labels = session.Run(draft);
-    QuicklookRequest request{{mosaic_, info_, file_}, bands_, size_, {}, {}, {}};
+    QuicklookRequest request{{mosaic_, info_, file_},      bands_, size_, {}, {}, {}, {},
+                             ChooseSampling(info_, bands_)};
     const auto add = [&](const char* name, const std::array<unsigned char, 3>& colour) {
       request.outlines.push_back(
           {{URIOf(labels, String(std::string("$") + name)), ReadInfo(labels, name), file_},

@@ -2,6 +2,7 @@
 #include <charconv>
 #include <cstdlib>
 
+#include "options/option_values.h"
 #include "pictures/palette_reading.h"
 #include "pictures/picture_writer.h"
 #include "pictures/quicklook_maker.h"
@@ -65,6 +66,13 @@ class QuicklookVerb final : public FileVerb {
         .IsFile("LABELS");
     line.Add("--legend", hasLegend_,
              "Draw the names of the values that have some, and their colours");
+    line.Add(
+            "--resampling", resampling_,
+            "What a pixel of a reduced picture shows: average, the mean of the valid pixels that "
+            "it "
+            "covers, or nearest, the one in their middle; by default average, and nearest of bands "
+            "with a palette, which have no other")
+        .Takes(OneOf({"average", "nearest"}));
     line.Add("--size", size_, "Pixels of the longer side at most").Within(1, 16384).ShowsDefault();
     AddOverwriteTo(line, "a file that is there");
   }
@@ -95,6 +103,11 @@ class QuicklookVerb final : public FileVerb {
     if (hasLegend_ && !hasPalette_) {
       throw HostError(kExitFailed, GetSource().file + ": --legend: the picture is in no palette");
     }
+    sampling_ = ChooseSampling(info_, bands_);
+    if (resampling_ == "average" && sampling_ == PictureSampling::kNearest) {
+      throw HostError(kExitUsage, "--resampling: the values of a band with a palette have no mean");
+    }
+    if (resampling_ == "nearest") sampling_ = PictureSampling::kNearest;
     shown_ = raster_;
     if (outlines_.empty()) level_ = ChooseLevel(info_, size_);  // labels have no levels
     if (level_ != 0) ShowLevel(session);
@@ -121,7 +134,7 @@ class QuicklookVerb final : public FileVerb {
       AddLevel(draft, "level", chain.GetTop(), level_);
       chain.Take("level");
     }
-    const QuicklookPicture picture(info_, size_, bands_);
+    const QuicklookPicture picture(info_, size_, bands_, sampling_);
     AddBlockSteps(draft, chain.GetTop(), info_, bands_, Interleave::BIP, picture.GetBlocks());
     chain.Close();
     return draft;
@@ -129,7 +142,7 @@ class QuicklookVerb final : public FileVerb {
 
   void Make(JobSession& session, const Outputs& outputs) override {
     QuicklookRequest request{
-        {shown_, info_, GetSource().file}, bands_, size_, stretch_, {}, {}, {}};
+        {shown_, info_, GetSource().file}, bands_, size_, stretch_, {}, {}, {}, sampling_};
     if (hasPalette_) request.palette = ReadPalette(session, raster_, bands_[0]);
     if (hasLegend_) request.legend = ReadLegend(session, *request.palette);
     if (!outlines_.empty()) request.outlines.push_back({OpenOutlines(session), {255, 255, 0}});
@@ -173,11 +186,12 @@ class QuicklookVerb final : public FileVerb {
     throw HostError(kExitFailed, outlines_ + ": --outlines: the labels have another size");
   }
 
-  std::string output_, bandsText_, stretchText_, outlines_;
+  std::string output_, bandsText_, stretchText_, outlines_, resampling_;
   unsigned size_ = 1024;
   bool hasLegend_ = false;
 
   QuicklookPicture::Stretch stretch_;
+  PictureSampling sampling_ = PictureSampling::kAverage;
   String raster_;       // URI
   unsigned level_ = 0;  // of the pyramid that the picture is made from
   String shown_;        // URI of the level, or of the raster

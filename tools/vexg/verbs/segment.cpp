@@ -394,6 +394,7 @@ class SegmentVerb final : public RasterVerb {
         bands_.GetCount() == 1 || bands_.GetCount() == 3 ? bandsText_ : std::string(),
         request.raster.info);
     request.size = kQuicklookSize;
+    request.sampling = ChooseSampling(request.raster.info, request.bands);
     request.outlines.push_back(
         {{URIOf(opened, "$labels"), ReadInfo(opened, "labels"), GetTargetName()}, {255, 255, 0}});
     const std::size_t picture = polygons_.empty() ? 1 : 2;

@@ -1,16 +1,23 @@
+#include <algorithm>
+#include <cmath>
+
 #include <fmt/format.h>
 
+#include "foundation/fault.h"
 #include "foundation/near_name.h"
 #include "output/json_number.h"
 #include "output/saved_values.h"
 #include "rasters/file_verb.h"
 #include "rasters/raster_target.h"
+#include "regions/zonal_figures.h"
+#include "stats/raster_percentiles.h"
 #include "stats/turn.h"
 
 namespace lumo::host {
 namespace {
 
 constexpr const char* kStatsStep = "stats";
+constexpr const char* kPercentilesStep = "percentiles";
 constexpr const char* kSaveCommand = "SaveRasterStatsCommand";
 
 /// A value in both forms of output.
@@ -33,7 +40,7 @@ using Column = std::vector<Cell>;
 /// Statistics of bands.
 struct BandTable {
   std::vector<unsigned> bands;
-  std::vector<std::pair<const char*, Column>> columns;
+  std::vector<std::pair<std::string, Column>> columns;
   std::vector<Column> sumXY, cov;  ///< a row for each band; none unless asked for
 };
 
@@ -111,6 +118,19 @@ BandTable ReadTable(const Map<String, String>& returns, const std::string& file,
   return table;
 }
 
+/// Adds a column for each percentile: "median" and "p2".
+void AddPercentiles(const String& values, const std::vector<std::string>& names, BandTable& table) {
+  const auto percentiles = ParseValue<Array<double>>(values);
+  for (std::size_t i = 0; i < names.size(); ++i) {
+    Column column;
+    for (std::size_t band = 0; band < table.bands.size(); ++band) {
+      const double value = percentiles[band * names.size() + i];
+      column.push_back(std::isnan(value) ? Cell{Json(), "-"} : CellOf(value));
+    }
+    table.columns.emplace_back(names[i], std::move(column));
+  }
+}
+
 Json AsJson(const Column& row) {
   Json list = Json::array();
   for (const Cell& value : row) list.push_back(value.json);
@@ -176,12 +196,17 @@ class StatsVerb final : public FileVerb {
         .Example("3,2,1");
     AddAreaTo(line);
     line.Add("--extended", isExtended_, "With covariances and sums of products");
+    line.Add("--median", hasMedian_, "With the median");
+    line.Add("--percentiles", percentilesText_, "With percentiles, each from 0 to 100")
+        .Shows("P,P...")
+        .Example("2,50,98");
     line.Add("--save", saves_, "Store them with the raster, so that they are known from now on");
     line.Add("--json", isJson_, "As JSON");
   }
 
  private:
   void CheckOptions() override {
+    ReadPercentages();
     if (saves_ && !bandsText_.empty()) {
       throw HostError(kExitUsage,
                       "--save: the statistics of all bands are saved together; leave --bands out");
@@ -189,6 +214,33 @@ class StatsVerb final : public FileVerb {
     if (saves_ && GetArea().IsGiven()) {
       throw HostError(kExitUsage, "--save: the statistics of some pixels are not the raster's");
     }
+  }
+
+  /// Finds out which percentiles are wanted, and what their columns are called.
+  void ReadPercentages() {
+    if (hasMedian_) AddPercentage("median", 50);
+    for (std::size_t at = 0; !percentilesText_.empty() && at <= percentilesText_.size();) {
+      const std::size_t end = std::min(percentilesText_.find(',', at), percentilesText_.size());
+      const std::string name = fmt::format("p{}", percentilesText_.substr(at, end - at));
+      ZonalRequest request;
+      if (!ParseZonalRequest(name, request) || request.figure != ZonalFigure::kPercentile) {
+        TakeFault();
+        throw HostError(kExitUsage,
+                        fmt::format("--percentiles: \"{}\" is no percentage from 0 to 100",
+                                    Printable(name.substr(1))));
+      }
+      AddPercentage(name, request.percent);
+      at = end + 1;
+    }
+    if (percents_.size() <= kMostPercentages) return;
+    throw HostError(kExitUsage,
+                    fmt::format("--percentiles: more than {} of them", kMostPercentages));
+  }
+
+  void AddPercentage(const std::string& name, double percent) {
+    if (std::find(columns_.begin(), columns_.end(), name) != columns_.end()) return;
+    columns_.push_back(name);
+    percents_.push_back(percent);
   }
 
   std::vector<std::string> GetChangedFiles() const override {
@@ -215,6 +267,13 @@ class StatsVerb final : public FileVerb {
         kStatsStep, isExtended_ ? "GetExtendedRasterStatsCommand" : "GetBasicRasterStatsCommand");
     stats.AddInput("URI", bandsText_.empty() ? raster : "$bands");
     stats.AddInput("Wait", Waiting::kAlways);
+    if (!percents_.empty()) {
+      JobWriterCommand& percentiles = draft.Step(kPercentilesStep, "GetRasterPercentilesCommand");
+      percentiles.AddInput("URI", bandsText_.empty() ? raster : "$bands");
+      Array<double> percents{ArrayDims(static_cast<unsigned>(percents_.size()))};
+      std::copy(percents_.begin(), percents_.end(), percents.begin());
+      percentiles.AddInput("Percents", percents);
+    }
     if (!bandsText_.empty()) draft.Close("close.bands", "$bands");
   }
 
@@ -235,11 +294,15 @@ class StatsVerb final : public FileVerb {
     AddStats(draft, raster_);
     JobResults results;
     {
-      const ProgressView view(ProgressOfStep(session, draft, kStatsStep), GetProgressStyle());
+      const char* const last = percents_.empty() ? kStatsStep : kPercentilesStep;
+      const ProgressView view(ProgressOfSteps(session, draft, kStatsStep, last),
+                              GetProgressStyle());
       results = session.Run(draft);
     }
     table_ = ReadTable(results.Find(kStatsStep).returns, GetSource().file, isExtended_, bands_,
                        info_.dataType);
+    if (percents_.empty()) return;
+    AddPercentiles(results.Find(kPercentilesStep).returns.Find("Percentiles"), columns_, table_);
   }
 
   void Save(JobSession& session) override {
@@ -251,7 +314,8 @@ class StatsVerb final : public FileVerb {
                    : AsText(GetSource().file, table_);
   }
 
-  std::string bandsText_;
+  std::string bandsText_, percentilesText_;
+  bool hasMedian_ = false;
   bool isExtended_ = false;
   bool saves_ = false;
   bool isJson_ = false;
@@ -259,6 +323,8 @@ class StatsVerb final : public FileVerb {
   String raster_;  // URI
   RasterInfo info_;
   Array<unsigned> bands_;
+  std::vector<double> percents_;      // those that are wanted
+  std::vector<std::string> columns_;  // what the table calls each
   BandTable table_;
 };
 
