@@ -1,6 +1,6 @@
-# What cpack makes of the installed tree: `cpack -G DEB` one package for this distribution, which asks for
-# the libraries that it needs, and `cpack -G TGZ` the same tree for users without root, which runs wherever
-# it is unpacked. The packages of the distribution's own form are made from debian/ (docs/release.md).
+# cpack makes packages of the installed tree: `cpack -G DEB` one for this distribution, which asks for the
+# libraries that it needs, and `cpack -G TGZ` the same tree for users without root, which runs wherever it is
+# unpacked. The packages of the distribution's own form are made from debian/ (docs/release.md).
 set(CPACK_PACKAGE_NAME vexg)
 set(CPACK_PACKAGE_VENDOR vexg)
 set(CPACK_PACKAGE_CONTACT "vexg maintainers <maintainers@vexg.example.org>")
