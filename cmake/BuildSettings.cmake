@@ -17,7 +17,10 @@ endif()
 find_package(Threads REQUIRED)
 
 add_compile_options(-Wall -Wextra -Wpedantic -Wshadow -Wnon-virtual-dtor -Woverloaded-virtual
-                    -Wcast-qual -Werror)
+                    -Wcast-qual)
+if(VEXG_WERROR)
+  add_compile_options(-Werror)
+endif()
 if(VEXG_SANITIZE)
   add_compile_options(-fsanitize=${VEXG_SANITIZE} -fno-sanitize-recover=all
                       -fno-omit-frame-pointer -g1)

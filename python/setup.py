@@ -1,6 +1,7 @@
 """Puts the library, its plug-ins and data into the package: one wheel for all versions of Python.
 
-$VEXG_BUILD names the folder of the build, which is build/release of the tree by default.
+$VEXG_BUILD names the folder of the build, which is build/release of the tree by default. With
+VEXG_WHEEL=pure nothing of a build is put in, for systems on which the library is installed.
 """
 
 import os
@@ -17,6 +18,7 @@ from wheel.bdist_wheel import bdist_wheel
 
 TREE = pathlib.Path(__file__).resolve().parent.parent
 BUILD = pathlib.Path(os.environ.get("VEXG_BUILD", TREE / "build" / "release"))
+PURE = os.environ.get("VEXG_WHEEL") == "pure"
 
 
 def version():
@@ -46,25 +48,26 @@ class BuildWithLibrary(build_py):
 
     def run(self):
         super().run()
-        copy_native(pathlib.Path(self.build_lib) / "vexg" / "native")
+        if not PURE:
+            copy_native(pathlib.Path(self.build_lib) / "vexg" / "native")
 
 
 class PlatformWheel(bdist_wheel):
-    """Names the wheel after the platform, and no version of Python."""
+    """Names a wheel with libraries after the platform, and none after a version of Python."""
 
     def finalize_options(self):
         super().finalize_options()
-        self.root_is_pure = False
+        self.root_is_pure = PURE
 
     def get_tag(self):
-        return "py3", "none", super().get_tag()[2]
+        return "py3", "none", "any" if PURE else super().get_tag()[2]
 
 
 class PlatformDistribution(Distribution):
     """Tells that there are libraries in the package."""
 
     def has_ext_modules(self):
-        return True
+        return not PURE
 
 
 setup(version=version(), distclass=PlatformDistribution,

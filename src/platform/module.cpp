@@ -4,6 +4,7 @@
 #include <cerrno>
 #include <cstring>
 #include <dlfcn.h>
+#include <filesystem>
 #include <iterator>
 
 #include "platform/memory_shortage.h"
@@ -45,9 +46,12 @@ std::string ModuleFileName(const std::string& name) {
 std::string LibraryDirectory() {
   Dl_info info{};
   if (dladdr(reinterpret_cast<const void*>(&ModuleFileName), &info) == 0) return {};
-  const std::string path = info.dli_fname;
-  const std::size_t slash = path.rfind('/');
-  return slash != std::string::npos ? path.substr(0, slash) : std::string();
+  const std::filesystem::path folder = std::filesystem::path(info.dli_fname).parent_path();
+  if (folder.empty()) return {};
+  // The loader may come by a link, as /lib to /usr/lib, from which ".." leads elsewhere.
+  std::error_code unresolved;
+  const std::filesystem::path real = std::filesystem::canonical(folder, unresolved);
+  return unresolved ? folder.string() : real.string();
 }
 
 }  // namespace lumo::platform

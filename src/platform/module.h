@@ -46,8 +46,8 @@ class VEXG_EXPORT Module {
 /// File name of the library called `name` here: "lib<name>.so".
 VEXG_EXPORT std::string ModuleFileName(const std::string& name);
 
-/// Directory, without a slash at its end, that holds libvexg.so; empty when the system doesn't
-/// know.
+/// Directory, without a slash at its end, that holds libvexg.so, links on the way to it followed;
+/// empty when the system doesn't know.
 VEXG_EXPORT std::string LibraryDirectory();
 
 }  // namespace lumo::platform

@@ -30,7 +30,7 @@ class Documents(PipeTest):
         self.assertEqual(without_times(run("run", "-", stdin=job)[1]), without_times(result))
 
     def test_the_first_job_of_the_readme_runs(self):
-        two_commands, first_job, _, _, _, transform = blocks("README.md", "sh")
+        two_commands, first_job, _, _, _, transform, _ = blocks("README.md", "sh")
         for line in two_commands.splitlines():
             self.assertTrue(os.access(SOURCE / line.split()[0], os.X_OK), line)
         script = "set -e\n" + first_job.replace("build/release", str(BUILD)) + "wait\n" + transform
@@ -50,10 +50,10 @@ class Documents(PipeTest):
             shell = subprocess.run(["bash", "-c", script], cwd=folder, capture_output=True, text=True, timeout=60)
             self.assertEqual(shell.returncode, 0, shell.stderr)
             self.assertEqual(sorted(path.name for path in pathlib.Path(folder).iterdir()),
-                             ["areas.csv", "areas.gpkg", "cloud.tif", "fields.csv", "fields.shape.fxa", "fields.spectral.fxa",
+                             ["areas.csv", "areas.gpkg", "both.tif", "cloud.tif", "fields.csv", "fields.shape.fxa", "fields.spectral.fxa",
                               "geographic.tif", "histogram.png", "labels.tif", "part.npy", "part.tif", "ratio.tif",
                               "reflectance.tif", "scene.dat", "scene.dat.hdr", "scene.png", "scene.tif", "scene.tif.pyr",
-                              "segments.tif"])
+                              "segments.tif", "small.tif"])
 
     def test_programs_compile(self):
         compiler = os.environ["VEXG_CXX"]

@@ -82,16 +82,15 @@ std::string ManualOf(const Verb& verb) {
     if (option.isRepeatable) text += " ...";
   }
   text += "\n.SH DESCRIPTION\n";
+  text += Troff(verb.summary) + ".\n";
   for (const std::string& note : verb.options.Notes()) text += ".PP\n" + Troff(note) + "\n";
   text += ".SH OPTIONS\n";
   for (const OptionSpec& option : verb.options.Options()) text += OptionAsManual(option);
   for (const OptionSpec& option : GetGeneralOptions().Options()) text += OptionAsManual(option);
-  text += ".SH EXAMPLES\n";
-  for (const std::string& example : verb.options.Examples()) {
-    text += ".PP\n.nf\n" + Troff(example) + "\n.fi\n";
-  }
+  text += ".SH EXAMPLES\n.nf\n";
+  for (const std::string& example : verb.options.Examples()) text += Troff(example) + "\n";
   return text +
-         ".SH EXIT STATUS\n0 for success, 1 when a command failed, 2 for a wrong command "
+         ".fi\n.SH EXIT STATUS\n0 for success, 1 when a command failed, 2 for a wrong command "
          "line or document, 3 when no server answers.\n.SH SEE ALSO\n.BR vexg (1)\n";
 }
 
@@ -122,59 +121,6 @@ std::string VerbAsManual(const Verb* verb) {
     text += ".TP\n.BR vexg\\-" + Troff(each.name) + " (1)\n" + Troff(each.summary) + ".\n";
   }
   return text;
-}
-
-std::string VerbsAsBashCompletion() {
-  const auto longNames = [](const OptionSet& options) {
-    std::string names;
-    for (const OptionSpec& option : options.Options()) {
-      if (!option.IsByPlace()) names += " " + option.Name();
-    }
-    return names;
-  };
-  std::string verbs = longNames(GetGeneralOptions()) + " --help --version", values, options;
-  for (const Verb& verb : GetVerbs()) {
-    verbs += " " + verb.name;
-    options += fmt::format("    {}) words=\"--help{}\" ;;\n", verb.name, longNames(verb.options));
-    for (const OptionSpec& option : verb.options.Options()) {
-      if (option.choices.empty()) continue;
-      // The first argument by its place stands behind the verb.
-      const std::string before = option.IsByPlace() ? verb.name : option.Name();
-      values += fmt::format("    \"{} {}\") words=\"{}\" ;;\n", verb.name, before,
-                            fmt::join(option.choices, " "));
-    }
-  }
-  return R"sh(# Completion of vexg for bash: eval "$(vexg completion bash)"
-_vexg() {
-  local current=${COMP_WORDS[COMP_CWORD]} before=${COMP_WORDS[COMP_CWORD-1]} verb=${COMP_WORDS[1]}
-  local words=
-  if ((COMP_CWORD == 1)); then
-    COMPREPLY=($(compgen -W ")sh" +
-         verbs + R"sh(" -- "$current"))
-    return
-  fi
-  if [[ $current == = ]]; then current=; elif [[ $before == = ]]; then before=${COMP_WORDS[COMP_CWORD-2]}; fi
-  if [[ $verb == help && $current != -* ]]; then
-    words=$("${COMP_WORDS[0]}" commands --names)
-  fi
-  case "$verb $before" in
-)sh" + values +
-         R"sh(  esac
-  if [[ -n $words ]]; then
-    COMPREPLY=($(compgen -W "$words" -- "$current"))
-    return
-  fi
-  case $verb in
-)sh" + options +
-         R"sh(  esac
-  if [[ $current == -* ]]; then
-    COMPREPLY=($(compgen -W "$words" -- "$current"))
-  else
-    COMPREPLY=($(compgen -f -- "$current"))
-  fi
-}
-complete -F _vexg vexg
-)sh";
 }
 
 }  // namespace lumo::host

@@ -12,7 +12,4 @@ std::string VerbsAsJson();
 /// A manual page in the troff language, vexg-NAME(1) of a verb, or vexg(1) for null.
 std::string VerbAsManual(const Verb* verb);
 
-/// A script that has bash complete verbs, options, and the values of those with choices.
-std::string VerbsAsBashCompletion();
-
 }  // namespace lumo::host

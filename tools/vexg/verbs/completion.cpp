@@ -1,8 +1,8 @@
 #include <iostream>
 #include <memory>
 
+#include "options/completion_text.h"
 #include "options/option_values.h"
-#include "options/verb_text.h"
 #include "verb.h"
 
 namespace lumo::host {
@@ -12,10 +12,12 @@ const VerbRegistration registration(
     "completion", "Prints a script with which a shell completes command lines",
     [](OptionSet& line) {
       const auto shell = std::make_shared<std::string>();
+      line.AddNote("A package of vexg installs these scripts where the shells look for them.");
       line.AddExample("eval \"$(vexg completion bash)\"");
-      line.Add("shell", *shell, "The shell").Takes(OneOf({"bash"})).Required();
+      line.AddExample("vexg completion fish | source");
+      line.Add("shell", *shell, "The shell").Takes(OneOf(CompletedShells())).Required();
       return VerbRegistration::Work([shell] {
-        if (*shell == "bash") std::cout << VerbsAsBashCompletion();
+        std::cout << VerbsAsCompletion(*shell);
         return int{kExitSuccess};
       });
     });
