@@ -218,10 +218,13 @@ class Segments(Raster):
         from .vectors import polygonize
 
         found = polygonize(self, progress=progress)
-        parts = {}
-        for label, shape in zip(found.labels.tolist(), found.wkb):
-            parts.setdefault(label, []).append(shape)
-        return [_joined(parts.get(label)) for label in labels.tolist()]
+        shapes = found.wkb
+        order = numpy.argsort(found.labels, kind="stable")
+        places, ordered = order.tolist(), found.labels[order]
+        starts = numpy.searchsorted(ordered, labels, "left").tolist()
+        ends = numpy.searchsorted(ordered, labels, "right").tolist()
+        return [shapes[places[start]] if end - start == 1 else _joined([shapes[place] for place in places[start:end]])
+                for start, end in zip(starts, ends)]
 
     def classify(self, samples=None, *, field=None, layer=None, method="knn", neighbors=5, use=None, rules=None,
                  progress=False):
@@ -513,8 +516,6 @@ def _joined(parts):
     """One WKB shape of some polygons."""
     if not parts:
         return None
-    if len(parts) == 1:
-        return parts[0]
     return b"\x01\x06\x00\x00\x00" + len(parts).to_bytes(4, "little") + b"".join(parts)
 
 
