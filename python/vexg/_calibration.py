@@ -1,116 +1,158 @@
-"""Physical values as formulas, with the arithmetic of the commands that calibrate whole files."""
+"""Physical values: the constants of scenes, and the view of the command that calibrates."""
 
 import math
 import os
+import warnings
 
-from . import _formula, _mtl
 from ._jobs import Draft, Node
 from ._values import type_word
+from ._watch import watch
 from .errors import Error
 
-# The digits of pi that the commands have.
-_PI = "3.141592653589"
-_BANDS = {"gain": "Gain", "offset": "Offset", "irradiance": "SolarIrradiance", "k1": "K1", "k2": "K2"}
+_BANDS = {"gain": "Gain", "offset": "Offset", "irradiance": "SolarIrradiance", "k1": "K1", "k2": "K2",
+          "reflectance_gain": "ReflectanceGain", "reflectance_offset": "ReflectanceOffset"}
 _SCENE = {"sun_elevation": "SunElevation", "distance": "EarthSunDistance"}
 _NEEDED = {
     "radiance": ("gain", "offset"),
     "reflectance": ("gain", "offset", "irradiance", "sun_elevation", "distance"),
     "temperature": ("gain", "offset", "k1", "k2"),
 }
+_OF_RADIANCE = ("gain", "offset", "irradiance", "distance")
+_OF_REFLECTANCE = ("reflectance_gain", "reflectance_offset")
 
 
-def calibrate(raster, quantity, metadata, constants):
+def calibrate(raster, quantity, metadata, metadata_bands, dtype, scale, unit, constants):
     """The raster of a quantity; see Raster.calibrate."""
-    from .raster import FormulaRaster
-
     if quantity not in _NEEDED:
         raise ValueError(f"{quantity!r} is none of {', '.join(_NEEDED)}")
-    known = {*_BANDS, *_SCENE, "scale", "dtype", "metadata_bands"}
     for name in constants:
-        if name not in known:
-            raise TypeError(f"there is no constant {name!r}; there are {', '.join(sorted(known))}")
-    scale = float(constants.pop("scale", 1.0))
-    word = type_word(constants.pop("dtype", "float32"))
-    metadata_bands = constants.pop("metadata_bands", None)
-    if metadata is not None:
-        told = (_mtl.constants_of(metadata, metadata_bands, raster.count) if _mtl.is_mtl(metadata)
-                else constants_of(metadata, raster._door))
-        constants = {**told, **constants}
-    missing = [name for name in _NEEDED[quantity] if name not in constants]
+        if name not in _BANDS and name not in _SCENE:
+            raise TypeError(f"there is no constant {name!r}; there are {', '.join((*_BANDS, *_SCENE))}")
+    if metadata_bands is not None and metadata is None:
+        raise TypeError("metadata_bands goes with metadata")
+    constants = {name: value for name, value in constants.items() if value is not None}
+    told = {} if metadata is None else _told(raster, quantity, metadata, metadata_bands, constants)
+    needed = _needed(quantity, constants, told)
+    taken = {**told, **constants}
+    missing = [name for name in needed if name not in taken]
     if missing:
-        raise Error(f"{quantity} needs {', '.join(missing)}, which "
-                    + ("are not given" if metadata is None else f"{metadata} does not tell"))
-    count = raster.count
-    bands = {name: _for_bands(name, constants[name], count) for name in _NEEDED[quantity] if name in _BANDS}
-    formulas = []
-    for band, parts in enumerate(raster._parts()):
-        values = {name: _text(all_bands[band]) for name, all_bands in bands.items()}
-        radiance = ("(", *parts, f" * {values['gain']} + {values['offset']})")
-        formulas.append(_of_band(quantity, radiance, values, constants, scale))
-    return FormulaRaster(formulas, raster._door, word)
+        raise Error(_why_missing(quantity, missing, metadata, told))
+    values = {name: _for_bands(name, taken[name], raster.count, told.get("names")) if name in _BANDS
+              else float(taken[name]) for name in needed}
+    _check(values)
+    inputs = {"Quantity": quantity.capitalize()}
+    for name, value in values.items():
+        # Without irradiances gains and offsets make reflectance.
+        input = {**_BANDS, **_SCENE}[name]
+        inputs[input.removeprefix("Reflectance") if name in _OF_REFLECTANCE else input] = value
+    if quantity == "temperature":
+        inputs["Unit"] = str(unit).capitalize()
+    inputs.update({"ScaleFactor": float(scale), "DataType": type_word(dtype)})
+    return raster._view("CreateCalibratedRasterCommand", inputs)
 
 
-def _of_band(quantity, radiance, values, constants, scale):
-    if quantity == "radiance":
-        value = (f"{_text(scale)} * ", *radiance)
-    elif quantity == "reflectance":
-        elevation = float(constants["sun_elevation"])
-        if not 0 < elevation <= 90:
-            raise ValueError("sun_elevation: the sun stands 0 to 90 degrees above the horizon, and not on it")
-        if not float(constants["distance"]) > 0 or not float(values["irradiance"].strip("()")) > 0:
+def _needed(quantity, constants, told):
+    """The names of the constants that the quantity is computed of: where metadata have factors that make
+    reflectance, and nothing is given that goes with radiance, these."""
+    if quantity != "reflectance":
+        return _NEEDED[quantity]
+    own = [name for name in _OF_REFLECTANCE if name in constants]
+    others = [name for name in _OF_RADIANCE if name in constants]
+    if own and others:
+        raise TypeError(f"{own[0]} goes without {others[0]}")
+    if not own and (others or "reflectance_gain" not in told):
+        return _NEEDED[quantity]
+    if told.get("is_sun_in"):
+        if "sun_elevation" in constants:
+            raise TypeError("sun_elevation is in the reflectances of the metadata")
+        return _OF_REFLECTANCE
+    return (*_OF_REFLECTANCE, "sun_elevation")
+
+
+def _why_missing(quantity, missing, metadata, told):
+    if metadata is None:
+        return f"{quantity} needs {', '.join(missing)}, which are not given"
+    if told.get("doubt"):
+        names = told.get("names")
+        return f"{metadata}: {told['doubt']}" + (
+            f"; metadata_bands says which of {', '.join(names)} these are" if names else "")
+    return f"{metadata} does not tell {', '.join(missing)}, which {quantity} needs"
+
+
+def _check(values):
+    if not 0 < values.get("sun_elevation", 90) <= 90:
+        raise ValueError("sun_elevation: the sun stands 0 to 90 degrees above the horizon, and not on it")
+    for value in (values.get("distance", 1.0), *values.get("irradiance", ())):
+        if not value > 0:
             raise ValueError("distance and irradiance are above 0")
-        divisor = math.sin(elevation * math.pi / 180.0) * float(values["irradiance"])
-        distance = _text(constants["distance"])
-        value = ("(", *radiance, f" * {_PI} * {distance} * {distance} * {_text(scale)}) / {_text(divisor)}")
-    else:
-        value = (f"{values['k2']} / log({values['k1']} / ", *radiance, f" + 1.0) * {_text(scale)}")
-    return ("where(", *radiance, " > 0, ", *value, ", 0)")
 
 
-def _text(number):
-    return _formula._number_parts(number)[0]
-
-
-def _for_bands(name, value, count):
+def _for_bands(name, value, count, bands):
     """A value for each band; one number counts for all."""
-    values = [float(value)] * count if isinstance(value, (int, float)) else [float(each) for each in value]
+    values = [float(each) for each in value] if hasattr(value, "__len__") else [float(value)]
     if len(values) == 1:
         values *= count
     if len(values) != count:
         raise ValueError(f"{name}: there are {len(values)} values for {count} bands")
+    for band, each in enumerate(values):
+        if not math.isfinite(each):
+            raise Error(f"{name} of band {bands[band] if bands and len(bands) == count else band} is not known")
     return values
+
+
+def _told(raster, quantity, metadata, bands, constants):
+    """The constants that metadata tell for the bands of a raster, by their names here, with names, the
+    bands that they are of, and doubt, why these aren't known."""
+    draft = Draft()
+    draft.step("constants", "GetMetadataCalibrationCommand", {
+        "URI": Node("CreateMetadataCommand", (("ConnStr", _metadata_source(metadata)),)),
+        "RasterURI": raster._chain(), "Quantity": quantity.capitalize(),
+        "Bands": None if bands is None else [str(band) for band in bands],
+        "SunElevation": constants.get("sun_elevation") if quantity == "radiance" else None})
+    found = watch(lambda task: raster._door.run(draft, task)).values("constants")
+    if found.get("Warning"):
+        warnings.warn(f"{metadata}: {found['Warning']}", stacklevel=5)
+    told = {name: found[output].tolist() for name, output in _BANDS.items() if output in found}
+    told.update({name: found[output] for name, output in _SCENE.items() if output in found})
+    return {**told, "names": found.get("BandNames"), "doubt": found.get("Doubt"),
+            "is_sun_in": found.get("ReflectanceSun", False)}
 
 
 _FORMATS = {
     ".imd": "DGIMD", ".rpb": "DGRPB", ".til": "DGTIL", ".tif": "TIFF", ".tiff": "TIFF", ".img": "Erdas",
     ".grb": "GRIB", ".grb2": "GRIB", ".grib": "GRIB", ".grib2": "GRIB", ".hdr": "ORVA",
 }  # fmt: skip
+_XML = {
+    b"<Rational_Function_Model": "PLEIADESRPC", b"<Dimap_Document": "PLEIADESDIM", b"<LANDSAT_METADATA_FILE": "LANDSAT",
+    b"Level-1C_User_Product": "SENTINEL2", b"Level-2A_User_Product": "SENTINEL2", b"Level-1C_Tile_ID": "SENTINEL2",
+    b"Level-2A_Tile_ID": "SENTINEL2", b"FeatureCollection": "GML",
+}  # fmt: skip
 
 
 def _metadata_source(text):
-    """The connection strings of a header: FORMAT:FILE, or a name that tells the format."""
+    """The connection strings of metadata: FORMAT:FILE, or a name that tells the format, as
+    `vexg calibrate --from-metadata` takes them."""
     text = os.fspath(text)
     format, colon, file = text.partition(":")
-    if colon and format.isupper() and format.isalnum():
-        return f"{format}|{os.path.abspath(file)}"
-    ending = os.path.splitext(text)[1].lower()
-    format = _FORMATS.get(ending)
-    if ending in (".xml", ".gml"):
-        with open(text, "rb") as head:
-            start = head.read(1 << 16)
-        format = ("PLEIADESRPC" if b"<Rational_Function_Model" in start else
-                  "PLEIADESDIM" if b"<Dimap_Document" in start else "GML" if b"FeatureCollection" in start else None)
+    if not (colon and format.isupper() and format.isalnum()):
+        format, file = _format_of(text), text
     if format is None:
         raise Error(f"{text}: the name doesn't tell what metadata these are; write FORMAT:FILE, such as DGIMD:{text}")
-    return f"{format}|{os.path.abspath(text)}"
+    if format == "ORVA" and not file.lower().endswith(".hdr") and os.path.exists(file + ".hdr"):
+        file += ".hdr"
+    return f"{format}|{os.path.abspath(file)}"
 
 
-def constants_of(metadata, door):
-    """The constants that the header of a scene tells, by their names here."""
-    node = Node("CreateMetadataCommand", (("ConnStr", _metadata_source(metadata)),))
-    draft = Draft()
-    draft.step("constants", "GetMetadataCalibrationCommand", {"URI": node})
-    found = door.run(draft).values("constants")
-    constants = {name: found[output].tolist() for name, output in _BANDS.items() if output in found}
-    constants.update({name: found[output] for name, output in _SCENE.items() if output in found})
-    return constants
+def _format_of(file):
+    if file.lower().endswith(("mtl.txt", "mtl.json")):
+        return "LANDSAT"
+    ending = os.path.splitext(file)[1].lower()
+    format = _FORMATS.get(ending)
+    if ending in (".xml", ".gml"):
+        try:
+            with open(file, "rb") as head:
+                start = head.read(1 << 16)
+        except OSError as fault:
+            raise Error(f"{file}: {fault.strerror}") from None
+        format = next((word for mark, word in _XML.items() if mark in start), None)
+    return format or ("ORVA" if os.path.exists(file + ".hdr") else None)

@@ -189,13 +189,6 @@ def _build(operands, join):
     return raster.FormulaRaster(formulas, raster.door_of(rasters))
 
 
-def cast(source, dtype):
-    """The raster with pixels of another type."""
-    from .raster import FormulaRaster
-
-    return FormulaRaster(source._parts(), source._door, _values.type_word(dtype))
-
-
 def node_of(formulas, type_word):
     """The node of the expressions of some formulas."""
     sources = {}

@@ -5,7 +5,6 @@ import json
 import os
 import threading
 import weakref
-import xml.etree.ElementTree as ElementTree
 
 import numpy
 
@@ -264,6 +263,8 @@ class Results:
     """The results of a job by the names of its steps."""
 
     def __init__(self, document, draft):
+        import xml.etree.ElementTree as ElementTree  # not needed before the first job
+
         self._draft = draft
         self._returns = {}
         failed = None

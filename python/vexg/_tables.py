@@ -140,8 +140,25 @@ def geo_table(columns, wkb, crs):
         import geopandas
     except ImportError:
         return table({**columns, "geometry": wkb}, None)
-    shapes = geopandas.GeoSeries.from_wkb(wkb, crs=crs)
+    shapes = geopandas.GeoSeries(_shapes_of(wkb), crs=crs)
     return geopandas.GeoDataFrame(columns, geometry=shapes)
+
+
+def _shapes_of(wkb):
+    """The shapes of WKB; None for None."""
+    import geopandas
+    import shapely
+
+    if int(shapely.__version__.partition(".")[0]) >= 2 or geopandas.options.use_pygeos:
+        return geopandas.array.from_wkb(numpy.array([*wkb, None], dtype=object)[:-1])
+    # Before 2.0 its function makes a reader for each shape, which takes longer than the shape.
+    from shapely.geos import WKBReader, lgeos
+
+    read = WKBReader(lgeos).read
+    shapes = numpy.empty(len(wkb), dtype=object)
+    for i, shape in enumerate(wkb):  # one by one: numpy takes shapes of several parts for sequences
+        shapes[i] = None if shape is None else read(shape)
+    return geopandas.array.GeometryArray(shapes)
 
 
 def labelled(labels, columns):

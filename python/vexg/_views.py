@@ -4,11 +4,13 @@ import os
 
 import numpy
 
-from . import _formula, _values
+from . import _values
 from ._doors import job_node
 from ._jobs import Draft, Node
 from ._pixels import rect_of
 from .errors import Error
+
+_KERNELS = ("Nearest", "Linear", "Cubic", "Lanczos", "Average", "Mode", "Min", "Max", "Median")
 
 
 class Views:
@@ -141,7 +143,25 @@ class Views:
         fit are not valid."""
         if numpy.dtype(dtype) == self.dtype:
             return self
-        return _formula.cast(self, dtype)
+        return self._view("CreateConvertedRasterCommand", {"DataType": _values.type_word(dtype)})
+
+    def scale(self, low, high, to=None, *, dtype=None):
+        """Shows it with the values from low to high carried to another range; what lies outside is cut to
+        that.
+
+        Args:
+            to: the ends of the other range; by default all that an integer type holds, or 0 and 1.
+            dtype: of the result; that of the raster by default.
+        """
+        ends = [float(low), float(high)] + ([] if to is None else [float(end) for end in to])
+        if low == high or len(ends) not in (2, 4):
+            raise ValueError("scale takes the two ends of a range, and those of another one")
+        return self._view("CreateConvertedRasterCommand", {
+            "Scale": ends, "DataType": _values.type_word(self.dtype if dtype is None else dtype)})
+
+    def unscale(self, dtype="float32"):
+        """Shows the values that its pixels stand for by the scales and offsets of its bands."""
+        return self._view("CreateConvertedRasterCommand", {"Unscale": "1", "DataType": _values.type_word(dtype)})
 
     def real(self):
         """Shows the real parts of complex pixels."""
@@ -166,12 +186,16 @@ class Views:
             to: "EPSG:n", WKT or a PROJ text.
             like: a raster whose grid it gets, in place of `to`.
             pixel_size: in units of the system; by default there are about as many pixels.
-            resampling: "nearest", "linear" or "cubic".
+            resampling: "nearest"; "linear", "cubic" or "lanczos", which are stretched over the area that a
+                pixel covers; "average", "mode", "min", "max" or "median" of the pixels in that.
             method: "polynomial", within an eighth of a pixel, or "rigorous".
             nodata: of the result; by default the source's.
         """
         if (to is None) == (like is None):
             raise TypeError("warp takes either a coordinate system or a raster with a grid")
+        kernel = "Linear" if resampling == "bilinear" else str(resampling).capitalize()
+        if kernel not in _KERNELS:
+            raise ValueError(f"resampling is one of {', '.join(_KERNELS).lower()}, and not {resampling!r}")
         if like is not None:
             reference = like._describe()["geoRef"]
             grid = reference["text"] if reference and reference["transform"] else None
@@ -184,7 +208,7 @@ class Views:
             grid = self._door.run(draft).text("grid", "GeoRef")
         return self._view("CreateProjectedRasterCommand", {
             "GeoRef": grid, "ReprojectionMethod": method.capitalize(),
-            "ResamplingMethod": resampling.capitalize(), "Grid": "Exact", "Sampling": "Centred",
+            "ResamplingMethod": "Nearest", "Kernel": kernel, "Grid": "Exact",
             "NoData": nodata})
 
     def reflectance(self, **constants):
@@ -196,20 +220,47 @@ class Views:
         return self.calibrate("radiance", **constants)
 
     def temperature(self, **constants):
-        """Shows brightness temperature in kelvin; see calibrate for the constants."""
+        """Shows brightness temperature; see calibrate for the constants."""
         return self.calibrate("temperature", **constants)
 
-    def calibrate(self, quantity, *, metadata=None, **constants):
+    def calibrate(self, quantity, *, metadata=None, metadata_bands=None, dtype="float32", scale=1.0, unit="kelvin",
+                  **constants):
         """Shows a physical quantity: "radiance", "reflectance" or "temperature". The values are those
-        of the commands that calibrate whole files, and are computed where they are read.
+        of the command that calibrates whole files, and are computed where they are read.
 
         Args:
-            metadata: the header of the scene, from which constants are taken that are not given: the MTL of
-                a Landsat scene, or one that `vexg calibrate --from-metadata` takes.
+            metadata: the metadata of the scene, from which constants are taken that are not given: the MTL
+                of a Landsat scene, MTD_MSIL1C.xml of a Sentinel-2 product, and all else that
+                `vexg calibrate --from-metadata` takes (docs/metadata.md).
+            metadata_bands: which bands of the metadata those of the raster are, such as [4, 3, 2], where
+                neither names nor their number tell it.
+            dtype: of the result. Values for integers are cut and keep their low bits; astype rounds them, and
+                marks those that don't fit.
+            scale: a factor on the result.
+            unit: of temperatures: "kelvin" or "celsius".
             constants: gain, offset, irradiance, k1, k2 (a number, or one for each band), sun_elevation in
-                degrees, distance in astronomical units, scale; metadata_bands, the numbers of the bands in
-                an MTL where that has more.
+                degrees, distance in astronomical units; reflectance_gain and reflectance_offset in place of
+                gain, offset, irradiance and distance.
         """
         from . import _calibration
 
-        return _calibration.calibrate(self, quantity, metadata, constants)
+        return _calibration.calibrate(self, quantity, metadata, metadata_bands, dtype, scale, unit, constants)
+
+    def compare_grid(self, other):
+        """Tells how its grid lies in that of another raster: a dictionary with same_size, same_system, and,
+        where both have a place that can be carried from one to the other, shift (sample and line of the other
+        at which its upper left corner lies), scale (pixels of the other for each of its own, across and down),
+        rotation in degrees, clockwise, and largest_offset: how many pixels of the other a place is off at most
+        where pixels are taken by their sample and line. None stands for what can't be told."""
+        from .raster import door_of
+
+        draft = Draft()
+        draft.step("grids", "CompareRasterGridsCommand",
+                   {"URI": job_node(self._chain()), "OtherURI": job_node(other._chain())})
+        found = door_of([self, other]).run(draft).values("grids")
+
+        def pair(name):
+            return (found[name + "X"], found[name + "Y"]) if name + "X" in found else None
+
+        return {"same_size": found["SameSize"], "same_system": found["SameSystem"], "shift": pair("Shift"),
+                "scale": pair("Scale"), "rotation": found.get("Rotation"), "largest_offset": found.get("LargestOffset")}

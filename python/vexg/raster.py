@@ -2,6 +2,7 @@
 
 import math
 import os
+import warnings
 
 import numpy
 
@@ -240,6 +241,13 @@ class FormulaRaster(Raster):
     def _parts(self):
         return self._formulas if self._type_word in ("Single", "Double") else super()._parts()
 
+    def astype(self, dtype):
+        # A formula of another type, so that nothing is rounded twice.
+        is_same = self._type_word == _values.type_word(dtype)
+        if is_same or self._type_word not in ("Single", "Double"):
+            return super().astype(dtype)
+        return FormulaRaster(self._formulas, self._door, _values.type_word(dtype))
+
     def _chain(self):
         if self._node is None:
             self._node = _formula.node_of(self._formulas, self._type_word)
@@ -350,8 +358,27 @@ def stack(*rasters, dtype=None):
         raise Error(f"the rasters have different lines and samples: {sorted(sizes)}")
     wanted = numpy.dtype(dtype) if dtype is not None else numpy.result_type(*(r.dtype for r in rasters))
     rasters = [raster.astype(wanted) for raster in rasters]
-    return Raster(Node("CreateBandStackRasterCommand", (("SrcURI", tuple(r._chain() for r in rasters)),)),
-                  door_of(rasters))
+    _question_places(rasters)
+    return Raster(Node("CreateBandStackRasterCommand", (
+        ("SrcURI", tuple(raster._chain() for raster in rasters)), ("Bands", "Exact"))), door_of(rasters))
+
+
+def _question_places(rasters):
+    """Warns where a raster lies elsewhere than the first one by more than a tenth of a pixel."""
+    first = rasters[0]
+    _, lines, samples = first.shape
+    corners = numpy.array([(1, 0, 0), (1, samples, 0), (1, 0, lines)])
+    if first._grid() is None:
+        return
+    x0, xx, xy, y0, yx, yy = first._grid()
+    for number, raster in enumerate(rasters[1:], 1):
+        if raster._grid() is None:
+            continue
+        difference = corners @ (numpy.array(raster._grid()) - first._grid()).reshape(2, 3).T
+        off = numpy.abs(difference @ numpy.linalg.inv(numpy.array([[xx, xy], [yx, yy]])).T).max()
+        if off > 0.1 or raster.crs != first.crs:
+            warnings.warn(f"raster {number} of the stack lies elsewhere than the first one; warp carries it there",
+                          stacklevel=4)
 
 
 def door_of(rasters):

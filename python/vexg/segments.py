@@ -5,9 +5,9 @@ import os
 
 import numpy
 
-from . import _tables
+from . import _tables, _values
 from ._doors import job_node
-from ._jobs import Draft, named_inputs
+from ._jobs import Draft, Node, named_inputs
 from ._watch import watch
 from ._workspace import Workspace
 from .errors import Error
@@ -105,6 +105,55 @@ class Segments(Raster):
     def _saved_as(self, made):
         return Segments(made._node, self.image, self.tree)
 
+    def _tree(self):
+        if self.tree is None:
+            raise Error("there is no tree of these segments; segment(tree=True) keeps one")
+        return self.tree
+
+    def cut(self, value=None, *, percent=None):
+        """Shows the segments that its tree has at another cost, those of segment with this merge_value; nothing
+        is segmented again.
+
+        Args:
+            value: the cost up to which segments are merged; 0 for the basins themselves.
+            percent: the percentage of all merges to do, in place of `value`.
+        """
+        if (value is None) == (percent is None):
+            raise TypeError("cut takes either a value or percent")
+        if not (percent is None or 0 <= percent <= 100) or not (value is None or value >= 0):
+            raise ValueError("costs are not below 0, and percentages 0 to 100")
+        name, number = ("MergeValue", value) if percent is None else ("MergePercent", percent)
+        inputs = (("Tree", self._tree()), (name, _values.number_text(float(number))))
+        node = Node("CreateTreeLabelsRasterCommand", inputs)
+        node.keep, node.recipe = self._node.keep, self._node.recipe
+        return Segments(node, self.image, self.tree)
+
+    def levels(self, values):
+        """The segments of its tree at several costs, in ascending order: a list of Segments, and a DataFrame
+        with a row for each segment of each level: level from 1 on, cost, segment, its pixels, and the segment
+        of the next level that it lies in."""
+        values = [float(value) for value in values]
+        if not values or sorted(set(values)) != values or values[0] < 0:
+            raise ValueError("levels takes costs in ascending order")
+        workspace = Workspace()
+        file = workspace.path("levels.csv")
+        draft = Draft()
+        draft.step("levels", "CreateTreeLevelsTableCommand", {"Tree": self._tree(), "MergeValues": values, "Table": file})
+        watch(lambda task: self._door.run(draft, task))
+        return [self.cut(value) for value in values], _tables.read_csv(file)
+
+    def suggest(self, least_prominence=0.1):
+        """Finds costs at which its segments are likely to be whole objects (docs/segmentation.md): a
+        Suggestion.
+
+        Args:
+            least_prominence: peaks are left out whose prominence is a smaller share of the highest, 0 to 1.
+        """
+        draft = Draft()
+        draft.step("scales", "SuggestSegmentScalesCommand",
+                   {"Tree": self._tree(), "LeastProminence": float(least_prominence)})
+        return Suggestion(watch(lambda task: self._door.run(draft, task)).values("scales"))
+
     def attributes(self, *kinds, bands=None, kernel=3, geometry=None, progress=False):
         """What its segments are like: a DataFrame with a row for each label, or a list of dictionaries;
         docs/attributes.md has the formulas.
@@ -169,10 +218,13 @@ class Segments(Raster):
         from .vectors import polygonize
 
         found = polygonize(self, progress=progress)
-        parts = {}
-        for label, shape in zip(found.labels.tolist(), found.wkb):
-            parts.setdefault(label, []).append(shape)
-        return [_joined(parts.get(label)) for label in labels.tolist()]
+        shapes = found.wkb
+        order = numpy.argsort(found.labels, kind="stable")
+        places, ordered = order.tolist(), found.labels[order]
+        starts = numpy.searchsorted(ordered, labels, "left").tolist()
+        ends = numpy.searchsorted(ordered, labels, "right").tolist()
+        return [shapes[places[start]] if end - start == 1 else _joined([shapes[place] for place in places[start:end]])
+                for start, end in zip(starts, ends)]
 
     def classify(self, samples=None, *, field=None, layer=None, method="knn", neighbors=5, use=None, rules=None,
                  progress=False):
@@ -202,6 +254,29 @@ class Segments(Raster):
         watch(work.make, progress, "classes")
         workspace.parts.append(records.workspace)
         return Classes(workspace.source("classes.tif", [records.draft, work.draft]), self._door, work.names)
+
+
+class Suggestion:
+    """Costs for Segments.cut at which segments are likely to be whole objects.
+
+    Attributes:
+        peaks: costs at which the local variance begins to change less with scale, the most prominent first.
+        onsets: for each peak the cost in front of it at which its objects are whole yet.
+        prominences: how far the rate falls on both sides of each peak, in percent.
+        table: a DataFrame with a row for each cost: how many segments there are, their local variance, and the
+            rate at which that changes.
+    """
+
+    def __init__(self, found):
+        def list_of(name):
+            return numpy.asarray(found.get(name, ()), dtype=float).ravel().tolist()
+
+        self.peaks, self.onsets, self.prominences = (list_of(name) for name in ("Peaks", "Onsets", "Prominences"))
+        self.table = _tables.table({"value": list_of("MergeValues"), "segments": [int(n) for n in list_of("Segments")],
+                                    "local_variance": list_of("LocalVariance"), "rate": list_of("Rates")}, None)
+
+    def __repr__(self):
+        return f"<vexg.Suggestion of {len(self.peaks)} costs: {', '.join(f'{value:.4g}' for value in self.peaks[:5])}>"
 
 
 class _Records:
@@ -441,8 +516,6 @@ def _joined(parts):
     """One WKB shape of some polygons."""
     if not parts:
         return None
-    if len(parts) == 1:
-        return parts[0]
     return b"\x01\x06\x00\x00\x00" + len(parts).to_bytes(4, "little") + b"".join(parts)
 
 

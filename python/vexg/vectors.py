@@ -2,6 +2,7 @@
 
 import os
 import pathlib
+import struct
 
 import numpy
 
@@ -32,7 +33,7 @@ class Polygons:
         self.crs = raster.crs
 
     def _find(self):
-        """The labels and the rings of all polygons."""
+        """The labels of all polygons, and what wkb_of takes."""
         if self._found is None:
             workspace = Workspace()
             file = workspace.path("areas.fxv")
@@ -52,15 +53,15 @@ class Polygons:
     @property
     def wkb(self):
         """The polygons as WKB, in the order of their labels, each a bytes object."""
-        return wkb_of(self._find()[1], self._raster._grid())
+        data, offsets = self.wkb_column()
+        ends = offsets.tolist()
+        return [data[start:end] for start, end in zip(ends, ends[1:])]
 
     def wkb_column(self):
         """The polygons as WKB in one piece, as columns of Arrow have them: the bytes, and an array of one
         offset more than there are polygons, between which each lies."""
-        shapes = self.wkb
-        offsets = numpy.zeros(len(shapes) + 1, dtype="int64")
-        numpy.cumsum([len(shape) for shape in shapes], out=offsets[1:])
-        return b"".join(shapes), offsets
+        _, *rings = self._find()
+        return wkb_of(*rings, self._raster._grid())
 
     @property
     def __geo_interface__(self):
@@ -109,56 +110,64 @@ def polygonize(raster, *, band=0, min_size=None, progress=False):
 
 
 def read_fxv(file):
-    """The polygons of an FXV file (docs/file-formats.md): their labels, and for each its rings as arrays
-    of x and y in pixels, the outer one first."""
+    """The polygons of an FXV file (docs/file-formats.md): their labels, how many rings each has, how many
+    vertices each ring has, the outer one of a polygon first, and the x and y of all vertices, in pixels."""
     data = pathlib.Path(file).read_bytes()
     if data[:5] != b"FXV50":
         raise Error(f"{file}: is no file of polygons")
     order = ">" if data[5] else "<"
-    words = order + "i4"
-    (count,) = numpy.frombuffer(data, words, 1, 10)
-    labels = numpy.empty(int(count), dtype="int64")
-    shapes, at = [], 1024
-    for i in range(int(count)):
-        label, rings, numbers = numpy.frombuffer(data, words, 3, at).tolist()
-        at += 12 + rings
-        if rings == 1:
-            starts = None
+    head, view, at = struct.Struct(order + "3i").unpack_from, memoryview(data), 1024
+    (count,) = struct.unpack_from(order + "i", data, 10)
+    labels, rings, sizes, pieces = [], [], [], []
+    for _ in range(count):
+        label, ring_count, numbers = head(data, at)
+        labels.append(label)
+        rings.append(ring_count)
+        at += 12 + ring_count
+        if ring_count == 1:
+            sizes.append(numbers >> 1)
         else:
-            starts = numpy.frombuffer(data, words, rings, at)[1:]
-        at += 4 * rings
-        points = numpy.frombuffer(data, words, numbers, at).reshape(-1, 2)
+            starts = struct.unpack_from(f"{order}{ring_count}i", data, at)
+            sizes.extend(end - start for start, end in zip(starts, (*starts[1:], numbers >> 1)))
+        at += 4 * ring_count
+        pieces.append(view[at:at + 4 * numbers])
         at += 4 * numbers
-        labels[i] = label
-        shapes.append([points] if starts is None else numpy.split(points, starts))
-    return labels, shapes
+    points = numpy.frombuffer(b"".join(pieces), order + "i4").reshape(-1, 2)
+    return numpy.array(labels, dtype="int64"), numpy.array(rings, dtype="int64"), numpy.array(sizes, dtype="int64"), points
 
 
-def wkb_of(shapes, grid):
-    """Polygons as WKB (OGC 06-103r4, clause 8).
+def wkb_of(rings, sizes, points, grid):
+    """Polygons as WKB in one piece (OGC 06-103r4, clause 8), and the offsets of each and of the end.
 
     Args:
-        shapes: for each its rings as arrays of x and y in pixels.
+        rings: how many each polygon has.
+        sizes: how many vertices each ring has.
+        points: x and y of all vertices in pixels.
         grid: the six numbers of a grid; None to keep pixels.
     """
-    if not shapes:
-        return []
+    if len(rings) == 0:
+        return b"", numpy.zeros(1, dtype="int64")
     x0, xx, xy, y0, yx, yy = grid if grid is not None else (0, 1, 0, 0, 0, 1)
-    points = numpy.concatenate([ring for rings in shapes for ring in rings]).astype(float)
+    points = points.astype(float)
     x, y = points[:, 0].copy(), points[:, 1]
     points[:, 1] = y0 + yx * x + yy * y if yx else y0 + yy * y
     points[:, 0] = x0 + xx * x + xy * y if xy else x0 + xx * x
+    # A ring begins with its size, the first of a polygon behind the polygon's head of nine bytes.
+    first = numpy.cumsum(rings) - rings
+    heads = numpy.zeros(len(sizes), dtype=[("order", "u1"), ("kind", "<u4"), ("rings", "<u4"), ("size", "<u4")])
+    heads["order"], heads["kind"], heads["size"] = 1, 3, sizes
+    heads["rings"][first] = rings
+    is_first = numpy.zeros(len(sizes), dtype=bool)
+    is_first[first] = True
     coordinates = memoryview(points.astype("<f8", copy=False).tobytes())
-    found, at = [], 0
-    for rings in shapes:
-        pieces = [b"\x01\x03\x00\x00\x00", len(rings).to_bytes(4, "little")]
-        for ring in rings:
-            size = 16 * len(ring)
-            pieces.append(len(ring).to_bytes(4, "little"))
-            pieces.append(coordinates[at:at + size])
-            at += size
-        found.append(b"".join(pieces))
-    return found
+    head_bytes, pieces, at = heads.tobytes(), [], 0
+    for ring, (begins, size) in enumerate(zip(is_first.tolist(), (16 * sizes).tolist())):
+        pieces.append(head_bytes[13 * ring + (0 if begins else 9):13 * ring + 13])
+        pieces.append(coordinates[at:at + size])
+        at += size
+    lengths = 16 * sizes + numpy.where(is_first, 13, 4)
+    offsets = numpy.concatenate([[0], numpy.cumsum(lengths)])
+    return b"".join(pieces), offsets[numpy.append(first, len(sizes))]
 
 
 def _options(command, options):

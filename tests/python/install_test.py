@@ -34,6 +34,27 @@ class DeclarationsTest(unittest.TestCase):
             self.assertIn(f" {name}(", header.replace("*", " "))
 
 
+@unittest.skipUnless(shutil.which("abidiff") and shutil.which("cc"), "abigail-tools is not installed")
+class InterfaceTest(FolderTest):
+    def test_the_c_interface_is_that_of_programs_that_are_there(self):
+        header = (SOURCE / "src" / "c" / "vexg.h").read_text()
+        free = "VEXG_C_EXPORT void vexg_free(char* text);"
+        cases = (("as it is", free, free, 0), ("function added", free, free + "\nVEXG_C_EXPORT int vexg_new(int a);", 0),
+                 ("function gone", free, "", 1), ("argument", "int threads,", "long threads,", 1),
+                 ("result", "int vexg_close(", "char* vexg_close(", 1), ("member", "uint64_t size;", "uint32_t size;", 1),
+                 ("order of members", "left, top, right", "top, left, right", 1),
+                 ("constant", "VEXG_BSQ = 2", "VEXG_BSQ = 3", 1), ("number", "#define VEXG_ABI 1", "#define VEXG_ABI 2", 1))
+        for name, old, new, status in cases:
+            with self.subTest(name):
+                self.assertIn(old, header)
+                file = self.folder / "vexg.h"
+                file.write_text(header.replace(old, new))
+                done = subprocess.run([sys.executable, SOURCE / "scripts" / "abi", "--header", file], text=True,
+                                      stdout=subprocess.PIPE, stderr=subprocess.STDOUT)
+                self.assertEqual(done.returncode, status, done.stdout)
+                self.assertEqual("differs from vexg.abixml" in done.stdout, status == 1)
+
+
 @needs_data
 @needs("build", "wheel", "setuptools", "venv", "pip")
 @unittest.skipIf(os.environ.get("VEXG_SANITIZE"), "a sanitizer would have to be in Python too")

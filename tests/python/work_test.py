@@ -204,6 +204,14 @@ class SavingTest(FolderTest):
         self.assertEqual(self.left(), ["a.dat", "a.dat.hdr", "a.tif", "b.tif", "d.dat", "d.dat.hdr"])
 
     def test_options_of_the_format(self):
+        sizes = {}
+        for compress in ("none", "deflate", "ZSTD"):
+            file = self.folder / f"{compress}.tif"
+            cog = vexg.open(SCENE).save(file, cog=True, compress=compress, predictor="auto")
+            numpy.testing.assert_array_equal(cog.read(), vexg.open(SCENE).read())
+            self.assertIn(b"LAYOUT=IFDS_BEFORE_DATA", file.read_bytes()[:400])
+            sizes[compress] = file.stat().st_size
+        self.assertLess(max(sizes["deflate"], sizes["ZSTD"]), 0.9 * sizes["none"])
         made = vexg.open(SCENE).save(self.folder / "a.dat", interleave="bsq")
         self.assertEqual(made._describe()["interleave"], "BSQ")
 
@@ -260,6 +268,42 @@ class ObjectsTest(FolderTest):
             vexg.open(SCENE).segment(minimal_size=3)
         again = pickle.loads(pickle.dumps(segments))
         numpy.testing.assert_array_equal(again.read(), segments.read())
+
+    def test_a_tree_has_the_segments_of_all_costs(self):
+        scene = vexg.open(SCENE)
+        segments = scene.segment(merge_value=100, tree=True)
+        counts = []
+        cuts, table = segments.levels([50, 300, 900])
+        for value, cut in zip((50, 300, 900), cuts):
+            numpy.testing.assert_array_equal(cut.read(), scene.segment(merge_value=value).read())
+            counts.append(int(cut.read().max()))
+        rows = rows_of(table)
+        for level, cut in enumerate(cuts, 1):
+            here = [row for row in rows if row["level"] == level]
+            numpy.testing.assert_array_equal([row["pixels"] for row in here], numpy.bincount(cut.read().ravel())[1:])
+        low, high = cuts[0].read(0), cuts[1].read(0)
+        parents = {row["segment"]: row["parent"] for row in rows if row["level"] == 1}
+        self.assertTrue(all(parents[low[at]] == high[at] for at in numpy.ndindex(40, 30)))
+        numpy.testing.assert_array_equal(segments.cut(percent=100).read().max(), scene.segment(merge=100).read().max())
+        found = segments.suggest()
+        self.assertEqual(len(found.peaks), len(found.onsets))
+        for row in rows_of(found.table)[::20]:
+            self.assertEqual(int(segments.cut(row["value"]).read().max()), row["segments"])
+        # A cut outlives the segments whose tree it is of, and goes into documents.
+        cut = segments.cut(300)
+        job = vexg.job(cut, self.folder / "cut.tif", folder=self.folder)
+        job.save(self.folder / "cut.xml")
+        del segments, cuts
+        vexg.open(SCENE)
+        self.assertEqual(len(rows_of(cut.attributes("shape", geometry=False))), counts[1])
+        want = cut.read()
+        ran = subprocess.run([VEXG, "run", self.folder / "cut.xml"], capture_output=True, text=True)
+        self.assertEqual(ran.returncode, 0, ran.stderr)
+        numpy.testing.assert_array_equal(vexg.open(self.folder / "cut.tif").read(), want)
+        for kind, call in ((vexg.Error, lambda: scene.segment(merge=90).cut(1)), (TypeError, lambda: cut.cut()),
+                           (ValueError, lambda: cut.cut(percent=101)), (ValueError, lambda: cut.levels([3, 2]))):
+            with self.assertRaises(kind):
+                call()
 
     def test_documents_make_the_same_elsewhere(self):
         classes = vexg.open(SCENE).segment(merge=90).classify(self.folder / "samples.geojson")
