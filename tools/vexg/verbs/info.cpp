@@ -126,7 +126,7 @@ Json FlagsAsJson(const Array<bool>& flags) {
   return list;
 }
 
-/// What the raster says of its bands, beside RasterInfo.
+/// Holds what the raster says of a band, beside RasterInfo.
 struct BandNotes {
   std::string name, meaning, unit, scale, offset;
   bool IsEmpty() const {
