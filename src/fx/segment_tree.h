@@ -129,8 +129,8 @@ class VEXG_EXPORT SegmentTreeWriter {
 
 /// Reads the tree of a segmentation, as SegmentTreeWriter made it.
 ///
-/// Of a file that is damaged, whatever its checksums say, nothing is read that could not be: labels
-/// are those of basins, and merges join two that stand for segments.
+/// It reads nothing from a damaged file that could not be, whatever the checksums say: labels are
+/// those of basins, and merges join two that stand for segments.
 ///
 /// Threads: any number may read at once. Failure: null or false, with the fault set: one line that
 ///          names the file.

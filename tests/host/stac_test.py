@@ -7,7 +7,7 @@ import unittest
 from creation_test import Creation, by_gdal, has_gdal_python
 from support import DATA, needs_data, run
 
-# The fields that the specification of items 1.0.0 and the extensions ask for, written from their texts.
+# The fields that STAC 1.0.0 and its extensions ask for in an item, written from their texts.
 ITEM = {
     "type": "object",
     "required": ["type", "stac_version", "stac_extensions", "id", "geometry", "properties", "links", "assets"],
