@@ -32,7 +32,6 @@ class CountingText {
     return before;
   }
   friend bool operator==(const CountingText& a, const CountingText& b) { return a.at_ == b.at_; }
-  friend bool operator!=(const CountingText& a, const CountingText& b) { return a.at_ != b.at_; }
 
  private:
   const char* at_;
