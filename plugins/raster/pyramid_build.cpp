@@ -257,6 +257,8 @@ bool Build::Complete(const std::string& values) {
 bool Build::TakePlace() {
   const std::lock_guard guard(lock_);
   isOver_ = true;
+  // The command fails then, whatever comes of it, and a failed one leaves the file that is there.
+  if (memory_.WasShort()) return FailBy(path_ + ": " + platform::kOutOfMemory);
   std::string fault;
   const platform::FolderLock lock(path_);
   if (!lock.IsHeld(&fault)) return FailBy(fault);

@@ -4,6 +4,7 @@
 #include <set>
 
 #include "platform/file_identity.h"
+#include "platform/memory_shortage.h"
 #include "pyramid_file.h"
 
 namespace lumo::pyramid {
@@ -91,6 +92,7 @@ class Build {
   const std::string path_;
   const std::string temporary_;
   const platform::FileIdentity older_;  // that stands at the place
+  const platform::MemoryWatch memory_;
   Header header_;
   mutable std::mutex lock_;  // of what follows
   const void* beginner_ = nullptr;
