@@ -43,6 +43,7 @@ void RasterVerb::AddMaking(JobDraft& draft, const Making& making) const {
   copy.AddVariableInput("SrcURI", making.shown);
   copy.AddVariableInput("DstURI", "$target");
   copy.AddInput("Invalid", String(FillsNoData(making.noData) ? "NoData" : "Told"));
+  if (CopiesBlocksOfSource()) copy.AddInput("Blocks", String("Stream"));
 }
 
 RasterContents RasterVerb::ReadWanted(const JobResults& results) const {
