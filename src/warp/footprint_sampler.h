@@ -185,7 +185,10 @@ class FootprintParallel final : public WarpParallel<T> {
   }
   /// Runs of elements of a line that lie next to one another: all bands, or one.
   unsigned Runs() const { return this->Source().strides.band == 1 ? 1 : this->Target().bands; }
-  std::size_t RunLength(const Span& span) const { return span.columns * ColumnStep(); }
+  std::size_t RunLength(const Span& span) const {
+    const std::size_t bands = this->Source().strides.band == 1 ? this->Target().bands : 1;
+    return (span.columns - 1) * ColumnStep() + bands;
+  }
 
   const T* At(std::int32_t x, std::int32_t y, unsigned band) const {
     return this->Source().pixels + IndexOf(x, y, band);

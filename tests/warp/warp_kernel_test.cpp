@@ -176,6 +176,36 @@ TEST(WarpKernel, MakesPixelsByItsDefinition) {
   }
 }
 
+TEST(WarpKernel, ReadsRastersOfOneColumnInEveryOrder) {
+  // Bands lie next to one another there whatever the order is called.
+  for (const unsigned lines : {1U, 9U}) {
+    const RasterPtr<float> source(MakePlaced<float>(
+        MakeGrid(0, 0, 10, 1, lines, "EPSG:32633"), 7,
+        [](unsigned, unsigned, unsigned band) { return static_cast<float>(band); }));
+    for (const auto interleave : {Interleave::BIP, Interleave::BIL, Interleave::BSQ}) {
+      for (const auto kernel : {WarpKernel::kLinear, WarpKernel::kLanczos, WarpKernel::kAverage}) {
+        ProjectedRaster<float> view(
+            source, MakeGrid(0, 0, 30, 1, 1, "EPSG:32633"), ReprojectionMethod::kPolynomial,
+            PyramidResamplingMethod::kNearest, {ProjectedGrid::kExact, {}, -1.0, kernel});
+        Array<float> pixels;
+        Array<unsigned char> state;
+        ASSERT_TRUE(view.GetSubRect({0, 0, 0, 0}, MakeArray<unsigned>({6, 5, 4, 3, 2, 1, 0}),
+                                    interleave, pixels, state));
+        for (unsigned i = 0; i < 7; ++i) {
+          // The middle of the larger pixel lies beside the column.
+          ASSERT_EQ(pixels[i], -1) << unsigned(kernel);
+        }
+        ProjectedRaster<float> inside(
+            source, MakeGrid(-10, 10, 30, 1, 1, "EPSG:32633"), ReprojectionMethod::kPolynomial,
+            PyramidResamplingMethod::kNearest, {ProjectedGrid::kExact, {}, -1.0, kernel});
+        ASSERT_TRUE(inside.GetSubRect({0, 0, 0, 0}, MakeArray<unsigned>({6, 5, 4, 3, 2, 1, 0}),
+                                      interleave, pixels, state));
+        for (unsigned i = 0; i < 7; ++i) ASSERT_NEAR(pixels[i], 6.0 - i, 1e-5) << unsigned(kernel);
+      }
+    }
+  }
+}
+
 TEST(WarpKernel, KeepsAPlaneThroughASystemThatIsCurved) {
   // A weighed mean of a plane is its value at the middle, and one of squared distances says how
   // wide the footprint is: a twelfth of the squared width for a box.
