@@ -6,14 +6,12 @@
 #include "foundation/fault.h"
 #include "fx/seamless_watershed.h"
 #include "fx/watershed.h"
-#include "support/test_rasters.h"
+#include "support/noise_scene.h"
 #include "tasks/thread_limit.h"
 
 namespace lumo {
 namespace {
 
-template <typename T>
-using MemoryPtr = Pointer<MemoryTestRaster<T>>;
 using Labels = std::vector<std::int32_t>;
 
 /// Numbers labels from 1 in the order in which they come; 0 stays.
@@ -97,18 +95,6 @@ TEST(SeamlessWatershed, GivesTheBasinsOfTheWhole) {
       for (const unsigned threads : {1U, 4U}) CheckBasins(image, stripLines, threads);
     }
   }
-}
-
-template <typename T>
-MemoryPtr<T> MakeScene(unsigned samples, unsigned lines, unsigned bands, unsigned seed) {
-  const MemoryPtr<T> scene(new MemoryTestRaster<T>(samples, lines, bands));
-  std::mt19937 random(seed);
-  for (std::size_t i = 0; i < scene->pixels.size(); ++i) {
-    // Fractions, so that sums depend on their order.
-    scene->pixels[i] = static_cast<T>(static_cast<double>(random() % 1000) / 7);
-    scene->states[i] = random() % 900 == 0 ? 1U << random() % 3 : 0;
-  }
-  return scene;
 }
 
 struct Settings {

@@ -14,27 +14,14 @@
 #include "fx/tree_scales.h"
 #include "support/file_bytes.h"
 #include "support/file_size_limit.h"
+#include "support/noise_scene.h"
 #include "support/temporary_directory.h"
-#include "support/test_rasters.h"
 #include "tasks/thread_limit.h"
 
 namespace lumo {
 namespace {
 
-template <typename T>
-using MemoryPtr = Pointer<MemoryTestRaster<T>>;
 using Labels = std::vector<std::int32_t>;
-
-template <typename T>
-MemoryPtr<T> MakeScene(unsigned samples, unsigned lines, unsigned bands, unsigned seed) {
-  const MemoryPtr<T> scene(new MemoryTestRaster<T>(samples, lines, bands));
-  std::mt19937 random(seed);
-  for (std::size_t i = 0; i < scene->pixels.size(); ++i) {
-    scene->pixels[i] = static_cast<T>(static_cast<double>(random() % 1000) / 7);
-    scene->states[i] = random() % 900 == 0 ? 1U << random() % 3 : 0;
-  }
-  return scene;
-}
 
 struct Run {
   double mergeValue = 0;
