@@ -213,17 +213,21 @@ class ProcessTest(FolderTest):
             "read": lambda n: (big / (n + 2)).read(),
             "polygons": lambda n: big.polygons().to_file(f"{folder}/{n}.fxv"),
         }[what]
-        print("ready", flush=True)
+        def say(line):  # in one call, that an interrupt can't cut
+            os.write(1, (line + "\\n").encode())
+
+        say("ready")
         number = 0
         while True:
-            number += 1
             try:
-                begin = time.monotonic()
-                sys.stdin.readline()
-                work(number)
-                print("done", flush=True)
+                while True:
+                    sys.stdin.readline()
+                    say("begun")
+                    number += 1
+                    work(number)
+                    say("done")
             except KeyboardInterrupt:
-                print(f"interrupted {time.monotonic_ns()}", flush=True)
+                say(f"interrupted {time.monotonic_ns()}")
         """
 
     def test_a_hundred_interrupts(self):
@@ -238,6 +242,7 @@ class ProcessTest(FolderTest):
             for turn in range(20):
                 process.stdin.write("\n")
                 process.stdin.flush()
+                self.assertEqual(process.stdout.readline(), "begun\n")
                 time.sleep(chance.uniform(0.002, 0.12))
                 sent = time.monotonic_ns()
                 process.send_signal(signal.SIGINT)
