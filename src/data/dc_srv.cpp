@@ -30,17 +30,30 @@ struct LocalManagerScope {
 
 }  // namespace
 
+/// True in a process that was forked after the source was made: its thread isn't there, and its
+/// locks may be held by threads that aren't either.
+bool DcSrv::IsElsewhere() const {
+  return process_ != platform::ProcessNumber();
+}
+
 bool DcSrv::Start() {
+  if (IsElsewhere()) return true;  // each call says why it fails
   const std::lock_guard lock(mutex_);
   if (thread_ != nullptr) return true;
   thread_ = std::make_unique<Thread>();
-  if (thread_->Start([this] { Serve(queue_); })) return true;
+  if (thread_->Start([this] { Serve(*queue_); })) return true;
   thread_.reset();
   SetErrorState(DcSrvErrorNoThread());
   return false;
 }
 
 bool DcSrv::Stop() {
+  if (IsElsewhere()) {
+    // Nobody is left to be waited for, not even by the end of a condition.
+    static_cast<void>(thread_.release());
+    static_cast<void>(queue_.release());
+    return false;
+  }
   const std::lock_guard lock(mutex_);
   if (thread_ == nullptr) return false;
   DcSrvCmdExit exit;
@@ -50,8 +63,13 @@ bool DcSrv::Stop() {
 }
 
 void DcSrv::Execute(DcSrvCmd& cmd) {
+  if (IsElsewhere()) {
+    SetFault(std::string(cmd.name_) +
+             ": the source was opened before this process was forked; it has to be opened anew");
+    return;
+  }
   cmd.abandons_ = IsAbandoning();
-  queue_.Push(&cmd);
+  queue_->Push(&cmd);
   {
     std::unique_lock lock(cmd.mutex_);
     cmd.replied_.wait(lock, [&] { return cmd.done_; });

@@ -7,6 +7,7 @@
 
 #include "data/data_connection.h"
 #include "foundation/thread.h"
+#include "platform/process.h"
 
 namespace lumo {
 
@@ -49,7 +50,8 @@ class VEXG_EXPORT DcSrvCmd {
 /// connection run here, one at a time and in the order of the queue.
 ///
 /// Threads: any number of threads may Execute. A plug-in that is being called must not wait for its
-///          own source: that call would queue behind the running one for ever.
+///          own source: that call would queue behind the running one for ever. A process that was
+///          forked afterwards doesn't have the thread: there each call fails with a fault.
 /// Cost: a call is two changes of threads. CallServer and CallConnection wrap it.
 class VEXG_EXPORT DcSrv : public ErrorState {
  public:
@@ -58,21 +60,24 @@ class VEXG_EXPORT DcSrv : public ErrorState {
   bool Start();
 
   /// Ends the thread: its connection and its data manager are gone when this returns. False when
-  /// there is no thread.
+  /// there is no thread, or when this process was forked after its start.
   bool Stop();
 
   /// Runs `cmd` on the thread and waits for it. An exception out of the plug-in ends there. The
-  /// fault text and the warnings of the call become this thread's. Start must have succeeded.
+  /// fault text and the warnings of the call become this thread's. Where this process was forked
+  /// after Start, `cmd` isn't run and the fault text says so. Start must have succeeded.
   void Execute(DcSrvCmd& cmd);
 
  private:
+  bool IsElsewhere() const;
   static void Serve(MTQueue<DcSrvCmd*>& queue);
   static void Run(DcSrvCmd& cmd, DcSrvContext& context);
   static void Reply(DcSrvCmd& cmd);
 
-  MTQueue<DcSrvCmd*> queue_;
+  std::unique_ptr<MTQueue<DcSrvCmd*>> queue_ = std::make_unique<MTQueue<DcSrvCmd*>>();
   std::unique_ptr<Thread> thread_;
-  std::mutex mutex_;  // guards the start and the stop
+  int process_ = platform::ProcessNumber();  // the one that the thread runs in
+  std::mutex mutex_;                         // guards the start and the stop
 };
 
 }  // namespace lumo

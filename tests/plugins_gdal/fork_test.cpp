@@ -59,8 +59,8 @@ TEST(Forking, TheChildOpensAndReads) {
   MakeFile(own, "DEFLATE");
   MakeFile(byGdal, "PACKBITS");
   ASSERT_TRUE(IsReadWhole(own) && IsReadWhole(byGdal));
-  const auto before = OpenSource({own});
-  const auto reader = ReaderOf<std::uint8_t>(before);
+  auto before = OpenSource({own});
+  auto reader = ReaderOf<std::uint8_t>(before);
   ASSERT_TRUE(reader);
 
   const pid_t child = fork();
@@ -68,7 +68,12 @@ TEST(Forking, TheChildOpensAndReads) {
   if (child == 0) {
     alarm(60);  // instead of hanging for ever
     if (!IsReadWhole(own)) _exit(1);
-    _exit(IsReadWhole(byGdal) ? 0 : 2);
+    if (!IsReadWhole(byGdal)) _exit(2);
+    Block<std::uint8_t> old{{0, 0, 9, 9}, {0}, {}, {}};
+    if (old.Read(*reader) || TakeFault().Find("forked") == String::kNotFound) _exit(3);
+    reader.Reset();
+    before.Reset();
+    _exit(0);
   }
   int status = 0;
   ASSERT_EQ(waitpid(child, &status, 0), child);
