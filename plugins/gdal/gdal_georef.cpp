@@ -4,6 +4,7 @@
 #include <cmath>
 #include <cstdio>
 #include <gdal_alg.h>
+#include <optional>
 #include <string>
 
 #include "gdal_common/coordsys.h"
@@ -60,10 +61,10 @@ bool ReadGrid(GDALDatasetH dataset, StdGeoRef& grid) {
 }
 
 /// GDAL counts samples and lines as our model does, from the centre of the first pixel.
-bool ReadCamera(GDALDatasetH dataset, RpcGeoRef& camera) {
+std::optional<RpcCoefficients> ReadCamera(GDALDatasetH dataset) {
   GDALRPCInfoV2 info{};
   char** const items = GDALGetMetadata(dataset, "RPC");
-  if (items == nullptr || GDALExtractRPCInfoV2(items, &info) == FALSE) return false;
+  if (items == nullptr || GDALExtractRPCInfoV2(items, &info) == FALSE) return std::nullopt;
   RpcCoefficients rpc;
   rpc.lineOffset = info.dfLINE_OFF;
   rpc.sampleOffset = info.dfSAMP_OFF;
@@ -79,8 +80,7 @@ bool ReadCamera(GDALDatasetH dataset, RpcGeoRef& camera) {
   std::copy_n(info.adfLINE_DEN_COEFF, RpcCoefficients::kTerms, rpc.lineDenominator.begin());
   std::copy_n(info.adfSAMP_NUM_COEFF, RpcCoefficients::kTerms, rpc.sampleNumerator.begin());
   std::copy_n(info.adfSAMP_DEN_COEFF, RpcCoefficients::kTerms, rpc.sampleDenominator.begin());
-  camera.SetCoefficients(rpc);
-  return true;
+  return rpc;
 }
 
 std::string Number(double value) {
@@ -118,13 +118,18 @@ bool WriteCoordSys(GDALDatasetH dataset, const CoordSys& system) {
 }  // namespace
 
 GeoRefPtr ReadGeoRef(GDALDatasetH dataset, bool hasSystem) {
-  RpcGeoRef camera;
-  const bool hasCamera = ReadCamera(dataset, camera);
-  auto* const both = hasCamera ? new StdRpcGeoRef : nullptr;
-  StdGeoRef* const grid = hasCamera ? both : new StdGeoRef;
+  const std::optional<RpcCoefficients> rpc = ReadCamera(dataset);
+  auto* const both = rpc ? new StdRpcGeoRef : nullptr;
+  StdGeoRef* const grid = rpc ? both : new StdGeoRef;
   GeoRefPtr owner(grid);
-  if (!ReadGrid(dataset, *grid)) return hasCamera ? GeoRefPtr(camera.Clone()) : GeoRefPtr();
-  if (hasCamera) both->SetRpc(camera);
+  const bool hasGrid = ReadGrid(dataset, *grid);
+  if (rpc) {  // making a camera opens the registry of systems: only rasters with one pay for it
+    RpcGeoRef camera;
+    camera.SetCoefficients(*rpc);
+    if (!hasGrid) return GeoRefPtr(camera.Clone());
+    both->SetRpc(camera);
+  }
+  if (!hasGrid) return {};
   if (hasSystem) grid->SetCoordinateSystem(ReadCoordSys(GDALGetSpatialRef(dataset)));
   return owner;
 }
