@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <atomic>
 #include <cstring>
+#include <utility>
 
 #include "tasks/crew.h"
 
@@ -135,9 +136,39 @@ bool Window::ReadPlain(const Piece& piece) {
   return true;
 }
 
+/// Reads a part of a block without compression. A block that is asked for again by windows that lie
+/// anywhere is read whole and kept, since a call of the system for each window costs more.
+bool Window::ReadPlainOrKept(const Piece& piece) {
+  constexpr std::size_t kMostBytes = 1 << 20, kLeastShare = 32;
+  const std::size_t bytes = piece.lines * image_.RowBytes();
+  const std::size_t wanted = std::size_t{piece.width} * piece.height * image_.PixelBytes();
+  if (!piece.isKept || bytes > kMostBytes || wanted < bytes / kLeastShare) return ReadPlain(piece);
+  BlockCache& cache = BlockCache::Get();
+  if (const Bytes kept = cache.Find(group_, piece.block)) return Carry(piece, kept.get());
+  if (std::exchange(wasAsked_[piece.block], 1) == 0) return ReadPlain(piece);
+  if (offsets_[piece.block] == 0 || sizes_[piece.block] < bytes) return false;
+  auto block = std::make_shared_for_overwrite<unsigned char[]>(bytes);
+  if (!file_.Handle().Read(offsets_[piece.block], block.get(), bytes)) return false;
+  Carry(piece, block.get());
+  hasKept_ = true;
+  cache.Keep(group_, piece.block, std::move(block), bytes);
+  return true;
+}
+
+/// Copies the part of a block to its place.
+bool Window::Carry(const Piece& piece, const unsigned char* block) const {
+  const std::size_t rowBytes = image_.RowBytes();
+  const unsigned char* const first =
+      block + piece.top * rowBytes + piece.left * image_.PixelBytes();
+  for (unsigned y = 0; y < piece.height; ++y) {
+    piece.carrier->Row(first + y * rowBytes, piece.to + y * piece.stride, piece.width);
+  }
+  return true;
+}
+
 bool Window::ReadPiece(const Piece& piece) {
-  if (image_.compression == Compression::kNone) return ReadPlain(piece);
-  const std::size_t rowBytes = image_.RowBytes(), pixelBytes = image_.PixelBytes();
+  if (image_.compression == Compression::kNone) return ReadPlainOrKept(piece);
+  const std::size_t rowBytes = image_.RowBytes();
   const bool isWholeWidth = piece.width == image_.blockWidth;
   const bool isWhole =
       piece.height == piece.lines &&
@@ -146,24 +177,17 @@ bool Window::ReadPiece(const Piece& piece) {
   if (isPassing && isWholeWidth && piece.stride == rowBytes && piece.carrier->chosen == nullptr) {
     return DecodeBlock(piece.block, piece.lines, piece.to);
   }
-  const auto carry = [&](const unsigned char* block) {
-    const unsigned char* const first = block + piece.top * rowBytes + piece.left * pixelBytes;
-    for (unsigned y = 0; y < piece.height; ++y) {
-      piece.carrier->Row(first + y * rowBytes, piece.to + y * piece.stride, piece.width);
-    }
-    return true;
-  };
   const std::size_t bytes = piece.lines * rowBytes;
   if (isPassing) {
     thread_local std::vector<unsigned char> decoded;
     if (decoded.size() < bytes) decoded.resize(bytes);
-    return DecodeBlock(piece.block, piece.lines, decoded.data()) && carry(decoded.data());
+    return DecodeBlock(piece.block, piece.lines, decoded.data()) && Carry(piece, decoded.data());
   }
   BlockCache& cache = BlockCache::Get();
-  if (const Bytes kept = cache.Find(group_, piece.block)) return carry(kept.get());
+  if (const Bytes kept = cache.Find(group_, piece.block)) return Carry(piece, kept.get());
   auto decoded = std::make_shared_for_overwrite<unsigned char[]>(bytes);
   if (!DecodeBlock(piece.block, piece.lines, decoded.get())) return false;
-  carry(decoded.get());
+  Carry(piece, decoded.get());
   hasKept_ = true;
   cache.Keep(group_, piece.block, std::move(decoded), bytes);
   return true;
@@ -183,6 +207,9 @@ bool Window::Read(const Rect& rect, const Array<unsigned>& bands, unsigned char*
   // Who reads whole rows of an image reads it from top to bottom, as a rule.
   const bool isAnywhere =
       rect.width < image_.samples && (rect.left % width != 0 || rect.top % height != 0);
+  if (isAnywhere && image_.compression == Compression::kNone && wasAsked_.empty()) {
+    wasAsked_.resize(image_.Blocks());
+  }
   std::vector<Piece> pieces;
   for (unsigned plane = 0; plane < planes; ++plane) {
     unsigned char* const start = pixels + plane * rowBytes * rect.height;

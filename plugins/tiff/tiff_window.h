@@ -13,7 +13,8 @@ struct Rect {
 
 /// Reads rectangles of an image, decoding blocks on as many threads as there are. Blocks of which a
 /// rectangle needs a part are kept for the next ones (BlockCache); of a rectangle that lies
-/// anywhere in the image all blocks are, since others will overlap with it.
+/// anywhere in the image all blocks are, since others will overlap with it. Blocks without
+/// compression are kept when they are needed again.
 ///
 /// Threads: one at a time.
 /// Failure: false, without a word, for data that are damaged or left out.
@@ -36,12 +37,15 @@ class Window {
   bool FindBlocks();
   bool ReadPiece(const Piece& piece);
   bool ReadPlain(const Piece& piece);
+  bool ReadPlainOrKept(const Piece& piece);
+  bool Carry(const Piece& piece, const unsigned char* block) const;
   bool DecodeBlock(std::uint64_t block, unsigned lines, unsigned char* out) const;
 
   const File& file_;
   const Image image_;
   bool areBlocksFound_ = false;
   std::vector<std::uint64_t> offsets_, sizes_;
+  std::vector<unsigned char> wasAsked_;  // by a window anywhere, for each plain block
   const std::uint64_t group_ = BlockCache::Get().NewGroup();
   std::atomic<bool> hasKept_{false};  // some block, now or before
 };

@@ -3,6 +3,7 @@
 #include "data/data_errors.h"
 #include "data/data_manager.h"
 #include "foundation/abandonment.h"
+#include "foundation/brief_wait.h"
 #include "foundation/fault.h"
 #include "foundation/thrown.h"
 #include "foundation/warnings.h"
@@ -70,9 +71,10 @@ void DcSrv::Execute(DcSrvCmd& cmd) {
   }
   cmd.abandons_ = IsAbandoning();
   queue_->Push(&cmd);
+  WaitBriefly([&] { return cmd.done_.load(std::memory_order_relaxed); });
   {
-    std::unique_lock lock(cmd.mutex_);
-    cmd.replied_.wait(lock, [&] { return cmd.done_; });
+    std::unique_lock lock(cmd.mutex_);  // the thread has let go of the command when this is had
+    cmd.replied_.wait(lock, [&] { return cmd.done_.load(); });
   }
   if (cmd.fault_.GetLength() != 0) SetFault(cmd.fault_);
   for (const std::string& warning : cmd.warnings_) AddWarning(warning);
@@ -85,7 +87,7 @@ void DcSrv::Serve(MTQueue<DcSrvCmd*>& queue) {
     const LocalManagerScope manager;
     DcSrvContext context;
     while (!context.exit) {
-      queue.Pop(last);
+      if (!WaitBriefly([&] { return queue.TryPop(last); })) queue.Pop(last);
       Run(*last, context);
       if (!context.exit) Reply(*last);
     }

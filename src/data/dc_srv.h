@@ -1,5 +1,6 @@
 #pragma once
 
+#include <atomic>
 #include <condition_variable>
 #include <mutex>
 #include <string>
@@ -40,9 +41,9 @@ class VEXG_EXPORT DcSrvCmd {
   const char* const name_;
   std::mutex mutex_;
   std::condition_variable replied_;
-  bool done_ = false;      // the reply
-  bool abandons_ = false;  // as the thread that it works for
-  String fault_;           // the fault text that was set while the thread ran this
+  std::atomic<bool> done_{false};  // the reply
+  bool abandons_ = false;          // as the thread that it works for
+  String fault_;                   // the fault text that was set while the thread ran this
   std::vector<std::string> warnings_;
 };
 
