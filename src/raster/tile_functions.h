@@ -215,8 +215,8 @@ void AddReduction(TileProcess<Base>& process, const char* name,
                   const std::tuple<TileSlot<Ts>...>& slots, Total& total, const Part& part,
                   const Merge& merge, std::size_t leastPixels = 0) {
   using R = detail::PartResult<Part, Ts...>;
-  const auto partOfTile = [part, merge, leastPixels](const AbortFlag* abort, const auto& first,
-                                                     const auto&... more) -> std::optional<R> {
+  const auto partOfTile = [=](const AbortFlag* abort, const auto& first,
+                              const auto&... more) -> std::optional<R> {
     if constexpr (std::is_invocable_v<const Part&, const Tile<Ts>&..., const TilePart&>) {
       const std::size_t least = leastPixels != 0 ? leastPixels : LeastStripPixels(first.Bands());
       return ReduceStrips<R>(

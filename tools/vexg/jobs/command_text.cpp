@@ -9,6 +9,7 @@
 #include <fmt/ranges.h>
 
 #include "commands/command.h"
+#include "options/troff.h"
 
 namespace lumo::host {
 namespace {
@@ -61,6 +62,11 @@ std::string AsMarkdown(const CommandDeclaration& command) {
 /// The words of an input, joined by `separator`; empty for one without.
 std::string JoinWords(const InputDeclaration& input, const char* separator) {
   return input.words == nullptr ? "" : fmt::format("{}", fmt::join(input.words(), separator));
+}
+
+/// An entry of a list in a manual page: a name, its kind, and what it means.
+std::string EntryInManual(const char* name, const std::string& kind, const std::string& meaning) {
+  return fmt::format(".TP\n\\fB{}\\fR ({})\n{}.\n", Troff(name), Troff(kind), Troff(meaning));
 }
 
 bool IsToldForm(const InputDeclaration& input) {
@@ -132,6 +138,28 @@ std::string CommandAsHelp(const CommandDeclaration& command) {
                     output.meaning, output.returned ? "" : " (not in the result document)");
   }
   return text;
+}
+
+std::string CommandAsManual(const CommandDeclaration& command) {
+  std::string text = HeadOfManual(command.name, 7, command.meaning);
+  text += fmt::format(".SH DESCRIPTION\nA command of jobs, of the group {}.\n{}\n",
+                      Troff(command.group), Troff(command.meaning));
+  if (!command.inputs.empty()) text += ".SH INPUTS\nIn the order in which they are checked.\n";
+  for (const InputDeclaration& input : command.inputs) {
+    const std::string words = JoinWords(input, ", ");
+    text += EntryInManual(
+        input.name,
+        fmt::format("{}, {}; {}", PresenceWord(input.presence), KindOf(input.kind, input.unit),
+                    words.empty() ? Describe(input.kind).form : words),
+        input.meaning);
+  }
+  if (!command.outputs.empty()) text += ".SH OUTPUTS\n";
+  for (const OutputDeclaration& output : command.outputs) {
+    text += EntryInManual(
+        output.name, KindOf(output.kind, output.unit),
+        std::string(output.meaning) + (output.returned ? "" : " (not in the result document)"));
+  }
+  return text + ".SH SEE ALSO\n.BR vexg (1),\n.BR vexg\\-run (1)\n";
 }
 
 }  // namespace lumo::host

@@ -17,4 +17,7 @@ std::string CommandsAsMarkdown();  ///< everything, as a document
 /// All about one command.
 std::string CommandAsHelp(const CommandDeclaration& command);
 
+/// A manual page about one command in the troff language, NAME(7).
+std::string CommandAsManual(const CommandDeclaration& command);
+
 }  // namespace lumo::host

@@ -5,6 +5,7 @@
 #include <nlohmann/json.hpp>
 
 #include "foundation/library.h"
+#include "options/troff.h"
 
 namespace lumo::host {
 namespace {
@@ -33,17 +34,6 @@ Json OptionsAsJson(const OptionSet& options) {
   return list;
 }
 
-/// Lets a text stand in a manual page: a backslash is an escape there, a dot or quote at the start
-/// of a line a request, and a plain dash may be broken or replaced.
-std::string Troff(const std::string& text) {
-  std::string escaped;
-  for (const char c : text) {
-    if (c == '\\' || c == '-') escaped += '\\';
-    escaped += c == '\\' ? 'e' : c;
-  }
-  return escaped.starts_with('.') || escaped.starts_with('\'') ? "\\&" + escaped : escaped;
-}
-
 std::string ShownInManual(const OptionSpec& option) {
   std::string text =
       fmt::format("\\fB{}\\fR", Troff(fmt::format("{}", fmt::join(option.names, ", "))));
@@ -67,13 +57,8 @@ std::string OptionAsManual(const OptionSpec& option) {
   return text + "\n";
 }
 
-std::string HeadOfManual(const std::string& name, const std::string& summary) {
-  return fmt::format(".TH {} 1 \"\" \"vexg {}\"\n.SH NAME\n{} \\- {}\n", name, GetLibraryVersion(),
-                     Troff(name), Troff(summary));
-}
-
 std::string ManualOf(const Verb& verb) {
-  std::string text = HeadOfManual("vexg-" + verb.name, verb.summary);
+  std::string text = HeadOfManual("vexg-" + verb.name, 1, verb.summary);
   text += ".SH SYNOPSIS\n.B vexg " + Troff(verb.name) + "\n[\\fIOPTIONS\\fR]";
   for (const OptionSpec& option : verb.options.Options()) {
     if (!option.IsByPlace()) continue;
@@ -113,14 +98,16 @@ std::string VerbsAsJson() {
 
 std::string VerbAsManual(const Verb* verb) {
   if (verb != nullptr) return ManualOf(*verb);
-  std::string text = HeadOfManual("vexg", "processing core for remote-sensing images");
+  std::string text = HeadOfManual("vexg", 1, "processing core for remote-sensing images");
   text += ".SH SYNOPSIS\n.B vexg\n[\\fIOPTIONS\\fR] \\fIVERB\\fR ...\n.SH OPTIONS\n";
   for (const OptionSpec& option : GetGeneralOptions().Options()) text += OptionAsManual(option);
   text += ".SH VERBS\n";
   for (const Verb& each : GetVerbs()) {
     text += ".TP\n.BR vexg\\-" + Troff(each.name) + " (1)\n" + Troff(each.summary) + ".\n";
   }
-  return text;
+  return text +
+         ".SH SEE ALSO\nEach command of jobs has a page of its own, for example\n"
+         ".BR OpenRasterCommand (7);\n.B vexg commands\nlists them.\n";
 }
 
 }  // namespace lumo::host

@@ -28,7 +28,10 @@ struct Options {
 std::string TextOf(const Options& options) {
   if (options.json) return VerbsAsJson();
   const CommandFactory* const factory = GetCommandRegistry().Find(String(options.name));
-  if (factory != nullptr && !options.manual) return CommandAsHelp(factory->GetDeclaration());
+  if (factory != nullptr) {
+    const CommandDeclaration& command = factory->GetDeclaration();
+    return options.manual ? CommandAsManual(command) : CommandAsHelp(command);
+  }
   const Verb* const verb = FindVerb(options.name);
   if (verb == nullptr && !options.name.empty()) FailUnknown(options.name);
   return options.manual ? VerbAsManual(verb) : HelpOf(verb);
@@ -41,7 +44,7 @@ const VerbRegistration registration(
       line.AddExample("vexg help --man read | man -l -");
       line.Add("name", options->name, "The command or verb").Shows("NAME");
       line.Add("--json", options->json, "All verbs with their options as JSON");
-      line.Add("--man", options->manual, "The manual page of a verb, or of the program");
+      line.Add("--man", options->manual, "The manual page of a command or verb, or of the program");
       line.AllowOneOf({"--json", "--man"});
       return VerbRegistration::Work([options] {
         std::cout << TextOf(*options);
