@@ -104,8 +104,11 @@ def _told(raster, quantity, metadata, bands, constants):
     """The constants that metadata tell for the bands of a raster, by their names here, with names, the
     bands that they are of, and doubt, why these aren't known."""
     draft = Draft()
+    draft.step("source", "FindMetadataSourceCommand", {"Name": os.fspath(metadata), "Folder": os.getcwd()})
+    source = watch(lambda task: raster._door.run(draft, task)).values("source")["ConnStr"]
+    draft = Draft()
     draft.step("constants", "GetMetadataCalibrationCommand", {
-        "URI": Node("CreateMetadataCommand", (("ConnStr", _metadata_source(metadata)),)),
+        "URI": Node("CreateMetadataCommand", (("ConnStr", "|".join(source)),)),
         "RasterURI": raster._chain(), "Quantity": quantity.capitalize(),
         "Bands": None if bands is None else [str(band) for band in bands],
         "SunElevation": constants.get("sun_elevation") if quantity == "radiance" else None})
@@ -116,43 +119,3 @@ def _told(raster, quantity, metadata, bands, constants):
     told.update({name: found[output] for name, output in _SCENE.items() if output in found})
     return {**told, "names": found.get("BandNames"), "doubt": found.get("Doubt"),
             "is_sun_in": found.get("ReflectanceSun", False)}
-
-
-_FORMATS = {
-    ".imd": "DGIMD", ".rpb": "DGRPB", ".til": "DGTIL", ".tif": "TIFF", ".tiff": "TIFF", ".img": "Erdas",
-    ".grb": "GRIB", ".grb2": "GRIB", ".grib": "GRIB", ".grib2": "GRIB", ".hdr": "ORVA",
-}  # fmt: skip
-_XML = {
-    b"<Rational_Function_Model": "PLEIADESRPC", b"<Dimap_Document": "PLEIADESDIM", b"<LANDSAT_METADATA_FILE": "LANDSAT",
-    b"Level-1C_User_Product": "SENTINEL2", b"Level-2A_User_Product": "SENTINEL2", b"Level-1C_Tile_ID": "SENTINEL2",
-    b"Level-2A_Tile_ID": "SENTINEL2", b"FeatureCollection": "GML",
-}  # fmt: skip
-
-
-def _metadata_source(text):
-    """The connection strings of metadata: FORMAT:FILE, or a name that tells the format, as
-    `vexg calibrate --from-metadata` takes them."""
-    text = os.fspath(text)
-    format, colon, file = text.partition(":")
-    if not (colon and format.isupper() and format.isalnum()):
-        format, file = _format_of(text), text
-    if format is None:
-        raise Error(f"{text}: the name doesn't tell what metadata these are; write FORMAT:FILE, such as DGIMD:{text}")
-    if format == "ORVA" and not file.lower().endswith(".hdr") and os.path.exists(file + ".hdr"):
-        file += ".hdr"
-    return f"{format}|{os.path.abspath(file)}"
-
-
-def _format_of(file):
-    if file.lower().endswith(("mtl.txt", "mtl.json")):
-        return "LANDSAT"
-    ending = os.path.splitext(file)[1].lower()
-    format = _FORMATS.get(ending)
-    if ending in (".xml", ".gml"):
-        try:
-            with open(file, "rb") as head:
-                start = head.read(1 << 16)
-        except OSError as fault:
-            raise Error(f"{file}: {fault.strerror}") from None
-        format = next((word for mark, word in _XML.items() if mark in start), None)
-    return format or ("ORVA" if os.path.exists(file + ".hdr") else None)

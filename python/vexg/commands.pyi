@@ -1535,6 +1535,28 @@ def FindClassExamplesCommand(
     """
     ...
 
+class _FindMetadataSourceCommandOutputs(TypedDict, total=False):
+    ConnStr: list[str]
+
+def FindMetadataSourceCommand(
+    *,
+    Name: str | PathLike[str],
+    Folder: str | PathLike[str] | None = None,
+    server: Server | None = None,
+    progress: Progress = False,
+) -> _FindMetadataSourceCommandOutputs:
+    """Finds the format of a file of metadata by its name and, of XML files, by what stands in
+    it.
+
+    Args:
+        Name: text: FILE, or FORMAT:FILE
+        Folder: text: where a relative name begins; the folder of the process when absent
+
+    Returns:
+        ConnStr: text list: what CreateMetadataCommand takes: format and file
+    """
+    ...
+
 class _FitPCAModelCommandOutputs(TypedDict, total=False):
     PCACoefficients: NDArray[Any]
     Weights: NDArray[Any]

@@ -1,7 +1,10 @@
+#include <fstream>
+
 #include "commands/catalog.h"
 #include "commands/value_text.h"
 #include "support/metadata_support.h"
 #include "support/run_command.h"
+#include "support/temporary_directory.h"
 
 namespace lumo {
 namespace {
@@ -146,6 +149,42 @@ TEST_F(MetadataCommands, CountTheirOpens) {
   EXPECT_TRUE(Run("CloseMetadataCommand", {}).Succeeded());
   EXPECT_FALSE(isOpen());
   EXPECT_TRUE(Run("CloseMetadataCommand", {}).Succeeded());  // absent: no failure
+}
+
+TEST(MetadataSources, AreKnownByTheirNamesAndBeginnings) {
+  const test::TemporaryDirectory folder;
+  const auto write = [&](const char* name, const char* text) {
+    std::ofstream(folder.Path() / name) << text;
+  };
+  write("a.xml", "<?xml version='1.0'?><Dimap_Document>");
+  write("b.xml", "<LANDSAT_METADATA_FILE>");
+  write("c.xml", "<something/>");
+  write("pixels.bin", "");
+  write("pixels.bin.hdr", "");
+  const struct {
+    const char *name, *format, *file;
+  } cases[] = {{"a.xml", "PLEIADESDIM", "a.xml"},
+               {"b.xml", "LANDSAT", "b.xml"},
+               {"LC08_MTL.txt", "LANDSAT", "LC08_MTL.txt"},
+               {"x.IMD", "DGIMD", "x.IMD"},
+               {"GML:c.xml", "GML", "c.xml"},
+               {"pixels.bin", "ORVA", "pixels.bin.hdr"},
+               {"ORVA:pixels.bin", "ORVA", "pixels.bin.hdr"},
+               {"c.xml", nullptr, nullptr},
+               {"none.xml", nullptr, nullptr},
+               {"NONE:x.IMD", "DGIMD", "NONE:x.IMD"},
+               {"", nullptr, nullptr}};
+  for (const auto& each : cases) {
+    const CommandOutcome found = RunCommand(
+        "FindMetadataSourceCommand", {{"Name", each.name}, {"Folder", folder.Path().string()}});
+    ASSERT_EQ(found.Succeeded(), each.format != nullptr) << each.name;
+    if (each.format == nullptr) {
+      EXPECT_NE(found.reason.find("FORMAT:FILE"), std::string::npos) << each.name;
+    } else {
+      EXPECT_EQ(found.outputs.at("ConnStr"),
+                std::string(each.format) + "|" + (folder.Path() / each.file).string());
+    }
+  }
 }
 
 }  // namespace
