@@ -246,6 +246,16 @@ bool Source::Describe(const String& formatKey) {
   for (unsigned band = 0; isRgb && band < 3; ++band) {
     metadata.Set(BandDetailPath(band, "Meaning"), String(colors[band]));
   }
+  for (unsigned band = 0; band < image.bands; ++band) {
+    for (const auto& [name, text] : stored_.Details(band)) {
+      const String path = BandDetailPath(band, name);
+      if (text.empty()) {
+        metadata.Remove(path);
+      } else {
+        metadata.Set(path, String(text));
+      }
+    }
+  }
   return true;
 }
 

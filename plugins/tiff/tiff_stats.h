@@ -18,6 +18,9 @@ class StoredItems {
   /// Takes the text of the file beside a raster, `NAME.aux.xml`.
   bool TakeSideFile(const std::string& text, unsigned bands);
 
+  /// What the tag says of a band, by the names of details: Description, Unit, Meaning, Scale and
+  /// Offset.
+  const std::map<std::string, std::string>& Details(unsigned band) const;
   /// The statistics of a band; nothing where none of all its pixels are stored.
   std::optional<gdal::StoredStats> Stats(unsigned band) const;
   /// True when the file beside it holds histograms, which are GDAL's to read.
@@ -27,6 +30,7 @@ class StoredItems {
   class Parser;
 
   std::map<unsigned, std::map<std::string, std::string>> items_;  // by band and name
+  std::map<unsigned, std::map<std::string, std::string>> details_;
   bool hasHistograms_ = false;
 };
 

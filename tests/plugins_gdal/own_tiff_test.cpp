@@ -357,10 +357,10 @@ TEST(OwnTiff, StoredStatisticsAreThoseOfGdal) {
        }},
       {"marks in a text", true, [&](GDALDatasetH file) { set(file, "STATISTICS_MEAN", "<&>"); }},
       {"another item", false, [&](GDALDatasetH file) { set(file, "SENSOR", "here"); }},
-      {"a scale", false,
-       [](GDALDatasetH file) { GDALSetRasterScale(GDALGetRasterBand(file, 1), 2); }},
-      {"a name", false,
-       [](GDALDatasetH file) { GDALSetDescription(GDALGetRasterBand(file, 1), "Red"); }},
+      {"an alpha band", false,
+       [](GDALDatasetH file) {
+         GDALSetRasterColorInterpretation(GDALGetRasterBand(file, 2), GCI_AlphaBand);
+       }},
       {"a histogram", true,
        [&](GDALDatasetH file) {
          compute(file, false);
@@ -388,6 +388,41 @@ TEST(OwnTiff, StoredStatisticsAreThoseOfGdal) {
         } else if (how == 0) {
           store(GDAL_OF_RASTER, each.store);
         }
+        EXPECT_EQ(ExpectSame(path), each.isOwn);
+      }
+    }
+  }
+}
+
+/// What GDAL keeps of bands in a tag of the file: names, units, meanings, scales.
+TEST(OwnTiff, DetailsOfBandsAreThoseOfGdal) {
+  const test::TemporaryDirectory directory;
+  using Store = std::function<void(GDALRasterBandH)>;
+  const struct {
+    bool isOwn;
+    Store store;
+  } cases[] = {
+      {true, [](GDALRasterBandH band) { GDALSetDescription(band, "near infrared, 30 m"); }},
+      {true, [](GDALRasterBandH band) { GDALSetRasterUnitType(band, "W/(m2 sr um)"); }},
+      {true, [](GDALRasterBandH band) { GDALSetRasterScale(band, 2.75e-05); }},
+      {true, [](GDALRasterBandH band) { GDALSetRasterScale(band, 1); }},
+      {true, [](GDALRasterBandH band) { GDALSetRasterOffset(band, -0.2); }},
+      {true, [](GDALRasterBandH band) { GDALSetRasterColorInterpretation(band, GCI_BlueBand); }},
+      {false, [](GDALRasterBandH band) { GDALSetDescription(band, "<a & b>"); }},
+      {false, [](GDALRasterBandH band) { GDALSetRasterColorInterpretation(band, GCI_HueBand); }},
+  };
+  int number = 0;
+  for (const auto& each : cases) {
+    for (const char* const photometric : {"PHOTOMETRIC=MINISBLACK", "PHOTOMETRIC=RGB"}) {
+      for (const int bandNumber : {1, 2, 3}) {
+        SCOPED_TRACE(std::to_string(number) + photometric);
+        const std::string path =
+            (directory.Path() / ("d" + std::to_string(number++) + "x.tif")).string();
+        Make(path, {GDT_Byte, {photometric}, 4, 32633}, number);
+        GDALDatasetH const file =
+            GDALOpenEx(path.c_str(), GDAL_OF_RASTER | GDAL_OF_UPDATE, nullptr, nullptr, nullptr);
+        each.store(GDALGetRasterBand(file, bandNumber));
+        GDALClose(file);
         EXPECT_EQ(ExpectSame(path), each.isOwn);
       }
     }
