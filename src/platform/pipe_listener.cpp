@@ -4,6 +4,7 @@
 #include <atomic>
 #include <cerrno>
 #include <compare>
+#include <cstdlib>
 #include <cstring>
 #include <fcntl.h>
 #include <limits>
@@ -12,6 +13,7 @@
 #include <new>
 #include <poll.h>
 #include <set>
+#include <sys/eventfd.h>
 #include <sys/file.h>
 #include <sys/resource.h>
 #include <sys/socket.h>
@@ -161,6 +163,30 @@ FileDescriptor ListenAt(const std::string& path) {
   return {};
 }
 
+/// The socket of `path` that a service manager has opened for this process, which takes it over, as
+/// sd_listen_fds(3) describes; not open when there is none.
+FileDescriptor TakeInherited(const std::string& path) {
+  constexpr int kFirst = 3;
+  const char* const process = std::getenv("LISTEN_PID");
+  const char* const count = std::getenv("LISTEN_FDS");
+  if (process == nullptr || count == nullptr || std::to_string(getpid()) != process) return {};
+  for (int socket = kFirst; socket < kFirst + std::atoi(count); ++socket) {
+    sockaddr_un address{};
+    socklen_t length = sizeof address - 1;  // a zero stands behind every path
+    int listens = 0;
+    socklen_t size = sizeof listens;
+    const bool isIt = getsockname(socket, reinterpret_cast<sockaddr*>(&address), &length) == 0 &&
+                      address.sun_family == AF_UNIX && path == address.sun_path &&
+                      getsockopt(socket, SOL_SOCKET, SO_ACCEPTCONN, &listens, &size) == 0 &&
+                      listens != 0;
+    if (!isIt) continue;
+    fcntl(socket, F_SETFD, FD_CLOEXEC);
+    fcntl(socket, F_SETFL, fcntl(socket, F_GETFL) | O_NONBLOCK);
+    return FileDescriptor(socket);
+  }
+  return {};
+}
+
 /// How many clients one listener may have at a time, so that most of the descriptors of the process
 /// are left for what it does.
 unsigned MostClients() {
@@ -209,6 +235,7 @@ struct PipeListener::Impl {
   PipeFile file;
   FileDescriptor socket;
   FileDescriptor watched;  // a process whose end ends the waiting
+  FileDescriptor wake{eventfd(0, EFD_CLOEXEC | EFD_NONBLOCK)};  // ready once there is a stop
   std::atomic<bool> stopped{false};
   std::list<Peer> peers;        // all but the current one
   std::list<Peer> current;      // the client of the exchange, or none
@@ -243,6 +270,13 @@ std::unique_ptr<PipeListener> PipeListener::Open(const std::string& name, PipeFa
   fault = PipeFault::kBadName;
   if (impl->file.path.empty()) return nullptr;
   SpareDescriptor::Get();  // taken while there is one
+  fault = PipeFault::kSystem;
+  if (!impl->wake.IsOpen()) return nullptr;
+  impl->socket = TakeInherited(impl->file.path);
+  if (impl->socket.IsOpen()) {  // its file stays, for the next process that is started with it
+    fault = PipeFault::kNone;
+    return std::unique_ptr<PipeListener>(new PipeListener(std::move(impl)));
+  }
   impl->socket = TakeName(impl->file.path, fault);
   if (!impl->socket.IsOpen()) return nullptr;
   impl->file.number = FileNumber(impl->file.path);
@@ -294,7 +328,10 @@ bool PipeListener::EndWithProcess(int process) {
 
 void PipeListener::Stop() {
   impl_->stopped = true;
-  shutdown(impl_->socket.Get(), SHUT_RD);  // wakes the poll
+  const std::uint64_t one = 1;
+  static_cast<void>(write(impl_->wake.Get(), &one, sizeof one) == sizeof one);
+  // Clients look elsewhere at once; those of a service manager wait for the next server.
+  if (impl_->file.number != 0) shutdown(impl_->socket.Get(), SHUT_RD);
 }
 
 /// Puts the client of the exchange before among those whose answers are still being sent.
@@ -387,12 +424,13 @@ bool PipeListener::Impl::PollRound() {
   entries.clear();
   entries.push_back({MakeRoom() ? socket.Get() : -1, POLLIN, 0});
   entries.push_back({watched.IsOpen() ? watched.Get() : -1, POLLIN, 0});
+  entries.push_back({wake.Get(), POLLIN, 0});
   for (const Peer& peer : peers) {
     entries.push_back({peer.socket.Get(), static_cast<short>(peer.answered ? POLLOUT : POLLIN), 0});
   }
   if (poll(entries.data(), entries.size(), NextTimeout()) < 0) return errno == EINTR;
   if (stopped || entries[1].revents != 0) return false;
-  std::size_t index = 2;
+  std::size_t index = 3;
   for (auto peer = peers.begin(); peer != peers.end(); ++index) {
     const auto next = std::next(peer);
     if (entries[index].revents != 0) Serve(peer, entries[index].revents);

@@ -27,7 +27,8 @@ struct ListenerLimits {
 /// Threads: one thread uses it; only Stop may come from another.
 class VEXG_EXPORT PipeListener {
  public:
-  /// Takes the name.
+  /// Takes the name. A socket of that name which a service manager has opened for this process is
+  /// taken over (LISTEN_FDS); it stays the manager's when the listener goes.
   /// @param fault  [out] why not, when null is returned.
   static std::unique_ptr<PipeListener> Open(const std::string& name, PipeFault& fault,
                                             const ListenerLimits& limits = {});

@@ -16,7 +16,7 @@ import unittest.mock
 import xml.etree.ElementTree as ElementTree
 
 import vexg_client
-from support import SANITIZED, SOURCE, PipeTest, run, start, write_orva
+from support import EXAMPLES, SANITIZED, SOURCE, VEXG, PipeTest, run, start, write_orva
 
 WAIT = '<Command Name="w" ID="ExampleWaitCommand"><Input Seconds="60"/></Command>'
 SUM = '<Job><Command Name="s" ID="ExampleSumCommand"><Input Values="1:2 [1 2] "/></Command></Job>'
@@ -107,6 +107,34 @@ class Stop(Server):
             self.assertEqual(list(temporary.iterdir()), [])
             self.assertEqual(self.pipes(), [])
             self.server.communicate()
+
+    def test_a_socket_of_a_service_manager_outlives_the_servers_that_it_starts(self):
+        folder = pathlib.Path(self.runtime.name) / "vexg"
+        folder.mkdir(mode=0o700)
+        with socket.socket(socket.AF_UNIX) as listener:
+            listener.bind(str(folder / "test"))
+            listener.listen()
+            os.set_inheritable(listener.fileno(), True)
+            for end in ("word", signal.SIGTERM):
+                # The first client waits in the socket before there is a server.
+                answers = []
+                early = threading.Thread(
+                    target=lambda answers=answers: answers.append(vexg_client.Client("test").submit(SUM)))
+                early.start()
+                self.server = subprocess.Popen(
+                    ["sh", "-c", f"exec 3<&{listener.fileno()}; LISTEN_FDS=1 LISTEN_PID=$$ exec {VEXG} --load {EXAMPLES} serve test"],
+                    pass_fds=[listener.fileno()], stderr=subprocess.PIPE, text=True)
+                self.addCleanup(self.stop)
+                early.join(30)
+                self.assertEqual(answers[0]["s"]["Result"], "Success")
+                self.alive()
+                if end == "word":
+                    self.assertEqual(run("stop", "test")[0], 0)
+                else:
+                    self.server.send_signal(end)
+                self.assertEqual(self.server.wait(timeout=30), 0)
+                self.assertTrue((folder / "test").is_socket())
+                self.server.communicate()
 
     def test_a_new_file_is_published_and_a_large_answer_is_read_to_its_end(self):
         self.serve()
