@@ -70,12 +70,15 @@ void DcSrv::Execute(DcSrvCmd& cmd) {
     return;
   }
   cmd.abandons_ = IsAbandoning();
+  const bool isAlone = callers_++ == 0;
   queue_->Push(&cmd);
-  WaitBriefly([&] { return cmd.done_.load(std::memory_order_relaxed); });
+  // One of many waits for the turns of others, which is long.
+  if (isAlone) WaitBriefly([&] { return cmd.done_.load(std::memory_order_relaxed); });
   {
     std::unique_lock lock(cmd.mutex_);  // the thread has let go of the command when this is had
     cmd.replied_.wait(lock, [&] { return cmd.done_.load(); });
   }
+  --callers_;
   if (cmd.fault_.GetLength() != 0) SetFault(cmd.fault_);
   for (const std::string& warning : cmd.warnings_) AddWarning(warning);
 }

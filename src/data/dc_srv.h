@@ -77,6 +77,7 @@ class VEXG_EXPORT DcSrv : public ErrorState {
 
   std::unique_ptr<MTQueue<DcSrvCmd*>> queue_ = std::make_unique<MTQueue<DcSrvCmd*>>();
   std::unique_ptr<Thread> thread_;
+  std::atomic<unsigned> callers_{0};         // in Execute
   int process_ = platform::ProcessNumber();  // the one that the thread runs in
   std::mutex mutex_;                         // guards the start and the stop
 };
