@@ -40,7 +40,7 @@ bool Recognises(DataConnectionFactory& factory, const Array<String>& connStrings
 
 }  // namespace
 
-FormatDetection DetectFormats(const Array<String>& connStrings) {
+FormatDetection DetectFormats(const Array<String>& connStrings, DetectionExtent extent) {
   FormatDetection found;
   std::error_code fault;
   const std::string own = connStrings.GetCount() != 0
@@ -51,14 +51,20 @@ FormatDetection DetectFormats(const Array<String>& connStrings) {
   for (std::uint32_t row = 0; row < FormatCount(); ++row) {
     const FormatRecord& format = GetFormat(row);
     if (!MayUseFormat(format)) continue;
-    if (!head.MayBeOf(format) && IsOwnPlugin(LibraryName(format).ToUTF8())) continue;
+    const bool isOwnRow = IsOwnPlugin(LibraryName(format).ToUTF8());
+    if (isOwnRow && !head.MayBeOf(format)) continue;
+    if (extent == DetectionExtent::kToFirst && isOwnRow && !found.willing.empty() &&
+        GetFormat(found.willing.front()).kind == format.kind) {
+      found.isWhole = false;
+      continue;
+    }
     LoadFormat(row);
     DataConnectionFactory* const factory = GetFactory(format);
     if (factory == nullptr) {
       if (found.unread.GetLength() == 0) found.unread = WhyNotLoaded(format);
       continue;
     }
-    found.isOwn = found.isOwn && IsOwnPlugin(LibraryName(format).ToUTF8());
+    found.isOwn = found.isOwn && isOwnRow;
     if (Recognises(*factory, connStrings)) found.willing.push_back(row);
     if (const FileFault* const broken = faults.FirstOf(own)) {
       found.unread = Describe(*broken);

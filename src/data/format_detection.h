@@ -16,13 +16,23 @@ struct FormatDetection {
   String unread;
   /// Only plug-ins that come with the library were asked.
   bool isOwn = true;
+  /// False when rows were left out that wouldn't be tried before the first that is willing.
+  bool isWhole = true;
+};
+
+/// How many rows are asked.
+enum class DetectionExtent : unsigned {
+  kAll,     ///< all
+  kToFirst  ///< of the plug-ins that come with the library, none of its kind behind the first
+            ///< willing
 };
 
 /// Asks the rows of the table, in their order, whether they recognise a source.
 ///
 /// A plug-in that comes with the library is not asked, nor loaded, where the first bytes of a file
 /// are those of another format: what it would say is known. All others are asked, always.
-VEXG_EXPORT FormatDetection DetectFormats(const Array<String>& connStrings);
+VEXG_EXPORT FormatDetection DetectFormats(const Array<String>& connStrings,
+                                          DetectionExtent extent = DetectionExtent::kAll);
 
 /// While one lives, what ConnectDirect opens on this thread under no format's key was detected
 /// before. A null detection changes nothing.

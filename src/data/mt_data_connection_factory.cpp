@@ -79,20 +79,32 @@ DataConnectionPtr MtDataConnectionFactory::ConnectDirect(const Array<String>& co
     if (factory == nullptr) return {};
     return TryConnect(*factory, connStrings, geoRef, metadata);
   }
+  // The first that recognises a source is given its metadata where it is the only one.
+  const DetectionExtent extent = metadata ? DetectionExtent::kAll : DetectionExtent::kToFirst;
   const FormatDetection* known = DetectedScope::Current();
-  const FormatDetection detection = known != nullptr ? *known : DetectFormats(connStrings);
+  if (known != nullptr && !known->isWhole && metadata) known = nullptr;
+  FormatDetection detection = known != nullptr ? *known : DetectFormats(connStrings, extent);
   TakeFault();  // of rows that don't load: they are none of this source's
   if (detection.willing.empty()) {
     SetUnrecognised(detection, connStrings);
   }
-  const auto factoryOf = [](std::uint32_t row) { return GetFactory(GetFormat(row)); };
-  if (detection.willing.size() == 1) {
-    const DataConnectionPtr made =
-        TryConnect(*factoryOf(detection.willing.front()), connStrings, geoRef, metadata);
-    if (made) return made;
+  const auto connect = [&](std::uint32_t row, const MetadataPtr& more) {
+    return TryConnect(*GetFactory(GetFormat(row)), connStrings, geoRef, more);
+  };
+  std::size_t tried = 0;  // of the willing
+  if (!detection.isWhole) {
+    const std::uint32_t first = detection.willing.front();
+    if (const DataConnectionPtr made = connect(first, MetadataPtr())) return made;
+    const String fault = TakeFault();
+    detection = DetectFormats(connStrings);
+    if (fault.GetLength() != 0) SetFault(fault);
+    const bool isSame = !detection.willing.empty() && detection.willing.front() == first;
+    tried = isSame && detection.willing.size() > 1 ? 1 : 0;
+  } else if (detection.willing.size() == 1) {
+    if (const DataConnectionPtr made = connect(detection.willing.front(), metadata)) return made;
   }
-  for (const std::uint32_t row : detection.willing) {
-    const DataConnectionPtr made = TryConnect(*factoryOf(row), connStrings, geoRef, MetadataPtr());
+  for (; tried < detection.willing.size(); ++tried) {
+    const DataConnectionPtr made = connect(detection.willing[tried], MetadataPtr());
     if (made) return made;
   }
   return {};
@@ -125,7 +137,7 @@ DataConnectionPtr MtDataConnectionFactory::Connect(const Array<String>& connStri
   FormatDetection detection;
   bool isDetected = false;
   if (kind == 0) {
-    detection = DetectFormats(connStrings);
+    detection = DetectFormats(connStrings, DetectionExtent::kToFirst);
     TakeFault();
     kind = KindOf(detection);
     isDetected = kind != 0;

@@ -44,6 +44,7 @@ SourceHead::SourceHead(const Array<String>& connStrings) {
   }
   ending_ = LowerCase(fs::path(path).extension().string());
   bytes_ = LowerCase(bytes);
+  isRead_ = true;
 }
 
 bool SourceHead::Begins(const char* text) const {
@@ -51,8 +52,9 @@ bool SourceHead::Begins(const char* text) const {
 }
 
 bool SourceHead::MayBeOf(const FormatRecord& row) const {
-  if (row_.empty() || row.name == row_.c_str()) return true;
   const std::string name = row.name.ToUTF8();
+  if (isRead_ && name == "Shapefile") return ending_ == ".shp";
+  if (row_.empty() || row.name == row_.c_str()) return true;
   // Its mark lies in a file beside, so that nothing in this one rules it out.
   if (name == "ORVA") return true;
   if (name == "GRIB") {
@@ -65,7 +67,6 @@ bool SourceHead::MayBeOf(const FormatRecord& row) const {
   // And these by bytes at a place of theirs, or by the name of the file.
   if (name == "CEOS") return bytes_.find("\x3f\xc0\x12\x12") == 4;
   if (name == "Esri") return ending_ == ".adf";
-  if (name == "Shapefile") return ending_ == ".shp";
   if (name == "HDF5")
     return ending_ != ".tif" && ending_ != ".tiff" && ending_ != ".jpg" && ending_ != ".jpeg" &&
            ending_ != ".png" && ending_ != ".gif" && ending_ != ".img";

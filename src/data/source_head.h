@@ -21,6 +21,7 @@ class SourceHead {
  private:
   bool Begins(const char* text) const;
 
+  bool isRead_ = false;
   std::string ending_;  // of the file's name, in small letters, with its dot
   std::string bytes_;   // in small letters too, where they are letters
   std::string row_;     // the key of the format whose mark the file begins with; none

@@ -31,7 +31,13 @@ std::vector<std::uint32_t> AskAll(const std::string& path) {
 }
 
 void ExpectAsAsked(const std::string& path) {
-  EXPECT_EQ(DetectFormats(test::Strings({path})).willing, AskAll(path)) << path;
+  const std::vector<std::uint32_t> all = AskAll(path);
+  EXPECT_EQ(DetectFormats(test::Strings({path})).willing, all) << path;
+  const FormatDetection first = DetectFormats(test::Strings({path}), DetectionExtent::kToFirst);
+  EXPECT_EQ(first.willing.empty(), all.empty()) << path;
+  if (first.willing.empty() || all.empty()) return;
+  EXPECT_EQ(first.willing.front(), all.front()) << path;
+  EXPECT_TRUE(first.isWhole ? first.willing == all : first.willing.size() <= all.size()) << path;
 }
 
 TEST(FormatDetection, FindsTheRowsThatAskingAllFinds) {
