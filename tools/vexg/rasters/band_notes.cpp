@@ -24,6 +24,10 @@ RasterNotes ReadNotes(const JobResults& results, unsigned bands) {
         {text("Description"), text("Meaning"), text("Unit"), text("Scale"), text("Offset")});
     if (notes.bands.back().meaning == "Alpha") notes.alpha = band;
   }
+  if (const Json& storage = all["storage"]; storage.is_object()) {
+    notes.blocks = {storage["blocks"][0].get<unsigned>(), storage["blocks"][1].get<unsigned>()};
+    if (const Json& word = storage["compression"]; word.is_string()) notes.compression = word;
+  }
   const Json& place = all["geoRef"];
   if (place.is_object()) notes.epsg = place["epsg"].get<long>();
   return notes;

@@ -26,6 +26,8 @@ struct RasterNotes {
   std::vector<BandNotes> bands;
   std::optional<unsigned> alpha;  ///< the band that says which pixels count
   long epsg = 0;                  ///< code of the coordinate system; 0 for none
+  TileDimensions blocks;          ///< of the file; 0 where it says nothing
+  std::string compression;        ///< of the file, "none", or empty where it says nothing
 };
 
 /// Adds the command that asks a raster for them.

@@ -143,6 +143,19 @@ Json NotesAsJson(const RasterNotes& notes) {
   return list;
 }
 
+/// The blocks of the file, or those that reading goes by where it says nothing of them.
+TileDimensions BlocksOf(const RasterInfo& info, const RasterNotes& notes) {
+  return notes.blocks.width != 0 ? notes.blocks : info.tiles;
+}
+
+std::string BlocksAsText(const RasterInfo& info, const RasterNotes& notes) {
+  const TileDimensions blocks = BlocksOf(info, notes);
+  if (blocks.width == 0) return "none";
+  if (blocks.width < info.samples) return fmt::format("{} x {}", blocks.width, blocks.height);
+  const unsigned lines = std::min(blocks.height, info.lines);
+  return lines <= 1 ? "single lines" : fmt::format("strips of {} lines", lines);
+}
+
 Json AsJson(const std::string& file, const RasterInfo& info, const RasterNotes& notes) {
   return {{"file", file},
           {"format", info.format.ToUTF8()},
@@ -151,7 +164,8 @@ Json AsJson(const std::string& file, const RasterInfo& info, const RasterNotes& 
           {"bands", info.bands},
           {"dataType", DataTypeName(info.dataType).ToUTF8()},
           {"interleave", FormatValue(info.interleave).ToUTF8()},
-          {"blockSize", Json::array({info.tiles.width, info.tiles.height})},
+          {"blockSize", Json::array({BlocksOf(info, notes).width, BlocksOf(info, notes).height})},
+          {"compression", notes.compression.empty() ? Json() : Json(notes.compression)},
           {"noData", NoDataAsJson(info)},
           {"hasPalette", FlagsAsJson(info.hasPalette)},
           {"bandDetails", NotesAsJson(notes)},
@@ -216,17 +230,19 @@ std::string GeoRefAsText(const RasterInfo& info, const RasterNotes& notes, bool 
 }
 
 /// A line for each band that says something of itself.
-std::string BandsAsText(const RasterNotes& notes) {
+std::string BandsAsText(const RasterNotes& notes, const RasterInfo& info) {
   std::string text;
   for (std::size_t i = 0; i < notes.bands.size(); ++i) {
     const BandNotes& band = notes.bands[i];
-    if (band.IsEmpty()) continue;
+    const bool hasPalette = info.hasPalette[static_cast<unsigned>(i)];
+    if (band.IsEmpty() && !hasPalette) continue;
     std::string words;
     const auto add = [&](const std::string& word) {
       if (!word.empty()) words.append(words.empty() ? "" : ", ").append(Printable(word));
     };
     add(band.name);
     add(band.meaning);
+    if (hasPalette) add("colours of a palette");
     if (band.IsScaled()) add("value = " + band.GetScaling());
     if (!band.unit.empty()) add("in " + band.unit);
     text += fmt::format("  {:<14} {}\n", fmt::format("band {}", i), words);
@@ -242,12 +258,12 @@ std::string AsText(const std::string& file, const RasterInfo& info, const Raster
                       info.bands);
   text += fmt::format("  pixels         {}, {}\n", DataTypeName(info.dataType).ToUTF8(),
                       FormatValue(info.interleave).ToUTF8());
-  const bool isTiled = info.tiles.height > 1;
-  text += fmt::format("  blocks         {}\n",
-                      isTiled ? fmt::format("{} x {}", info.tiles.width, info.tiles.height)
-                              : std::string("whole lines"));
+  text += fmt::format("  blocks         {}\n", BlocksAsText(info, notes));
+  if (!notes.compression.empty()) {
+    text += fmt::format("  compression    {}\n", Printable(notes.compression));
+  }
   text += fmt::format("  no data        {}\n", BandsAsText(NoDataAsJson(info)));
-  text += BandsAsText(notes);
+  text += BandsAsText(notes, info);
   if (notes.alpha) {
     text += fmt::format("  valid pixels   where band {}, alpha, is not 0\n", *notes.alpha);
   }
