@@ -13,6 +13,7 @@
 #include "gdal_details.h"
 #include "gdal_raster.h"
 #include "raster/pixel_types.h"
+#include "raster/raster_storage.h"
 
 namespace lumo::gdal {
 namespace {
@@ -145,13 +146,34 @@ void CollectBands(GDALDatasetH dataset, MetadataContainer& texts) {
       texts);
 }
 
+/// The codec of the pixels, of the file or of its first band.
+std::string CompressionOf(GDALDatasetH dataset, GDALRasterBandH band) {
+  for (GDALMajorObjectH object : {dataset, band}) {
+    const char* const word = GDALGetMetadataItem(object, "COMPRESSION", "IMAGE_STRUCTURE");
+    if (word != nullptr) return word;
+  }
+  // Of these a file says so when it is packed.
+  const std::string_view driver = GDALGetDriverShortName(GDALGetDatasetDriver(dataset));
+  return IsOneOf(driver, {"GTiff", "COG", "HFA"}) ? "none" : std::string();
+}
+
 }  // namespace
+
+RasterStorage ReadStorage(GDALDatasetH dataset) {
+  GDALRasterBandH band = GDALGetRasterBand(dataset, 1);
+  if (band == nullptr) return {};
+  int width = 0, height = 0;
+  GDALGetBlockSize(band, &width, &height);
+  return {static_cast<unsigned>(std::max(width, 0)), static_cast<unsigned>(std::max(height, 0)),
+          CompressionOf(dataset, band)};
+}
 
 Metadata ReadMetadata(GDALDatasetH dataset, bool hasGrid) {
   Metadata metadata;
   VisitDomains(dataset, false,
                [&](const String& path, const char* value) { metadata.Set(path, value); });
   ReadDetails(dataset, hasGrid, metadata);
+  SetStorage(metadata, ReadStorage(dataset));
   return metadata;
 }
 

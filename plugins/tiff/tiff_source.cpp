@@ -10,6 +10,7 @@
 #include "gdal_common/level_number.h"
 #include "raster/pixel_types.h"
 #include "raster/raster_details.h"
+#include "raster/raster_storage.h"
 #include "tiff/tiff_place.h"
 #include "tiff/tiff_siblings.h"
 
@@ -232,7 +233,9 @@ bool Source::Describe(const String& formatKey) {
     item(named.name, text, true);
   }
   structure("INTERLEAVE", image.byPixel ? "PIXEL" : "BAND");
-  if (const char* const word = WordOf(image)) structure("COMPRESSION", word);
+  const char* const word = WordOf(image);
+  if (word != nullptr) structure("COMPRESSION", word);
+  SetStorage(metadata, {image.blockWidth, image.blockHeight, word != nullptr ? word : "none"});
   if (image.jpeg != nullptr) {
     const std::optional<JpegTables> tables = FindJpegTables(*image.jpeg);
     if (!tables) return false;

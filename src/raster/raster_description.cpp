@@ -8,6 +8,7 @@
 #include "raster/pixel_types.h"
 #include "raster/raster_def.h"
 #include "raster/raster_details.h"
+#include "raster/raster_storage.h"
 
 namespace lumo {
 namespace {
@@ -99,6 +100,14 @@ Json GeoRefOf(const RasterDef& def) {
           {"isGeographic", system.Type() == 1}};
 }
 
+/// How the pixels lie in the file below, where its reader knows.
+Json StorageOf(const RasterDef& def) {
+  const std::optional<RasterStorage> storage = FindStorage(def.metadata);
+  if (!storage) return nullptr;
+  return {{"blocks", {storage->blockWidth, storage->blockHeight}},
+          {"compression", storage->compression.empty() ? Json() : Json(storage->compression)}};
+}
+
 Json DetailsOf(const RasterDef& def) {
   Json details = Json::object();
   for (const std::string& name : DetailNames(def.metadata)) {
@@ -121,6 +130,7 @@ std::string DescribeRaster(const BasicRaster& raster) {
                          {"interleave", FormatValue(def.interleave).ToUTF8()},
                          {"format", def.format.ToUTF8()},
                          {"tiles", {tiles.width, tiles.height}},
+                         {"storage", StorageOf(def)},
                          {"canWrite", raster.CanWrite()},
                          {"noData", NoDataOf(raster, def)},
                          {"palettes", PalettesOf(raster)},

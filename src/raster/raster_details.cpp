@@ -4,6 +4,8 @@
 #include <charconv>
 #include <map>
 
+#include "raster/raster_storage.h"
+
 namespace lumo {
 namespace {
 
@@ -166,6 +168,7 @@ void KeepDetails(Metadata& metadata, KeptDetails kept) {
   for (const std::string& name : DetailNames(metadata)) {
     if (!IsKept(name, kept)) metadata.Remove(DetailPath(name));
   }
+  DropStorage(metadata);
 }
 
 }  // namespace lumo

@@ -6,7 +6,7 @@ import subprocess
 import time
 import unittest
 
-from support import DATA, FolderTest, needs_data, needs_gdal, read_png, run
+from support import DATA, FolderTest, gdal_pixels, needs_data, needs_gdal, read_png, run
 
 
 @needs_data
@@ -16,13 +16,41 @@ class Pictures(FolderTest):
         source = DATA / "landsat7_rgb.png"
         for verb in (["quicklook", source], ["hist", source, "-o"]):
             for name, begin in (("a.png", b"\x89PNG"), ("b.PNG", b"\x89PNG"), ("c.jpg", b"\xff\xd8\xff"),
-                                ("d.JPEG", b"\xff\xd8\xff")):
+                                ("d.JPEG", b"\xff\xd8\xff"), ("e.webp", b"RIFF")):
                 with self.subTest(verb=verb[0], name=name):
                     self.fine(*verb, self.folder / name, "--overwrite")
                     self.assertTrue((self.folder / name).read_bytes().startswith(begin))
-            for name in ("e.gif", "f.tif", "g", "h.png.x"):
-                self.fails(2, "a picture is named .png, .jpg or .jpeg", *verb, self.folder / name)
+            for name in ("f.gif", "f.tif", "g", "h.png.x"):
+                self.fails(2, "named .", *verb, self.folder / name)
                 self.assertFalse((self.folder / name).exists())
+        self.fails(2, "a picture is named .png, .jpg, .jpeg or .webp", "quicklook", source, self.folder / "a.svg")
+
+    def test_a_webp_shows_what_the_png_does(self):
+        """To the bit where there are few colours, and transparent at the same places."""
+        labels = self.folder / "labels.tif"
+        subprocess.run(["gdal_calc.py", "-A", DATA / "landsat7_rgb.png", "--calc", "A//64*80", "--outfile", labels, "--quiet"],
+                       check=True, capture_output=True)
+        for source, most, options in ((labels, 0, ["--stretch", "none"]), (DATA / "alpha.tif", 6, []),
+                                      (DATA / "landsat7_rgb.png", 6, [])):
+            with self.subTest(source=source.name):
+                pictures = []
+                for name in ("q.png", "q.webp"):
+                    self.fine("quicklook", source, self.folder / name, "--overwrite", "--size", "300", *options)
+                    pictures.append(gdal_pixels(self.folder / name))
+                png, webp = pictures
+                width, height, channels, _ = read_png(self.folder / "q.png")
+                kept = len(webp) // (width * height)
+                self.assertEqual(kept, max(channels, 3) if channels % 2 else 4)
+                off = shown = 0
+                for i in range(width * height):
+                    a, b = png[i * channels:(i + 1) * channels], webp[i * kept:(i + 1) * kept]
+                    a = a if channels > 2 else a[:1] * 3 + a[1:]
+                    if kept == 4:
+                        self.assertEqual(a[3], b[3])
+                    if kept == 3 or a[3]:
+                        off += sum(abs(x - y) for x, y in zip(a[:3], b[:3]))
+                        shown += 3
+                self.assertLessEqual(off / shown, most)
 
     def test_a_jpeg_shows_what_the_png_does_and_white_for_what_is_not_valid(self):
         mask = self.folder / "mask.tif"

@@ -51,7 +51,7 @@ class Documents(PipeTest):
             self.assertEqual(shell.returncode, 0, shell.stderr)
             self.assertEqual(sorted(path.name for path in pathlib.Path(folder).iterdir()),
                              ["areas.csv", "areas.gpkg", "both.tif", "cloud.tif", "fields.csv", "fields.shape.fxa", "fields.spectral.fxa",
-                              "geographic.tif", "histogram.png", "labels.tif", "layers.tif", "layers.tif.aux.xml", "part.npy", "part.tif",
+                              "geographic.tif", "histogram.svg", "labels.tif", "layers.tif", "layers.tif.aux.xml", "part.npy", "part.tif",
                               "ratio.tif",
                               "reflectance.tif", "scene.dat", "scene.dat.hdr", "scene.png", "scene.tif", "scene.tif.pyr",
                               "segments.tif", "small.tif"])

@@ -60,6 +60,8 @@ class Guide(PipeTest, FolderTest):
         self.assertEqual(out.split()[-1], "5000")
         self.assertIn("median", out)
         self.assertEqual(read_png(self.folder / "scene.png")[:3], (349, 352, 3))
+        self.assertIn("scene.tif, band 3", (self.folder / "values.svg").read_text())
+        self.assertLess((self.folder / "scene.webp").stat().st_size, (self.folder / "scene.png").stat().st_size / 2)
         self.assertTrue((self.folder / "area.jpg").read_bytes().startswith(b"\xff\xd8\xff"))
         _, _, channels, pixels = read_png(self.folder / "parcels.png")
         self.assertEqual((channels, set(pixels[3::4])), (4, {0, 255}))

@@ -61,6 +61,39 @@ class Info(FolderTest):
         for words in ("349 samples, 352 lines, 6 bands", "Byte", "28.5 28.5", "upperLeft"):
             self.assertIn(words, text)
 
+    @needs_gdal
+    def test_tells_how_pixels_lie_in_the_file(self):
+        """Blocks and codecs as GDAL tells them, of files that are read by our own reader and by GDAL."""
+        plain, made = DATA / "landsat7_olinda.tif", self.folder / "made"
+        for ending, driver, options in (
+                (".tif", "GTiff", []), (".tif", "GTiff", ["BLOCKYSIZE=23", "COMPRESS=LZW", "PREDICTOR=2"]),
+                (".tif", "GTiff", ["TILED=YES", "BLOCKXSIZE=64", "BLOCKYSIZE=96", "COMPRESS=DEFLATE"]),
+                (".tif", "GTiff", ["COMPRESS=ZSTD", "BLOCKYSIZE=352"]), (".tif", "GTiff", ["COMPRESS=PACKBITS"]),
+                (".tif", "COG", ["COMPRESS=LERC", "BLOCKSIZE=128"]), (".img", "HFA", ["COMPRESSED=YES"]), (".img", "HFA", []),
+                (".jp2", "JP2OpenJPEG", ["BLOCKXSIZE=128", "BLOCKYSIZE=128"]), (".png", "PNG", [])):
+            with self.subTest(driver=driver, options=options):
+                file = made.with_suffix(ending)
+                bands = ["-b", "1", "-b", "2", "-b", "3"]
+                subprocess.run(["gdal_translate", "-q", *bands, "-of", driver, *(word for option in options for word in ("-co", option)),
+                                plain, file], check=True)
+                theirs = json.loads(subprocess.run(["gdalinfo", "-json", file], capture_output=True, text=True, check=True).stdout)
+                ours = json.loads(self.fine("info", "--json", file))
+                self.assertEqual(ours["blockSize"], theirs["bands"][0]["block"])
+                parts = (theirs, theirs["bands"][0])
+                codec = next((part["metadata"]["IMAGE_STRUCTURE"]["COMPRESSION"] for part in parts
+                              if "COMPRESSION" in part["metadata"].get("IMAGE_STRUCTURE", {})), None)
+                self.assertEqual(ours["compression"], codec or ("none" if driver in ("GTiff", "HFA") else None))
+                width, height = ours["blockSize"]
+                block = f"{width} x {height}" if width < 349 else f"strips of {height} lines" if height > 1 else "single lines"
+                self.assertRegex(self.fine("info", file), rf"  blocks +{block}\n")
+                # A copy is told of as it lies itself.
+                copy = self.folder / "copy.tif"
+                self.fine("copy", file, copy, "--overwrite", "--tile", "256", "--compress", "deflate", "-q")
+                self.assertEqual([json.loads(self.fine("info", "--json", copy))[name] for name in ("blockSize", "compression")],
+                                 [[256, 256], "DEFLATE"])
+                for path in self.folder.iterdir():
+                    path.unlink()
+
     def test_goes_on_after_a_bad_file(self):
         code, out, err = run("info", "--json", str(DATA / "rgb1.tif"), "nowhere", str(DATA / "rgb2.tif"))
         self.assertEqual((code, len(json.loads(out)), err.count("\n")), (1, 2, 1))

@@ -432,8 +432,8 @@ class SegmentTest(FolderTest):
         table = self.fine("segment", "--suggest", tree).splitlines()
         self.assertEqual([float(row.split()[0]) for row in table[1:]],
                          [float(f"{one['mergeValue']:.6g}") for one in told["suggested"]])
-        self.fine("segment", "--suggest", tree, "-o", self.folder / "curve.png", "-q")
-        self.assertTrue((self.folder / "curve.png").exists())
+        self.fine("segment", "--suggest", tree, "-o", self.folder / "curve.svg", "-q")
+        self.assertEqual((self.folder / "curve.svg").read_text().count(" stroke=\"#1f5a96\""), 2)
         document = self.fine("segment", "levels", tree, "--values", "1,2", "-o", self.folder / "p", "--print-job")
         self.fine("run", "-", stdin=document)
         self.assertTrue((self.folder / "p.2.tif").exists())
@@ -483,8 +483,8 @@ class SegmentTest(FolderTest):
         self.fine("segment", scene, self.folder / "l.dat", "--format", "ORVA", "--merge-percent", 100, "-q")
         labels = struct.unpack("<1600i", (self.folder / "l.dat").read_bytes())
         self.assertEqual(len(set(labels)), 1)  # all merges are done
-        self.fine("segment", "--estimate", scene, "-o", self.folder / "curves.png", "-q")
-        self.assertTrue((self.folder / "curves.png").exists())
+        self.fine("segment", "--estimate", scene, "-o", self.folder / "curves.svg", "-q")
+        self.assertEqual((self.folder / "curves.svg").read_text().count(" stroke=\"#1f5a96\""), 2)
 
 
 if __name__ == "__main__":

@@ -1,44 +1,80 @@
 """STAC items, world files, and what class rasters keep."""
 
 import json
+import math
 import subprocess
 import unittest
 
 from creation_test import Creation, by_gdal, has_gdal_python
 from support import DATA, needs_data, run
 
-# The fields that STAC 1.0.0 and its extensions ask for in an item, written from their texts.
+EXTENSIONS = "https://stac-extensions.github.io/"
+
+
+def fields_of(prefix, fields):
+    """An object whose fields of a prefix are these alone."""
+    return {"type": "object", "properties": fields, "patternProperties": {f"^(?!{prefix}:)": {}}, "additionalProperties": False}
+
+
+def named(extension):
+    return {"contains": {"const": f"{EXTENSIONS}{extension}/v1.1.0/schema.json"}}
+
+
+NUMBERS = {"type": "array", "items": {"type": "number"}}
+POSITION = {**NUMBERS, "minItems": 2, "maxItems": 3}
+PROJECTION = fields_of("proj", {
+    "proj:epsg": {"type": ["integer", "null"]},
+    "proj:shape": {"type": "array", "minItems": 2, "maxItems": 2, "items": {"type": "integer"}},
+    "proj:transform": {**NUMBERS, "oneOf": [{"minItems": 6, "maxItems": 6}, {"minItems": 9, "maxItems": 9}]}})
+CLASSIFICATION = fields_of("classification", {"classification:classes": {
+    "type": "array", "uniqueItems": True, "minItems": 1, "items": {
+        "type": "object", "required": ["value", "description"],
+        "properties": {"value": {"type": "integer"}, "description": {"type": "string"}, "name": {"type": "string"},
+                       "color_hint": {"type": "string", "pattern": "^([0-9A-Fa-f]{6})$"}}}}})
+BAND = {
+    "type": "object", "minProperties": 1,
+    "properties": {
+        "data_type": {"enum": ["int8", "int16", "int32", "int64", "uint8", "uint16", "uint32", "uint64", "float16",
+                               "float32", "float64", "cint16", "cint32", "cfloat32", "cfloat64", "other"]},
+        "name": {"type": "string"}, "unit": {"type": "string"},
+        "nodata": {"oneOf": [{"type": "number"}, {"enum": ["nan", "inf", "-inf"]}]},
+        "scale": {"type": "number"}, "offset": {"type": "number"}, "spatial_resolution": {"type": "number"}}}
+ASSET = {
+    "type": "object", "required": ["href"],
+    "properties": {
+        "href": {"type": "string", "minLength": 1}, "type": {"type": "string"},
+        "roles": {"type": "array", "items": {"type": "string"}},
+        "raster:bands": {"type": "array", "minItems": 1, "items": {"allOf": [BAND, CLASSIFICATION]}}}}
+# What STAC 1.0.0 and version 1.1.0 of its three extensions ask of an item, written from their texts.
 ITEM = {
     "type": "object",
     "required": ["type", "stac_version", "stac_extensions", "id", "geometry", "properties", "links", "assets"],
     "properties": {
         "type": {"const": "Feature"},
         "stac_version": {"const": "1.0.0"},
-        "stac_extensions": {"type": "array", "uniqueItems": True, "items": {
-            "pattern": "^https://stac-extensions.github.io/(projection|raster|classification)/v1.1.0/schema.json$"}},
+        "stac_extensions": {"type": "array", "uniqueItems": True, "items": {"type": "string", "format": "iri"},
+                            "allOf": [named("projection"), named("raster")]},
         "id": {"type": "string", "minLength": 1},
-        "bbox": {"type": "array", "minItems": 4, "maxItems": 4, "items": {"type": "number"}},
-        "properties": {
-            "type": "object", "required": ["datetime", "proj:epsg", "proj:shape"],
-            "properties": {
-                "datetime": {"pattern": r"^\d{4}-\d\d-\d\dT\d\d:\d\d:\d\dZ$"},
-                "proj:epsg": {"type": ["integer", "null"]},
-                "proj:shape": {"type": "array", "minItems": 2, "maxItems": 2, "items": {"type": "integer"}},
-                "proj:transform": {"type": "array", "minItems": 6, "maxItems": 6, "items": {"type": "number"}}}},
-        "links": {"type": "array"},
-        "assets": {"type": "object", "minProperties": 1, "additionalProperties": {
-            "type": "object", "required": ["href", "type", "roles", "raster:bands"],
-            "properties": {"raster:bands": {"type": "array", "minItems": 1, "items": {
-                "type": "object",
-                "properties": {
-                    "data_type": {"enum": ["int8", "int16", "int32", "int64", "uint8", "uint16", "uint32", "uint64",
-                                           "float32", "float64", "cfloat32", "cfloat64"]},
-                    "nodata": {"oneOf": [{"type": "number"}, {"enum": ["nan", "inf", "-inf"]}]},
-                    "scale": {"type": "number"}, "offset": {"type": "number"}, "unit": {"type": "string"},
-                    "classification:classes": {"type": "array", "minItems": 1, "items": {
-                        "required": ["value", "description"],
-                        "properties": {"value": {"type": "integer"}, "description": {"type": "string"},
-                                       "color_hint": {"pattern": "^[0-9A-F]{6}$"}}}}}}}}}}},
+        "properties": {"allOf": [
+            {"type": "object", "required": ["datetime"],
+             "properties": {name: {"type": "string", "pattern": r"^\d{4}-\d\d-\d\dT\d\d:\d\d:\d\d(\.\d+)?Z$"}
+                            for name in ("datetime", "created")}},
+            PROJECTION, fields_of("classification", {})]},
+        "links": {"type": "array", "items": {"required": ["rel", "href"]}},
+        "assets": {"type": "object", "minProperties": 1,
+                   "additionalProperties": {"allOf": [ASSET, PROJECTION, CLASSIFICATION, fields_of("raster", {"raster:bands": {}})]}}},
+    # An item with a place has a box, of one without there is none.
+    "oneOf": [
+        {"required": ["bbox"], "properties": {
+            "bbox": {**NUMBERS, "oneOf": [{"minItems": 4, "maxItems": 4}, {"minItems": 6, "maxItems": 6}]},
+            "geometry": {"type": "object", "required": ["type", "coordinates"], "properties": {
+                "type": {"const": "Polygon"},
+                "coordinates": {"type": "array", "items": {"type": "array", "minItems": 4, "items": POSITION}}}}}},
+        {"not": {"required": ["bbox"]}, "properties": {"geometry": {"type": "null"}}}],
+    # Who has classes names their extension.
+    "if": {"properties": {"assets": {"additionalProperties": {"properties": {"raster:bands": {"items": {
+        "not": {"required": ["classification:classes"]}}}}}}}},
+    "then": {}, "else": {"properties": {"stac_extensions": named("classification")}},
 }
 
 CLASSES = """
@@ -108,6 +144,30 @@ class Stac(Creation):
                 for found, want in zip(properties["proj:transform"], size[2:]):
                     self.assertAlmostEqual(found, want, delta=1e-9 * max(1, abs(want)))
                 self.check_footprint(made, item)
+
+    @needs_data
+    def test_pixels_are_measured_in_metres(self):
+        """On the ellipsoid, where a grid is in degrees; by the number of feet in a metre."""
+        made = self.folder / "degrees.tif"
+        self.fine("warp", DATA / "landsat7_olinda.tif", made, "--to", "EPSG:4326", "-q")
+        _, degrees = self.item(made)
+        size = by_gdal("d = gdal.Open(sys.argv[1])\nt = d.GetGeoTransform()\n"
+                       "print(json.dumps([t[1], -t[5], t[3] + t[5] * d.RasterYSize / 2]))", made)
+        a, e2, angle = 6378137.0, 0.00669437999014, math.radians(size[2])
+        bent = 1 - e2 * math.sin(angle) ** 2
+        want = (math.radians(size[0]) * math.cos(angle) * a / bent ** 0.5 + math.radians(size[1]) * a * (1 - e2) / bent ** 1.5) / 2
+        feet = self.folder / "feet.tif"
+        subprocess.run(["gdal_translate", "-q", "-a_srs", "EPSG:2263", "-a_ullr", "1000000", "200000", "1000600", "199400",
+                        "-outsize", "20", "20", DATA / "RGB.byte.tif", feet], check=True)
+        bare = self.folder / "bare.tif"
+        subprocess.run(["gdal_translate", "-q", DATA / "landsat7_rgb.png", bare], check=True)
+        for item, metres in ((degrees, want), (self.item(DATA / "landsat7_olinda.tif")[1], 28.5),
+                             (self.item(feet)[1], 30 * 1200 / 3937), (self.item(bare)[1], None)):
+            for band in item["assets"]["data"]["raster:bands"]:
+                if metres is None:
+                    self.assertNotIn("spatial_resolution", band)
+                else:
+                    self.assertAlmostEqual(band["spatial_resolution"], metres, delta=1e-6 * metres)
 
     def check_footprint(self, made, item):
         """The corners as PROJ puts them, by GDAL's own program."""

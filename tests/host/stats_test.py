@@ -9,6 +9,7 @@ import re
 import shutil
 import subprocess
 import unittest
+from xml.etree import ElementTree
 
 from support import DATA, FolderTest, needs_data, needs_gdal, read_npy, read_png, run, start, table, write_orva
 
@@ -207,17 +208,41 @@ class Hist(RasterTest):
                     self.assertEqual(band["counts"], counts)
                     self.assertLessEqual(low + size * (len(counts) - 1), high)
 
-    def test_picture(self):
-        picture = self.folder / "h.png"
-        self.fine("hist", DATA / "rgb1.tif", "-o", picture)
-        width, height, channels, pixels = read_png(picture)
-        self.assertEqual((channels, height % 3), (1, 0))
-        # The highest bar of each panel is as high as the axis: a column of 126 dark grey dots.
-        panel = width * height // 3
-        for top in range(0, len(pixels), panel):
-            bars = [pixels[top + x:top + panel:width].count(90) for x in range(width)]
-            self.assertEqual(max(bars), 126)
-        code, _, err = run("hist", str(DATA / "rgb1.tif"), "-o", str(picture))
+    def test_plots_tell_bands_units_and_counts(self):
+        """Bars of an SVG have the heights of the counts; a PNG shows the same at the same places."""
+        scene, plot = self.folder / "scene.tif", self.folder / "h.svg"
+        subprocess.run(["gdal_translate", "-q", DATA / "rgb1.tif", scene], check=True)
+        subprocess.run(["gdal_edit.py", "-colorinterp_1", "undefined", "-units", "K & <C>", scene], check=True)
+        bands = self.hist(scene, "--bins", "16")
+        self.fine("hist", scene, "--bins", "16", "-o", plot)
+        root = ElementTree.parse(plot).getroot()
+        space = "{http://www.w3.org/2000/svg}"
+        texts = [text.text for text in root.iter(space + "text")]
+        for band in bands:
+            self.assertTrue(any(text.startswith(f"scene.tif, band {band['band']}") for text in texts), texts)
+        self.assertEqual(texts.count("pixel value (K & <C>)"), len(bands))
+        self.assertEqual(sum(text.endswith("pixels") for text in texts), len(bands))
+        bars = [[tuple(map(float, place.split(","))) for place in area.get("points").split()]
+                for area in root.iter(space + "polygon")]
+        self.assertEqual(len(bars), len(bands))
+        self.fine("hist", scene, "--bins", "16", "--bands", "0", "-o", self.folder / "h.png")
+        width, height, channels, pixels = read_png(self.folder / "h.png")
+        self.assertEqual((width, height), (2 * int(root.get("width")), 2 * int(root.get("height")) // len(bands)))
+        for band, bar in zip(bands, bars):
+            counts, base = band["counts"], bar[0][1]
+            heights = [base - y for _, y in bar[1:-1]]
+            unit = max(heights) / max(counts)
+            for i, count in enumerate(counts):
+                for tall in heights[2 * i:2 * i + 2]:
+                    self.assertAlmostEqual(tall, max(count * unit, 0.75 if count else 0), delta=0.02)
+                if band["band"] != 0:
+                    continue
+                middle = round(bar[1 + 2 * i][0] + bar[2 + 2 * i][0])  # in pixels, of which a unit has two
+                column = [pixels[(y * width + middle) * channels:][:3] for y in range(height)]
+                blue = sum(1 for y in range(round(2 * (base - max(heights))), round(2 * base) - 1)
+                           if column[y][2] > column[y][0] + 60)
+                self.assertAlmostEqual(blue, max(0, 2 * heights[2 * i] - 1), delta=2)
+        code, _, err = run("hist", str(scene), "-o", str(plot))
         self.assertEqual(code, 2)
         self.assertIn("--overwrite", err)
 

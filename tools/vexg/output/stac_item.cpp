@@ -189,6 +189,25 @@ Json NoDataOfBand(const RasterInfo& info, unsigned band) {
   return value;
 }
 
+/// The mean of a pixel's width and height in metres, of one in degrees at the middle of the raster;
+/// nothing where the size of a pixel isn't known.
+std::optional<double> ResolutionOf(const RasterInfo& info) {
+  if (!info.geoRef || info.geoRef->GetType() == GeoRef::kRpc) return std::nullopt;
+  const CoordSys& system = info.geoRef->CoordinateSystem();
+  const double factor = system.Info()->unitFactor;
+  double width = std::abs(info.geoRef->PixelSizeX()) * factor;
+  double height = std::abs(info.geoRef->PixelSizeY()) * factor;
+  if (system.Type() == 1) {
+    constexpr std::int32_t kMetre = 9001, kDegree = 9102;
+    double x = 0, y = 0;
+    if (!info.geoRef->PixelToMap(info.samples / 2.0, info.lines / 2.0, x, y)) return std::nullopt;
+    CoordSys::ConvertUnits(width, height, kDegree, kMetre, width, height, y * factor);
+  }
+  const double mean = (width + height) / 2;
+  const bool isKnown = system.Type() != 0 && std::isfinite(mean) && mean > 0;
+  return isKnown ? std::optional(mean) : std::nullopt;
+}
+
 Json BandOf(const StacRaster& raster, const std::map<std::string, std::string>& details,
             unsigned band) {
   const RasterInfo& info = raster.contents.info;
@@ -203,9 +222,7 @@ Json BandOf(const StacRaster& raster, const std::map<std::string, std::string>& 
   if (!detail("Unit").empty()) entry["unit"] = detail("Unit");
   if (!detail("Scale").empty()) entry["scale"] = std::stod(detail("Scale"));
   if (!detail("Offset").empty()) entry["offset"] = std::stod(detail("Offset"));
-  if (info.geoRef && info.geoRef->GetType() != GeoRef::kRpc) {
-    entry["spatial_resolution"] = NumberAsJson(std::abs(info.geoRef->PixelSizeX()));
-  }
+  if (const auto metres = ResolutionOf(info)) entry["spatial_resolution"] = *metres;
   const Json classes = ClassesOf(raster.categories[band], raster.palettes[band]);
   if (!classes.empty()) entry["classification:classes"] = classes;
   return entry;

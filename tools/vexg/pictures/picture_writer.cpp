@@ -3,8 +3,10 @@
 #include <filesystem>
 #include <vector>
 
+#include "foundation/text_case.h"
 #include "pictures/jpeg_writer.h"
 #include "pictures/png_writer.h"
+#include "pictures/webp_writer.h"
 #include "verb.h"
 
 namespace lumo::host {
@@ -51,33 +53,43 @@ class OpaquePicture final : public PictureWriter {
   std::vector<unsigned char> opaque_;
 };
 
-enum class Format { kNone, kPng, kJpeg };
+enum class Format { kNone, kPng, kJpeg, kWebp };
 
 Format FormatOf(const std::string& name) {
-  std::string ending = std::filesystem::path(name).extension().string();
-  for (char& c : ending) {
-    if (c >= 'A' && c <= 'Z') c = static_cast<char>(c - 'A' + 'a');
+  static constexpr std::pair<const char*, Format> kEndings[] = {{".png", Format::kPng},
+                                                                {".jpg", Format::kJpeg},
+                                                                {".jpeg", Format::kJpeg},
+                                                                {".webp", Format::kWebp}};
+  const std::string ending = LowerCase(std::filesystem::path(name).extension().string());
+  for (const auto& [known, format] : kEndings) {
+    if (ending == known) return format;
   }
-  return ending == ".png"                        ? Format::kPng
-         : ending == ".jpg" || ending == ".jpeg" ? Format::kJpeg
-                                                 : Format::kNone;
+  return Format::kNone;
 }
 
 }  // namespace
 
+bool IsPictureName(const std::string& name) {
+  return FormatOf(name) != Format::kNone;
+}
+
 void CheckPictureName(const std::string& name) {
-  if (FormatOf(name) != Format::kNone) return;
-  throw HostError(kExitUsage, name + ": a picture is named .png, .jpg or .jpeg");
+  if (IsPictureName(name)) return;
+  throw HostError(kExitUsage, name + ": a picture is named .png, .jpg, .jpeg or .webp");
 }
 
 std::unique_ptr<PictureWriter> MakePictureWriter(const OutputFile& output, unsigned width,
                                                  unsigned height, unsigned channels) {
   CheckPictureName(output.GetShownName());
-  if (FormatOf(output.GetShownName()) == Format::kPng) {
-    constexpr unsigned kBits = 8;
-    return MakePngWriter(output, width, height, channels, kBits);
+  constexpr unsigned kBits = 8;
+  switch (FormatOf(output.GetShownName())) {
+    case Format::kJpeg:
+      return std::make_unique<OpaquePicture>(output, width, height, channels);
+    case Format::kWebp:
+      return MakeWebpWriter(output, width, height, channels);
+    default:
+      return MakePngWriter(output, width, height, channels, kBits);
   }
-  return std::make_unique<OpaquePicture>(output, width, height, channels);
 }
 
 }  // namespace lumo::host

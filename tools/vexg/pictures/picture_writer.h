@@ -17,7 +17,10 @@ class PictureWriter {
   virtual void Close() = 0;
 };
 
-/// Throws HostError unless the name's ending stands for a format of pictures: .png, .jpg or .jpeg.
+/// True where the name's ending stands for a format of pictures: .png, .jpg, .jpeg or .webp.
+bool IsPictureName(const std::string& name);
+
+/// Throws HostError unless IsPictureName.
 void CheckPictureName(const std::string& name);
 
 /// Makes the writer for the format that the ending of the output's name stands for.

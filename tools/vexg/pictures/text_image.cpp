@@ -1,24 +1,9 @@
 #include "pictures/text_image.h"
 
 #include "drawing/text_drawing.h"
-#include "foundation/near_name.h"
-#include "foundation/plugin_library.h"
-#include "verb.h"
+#include "pictures/drawing_plugin.h"
 
 namespace lumo::host {
-namespace {
-
-/// The function of the plug-in, which is loaded by the first call.
-VexgDrawTextFunction* FindDrawing() {
-  std::string fault;
-  const platform::Module plugin = LoadPlugin(platform::ModuleFileName("vexgdrawing"), fault);
-  auto* const draw = plugin.Find<VexgDrawTextFunction>("VexgDrawText");
-  if (draw != nullptr) return draw;
-  throw HostError(kExitFailed, "text can't be drawn: " + fault);
-}
-
-}  // namespace
-
 void TextImage::DrawOn(std::vector<unsigned char>& pixels, unsigned rowPixels, unsigned channels,
                        unsigned x, unsigned y) const {
   const std::size_t rows = pixels.size() / (std::size_t{rowPixels} * channels);
@@ -35,7 +20,7 @@ void TextImage::DrawOn(std::vector<unsigned char>& pixels, unsigned rowPixels, u
 }
 
 TextImage DrawText(const std::string& text, double size) {
-  auto* const draw = FindDrawing();
+  auto* const draw = FindDrawing<VexgDrawTextFunction>("VexgDrawText");
   const std::string line = Printable(text);
   TextImage image;
   bool isDone = draw(line.c_str(), size, &image.width, &image.height, nullptr);

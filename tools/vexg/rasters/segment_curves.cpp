@@ -7,21 +7,22 @@
 
 #include "commands/value_text.h"
 #include "output/json_number.h"
-#include "pictures/histogram_plot.h"
+#include "pictures/plot.h"
 
 namespace lumo::host {
 namespace {
 
-/// Leaves out the last hundredth, which takes most of the width.
-PlottedHistogram Plot(const char* title, const SegmentCurve& curve) {
-  PlottedHistogram plot{title, curve.low, curve.binSize > 0 ? curve.binSize : 1, {}};
-  constexpr double kEnd = 0.99, kHeight = 100;  // percent
+/// The curve from its lower end on, without the last hundredth, which takes most of the width.
+PlotPanel PanelOf(const char* title, const char* across, const char* up,
+                  const SegmentCurve& curve) {
+  PlotPanel panel{title, across, up, curve.low, curve.binSize > 0 ? curve.binSize : 1, {0}};
+  panel.form = PlotPanel::Form::kCurve;
+  constexpr double kEnd = 0.99, kPercent = 100;
   for (const double share : curve.shares) {
-    plot.counts.push_back(static_cast<std::uint64_t>(std::lround(share * kHeight)));
+    panel.values.push_back(share * kPercent);
     if (share >= kEnd) break;
   }
-  if (plot.counts.empty()) plot.counts.push_back(0);
-  return plot;
+  return panel;
 }
 
 Json CurveAsJson(const SegmentCurve& curve) {
@@ -74,7 +75,11 @@ std::string SegmentCurves::AsJson(const std::string& file) const {
 }
 
 void SegmentCurves::Draw(const OutputFile& output) const {
-  HistogramPlot({Plot("gradients", gradients), Plot("costs", costs)}).Write(output);
+  DrawPlot({PanelOf("Gradients below which a share of the pixels lies", "gradient",
+                    "share of the pixels (%)", gradients),
+            PanelOf("Costs below which a share of the merges lies", "cost of merging two segments",
+                    "share of the merges (%)", costs)})
+      .Write(output);
 }
 
 }  // namespace lumo::host

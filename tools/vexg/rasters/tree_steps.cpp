@@ -10,7 +10,7 @@
 #include "foundation/near_name.h"
 #include "options/option_values.h"
 #include "output/json_number.h"
-#include "pictures/histogram_plot.h"
+#include "pictures/plot.h"
 #include "rasters/raster_source.h"
 #include "rasters/raster_target.h"
 #include "verb.h"
@@ -120,24 +120,22 @@ std::string ScaleCurve::AsJson(const std::string& file) const {
 }
 
 void ScaleCurve::Draw(const OutputFile& output) const {
-  const auto plot = [this](const char* title, const std::vector<double>& values) {
-    constexpr double kStep = 0.25, kHeight = 1000;  // octaves; of the highest bar
-    const double first = mergeValues.empty() ? 0 : std::log2(mergeValues.front());
-    PlottedHistogram bars{title, first, kStep, {}};
+  const auto panel = [this](const char* title, const char* up, const std::vector<double>& values) {
+    PlotPanel drawn{title, "cost of merging two segments", up, 0, 1, {}};
+    if (!mergeValues.empty()) drawn.lower = std::log2(mergeValues.front());
+    if (mergeValues.size() > 1) drawn.step = std::log2(mergeValues[1] / mergeValues[0]);
+    drawn.form = PlotPanel::Form::kCurve;
+    drawn.axis = PlotPanel::Axis::kPowersOfTwo;
+    for (const double peak : peaks) drawn.places.push_back(std::log2(peak));
     constexpr double kFewest = 10;  // segments; with fewer chance rules
-    std::vector<double> shown;
     for (std::size_t i = 0; i < values.size() && segments[i] >= kFewest; ++i) {
-      shown.push_back(std::max(values[i], 0.0));
+      drawn.values.push_back(std::isfinite(values[i]) ? std::max(values[i], 0.0) : 0);
     }
-    const double most = shown.empty() ? 0 : *std::max_element(shown.begin(), shown.end());
-    for (const double value : shown) {
-      bars.counts.push_back(most > 0 ? static_cast<std::uint64_t>(value / most * kHeight) : 0);
-    }
-    if (bars.counts.empty()) bars.counts.push_back(0);
-    return bars;
+    if (drawn.values.empty()) drawn.values.push_back(0);
+    return drawn;
   };
-  HistogramPlot({plot("rate of change of local variance, over log2 of cost", rates),
-                 plot("local variance, over log2 of cost", localVariance)})
+  DrawPlot({panel("Growth of local variance, with the suggested costs", "growth (%)", rates),
+            panel("Local variance: mean deviation inside segments", "deviation", localVariance)})
       .Write(output);
 }
 

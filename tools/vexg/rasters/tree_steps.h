@@ -45,7 +45,7 @@ struct ScaleCurve {
 
   std::string AsText() const;
   std::string AsJson(const std::string& file) const;
-  /// Draws the rates and the local variance over the binary logarithm of the cost.
+  /// Draws the rates and the local variance over the cost, with lines at what is suggested.
   void Draw(const OutputFile& output) const;
 };
 

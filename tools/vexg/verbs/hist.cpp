@@ -1,5 +1,6 @@
 #include <algorithm>
 #include <cmath>
+#include <filesystem>
 #include <numeric>
 #include <optional>
 
@@ -8,10 +9,10 @@
 #include "foundation/near_name.h"
 #include "output/json_number.h"
 #include "output/saved_values.h"
-#include "pictures/histogram_plot.h"
-#include "pictures/picture_writer.h"
+#include "pictures/plot.h"
 #include "raster/band_values.h"
 #include "raster/pixel_types.h"
+#include "rasters/band_notes.h"
 #include "rasters/file_verb.h"
 #include "rasters/raster_target.h"
 #include "stats/turn.h"
@@ -78,12 +79,41 @@ std::string AsText(const std::string& file, const std::vector<BandBins>& all) {
   return text;
 }
 
-HistogramPlot Draw(const std::vector<BandBins>& all) {
-  std::vector<PlottedHistogram> shown;
-  for (const BandBins& bins : all) {
-    shown.push_back({"band " + std::to_string(bins.band), bins.lower, bins.size, bins.counts});
+/// A count and its unit, such that the highest of an axis is a short number.
+struct CountUnit {
+  const char* words;
+  double pixels;
+};
+
+CountUnit UnitOf(std::uint64_t most) {
+  constexpr double kThousand = 1e3, kMillion = 1e6, kShort = 20;
+  if (static_cast<double>(most) >= kShort * kMillion) return {"million pixels", kMillion};
+  if (static_cast<double>(most) >= kShort * kThousand) return {"thousand pixels", kThousand};
+  return {"pixels", 1};
+}
+
+PlotPanel PanelOf(const std::string& file, const BandBins& bins, const BandNotes& notes) {
+  const CountUnit unit = UnitOf(*std::max_element(bins.counts.begin(), bins.counts.end()));
+  const std::string& name = notes.name.empty() ? notes.meaning : notes.name;
+  constexpr std::size_t kLongest = 40;  // letters of a name that a title has room for
+  PlotPanel panel{fmt::format("{}, band {}{}{}",
+                              Printable(std::filesystem::path(file).filename().string(), kLongest),
+                              bins.band, name.empty() ? "" : ": ", Printable(name, kLongest)),
+                  "pixel value",
+                  unit.words,
+                  bins.lower,
+                  bins.size,
+                  {}};
+  const std::string in = notes.unit.empty() ? "" : fmt::format(" ({})", notes.unit);
+  if (notes.IsScaled()) {
+    panel.across = fmt::format("pixel; value{} = {}", in, notes.GetScaling());
+  } else {
+    panel.across += in;
   }
-  return HistogramPlot(shown);
+  for (const std::uint64_t count : bins.counts) {
+    panel.values.push_back(static_cast<double>(count) / unit.pixels);
+  }
+  return panel;
 }
 
 class HistVerb final : public FileVerb {
@@ -106,8 +136,8 @@ class HistVerb final : public FileVerb {
     line.Add("--bins", binCount_, "How many bins; no more than there are whole numbers")
         .Within(1, kMostBins);
     line.Add("--bin-size", binSize_, "Width of a bin").Shows("SIZE");
-    line.Add("--output,-o", output_, "A picture of the histograms, a PNG or JPEG")
-        .IsFile("OUT.png|jpg");
+    line.Add("--output,-o", output_, "A plot of the histograms, as SVG, PNG, JPEG or WebP")
+        .IsFile("OUT.svg|png");
     AddOverwriteTo(line, "a picture that is there");
     line.Add("--save", saves_, "Store the histograms with the raster");
     line.Add("--json", isJson_, "As JSON");
@@ -121,7 +151,7 @@ class HistVerb final : public FileVerb {
     if (binSize_ && !(*binSize_ > 0 && std::isfinite(*binSize_))) {
       throw HostError(kExitUsage, "--bin-size: the size of a bin is above 0");
     }
-    if (!output_.empty()) CheckPictureName(output_);
+    if (!output_.empty()) CheckFigureName(output_);
     if (saves_ && GetArea().IsGiven()) {
       throw HostError(kExitUsage, "--save: the histograms of some pixels are not the raster's");
     }
@@ -138,12 +168,14 @@ class HistVerb final : public FileVerb {
   void AddOpening(JobDraft& draft) const override {
     AddOpenWithPyramid(draft, "raster", GetSource());
     AddQuery(draft, "raster", "$raster");
+    AddNotesQuery(draft, "$raster");
   }
 
   void Plan(JobSession& session, const JobResults& opened) override {
     const auto [uri, info] =
         ShowArea(session, {URIOf(opened, "$raster"), ReadInfo(opened, "raster")});
     raster_ = uri;
+    notes_ = ReadNotes(opened, info.bands);
     dataType_ = info.dataType;
     bands_ = ParseBands(bandsText_, info);
     if (DispatchType(TenTypes{}, dataType_, []<typename T>() { return true; })) return;
@@ -200,7 +232,15 @@ class HistVerb final : public FileVerb {
         return true;
       });
     }
-    if (!output_.empty()) Draw(all_).Write(outputs.Get(0));
+    if (!output_.empty()) Draw(outputs.Get(0));
+  }
+
+  void Draw(const OutputFile& output) const {
+    std::vector<PlotPanel> panels;
+    for (const BandBins& bins : all_) {
+      panels.push_back(PanelOf(GetSource().file, bins, notes_.bands[bins.band]));
+    }
+    DrawPlot(panels).Write(output);
   }
 
   void Save(JobSession& session) override {
@@ -225,6 +265,7 @@ class HistVerb final : public FileVerb {
   String raster_;  // URI
   unsigned dataType_ = 0;
   Array<unsigned> bands_;
+  RasterNotes notes_;
   std::vector<BandBins> all_;
 };
 

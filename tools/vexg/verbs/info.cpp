@@ -8,6 +8,7 @@
 #include "foundation/near_name.h"
 #include "output/json_number.h"
 #include "platform/memory_shortage.h"
+#include "rasters/band_notes.h"
 #include "rasters/raster_source.h"
 #include "rasters/vector_info.h"
 #include "verb.h"
@@ -126,38 +127,7 @@ Json FlagsAsJson(const Array<bool>& flags) {
   return list;
 }
 
-/// Holds what the raster says of a band, beside RasterInfo.
-struct BandNotes {
-  std::string name, meaning, unit, scale, offset;
-  bool IsEmpty() const {
-    return name.empty() && meaning.empty() && unit.empty() && scale.empty() && offset.empty();
-  }
-};
-
-struct Notes {
-  std::vector<BandNotes> bands;
-  std::optional<unsigned> alpha;  ///< the band that says which pixels count
-  long epsg = 0;                  ///< code of the coordinate system; 0 for none
-};
-
-Notes ReadNotes(const JobResults& results, const RasterInfo& info) {
-  const Json all = Json::parse(results.Find("notes").returns.Find("Description").ToUTF8());
-  const Json& details = all["details"];
-  Notes notes;
-  for (unsigned band = 0; band < info.bands; ++band) {
-    const auto text = [&](const char* name) {
-      return details.value(fmt::format("Bands/{}/{}", band, name), std::string());
-    };
-    notes.bands.push_back(
-        {text("Description"), text("Meaning"), text("Unit"), text("Scale"), text("Offset")});
-    if (notes.bands.back().meaning == "Alpha") notes.alpha = band;
-  }
-  const Json& place = all["geoRef"];
-  if (place.is_object()) notes.epsg = place["epsg"].get<long>();
-  return notes;
-}
-
-Json NotesAsJson(const Notes& notes) {
+Json NotesAsJson(const RasterNotes& notes) {
   const auto text = [](const std::string& of) { return of.empty() ? Json() : Json(of); };
   const auto number = [](const std::string& of) {
     return of.empty() ? Json() : NumberAsJson(ParseValue<double>(String(of)));
@@ -173,7 +143,20 @@ Json NotesAsJson(const Notes& notes) {
   return list;
 }
 
-Json AsJson(const std::string& file, const RasterInfo& info, const Notes& notes) {
+/// The blocks of the file, or those that reading goes by where it says nothing of them.
+TileDimensions BlocksOf(const RasterInfo& info, const RasterNotes& notes) {
+  return notes.blocks.width != 0 ? notes.blocks : info.tiles;
+}
+
+std::string BlocksAsText(const RasterInfo& info, const RasterNotes& notes) {
+  const TileDimensions blocks = BlocksOf(info, notes);
+  if (blocks.width == 0) return "none";
+  if (blocks.width < info.samples) return fmt::format("{} x {}", blocks.width, blocks.height);
+  const unsigned lines = std::min(blocks.height, info.lines);
+  return lines <= 1 ? "single lines" : fmt::format("strips of {} lines", lines);
+}
+
+Json AsJson(const std::string& file, const RasterInfo& info, const RasterNotes& notes) {
   return {{"file", file},
           {"format", info.format.ToUTF8()},
           {"samples", info.samples},
@@ -181,7 +164,8 @@ Json AsJson(const std::string& file, const RasterInfo& info, const Notes& notes)
           {"bands", info.bands},
           {"dataType", DataTypeName(info.dataType).ToUTF8()},
           {"interleave", FormatValue(info.interleave).ToUTF8()},
-          {"blockSize", Json::array({info.tiles.width, info.tiles.height})},
+          {"blockSize", Json::array({BlocksOf(info, notes).width, BlocksOf(info, notes).height})},
+          {"compression", notes.compression.empty() ? Json() : Json(notes.compression)},
           {"noData", NoDataAsJson(info)},
           {"hasPalette", FlagsAsJson(info.hasPalette)},
           {"bandDetails", NotesAsJson(notes)},
@@ -209,7 +193,7 @@ std::string BandsAsText(const Json& list) {
 }
 
 /// The code and the name of a system, or for one without a name its projection.
-std::string SystemAsText(const GeoRef& geoRef, const Notes& notes) {
+std::string SystemAsText(const GeoRef& geoRef, const RasterNotes& notes) {
   if (SystemText(geoRef).GetLength() == 0) return "none";
   const CoordSysInfo& info = *geoRef.CoordinateSystem().Info();
   std::string name = info.name.ToUTF8();
@@ -221,7 +205,7 @@ std::string SystemAsText(const GeoRef& geoRef, const Notes& notes) {
   return notes.epsg != 0 ? fmt::format("EPSG:{} {}", notes.epsg, name) : name;
 }
 
-std::string GeoRefAsText(const RasterInfo& info, const Notes& notes, bool wkt) {
+std::string GeoRefAsText(const RasterInfo& info, const RasterNotes& notes, bool wkt) {
   if (!info.geoRef) return "  geo-reference  none\n";
   const GeoRef& geoRef = *info.geoRef;
   std::string text = fmt::format("  geo-reference  {}\n", TypeWord(geoRef));
@@ -246,40 +230,40 @@ std::string GeoRefAsText(const RasterInfo& info, const Notes& notes, bool wkt) {
 }
 
 /// A line for each band that says something of itself.
-std::string BandsAsText(const Notes& notes) {
+std::string BandsAsText(const RasterNotes& notes, const RasterInfo& info) {
   std::string text;
   for (std::size_t i = 0; i < notes.bands.size(); ++i) {
     const BandNotes& band = notes.bands[i];
-    if (band.IsEmpty()) continue;
+    const bool hasPalette = info.hasPalette[static_cast<unsigned>(i)];
+    if (band.IsEmpty() && !hasPalette) continue;
     std::string words;
     const auto add = [&](const std::string& word) {
       if (!word.empty()) words.append(words.empty() ? "" : ", ").append(Printable(word));
     };
     add(band.name);
     add(band.meaning);
-    if (!band.scale.empty() || !band.offset.empty()) {
-      add(fmt::format("value = pixel * {} + {}", band.scale.empty() ? "1" : band.scale,
-                      band.offset.empty() ? "0" : band.offset));
-    }
+    if (hasPalette) add("colours of a palette");
+    if (band.IsScaled()) add("value = " + band.GetScaling());
     if (!band.unit.empty()) add("in " + band.unit);
     text += fmt::format("  {:<14} {}\n", fmt::format("band {}", i), words);
   }
   return text;
 }
 
-std::string AsText(const std::string& file, const RasterInfo& info, const Notes& notes, bool wkt) {
+std::string AsText(const std::string& file, const RasterInfo& info, const RasterNotes& notes,
+                   bool wkt) {
   std::string text = fmt::format("{}\n", Printable(file));
   text += fmt::format("  format         {}\n", info.format.ToUTF8());
   text += fmt::format("  size           {} samples, {} lines, {} bands\n", info.samples, info.lines,
                       info.bands);
   text += fmt::format("  pixels         {}, {}\n", DataTypeName(info.dataType).ToUTF8(),
                       FormatValue(info.interleave).ToUTF8());
-  const bool isTiled = info.tiles.height > 1;
-  text += fmt::format("  blocks         {}\n",
-                      isTiled ? fmt::format("{} x {}", info.tiles.width, info.tiles.height)
-                              : std::string("whole lines"));
+  text += fmt::format("  blocks         {}\n", BlocksAsText(info, notes));
+  if (!notes.compression.empty()) {
+    text += fmt::format("  compression    {}\n", Printable(notes.compression));
+  }
   text += fmt::format("  no data        {}\n", BandsAsText(NoDataAsJson(info)));
-  text += BandsAsText(notes);
+  text += BandsAsText(notes, info);
   if (notes.alpha) {
     text += fmt::format("  valid pixels   where band {}, alpha, is not 0\n", *notes.alpha);
   }
@@ -294,7 +278,7 @@ JobDraft MakeDraft(const SourceOptions& source) {
   JobDraft draft;
   AddOpenWithPyramid(draft, "raster", source);
   AddQuery(draft, "raster", "$raster");
-  draft.Step("notes", "DescribeRasterCommand").AddInput("URI", String("$raster"));
+  AddNotesQuery(draft, "$raster");
   draft.Close("close", "$raster");
   return draft;
 }
@@ -404,7 +388,7 @@ void Tell(JobSession& session, const Options& options, const std::string& file, 
   const JobResults results =
       session.Run(MakeDraft({file, options.source.format, options.source.subdataset}));
   const RasterInfo info = ReadInfo(results, "raster");
-  const Notes notes = ReadNotes(results, info);
+  const RasterNotes notes = ReadNotes(results, info.bands);
   options.json ? all.push_back(AsJson(file, info, notes))
                : void(text.append(gap).append(AsText(file, info, notes, options.wkt)));
 }

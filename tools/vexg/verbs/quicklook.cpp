@@ -48,8 +48,8 @@ class QuicklookVerb final : public FileVerb {
         "A band with a palette shows its colours, unless --stretch is given. Pixels without data "
         "are transparent; in a JPEG white.");
     line.AddExample("vexg quicklook scene.tif scene.png --bands 3,2,1 --stretch 1,99");
-    line.Add("output", output_, "The picture, a PNG or JPEG as its name tells")
-        .IsFile("OUT.png|jpg")
+    line.Add("output", output_, "The picture, a PNG, JPEG or WebP as its name tells")
+        .IsFile("OUT.png|jpg|webp")
         .Required();
     line.Add("--bands", bandsText_,
              "One band, or red,green,blue; by default 2,1,0 of four bands or more, 0,1,2 of "

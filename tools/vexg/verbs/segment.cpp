@@ -1,6 +1,7 @@
 #include <optional>
 
 #include "options/option_values.h"
+#include "pictures/figure.h"
 #include "pictures/picture_writer.h"
 #include "pictures/quicklook_maker.h"
 #include "raster/pixel_types.h"
@@ -61,7 +62,8 @@ class SegmentVerb final : public RasterVerb {
     line.Add("--suggest", isSuggest_, "Say which costs suit a tree, and make no labels");
     line.AllowOneOf({"--estimate", "--suggest"});
     line.Add("--output,-o", picture_,
-             "With --estimate and --suggest: a picture of the curves, a PNG or JPEG; with levels: "
+             "With --estimate and --suggest: a plot of the curves, as SVG, PNG, JPEG or WebP; with "
+             "levels: "
              "the files "
              "without "
              "their endings")
@@ -139,7 +141,7 @@ class SegmentVerb final : public RasterVerb {
     line.Add("--polygons", polygons_, "Make polygons of the segments as well, in this vector file")
         .IsFile("OUT");
     line.Add("--quicklook", quicklook_, "Draw the borders over the scene as well, in this picture")
-        .IsFile("OUT.png|jpg");
+        .IsFile("OUT.png|jpg|webp");
   }
 
   int Run() override {
@@ -184,7 +186,7 @@ class SegmentVerb final : public RasterVerb {
       if (request_.mergeValue || request_.mergePercent || !valuesText_.empty()) {
         refuse("--suggest takes no costs");
       }
-      if (!picture_.empty()) CheckPictureName(picture_);
+      if (!picture_.empty()) CheckFigureName(picture_);
       return;
     }
     if (Is(Action::kCut)) {
@@ -213,7 +215,7 @@ class SegmentVerb final : public RasterVerb {
     if (request_.isEstimate) {
       if (!GetTargetName().empty()) refuse("--estimate makes no labels");
       if (!polygons_.empty() || !quicklook_.empty()) refuse("--estimate makes one picture at most");
-      if (!picture_.empty()) CheckPictureName(picture_);
+      if (!picture_.empty()) CheckFigureName(picture_);
       return;
     }
     if (GetTargetName().empty()) refuse("LABELS, the file to make, is missing");
