@@ -10,6 +10,7 @@
 #include "foundation/thrown.h"
 #include "raster/raster_details.h"
 #include "rasters/map_points.h"
+#include "rasters/value_names.h"
 #include "verb.h"
 #include "viewer/viewed_shapes.h"
 #include "views/sources/catalog_raster_ref.h"
@@ -36,12 +37,12 @@ Json ReadLegend(const ViewedRaster& raster) {
   ask.AddInput("Band", 0U);
   chain.Close();
   const String text = RunDraft(draft).Find("categories").returns.Find("Categories");
-  const auto names = ParseValue<Array<String>>(text);
+  const auto names = ReadValueNames(text);
   Json legend = Json::array();
   for (unsigned value = 0; value < palette.size(); ++value) {
-    const bool hasName = value < names.GetCount() && names[value].GetLength() != 0;
+    const bool hasName = value < names.size() && !names[value].empty();
     legend.push_back({{"value", value},
-                      {"name", hasName ? names[value].ToUTF8() : std::string()},
+                      {"name", hasName ? names[value] : std::string()},
                       {"color", palette[value]}});
   }
   return legend;
