@@ -23,7 +23,9 @@ export class ClassLayer {
     this.number = number;
     this.raster = raster;
     this.legend = legendOf(raster);
-    this.hidden = new Set();
+    // Where classes have names, a value without one is none.
+    const hasNames = this.legend.some(({name}) => name !== '');
+    this.hidden = new Set(hasNames ? this.legend.filter(({name}) => name === '').map(({value}) => value) : []);
     this.colors = colorsOf(this.legend, this.hidden);
     this.tiles = new PixelTiles(number, raster, {
       bands: () => [0], onFault,
