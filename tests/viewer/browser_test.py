@@ -123,7 +123,7 @@ class LargeScene(BrowserTest):
         found = self.drive(self.viewer, "style", center=(2000, 2000), pixels=pixels)
         self.assertEqual(found["requests"], 0)
         self.assertLess(sorted(found["ms"])[len(found["ms"]) // 2], 100)
-        # What is counted of so large a scene is every second pixel; the ends are those of its values.
+        # Of so large a scene every second pixel is counted; the ends are those of its values.
         counted = self.bands[0][::2, ::2]
         low, high = int(counted.min()), int(counted.max())
         for (x, y), color in zip(pixels, found["grey"], strict=True):
@@ -210,8 +210,12 @@ class SmallScene(BrowserTest):
     @unittest.skipUnless(os.environ.get("VEXG_PICTURES"), "only when asked for")
     def test_pictures_of_the_page(self):
         folder = pathlib.Path(os.environ["VEXG_PICTURES"]).resolve()
-        self.drive(self.viewer, "picture", file=str(folder / "view-segments.png"), click=(174, 173), point=(160, 200))
-        with Viewer(SCENE, self.files / "after.tif") as viewer:
+        with Viewer(SCENE, "--classes", self.files / "classes.tif", "--labels", self.files / "segments.tree") as viewer:
+            self.drive(viewer, "picture", file=str(folder / "view-segments.png"), click=(174, 173), point=(160, 200))
+        infrared = self.files / "infrared.tif"
+        bands = gdal.Open(str(SCENE)).ReadAsArray()
+        make_raster(infrared, [bands[number] for number in (3, 2, 1)], gdal.Open(str(SCENE)).GetGeoTransform(), 31985)
+        with Viewer(SCENE, infrared) as viewer:
             self.drive(viewer, "picture", file=str(folder / "view-swipe.png"), keys=["s"], point=(120, 150), dark=True)
 
 

@@ -215,6 +215,14 @@ class Life(FolderTest):
             self.assertEqual(viewer.end(), (0, ""))
             self.assertLess(time.monotonic() - begin, 4)
 
+    def test_it_ends_when_the_page_has_been_closed_for_long(self):
+        with Viewer(SCENE, "--idle", "0.03") as viewer:
+            for _ in range(4):
+                time.sleep(0.8)
+                viewer.get("alive")
+            viewer.ask("/", key=False)
+            self.assertEqual(viewer.process.wait(20), 0)
+
     def test_faults_are_told_at_the_start(self):
         broken = self.folder / "broken.tif"
         broken.write_bytes(b"II*\0")

@@ -26,7 +26,7 @@ struct ViewOptions {
   ViewRequest request;
   unsigned port = 0;
   bool noBrowser = false;
-  unsigned idle = 5;  // minutes
+  double idle = 5;  // minutes
 };
 
 /// The function of the plug-in that makes servers.
@@ -38,15 +38,17 @@ http::MakeServerFunction* FindServerMaker() {
   throw HostError(kExitFailed, "pages can't be served: " + fault);
 }
 
-/// Stops a server once the page has been silent for long.
+/// Stops a server once the page has been silent for long, or the user wants it.
 class SilenceWatch {
  public:
-  SilenceWatch(const ViewerSite& site, http::Server& server, unsigned minutes)
+  SilenceWatch(const ViewerSite& site, http::Server& server, double minutes)
       : thread_([this, &site, &server, minutes] {
           std::unique_lock lock(mutex_);
           while (!isOver_) {
             wake_.wait_for(lock, std::chrono::seconds(1));
-            if (minutes != 0 && site.GetSilence() > 60.0 * minutes) {
+            // A request to end that came just before the server ran did not reach it.
+            const bool isSilent = minutes != 0 && site.GetSilence() > 60.0 * minutes;
+            if (isSilent || platform::WasInterrupted()) {
               server.Stop();
               return;
             }
@@ -137,12 +139,12 @@ const VerbRegistration registration(
           .Within(1024, 65535);
       line.Add("--no-browser", options->noBrowser, "Only print the address");
       line.Add("--idle", options->idle, "Minutes after which a closed page ends it; 0 never")
-          .Within(0, 10000)
           .ShowsDefault();
       return VerbRegistration::Work([options] {
         if (options->request.files.empty() && options->request.mosaic.empty()) {
           throw HostError(kExitUsage, "give a raster, or --mosaic");
         }
+        if (!(options->idle >= 0)) throw HostError(kExitUsage, "--idle: not below 0");
         return View(*options);
       });
     });

@@ -48,7 +48,7 @@ Json ReadLegend(const ViewedRaster& raster) {
   return legend;
 }
 
-/// What a band is called; empty where nothing says so.
+/// The name of a band; empty where nothing says so.
 std::string NameOfBand(const Json& details, unsigned band) {
   for (const char* const what : {"Name", "Meaning", "Wavelength"}) {
     const auto at = details.find(fmt::format("Bands/{}/{}", band, what));
@@ -82,19 +82,14 @@ ViewedScene::ViewedScene(const ViewRequest& request, WorkFolder& folder) : folde
   if (!request.mosaic.empty()) Add(Role::kImage, request.mosaic);
   if (!request.classes.empty()) Add(Role::kClasses, request.classes);
   if (!request.labels.empty()) Add(Role::kLabels, request.labels);
-  const GeoRefPtr grid = GetGrid();
   if (!request.mosaic.empty()) {
-    shapes_.push_back(ReadMosaicShapes(request.mosaic, grid, folder_.NewPath(".gpkg")));
+    shapes_.push_back(ReadMosaicShapes(request.mosaic, grid_, folder_.NewPath(".gpkg")));
     shapeNames_.push_back(entries_[request.files.size()].raster->GetName());
   }
   if (!request.shapes.empty()) {
-    shapes_.push_back(ReadViewedShapes(request.shapes, grid));
+    shapes_.push_back(ReadViewedShapes(request.shapes, grid_));
     shapeNames_.push_back(std::filesystem::path(request.shapes).filename().string());
   }
-}
-
-GeoRefPtr ViewedScene::GetGrid() const {
-  return entries_.empty() ? GeoRefPtr() : entries_.front().raster->GetGeoRef();
 }
 
 void ViewedScene::Add(Role role, const std::string& file) {
@@ -103,10 +98,9 @@ void ViewedScene::Add(Role role, const std::string& file) {
     entry.tree = file;
     entry.raster = std::make_shared<ViewedRaster>(TreeCutRequest{file, {}, {}});
   } else {
-    const GeoRefPtr grid = GetGrid();
-    const bool canCarry = !grid.IsNull() && grid->GetType() == GeoRef::kStd;
+    const bool canCarry = !grid_.IsNull() && grid_->GetType() == GeoRef::kStd;
     entry.raster = std::make_shared<ViewedRaster>(
-        SourceOptions{file, ""}, canCarry ? grid : GeoRefPtr(),
+        SourceOptions{file, ""}, canCarry ? grid_ : GeoRefPtr(),
         role == Role::kImage ? ViewedRaster::Levels::kAll : ViewedRaster::Levels::kPicked);
     entry.legend = ReadLegend(*entry.raster);
   }
@@ -115,6 +109,7 @@ void ViewedScene::Add(Role role, const std::string& file) {
        entry.raster->Lines() != entries_.front().raster->Lines())) {
     throw HostError(kExitFailed, file + ": --labels: the segments have another size");
   }
+  if (entries_.empty()) grid_ = entry.raster->GetGeoRef();
   entries_.push_back(std::move(entry));
 }
 
@@ -216,7 +211,7 @@ Json ViewedScene::ReadPixel(unsigned x, unsigned y, double cost) {
     const bool isInside = x < raster->Samples() && y < raster->Lines();
     rasters.push_back(isInside ? raster->ReadValues(x, y) : Json());
   }
-  return {{"x", x}, {"y", y}, {"values", rasters}, {"place", PlaceOf(GetGrid(), x + 0.5, y + 0.5)}};
+  return {{"x", x}, {"y", y}, {"values", rasters}, {"place", PlaceOf(grid_, x + 0.5, y + 0.5)}};
 }
 
 /// Builds the levels of an open raster, and closes it.

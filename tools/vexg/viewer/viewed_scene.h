@@ -28,7 +28,7 @@ class ViewedScene {
   /// @param folder  for files on the way; outlives the scene.
   ViewedScene(const ViewRequest& request, WorkFolder& folder);
 
-  /// What the page needs to know at its beginning.
+  /// Tells all that the page needs at its beginning.
   Json Describe() const;
 
   std::size_t RasterCount() const { return entries_.size(); }
@@ -75,7 +75,6 @@ class ViewedScene {
   };
 
   void Add(Role role, const std::string& file);
-  GeoRefPtr GetGrid() const;
   Json DescribeEntry(const Entry& entry) const;
   std::shared_ptr<SegmentAttributes> GetAttributes(std::size_t number, double cost);
   void RunPyramid(std::size_t number);
@@ -84,6 +83,7 @@ class ViewedScene {
   WorkFolder& folder_;
   std::vector<Json> shapes_;
   std::vector<std::string> shapeNames_;
+  GeoRefPtr grid_;  // of the first raster; empty for none
 
   mutable std::mutex mutex_;  // of what follows
   std::vector<Entry> entries_;
