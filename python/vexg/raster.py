@@ -176,6 +176,20 @@ class Raster(Described, Pixels, Views, _formula.Arithmetic):
 
         return segments.segment(self, **options)
 
+    def view(self, *others, labels=None, classes=None, shapes=None, browser=True):
+        """Shows it in the browser, as `vexg view` does, until the Viewer that it gives is closed.
+
+        Args:
+            others: further rasters beside it.
+            labels: segments over them: a file of labels, a tree, or a raster of a file.
+            classes: a map of classes over them, likewise.
+            shapes: a vector file over them.
+            browser: whether the page is opened; its address is viewer.address.
+        """
+        from ._viewer import Viewer
+
+        return Viewer((self, *others), labels=labels, classes=classes, shapes=shapes, browser=browser)
+
     def save(self, file, *, overwrite=False, progress=False, format=None, nodata=None, cog=False, **options):
         """Writes it to a file, which is there whole or not at all, and opens that.
 

@@ -194,6 +194,11 @@ class Stac(Creation):
             {"value": 0, "description": "none", "color_hint": "000000"},
             {"value": 1, "description": "open water", "color_hint": "0000FF"},
             {"value": 2, "description": "wood", "color_hint": "228B22"}])
+        # A value without a name leaves those behind it theirs.
+        by_gdal(CLASSES.replace("'none'", "''"), self.folder / "part.tif")
+        _, item = self.item(self.folder / "part.tif", name="named.tif")
+        classes = item["assets"]["data"]["raster:bands"][0]["classification:classes"]
+        self.assertEqual([(row["value"], row["description"]) for row in classes], [(1, "open water"), (2, "wood")])
 
     @needs_data
     def test_an_item_that_is_there_stays(self):

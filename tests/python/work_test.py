@@ -1,10 +1,12 @@
 """The work that rasters do: numbers, files, segments and classes, here and in a server."""
 
+import json
 import os
 import pickle
 import struct
 import subprocess
 import unittest
+import urllib.request
 
 from support import DATA, SCENE, VEXG, FolderTest, needs, needs_data
 
@@ -45,6 +47,22 @@ class NumbersTest(FolderTest):
         band = vexg.open(SCENE).read(2)
         counts, edges = vexg.open(SCENE).histogram(bins=10, range=(50, 100))[2]
         numpy.testing.assert_array_equal(counts, numpy.histogram(band[band <= 100], edges)[0])
+
+    def test_a_page_shows_rasters_of_files(self):
+        scene = vexg.open(SCENE)
+        with scene.view(vexg.open(DATA / "mosaic_a.tif"), browser=False) as viewer:
+            host, _, key = viewer.address.partition("/#")
+            request = urllib.request.Request(host + "/api/scene", headers={"X-Vexg-Key": key})
+            with urllib.request.urlopen(request, timeout=20) as answer:
+                names = [raster["name"] for raster in json.load(answer)["rasters"]]
+            self.assertEqual(names, ["landsat7_olinda.tif", "mosaic_a.tif"])
+            self.assertNotIn(key, viewer._repr_html_().partition("</a>")[0].partition(">")[2])
+        with self.assertRaises(OSError):
+            urllib.request.urlopen(request, timeout=20)
+        with self.assertRaisesRegex(vexg.Error, "save the raster first"):
+            scene[0].view(browser=False)
+        with self.assertRaisesRegex(vexg.Error, "another size|labels|none.tif"):
+            scene.view(labels=self.folder / "none.tif", browser=False)
 
     def test_zones_and_shapes(self):
         scene = vexg.open(SCENE)

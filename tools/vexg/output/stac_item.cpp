@@ -155,11 +155,11 @@ void AddProjection(const RasterInfo& info, Json& properties) {
 }
 
 /// The classes of a band that has names of its values.
-Json ClassesOf(const Array<String>& names, Palette palette) {
+Json ClassesOf(const std::vector<std::string>& names, Palette palette) {
   Json classes = Json::array();
-  for (unsigned value = 0; value < names.GetCount(); ++value) {
-    if (names[value].GetLength() == 0) continue;
-    Json entry{{"value", value}, {"description", names[value].ToUTF8()}};
+  for (unsigned value = 0; value < names.size(); ++value) {
+    if (names[value].empty()) continue;
+    Json entry{{"value", value}, {"description", names[value]}};
     if (value < palette.GetCount()) {
       const ColorPtr color = palette.At(value);
       entry["color_hint"] = fmt::format("{:02X}{:02X}{:02X}", color->r, color->g, color->b);

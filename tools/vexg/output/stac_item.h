@@ -14,8 +14,8 @@ struct StacRaster {
   std::string file;  ///< its name, without a folder
   bool isCog = false;
   RasterContents contents;
-  std::vector<Palette> palettes;          ///< of the bands; without colours where one has none
-  std::vector<Array<String>> categories;  ///< names of values of the bands, from 0 on
+  std::vector<Palette> palettes;  ///< of the bands; without colours where one has none
+  std::vector<std::vector<std::string>> categories;  ///< names of values of the bands, from 0 on
 };
 
 /// The name of the item of a raster file: its own with the ending `.stac.json`, beside it.

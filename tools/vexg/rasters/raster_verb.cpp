@@ -7,6 +7,7 @@
 #include "output/stac_item.h"
 #include "pictures/palette_reading.h"
 #include "rasters/raster_target.h"
+#include "rasters/value_names.h"
 
 namespace lumo::host {
 
@@ -135,7 +136,7 @@ void RasterVerb::MakeStac(JobSession& session, const Outputs& outputs,
   const OutputFile& output = outputs.Get(0);
   StacRaster raster{std::filesystem::path(output.GetName()).filename().string(),
                     creation_.count("Layout") != 0, made, std::vector<Palette>(made.info.bands),
-                    std::vector<Array<String>>(made.info.bands)};
+                    std::vector<std::vector<std::string>>(made.info.bands)};
   raster.contents.info.format = String(format_);
   JobDraft open;
   AddOpen(open, "made", {output.GetWorkName(), format_});
@@ -149,8 +150,7 @@ void RasterVerb::MakeStac(JobSession& session, const Outputs& outputs,
   const String uri = opened.Find("made").returns.Find("URI");
   for (unsigned band = 0; band < made.info.bands; ++band) {
     const String step(fmt::format("categories{}", band));
-    raster.categories[band] =
-        ParseValue<Array<String>>(opened.Find(step).returns.Find("Categories"));
+    raster.categories[band] = ReadValueNames(opened.Find(step).returns.Find("Categories"));
     if (made.info.hasPalette[band]) raster.palettes[band] = ReadPalette(session, uri, band);
   }
   JobDraft close;

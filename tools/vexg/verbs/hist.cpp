@@ -10,58 +10,17 @@
 #include "output/json_number.h"
 #include "output/saved_values.h"
 #include "pictures/plot.h"
-#include "raster/band_values.h"
 #include "raster/pixel_types.h"
+#include "rasters/band_bins.h"
 #include "rasters/band_notes.h"
 #include "rasters/file_verb.h"
 #include "rasters/raster_target.h"
-#include "stats/turn.h"
 
 namespace lumo::host {
 namespace {
 
 constexpr unsigned kMostBins = 1U << 24;
-constexpr const char* kCountStep = "count";
-constexpr const char* kStatsStep = "stats";
 constexpr const char* kSaveCommand = "SaveRasterHistogramCommand";
-
-/// A histogram of one band, whatever its pixel type.
-struct BandBins {
-  unsigned band = 0;
-  Json min;  ///< the bounds as numbers of the pixel type
-  Json max;
-  std::string range;  ///< "0 to 255"
-  double lower = 0;
-  double size = 0;
-  std::vector<std::uint64_t> counts;
-};
-
-template <typename T>
-std::vector<BandBins> ReadBins(const String& histograms) {
-  std::vector<BandBins> all;
-  for (const auto& histogram : ParseValue<Array<RasterBandHistogram<T>>>(histograms)) {
-    all.push_back({histogram.band,
-                   NumberAsJson(histogram.min),
-                   NumberAsJson(histogram.max),
-                   fmt::format("{} to {}", histogram.min, histogram.max),
-                   static_cast<double>(histogram.min),
-                   histogram.binSize,
-                   {histogram.counts.begin(), histogram.counts.end()}});
-  }
-  return all;
-}
-
-Json AsJson(const std::string& file, const std::vector<BandBins>& all) {
-  Json list = Json::array();
-  for (const BandBins& bins : all) {
-    list.push_back({{"band", bins.band},
-                    {"min", bins.min},
-                    {"max", bins.max},
-                    {"binSize", bins.size},
-                    {"counts", bins.counts}});
-  }
-  return {{"file", file}, {"bands", list}};
-}
 
 std::string AsText(const std::string& file, const std::vector<BandBins>& all) {
   std::string text = Printable(file) + "\n";
@@ -131,11 +90,11 @@ class HistVerb final : public FileVerb {
         .Shows("B,B...")
         .Example("3,2,1");
     AddAreaTo(line);
-    line.Add("--lower", lower_, "Smallest value that counts").Shows("VALUE");
-    line.Add("--upper", upper_, "Largest value that counts").Shows("VALUE");
-    line.Add("--bins", binCount_, "How many bins; no more than there are whole numbers")
+    line.Add("--lower", limits_.lower, "Smallest value that counts").Shows("VALUE");
+    line.Add("--upper", limits_.upper, "Largest value that counts").Shows("VALUE");
+    line.Add("--bins", limits_.binCount, "How many bins; no more than there are whole numbers")
         .Within(1, kMostBins);
-    line.Add("--bin-size", binSize_, "Width of a bin").Shows("SIZE");
+    line.Add("--bin-size", limits_.binSize, "Width of a bin").Shows("SIZE");
     line.Add("--output,-o", output_, "A plot of the histograms, as SVG, PNG, JPEG or WebP")
         .IsFile("OUT.svg|png");
     AddOverwriteTo(line, "a picture that is there");
@@ -145,10 +104,10 @@ class HistVerb final : public FileVerb {
 
  private:
   void CheckOptions() override {
-    if (binCount_ && binSize_) {
+    if (limits_.binCount && limits_.binSize) {
       throw HostError(kExitUsage, "--bins and --bin-size exclude each other");
     }
-    if (binSize_ && !(*binSize_ > 0 && std::isfinite(*binSize_))) {
+    if (limits_.binSize && !(*limits_.binSize > 0 && std::isfinite(*limits_.binSize))) {
       throw HostError(kExitUsage, "--bin-size: the size of a bin is above 0");
     }
     if (!output_.empty()) CheckFigureName(output_);
@@ -188,49 +147,19 @@ class HistVerb final : public FileVerb {
     AddOpenWithPyramid(draft, "raster", GetSource());
     chain.Take("raster");
     GetArea().AddViews(chain);
-    AddSteps(draft, chain.GetTop());
+    AddCounting(draft, chain.GetTop(), bands_, dataType_, limits_);
     if (saves_) AddSave(draft, kSaveCommand, "$raster");
     chain.Close();
     return draft;
   }
 
-  /// Adds the commands that count, behind one that finds the smallest and largest values of the
-  /// bands where these decide on the bins.
-  void AddSteps(JobDraft& draft, const String& raster) const {
-    const bool needsExtremes = DataTypeBytes(dataType_) > 1 && !(lower_ && upper_);
-    if (needsExtremes) {
-      AddBandView(draft, "bands", raster, bands_);
-      JobWriterCommand& stats = draft.Step(kStatsStep, "GetBasicRasterStatsCommand");
-      stats.AddVariableInput("URI", "$bands");
-      stats.AddInput("Wait", Waiting::kAlways);
-      stats.AddOutput("Min", "$lowest");
-      stats.AddOutput("Max", "$highest");
-      draft.Close("close.bands", "$bands");
-    }
-    JobWriterCommand& count = draft.Step(kCountStep, "FitRasterHistogramCommand");
-    count.AddInput("URI", raster);
-    count.AddInput("Bands", bands_);
-    if (needsExtremes) {
-      count.AddVariableInput("Lowest", "$lowest");
-      count.AddVariableInput("Highest", "$highest");
-    }
-    if (lower_) count.AddInput("LowerBound", *lower_);
-    if (upper_) count.AddInput("UpperBound", *upper_);
-    if (binCount_) count.AddInput("BinCount", *binCount_);
-    if (binSize_) count.AddInput("BinSize", *binSize_);
-    count.AddInput("Wait", Waiting::kAlways);
-  }
-
   void Make(JobSession& session, const Outputs& outputs) override {
     JobDraft draft;
-    AddSteps(draft, raster_);
+    AddCounting(draft, raster_, bands_, dataType_, limits_);
     {
       const ProgressView view(session.GetProgress(), GetProgressStyle());
       const JobResults results = session.Run(draft);
-      DispatchType(TenTypes{}, dataType_, [&]<typename T>() {
-        all_ = ReadBins<T>(results.Find(kCountStep).returns.Find("Histograms"));
-        return true;
-      });
+      all_ = ReadBins(results, dataType_);
     }
     if (!output_.empty()) Draw(outputs.Get(0));
   }
@@ -249,15 +178,12 @@ class HistVerb final : public FileVerb {
 
   std::string Describe() const override {
     const std::string& file = GetSource().file;
-    if (isJson_) return AsJson(file, all_).dump(2) + "\n";
+    if (isJson_) return Json{{"file", file}, {"bands", AsJson(all_)}}.dump(2) + "\n";
     return output_.empty() ? AsText(file, all_) : std::string();
   }
 
   std::string bandsText_;
-  std::optional<double> lower_;
-  std::optional<double> upper_;
-  std::optional<unsigned> binCount_;
-  std::optional<double> binSize_;
+  BinLimits limits_;
   std::string output_;
   bool saves_ = false;
   bool isJson_ = false;

@@ -7,6 +7,7 @@
 #include "pictures/picture_writer.h"
 #include "pictures/quicklook_maker.h"
 #include "rasters/file_verb.h"
+#include "rasters/value_names.h"
 
 namespace lumo::host {
 namespace {
@@ -158,8 +159,8 @@ class QuicklookVerb final : public FileVerb {
     const String text = session.Run(draft).Find("categories").returns.Find("Categories");
     std::vector<LegendRow> legend;
     unsigned value = 0;
-    for (const String& name : ParseValue<Array<String>>(text)) {
-      if (name.GetLength() != 0) legend.push_back({name.ToUTF8(), *palette.At(value)});
+    for (const std::string& name : ReadValueNames(text)) {
+      if (!name.empty() && value < palette.GetCount()) legend.push_back({name, *palette.At(value)});
       ++value;
     }
     if (!legend.empty()) return legend;

@@ -1,0 +1,164 @@
+// The page: asks what there is to see, and puts it together.
+import {bandsPanel} from './histogram_panel.js';
+import {ClassLayer} from './class_layer.js';
+import {el, save} from './dom.js';
+import {ImageLayer} from './image_layer.js';
+import {layersPanel} from './layers_panel.js';
+import {Map as OlMap, OverviewMap, Projection, TileLayer, View, Zoom} from './ol.js';
+import {Readout} from './readout.js';
+import {RegionTool} from './region_tool.js';
+import {ScaleBar} from './scale_bar.js';
+import {SegmentLayer} from './segment_layer.js';
+import {get, hasKey} from './server.js';
+import {shapeLayers} from './shape_layer.js';
+import {SwipeTool} from './swipe_tool.js';
+import {texts} from './texts.js';
+import {makeTools, showHelp, toggleDark} from './tools.js';
+
+const kAliveMs = 20000;
+
+function say(text, isFault = false) {
+  const notice = document.getElementById('notice');
+  notice.textContent = text;
+  notice.classList.toggle('fault', isFault);
+}
+
+function onFault(fault) {
+  say(fault.status === 0 ? texts.ended : fault.status === 403 ? texts.refused : fault.message, true);
+}
+
+function makeMap(raster) {
+  const extent = [0, -raster.lines, raster.samples, 0];
+  const projection = new Projection({code: 'vexg:pixels', units: 'pixels', extent});
+  const map = new OlMap({
+    target: 'map', controls: [new Zoom()], pixelRatio: 1,
+    view: new View({
+      projection, center: [raster.samples / 2, -raster.lines / 2], resolution: 1, minResolution: 1 / 64,
+      maxResolution: 4 * 2 ** (raster.levels - 1), showFullExtent: true, smoothResolutionConstraint: true,
+    }),
+  });
+  map.getTargetElement().setAttribute('aria-label', texts.map);
+  return {map, extent};
+}
+
+function makeLayers(scene, map) {
+  const made = {images: [], classes: [], segments: []};
+  const kinds = {image: [ImageLayer, made.images], classes: [ClassLayer, made.classes], labels: [SegmentLayer, made.segments]};
+  const entries = scene.rasters.map((raster, number) => {
+    const [Kind, list] = kinds[raster.role];
+    const layer = new Kind(number, raster, map, onFault);
+    list.push(layer);
+    if (raster.role !== 'labels') map.addLayer(layer.layer);
+    if (raster.role === 'labels') layer.layer.setZIndex(10);
+    const canBuild = !raster.hasLevels && raster.levels > 2 && !raster.isTree && number === 0;
+    return {name: raster.name, layer: layer.layer, number, canBuild};
+  });
+  return {...made, entries};
+}
+
+async function addShapes(scene, map, entries) {
+  for (const [number, name] of scene.shapes.entries()) {
+    const collection = await get(`shapes/${number}`);
+    for (const entry of shapeLayers(name, collection)) {
+      map.addLayer(entry.layer);
+      entries.push({...entry, note: collection.more ? texts.shapesMore : undefined});
+    }
+  }
+}
+
+function savePicture(map) {
+  map.once('rendercomplete', () => {
+    const [width, height] = map.getSize();
+    const canvas = el('canvas', {width, height});
+    const context = canvas.getContext('2d');
+    for (const part of map.getViewport().querySelectorAll('.ol-layer canvas, canvas.ol-layer')) {
+      if (part.width === 0) continue;
+      context.globalAlpha = Number(part.style.opacity || part.parentNode.style.opacity || 1);
+      const numbers = part.style.transform.match(/^matrix\(([^)]*)\)$/)?.[1].split(',').map(Number);
+      context.setTransform(...(numbers ?? [1, 0, 0, 1, 0, 0]));
+      context.drawImage(part, 0, 0);
+    }
+    canvas.toBlob((blob) => save('view.png', blob));
+  });
+  map.render();
+}
+
+function makeOverview(map, image) {
+  const control = new OverviewMap({
+    className: 'ol-overviewmap', collapsed: true, collapsible: true, tipLabel: texts.overview,
+    layers: [new TileLayer({source: image.tiles.layer.getSource()})],
+    view: new View({projection: map.getView().getProjection(), resolution: 1, maxResolution: 2 ** 20, minResolution: 1 / 64}),
+  });
+  let isThere = false;
+  return () => {
+    if (!isThere) map.addControl(control);
+    isThere = true;
+    control.setCollapsed(!control.getCollapsed());
+    return !control.getCollapsed();
+  };
+}
+
+async function start() {
+  document.getElementById('tools').setAttribute('aria-label', texts.tools);
+  if (!hasKey) { say(texts.noKey, true); return; }
+  const scene = await get('scene');
+  const first = scene.rasters[0];
+  document.title = `${first.name} – ${texts.title}`;
+  document.getElementById('title').textContent = first.name;
+  const {map, extent} = makeMap(first);
+  const fit = () => map.getView().fit(extent, {padding: [16, 16, 16, 16], maxZoom: 30});
+  fit();
+  const {images, classes, segments, entries} = makeLayers(scene, map);
+  const started = Promise.all([
+    ...images.map((image) => image.start()),
+    ...segments.map((layer) => layer.start().then(() => map.addLayer(layer.layer)))]);
+
+  const named = new Map(classes.map((layer) => [layer.number, layer]));
+  const readout = new Readout(map, scene.rasters, {
+    nameOf: (number, value) => {
+      const name = named.get(number)?.nameOf(value);
+      return name ? `${value} ${name}` : value;
+    },
+    costOf: () => segments.at(-1)?.cost ?? 0, onFault,
+  });
+  new ScaleBar(map, first);
+  const region = new RegionTool(map, first, say, onFault);
+  const swipe = images.length > 1 ? new SwipeTool(map, images[1].layer) : null;
+  map.on('singleclick', ({coordinate: [x, y]}) => {
+    if (!region.isDrawing) segments.at(-1)?.choose(Math.floor(x), Math.floor(-y));
+  });
+  const regionTool = {name: 'region', key: 'r', isToggle: true, run: () => region.toggle()};
+  region.onEnd = () => regionTool.off();
+  const tools = [
+    {name: 'fit', key: 'f', run: fit},
+    {name: 'actual', key: '1', run: () => map.getView().setResolution(1)},
+    regionTool,
+    {name: 'viewRegion', key: 'v', run: () => region.takeView()},
+    ...(swipe ? [{name: 'swipe', key: 's', isToggle: true, run: () => swipe.toggle()}] : []),
+    {name: 'overview', key: 'o', isToggle: true, run: makeOverview(map, images[0])},
+    {name: 'picture', key: 'p', run: () => savePicture(map)},
+    {name: 'dark', key: 'd', run: () => { toggleDark(); images.forEach((image) => image.refresh()); }},
+    {name: 'help', key: '?', run: showHelp},
+  ];
+  makeTools(tools, () => {
+    if (!region.isDrawing) return false;
+    region.stop();
+    region.source.clear();
+    return true;
+  });
+  document.addEventListener('keydown', (event) => {
+    if (event.key.toLowerCase() !== 'b' || event.ctrlKey || event.target.matches?.('input[type=number], select')) return;
+    for (const layer of segments) layer.layer.setVisible(!layer.layer.getVisible());
+  });
+
+  await started;
+  await addShapes(scene, map, entries);
+  document.getElementById('panels').replaceChildren(
+    layersPanel(entries, onFault), bandsPanel(images),
+    ...classes.map((layer) => layer.makePanel()), ...segments.map((layer) => layer.makePanel()));
+  setInterval(() => get('alive').catch(onFault), kAliveMs);
+  window.vexgView = {map, scene, images, classes, segments, region, readout, swipe};
+  document.documentElement.dataset.ready = 'true';
+}
+
+start().catch(onFault);

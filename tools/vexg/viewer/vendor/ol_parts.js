@@ -1,0 +1,20 @@
+// The parts of OpenLayers that the page uses. `npm ci && npm run build` makes ../page/ol.js of them.
+export {default as Feature} from 'ol/Feature.js';
+export {default as Map} from 'ol/Map.js';
+export {default as View} from 'ol/View.js';
+export {default as OverviewMap} from 'ol/control/OverviewMap.js';
+export {default as Zoom} from 'ol/control/Zoom.js';
+export {default as GeoJSON} from 'ol/format/GeoJSON.js';
+export {default as Polygon, fromExtent} from 'ol/geom/Polygon.js';
+export {default as Draw} from 'ol/interaction/Draw.js';
+export {default as TileLayer} from 'ol/layer/Tile.js';
+export {default as VectorLayer} from 'ol/layer/Vector.js';
+export {default as Projection} from 'ol/proj/Projection.js';
+export {getRenderPixel} from 'ol/render.js';
+export {default as ImageTile} from 'ol/source/ImageTile.js';
+export {default as VectorSource} from 'ol/source/Vector.js';
+export {default as CircleStyle} from 'ol/style/Circle.js';
+export {default as Fill} from 'ol/style/Fill.js';
+export {default as Stroke} from 'ol/style/Stroke.js';
+export {default as Style} from 'ol/style/Style.js';
+export {default as TileGrid} from 'ol/tilegrid/TileGrid.js';
