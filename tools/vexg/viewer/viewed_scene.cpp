@@ -67,6 +67,11 @@ Json PlaceOf(const GeoRefPtr& geoRef, double x, double y) {
   ShiftPixels(points, FirstPixel(*geoRef));
   if (!geoRef->PixelToMap(points) || !std::isfinite(points[0])) return place;
   place["map"] = {points[0], points[1]};
+  if (geoRef->GetType() == GeoRef::kRpc) {
+    place["degrees"] = place["map"];  // which is what such a model gives
+    place.erase("map");
+    return place;
+  }
   if (geoRef->CoordinateSystem().IsEmpty()) return place;
   MapToMap(geoRef->CoordinateSystem(), ReadSystem("map", "EPSG:4326"), points);
   if (std::isfinite(points[0]) && std::isfinite(points[1])) {

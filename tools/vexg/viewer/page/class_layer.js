@@ -43,30 +43,33 @@ export class ClassLayer {
 
   /** The name of a value, for the reading at the cursor. */
   nameOf(value) { return this.legend[Number(value)]?.name ?? ''; }
+}
 
-  /** The legend: a box for each class that has a name, or a colour where none has one. */
-  makePanel() {
-    const named = this.legend.filter(({name}) => name !== '');
-    const shown = named.length ? named : this.legend.filter(({color}) => color[3] !== 0).slice(0, 64);
-    const boxes = shown.map((row) => {
-      const box = tick(row.name || texts.noName(row.value), true, (isOn) => {
-        if (isOn) this.hidden.delete(row.value); else this.hidden.add(row.value);
-        this.refresh();
-      });
-      const swatch = el('span', {class: 'swatch', 'aria-hidden': 'true'});
-      swatch.style.backgroundColor = `rgba(${row.color.slice(0, 3)},${row.color[3] / 255})`;
-      box.row.insertBefore(swatch, box.row.lastChild);
-      return {...box, value: row.value};
+/**
+ * The legend: a box for each class that has a name, or a colour where none has one.
+ * @param layer {legend, hidden, refresh}
+ */
+export function legendPanel(layer) {
+  const named = layer.legend.filter(({name}) => name !== '');
+  const shown = named.length ? named : layer.legend.filter(({color}) => color[3] !== 0).slice(0, 64);
+  const boxes = shown.map((row) => {
+    const box = tick(row.name || texts.noName(row.value), true, (isOn) => {
+      if (isOn) layer.hidden.delete(row.value); else layer.hidden.add(row.value);
+      layer.refresh();
     });
-    const all = (isOn) => () => {
-      for (const box of boxes) {
-        box.input.checked = isOn;
-        if (isOn) this.hidden.delete(box.value); else this.hidden.add(box.value);
-      }
-      this.refresh();
-    };
-    return panel(texts.classes, el('div', {class: 'legend'}, ...boxes.map((box) => box.row)),
-      el('div', {class: 'row'}, el('button', {type: 'button', onclick: all(true)}, texts.allClasses),
-        el('button', {type: 'button', onclick: all(false)}, texts.noClasses)));
-  }
+    const swatch = el('span', {class: 'swatch', 'aria-hidden': 'true'});
+    swatch.style.backgroundColor = `rgba(${row.color.slice(0, 3)},${row.color[3] / 255})`;
+    box.row.insertBefore(swatch, box.row.lastChild);
+    return {...box, value: row.value};
+  });
+  const all = (isOn) => () => {
+    for (const box of boxes) {
+      box.input.checked = isOn;
+      if (isOn) layer.hidden.delete(box.value); else layer.hidden.add(box.value);
+    }
+    layer.refresh();
+  };
+  return panel(texts.classes, el('div', {class: 'legend'}, ...boxes.map((box) => box.row)),
+    el('div', {class: 'row'}, el('button', {type: 'button', onclick: all(true)}, texts.allClasses),
+      el('button', {type: 'button', onclick: all(false)}, texts.noClasses)));
 }

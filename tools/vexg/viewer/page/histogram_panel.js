@@ -65,11 +65,13 @@ class HistogramView {
     const {min, max, binSize, counts} = this.histogram;
     const span = max - min || 1;
     const columns = new Float64Array(kWidth);
-    counts.forEach((count, bin) => {
-      const from = Math.floor((bin * binSize) / (span + (binSize === 1 ? 1 : 0)) * kWidth);
-      const to = Math.max(from + 1, Math.floor(((bin + 1) * binSize) / (span + (binSize === 1 ? 1 : 0)) * kWidth));
-      for (let x = from; x < to && x < kWidth; ++x) columns[x] += count / (to - from);
-    });
+    // A bin over all its columns, or the mean of the bins of a column.
+    const shown = Math.max(1, Math.round((span + (binSize === 1 ? 1 : 0)) / binSize));
+    for (let x = 0; x < kWidth; ++x) {
+      const from = Math.floor((x * shown) / kWidth);
+      const to = Math.max(from + 1, Math.floor(((x + 1) * shown) / kWidth));
+      for (let bin = from; bin < to; ++bin) columns[x] += (counts[bin] ?? 0) / (to - from);
+    }
     const top = Math.sqrt(columns.reduce((most, count) => Math.max(most, count), 0)) || 1;
     const left = ((low - min) / span) * kWidth, right = ((high - min) / span) * kWidth;
     for (let x = 0; x < kWidth; ++x) {

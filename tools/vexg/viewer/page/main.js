@@ -1,6 +1,6 @@
 // The page: asks what there is to see, and puts it together.
 import {bandsPanel} from './histogram_panel.js';
-import {ClassLayer} from './class_layer.js';
+import {ClassLayer, legendPanel} from './class_layer.js';
 import {el, save} from './dom.js';
 import {ImageLayer} from './image_layer.js';
 import {layersPanel} from './layers_panel.js';
@@ -84,10 +84,15 @@ function savePicture(map) {
 }
 
 function makeOverview(map, image) {
+  const {samples, lines} = image.raster;
+  const whole = Math.max(samples, lines) / 150;
   const control = new OverviewMap({
     className: 'ol-overviewmap', collapsed: true, collapsible: true, tipLabel: texts.overview,
     layers: [new TileLayer({source: image.tiles.layer.getSource()})],
-    view: new View({projection: map.getView().getProjection(), resolution: 1, maxResolution: 2 ** 20, minResolution: 1 / 64}),
+    view: new View({  // of all of it, and always in the middle
+      projection: map.getView().getProjection(), resolution: whole, minResolution: whole, maxResolution: whole,
+      extent: [samples / 2, -lines / 2, samples / 2, -lines / 2], constrainOnlyCenter: true,
+    }),
   });
   let isThere = false;
   return () => {
@@ -155,7 +160,9 @@ async function start() {
   await addShapes(scene, map, entries);
   document.getElementById('panels').replaceChildren(
     layersPanel(entries, onFault), bandsPanel(images),
-    ...classes.map((layer) => layer.makePanel()), ...segments.map((layer) => layer.makePanel()));
+    ...images.filter(({style}) => style.mode === 'palette').map((image) => legendPanel({
+      legend: image.raster.legend, hidden: image.style.hidden, refresh: () => image.refresh()})),
+    ...classes.map(legendPanel), ...segments.map((layer) => layer.makePanel()));
   setInterval(() => get('alive').catch(onFault), kAliveMs);
   window.vexgView = {map, scene, images, classes, segments, region, readout, swipe};
   document.documentElement.dataset.ready = 'true';

@@ -45,7 +45,7 @@ export const texts = {
   low: (channel) => `${channel}, dark end`,
   high: (channel) => `${channel}, bright end`,
   histogram: (channel, low, high) => `Histogram of ${channel}, stretched from ${low} to ${high}`,
-  ofLevel: (step) => `Counted at every ${step}th pixel`,
+  ofLevel: (step) => `One pixel of ${step} × ${step} is counted.`,
 
   classes: 'Classes',
   noName: (value) => `Value ${value}`,
