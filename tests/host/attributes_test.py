@@ -7,17 +7,14 @@ import pathlib
 import shutil
 import struct
 import subprocess
-import sys
 import unittest
 
-from support import DATA, FolderTest, gdal_pixels, needs_data, needs_gdal, run
+from support import DATA, FolderTest, gdal_pixels, needs_data, needs_gdal, run, use_system_python
 
 try:
     import numpy as np
 except ImportError:
-    # Debian's numpy is that of Debian's interpreter.
-    if sys.executable != "/usr/bin/python3" and os.path.exists("/usr/bin/python3"):
-        os.execv("/usr/bin/python3", ["/usr/bin/python3", *sys.argv])
+    use_system_python()
     np = None
 
 SCENE = DATA / "landsat7_olinda.tif"

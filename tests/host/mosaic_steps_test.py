@@ -6,18 +6,15 @@ import pathlib
 import signal
 import struct
 import subprocess
-import sys
 import time
 import unittest
 
-from support import DATA, FolderTest, VEXG, gdal_pixels, needs_data, needs_gdal
+from support import DATA, FolderTest, VEXG, gdal_pixels, needs_data, needs_gdal, use_system_python
 
 try:
     import numpy as np
 except ImportError:
-    # Debian's numpy is that of Debian's interpreter.
-    if sys.executable != "/usr/bin/python3" and os.path.exists("/usr/bin/python3"):
-        os.execv("/usr/bin/python3", ["/usr/bin/python3", *sys.argv])
+    use_system_python()
     np = None
 
 needs_numpy = unittest.skipIf(np is None, "no numpy")

@@ -7,21 +7,18 @@ import random
 import shutil
 import signal
 import subprocess
-import sys
 import threading
 import time
 import unittest
 
-from support import DATA, FolderTest, VEXG, needs_data, run
+from support import DATA, FolderTest, VEXG, needs_data, run, use_system_python
 
 try:
     import numpy as np
     from osgeo import gdal, osr
     gdal.UseExceptions()
 except ImportError:
-    # Debian's modules are those of Debian's interpreter.
-    if sys.executable != "/usr/bin/python3" and os.path.exists("/usr/bin/python3"):
-        os.execv("/usr/bin/python3", ["/usr/bin/python3", *sys.argv])
+    use_system_python()
     np = None
 
 needs_modules = unittest.skipIf(np is None, "no numpy or GDAL module")

@@ -7,9 +7,18 @@ import re
 import shutil
 import struct
 import subprocess
+import sys
 import tempfile
 import unittest
 import zlib
+
+
+def use_system_python():
+    """Begins anew in the system's Python, for modules that the one that was called hasn't got."""
+    system = "/usr/bin/python3"
+    if sys.executable != system and os.path.exists(system):
+        os.execv(system, [system, *sys.argv])
+
 
 SOURCE = pathlib.Path(os.environ["VEXG_SOURCE"])
 BUILD = pathlib.Path(os.environ["VEXG_BUILD"])

@@ -15,7 +15,7 @@ import unittest
 
 from viewer import Viewer
 
-from support import BUILD, DATA, SANITIZED, SOURCE, FolderTest, needs_data, run
+from support import BUILD, DATA, SANITIZED, SOURCE, FolderTest, needs_data, run, use_system_python
 
 HERE = pathlib.Path(__file__).parent
 CHROMIUM = shutil.which("chromium") or shutil.which("chromium-browser")
@@ -26,6 +26,7 @@ try:
     from osgeo import gdal
     gdal.UseExceptions()
 except ImportError:
+    use_system_python()
     gdal = None
 
 
