@@ -15,7 +15,7 @@ struct Counted {
   std::shared_ptr<int> held;
 };
 
-/// What a call has opened must not be closed by its thread, perhaps at the end of the program.
+/// The thread of a call must not close what it has opened, perhaps at the end of the program.
 TEST(AbortableCall, LeavesItsResultToTheCallerAlone) {
   const StandardAbortFlag abort;
   for (int i = 0; i < 200; ++i) {
