@@ -11,6 +11,7 @@
 #include "gdal_no_data.h"
 #include "gdal_reader.h"
 #include "raster/block_strides.h"
+#include "raster/level_reduction.h"
 #include "raster/no_data_marker.h"
 #include "raster/pixel_states.h"
 #include "raster/pixel_value.h"
@@ -57,6 +58,9 @@ StoredHistogram ToStored(const RasterBandHistogram<T>& histogram) {
 
 /// Gives GDAL's name of a resampling method.
 inline const char* ResamplingName(std::int32_t method) {
+  const LevelReduction reduction = ReductionOf(static_cast<lumo::PyramidResamplingMethod>(method));
+  if (reduction == LevelReduction::kAverage) return "AVERAGE";
+  if (reduction == LevelReduction::kMode) return "MODE";
   switch (static_cast<lumo::PyramidResamplingMethod>(method)) {
     case lumo::PyramidResamplingMethod::kLinear:
       return "BILINEAR";

@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <cerrno>
 #include <cpl_conv.h>
+#include <cpl_string.h>
 #include <cpl_vsi_error.h>
 #include <cpl_vsi_virtual.h>
 #include <cstring>
@@ -268,7 +269,9 @@ class FileSystem final : public VSIFilesystemHandler {
   int Mkdir(const char* path, long mode) override { return plain_.Mkdir(path, mode); }
   int Rmdir(const char* path) override { return plain_.Rmdir(path); }
   int RmdirRecursive(const char* path) override { return plain_.RmdirRecursive(path); }
-  char** ReadDirEx(const char* path, int most) override { return plain_.ReadDirEx(path, most); }
+  char** ReadDirEx(const char* path, int most) override {
+    return WithStaged(path, plain_.ReadDirEx(path, most));
+  }
   char** SiblingFiles(const char* path) override { return plain_.SiblingFiles(path); }
   int IsCaseSensitive(const char* path) override { return plain_.IsCaseSensitive(path); }
   const char* GetOptions() override { return kMark; }
@@ -279,6 +282,15 @@ class FileSystem final : public VSIFilesystemHandler {
   }
 
  private:
+  /// The names in a folder, and those of the files that are new there.
+  static char** WithStaged(const char* folder, char** names) {
+    const StagedFiles* const staged = StagedFiles::OfThread();
+    if (staged == nullptr || names == nullptr) return names;
+    for (const std::string& name : staged->NamesIn(folder))
+      names = CSLAddString(names, name.c_str());
+    return names;
+  }
+
   /// Where a file that GDAL names lies for now.
   static std::string PlaceOf(const char* path) {
     const StagedFiles* const staged = StagedFiles::OfThread();

@@ -4,8 +4,8 @@
 #include <string_view>
 #include <type_traits>
 
+#include "raster/level_reduction.h"
 #include "raster/pixel_types.h"
-#include "raster/raster_enums.h"
 
 namespace lumo::pyramid {
 
@@ -40,7 +40,7 @@ bool HasMagic(const StoredHeader& stored) {
 }
 
 const char* FindFault(const Header& h) {
-  constexpr auto kMethods = static_cast<std::uint32_t>(PyramidResamplingMethod::kMajority);
+  constexpr std::uint32_t kMethods = kLastLevelMethod;
   if (h.samples == 0 || h.lines == 0 || h.bands == 0) return "a raster without pixels";
   if (DataTypeBytes(h.dataType) == 0) return "no such pixel type";
   if (h.tileSide == 0 || h.tileSide > kMostTileSide) return "tiles are 1 to 2048 pixels wide";

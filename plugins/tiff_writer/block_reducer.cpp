@@ -6,21 +6,11 @@
 #include <cstring>
 
 #include "raster/no_data_number.h"
+#include "raster/pixel_mode.h"
 #include "raster/pixel_types.h"
 
 namespace lumo::tiff {
 namespace {
-
-template <typename T>
-bool IsSame(const T& a, const T& b) {
-  if constexpr (std::is_floating_point_v<T>) {
-    return a == b || (std::isnan(a) && std::isnan(b));
-  } else if constexpr (std::is_integral_v<T>) {
-    return a == b;
-  } else {
-    return IsSame(a.real, b.real) && IsSame(a.imag, b.imag);
-  }
-}
 
 template <typename T>
 bool IsNumber(const T& value) {
@@ -72,20 +62,6 @@ void ShortMeans(const T* upper, const T* lower, unsigned count, unsigned depth, 
       to[band] = static_cast<T>((sum + 2) >> 2);  // rounds down, of negative numbers too
     }
   }
-}
-
-/// The most frequent of one to four values, of several such the first.
-template <typename T>
-T ModeOf(const std::array<T, 4>& values, unsigned count) {
-  const auto times = [&](unsigned i) {
-    return std::count_if(values.begin(), values.begin() + count,
-                         [&](const T& value) { return IsSame(value, values[i]); });
-  };
-  unsigned best = 0;
-  for (unsigned i = 1; i < count; ++i) {
-    if (times(i) > times(best)) best = i;
-  }
-  return values[best];
 }
 
 }  // namespace
@@ -176,7 +152,7 @@ void BlockReducer::ReduceAs(const Reduction& work) const {
         for (unsigned i = 0; i < count; ++i) {
           const T value = from[i][band];
           const bool isValid = counts[i] && IsNumber(value) &&
-                               !(hasNoData && IsSame(value, noData[band])) &&
+                               !(hasNoData && IsSamePixel(value, noData[band])) &&
                                !(isMarked && from[i][alpha] == T{});
           if (isValid) values[valid++] = value;
         }
@@ -186,7 +162,7 @@ void BlockReducer::ReduceAs(const Reduction& work) const {
           to[band] = method_ == OverviewMethod::kMode ? ModeOf(values, valid)
                                                       : MeanOf(values.data(), valid);
           // A mean may come out as the value that says there is none.
-          if (hasNoData && IsSame(to[band], noData[band])) to[band] = values[0];
+          if (hasNoData && IsSamePixel(to[band], noData[band])) to[band] = values[0];
         }
       }
     }
@@ -205,7 +181,7 @@ void BlockReducer::ExcludeNoData(const unsigned char* pixels, unsigned width, un
         for (unsigned band = 0; isNone && band < depth_; ++band) {
           T noData;
           std::memcpy(&noData, noData_[band].data(), sizeof(T));
-          isNone = IsSame(value[band], noData);
+          isNone = IsSamePixel(value[band], noData);
         }
         if (isNone) excluded[std::size_t{y} * width + x] = 1;
       }

@@ -5,6 +5,7 @@
 #include <functional>
 #include <memory>
 #include <mutex>
+#include <utility>
 
 #include "foundation/fault.h"
 #include "foundation/run_controls.h"
@@ -50,7 +51,7 @@ bool RunAbortable(const AbortFlag& abort, std::function<Result()> call, Result& 
     }
     fault = TakeFault();
     const std::lock_guard lock(shared->mutex);
-    shared->result = std::move(made);
+    std::swap(shared->result, made);  // what the caller takes is the caller's alone
     shared->fault = std::move(fault);
     shared->done = true;
     shared->ended.notify_all();
@@ -62,7 +63,7 @@ bool RunAbortable(const AbortFlag& abort, std::function<Result()> call, Result& 
   while (!shared->ended.wait_for(lock, kLook, [&] { return shared->done; })) {
     if (abort.IsSet()) return false;
   }
-  result = std::move(shared->result);
+  result = std::exchange(shared->result, Result{});  // the thread may let go of its share later
   if (shared->fault.GetLength() != 0) SetFault(shared->fault);
   return true;
 }

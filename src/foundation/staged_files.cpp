@@ -70,6 +70,18 @@ std::string StagedFiles::PlaceOf(const std::string& path) const {
   return at != entries_.end() ? at->second.place : path;
 }
 
+std::vector<std::string> StagedFiles::NamesIn(const std::string& folder) const {
+  std::vector<std::string> names;
+  std::error_code ignored;
+  for (const auto& [path, entry] : entries_) {
+    const fs::path file(path);
+    const bool isThere =
+        fs::equivalent(file.parent_path().empty() ? "." : file.parent_path(), folder, ignored);
+    if (isThere && !entry.isRemoved && !entry.older.exists) names.push_back(file.filename());
+  }
+  return names;
+}
+
 std::string StagedFiles::Stage(const std::string& path, bool isNew) {
   const bool isKnown = entries_.contains(path);
   if (!isNew && !isKnown && !platform::IdentifyFile(path).exists) {

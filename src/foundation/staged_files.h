@@ -2,6 +2,7 @@
 
 #include <map>
 #include <string>
+#include <vector>
 
 #include "platform/export.h"
 #include "platform/file_identity.h"
@@ -41,6 +42,8 @@ class VEXG_EXPORT StagedFiles {
   bool Covers(const std::string& path) const;
   /// Where a file lies for now; a name of nothing for one that was removed.
   std::string PlaceOf(const std::string& path) const;
+  /// The names of the files of a folder that are there for the library alone.
+  std::vector<std::string> NamesIn(const std::string& folder) const;
   /// Where a file is to be written: a copy of it, or for a new one a name. No text on failure.
   std::string Stage(const std::string& path, bool isNew);
   /// Makes a file look removed to the library; it goes when all is moved in.

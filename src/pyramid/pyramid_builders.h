@@ -5,6 +5,7 @@
 
 #include "data/raster_reader.h"
 #include "foundation/async.h"
+#include "raster/level_reduction.h"
 #include "raster/raster.h"
 #include "raster/raster_def.h"
 #include "stats/raster_stats.h"
@@ -13,6 +14,8 @@ namespace lumo {
 
 template <typename T>
 class DynamicRasterPyramid;
+template <typename T>
+struct PyramidPlan;
 
 /// Makes the raster that stands on a source, and on a pyramid where that isn't empty. The floor
 /// that has such rasters lies above.
@@ -82,6 +85,8 @@ class AsyncOrvaPyramidBuilder final : public PyramidBuilder {
   bool Build();
   bool Open(Rasters& rasters);
   bool MakeLevels(const Rasters& rasters);
+  bool MakeReduced(const PyramidPlan<T>& plan, LevelReduction reduction);
+  bool CollectStats(const RasterPtr<T>& raster);
   bool MakeHistogram(const Rasters& rasters);
   IPC Share(double weight) const;
 

@@ -10,6 +10,7 @@
 #include "pyramid/dynamic_raster_pyramid.h"
 #include "pyramid/pyramid_builders.h"
 #include "pyramid/pyramid_process.h"
+#include "pyramid/reduced_levels.h"
 #include "stats/exact_bins.h"
 #include "stats/raster_histogram.h"
 #include "stats/raster_histogram_process.h"
@@ -194,6 +195,8 @@ template <typename T>
 bool AsyncOrvaPyramidBuilder<T>::MakeLevels(const Rasters& rasters) {
   const PyramidPlan<T> plan{rasters.plain, rasters.full, order_.def.levelMin, order_.def.levelMax,
                             order_.tiles.height};
+  const LevelReduction reduction = ReductionOf(order_.def.resamplingMethod);
+  if (reduction != LevelReduction::kTold) return MakeReduced(plan, reduction);
   if constexpr (std::is_arithmetic_v<T>) {
     const bool isMorten = ChoosePyramidPath(rasters.plain->GetRasterDef()) == PyramidPath::kMorten;
     constexpr double kWithoutStats = 18, kWithStats = 19;
@@ -201,14 +204,44 @@ bool AsyncOrvaPyramidBuilder<T>::MakeLevels(const Rasters& rasters) {
     RasterPyramidDecimateRasterStatsProcess<T, RasterStats<T>> levels(
         plan, stats_, &owner_, Share(isMorten ? kWithoutStats : kWithStats));
     if (!levels.RunProcess(levels.kHere)) return false;
-    if (!isMorten || IsAborted()) return true;
-    const RasterIteratorPtr<T> blocks(new RasterIteratorStream<T>(rasters.plain));
-    RasterStatsProcess<T, RasterStats<T>> stats(blocks, stats_, Share(1));
-    return stats.RunProcess(stats.kHere);
+    return !isMorten || IsAborted() || CollectStats(rasters.plain);
   } else {
     RasterPyramidDecimateRasterProcess<T> levels(plan, &owner_, GetIPC());
     return levels.RunProcess(levels.kHere);
   }
+}
+
+/// The statistics of the raster, in a pass of their own.
+template <typename T>
+bool AsyncOrvaPyramidBuilder<T>::CollectStats(const RasterPtr<T>& raster) {
+  if constexpr (std::is_arithmetic_v<T>) {
+    const RasterIteratorPtr<T> blocks(new RasterIteratorStream<T>(raster));
+    RasterStatsProcess<T, RasterStats<T>> stats(blocks, stats_, Share(1));
+    return stats.RunProcess(stats.kHere);
+  } else {
+    return true;
+  }
+}
+
+/// MakeLevels, of means or modes.
+template <typename T>
+bool AsyncOrvaPyramidBuilder<T>::MakeReduced(const PyramidPlan<T>& plan, LevelReduction reduction) {
+  const auto groups = GroupsOfBands(plan.source->Bands(), plan.tileSide);
+  const bool isTogether = groups.size() == 1;
+  ObjectPtr stats;
+  if constexpr (std::is_arithmetic_v<T>) {
+    stats_.Reset(new RasterStats<T>);
+    stats_->Reset(plan.source->Bands());
+    if (isTogether) stats = stats_;
+  }
+  constexpr double kAll = 18;  // of 20 parts of the progress
+  for (const Array<unsigned>& bands : groups) {
+    const IPC share = Share(kAll / static_cast<double>(groups.size()));
+    if (!ReducedLevels<T>::Make(plan, reduction, bands, stats, share)) return false;
+    if (IsAborted()) return true;
+  }
+  owner_.OnLevelsWritten();
+  return isTogether || CollectStats(plan.source);
 }
 
 /// Counts a histogram of a small level, and leaves the owner with it and with the statistics.

@@ -2,6 +2,7 @@
 
 #include "foundation/fault.h"
 #include "pyramid/exact_levels.h"
+#include "raster/level_reduction.h"
 #include "raster/raster_command.h"
 #include "raster/raster_def.h"
 
@@ -88,7 +89,7 @@ const CommandDeclaration kBuild{
       "ORVA: a file of the library's own; DRIVER: by the driver of the format", "",
       &WordsIn<PyramidType>},
      {"PyramidResamplingMethod", Presence::kRequired, ValueKind::kWord,
-      "Impl, Nearest, Linear, Cubic or Majority; ORVA always takes every 2^level-th pixel", "",
+      "Impl, Nearest, Linear, Cubic or Majority; ORVA takes every 2^level-th pixel", "",
       &WordsIn<PyramidResamplingMethod>},
      {"PyramidLevelMin", Presence::kRequired, ValueKind::kInteger, "first level; 0 is a copy"},
      {"PyramidLevelMax", Presence::kRequired, ValueKind::kInteger, "last level, up to 31"},
@@ -98,7 +99,11 @@ const CommandDeclaration kBuild{
      {"Bins", Presence::kOptional, ValueKind::kWord,
       "of the histogram. Told: each a whole number wide, 256 at most; Exact: 256 that share the "
       "range of the values, or one for each of fewer integers",
-      "", &WordsIn<Form>}},
+      "", &WordsIn<Form>},
+     {"Reduction", Presence::kOptional, ValueKind::kWord,
+      "in place of the resampling method. Told: that; Average: means of the valid pixels below; "
+      "Mode: the most frequent ones",
+      "", &WordsIn<LevelReduction>}},
     {}};
 
 class BuildRasterPyramidCommand final : public RasterCommand {
@@ -109,6 +114,9 @@ class BuildRasterPyramidCommand final : public RasterCommand {
     PyramidDef def;
     def.pyramidType = Read<PyramidType>("PyramidType");
     def.resamplingMethod = Read<PyramidResamplingMethod>("PyramidResamplingMethod");
+    if (const auto method = MethodOf(Read<LevelReduction>("Reduction"))) {
+      def.resamplingMethod = *method;
+    }
     def.levelMin = Read<unsigned>("PyramidLevelMin");
     def.levelMax = Read<unsigned>("PyramidLevelMax");
     def.canBuild = Read<bool>("PyramidCanBuild");

@@ -29,6 +29,9 @@ class LevelStripWriter {
  public:
   /// @param level  as a raster that can be written.
   LevelStripWriter(const RasterPtr<T>& level, const LevelShape& shape, unsigned samples);
+  /// Writes some bands alone.
+  LevelStripWriter(const RasterPtr<T>& level, const LevelShape& shape, unsigned samples,
+                   const Array<unsigned>& bands);
 
   /// Takes the pixels of the level out of a block, and writes the strips that are whole with it. A
   /// row of more than one block lies within one strip.

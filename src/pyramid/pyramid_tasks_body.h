@@ -18,6 +18,13 @@ LevelStripWriter<T>::LevelStripWriter(const RasterPtr<T>& level, const LevelShap
       samples_(samples) {}
 
 template <typename T>
+LevelStripWriter<T>::LevelStripWriter(const RasterPtr<T>& level, const LevelShape& shape,
+                                      unsigned samples, const Array<unsigned>& bands)
+    : iterator_(level, TileDimensions{shape.width, shape.tileSide}, bands),
+      strip_(shape),
+      samples_(samples) {}
+
+template <typename T>
 bool LevelStripWriter<T>::Take(const Tile<T>& block) {
   const LevelShape& shape = strip_.Shape();
   const auto [x, y] = block.Origin();

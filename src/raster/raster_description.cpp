@@ -5,6 +5,7 @@
 #include <nlohmann/json.hpp>
 
 #include "foundation/color.h"
+#include "raster/level_reduction.h"
 #include "raster/pixel_types.h"
 #include "raster/raster_def.h"
 #include "raster/raster_details.h"
@@ -64,8 +65,11 @@ Json PalettesOf(const BasicRaster& raster) {
 Json PyramidOf(const BasicRaster& raster) {
   if (!raster.PyramidExists()) return nullptr;
   const PyramidDef def = raster.GetPyramidDef();
+  const LevelReduction reduction = ReductionOf(def.resamplingMethod);
+  const String method = reduction == LevelReduction::kTold ? FormatValue(def.resamplingMethod)
+                                                           : FormatValue(reduction);
   return {{"type", FormatValue(def.pyramidType).ToUTF8()},
-          {"method", FormatValue(def.resamplingMethod).ToUTF8()},
+          {"method", method.ToUTF8()},
           {"min", def.levelMin},
           {"max", def.levelMax}};
 }

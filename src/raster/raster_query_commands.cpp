@@ -1,3 +1,4 @@
+#include "raster/level_reduction.h"
 #include "raster/raster_command.h"
 #include "raster/raster_def.h"
 
@@ -21,7 +22,7 @@ class QueryCommand : public RasterCommand {
     Write("TileDimensions", raster.TileDimensions());
     const PyramidDef pyramid = raster.GetPyramidDef();
     Write("PyramidType", pyramid.pyramidType);
-    Write("PyramidResamplingMethod", pyramid.resamplingMethod);
+    Write("PyramidResamplingMethod", ToldMethodOf(pyramid.resamplingMethod));
     Write("PyramidLevelMin", pyramid.levelMin);
     Write("PyramidLevelMax", pyramid.levelMax);
     Write("PyramidCanBuild", pyramid.canBuild);

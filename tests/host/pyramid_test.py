@@ -42,6 +42,10 @@ class Pyramids(PipeTest, FolderTest):
                 "</Command></Job>")
             self.assertEqual(self.fine("run", "-q", job).count("Note="), notes, (first, second))
 
+    def build(self, *options):
+        """Levels of picked pixels."""
+        self.fine("pyramid", "build", self.file, "--resampling", "nearest", *options)
+
     def files(self):
         return sorted(path.name for path in self.folder.iterdir())
 
@@ -49,7 +53,7 @@ class Pyramids(PipeTest, FolderTest):
         self.serve("test", "--root", str(self.folder))
         for server in ([], ["--server", "test"]):
             with self.subTest(server):
-                self.fine("pyramid", "build", self.file, "--levels", "1-3", *server)
+                self.build("--levels", "1-3", *server)
                 self.assertEqual(self.files(), ["scene", "scene.hdr", "scene.pyr"])
                 for level in (1, 2, 3):
                     shape = (LINES >> level, SAMPLES >> level, BANDS)
@@ -77,14 +81,59 @@ class Pyramids(PipeTest, FolderTest):
                 self.assertEqual(got[name], want[name])
 
     def test_a_picture_is_made_from_the_smallest_level_that_is_large_enough(self):
-        self.fine("pyramid", "build", self.file, "--levels", "1-3", "--tile", "16")
-        for size, level in ((301, None), (200, None), (150, 1), (76, 1), (75, 2), (30, 3)):
-            job = self.fine("quicklook", self.file, self.folder / "out.png", "--size", size, "--print-job")
-            self.assertEqual('Input Level="' in job, level is not None, size)
-            if level is not None:
-                self.assertIn(f'Input Level="{level}"', job, size)
-        self.fine("quicklook", self.file, self.folder / "out.png", "--size", 75, "--stretch", "none")
+        """Of means of means, of picks of picks, and of means of 64 picks at least."""
+        none = ((301, None), (200, None))
+        fit = ((150, 1), (76, 1), (75, 2), (30, 3))
+        for built, shown, levels in (
+                ("average", "average", none + fit), ("nearest", "nearest", none + fit), ("mode", "nearest", none + fit),
+                ("average", "nearest", none + tuple((size, None) for size, _ in fit)),
+                ("nearest", "average", none + ((150, None), (19, None), (18, 1), (9, 2), (5, 2), (4, 3)))):
+            self.fine("pyramid", "build", self.file, "--levels", "1-3", "--tile", "16", "--resampling", built)
+            for size, level in levels:
+                job = self.fine("quicklook", self.file, self.folder / "out.png", "--size", size, "--resampling", shown,
+                                "--print-job")
+                self.assertEqual('Input Level="' in job, level is not None, (built, shown, size))
+                if level is not None:
+                    self.assertIn(f'Input Level="{level}"', job, (built, shown, size))
+        self.build("--levels", "1-3", "--tile", "16")
+        self.fine("quicklook", self.file, self.folder / "out.png", "--size", 75, "--stretch", "none", "--resampling", "nearest")
         self.assertEqual(read_png(self.folder / "out.png"), (75, 50, 3, every(self.pixels, 2)))
+
+    def test_levels_are_means_unless_pixels_are_codes(self):
+        def mean(x, y, band):
+            total = sum(self.pixels[((4 * y + v) * SAMPLES + 4 * x + u) * BANDS + band] for v in range(4) for u in range(4))
+            return (total + 8) // 16
+
+        self.fine("pyramid", "build", self.file, "--levels", "1-2")
+        self.assertEqual(json.loads(self.fine("pyramid", "info", self.file, "--json"))["method"], "Average")
+        want = bytes(mean(x, y, band) for y in range(LINES >> 2) for x in range(SAMPLES >> 2) for band in range(BANDS))
+        self.assertEqual(self.level(2)[2], want)
+        query = f'<Job><Command Name="a" ID="OpenRasterCommand"><Input ConnStr="{self.file}" PyramidConnStr="Pyramid|' \
+                f'{self.pyramid}"/><Output URI="$a"/></Command><Command Name="b" ID="QueryRasterCommand"><DependsOn Name="a"/>' \
+                '<Input URI="$a"/></Command></Job>'
+        self.assertIn('PyramidResamplingMethod="Linear"', self.fine("run", "-q", "-", stdin=query))
+        labels = write_orva(self.folder / "labels", 40, 30, 1, bytes(range(240)) * 20, data_type="Int32")
+        self.fine("pyramid", "build", labels, "--levels", "1")
+        self.assertEqual(json.loads(self.fine("pyramid", "info", labels, "--json"))["method"], "Nearest")
+        self.fine("pyramid", "build", labels, "--levels", "1", "--resampling", "mode")
+        self.assertEqual(json.loads(self.fine("pyramid", "info", labels, "--json"))["method"], "Mode")
+        self.fails(2, "exclude", "pyramid", "build", labels, "--resampling", "mode", "--method", "Cubic", "--type", "DRIVER")
+
+    @needs_gdal
+    def test_a_driver_takes_means_as_well(self):
+        tiff = self.folder / "scene.tif"
+        self.fine("copy", self.file, tiff)
+        for options, want in (([], "average"), (["--resampling", "nearest"], "nearest"), (["--method", "Cubic"], "cubic")):
+            self.fine("pyramid", "build", tiff, "--type", "DRIVER", "--levels", "1", *options)
+            code = subprocess.run(["gdaladdo", "-q", "-ro", "-r", want, "--config", "COMPRESS_OVERVIEW", "NONE",
+                                   shutil.copy(tiff, self.folder / "peer.tif"), "2"], capture_output=True, check=True)
+            self.assertEqual(code.returncode, 0)
+            made, peer = (subprocess.run(["gdalinfo", "-checksum", f"{name}.ovr"], capture_output=True, text=True,
+                                         check=True).stdout for name in (tiff, self.folder / "peer.tif"))
+            self.assertEqual([line for line in made.splitlines() if "Checksum" in line],
+                             [line for line in peer.splitlines() if "Checksum" in line], want)
+            self.fine("pyramid", "delete", tiff)
+            (self.folder / "peer.tif.ovr").unlink()
 
     def looks(self, file=None):
         """Whether the pyramid beside a raster is used, and what is said."""
@@ -156,11 +205,11 @@ class Pyramids(PipeTest, FolderTest):
         self.assertEqual(letter.read_text(), "Dear all")
         self.fails(1, "No such file", "pyramid", "delete", self.file, "--output", self.folder / "none")
         self.pyramid.write_bytes(b"VEXGPYRAMID01\n".ljust(9000, b"\0"))
-        self.fine("pyramid", "build", self.file)  # makes it good again
+        self.build()  # makes it good again
         self.assertEqual(self.level(1)[2], every(self.pixels, 1))
 
     def test_the_printed_job_builds_it(self):
-        job = self.fine("pyramid", "build", self.file, "--levels", "2", "--print-job")
+        job = self.fine("pyramid", "build", self.file, "--levels", "2", "--resampling", "nearest", "--print-job")
         self.assertEqual(self.files(), ["scene", "scene.hdr"])
         self.assertEqual(self.fine("run", "-", stdin=job).count('Result="Success"'), 3)
         self.assertEqual(self.level(2)[2], every(self.pixels, 2))

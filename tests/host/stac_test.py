@@ -45,7 +45,7 @@ ASSET = {
         "href": {"type": "string", "minLength": 1}, "type": {"type": "string"},
         "roles": {"type": "array", "items": {"type": "string"}},
         "raster:bands": {"type": "array", "minItems": 1, "items": {"allOf": [BAND, CLASSIFICATION]}}}}
-# What STAC 1.0.0 and version 1.1.0 of its three extensions ask of an item, written from their texts.
+# The rules of STAC 1.0.0 and of version 1.1.0 of its three extensions, written from their texts.
 ITEM = {
     "type": "object",
     "required": ["type", "stac_version", "stac_extensions", "id", "geometry", "properties", "links", "assets"],

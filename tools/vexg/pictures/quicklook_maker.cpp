@@ -104,9 +104,7 @@ Array<unsigned> ChoosePictureBands(const std::string& text, const RasterInfo& in
 }
 
 PictureSampling ChooseSampling(const RasterInfo& info, const Array<unsigned>& bands) {
-  const bool hasCodes =
-      std::any_of(bands.begin(), bands.end(), [&](unsigned band) { return info.hasPalette[band]; });
-  return hasCodes ? PictureSampling::kNearest : PictureSampling::kAverage;
+  return HoldsCodes(info, bands) ? PictureSampling::kNearest : PictureSampling::kAverage;
 }
 
 void MakeQuicklook(JobSession& session, const QuicklookRequest& request, const OutputFile& output,

@@ -43,8 +43,8 @@ struct QuicklookRequest {
 /// more. Throws HostError for other bands than one or three.
 Array<unsigned> ChoosePictureBands(const std::string& text, const RasterInfo& info);
 
-/// How a picture of the bands takes its pixels unless told: averages, but for bands with a palette,
-/// whose codes have no mean.
+/// How a picture of the bands takes its pixels unless told: averages, but for bands that hold
+/// codes.
 PictureSampling ChooseSampling(const RasterInfo& info, const Array<unsigned>& bands);
 
 /// Reads a raster, draws the picture and writes it. Throws HostError.

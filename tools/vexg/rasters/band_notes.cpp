@@ -28,6 +28,9 @@ RasterNotes ReadNotes(const JobResults& results, unsigned bands) {
     notes.blocks = {storage["blocks"][0].get<unsigned>(), storage["blocks"][1].get<unsigned>()};
     if (const Json& word = storage["compression"]; word.is_string()) notes.compression = word;
   }
+  if (const Json& pyramid = all["pyramid"]; pyramid.is_object()) {
+    notes.pyramidMethod = pyramid["method"];
+  }
   const Json& place = all["geoRef"];
   if (place.is_object()) notes.epsg = place["epsg"].get<long>();
   return notes;

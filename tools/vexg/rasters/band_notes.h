@@ -27,6 +27,7 @@ struct RasterNotes {
   std::optional<unsigned> alpha;  ///< the band that says which pixels count
   long epsg = 0;                  ///< code of the coordinate system; 0 for none
   TileDimensions blocks;          ///< of the file; 0 where it says nothing
+  std::string pyramidMethod;      ///< how its levels came about; empty without any
   std::string compression;        ///< of the file, "none", or empty where it says nothing
 };
 

@@ -181,6 +181,13 @@ RasterInfo ReadInfo(const JobResults& results, const std::string& name) {
   return info;
 }
 
+bool HoldsCodes(const RasterInfo& info, const Array<unsigned>& bands) {
+  using Wide = TypeList<std::int32_t, std::uint32_t, std::int64_t, std::uint64_t>;
+  return DispatchType(Wide{}, info.dataType, []<typename T>() { return true; }) ||
+         std::any_of(bands.begin(), bands.end(),
+                     [&](unsigned band) { return info.hasPalette[band]; });
+}
+
 Interleave ParseInterleave(const std::string& word) {
   return word == "bsq" ? Interleave::BSQ : word == "bil" ? Interleave::BIL : Interleave::BIP;
 }

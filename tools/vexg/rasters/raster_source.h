@@ -92,6 +92,10 @@ void AddQuery(JobDraft& draft, const std::string& name, const String& raster);
 /// Reads the results of the commands of AddQuery. Throws HostError for values that can't be.
 RasterInfo ReadInfo(const JobResults& results, const std::string& name);
 
+/// True where the values of a band are codes, as far as its type and palette tell: those of a band
+/// with a palette, and whole numbers of 32 bits and more. They have no mean.
+bool HoldsCodes(const RasterInfo& info, const Array<unsigned>& bands);
+
 /// The order that "bip", "bil" or "bsq" names.
 Interleave ParseInterleave(const std::string& word);
 

@@ -53,6 +53,7 @@ class CopyVerb final : public RasterVerb {
   RasterInfo PlanRaster(JobSession& session, const JobResults& opened,
                         const RasterInfo& source) override {
     bands_ = ParseBands(bandsText_, source);
+    hasCodes_ = HoldsCodes(source, bands_);
     ReadPalettes(session,
                  level_ == 0 ? opened.Find("source").returns.Find("URI")
                              : opened.Find("level").returns.Find("PyramidURI"),
@@ -91,9 +92,7 @@ class CopyVerb final : public RasterVerb {
     }
   }
 
-  std::string GetOverviewMethod() const override {
-    return palettes_.empty() ? "Average" : "Nearest";
-  }
+  std::string GetOverviewMethod() const override { return hasCodes_ ? "Nearest" : "Average"; }
 
   void Compare(MadeRaster& raster, Losses& losses) const override {
     CompareKept(raster, losses);
@@ -116,6 +115,7 @@ class CopyVerb final : public RasterVerb {
   unsigned dataType_ = 0;  // of the source
   Array<unsigned> bands_;
   std::vector<BandPalette> palettes_;
+  bool hasCodes_ = false;  // in a band that is copied
 };
 
 const VerbRegistration registration(

@@ -8,6 +8,7 @@
 #include "data/format_table.h"
 #include "options/option_values.h"
 #include "output/json_number.h"
+#include "rasters/band_notes.h"
 #include "rasters/file_verb.h"
 #include "rasters/raster_target.h"
 #include "views/sources/catalog_raster_ref.h"
@@ -20,7 +21,8 @@ struct Options {
   std::string output;
   std::string levels;
   std::string type;
-  std::string method = "Nearest";
+  std::string method;
+  std::string resampling;
   std::string compression;
   unsigned side = 128;
   bool json = false;
@@ -104,7 +106,8 @@ class PyramidVerb final : public FileVerb {
  public:
   explicit PyramidVerb(OptionSet& line) {
     line.AddNote(
-        "Level L has every 2^L-th pixel of every 2^L-th line. ORVA is a file of its own, FILE.pyr "
+        "A pixel of level L is the mean of the valid ones among 2^L by 2^L of the raster, or as "
+        "--resampling says. ORVA is a file of its own, FILE.pyr "
         "unless --output says otherwise; quicklook, read --level, info, stats and hist find it "
         "there, with the statistics of the raster in it. DRIVER leaves it to the driver of the "
         "format, which may put levels into the file itself, or beside it.");
@@ -121,9 +124,14 @@ class PyramidVerb final : public FileVerb {
     line.Add("--type", options_.type, "Who keeps the pyramid; ORVA by default")
         .Takes(OneOf({"ORVA", "DRIVER"}));
     line.Add("--output", options_.output, "The pyramid file; FILE.pyr by default").IsFile("PATH");
-    line.Add("--method", options_.method, "How a driver reduces pixels")
-        .Takes(OneOf({"Nearest", "Linear", "Cubic", "Majority"}))
-        .ShowsDefault();
+    line.Add(
+            "--resampling", options_.resampling,
+            "How pixels are reduced: average; nearest, every 2^L-th of every 2^L-th line; or mode, "
+            "the most frequent of four, level by level; by default average, and nearest of codes: "
+            "of bands with a palette, and of whole numbers of 32 bits")
+        .Takes(OneOf({"average", "nearest", "mode"}));
+    line.Add("--method", options_.method, "With DRIVER, in place of --resampling: as it names them")
+        .Takes(OneOf({"Nearest", "Linear", "Cubic", "Majority"}));
     line.Add("--tile", options_.side, "Side of the squares that levels are stored in")
         .Within(1, 2048)
         .ShowsDefault();
@@ -153,8 +161,11 @@ class PyramidVerb final : public FileVerb {
   // Building.
 
   void CheckOptions() override {
-    if (options_.IsDriver() || options_.method == "Nearest") return;
-    throw HostError(kExitUsage, "--method: a pyramid file takes every 2^level-th pixel: Nearest");
+    if (!options_.method.empty() && !options_.resampling.empty()) {
+      throw HostError(kExitUsage, "--method and --resampling exclude each other");
+    }
+    if (options_.IsDriver() || options_.method.empty() || options_.method == "Nearest") return;
+    throw HostError(kExitUsage, "--method: goes with --type DRIVER; a file takes --resampling");
   }
 
   std::vector<std::string> GetChangedFiles() const override {
@@ -179,8 +190,19 @@ class PyramidVerb final : public FileVerb {
 
   void Plan(JobSession& session, const JobResults& opened) override {
     raster_ = opened.Find("raster").returns.Find("URI");
-    levels_ = ChooseLevels(options_.levels, ReadInfo(opened, "raster"));
+    const RasterInfo info = ReadInfo(opened, "raster");
+    levels_ = ChooseLevels(options_.levels, info);
+    reduction_ = ChooseReduction(info);
     if (!options_.IsDriver()) session.GetInterruption().AddTemporariesOf(PyramidPath());
+  }
+
+  /// The word of the input Reduction.
+  const char* ChooseReduction(const RasterInfo& info) const {
+    std::string word = options_.resampling;
+    if (!options_.method.empty()) word = "nearest";  // or as the method says
+    const Array<unsigned> bands = ParseBands("", info);
+    if (word.empty()) word = HoldsCodes(info, bands) ? "nearest" : "average";
+    return word == "average" ? "Average" : word == "mode" ? "Mode" : "Told";
   }
 
   /// @param raster  a variable or URI.
@@ -188,7 +210,9 @@ class PyramidVerb final : public FileVerb {
     JobWriterCommand& build = draft.Step(kBuildStep, "BuildRasterPyramidCommand");
     build.AddInput("URI", raster);
     build.AddInput("PyramidType", String(options_.IsDriver() ? "DRIVER" : "ORVA"));
-    build.AddInput("PyramidResamplingMethod", String(options_.method));
+    build.AddInput("PyramidResamplingMethod",
+                   String(options_.method.empty() ? "Nearest" : options_.method));
+    build.AddInput("Reduction", String(reduction_));
     build.AddInput("PyramidLevelMin", levels_.first);
     build.AddInput("PyramidLevelMax", levels_.last);
     build.AddInput("PyramidCanBuild", true);
@@ -232,6 +256,7 @@ class PyramidVerb final : public FileVerb {
     JobDraft opening;
     AddOpenToLook(opening);
     AddQuery(opening, "raster", "$raster");
+    AddNotesQuery(opening, "$raster");
     if (GetJobOptions().printJob) {
       opening.Close("close", "$raster");
       std::cout << opening.Write().ToUTF8() << '\n';
@@ -243,10 +268,9 @@ class PyramidVerb final : public FileVerb {
       throw HostError(kExitFailed, GetSource().file + ": there is no pyramid");
     }
     const String raster = opened.Find("raster").returns.Find("URI");
-    const Map<String, String>& query = opened.Find("raster.query").returns;
     Json all{{"file", GetSource().file},
              {"type", info.pyramidType.ToUTF8()},
-             {"method", query.Find("PyramidResamplingMethod").ToUTF8()}};
+             {"method", ReadNotes(opened, info.bands).pyramidMethod}};
     if (info.pyramidType == "ORVA") all["pyramid"] = PyramidPath();
     const JobDraft asking = LevelsDraft(raster, info);
     all["levels"] =
@@ -290,6 +314,7 @@ class PyramidVerb final : public FileVerb {
   Options options_;
   String raster_;  // URI
   Levels levels_;
+  const char* reduction_ = "Told";
 };
 
 const VerbRegistration registration("pyramid",

@@ -6,6 +6,7 @@
 #include "pictures/palette_reading.h"
 #include "pictures/picture_writer.h"
 #include "pictures/quicklook_maker.h"
+#include "rasters/band_notes.h"
 #include "rasters/file_verb.h"
 #include "rasters/value_names.h"
 
@@ -42,6 +43,17 @@ unsigned ChooseLevel(const RasterInfo& info, unsigned size) {
   return isThere ? level : 0;
 }
 
+/// The level of the pyramid that a picture is made from. One of means serves averages as it is. One
+/// of picked pixels has to be eight times as large as the picture, so that a mean is one of 64
+/// pixels; and single pixels are those of no level of means.
+unsigned ChooseLevelFor(PictureSampling sampling, const RasterInfo& info, const std::string& method,
+                        unsigned size) {
+  constexpr unsigned kPickedBits = 3;
+  const bool areMeans = method == "Average";
+  if (sampling == PictureSampling::kNearest) return areMeans ? 0 : ChooseLevel(info, size);
+  return ChooseLevel(info, areMeans ? size : size << kPickedBits);
+}
+
 class QuicklookVerb final : public FileVerb {
  public:
   explicit QuicklookVerb(OptionSet& line) : FileVerb(line) {
@@ -67,12 +79,10 @@ class QuicklookVerb final : public FileVerb {
         .IsFile("LABELS");
     line.Add("--legend", hasLegend_,
              "Draw the names of the values that have some, and their colours");
-    line.Add(
-            "--resampling", resampling_,
-            "What a pixel of a reduced picture shows: average, the mean of the valid pixels that "
-            "it "
-            "covers, or nearest, the one in their middle; by default average, and nearest of bands "
-            "with a palette, which have no other")
+    line.Add("--resampling", resampling_,
+             "What a pixel of a reduced picture shows: average, the mean of the valid pixels that "
+             "it covers, or nearest, the one in their middle; by default average, and nearest of "
+             "codes: of bands with a palette, which have no other, and of whole numbers of 32 bits")
         .Takes(OneOf({"average", "nearest"}));
     line.Add("--size", size_, "Pixels of the longer side at most").Within(1, 16384).ShowsDefault();
     AddOverwriteTo(line, "a file that is there");
@@ -92,6 +102,7 @@ class QuicklookVerb final : public FileVerb {
   void AddOpening(JobDraft& draft) const override {
     AddOpenWithPyramid(draft, "raster", GetSource());
     AddQuery(draft, "raster", "$raster");
+    AddNotesQuery(draft, "$raster");
   }
 
   void Plan(JobSession& session, const JobResults& opened) override {
@@ -105,12 +116,18 @@ class QuicklookVerb final : public FileVerb {
       throw HostError(kExitFailed, GetSource().file + ": --legend: the picture is in no palette");
     }
     sampling_ = ChooseSampling(info_, bands_);
-    if (resampling_ == "average" && sampling_ == PictureSampling::kNearest) {
+    const bool hasPalette = std::any_of(bands_.begin(), bands_.end(),
+                                        [&](unsigned band) { return info_.hasPalette[band]; });
+    if (resampling_ == "average") sampling_ = PictureSampling::kAverage;
+    if (resampling_ == "average" && hasPalette) {
       throw HostError(kExitUsage, "--resampling: the values of a band with a palette have no mean");
     }
     if (resampling_ == "nearest") sampling_ = PictureSampling::kNearest;
     shown_ = raster_;
-    if (outlines_.empty()) level_ = ChooseLevel(info_, size_);  // labels have no levels
+    if (outlines_.empty()) {  // labels have no levels
+      const std::string method = ReadNotes(opened, whole_.bands).pyramidMethod;
+      level_ = ChooseLevelFor(sampling_, info_, method, size_);
+    }
     if (level_ != 0) ShowLevel(session);
   }
 
