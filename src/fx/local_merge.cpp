@@ -47,17 +47,21 @@ void LocalMerge::Begin(std::uint32_t bands, const Rules& rules, LabelForest& for
   pairs_.resize(std::size_t{rules.rounds} + 1);
 }
 
-/// Makes places, half as many again.
+/// Makes places, a quarter as many again.
 void LocalMerge::Grow() {
   constexpr std::size_t kLeast = 1024;
-  const std::size_t before = labels_.size(), count = before + std::max(before / 2, kLeast);
-  labels_.resize(count);
-  pixels_.resize(count);
-  means_.resize(count * bands_);
-  levels_.resize(count);
-  roots_.resize(count);
-  chosen_.resize(count);
-  waits_.resize(count);
+  const std::size_t before = labels_.size(), count = before + std::max(before / 4, kLeast);
+  const auto grow = [](auto& container, std::size_t size) {
+    container.reserve(size);  // no more than that
+    container.resize(size);
+  };
+  grow(labels_, count);
+  grow(pixels_, count);
+  grow(means_, count * bands_);
+  grow(levels_, count);
+  grow(roots_, count);
+  grow(chosen_, count);
+  grow(waits_, count);
   for (std::size_t slot = count; slot-- > before;) {
     free_.push_back(static_cast<std::uint32_t>(slot));
   }
@@ -193,6 +197,7 @@ bool LocalMerge::Merge(const AbortFlag* abort) {
     }
     Advance(round);
     MovePairs(round);
+    pairs_[round].shrink_to_fit();  // few are left, and the next rounds need the memory
     if (isAny && round + 1 < rules_.rounds) RenewPairs(pairs_[round + 1]);
     Free();
     if (!forest_->IsWell()) return false;

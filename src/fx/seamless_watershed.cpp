@@ -187,37 +187,48 @@ bool SeamlessWatershed::FindWays(unsigned strip) {
   return true;
 }
 
-bool SeamlessWatershed::CountMinima() {
+/// Finds the ways of all strips, and the minima that go on in the strip below. Some strips at a
+/// time: with their numbers the distances can go.
+bool SeamlessWatershed::FindAllWays(const AbortFlag* abort, std::vector<Join>& joins) {
+  constexpr std::size_t kAtOnce = 16;
   std::uint64_t total = 0;
-  for (Strip& strip : strips_) {
-    strip.firstNumber = static_cast<std::uint32_t>(total);
-    total += strip.minimumCount;
-    if (total > static_cast<std::uint64_t>(std::numeric_limits<std::int32_t>::max())) {
-      SetFault("the raster has more minima than labels have numbers");
-      return false;
+  for (std::size_t begin = 0; begin < strips_.size(); begin += kAtOnce) {
+    if (abort != nullptr && abort->IsSet()) return true;
+    std::vector<unsigned> now(std::min(kAtOnce, strips_.size() - begin));
+    std::iota(now.begin(), now.end(), static_cast<unsigned>(begin));
+    if (!ForEachStrip(now, abort, [this](unsigned strip) { return FindWays(strip); })) return false;
+    if (abort != nullptr && abort->IsSet()) return true;
+    for (const unsigned strip : now) {
+      strips_[strip].firstNumber = static_cast<std::uint32_t>(total);
+      total += strips_[strip].minimumCount;
+      if (total > static_cast<std::uint64_t>(std::numeric_limits<std::int32_t>::max())) {
+        SetFault("the raster has more minima than labels have numbers");
+        return false;
+      }
+      if (strip == 0) continue;
+      ListJoins(strip, joins);
+      Release(strips_[strip - 1].first, strips_[strip - 1].last, strips_[strip - 1].same);
     }
   }
   return true;
 }
 
-/// Finds the minima that go on in the strip below, and which of them are one.
-void SeamlessWatershed::FindParts() {
-  std::vector<std::pair<std::uint32_t, std::uint32_t>> joins;  // numbers, of one minimum
-  for (std::size_t below = 1; below < strips_.size(); ++below) {
-    Strip& upper = strips_[below - 1];
-    const Strip& lower = strips_[below];
-    for (std::uint32_t x = 0; x < cut_.width; ++x) {
-      // On one level, or one of them would have a way down.
-      if (upper.last[x] != StripDrains::kFar || lower.first[x] != StripDrains::kFar) continue;
-      if (upper.lastLabels[x] <= 0 || lower.firstLabels[x] <= 0) continue;  // excluded
-      const std::pair join{
-          upper.firstNumber + static_cast<std::uint32_t>(upper.lastLabels[x]) - 1,
-          lower.firstNumber + static_cast<std::uint32_t>(lower.firstLabels[x]) - 1};
-      if (joins.empty() || joins.back() != join) joins.push_back(join);
-    }
-    Release(upper.first, upper.last, upper.same);
+/// Lists the minima that go on from the strip above.
+void SeamlessWatershed::ListJoins(unsigned strip, std::vector<Join>& joins) const {
+  const Strip& upper = strips_[strip - 1];
+  const Strip& lower = strips_[strip];
+  for (std::uint32_t x = 0; x < cut_.width; ++x) {
+    // On one level, or one of them would have a way down.
+    if (upper.last[x] != StripDrains::kFar || lower.first[x] != StripDrains::kFar) continue;
+    if (upper.lastLabels[x] <= 0 || lower.firstLabels[x] <= 0) continue;  // excluded
+    const Join join{upper.firstNumber + static_cast<std::uint32_t>(upper.lastLabels[x]) - 1,
+                    lower.firstNumber + static_cast<std::uint32_t>(lower.firstLabels[x]) - 1};
+    if (joins.empty() || joins.back() != join) joins.push_back(join);
   }
-  Release(strips_.back().first, strips_.back().last, strips_.back().same);
+}
+
+/// Finds which parts of minima are one.
+void SeamlessWatershed::FindParts(const std::vector<Join>& joins) {
   parts_.reserve(2 * joins.size());
   for (const auto& [a, b] : joins) {
     parts_.push_back({a, a});
@@ -354,12 +365,10 @@ bool SeamlessWatershed::Connect(const AbortFlag* abort) {
   const auto isAborted = [abort] { return abort != nullptr && abort->IsSet(); };
   if (!Settle(abort)) return false;
   if (isAborted()) return true;
-  std::vector<unsigned> all(strips_.size());
-  std::iota(all.begin(), all.end(), 0U);
-  if (!ForEachStrip(all, abort, [this](unsigned strip) { return FindWays(strip); })) return false;
+  std::vector<Join> joins;
+  if (!FindAllWays(abort, joins)) return false;
   if (isAborted()) return true;
-  if (!CountMinima()) return false;
-  FindParts();
+  FindParts(joins);
   NumberMinima();
   if (cut_.isRanked) RankMinima();
   FollowSeams();

@@ -2,6 +2,7 @@
 
 #include <memory>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include "foundation/run_controls.h"
@@ -22,8 +23,8 @@ namespace lumo {
 /// own.
 ///
 /// Cost: a byte a pixel in a file without a name, read and written twice and read once for each
-/// labelling; in memory 17 bytes for a pixel of each strip's width, 12 a minimum that strips meet
-/// in, a few bytes a pixel of the strips that are worked on, and where minima are ranked 20 bytes
+/// labelling; in memory 9 bytes for a pixel of each strip's width, 24 a minimum that strips
+/// meet in, a few bytes a pixel of the strips that are worked on, and where minima are ranked 20 bytes
 /// for each of them.
 /// Threads: AddStrip and Label may be called for several strips at once; Connect works on all
 ///          threads. Failure: false, with the fault set.
@@ -115,13 +116,16 @@ class VEXG_EXPORT SeamlessWatershed {
     std::uint32_t label;   // in front of NumberMinima the number of the whole
   };
 
+  using Join = std::pair<std::uint32_t, std::uint32_t>;  // numbers of parts of one minimum
+
   StripDrains::Beyond BeyondOf(unsigned strip) const;
   bool ComesNearer(unsigned strip) const;
   bool Settle(const AbortFlag* abort);
   bool Drain(unsigned strip, StripDrains& drains);
   bool FindWays(unsigned strip);
-  bool CountMinima();
-  void FindParts();
+  bool FindAllWays(const AbortFlag* abort, std::vector<Join>& joins);
+  void ListJoins(unsigned strip, std::vector<Join>& joins) const;
+  void FindParts(const std::vector<Join>& joins);
   void NumberMinima();
   void RankMinima();
   std::uint32_t LabelOf(unsigned strip, std::uint32_t minimum) const;
