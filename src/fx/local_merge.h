@@ -1,12 +1,15 @@
 #pragma once
 
+#include <atomic>
 #include <cstddef>
 #include <cstdint>
+#include <unordered_map>
 #include <vector>
 
 #include "foundation/run_controls.h"
-#include "fx/label_pairs.h"
+#include "fx/label_forest.h"
 #include "fx/merge_cost.h"
+#include "fx/strip_basins.h"
 #include "platform/huge_pages.h"
 
 namespace lumo {
@@ -18,78 +21,132 @@ namespace lumo {
 /// first of them was.
 ///
 /// A segment of n rounds depends on its surroundings alone, unlike one of LambdaSchedule, whose
-/// merges wait for cheaper ones anywhere. The result is the same for any number of threads.
+/// merges wait for cheaper ones anywhere. So the image comes strip by strip, and a segment is done
+/// with, and forgotten, as soon as its last round is. Each goes through its rounds on its own: a
+/// round of it waits until all neighbours have been through those before, and until the choice of
+/// the neighbour that it chose is known as well. So nothing is ever guessed or done twice: the
+/// result is the same for any height of the strips, any memory, and any number of threads.
 ///
-/// Cost: each round looks at all segments and pairs that are left. All threads work in it.
-/// Threads: one at a time.
+/// Memory: of segments that wait, and their pairs. They are those some two neighbours for each
+///         round away from the end of what has come so far; and those as near to a segment that
+///         reaches through the whole image. What has become of the others is in a LabelForest.
+/// Cost:   each round looks at all segments and pairs that go through it. All threads work in it.
+/// Threads: one at a time. Failure: false, with the fault set.
+///
+///     merge.Begin(bands, rules, forest);
+///     for (...) if (!merge.AddStrip(basins, values, abort)) return false;
+///     if (!merge.Finish(abort)) return false;
 class VEXG_EXPORT LocalMerge {
  public:
   /// The rounds where nobody says how many.
   static constexpr unsigned kRounds = 12;
 
-  /// Forgets everything, and makes room for labels below `labelCount`, of `bands` bands.
-  void Begin(std::uint32_t labelCount, std::uint32_t bands);
-  /// Limits how segments grow. Behind Begin.
-  void Limit(const GrowthLimits& limits) { limits_ = limits; }
+  struct Rules {
+    double threshold = 0;
+    unsigned rounds = kRounds;
+    GrowthLimits limits;
+    std::uint64_t memory = 0xFFFFFFFFFFFFFFFF;  ///< bytes that it may take, the forest excluded
+  };
 
-  /// Adds a pixel to its segment.
-  /// @param label   not 0.
-  /// @param values  one for each band.
+  /// Forgets everything. @param forest  has all labels, each by itself; it outlives the merge.
+  void Begin(std::uint32_t bands, const Rules& rules, LabelForest& forest);
+
+  /// Adds the next strip, and merges where enough has come.
+  /// @param values  of its pixels, band by band for each.
   template <typename T>
-  void AddPixel(std::uint32_t label, const T* values) {
-    double* const sums = means_.data() + std::size_t{label} * bands_;
-    for (std::uint32_t band = 0; band < bands_; ++band) {
-      sums[band] += static_cast<double>(values[band]);
+  bool AddStrip(const StripBasins& strip, const T* values, const AbortFlag* abort) {
+    Enter(strip);
+    for (const StripBasins::Run& run : strip.runs) {
+      AddRun(slots_[run.basin], run.pixels, values + run.first * bands_);
     }
-    pixels_[label] += 1;
+    return Leave(strip) && MergeIfDue(abort);
   }
-  /// Makes room for pairs of neighbours.
-  void ReservePairs(std::size_t count) { pairs_.reserve(count); }
-  /// Adds a pair of neighbours, behind those that were found before. None has the label 0.
-  void AddPair(const LabelPair& pair) {
-    pairs_.push_back({pair.low, pair.high, pair.length, static_cast<std::uint32_t>(pairs_.size())});
-  }
-  /// Adds to the common boundary of a pair. @param pair  by the order in which pairs were added.
-  void Lengthen(std::size_t pair, std::uint32_t length) { pairs_[pair].length += length; }
+  /// Merges the rest, behind all strips.
+  bool Finish(const AbortFlag* abort) { return Merge(abort); }
 
-  /// Merges, behind all pixels and pairs. @param abort  ends it early; null for none.
-  /// @return for each label one that stands for its segment.
-  std::vector<std::uint32_t> Join(double threshold, unsigned rounds, const AbortFlag* abort);
-
-  /// The bytes that a segment and a pair of neighbours take.
-  static constexpr std::size_t BytesOfSegment(std::uint32_t bands) {
-    return sizeof(double) + bands * sizeof(double) + 2 * sizeof(std::uint32_t);
-  }
-  static constexpr std::size_t BytesOfPair() { return 2 * sizeof(Pair) + sizeof(double); }
+  /// The most bytes that it took at once so far.
+  std::uint64_t MostBytes() const { return mostBytes_; }
 
  private:
   static constexpr std::uint32_t kNone = 0xFFFFFFFF;
+  static constexpr std::int32_t kGrowing = -1;  // the level of a segment that strips add to
 
+  /// Two neighbours, by their places; `low` has the lower label.
   struct Pair {
     std::uint32_t low, high;
     std::uint32_t length;
     std::uint32_t index;  // by which it was found
   };
+  /// A choice that a segment can't make any more: the neighbour has gone through the round.
+  struct Lost {
+    double cost;
+    std::uint32_t index;
+    std::int32_t level;
+  };
   template <typename T>
   using Large = std::vector<T, platform::HugePageAllocator<T>>;
 
-  MergeSide SideOf(std::uint32_t label) const {
-    return {pixels_[label], means_.data() + std::size_t{label} * bands_};
+  template <typename T>
+  void AddRun(std::uint32_t slot, std::uint32_t count, const T* values) {
+    pixels_[slot] += count;
+    double* const sums = means_.data() + std::size_t{slot} * bands_;
+    for (std::uint32_t i = 0; i < count; ++i, values += bands_) {
+      for (std::uint32_t band = 0; band < bands_; ++band) {
+        sums[band] += static_cast<double>(values[band]);
+      }
+    }
   }
-  bool IsBetter(std::uint32_t pair, std::uint32_t other) const;
-  void Offer(std::uint32_t label, std::uint32_t pair);
-  void Choose(double threshold);
-  bool MergeChosen();
-  void RenewPairs();
-  void SumUpCounts();
+  MergeSide SideOf(std::uint32_t slot) const {
+    return {pixels_[slot], means_.data() + std::size_t{slot} * bands_};
+  }
+  std::uint32_t TakeSlot(std::uint32_t label);
+  void Grow();
+  void Enter(const StripBasins& strip);
+  bool Leave(const StripBasins& strip);
+  void Complete(std::uint32_t slot);
+  bool JoinPairs(const StripBasins& strip);
+  std::uint64_t CountBytes() const;
+  bool MergeIfDue(const AbortFlag* abort);
+  bool Merge(const AbortFlag* abort);
+  bool IsBehind(unsigned round) const;
+  void ForgetAll();
+  void FindCosts(unsigned round);
+  void Choose(unsigned round);
+  bool IsBetter(const Pair* pairs, std::uint32_t pair, std::uint32_t other) const;
+  bool JoinChosen(unsigned round);
+  void Advance(unsigned round);
+  void MovePairs(unsigned round);
+  void RenewPairs(std::vector<Pair>& pairs);
+  void Lose(std::uint32_t slot, const Lost& lost);
+  void Free();
 
   std::uint32_t bands_ = 0;
-  GrowthLimits limits_;
-  Large<double> pixels_, means_;      // by label
-  std::vector<std::uint32_t> roots_;  // by label: the segment that it became part of
-  Large<std::uint32_t> chosen_;       // by label: the pair that it chose; or a count of its pairs
-  Large<Pair> pairs_, renewed_;
-  Large<double> costs_;  // by pair
+  Rules rules_;
+  LabelForest* forest_ = nullptr;
+  std::uint64_t mostBytes_ = 0;
+
+  // By place. A place is free again when its segment has gone.
+  std::vector<std::uint32_t> labels_;
+  Large<double> pixels_, means_;      // of growing ones sums
+  std::vector<std::int32_t> levels_;  // the rounds that it has been through
+  std::vector<std::uint32_t> roots_;  // the place of the segment that it became part of
+  Large<std::uint32_t> chosen_;       // the pair that it chose in its round; also counts of pairs
+  std::vector<std::uint8_t> waits_;   // not 0: can't go through its round yet
+  std::unordered_map<std::uint32_t, Lost> lost_;  // by place: the best of these
+  std::vector<std::uint32_t> free_, gone_;
+
+  // By level, that of the segment of a pair that has been through more rounds.
+  std::vector<std::vector<std::uint32_t>> segments_;
+  std::vector<std::vector<Pair>> pairs_;
+  std::size_t live_ = 0, fresh_ = 0;  // segments, and those that have come since the last merge
+  Large<double> costs_;               // by pair of a level
+  Large<Pair> renewed_;
+
+  // Between strips.
+  std::unordered_map<std::uint32_t, std::uint32_t> open_;  // by label: places of growing segments
+  std::unordered_map<std::uint64_t, Pair> openPairs_;      // of two of them, by labels
+  std::vector<std::uint32_t> slots_;                       // by number in the strip
+  std::uint32_t found_ = 0;                                // pairs
 };
 
 }  // namespace lumo

@@ -8,10 +8,6 @@ std::uint64_t MemoryOfMerging(std::uint64_t basins, unsigned bands, const Segmen
   constexpr std::uint64_t kPairs = 3;        // no more for each area of a plane
   constexpr std::uint64_t kNumbers = 4 + 4;  // its number, and the one that stands for its segment
   const std::uint64_t tree = request.tree.empty() ? 0 : sizeof(std::uint32_t) + sizeof(double);
-  if (request.order == MergeOrder::kLocal) {
-    return basins *
-           (kNumbers + kPairs * LocalMerge::BytesOfPair() + LocalMerge::BytesOfSegment(bands));
-  }
   if (!request.isRigorous) {
     return basins * (kNumbers + tree + kPairs * LambdaSchedule::BytesOfPair() +
                      LambdaSchedule::BytesOfSegment(bands) + LambdaSchedule::BytesInQueue());

@@ -1,5 +1,6 @@
 #pragma once
 
+#include "fx/label_forest.h"
 #include "fx/label_pairs.h"
 #include "fx/seamless_watershed.h"
 #include "fx/segment_process.h"
@@ -59,6 +60,7 @@ class SeamlessSegmentation {
   unsigned stripLines_ = 1;
   SeamlessWatershed watershed_;
   std::vector<std::uint32_t> roots_;  // by basin: one that stands for its segment; empty for itself
+  LabelForest forest_;                // what basins have become
   std::optional<SegmentTreeWriter> tree_;
   // With a tree, by basin: its number in raster order of first pixels, and the squares of its
   // values.

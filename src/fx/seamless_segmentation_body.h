@@ -7,8 +7,10 @@
 #include "foundation/progress.h"
 #include "fx/gradient_stages.h"
 #include "fx/lambda_schedule.h"
+#include "fx/local_merge.h"
 #include "fx/rigorous_merge.h"
 #include "fx/seamless_segmentation.h"
+#include "fx/strip_basins.h"
 #include "fx/strip_numbers.h"
 #include "fx/task_setup.h"
 #include "fx/tree_cut.h"
@@ -27,27 +29,6 @@ struct StripGraph {
   std::vector<std::int32_t> labels;
   std::vector<LabelPair> pairs;
 };
-
-/// Calls `visit(a, b)` for each edge of a strip between labels that differ, none of them 0: row by
-/// row, for each pixel first the edge to the right, then the one below.
-/// @param below  the labels of the line below the strip; null at the end of the raster.
-template <typename Visit>
-void ForEachStripEdge(const std::vector<std::int32_t>& labels, std::uint32_t width,
-                      const std::int32_t* below, const Visit& visit) {
-  const auto visitTo = [&](std::int32_t a, std::int32_t b) {
-    if (a != b && a != 0 && b != 0) {
-      visit(static_cast<std::uint32_t>(a), static_cast<std::uint32_t>(b));
-    }
-  };
-  for (std::size_t at = 0; at < labels.size(); at += width) {
-    const std::int32_t* const line = labels.data() + at;
-    const std::int32_t* const next = at + width < labels.size() ? line + width : below;
-    for (std::uint32_t x = 0; x < width; ++x) {
-      if (x + 1 < width) visitTo(line[x], line[x + 1]);
-      if (next != nullptr) visitTo(line[x], next[x]);
-    }
-  }
-}
 
 /// The pairs of neighbours of a merge that takes all of them at once.
 struct PairList {
@@ -89,13 +70,22 @@ inline void AddTo(LambdaSchedule& schedule, std::uint32_t label, const auto* val
                   const unsigned char* /*states*/, unsigned /*bands*/) {
   schedule.AddPixel(label, values, 1);
 }
-inline void AddTo(LocalMerge& merge, std::uint32_t label, const auto* values,
-                  const unsigned char* /*states*/, unsigned /*bands*/) {
-  merge.AddPixel(label, values);
-}
 inline void AddTo(RigorousMerge& merge, std::uint32_t label, const auto* values,
                   const unsigned char* states, unsigned bands) {
   if (IsUsable(states, bands)) merge.AddPixel(label, values, 1);
+}
+
+/// Finds for each label below `count` the first one that is in its group. `groupOf` gives the
+/// groups, by numbers of at most `count`.
+template <typename GroupOf>
+std::vector<std::uint32_t> FindFirstOfGroups(std::size_t count, const GroupOf& groupOf) {
+  std::vector<std::uint32_t> first(count + 1, 0), found(count, 0);
+  for (std::uint32_t label = 1; label < count; ++label) {
+    std::uint32_t& of = first[groupOf(label)];
+    if (of == 0) of = label;
+    found[label] = of;
+  }
+  return found;
 }
 
 /// The pipeline of a pass, with as many strips in flight as there are threads and one more.
@@ -141,6 +131,7 @@ template <typename T>
 bool SeamlessSegmentation<T>::Run() {
   if (!BeginTree() || !FindBasins()) return false;
   if (IsAborted()) return true;
+  forest_.Begin(std::uint64_t{watershed_.Count()} + 1);
   const bool merges = request_.mergeValue > 0 || request_.leastPixels > 1;
   if (((merges && watershed_.Count() > 0) || tree_) && !Merge()) return false;
   if (IsAborted()) return true;
@@ -150,7 +141,10 @@ bool SeamlessSegmentation<T>::Run() {
 
 template <typename T>
 bool SeamlessSegmentation<T>::FindBasins() {
-  if (!watershed_.Begin({segment_->Samples(), segment_->Lines(), stripLines_})) return false;
+  const bool isRanked = request_.order != MergeOrder::kLocal;
+  if (!watershed_.Begin({segment_->Samples(), segment_->Lines(), stripLines_, isRanked})) {
+    return false;
+  }
   const RasterIteratorPtr<T> strips(
       new RasterIterator<T>(segment_, Strips(detail::GradientBorder(request_.algorithm, 1))));
   detail::StripProcess process("SeamlessBasins", NextPass());
@@ -173,13 +167,13 @@ bool SeamlessSegmentation<T>::FindBasins() {
 
 template <typename T>
 bool SeamlessSegmentation<T>::Merge() {
+  if (request_.order == MergeOrder::kLocal) return MergeLocally();
   const std::uint64_t needed = MemoryOfMerging(watershed_.Count(), merge_->Bands(), request_);
   if (needed > request_.memory) {
     SetFault(MemoryFault(watershed_.Count(), needed, request_.memory));
     return false;
   }
-  if (request_.isRigorous) return MergeRigorously();
-  return request_.order == MergeOrder::kLocal ? MergeLocally() : MergeBySchedule();
+  return request_.isRigorous ? MergeRigorously() : MergeBySchedule();
 }
 
 /// Adds all pixels to a graph, in raster order, and finds the neighbours.
@@ -192,21 +186,22 @@ bool SeamlessSegmentation<T>::Gather(Graph& graph, Pairs& pairs) {
   const auto tiles = process.Read(strips);
   const auto graphs = process.template TakeSlot<ValueSlot<detail::StripGraph>>();
   ScratchPool<LabelPairs> scratch;
-  process.Add(
-      "Neighbours", StageOrder::kSeveralAtOnce, [&](ArgList& token, const AbortFlag* abort) {
-        const unsigned strip = tiles.In(token)->Index().second;
-        const std::uint32_t width = watershed_.Width();
-        detail::StripGraph made;
-        made.labels.resize(std::size_t{width} * watershed_.LinesOf(strip));
-        if (!watershed_.Label(strip, made.labels.data())) return false;
-        if (abort != nullptr && abort->IsSet()) return false;
-        const auto found = scratch.Borrow();
-        found->Begin(watershed_.Count() / watershed_.Strips() + 1);
-        detail::ForEachStripEdge(made.labels, width, watershed_.LabelsBelow(strip),
+  process.Add("Neighbours", StageOrder::kSeveralAtOnce,
+              [&](ArgList& token, const AbortFlag* abort) {
+                const unsigned strip = tiles.In(token)->Index().second;
+                const std::uint32_t width = watershed_.Width();
+                detail::StripGraph made;
+                made.labels.resize(std::size_t{width} * watershed_.LinesOf(strip));
+                if (!watershed_.Label(strip, made.labels.data())) return false;
+                if (abort != nullptr && abort->IsSet()) return false;
+                const auto found = scratch.Borrow();
+                found->Begin(watershed_.Count() / watershed_.Strips() + 1);
+                ForEachStripEdge(made.labels.data(), made.labels.size(), width,
+                                 watershed_.LabelsBelow(strip),
                                  [&](std::uint32_t a, std::uint32_t b) { found->AddEdge(a, b); });
-        made.pairs = found->Pairs();
-        return graphs.Put(token, std::move(made));
-      });
+                made.pairs = found->Pairs();
+                return graphs.Put(token, std::move(made));
+              });
   process.Add("Sums", StageOrder::kOneByOne, [&](ArgList& token, const AbortFlag*) {
     const TilePtr<T> tile = tiles.In(token);
     const detail::StripGraph* const made = graphs.In(token);
@@ -358,13 +353,8 @@ bool SeamlessSegmentation<T>::CutOwnTree() {
   }
   TreeCut cut;
   if (!CutTree(*tree, mergeValue, cut)) return false;
-  std::vector<std::uint32_t> first(std::size_t{cut.count} + 1, 0);  // basin of each segment
-  roots_.assign(order_.size(), 0);
-  for (std::uint32_t label = 1; label < order_.size(); ++label) {
-    std::uint32_t& root = first[cut.numbers[order_[label]]];
-    if (root == 0) root = label;
-    roots_[label] = root;
-  }
+  roots_ = detail::FindFirstOfGroups(order_.size(),
+                                     [&](std::size_t label) { return cut.numbers[order_[label]]; });
   order_ = {};
   return true;
 }
@@ -377,21 +367,45 @@ bool SeamlessSegmentation<T>::MergeRigorously() {
   detail::PairList list;
   list.pairs.reserve(std::size_t{3} * count);
   if (!Gather(merge, list)) return false;
-  if (!IsAborted()) roots_ = merge.Join(list.pairs, request_.mergeValue);
+  if (IsAborted()) return true;
+  const std::vector<std::uint32_t> groups = merge.Join(list.pairs, request_.mergeValue);
+  roots_ =
+      detail::FindFirstOfGroups(groups.size(), [&](std::size_t label) { return groups[label]; });
   return true;
 }
 
 template <typename T>
 bool SeamlessSegmentation<T>::MergeLocally() {
-  const std::uint32_t count = watershed_.Count();
-  watershed_.TakeRanks();
   LocalMerge merge;
-  merge.Begin(count + 1, merge_->Bands());
-  merge.Limit(request_.growth);
-  merge.ReservePairs(std::size_t{3} * count);
-  if (!Gather(merge, merge)) return false;
-  if (!IsAborted()) roots_ = merge.Join(request_.mergeValue, request_.rounds, ipc_.abort.Get());
-  return true;
+  merge.Begin(merge_->Bands(),
+              {request_.mergeValue, request_.rounds, request_.growth, request_.memory}, forest_);
+  const RasterIteratorPtr<T> strips(new RasterIterator<T>(merge_, Strips(0)));
+  detail::StripProcess process("SeamlessRounds", NextPass());
+  const auto tiles = process.Read(strips);
+  const auto found = process.template TakeSlot<ValueSlot<StripBasins>>();
+  ScratchPool<LabelPairs> pairs;
+  process.Add("Basins", StageOrder::kSeveralAtOnce, [&](ArgList& token, const AbortFlag*) {
+    const TilePtr<T> tile = tiles.In(token);
+    if (!tile || !tile->IsValid()) return false;
+    const unsigned strip = tile->Index().second;
+    std::vector<std::int32_t> labels(std::size_t{watershed_.Width()} * watershed_.LinesOf(strip));
+    if (!watershed_.Label(strip, labels.data())) return false;
+    const SeamlessWatershed::Labels own = watershed_.LabelsOf(strip);
+    StripBasins basins;
+    basins.Find({labels.data(), labels.size(), watershed_.Width(), watershed_.LabelsBelow(strip),
+                 strip > 0},
+                {own.first, own.count}, *pairs.Borrow());
+    basins.AddUp(labels.data(), labels.size(), tile->PixelArray().GetData(), tile->Bands());
+    return found.Put(token, std::move(basins));
+  });
+  process.Add("Rounds", StageOrder::kOneByOne, [&](ArgList& token, const AbortFlag* abort) {
+    const StripBasins* const basins = found.In(token);
+    return basins != nullptr &&
+           merge.AddStrip(*basins, tiles.In(token)->PixelArray().GetData(), abort);
+  });
+  process.Close();
+  if (!process.RunProcess(process.kHere)) return false;
+  return IsAborted() || merge.Finish(ipc_.abort.Get());
 }
 
 template <typename T>
@@ -401,17 +415,19 @@ bool SeamlessSegmentation<T>::Write() {
   const auto tiles = process.template TakeSlot<TileSlot<std::int32_t>>();
   process.SetStrips(watershed_.Strips());
   process.template AddTask<StripNumberTask>(ArgIDs({numbers.id}), MakeSetup(watershed_.Strips()));
-  SegmentNumbers segments(watershed_, std::move(roots_), request_.bordersOnly);
+  for (std::uint32_t label = 1; label < roots_.size(); ++label) {
+    if (roots_[label] != label) forest_.Join(label, roots_[label]);
+  }
+  roots_ = {};
+  SegmentNumbers segments(watershed_, forest_, request_.bordersOnly);
   TilePool<std::int32_t> pool;
   process.Add("Labels", StageOrder::kSeveralAtOnce, [&](ArgList& token, const AbortFlag*) {
     const TilePtr<std::int32_t> tile = pool.Take();
-    return segments.FindSegments(*FindScalarValue<unsigned>(token.Get(numbers.id)), *tile) &&
+    return segments.FindBasins(*FindScalarValue<unsigned>(token.Get(numbers.id)), *tile) &&
            tiles.Put(token, tile);
   });
-  process.Add("Numbers", StageOrder::kOneByOne, [&](ArgList& token, const AbortFlag*) {
-    segments.Number(*tiles.In(token));
-    return true;
-  });
+  process.Add("Numbers", StageOrder::kOneByOne,
+              [&](ArgList& token, const AbortFlag*) { return segments.Number(*tiles.In(token)); });
   process.Write(
       tiles, RasterIteratorPtr<std::int32_t>(new RasterIterator<std::int32_t>(labels_, Strips(0))));
   process.Close();

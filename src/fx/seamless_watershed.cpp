@@ -4,8 +4,8 @@
 #include <limits>
 #include <numeric>
 
-#include "data/access_policy.h"
 #include "foundation/fault.h"
+#include "fx/work_file.h"
 #include "tasks/parallel.h"
 
 namespace lumo {
@@ -13,9 +13,10 @@ namespace {
 
 using Cell = StripDrains::Cell;
 
-bool FailBy(const std::string& fault) {
-  SetFault(String("working file: ") + fault);
-  return false;
+/// Gives the memory of some containers back.
+template <typename... Containers>
+void Release(Containers&... containers) {
+  ((containers = {}), ...);
 }
 
 }  // namespace
@@ -28,11 +29,9 @@ bool SeamlessWatershed::Begin(const Cut& cut) {
     SetFault("a strip of lines has too many pixels, or none");
     return false;
   }
-  std::string fault;
-  // Where the process keeps to some folders, no other one can be written to.
-  const std::vector<std::string> roots = GetAccessPolicy().roots;
-  file_ = platform::RandomAccessFile::CreateUnnamed(roots.empty() ? "" : roots.front(), &fault);
-  if (!file_) return FailBy(fault);
+  file_ = MakeWorkFile();
+  if (!file_) return false;
+  parts_.clear();
   strips_.clear();
   strips_.resize((std::uint64_t{cut.height} + cut.stripLines - 1) / cut.stripLines);
   return true;
@@ -50,13 +49,13 @@ bool SeamlessWatershed::ReadCells(unsigned strip, StripDrains& drains) const {
   const std::uint64_t place = std::uint64_t{strip} * cut_.stripLines * cut_.width;
   const bool isRead = file_->Read(place, cells.data(), cells.size(), &fault);
   drains.Begin(std::move(cells), cut_.width);
-  return isRead || FailBy(fault);
+  return isRead || FailByWorkFile(fault);
 }
 
 bool SeamlessWatershed::WriteCells(unsigned strip, const std::vector<Cell>& cells) {
   std::string fault;
   const std::uint64_t place = std::uint64_t{strip} * cut_.stripLines * cut_.width;
-  return file_->Write(place, cells.data(), cells.size(), &fault) || FailBy(fault);
+  return file_->Write(place, cells.data(), cells.size(), &fault) || FailByWorkFile(fault);
 }
 
 bool SeamlessWatershed::AddStrip(unsigned strip, const StripLevels& from) {
@@ -87,6 +86,7 @@ bool SeamlessWatershed::AddStrip(unsigned strip, const StripLevels& from) {
   made.first.resize(width);
   made.last.resize(width);
   drains->DrainPlateaus({}, made.first.data(), made.last.data());
+  if (!cut_.isRanked) return true;
   const std::int32_t* const levels = from.levels + (hasAbove ? width : 0);
   drains->ForEachMinimum([&](std::uint32_t first) {
     made.minima.push_back({first, levels[first]});
@@ -165,83 +165,153 @@ bool SeamlessWatershed::FindWays(unsigned strip) {
   drains->DrainPlateaus(BeyondOf(strip), first.data(), last.data());
   if (!WriteCells(strip, drains->Cells())) return false;
   // Those found in the strip alone, less those which drain into another one.
-  std::size_t candidate = 0, kept = 0;
+  std::size_t candidate = 0;
+  std::uint32_t kept = 0;
   const auto width = static_cast<std::int32_t>(cut_.width);
   std::vector<std::int32_t> labels(drains->Cells().size());
   drains->Label(
       labels.data(),
       [&](std::uint32_t pixel) {
-        while (own.minima[candidate].first != pixel) ++candidate;
-        own.minima[kept++] = own.minima[candidate];
-        return static_cast<std::int32_t>(kept);
+        if (cut_.isRanked) {
+          while (own.minima[candidate].first != pixel) ++candidate;
+          own.minima[kept] = own.minima[candidate];
+        }
+        return static_cast<std::int32_t>(++kept);
       },
       [](std::uint32_t x) { return -1 - static_cast<std::int32_t>(x); },
       [width](std::uint32_t x) { return -1 - width - static_cast<std::int32_t>(x); });
-  own.minima.resize(kept);
+  own.minimumCount = kept;
+  if (cut_.isRanked) own.minima.resize(kept);
   own.firstLabels.assign(labels.begin(), labels.begin() + width);
   own.lastLabels.assign(labels.end() - width, labels.end());
   return true;
 }
 
-/// Joins the parts of minima where strips meet, and numbers minima in raster order.
-bool SeamlessWatershed::JoinMinima() {
+/// Finds the ways of all strips, and the minima that go on in the strip below. Some strips at a
+/// time: with their numbers the distances can go.
+bool SeamlessWatershed::FindAllWays(const AbortFlag* abort, std::vector<Join>& joins) {
+  constexpr std::size_t kAtOnce = 16;
   std::uint64_t total = 0;
-  for (Strip& strip : strips_) {
-    strip.base = static_cast<std::uint32_t>(total);
-    total += strip.minima.size();
-    if (total > static_cast<std::uint64_t>(std::numeric_limits<std::int32_t>::max())) {
-      SetFault("the raster has more minima than labels have numbers");
-      return false;
+  for (std::size_t begin = 0; begin < strips_.size(); begin += kAtOnce) {
+    if (abort != nullptr && abort->IsSet()) return true;
+    std::vector<unsigned> now(std::min(kAtOnce, strips_.size() - begin));
+    std::iota(now.begin(), now.end(), static_cast<unsigned>(begin));
+    if (!ForEachStrip(now, abort, [this](unsigned strip) { return FindWays(strip); })) return false;
+    if (abort != nullptr && abort->IsSet()) return true;
+    for (const unsigned strip : now) {
+      strips_[strip].firstNumber = static_cast<std::uint32_t>(total);
+      total += strips_[strip].minimumCount;
+      if (total > static_cast<std::uint64_t>(std::numeric_limits<std::int32_t>::max())) {
+        SetFault("the raster has more minima than labels have numbers");
+        return false;
+      }
+      if (strip == 0) continue;
+      ListJoins(strip, joins);
+      Release(strips_[strip - 1].first, strips_[strip - 1].last, strips_[strip - 1].same);
     }
   }
-  std::vector<std::uint32_t>& parents = labels_;
-  parents.resize(total);
-  std::iota(parents.begin(), parents.end(), 0U);
-  const auto rootOf = [&](std::uint32_t at) {
-    while (parents[at] != at) at = parents[at] = parents[parents[at]];
-    return at;
-  };
-  for (std::size_t below = 1; below < strips_.size(); ++below) {
-    const Strip& upper = strips_[below - 1];
-    const Strip& lower = strips_[below];
-    for (std::uint32_t x = 0; x < cut_.width; ++x) {
-      // On one level, or one of them would have a way down.
-      if (upper.last[x] != StripDrains::kFar || lower.first[x] != StripDrains::kFar) continue;
-      if (upper.lastLabels[x] <= 0 || lower.firstLabels[x] <= 0) continue;  // excluded
-      const std::uint32_t a =
-          rootOf(upper.base + static_cast<std::uint32_t>(upper.lastLabels[x]) - 1);
-      const std::uint32_t b =
-          rootOf(lower.base + static_cast<std::uint32_t>(lower.firstLabels[x]) - 1);
-      parents[std::max(a, b)] = std::min(a, b);
-    }
-  }
-  std::vector<std::int32_t> levels;
-  std::uint32_t number = 0;
-  for (Strip& strip : strips_) {
-    for (const Minimum& minimum : strip.minima) {
-      const std::uint32_t parent = parents[number];  // comes first, and has its label by now
-      if (parent == number) levels.push_back(minimum.level);
-      labels_[number] =
-          parent == number ? static_cast<std::uint32_t>(levels.size()) : labels_[parent];
-      ++number;
-    }
-    strip.minima = {};
-    strip.first = strip.last = {};
-    strip.same = {};
-  }
-  NumberMinima(std::move(levels));
   return true;
 }
 
-/// Ranks the minima by their levels.
-void SeamlessWatershed::NumberMinima(std::vector<std::int32_t>&& levels) {
-  count_ = static_cast<std::uint32_t>(levels.size());
-  constexpr std::int64_t kLeast = std::numeric_limits<std::int32_t>::min();
-  std::vector<std::uint64_t> keys(levels.size());
-  for (std::uint32_t i = 0; i < count_; ++i) {
-    keys[i] = static_cast<std::uint64_t>(std::int64_t{levels[i]} - kLeast) << 32U | (i + 1);
+/// Lists the minima that go on from the strip above.
+void SeamlessWatershed::ListJoins(unsigned strip, std::vector<Join>& joins) const {
+  const Strip& upper = strips_[strip - 1];
+  const Strip& lower = strips_[strip];
+  for (std::uint32_t x = 0; x < cut_.width; ++x) {
+    // On one level, or one of them would have a way down.
+    if (upper.last[x] != StripDrains::kFar || lower.first[x] != StripDrains::kFar) continue;
+    if (upper.lastLabels[x] <= 0 || lower.firstLabels[x] <= 0) continue;  // excluded
+    const Join join{upper.firstNumber + static_cast<std::uint32_t>(upper.lastLabels[x]) - 1,
+                    lower.firstNumber + static_cast<std::uint32_t>(lower.firstLabels[x]) - 1};
+    if (joins.empty() || joins.back() != join) joins.push_back(join);
   }
-  levels = {};
+}
+
+/// Finds which parts of minima are one.
+void SeamlessWatershed::FindParts(const std::vector<Join>& joins) {
+  parts_.reserve(2 * joins.size());
+  for (const auto& [a, b] : joins) {
+    parts_.push_back({a, a});
+    parts_.push_back({b, b});
+  }
+  std::sort(parts_.begin(), parts_.end(),
+            [](const Part& a, const Part& b) { return a.number < b.number; });
+  const auto isSame = [](const Part& a, const Part& b) { return a.number == b.number; };
+  parts_.erase(std::unique(parts_.begin(), parts_.end(), isSame), parts_.end());
+  const auto partOf = [this](std::uint32_t number) -> Part& {
+    return *std::lower_bound(parts_.begin(), parts_.end(), number,
+                             [](const Part& part, std::uint32_t at) { return part.number < at; });
+  };
+  const auto rootOf = [&](std::uint32_t number) {
+    for (Part* part = &partOf(number); part->label != part->number; part = &partOf(part->label)) {
+      number = part->label = partOf(part->label).label;
+    }
+    return number;
+  };
+  for (const auto& [a, b] : joins) {
+    const std::uint32_t one = rootOf(a), other = rootOf(b);
+    partOf(std::max(one, other)).label = std::min(one, other);
+  }
+  for (Part& part : parts_) part.label = rootOf(part.number);
+  std::erase_if(parts_, [](const Part& part) { return part.label == part.number; });
+  parts_.shrink_to_fit();
+}
+
+/// Numbers minima in raster order, those that strips cut where they begin.
+void SeamlessWatershed::NumberMinima() {
+  std::size_t part = 0;
+  for (Strip& strip : strips_) {
+    strip.firstPart = part;
+    strip.firstLabel = strip.firstNumber - static_cast<std::uint32_t>(part);
+    while (part < parts_.size() && parts_[part].number < strip.firstNumber + strip.minimumCount) {
+      ++part;
+    }
+  }
+  count_ = strips_.back().firstNumber + strips_.back().minimumCount -
+           static_cast<std::uint32_t>(parts_.size());
+  // A whole is no part, so that the number of parts in front of it is known.
+  const auto isBefore = [](const Part& at, std::uint32_t number) { return at.number < number; };
+  for (Part& at : parts_) {
+    const auto before = std::lower_bound(parts_.begin(), parts_.end(), at.label, isBefore);
+    at.label = at.label + 1 - static_cast<std::uint32_t>(before - parts_.begin());
+  }
+}
+
+/// Gives the label of a minimum of a strip, counted there from 0.
+std::uint32_t SeamlessWatershed::LabelOf(unsigned strip, std::uint32_t minimum) const {
+  const Strip& own = strips_[strip];
+  const std::uint32_t number = own.firstNumber + minimum;
+  const auto part = std::lower_bound(
+      parts_.begin() + static_cast<std::ptrdiff_t>(own.firstPart), parts_.end(), number,
+      [](const Part& at, std::uint32_t wanted) { return at.number < wanted; });
+  if (part != parts_.end() && part->number == number) return part->label;
+  return number + 1 - static_cast<std::uint32_t>(part - parts_.begin());
+}
+
+SeamlessWatershed::Labels SeamlessWatershed::LabelsOf(unsigned strip) const {
+  const std::uint32_t first = strips_[strip].firstLabel;
+  const std::uint32_t end = strip + 1 < strips_.size() ? strips_[strip + 1].firstLabel : count_;
+  return {first, end - first};
+}
+
+/// Ranks the minima by their levels.
+void SeamlessWatershed::RankMinima() {
+  constexpr std::int64_t kLeast = std::numeric_limits<std::int32_t>::min();
+  std::vector<std::uint64_t> keys;
+  keys.reserve(count_);
+  auto part = parts_.cbegin();
+  std::uint32_t number = 0;
+  for (Strip& strip : strips_) {
+    for (const Minimum& minimum : strip.minima) {
+      if (part != parts_.cend() && part->number == number++) {
+        ++part;
+        continue;
+      }
+      const auto level = static_cast<std::uint64_t>(std::int64_t{minimum.level} - kLeast);
+      keys.push_back(level << 32U | (keys.size() + 1));
+    }
+    Release(strip.minima);
+  }
   std::sort(keys.begin(), keys.end());
   ranks_.assign(std::size_t{count_} + 1, 0);
   for (std::uint32_t i = 0; i < count_; ++i) ranks_[keys[i] & 0xFFFFFFFFU] = i + 1;
@@ -256,13 +326,12 @@ std::int32_t& SeamlessWatershed::SeamLabel(unsigned strip, std::int32_t beyond) 
 
 /// Gives all pixels where strips meet the labels of the minima that they drain to.
 void SeamlessWatershed::FollowSeams() {
-  for (Strip& strip : strips_) {
-    for (std::vector<std::int32_t>* const line : {&strip.firstLabels, &strip.lastLabels}) {
+  for (unsigned strip = 0; strip < strips_.size(); ++strip) {
+    for (std::vector<std::int32_t>* const line :
+         {&strips_[strip].firstLabels, &strips_[strip].lastLabels}) {
       for (std::int32_t& label : *line) {
-        if (label > 0) {
-          label = static_cast<std::int32_t>(
-              labels_[strip.base + static_cast<std::uint32_t>(label) - 1]);
-        }
+        if (label <= 0) continue;
+        label = static_cast<std::int32_t>(LabelOf(strip, static_cast<std::uint32_t>(label) - 1));
       }
     }
   }
@@ -296,11 +365,12 @@ bool SeamlessWatershed::Connect(const AbortFlag* abort) {
   const auto isAborted = [abort] { return abort != nullptr && abort->IsSet(); };
   if (!Settle(abort)) return false;
   if (isAborted()) return true;
-  std::vector<unsigned> all(strips_.size());
-  std::iota(all.begin(), all.end(), 0U);
-  if (!ForEachStrip(all, abort, [this](unsigned strip) { return FindWays(strip); })) return false;
+  std::vector<Join> joins;
+  if (!FindAllWays(abort, joins)) return false;
   if (isAborted()) return true;
-  if (!JoinMinima()) return false;
+  FindParts(joins);
+  NumberMinima();
+  if (cut_.isRanked) RankMinima();
   FollowSeams();
   return true;
 }
@@ -318,11 +388,17 @@ std::vector<bool> SeamlessWatershed::MarkSeamBasins() const {
 bool SeamlessWatershed::Label(unsigned strip, std::int32_t* labels) const {
   const auto drains = drains_.Borrow();
   if (!ReadCells(strip, *drains)) return false;
-  std::uint32_t next = strips_[strip].base;
+  const Strip& own = strips_[strip];
+  std::uint32_t number = own.firstNumber, label = own.firstLabel;
+  auto part = parts_.cbegin() + static_cast<std::ptrdiff_t>(own.firstPart);
   const std::int32_t* const above = LabelsAbove(strip);
   const std::int32_t* const below = LabelsBelow(strip);
   drains->Label(
-      labels, [&](std::uint32_t) { return static_cast<std::int32_t>(labels_[next++]); },
+      labels,
+      [&](std::uint32_t) {
+        const bool isPart = part != parts_.cend() && part->number == number++;
+        return static_cast<std::int32_t>(isPart ? (part++)->label : ++label);
+      },
       [above](std::uint32_t x) { return above[x]; }, [below](std::uint32_t x) { return below[x]; });
   return true;
 }

@@ -2,6 +2,7 @@
 
 #include <memory>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include "foundation/run_controls.h"
@@ -22,8 +23,9 @@ namespace lumo {
 /// own.
 ///
 /// Cost: a byte a pixel in a file without a name, read and written twice and read once for each
-/// labelling; in memory 20 bytes a minimum, 25 a pixel of the lines at which strips meet, and a few
-/// bytes a pixel of the strips that are worked on.
+/// labelling; in memory 9 bytes for a pixel of each strip's width, 24 a minimum that strips
+/// meet in, a few bytes a pixel of the strips that are worked on, and where minima are ranked 20 bytes
+/// for each of them.
 /// Threads: AddStrip and Label may be called for several strips at once; Connect works on all
 ///          threads. Failure: false, with the fault set.
 ///
@@ -40,6 +42,7 @@ class VEXG_EXPORT SeamlessWatershed {
     std::uint32_t width = 0;
     std::uint32_t height = 0;
     std::uint32_t stripLines = 0;
+    bool isRanked = true;  ///< there shall be TakeRanks
   };
 
   /// The levels of a strip, with one line above and one below it where the image has them.
@@ -65,6 +68,12 @@ class VEXG_EXPORT SeamlessWatershed {
 
   /// How many minima there are. Labels go from 1 to this, in the order of their first pixels.
   std::uint32_t Count() const { return count_; }
+  /// Labels are those above `first`, `count` of them, of the minima whose first pixel a strip has.
+  struct Labels {
+    std::uint32_t first = 0;
+    std::uint32_t count = 0;
+  };
+  Labels LabelsOf(unsigned strip) const;
   /// For each label its number in the order of levels, and of first pixels where these are equal,
   /// which is the label that Watershed gives. Empties the list.
   std::vector<std::uint32_t> TakeRanks() { return std::move(ranks_); }
@@ -94,17 +103,32 @@ class VEXG_EXPORT SeamlessWatershed {
     std::vector<std::uint32_t> first, last;  // distances of the pixels of these lines
     std::vector<StripDrains::Cell> same;     // of the first line: who is on the level above
     std::vector<std::int32_t> firstLabels, lastLabels;  // below 0: see Beyond
-    std::vector<Minimum> minima;
-    std::uint32_t base = 0;  // number of the first of them
+    std::vector<Minimum> minima;                        // where they are ranked
+    std::uint32_t minimumCount = 0;
+    std::uint32_t firstNumber = 0;  // of its minima, among those of all strips
+    std::size_t firstPart = 0;      // of its parts, among those of all
+    std::uint32_t firstLabel = 0;   // less 1: that of its first minimum
   };
+
+  /// A minimum of a strip that is part of one that began before.
+  struct Part {
+    std::uint32_t number;  // among the minima of all strips
+    std::uint32_t label;   // in front of NumberMinima the number of the whole
+  };
+
+  using Join = std::pair<std::uint32_t, std::uint32_t>;  // numbers of parts of one minimum
 
   StripDrains::Beyond BeyondOf(unsigned strip) const;
   bool ComesNearer(unsigned strip) const;
   bool Settle(const AbortFlag* abort);
   bool Drain(unsigned strip, StripDrains& drains);
   bool FindWays(unsigned strip);
-  bool JoinMinima();
-  void NumberMinima(std::vector<std::int32_t>&& levels);
+  bool FindAllWays(const AbortFlag* abort, std::vector<Join>& joins);
+  void ListJoins(unsigned strip, std::vector<Join>& joins) const;
+  void FindParts(const std::vector<Join>& joins);
+  void NumberMinima();
+  void RankMinima();
+  std::uint32_t LabelOf(unsigned strip, std::uint32_t minimum) const;
   void FollowSeams();
   std::int32_t& SeamLabel(unsigned strip, std::int32_t beyond);
   bool ReadCells(unsigned strip, StripDrains& drains) const;
@@ -115,8 +139,8 @@ class VEXG_EXPORT SeamlessWatershed {
   Cut cut_;
   std::unique_ptr<platform::RandomAccessFile> file_;
   std::vector<Strip> strips_;
-  std::vector<std::uint32_t> labels_;  // of the minima of all strips, by number
-  std::vector<std::uint32_t> ranks_;   // by label
+  std::vector<Part> parts_;           // by number
+  std::vector<std::uint32_t> ranks_;  // by label
   std::uint32_t count_ = 0;
   mutable ScratchPool<StripDrains> drains_;
 };

@@ -15,14 +15,25 @@ bool StripNumberTask::Execute(ArgList& args) {
   return !HasError() && next_ < count_ && args.Set(0, MakeSetup(next_++));
 }
 
-SegmentNumbers::SegmentNumbers(const SeamlessWatershed& basins, std::vector<std::uint32_t>&& roots,
-                               bool bordersOnly)
-    : basins_(basins), roots_(std::move(roots)), bordersOnly_(bordersOnly) {
-  if (!roots_.empty()) roots_[0] = 0;  // excluded pixels
-  if (!bordersOnly_) numbers_.assign(std::size_t{basins.Count()} + 1, 0);
+namespace {
+
+/// Replaces labels, none of which is 0, by what `find` gives for them.
+template <typename Find>
+void ReplaceLabels(std::int32_t* labels, std::size_t count, const Find& find) {
+  std::int32_t last = 0, found = 0;
+  for (std::size_t i = 0; i < count; ++i) {
+    if (labels[i] == 0) continue;
+    if (labels[i] != last) {
+      last = labels[i];
+      found = static_cast<std::int32_t>(find(static_cast<std::uint32_t>(last)));
+    }
+    labels[i] = found;
+  }
 }
 
-bool SegmentNumbers::FindSegments(unsigned strip, Tile<std::int32_t>& tile) const {
+}  // namespace
+
+bool SegmentNumbers::FindBasins(unsigned strip, Tile<std::int32_t>& tile) const {
   TileDimensions size;
   size.width = basins_.Width();
   size.height = basins_.LinesOf(strip);
@@ -31,13 +42,16 @@ bool SegmentNumbers::FindSegments(unsigned strip, Tile<std::int32_t>& tile) cons
   tile.SetIndex({0, strip});
   std::fill(tile.StateArray().begin(), tile.StateArray().end(),
             static_cast<unsigned char>(PixelValueState::Valid));
-  if (!basins_.Label(strip, tile.PixelArray().GetData())) return false;
-  for (std::int32_t& label : tile.PixelArray()) label = RootOf(label);
-  if (bordersOnly_) MarkBorders(strip, tile);
-  return true;
+  return basins_.Label(strip, tile.PixelArray().GetData());
 }
 
-void SegmentNumbers::MarkBorders(unsigned strip, Tile<std::int32_t>& tile) const {
+void SegmentNumbers::FindRoots(std::int32_t* labels, std::size_t count) {
+  ReplaceLabels(labels, count, [this](std::uint32_t label) { return forest_.RootOf(label); });
+}
+
+void SegmentNumbers::MarkBorders(Tile<std::int32_t>& tile) {
+  const unsigned strip = tile.Index().second;
+  FindRoots(tile.PixelArray().GetData(), tile.PixelArray().GetCount());
   const std::size_t width = tile.Width(), lines = tile.Height();
   const bool isLast = strip + 1 == basins_.Strips();
   // The line that a line is compared with; a raster of one line compares it with itself.
@@ -46,7 +60,7 @@ void SegmentNumbers::MarkBorders(unsigned strip, Tile<std::int32_t>& tile) const
   };
   const auto rootsOf = [&](const std::int32_t* from) {
     std::vector<std::int32_t> line = lineOf(from);
-    for (std::int32_t& label : line) label = RootOf(label);
+    FindRoots(line.data(), line.size());
     return line;
   };
   std::int32_t* const pixels = tile.PixelArray().GetData();
@@ -74,14 +88,14 @@ void SegmentNumbers::MarkBorders(unsigned strip, Tile<std::int32_t>& tile) const
   }
 }
 
-void SegmentNumbers::Number(Tile<std::int32_t>& tile) {
-  if (bordersOnly_) return;
-  for (std::int32_t& label : tile.PixelArray()) {
-    if (label == 0) continue;
-    std::int32_t& number = numbers_[static_cast<std::size_t>(label)];
-    if (number == 0) number = ++count_;
-    label = number;
+bool SegmentNumbers::Number(Tile<std::int32_t>& tile) {
+  if (bordersOnly_) {
+    MarkBorders(tile);
+  } else {
+    ReplaceLabels(tile.PixelArray().GetData(), tile.PixelArray().GetCount(),
+                  [this](std::uint32_t label) { return forest_.NumberOf(label); });
   }
+  return forest_.IsWell();
 }
 
 }  // namespace lumo

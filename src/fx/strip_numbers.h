@@ -2,6 +2,7 @@
 
 #include <vector>
 
+#include "fx/label_forest.h"
 #include "fx/seamless_watershed.h"
 #include "raster/raster_tasks.h"
 
@@ -24,30 +25,26 @@ class VEXG_EXPORT StripNumberTask final : public SequentialTask {
 /// pixel is compared with those on its right and below, the last but one column and line with those
 /// in front (see RasterSegmentBorderTask).
 ///
-/// Threads: FindSegments may be called for several strips at once, Number for one after the other,
+/// Threads: FindBasins may be called for several strips at once, Number for one after the other,
 ///          from the first strip on.
 class VEXG_EXPORT SegmentNumbers {
  public:
-  /// @param roots  for each basin one that stands for its segment; empty when each is one.
-  SegmentNumbers(const SeamlessWatershed& basins, std::vector<std::uint32_t>&& roots,
-                 bool bordersOnly);
+  /// @param forest  what basins have become; outlives this.
+  SegmentNumbers(const SeamlessWatershed& basins, LabelForest& forest, bool bordersOnly)
+      : basins_(basins), forest_(forest), bordersOnly_(bordersOnly) {}
 
-  /// Makes a tile of a strip whose pixels are one basin for each segment, or of its borders.
-  bool FindSegments(unsigned strip, Tile<std::int32_t>& tile) const;
-  /// Gives the pixels of the next strip the numbers of their segments.
-  void Number(Tile<std::int32_t>& tile);
+  /// Makes a tile of a strip whose pixels are basins.
+  bool FindBasins(unsigned strip, Tile<std::int32_t>& tile) const;
+  /// Gives the pixels of the next strip the numbers of their segments, or marks borders of these.
+  /// False, with the fault set, when the forest is not well.
+  bool Number(Tile<std::int32_t>& tile);
 
  private:
-  void MarkBorders(unsigned strip, Tile<std::int32_t>& tile) const;
-  std::int32_t RootOf(std::int32_t basin) const {
-    return roots_.empty() ? basin
-                          : static_cast<std::int32_t>(roots_[static_cast<std::size_t>(basin)]);
-  }
+  void FindRoots(std::int32_t* labels, std::size_t count);
+  void MarkBorders(Tile<std::int32_t>& tile);
 
   const SeamlessWatershed& basins_;
-  std::vector<std::uint32_t> roots_;   // by basin
-  std::vector<std::int32_t> numbers_;  // by the basin that stands for a segment; 0 for none yet
-  std::int32_t count_ = 0;
+  LabelForest& forest_;
   bool bordersOnly_;
 };
 
