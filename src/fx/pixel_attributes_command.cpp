@@ -1,5 +1,6 @@
 #include <algorithm>
 
+#include "commands/division.h"
 #include "foundation/fault.h"
 #include "foundation/progress.h"
 #include "fx/attribute_inputs.h"
@@ -149,6 +150,9 @@ class FxComputePixelAttributesCommand final : public RegionCommand {
 };
 
 const CommandFactoryT<FxComputePixelAttributesCommand> factory(kPixelAttributes);
+const DivisionRegistration division({.command = "FxComputePixelAttributesCommand",
+                                     .makes = {"SpectralFXA", "TextureFXA", "MeansFXA",
+                                               "EntropyFXA"}});
 
 }  // namespace
 }  // namespace lumo

@@ -1,6 +1,7 @@
 #include <filesystem>
 #include <numeric>
 
+#include "commands/division.h"
 #include "foundation/fault.h"
 #include "raster/raster_command.h"
 #include "raster/raster_def.h"
@@ -192,6 +193,7 @@ class ZonalStatisticsCommand final : public RasterCommand {
 };
 
 const CommandFactoryT<ZonalStatisticsCommand> factory(kZonal);
+const DivisionRegistration division({.command = "ZonalStatisticsCommand", .makes = {"Table"}});
 
 }  // namespace
 }  // namespace lumo
