@@ -29,6 +29,7 @@ struct DivisionDeclaration {
   const char* target = "";           ///< input that names the raster to write, of kRows
   std::vector<const char*> makes{};  ///< inputs that name files which the command makes
   const char* makesWhen = "";        ///< input that has to be 1 for that; empty for none
+  const char* dividesWhen = "";      ///< input that has to be Exact for shares; empty for none
 };
 
 /// Registers a division: one static object beside the command.

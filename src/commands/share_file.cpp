@@ -85,6 +85,9 @@ bool ShareReader::GetBytes(void* data, std::size_t bytes) {
   if (bytes > bytes_.size() - at_) return false;
   std::copy_n(bytes_.data() + at_, bytes, static_cast<unsigned char*>(data));
   at_ += bytes;
+  if (!IsAtEnd()) return true;
+  bytes_ = {};  // not needed any more
+  at_ = 0;
   return true;
 }
 

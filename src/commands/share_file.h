@@ -64,6 +64,8 @@ class VEXG_EXPORT ShareReader {
   bool GetAll(T* numbers, std::size_t count) {
     return GetBytes(numbers, count * sizeof(T));
   }
+  /// Bytes that are left.
+  std::size_t Left() const { return bytes_.size() - at_; }
   /// True when nothing is left.
   bool IsAtEnd() const { return at_ == bytes_.size(); }
 
@@ -74,25 +76,7 @@ class VEXG_EXPORT ShareReader {
   std::size_t at_ = 0;
 };
 
-/// Opens one file of a list of all shares after the other and has `take` read it to its end.
-/// @return false, with the fault set, for a file that can't be read, or has too much or too little.
-template <typename Take>
-bool ForEachShare(const Array<String>& files, const std::string& key, const Take& take);
-
 /// Sets the fault for a file of a share that doesn't hold what it should.
 VEXG_EXPORT void SetShareFault(const std::string& path);
-
-template <typename Take>
-bool ForEachShare(const Array<String>& files, const std::string& key, const Take& take) {
-  for (unsigned i = 0; i < files.GetCount(); ++i) {
-    const std::string path = files[i].ToUTF8();
-    ShareReader in;
-    if (!in.Open(path, key, {i, files.GetCount()})) return false;
-    if (take(in) && in.IsAtEnd()) continue;
-    SetShareFault(path);
-    return false;
-  }
-  return true;
-}
 
 }  // namespace lumo

@@ -15,8 +15,8 @@
 namespace lumo {
 namespace {
 
-/// One is read, and the next ones are read ahead.
-constexpr std::size_t kMostOpenFiles = 4;
+/// A block reaches from one into the next; each keeps a row of its tiles.
+constexpr std::size_t kMostOpenFiles = 2;
 
 /// Places a block of whole lines in a larger one of the same width and bands.
 /// @param line  of `to` that the first of `from` becomes.

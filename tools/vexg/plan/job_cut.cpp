@@ -147,6 +147,9 @@ class Cutter {
   /// Why a command can't be divided here; empty when it can. Sets the level and the target.
   std::string WhyNot(Cut& cut) {
     const JobCommand& command = At(cut.at);
+    const std::string when = cut.division->dividesWhen;
+    const std::string* const form = when.empty() ? nullptr : command.Find(when);
+    if (!when.empty() && (form == nullptr || *form != "Exact")) return when + " is not Exact";
     const std::string* const source = command.Find(cut.division->source);
     if (source == nullptr || !source->starts_with('$')) return "its source is open before the job";
     for (const std::size_t at : SliceOf(command, cut.at)) {
@@ -364,6 +367,7 @@ class Cutter {
     }
     AddCloses(opened, first.job);
     first.memory = MemoryFor({}, false);
+    first.threads = request_.threads;
     made.jobs.push_back(std::move(first));
   }
 
@@ -380,6 +384,7 @@ class Cutter {
     }
     if (firstEnd_ != 0) whole.dependsOn.push_back(0);
     whole.memory = MemoryFor({}, false);
+    whole.threads = request_.threads;
     if (notes_.empty()) notes_.push_back("no command of the job can be divided: it is one part");
     const bool isDone = std::all_of(
         whole.job.commands.begin(), whole.job.commands.end(), [](const JobCommand& command) {
@@ -436,6 +441,7 @@ class Cutter {
     }
     AddCloses(opened, made.job);
     made.memory = MemoryFor(ofLevel, false);
+    made.threads = request_.threads;
     return made;
   }
 
@@ -509,6 +515,7 @@ class Cutter {
     }
     for (const Cut& cut : cuts_) all.push_back(&cut);
     merge.memory = MemoryFor(all, true);
+    merge.threads = 2 * request_.threads;  // it runs alone
     for (std::size_t part = firstEnd_ != 0 ? 1 : 0; part < made.jobs.size(); ++part) {
       merge.dependsOn.push_back(part);
     }

@@ -22,6 +22,7 @@ struct CutJob {
   std::vector<std::size_t> dependsOn;  ///< jobs before it that have to be done
   JobCommands job;
   std::uint64_t memory = 0;  ///< bytes that a worker should have
+  unsigned threads = 1;
 };
 
 /// The jobs of which one was cut, in an order in which they may run.

@@ -140,8 +140,12 @@ class OnceRun {
                                     " isn't done, which comes first; nothing was run");
   }
 
-  /// What was done before counts as new for programs that go by the times of files.
+  /// What was done before counts as new for programs that go by the times of files. What a run that
+  /// was killed at its very end has left goes away.
   int SayDone() const {
+    for (const std::string& file : FindFiles(commands_.commands).made) {
+      const OutputFile cleaned(file, {.overwrite = true});
+    }
     std::error_code ignored;
     fs::last_write_time(resultPath_, fs::file_time_type::clock::now(), ignored);
     if (!request_.quiet) Say(request_.document + ": done already");

@@ -134,7 +134,7 @@ class Planner {
       planned.outputs = files[i].made;
       planned.outputs.insert(planned.outputs.end(), files[i].inPlace.begin(),
                              files[i].inPlace.end());
-      planned.threads = options_.threads;
+      planned.threads = job.threads;
       planned.memory = job.memory;
       const std::string text = job.job.Write() + "\n";
       planned.hash = HashOf(text, planned.inputs, before);
@@ -186,7 +186,7 @@ const VerbRegistration registration(
                "As many parts as leave each at most so many bytes of pixels")
           .Shows("BYTES")
           .Within(1, 1ULL << 62U);
-      line.Add("--threads", options->threads, "Threads of each worker")
+      line.Add("--threads", options->threads, "Threads of each worker; the merge has twice as many")
           .Within(1, 1024)
           .ShowsDefault();
       line.Add("--runner", options->runner, "Print what runs the plan").Takes(OneOf(RunnerNames()));
