@@ -1,3 +1,4 @@
+#include "commands/division.h"
 #include "foundation/fault.h"
 #include "fx/attribute_inputs.h"
 #include "fx/attribute_statistics.h"
@@ -80,6 +81,8 @@ class FxComputeAttributesHistogramCommand final : public RegionCommand {
 };
 
 const CommandFactoryT<FxComputeAttributesHistogramCommand> factory(kAttributesHistogram);
+const DivisionRegistration division({.command = "FxComputeAttributesHistogramCommand",
+                                     .makes = {"HistogramFXAH"}});
 
 }  // namespace
 }  // namespace lumo

@@ -1,3 +1,4 @@
+#include "commands/division.h"
 #include "foundation/fault.h"
 #include "fx/attribute_inputs.h"
 #include "fx/attribute_statistics.h"
@@ -49,6 +50,8 @@ class FxComputeAttributesStatsCommand final : public RegionCommand {
 };
 
 const CommandFactoryT<FxComputeAttributesStatsCommand> factory(kAttributesStats);
+const DivisionRegistration division({.command = "FxComputeAttributesStatsCommand",
+                                     .makes = {"StatsFXAS"}});
 
 }  // namespace
 }  // namespace lumo

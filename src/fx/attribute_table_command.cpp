@@ -3,6 +3,7 @@
 #include <cmath>
 #include <filesystem>
 
+#include "commands/division.h"
 #include "data/vector_records.h"
 #include "foundation/fault.h"
 #include "foundation/progress.h"
@@ -315,6 +316,7 @@ class CreateAttributeTableCommand final : public RegionCommand {
 };
 
 const CommandFactoryT<CreateAttributeTableCommand> factory(kAttributeTable);
+const DivisionRegistration division({.command = "CreateAttributeTableCommand", .makes = {"Table"}});
 
 }  // namespace
 }  // namespace lumo

@@ -1,5 +1,6 @@
 #include <numeric>
 
+#include "commands/division.h"
 #include "foundation/fault.h"
 #include "fx/class_scores.h"
 #include "fx/fuzzy_rules.h"
@@ -72,6 +73,8 @@ class FxComputeFuzzyClassificationCommand final : public ClassScoresCommand {
 };
 
 const CommandFactoryT<FxComputeFuzzyClassificationCommand> factory(kFuzzy);
+const DivisionRegistration division({.command = "FxComputeFuzzyClassificationCommand",
+                                     .makes = {"ClassFXC"}});
 
 }  // namespace
 }  // namespace lumo

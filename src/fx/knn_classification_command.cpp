@@ -2,6 +2,7 @@
 #include <limits>
 #include <numeric>
 
+#include "commands/division.h"
 #include "foundation/fault.h"
 #include "fx/class_scores.h"
 #include "fx/nearest_examples.h"
@@ -134,6 +135,8 @@ class FxComputeKNNClassificationCommand final : public ClassScoresCommand {
 };
 
 const CommandFactoryT<FxComputeKNNClassificationCommand> factory(kKnn);
+const DivisionRegistration division({.command = "FxComputeKNNClassificationCommand",
+                                     .makes = {"ClassFXC"}});
 
 }  // namespace
 }  // namespace lumo

@@ -1,6 +1,7 @@
 #include <algorithm>
 #include <numeric>
 
+#include "commands/division.h"
 #include "foundation/fault.h"
 #include "fx/class_scores.h"
 
@@ -101,6 +102,8 @@ class FxComputePCAClassificationCommand final : public ClassScoresCommand {
 };
 
 const CommandFactoryT<FxComputePCAClassificationCommand> factory(kPca);
+const DivisionRegistration division({.command = "FxComputePCAClassificationCommand",
+                                     .makes = {"ClassFXC"}});
 
 }  // namespace
 }  // namespace lumo

@@ -1,5 +1,8 @@
 #include <algorithm>
 
+#include <fmt/format.h>
+
+#include "commands/share_scope.h"
 #include "foundation/fault.h"
 #include "foundation/progress.h"
 #include "fx/attribute_inputs.h"
@@ -13,27 +16,32 @@ const CommandDeclaration kPixelAttributes{
     "FxComputePixelAttributesCommand",
     "Feature extraction",
     "Computes spectral and texture values of the regions of a label raster.",
-    {{"SrcURI", Presence::kRequired, ValueKind::kURI, "the image"},
-     {"LabelURI", Presence::kRequired, ValueKind::kURI,
-      "the labels, of type Int or UInt and of the image's size"},
-     {"SpectralFXA", Presence::kOptional, ValueKind::kText,
-      "the file to create of mean, deviation, minimum, maximum and count; required unless Values "
-      "leaves it out"},
-     {"TextureFXA", Presence::kOptional, ValueKind::kText,
-      "the file to create of the means of windows' range, mean, variance and entropy, and of the "
-      "count; required unless Values leaves it out"},
-     {"TextureKernelSize", Presence::kOptional, ValueKind::kInteger,
-      "side of the windows, from 0; half of it, rounded down, is their reach; required with "
-      "TextureFXA",
-      "pixels"},
-     SumsInput(),
-     {"Values", Presence::kOptional, ValueKind::kTextList,
-      "of spectral, texture and means: the files that are made; spectral and texture when absent"},
-     {"MeansFXA", Presence::kOptional, ValueKind::kText,
-      "the file to create of mean and count; with the value means"},
-     {"EntropyFXA", Presence::kOptional, ValueKind::kText,
-      "the file to create of the mean entropy of windows over the number of their values, and of "
-      "the count; none when absent, and only with exact sums and the value texture"}},
+    WithShareInputs(
+        {{"SrcURI", Presence::kRequired, ValueKind::kURI, "the image"},
+         {"LabelURI", Presence::kRequired, ValueKind::kURI,
+          "the labels, of type Int or UInt and of the image's size"},
+         {"SpectralFXA", Presence::kOptional, ValueKind::kText,
+          "the file to create of mean, deviation, minimum, maximum and count; required unless "
+          "Values "
+          "leaves it out"},
+         {"TextureFXA", Presence::kOptional, ValueKind::kText,
+          "the file to create of the means of windows' range, mean, variance and entropy, and of "
+          "the "
+          "count; required unless Values leaves it out"},
+         {"TextureKernelSize", Presence::kOptional, ValueKind::kInteger,
+          "side of the windows, from 0; half of it, rounded down, is their reach; required with "
+          "TextureFXA",
+          "pixels"},
+         SumsInput(),
+         {"Values", Presence::kOptional, ValueKind::kTextList,
+          "of spectral, texture and means: the files that are made; spectral and texture when "
+          "absent"},
+         {"MeansFXA", Presence::kOptional, ValueKind::kText,
+          "the file to create of mean and count; with the value means"},
+         {"EntropyFXA", Presence::kOptional, ValueKind::kText,
+          "the file to create of the mean entropy of windows over the number of their values, and "
+          "of "
+          "the count; none when absent, and only with exact sums and the value texture"}}),
     {}};
 
 class FxComputePixelAttributesCommand final : public RegionCommand {
@@ -43,21 +51,40 @@ class FxComputePixelAttributesCommand final : public RegionCommand {
     if (!image) return Fail();
     const BasicRasterPtr labels = FindLabels(image.Get());
     if (!labels || !ReadFiles() || !ReadKernel(*image)) return Fail();
+    if (HasInput(kShareInput) && SumsForm() != Form::kExact) {
+      return Fail("Share goes with exact sums");
+    }
+    ShareScope shares;
+    if (!shares.Begin({HasInput(kShareInput), Read<Array<unsigned>>(kShareInput),
+                       Read<String>(kShareFileInput), Read<Array<String>>(kShareFilesInput)},
+                      KeyOfShares(*image, *labels))) {
+      return Fail();
+    }
     const IPC first(GetIPC().abort,
                     ProgressReportPtr(new ScaledProgressReport(GetIPC().progress, 5)));
     LabelCensus census;
     if (!census.Run(labels, first)) return Fail();
     const IPC second(GetIPC().abort,
                      ProgressReportPtr(new ScaledProgressReport(GetIPC().progress, 5, 4)));
-    bool isDone = CreateFiles(image->Bands());
+    plan_.ofShare = {Wants("spectral"), Wants("texture"), Wants("means"),
+                     entropy_.GetLength() != 0};
+    bool isDone = shares.IsShare() || CreateFiles(image->Bands());
     isDone = isDone && DispatchType(EightTypes{}, image->DataType(), [&]<typename T>() {
                const RasterPtr<T> typed(image);
                return SumsForm() == Form::kExact
                           ? RegionPass<T>(typed, labels, census, plan_).Run(second)
                           : RunTold<T>(typed, labels, second);
              });
-    isDone = isDone && CloseFiles();
+    isDone = isDone && CloseFiles() && shares.End();
     return isDone ? Succeed() : FailWithout("the values could not be computed", SumsForm());
+  }
+
+  std::string KeyOfShares(const BasicRaster& image, const BasicRaster& labels) const {
+    std::string key = fmt::format("regions {} {} {} {} {} {} {}", image.DataType(), image.Bands(),
+                                  image.Samples(), image.Lines(), labels.DataType(), plan_.kernel,
+                                  entropy_.GetLength() != 0);
+    for (const std::string& value : values_) key += " " + value;
+    return key;
   }
 
   bool Wants(const char* value) const {
@@ -149,6 +176,12 @@ class FxComputePixelAttributesCommand final : public RegionCommand {
 };
 
 const CommandFactoryT<FxComputePixelAttributesCommand> factory(kPixelAttributes);
+const DivisionRegistration division({.command = "FxComputePixelAttributesCommand",
+                                     .kind = DivisionKind::kShares,
+                                     .source = "SrcURI",
+                                     .makes = {"SpectralFXA", "TextureFXA", "MeansFXA",
+                                               "EntropyFXA"},
+                                     .dividesWhen = "Sums"});
 
 }  // namespace
 }  // namespace lumo

@@ -1,3 +1,4 @@
+#include "commands/division.h"
 #include "foundation/fault.h"
 #include "foundation/progress.h"
 #include "fx/attribute_inputs.h"
@@ -88,6 +89,8 @@ class FxComputeRegionMeansRasterCommand final : public RegionCommand {
 };
 
 const CommandFactoryT<FxComputeRegionMeansRasterCommand> factory(kRegionMeans);
+const DivisionRegistration division({.command = "FxComputeRegionMeansRasterCommand",
+                                     .makes = {"MeansFXA"}});
 
 }  // namespace
 }  // namespace lumo

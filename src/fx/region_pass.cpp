@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <unordered_map>
 
+#include "commands/share_scope.h"
 #include "foundation/fault.h"
 #include "fx/record_spool.h"
 #include "fx/region_sums.h"
@@ -10,6 +11,7 @@
 #include "fx/strip_regions.h"
 #include "fx/texture_windows.h"
 #include "fx/usable_pixels.h"
+#include "raster/chosen_blocks.h"
 #include "raster/pixel_states.h"
 #include "raster/tile_functions.h"
 #include "tasks/scratch_pool.h"
@@ -17,16 +19,7 @@
 namespace lumo {
 namespace {
 
-/// Says which values a pass gives.
-struct Wanted {
-  bool spectral = false;
-  bool texture = false;
-  bool means = false;
-  bool entropy = false;
-
-  bool Sums() const { return spectral || means; }
-  bool Windows() const { return texture || entropy; }
-};
+using Wanted = RegionPassValues;
 
 /// Records of finished regions, as the files have them.
 struct FinishedRegions {
@@ -71,6 +64,65 @@ struct StripValues {
   std::vector<RegionTotal<T>> totals;  // labels by bands
   std::vector<TextureSums> textures;
 };
+
+/// Gives numbers to the file of a share, and takes them from there.
+template <typename N>
+void Save(const std::vector<N>& numbers, ShareWriter& out) {
+  out.Put(std::uint64_t{numbers.size()});
+  out.PutAll(numbers.data(), numbers.size());
+}
+template <typename N>
+bool Restore(std::vector<N>& numbers, ShareReader& in) {
+  std::uint64_t count = 0;
+  if (!in.Get(count) || count > in.Left() / sizeof(N)) return false;
+  numbers.resize(count);
+  return in.GetAll(numbers.data(), count);
+}
+
+template <typename T>
+void Save(StripValues<T>& strip, ShareWriter& out) {
+  out.Put(strip.strip);
+  for (const auto* const labels : {&strip.finished.labels, &strip.labels}) Save(*labels, out);
+  for (const auto* const values : {&strip.finished.spectral, &strip.finished.texture,
+                                   &strip.finished.means, &strip.finished.entropy}) {
+    Save(*values, out);
+  }
+  out.Put(std::uint64_t{strip.totals.size()});
+  for (RegionTotal<T>& total : strip.totals) {
+    total.ForEachNumber([&](const auto& number) { out.Put(number); });
+  }
+  out.Put(std::uint64_t{strip.textures.size()});
+  for (const TextureSums& sums : strip.textures) {
+    out.PutAll(sums.sums, TextureSums::kFigures);
+    out.Put(sums.count);
+  }
+}
+
+template <typename T>
+bool Restore(StripValues<T>& strip, ShareReader& in) {
+  bool isThere = in.Get(strip.strip);
+  for (auto* const labels : {&strip.finished.labels, &strip.labels}) {
+    isThere = isThere && Restore(*labels, in);
+  }
+  for (auto* const values : {&strip.finished.spectral, &strip.finished.texture,
+                             &strip.finished.means, &strip.finished.entropy}) {
+    isThere = isThere && Restore(*values, in);
+  }
+  std::uint64_t count = 0;
+  isThere = isThere && in.Get(count) && count <= in.Left();
+  if (!isThere) return false;
+  strip.totals.resize(count);
+  for (RegionTotal<T>& total : strip.totals) {
+    total.ForEachNumber([&](auto& number) { isThere = isThere && in.Get(number); });
+  }
+  isThere = isThere && in.Get(count) && count <= in.Left() / sizeof(TextureSums);
+  if (!isThere) return false;
+  strip.textures.resize(count);
+  for (TextureSums& sums : strip.textures) {
+    isThere = isThere && in.GetAll(sums.sums, TextureSums::kFigures) && in.Get(sums.count);
+  }
+  return isThere;
+}
 
 /// Marks the pixels of a line that take part. @return null when all of them do.
 const unsigned char* FindUsable(const unsigned char* states, std::size_t width, std::size_t bands,
@@ -301,6 +353,66 @@ std::vector<StripValues<T>> SumTile(const StripWork<T, L>& work, unsigned lines,
   return strips;
 }
 
+/// Reads an image and its labels in tiles of strips, and hands the sums of each tile to `take`.
+template <typename T, typename L, typename Take>
+bool SumTiles(const RasterPtr<T>& image, const RasterPtr<L>& labels, const LabelCensus& census,
+              const Wanted& wanted, unsigned kernel, const Take& take, const IPC& ipc) {
+  const unsigned reach = wanted.Windows() ? kernel / 2 : 0;
+  TileDimensions tiles =
+      StripTiles(*image, std::size_t{image->Samples()} * image->Bands() * sizeof(T));
+  const RasterIteratorPtr<L> labelTiles = LabelTiles(labels, tiles);
+  tiles.borderLeft = tiles.borderRight = tiles.borderTop = tiles.borderBottom = reach;
+  const RasterIteratorPtr<T> imageTiles(new RasterIterator<T>(image, tiles));
+  const ShareScope* const shares = ShareScope::Current();
+  const Share share = shares != nullptr ? shares->GetShare() : Share();
+  std::vector<BlockPlace> places;
+  for (auto row = share.Begin(imageTiles->Rows()); row < share.End(imageTiles->Rows()); ++row) {
+    places.push_back({0, static_cast<unsigned>(row)});
+  }
+  if (places.empty()) return true;
+
+  ScratchPool<Scratch<T>> pool;
+  ChosenBlocks process("RegionPass", places, ipc);
+  const auto imageSlot = process.ReadChosen(imageTiles);
+  const auto labelSlot = process.ReadChosen(labelTiles);
+  const auto sums = process.template TakeSlot<ValueSlot<std::vector<StripValues<T>>>>();
+  process.Add("RegionPass", StageOrder::kSeveralAtOnce, [&](ArgList& token, const AbortFlag*) {
+    const TilePtr<T> tile = imageSlot.In(token);
+    const TilePtr<L> label = labelSlot.In(token);
+    if (!tile || !tile->IsValid() || !label || !label->IsValid()) return false;
+    const StripWork<T, L> work(*tile, *label, wanted, census);
+    return sums.Put(token, SumTile<T, L>(work, tile->Height(), pool, reach, wanted.entropy));
+  });
+  process.Add("RegionPass", StageOrder::kOneByOne, [&](ArgList& token, const AbortFlag*) {
+    auto* const strips = sums.In(token);
+    return strips != nullptr && std::all_of(strips->begin(), strips->end(), take);
+  });
+  process.Close();
+  const bool hasRun = process.RunProcess(process.kHere);
+  if (ipc.abort->IsSet()) {
+    SetFault("the work was aborted");
+    return false;
+  }
+  if (!hasRun) SetFault(process.GetFault());
+  return hasRun;
+}
+
+/// Hands the sums in the files of all shares to `take`, in their order.
+template <typename T, typename Take>
+bool TakeStrips(ShareScope& shares, const Take& take) {
+  for (unsigned i = 0; i < shares.Count(); ++i) {
+    ShareReader* const in = shares.In(i);
+    if (in == nullptr) return false;
+    while (!in->IsAtEnd()) {
+      StripValues<T> strip;
+      if (Restore(strip, *in) && take(strip)) continue;
+      SetFault("the files of the shares don't hold the sums of these regions");
+      return false;
+    }
+  }
+  return true;
+}
+
 }  // namespace
 
 template <typename T>
@@ -317,45 +429,22 @@ bool RegionPass<T>::Run(const IPC& ipc) {
 template <typename T>
 template <typename L>
 bool RegionPass<T>::RunTyped(const RasterPtr<L>& labels, const IPC& ipc) {
+  ShareScope* const shares = ShareScope::Current();
+  if (shares != nullptr && shares->IsShare()) {
+    const auto save = [&](StripValues<T>& strip) {
+      Save(strip, shares->Out());
+      return true;
+    };
+    return SumTiles<T, L>(image_, labels, census_, plan_.ofShare, plan_.kernel, save, ipc);
+  }
   const Wanted wanted{bool(plan_.spectral), bool(plan_.texture), bool(plan_.means),
                       bool(plan_.entropy)};
-  const unsigned reach = wanted.Windows() ? plan_.kernel / 2 : 0;
-  TileDimensions tiles =
-      StripTiles(*image_, std::size_t{image_->Samples()} * image_->Bands() * sizeof(T));
-  const RasterIteratorPtr<L> labelTiles = LabelTiles(labels, tiles);
-  tiles.borderLeft = tiles.borderRight = tiles.borderTop = tiles.borderBottom = reach;
-  const RasterIteratorPtr<T> imageTiles(new RasterIterator<T>(image_, tiles));
-
-  ScratchPool<Scratch<T>> pool;
   StripJoin<T> join(plan_, wanted, census_, image_->Bands());
-  TileProcess<> process("RegionPass", ipc);
-  const auto imageSlot = process.Read(imageTiles);
-  const auto labelSlot = process.Read(labelTiles);
-  const auto sums = process.template TakeSlot<ValueSlot<std::vector<StripValues<T>>>>();
-  process.Add("RegionPass", StageOrder::kSeveralAtOnce, [&](ArgList& token, const AbortFlag*) {
-    const TilePtr<T> image = imageSlot.In(token);
-    const TilePtr<L> label = labelSlot.In(token);
-    if (!image || !image->IsValid() || !label || !label->IsValid()) return false;
-    const StripWork<T, L> work(*image, *label, wanted, census_);
-    return sums.Put(token, SumTile<T, L>(work, image->Height(), pool, reach, wanted.entropy));
-  });
-  process.Add("RegionPass", StageOrder::kOneByOne, [&](ArgList& token, const AbortFlag*) {
-    auto* const strips = sums.In(token);
-    return strips != nullptr &&
-           std::all_of(strips->begin(), strips->end(),
-                       [&](const StripValues<T>& strip) { return join.Add(strip); });
-  });
-  process.Close();
-  const bool hasRun = process.RunProcess(process.kHere);
-  if (ipc.abort->IsSet()) {
-    SetFault("the work was aborted");
-    return false;
-  }
-  if (!hasRun) {
-    SetFault(process.GetFault());
-    return false;
-  }
-  return join.Close();
+  const auto add = [&](const StripValues<T>& strip) { return join.Add(strip); };
+  const bool isDone = shares != nullptr
+                          ? TakeStrips<T>(*shares, add)
+                          : SumTiles<T, L>(image_, labels, census_, wanted, plan_.kernel, add, ipc);
+  return isDone && join.Close();
 }
 
 VEXG_INSTANCES(EIGHT, RegionPass);

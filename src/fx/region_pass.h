@@ -6,6 +6,17 @@
 
 namespace lumo {
 
+/// Says which values a pass gives.
+struct RegionPassValues {
+  bool spectral = false;
+  bool texture = false;
+  bool means = false;
+  bool entropy = false;
+
+  bool Sums() const { return spectral || means; }
+  bool Windows() const { return texture || entropy; }
+};
+
 /// Names the files that a pass over an image and its labels fills; null leaves one out.
 struct RegionPassPlan {
   Pointer<SpectralRegionAttributesFile> spectral;
@@ -13,7 +24,8 @@ struct RegionPassPlan {
   Pointer<RegionMeansFile> means;
   /// The mean over a region of the entropy of windows, over the number of their values.
   Pointer<RegionMeansFile> entropy;
-  unsigned kernel = 1;  ///< side of the windows of texture, in pixels
+  unsigned kernel = 1;         ///< side of the windows of texture, in pixels
+  RegionPassValues ofShare{};  ///< the values of a share, which fills none of the files
 };
 
 /// Computes values of regions in one pass over an image and its labels, from exact sums: in
@@ -26,6 +38,9 @@ struct RegionPassPlan {
 ///
 ///     RegionPass<float> pass(image, labels, census, plan);
 ///     if (!pass.Run(ipc) || !plan.spectral->Close()) return false;
+///
+/// Where a ShareScope lives, the sums of a share of the strips go to its file, or files are filled
+/// out of the sums of all shares.
 ///
 /// Failure: false, with the fault set, when a raster or a file fails, and at an abort. Files then
 ///          hold some regions.

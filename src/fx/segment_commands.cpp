@@ -1,6 +1,7 @@
 #include <algorithm>
 #include <numeric>
 
+#include "commands/division.h"
 #include "foundation/fault.h"
 #include "foundation/scientific_notation.h"
 #include "fx/seamless_segmentation.h"
@@ -303,6 +304,8 @@ class FxTileSegmentMergeCommand final : public SegmentCommand {
 };
 
 const CommandFactoryT<FxTileSegmentMergeCommand> segmentMergeFactory(kSegmentMerge);
+const DivisionRegistration segmentMergeDivision({.command = "FxTileSegmentMergeCommand",
+                                                 .makes = {"Tree"}});
 
 const CommandDeclaration kHistogram{
     "FxTileSegmentHistogramCommand",

@@ -2,6 +2,7 @@
 
 #include <fmt/format.h>
 
+#include "commands/division.h"
 #include "foundation/fault.h"
 #include "fx/attribute_csv.h"
 #include "fx/tree_cut.h"
@@ -117,6 +118,8 @@ class CreateTreeLevelsTableCommand final : public Command {
 };
 
 const CommandFactoryT<CreateTreeLevelsTableCommand> levelsFactory(kTreeLevels);
+const DivisionRegistration levelsDivision({.command = "CreateTreeLevelsTableCommand",
+                                           .makes = {"Table"}});
 
 const CommandDeclaration kSuggest{
     "SuggestSegmentScalesCommand",

@@ -1,5 +1,6 @@
 #include <cmath>
 
+#include "commands/division.h"
 #include "foundation/fault.h"
 #include "foundation/progress.h"
 #include "fx/attribute_inputs.h"
@@ -141,6 +142,8 @@ class FxComputeVectorAttributesCommand final : public RegionCommand {
 };
 
 const CommandFactoryT<FxComputeVectorAttributesCommand> factory(kVectorAttributes);
+const DivisionRegistration division({.command = "FxComputeVectorAttributesCommand",
+                                     .makes = {"SpatialFXA"}});
 
 }  // namespace
 }  // namespace lumo

@@ -1,5 +1,6 @@
 #include <filesystem>
 
+#include "commands/division.h"
 #include "foundation/fault.h"
 #include "geometry/fxv_file.h"
 #include "geometry/raster_to_vector.h"
@@ -146,6 +147,7 @@ class PolygonizeCommand final : public RasterCommand {
 };
 
 const CommandFactoryT<PolygonizeCommand> factory(kPolygonize);
+const DivisionRegistration division({.command = "PolygonizeCommand", .makes = {"Vectors"}});
 
 }  // namespace
 }  // namespace lumo

@@ -1,3 +1,4 @@
+#include "commands/division.h"
 #include "foundation/fault.h"
 #include "geometry/fxv_file.h"
 #include "geometry/raster_to_vector.h"
@@ -48,6 +49,7 @@ class FxRasterToVectorCommand final : public RasterCommand {
 };
 
 const CommandFactoryT<FxRasterToVectorCommand> factory(kRasterToVector);
+const DivisionRegistration division({.command = "FxRasterToVectorCommand", .makes = {"VectorFXV"}});
 
 }  // namespace
 }  // namespace lumo

@@ -3,6 +3,7 @@
 
 #include <fmt/format.h>
 
+#include "commands/division.h"
 #include "data/access_policy.h"
 #include "data/file_uri.h"
 #include "foundation/fault.h"
@@ -221,6 +222,9 @@ class CreateMosaicCommand final : public RasterCommand {
 };
 
 const CommandFactoryT<CreateMosaicCommand> factory(kCreate);
+const DivisionRegistration division({.command = "CreateMosaicCommand",
+                                     .kind = DivisionKind::kFirst,
+                                     .makes = {"File"}});
 
 }  // namespace
 }  // namespace lumo

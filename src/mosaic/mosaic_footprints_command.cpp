@@ -1,3 +1,4 @@
+#include "commands/division.h"
 #include "foundation/fault.h"
 #include "mosaic/mosaic_command.h"
 #include "mosaic/mosaic_seams.h"
@@ -40,6 +41,8 @@ class MakeMosaicFootPrintsCommand final : public MosaicCommand {
 };
 
 const CommandFactoryT<MakeMosaicFootPrintsCommand> factory(kMake);
+const DivisionRegistration division({.command = "MakeMosaicFootPrintsCommand",
+                                     .kind = DivisionKind::kFirst});
 
 }  // namespace
 }  // namespace lumo

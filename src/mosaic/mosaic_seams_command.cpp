@@ -1,3 +1,4 @@
+#include "commands/division.h"
 #include "foundation/fault.h"
 #include "mosaic/mosaic_command.h"
 #include "mosaic/mosaic_seams.h"
@@ -28,6 +29,8 @@ class MosaicAutoSeamGenCommand final : public MosaicCommand {
 };
 
 const CommandFactoryT<MosaicAutoSeamGenCommand> factory(kSeams);
+const DivisionRegistration division({.command = "MosaicAutoSeamGenCommand",
+                                     .kind = DivisionKind::kFirst});
 
 }  // namespace
 }  // namespace lumo

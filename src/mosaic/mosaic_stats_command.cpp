@@ -1,3 +1,4 @@
+#include "commands/division.h"
 #include "foundation/fault.h"
 #include "mosaic/mosaic_command.h"
 #include "mosaic/mosaic_matching.h"
@@ -31,6 +32,8 @@ class MosaicStatsCommand final : public MosaicCommand {
 };
 
 const CommandFactoryT<MosaicStatsCommand> factory(kStats);
+const DivisionRegistration division({.command = "MosaicStatsCommand",
+                                     .kind = DivisionKind::kFirst});
 
 }  // namespace
 }  // namespace lumo

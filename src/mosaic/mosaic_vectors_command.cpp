@@ -1,6 +1,7 @@
 #include <algorithm>
 #include <cmath>
 
+#include "commands/division.h"
 #include "data/vector_records.h"
 #include "foundation/fault.h"
 #include "mosaic/mosaic_command.h"
@@ -181,6 +182,8 @@ class CreateMosaicVectorsCommand final : public MosaicCommand {
 };
 
 const CommandFactoryT<CreateMosaicVectorsCommand> factory(kVectors);
+const DivisionRegistration division({.command = "CreateMosaicVectorsCommand",
+                                     .makes = {"Vectors"}});
 
 }  // namespace
 }  // namespace lumo

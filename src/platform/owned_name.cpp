@@ -31,12 +31,15 @@ std::string Digest(std::string_view text) {
   return std::string(std::begin(digits), end);
 }
 
-/// When a process began, in the system's ticks since it was started; none when there is no such.
+/// When a process began, in the system's ticks since it was started; none when there is no such, or
+/// when it has ended and only waits for its parent to notice.
 std::optional<std::string> StartOf(const std::string& process) {
   const std::string line = FirstLine(("/proc/" + process + "/stat").c_str());
   // The name of the program, in parentheses, may hold blanks; the start is 20 fields behind it.
   std::size_t at = line.rfind(')');
   if (at == std::string::npos) return std::nullopt;
+  const char state = at + 2 < line.size() ? line[at + 2] : ' ';
+  if (state == 'Z' || state == 'X') return std::nullopt;
   constexpr int kFields = 20;
   for (int field = 0; field < kFields && at != std::string::npos; ++field) {
     at = line.find(' ', at + 1);
@@ -51,7 +54,11 @@ struct Owner {
 
   static Owner Self() {
     const std::string process = std::to_string(getpid());
-    return {Digest(FirstLine("/etc/machine-id")),
+    // Containers may lack an identifier of their own, and see no processes of others.
+    std::string machine = FirstLine("/etc/machine-id");
+    machine += '\n';
+    machine += FirstLine("/proc/sys/kernel/hostname");
+    return {Digest(machine),
             Digest(FirstLine("/proc/sys/kernel/random/boot_id")), process,
             StartOf(process).value_or("0")};
   }

@@ -1,6 +1,7 @@
 #include <optional>
 #include <vector>
 
+#include "commands/division.h"
 #include "foundation/fault.h"
 #include "raster/block_strides.h"
 #include "raster/raster_command.h"
@@ -120,6 +121,7 @@ class CopyRasterCommand final : public RasterCommand {
 };
 
 const CommandFactoryT<CopyRasterCommand> factory(kCopy);
+const DivisionRegistration division({"CopyRasterCommand", DivisionKind::kRows, "SrcURI", "DstURI"});
 
 }  // namespace
 }  // namespace lumo

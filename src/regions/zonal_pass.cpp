@@ -1,10 +1,10 @@
 #include "regions/zonal_pass.h"
 
 #include <algorithm>
+#include <numeric>
 
 #include "foundation/fault.h"
 #include "raster/raster_def.h"
-#include "raster/tile_process.h"
 #include "regions/coverage_block.h"
 #include "tasks/parallel.h"
 
@@ -57,7 +57,7 @@ template <typename T>
 class ZonalPass<T>::ZonesOfBlock final : public IParallelFor<unsigned>, public ParallelResult {
  public:
   ZonesOfBlock(ZonalPass& pass, const Tile<T>& block, const RegionWindow& window)
-      : pass_(pass), block_(block), window_(window), zones_(pass.shapes_.FindRecords(window)) {}
+      : pass_(pass), block_(block), window_(window), zones_(pass.ZonesIn(window)) {}
 
   unsigned Begin() const override { return 0; }
   unsigned End() const override { return static_cast<unsigned>(zones_.size()); }
@@ -89,17 +89,37 @@ ZonalPass<T>::ZonalPass(const RasterPtr<T>& raster, const ZonalPlan& plan)
 
 template <typename T>
 bool ZonalPass<T>::Run(const IPC& ipc) {
+  const RasterIteratorPtr<T> iterator(new RasterIteratorStream<T>(raster_, plan_.bands));
+  Begin(*iterator);
+  TileProcess<> process("ZonalStatistics", ipc);
+  return RunOver(process, process.Read(iterator), ipc);
+}
+
+template <typename T>
+bool ZonalPass<T>::RunShare(const Share& share, const IPC& ipc) {
+  const RasterIteratorPtr<T> iterator(new RasterIteratorStream<T>(raster_, plan_.bands));
+  ChooseZones(*iterator, share);
+  Begin(*iterator);
+  if (blocks_.empty()) return true;
+  ChosenBlocks process("ZonalStatistics", blocks_, ipc);
+  const auto slot = process.ReadChosen(iterator);
+  return RunOver(process, slot, ipc);
+}
+
+template <typename T>
+void ZonalPass<T>::Begin(const RasterIterator<T>& iterator) {
   const std::size_t zones = plan_.geometry->RecordCount();
   zones_ = std::vector<std::unique_ptr<Zone>>(zones);
-  blocksLeft_.assign(zones, 0);
   figures_.assign(zones * plan_.bands.GetCount() * plan_.requests.size(), std::nan(""));
-  const RasterIteratorPtr<T> iterator(new RasterIteratorStream<T>(raster_, plan_.bands));
-  CountBlocks(*iterator);
+  CountBlocks(iterator);
   for (std::size_t zone = 0; zone < zones; ++zone) {
     if (blocksLeft_[zone] == 0) Finish(static_cast<std::int32_t>(zone));  // off the raster
   }
-  TileProcess<> process("ZonalStatistics", ipc);
-  const auto slot = process.Read(iterator);
+}
+
+/// Runs the stages behind the one that reads blocks.
+template <typename T>
+bool ZonalPass<T>::RunOver(TileProcess<>& process, const TileSlot<T>& slot, const IPC& ipc) {
   process.Add("ZonalStatistics", StageOrder::kOneByOne,
               [this, slot](ArgList& token, const AbortFlag*) {
                 const TilePtr<T> block = slot.In(token);
@@ -112,20 +132,67 @@ bool ZonalPass<T>::Run(const IPC& ipc) {
   return false;
 }
 
-/// Counts for each zone the blocks that it may touch.
+/// The zones that may have pixels in a window, without those of other shares.
 template <typename T>
-void ZonalPass<T>::CountBlocks(const RasterIterator<T>& iterator) {
+std::vector<std::int32_t> ZonalPass<T>::ZonesIn(const RegionWindow& window) {
+  std::vector<std::int32_t> zones = shapes_.FindRecords(window);
+  if (!isLeftOut_.empty()) {
+    std::erase_if(zones,
+                  [&](std::int32_t zone) { return isLeftOut_[static_cast<std::size_t>(zone)]; });
+  }
+  return zones;
+}
+
+/// Chooses the zones of a share in the order of their first blocks, and finds the blocks that these
+/// touch.
+template <typename T>
+void ZonalPass<T>::ChooseZones(const RasterIterator<T>& iterator, const Share& share) {
+  CountBlocks(iterator);
+  const std::size_t count = plan_.geometry->RecordCount();
+  std::vector<std::uint32_t> order(count);
+  std::iota(order.begin(), order.end(), 0U);
+  std::stable_sort(order.begin(), order.end(), [&](std::uint32_t a, std::uint32_t b) {
+    return firstBlocks_[a] < firstBlocks_[b];
+  });
+  isLeftOut_.assign(count, true);
+  for (std::uint64_t i = share.Begin(count); i < share.End(count); ++i) {
+    zonesOfShare_.push_back(order[i]);
+    isLeftOut_[order[i]] = false;
+  }
+  ForEachBlock(iterator, [&](unsigned column, unsigned row, const RegionWindow& window) {
+    if (!ZonesIn(window).empty()) blocks_.push_back({column, row});
+  });
+}
+
+/// Calls `visit(column, row, window)` for each block of the raster.
+template <typename T>
+template <typename Visit>
+void ZonalPass<T>::ForEachBlock(const RasterIterator<T>& iterator, const Visit& visit) const {
   const TileDimensions size = iterator.Dimensions();
   for (unsigned row = 0; row < iterator.Rows(); ++row) {
     for (unsigned column = 0; column < iterator.Columns(); ++column) {
       const unsigned left = column * size.width, top = row * size.height;
-      const RegionWindow window{left, top, std::min(size.width, raster_->Samples() - left),
-                                std::min(size.height, raster_->Lines() - top)};
-      for (const std::int32_t zone : shapes_.FindRecords(window)) {
-        ++blocksLeft_[static_cast<std::size_t>(zone)];
-      }
+      visit(column, row,
+            RegionWindow{left, top, std::min(size.width, raster_->Samples() - left),
+                         std::min(size.height, raster_->Lines() - top)});
     }
   }
+}
+
+/// Counts for each zone the blocks that it may touch, and notes the first of them.
+template <typename T>
+void ZonalPass<T>::CountBlocks(const RasterIterator<T>& iterator) {
+  const std::size_t zones = plan_.geometry->RecordCount();
+  blocksLeft_.assign(zones, 0);
+  firstBlocks_.assign(zones, 0);
+  std::uint32_t block = 0;
+  ForEachBlock(iterator, [&](unsigned, unsigned, const RegionWindow& window) {
+    for (const std::int32_t zone : ZonesIn(window)) {
+      const auto at = static_cast<std::size_t>(zone);
+      if (blocksLeft_[at]++ == 0) firstBlocks_[at] = block;
+    }
+    ++block;
+  });
 }
 
 template <typename T>

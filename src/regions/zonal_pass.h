@@ -3,8 +3,8 @@
 #include <memory>
 #include <mutex>
 
-#include "raster/raster_iterator.h"
-#include "raster/tile.h"
+#include "commands/division.h"
+#include "raster/chosen_blocks.h"
 #include "regions/rasterized_geometry.h"
 #include "regions/zone_values.h"
 
@@ -40,6 +40,12 @@ class VEXG_EXPORT ZonalPass {
 
   /// Reads the raster and computes the figures.
   bool Run(const IPC& ipc);
+  /// Computes the figures of a share of the zones: of some whose first blocks follow one another,
+  /// so that it reads a part of the raster. They are those of the whole, to the bit. Other zones
+  /// have none.
+  bool RunShare(const Share& share, const IPC& ipc);
+  /// The zones of the share that was computed.
+  const std::vector<std::uint32_t>& GetZones() const { return zonesOfShare_; }
   /// The figures, zones by bands by requests, after Run.
   const std::vector<double>& GetFigures() const { return figures_; }
 
@@ -49,7 +55,13 @@ class VEXG_EXPORT ZonalPass {
   };
   class ZonesOfBlock;
 
+  void Begin(const RasterIterator<T>& iterator);
   void CountBlocks(const RasterIterator<T>& iterator);
+  void ChooseZones(const RasterIterator<T>& iterator, const Share& share);
+  template <typename Visit>
+  void ForEachBlock(const RasterIterator<T>& iterator, const Visit& visit) const;
+  std::vector<std::int32_t> ZonesIn(const RegionWindow& window);
+  bool RunOver(TileProcess<>& process, const TileSlot<T>& slot, const IPC& ipc);
   bool TakeBlock(const Tile<T>& block);
   bool TakeZone(std::int32_t zone, const Tile<T>& block, const RegionWindow& window);
   bool AddPixels(std::int32_t zone, const Tile<T>& block, const RegionWindow& window);
@@ -67,6 +79,10 @@ class VEXG_EXPORT ZonalPass {
   bool withValues_ = false;
   std::vector<std::unique_ptr<Zone>> zones_;  // those that blocks are still added to
   std::vector<std::uint32_t> blocksLeft_;     // for each zone
+  std::vector<std::uint32_t> firstBlocks_;    // for each zone
+  std::vector<bool> isLeftOut_;               // zones of other shares; empty without
+  std::vector<std::uint32_t> zonesOfShare_;
+  std::vector<BlockPlace> blocks_;  // that the zones of a share touch
   std::vector<double> figures_;
 };
 

@@ -1,6 +1,9 @@
 #include <filesystem>
 #include <numeric>
 
+#include <fmt/format.h>
+
+#include "commands/share_scope.h"
 #include "foundation/fault.h"
 #include "raster/raster_command.h"
 #include "raster/raster_def.h"
@@ -15,28 +18,30 @@ const CommandDeclaration kZonal{
     "Regions",
     "Makes a table of what the pixels inside each shape of a vector file add up to. A command of "
     "this library's own.",
-    {{"URI", Presence::kRequired, ValueKind::kURI, "the raster"},
-     {"Vectors", Presence::kRequired, ValueKind::kText, "the file of shapes, one zone each"},
-     {"Table", Presence::kRequired, ValueKind::kText,
-      "the file to make, in the format of its ending: a row for each record with its own fields "
-      "and, for each band, its figures; .csv has no shapes"},
-     {"Layer", Presence::kOptional, ValueKind::kText,
-      "a layer of the file, by its name or its number from 0; the first when absent"},
-     {"Where", Presence::kOptional, ValueKind::kText,
-      "FIELD=VALUE: only records with that value; all when absent"},
-     {"Bands", Presence::kOptional, ValueKind::kIntegerArray, "from 0; all when absent"},
-     {"Figures", Presence::kOptional, ValueKind::kTextList,
-      "of count, min, max, mean, std, sum, median, majority, minority, variety, and p with a "
-      "percentage, as p10; the first six when absent"},
-     {"Weights", Presence::kOptional, ValueKind::kWord,
-      "None: each pixel of a zone counts 1; Coverage: the share of it that lies inside", "",
-      &WordsIn<ZonalWeights>},
-     {"Pixels", Presence::kOptional, ValueKind::kWord,
-      "of zones without weights; see RasterizeCommand", "", &WordsIn<PixelRule>},
-     {"ScanRules", Presence::kOptional, ValueKind::kWord, "see CreateGeometryROIDefCommand", "",
-      &WordsIn<ScanRules>},
-     {"Coordinates", Presence::kOptional, ValueKind::kWord, "see CreateGeometryROIDefCommand", "",
-      &WordsIn<ShapeCoordinates>}},
+    WithShareInputs(
+        {{"URI", Presence::kRequired, ValueKind::kURI, "the raster"},
+         {"Vectors", Presence::kRequired, ValueKind::kText, "the file of shapes, one zone each"},
+         {"Table", Presence::kRequired, ValueKind::kText,
+          "the file to make, in the format of its ending: a row for each record with its own "
+          "fields "
+          "and, for each band, its figures; .csv has no shapes"},
+         {"Layer", Presence::kOptional, ValueKind::kText,
+          "a layer of the file, by its name or its number from 0; the first when absent"},
+         {"Where", Presence::kOptional, ValueKind::kText,
+          "FIELD=VALUE: only records with that value; all when absent"},
+         {"Bands", Presence::kOptional, ValueKind::kIntegerArray, "from 0; all when absent"},
+         {"Figures", Presence::kOptional, ValueKind::kTextList,
+          "of count, min, max, mean, std, sum, median, majority, minority, variety, and p with a "
+          "percentage, as p10; the first six when absent"},
+         {"Weights", Presence::kOptional, ValueKind::kWord,
+          "None: each pixel of a zone counts 1; Coverage: the share of it that lies inside", "",
+          &WordsIn<ZonalWeights>},
+         {"Pixels", Presence::kOptional, ValueKind::kWord,
+          "of zones without weights; see RasterizeCommand", "", &WordsIn<PixelRule>},
+         {"ScanRules", Presence::kOptional, ValueKind::kWord, "see CreateGeometryROIDefCommand", "",
+          &WordsIn<ScanRules>},
+         {"Coordinates", Presence::kOptional, ValueKind::kWord, "see CreateGeometryROIDefCommand",
+          "", &WordsIn<ShapeCoordinates>}}),
     {{"Zones", ValueKind::kInteger, "how many rows there are"},
      {"Empty", ValueKind::kInteger, "how many of them have no valid pixel in any band"}}};
 
@@ -48,19 +53,71 @@ class ZonalStatisticsCommand final : public RasterCommand {
     path_ = Read<String>("Vectors").ToUTF8();
     source_ = OpenShapes(path_);
     if (!source_ || !ReadZones()) return Fail(FaultOfShapes(path_));
+    ShareScope shares;
+    if (!shares.Begin({HasInput(kShareInput), Read<Array<unsigned>>(kShareInput),
+                       Read<String>(kShareFileInput), Read<Array<String>>(kShareFilesInput)},
+                      KeyOfShares(*raster))) {
+      return Fail();
+    }
     bool isDone = false;
     const bool isKnown = DispatchType(EightTypes{}, raster->DataType(), [&]<typename T>() {
-      ZonalPass<T> pass(RasterPtr<T>(raster), plan_);
-      isDone = pass.Run(GetIPC());
-      figures_ = pass.GetFigures();
+      isDone = shares.Joins() ? TakeFigures(shares) : Compute<T>(RasterPtr<T>(raster), shares);
       return true;
     });
     if (!isKnown) return Fail("URI: there are no zones on this pixel type");
     if (!isDone) return Fail(TakeFaultOr("the raster can't be read"));
+    if (!shares.End()) return Fail();
+    if (shares.IsShare()) return Succeed();
     if (!WriteTable()) return Fail(TakeFaultOr("the table can't be written"));
     Write("Zones", rows_);
     Write("Empty", empty_);
     return Succeed();
+  }
+
+  std::string KeyOfShares(const BasicRaster& raster) const {
+    std::string figures;
+    for (const ZonalRequest& request : plan_.requests) figures += request.name + "|";
+    return fmt::format("zones {} {} {} {} {} {} {}", raster.DataType(), raster.Samples(),
+                       raster.Lines(), FormatValue(plan_.bands).ToUTF8(), figures,
+                       static_cast<int>(plan_.weights), plan_.geometry->RecordCount());
+  }
+
+  /// Computes the figures of all zones, or of those of a share.
+  template <typename T>
+  bool Compute(const RasterPtr<T>& raster, ShareScope& shares) {
+    ZonalPass<T> pass(raster, plan_);
+    if (!shares.IsShare()) {
+      const bool isDone = pass.Run(GetIPC());
+      figures_ = pass.GetFigures();
+      return isDone;
+    }
+    if (!pass.RunShare(shares.GetShare(), GetIPC())) return false;
+    for (const std::uint32_t zone : pass.GetZones()) {
+      shares.Out().Put(zone);
+      shares.Out().PutAll(pass.GetFigures().data() + zone * FigureCount(), FigureCount());
+    }
+    return true;
+  }
+
+  /// Takes the figures of all zones out of the files of the shares.
+  bool TakeFigures(ShareScope& shares) {
+    const std::uint32_t zones = plan_.geometry->RecordCount();
+    figures_.resize(zones * FigureCount());
+    std::uint32_t taken = 0;
+    for (unsigned i = 0; i < shares.Count(); ++i) {
+      ShareReader* const in = shares.In(i);
+      if (in == nullptr) return false;
+      for (std::uint32_t zone = 0; !in->IsAtEnd(); ++taken) {
+        if (!in->Get(zone) || zone >= zones ||
+            !in->GetAll(figures_.data() + zone * FigureCount(), FigureCount())) {
+          SetFault("the files of the shares don't hold the figures of these zones");
+          return false;
+        }
+      }
+    }
+    if (taken == zones) return true;
+    SetFault("the files of the shares don't hold the figures of all zones");
+    return false;
   }
 
   bool ReadPlan(const BasicRaster& raster) {
@@ -192,6 +249,10 @@ class ZonalStatisticsCommand final : public RasterCommand {
 };
 
 const CommandFactoryT<ZonalStatisticsCommand> factory(kZonal);
+const DivisionRegistration division({.command = "ZonalStatisticsCommand",
+                                     .kind = DivisionKind::kShares,
+                                     .source = "URI",
+                                     .makes = {"Table"}});
 
 }  // namespace
 }  // namespace lumo

@@ -8,6 +8,8 @@
 
 namespace lumo {
 
+class ShareScope;
+
 /// The histograms of one raster: those at hand, and the run that counts one more. A raster that
 /// shows pixels of its own holds one and leaves its operations on histograms to it.
 ///
@@ -20,6 +22,9 @@ namespace lumo {
 /// the next call of any operation, and join those at hand unless an equal one is there. So does
 /// what a run had counted when it was aborted; one that failed leaves nothing.
 ///
+/// Where a ShareScope lives on the thread that asks, a run is that of a share, or joins those of
+/// all; it has ended when it was begun, and CountHistogram then gives nothing.
+///
 /// Those at hand hold for one Raster::WriteCount. Once pixels have been written they are gone, ones
 /// entered by hand as well, and a run that was under way then leaves nothing.
 ///
@@ -28,7 +33,7 @@ namespace lumo {
 /// Ownership: the raster owns it and outlives it. It is to be one of the raster's last members: its
 ///            destructor aborts a run that goes on, which reads the raster to that moment.
 /// Threads:   every operation may be called on any thread. The lock is never held while pixels are
-///            read.
+///            read, but for a share.
 template <typename T>
 class DynamicRasterHistogram : public ErrorState,
                                public HistogramsByName<DynamicRasterHistogram<T>, T> {
@@ -55,6 +60,7 @@ class DynamicRasterHistogram : public ErrorState,
   struct Run;
 
   bool CheckRunning() const;
+  bool DoShare(ShareScope& shares, Run& run, const IPC& ipc) const;
   void DropStale() const;
   void Append(const RasterBandHistogram<T>& histogram) const;
 

@@ -2,7 +2,9 @@
 
 #include <algorithm>
 
+#include "commands/share_scope.h"
 #include "foundation/fault.h"
+#include "raster/raster_lines.h"
 #include "stats/dynamic_raster_histogram.h"
 #include "stats/raster_histogram_process.h"
 
@@ -96,10 +98,56 @@ AsyncPtr DynamicRasterHistogram<T>::CountHistogram(const HistogramRequest<T>& re
     SetFault("there is no memory for so many bins");
     return {};
   }
+  if (ShareScope* const shares = ShareScope::Current()) {
+    const bool isDone = DoShare(*shares, *run, ipc);
+    for (unsigned i = 0; isDone && i < bands; ++i) {
+      Append(run->working->BandHistogram(i, run->iterator->Bands()[i]));
+    }
+    return {};
+  }
   run->process.Reset(new RasterHistogramProcess<T>(run->iterator, run->working, ipc));
   if (!run->process->RunProcess(run->process->kInBackground)) return {};
   run_ = std::move(run);
   return run_->process;
+}
+
+/// Counts a share, or joins the counts of all. @return false, with the fault set, when that fails.
+template <typename T>
+bool DynamicRasterHistogram<T>::DoShare(ShareScope& shares, Run& run, const IPC& ipc) const {
+  RasterHistogram<T>& counts = *run.working;
+  if (shares.Joins()) {
+    bool isWhole = counts.FillBins();
+    std::vector<unsigned long long> more;
+    for (unsigned i = 0; i < shares.Count(); ++i) {
+      ShareReader* const in = shares.In(i);
+      if (in == nullptr) return false;
+      for (unsigned band = 0; isWhole && band < counts.BandCount(); ++band) {
+        more.resize(counts.BinCount(band));
+        isWhole = in->GetAll(more.data(), more.size());
+        for (std::size_t bin = 0; isWhole && bin < more.size(); ++bin) {
+          counts.Counts(band)[bin] += more[bin];
+        }
+      }
+    }
+    if (!isWhole) SetFault("the files of the shares don't hold the counts of all bins");
+    return isWhole;
+  }
+  const auto& whole = static_cast<const RasterIteratorStream<T>&>(*run.iterator);
+  if (RasterIteratorShare<T>::IsEmpty(whole, shares.GetShare())) {
+    if (!counts.FillBins()) return false;
+  } else {
+    const RasterIteratorPtr<T> tiles(new RasterIteratorShare<T>(whole, shares.GetShare()));
+    RasterHistogramProcess<T> process(tiles, run.working, ipc);
+    if (!process.RunProcess(process.kHere)) {
+      SetFault(process.GetFault());
+      return false;
+    }
+    if (ipc.abort->IsSet()) return false;
+  }
+  for (unsigned band = 0; band < counts.BandCount(); ++band) {
+    shares.Out().PutAll(counts.Counts(band), counts.BinCount(band));
+  }
+  return true;
 }
 
 template <typename T>

@@ -8,12 +8,18 @@
 
 namespace lumo {
 
+class BasicRasterIterator;
+class ShareScope;
+
 /// The statistics of one raster: those at hand, and the computation that gives the rest. A raster
 /// that shows pixels of its own holds one and leaves its operations on statistics to it.
 ///
 /// A computation reads all pixels once, in the background, and gives all values of all bands. Its
 /// result is taken over at the next call of any operation, and then replaces the earlier one. A
 /// computation that was aborted, or failed, changes nothing.
+///
+/// Where a ShareScope lives on the thread that asks, a computation is that of a share, or joins
+/// those of all, and has ended when it was begun.
 ///
 /// The values at hand hold for one Raster::WriteCount. Once pixels have been written they are gone,
 /// ones entered by hand as well, and a computation that was under way then gives nothing; a getter
@@ -24,7 +30,7 @@ namespace lumo {
 /// Ownership: the raster owns it and outlives it. It is to be the raster's last member: its
 ///            destructor aborts a computation that goes on, which reads the raster to that moment.
 /// Threads:   every operation may be called on any thread. The lock is never held while pixels are
-///            read, or while a getter waits.
+///            read, but for a share, or while a getter waits.
 /// Failure:   getters give 0, with the fault set.
 template <typename T>
 class DynamicRasterStats : public ErrorState,
@@ -73,6 +79,9 @@ class DynamicRasterStats : public ErrorState,
   bool CheckRunning() const;
   void DropStale() const;
   void TakeOver(const Run& run) const;
+  bool DoShare(ShareScope& shares, Run& run, const IPC& ipc) const;
+  template <typename Stats>
+  bool Join(ShareScope& shares, const BasicRasterIterator& whole, Stats& stats) const;
   bool WasOvertaken() const;
   const RasterBandStats<T>* FindEntry(unsigned band, unsigned mask) const;
   template <typename Value>

@@ -1,6 +1,8 @@
 #pragma once
 
+#include "commands/share_scope.h"
 #include "foundation/fault.h"
+#include "raster/raster_lines.h"
 #include "stats/dynamic_raster_stats.h"
 #include "stats/raster_stats_process.h"
 
@@ -104,6 +106,10 @@ AsyncPtr DynamicRasterStats<T>::StatsBuild(const IPC& ipc) {
   const RasterPtr<T> raster(raster_, true);  // the raster outlives the run
   run->iterator.Reset(new RasterIteratorStream<T>(raster));
   if (!run->iterator->IsValid()) return {};
+  if (ShareScope* const shares = ShareScope::Current()) {
+    if (DoShare(*shares, *run, ipc)) TakeOver(*run);
+    return {};
+  }
   if (mode_ == lumo::StatsMode::kBasic) {
     run->basic.Reset(new RasterStats<T>);
     run->process.Reset(new RasterStatsProcess<T, RasterStats<T>>(run->iterator, run->basic, ipc));
@@ -117,6 +123,51 @@ AsyncPtr DynamicRasterStats<T>::StatsBuild(const IPC& ipc) {
   if (!run->process->RunProcess(run->process->kInBackground)) return {};
   run_ = std::move(run);
   return run_->process;
+}
+
+/// Computes the statistics of a share, or joins those of all. @return false, with the fault set,
+/// when that fails; nothing then holds.
+template <typename T>
+bool DynamicRasterStats<T>::DoShare(ShareScope& shares, Run& run, const IPC& ipc) const {
+  const auto compute = [&](const auto& stats) {
+    using Stats = std::remove_pointer_t<decltype(stats.Get())>;
+    const auto& whole = static_cast<const RasterIteratorStream<T>&>(*run.iterator);
+    if (shares.Joins()) return Join(shares, whole, *stats);
+    stats->Reset(whole.BandCount());
+    if (RasterIteratorShare<T>::IsEmpty(whole, shares.GetShare())) return stats->Finish();
+    const RasterIteratorPtr<T> tiles(new RasterIteratorShare<T>(whole, shares.GetShare()));
+    RasterStatsProcess<T, Stats> process(tiles, stats, ipc, &shares.Out());
+    if (process.RunProcess(process.kHere)) return !ipc.abort->IsSet();
+    SetFault(process.GetFault());
+    return false;
+  };
+  if (mode_ == lumo::StatsMode::kExtended) {
+    run.extended.Reset(new ExtendedRasterStats<T>);
+    return compute(run.extended);
+  }
+  run.basic.Reset(new RasterStats<T>);
+  return compute(run.basic);
+}
+
+/// Joins the statistics of all tiles, in their order: as the run over the whole does it.
+template <typename T>
+template <typename Stats>
+bool DynamicRasterStats<T>::Join(ShareScope& shares, const BasicRasterIterator& whole,
+                                 Stats& stats) const {
+  stats.Reset(whole.BandCount());
+  for (unsigned i = 0; i < shares.Count(); ++i) {
+    const Share share{i, shares.Count()};
+    const std::uint64_t rows = share.End(whole.Rows()) - share.Begin(whole.Rows());
+    ShareReader* const in = shares.In(i);
+    if (in == nullptr) return false;
+    for (std::uint64_t tile = 0; tile < rows * whole.Columns(); ++tile) {
+      Stats ofTile(whole.BandCount());
+      if (ofTile.Restore(*in) && stats.Merge(ofTile)) continue;
+      SetFault("the files of the shares don't hold the sums of all blocks");
+      return false;
+    }
+  }
+  return stats.Finish();
 }
 
 template <typename T>

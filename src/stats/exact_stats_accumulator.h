@@ -28,6 +28,12 @@ struct ExactStatsAccumulator {
     max = std::max(max, other.max);
   }
 
+  /// Calls `visit(number)` for each number that a merge takes in.
+  template <typename Visit>
+  void ForEachNumber(const Visit& visit) {
+    visit(count), visit(sum), visit(sum2), visit(min), visit(max);
+  }
+
   /// The same in the running form's terms, each with one or two roundings.
   LargeStatsAccumulator<T> ToLarge() const {
     LargeStatsAccumulator<T> large;
@@ -71,6 +77,11 @@ struct ExactPairAccumulator {
     sumX += other.sumX;
     sumY += other.sumY;
     products += other.products;
+  }
+  /// Calls `visit(number)` for each number that a merge takes in.
+  template <typename Visit>
+  void ForEachNumber(const Visit& visit) {
+    visit(count), visit(sumX), visit(sumY), visit(products);
   }
   /// Sum of the products x * y, rounded once.
   double SumXY() const { return static_cast<double>(products); }

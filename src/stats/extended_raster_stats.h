@@ -24,6 +24,8 @@ class ExtendedRasterStats : public RasterStats<T> {
   bool Accumulate(const Tile<T>& tile, unsigned rowFrom, unsigned rowTo, unsigned columnFrom,
                   unsigned columnTo);
   bool Merge(const ExtendedRasterStats& other);
+  void Save(ShareWriter& out) const;
+  bool Restore(ShareReader& in);
   bool Finish();
 
   /// Sums of the products, bands by bands, symmetric; empty before Finish.

@@ -220,6 +220,23 @@ bool ExtendedRasterStats<T>::Merge(const ExtendedRasterStats& other) {
 }
 
 template <typename T>
+void ExtendedRasterStats<T>::Save(ShareWriter& out) const {
+  RasterStats<T>::Save(out);
+  for (PairAccumulator pair : pairs_) {
+    pair.ForEachNumber([&](const auto& number) { out.Put(number); });
+  }
+}
+
+template <typename T>
+bool ExtendedRasterStats<T>::Restore(ShareReader& in) {
+  bool isThere = RasterStats<T>::Restore(in);
+  for (PairAccumulator& pair : pairs_) {
+    pair.ForEachNumber([&](auto& number) { isThere = isThere && in.Get(number); });
+  }
+  return isThere;
+}
+
+template <typename T>
 bool ExtendedRasterStats<T>::Finish() {
   const unsigned bands = this->BandCount();
   const ArrayDims dims(bands, bands);

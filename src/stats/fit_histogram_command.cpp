@@ -2,6 +2,9 @@
 #include <limits>
 #include <optional>
 
+#include <fmt/format.h>
+
+#include "commands/share_scope.h"
 #include "raster/raster_command.h"
 #include "stats/histogram_run.h"
 #include "stats/raster_histogram.h"
@@ -17,21 +20,25 @@ const CommandDeclaration kFit{
     "Statistics",
     "Chooses bins for the values of bands, counts them, and gives the histograms. (An addition of "
     "this library.)",
-    {{"URI", Presence::kRequired, ValueKind::kURI, "the raster"},
-     {"Bands", Presence::kOptional, ValueKind::kIntegerArray, "which bands; all when absent"},
-     {"Lowest", Presence::kOptional, ValueKind::kNumberArray,
-      "for each of the bands its smallest value, from which its bins begin; the type's for 8 bits"},
-     {"Highest", Presence::kOptional, ValueKind::kNumberArray,
-      "for each of the bands its largest value"},
-     {"LowerBound", Presence::kOptional, ValueKind::kNumber,
-      "smallest value that counts, instead of Lowest"},
-     {"UpperBound", Presence::kOptional, ValueKind::kNumber,
-      "largest value that counts, instead of Highest"},
-     {"BinCount", Presence::kOptional, ValueKind::kInteger,
-      "how many bins; 256 when absent, or fewer of the smallest whole size that whole numbers fit "
-      "into; no more than there are whole numbers"},
-     {"BinSize", Presence::kOptional, ValueKind::kNumber, "width of a bin, instead of BinCount"},
-     WaitInput()},
+    WithShareInputs(
+        {{"URI", Presence::kRequired, ValueKind::kURI, "the raster"},
+         {"Bands", Presence::kOptional, ValueKind::kIntegerArray, "which bands; all when absent"},
+         {"Lowest", Presence::kOptional, ValueKind::kNumberArray,
+          "for each of the bands its smallest value, from which its bins begin; the type's for 8 "
+          "bits"},
+         {"Highest", Presence::kOptional, ValueKind::kNumberArray,
+          "for each of the bands its largest value"},
+         {"LowerBound", Presence::kOptional, ValueKind::kNumber,
+          "smallest value that counts, instead of Lowest"},
+         {"UpperBound", Presence::kOptional, ValueKind::kNumber,
+          "largest value that counts, instead of Highest"},
+         {"BinCount", Presence::kOptional, ValueKind::kInteger,
+          "how many bins; 256 when absent, or fewer of the smallest whole size that whole numbers "
+          "fit "
+          "into; no more than there are whole numbers"},
+         {"BinSize", Presence::kOptional, ValueKind::kNumber,
+          "width of a bin, instead of BinCount"},
+         WaitInput()}),
     {{"Histograms", ValueKind::kText,
       "array of histograms, one for each of the bands: band, sign, bin size, bins, bounds, source "
       "and counts; every value within the bounds is in one bin"}}};
@@ -69,6 +76,15 @@ class FitRasterHistogramCommand final : public RasterCommand {
       return Fail("BinCount and BinSize exclude each other");
     }
     String why;
+    const std::string key =
+        fmt::format("histograms {} {} {} {} {}", raster->DataType(), FormatValue(bands).ToUTF8(),
+                    raster->Bands(), raster->Samples(), raster->Lines());
+    ShareScope shares;
+    if (!shares.Begin({HasInput(kShareInput), Read<Array<unsigned>>(kShareInput),
+                       Read<String>(kShareFileInput), Read<Array<String>>(kShareFilesInput)},
+                      key)) {
+      return Fail();
+    }
     const Turn turn(raster, Read<Waiting>("Wait"), GetIPC());
     const bool isReal = DispatchType(TenTypes{}, raster->DataType(), [&]<typename T>() {
       const RasterPtr<T> source(raster);
@@ -76,7 +92,8 @@ class FitRasterHistogramCommand final : public RasterCommand {
       return bool(source);
     });
     if (!isReal) return Fail("histograms are of real numbers, and the raster has others");
-    return why.GetLength() == 0 ? Succeed() : Fail(why);
+    if (why.GetLength() != 0) return Fail(why);
+    return shares.End() ? Succeed() : Fail();
   }
 
   /// Counts and writes. Gives no text, or why that could not be done.
@@ -92,6 +109,8 @@ class FitRasterHistogramCommand final : public RasterCommand {
       if (!why.empty()) return "band " + std::to_string(bands[i]) + ": " + why;
     }
     if (const String why = CountAll(raster, requests, turn); why.GetLength() != 0) return why;
+    const ShareScope* const shares = ShareScope::Current();
+    if (shares != nullptr && shares->IsShare()) return {};
     Array<RasterBandHistogram<T>> histograms(bands.GetDims());
     for (unsigned i = 0; i < bands.GetCount(); ++i) {
       const std::optional<RasterBandHistogram<T>> found = Find(raster, requests[i]);
@@ -212,6 +231,9 @@ class FitRasterHistogramCommand final : public RasterCommand {
 };
 
 const CommandFactoryT<FitRasterHistogramCommand> fitFactory(kFit);
+const DivisionRegistration fitDivision({.command = "FitRasterHistogramCommand",
+                                        .kind = DivisionKind::kShares,
+                                        .source = "URI"});
 
 }  // namespace
 }  // namespace lumo

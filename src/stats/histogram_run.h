@@ -1,5 +1,6 @@
 #pragma once
 
+#include "commands/share_scope.h"
 #include "foundation/fault.h"
 #include "raster/raster.h"
 #include "stats/turn.h"
@@ -18,11 +19,15 @@ String RunHistogram(Raster<T>& raster, const HistogramRequest<T>& request, const
     const String fault = TakeFault();
     return fault.GetLength() != 0 ? fault : String(text);
   };
+  if (ShareScope::Current() != nullptr) TakeFault();
   const std::uint64_t writes = raster.WriteCount();
   AsyncPtr run = raster.CountHistogram(request, ipc);
   // Another run may have begun meanwhile.
   while (!run && raster.HistogramAsync() && turn.AwaitRuns()) {
     run = raster.CountHistogram(request, ipc);
+  }
+  if (!run && ShareScope::Current() != nullptr) {  // it has ended
+    return ipc.abort->IsSet() ? String("the run was aborted") : TakeFault();
   }
   if (!run) return faultOr("the run could not be started");
   run->WaitFinished();

@@ -73,6 +73,13 @@ struct LargeStatsAccumulator {
     count += other.count;
   }
 
+  /// Calls `visit(number)` for each number that a merge takes in.
+  template <typename Visit>
+  void ForEachNumber(const Visit& visit) {
+    visit(count), visit(mean), visit(s), visit(meanSq), visit(sum), visit(sum2);
+    visit(min), visit(max);
+  }
+
   /// The running form, as ExactStatsAccumulator has it too.
   const LargeStatsAccumulator& ToLarge() const { return *this; }
 };
@@ -117,6 +124,13 @@ struct LargeStatsAccumulator2 : LargeStatsAccumulator<T> {
     meanY = (meanY * n1 + other.meanY * n2) / n;
     sumXY += other.sumXY;
     LargeStatsAccumulator<T>::Merge(other);
+  }
+
+  /// Calls `visit(number)` for each number that a merge takes in.
+  template <typename Visit>
+  void ForEachNumber(const Visit& visit) {
+    LargeStatsAccumulator<T>::ForEachNumber(visit);
+    visit(meanY), visit(c), visit(sumXY);
   }
 
   /// Sum of the products x * y.

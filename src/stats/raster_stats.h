@@ -1,5 +1,6 @@
 #pragma once
 
+#include "commands/share_file.h"
 #include "raster/band_values.h"
 #include "raster/tile.h"
 #include "stats/plane_stats.h"
@@ -45,6 +46,12 @@ class RasterStats : public Object {
   /// Takes in what another object with as many bands has seen. The order of merges decides the last
   /// bits of floating-point results. @return false, with no change, for another number of bands.
   bool Merge(const RasterStats& other);
+  /// Gives the sums so far to the file of a share, from which Restore takes them into an object of
+  /// as many bands.
+  void Save(ShareWriter& out) const;
+  /// Takes in the sums of another object as its Save gave them. @return false at the end of the
+  /// file.
+  bool Restore(ShareReader& in);
   /// Computes the results, and forgets what they came from. @return false, with no results, for an
   /// object without bands, or one that is finished.
   bool Finish();

@@ -43,6 +43,22 @@ bool RasterStats<T>::Merge(const RasterStats& other) {
 }
 
 template <typename T>
+void RasterStats<T>::Save(ShareWriter& out) const {
+  for (BandAccumulator<T> band : accumulators_) {
+    band.ForEachNumber([&](const auto& number) { out.Put(number); });
+  }
+}
+
+template <typename T>
+bool RasterStats<T>::Restore(ShareReader& in) {
+  bool isThere = true;
+  for (BandAccumulator<T>& band : accumulators_) {
+    band.ForEachNumber([&](auto& number) { isThere = isThere && in.Get(number); });
+  }
+  return isThere;
+}
+
+template <typename T>
 bool RasterStats<T>::Finish() {
   if (!IsValid() || bandCount_ == 0 || accumulators_.GetCount() < bandCount_) return false;
   const ArrayDims dims(bandCount_);

@@ -33,9 +33,10 @@ class RasterStatsAccumulateTask final : public ConcurrentTask {
 template <typename T, typename Stats>
 class RasterStatsProcess final : public TileProcess<> {
  public:
-  /// @param stats  is reset for the bands of the iterator.
+  /// @param stats   is reset for the bands of the iterator.
+  /// @param ofTile  gets the sums of each tile, in their order; null for none.
   RasterStatsProcess(const RasterIteratorPtr<T>& iterator, const Pointer<Stats>& stats,
-                     const IPC& ipc = {});
+                     const IPC& ipc = {}, ShareWriter* ofTile = nullptr);
   void Execute() override;
 
  private:

@@ -32,6 +32,18 @@ struct ParallelRasterStatsAccumulate {
   }
 };
 
+/// Joins statistics, and keeps those that come to the total.
+template <typename Stats>
+struct MergeAndKeep {
+  const Stats* total;
+  ShareWriter* kept;  // null for none
+
+  bool operator()(Stats& left, const Stats& right) const {
+    if (kept != nullptr && &left == total) right.Save(*kept);
+    return left.Merge(right);
+  }
+};
+
 /// Joins statistics.
 struct MergeStats {
   template <typename Stats>
@@ -70,13 +82,14 @@ bool RasterStatsAccumulateTask<T, Stats>::Execute(ArgList& args) {
 
 template <typename T, typename Stats>
 RasterStatsProcess<T, Stats>::RasterStatsProcess(const RasterIteratorPtr<T>& iterator,
-                                                 const Pointer<Stats>& stats, const IPC& ipc)
+                                                 const Pointer<Stats>& stats, const IPC& ipc,
+                                                 ShareWriter* ofTile)
     : TileProcess("RasterStatsProcess", ipc), stats_(stats) {
   stats->Reset(iterator->BandCount());
   const std::tuple tiles{Read(iterator)};
   AddReduction(*this, "RasterStatsAccumulateTask", tiles, *stats_,
-               ParallelRasterStatsAccumulate<T, Stats>{stats->BandCount()}, MergeStats(),
-               LeastStripPixels(*stats));
+               ParallelRasterStatsAccumulate<T, Stats>{stats->BandCount()},
+               MergeAndKeep<Stats>{stats_.Get(), ofTile}, LeastStripPixels(*stats));
   Close();
 }
 

@@ -1,5 +1,8 @@
 #include <algorithm>
 
+#include <fmt/format.h>
+
+#include "commands/share_scope.h"
 #include "foundation/fault.h"
 #include "raster/raster_command.h"
 #include "stats/turn.h"
@@ -19,6 +22,12 @@ class ComputeStatsCommand : public RasterCommand {
     if (!raster) return Fail();
     const AsyncPtr pyramid = raster->PyramidAsync();
     if (pyramid) pyramid->WaitFinished();
+    ShareScope shares;
+    if (!shares.Begin({HasInput(kShareInput), Read<Array<unsigned>>(kShareInput),
+                       Read<String>(kShareFileInput), Read<Array<String>>(kShareFilesInput)},
+                      KeyOfShares(*raster, mode))) {
+      return Fail();
+    }
     const Turn turn(raster, Read<Waiting>("Wait"), GetIPC());
     raster->SetStatsMode(mode);
     // While a computation goes on the mode stays what it was.
@@ -26,7 +35,7 @@ class ComputeStatsCommand : public RasterCommand {
     const bool typed = DispatchType(TenTypes{}, raster->DataType(), [&]<typename T>() {
       const RasterPtr<T> source(raster);
       if (!source) return false;
-      WriteStats(*source, mode);
+      WriteStats(*source, mode, shares.IsShare());
       return true;
     });
     if (!typed) return Fail("statistics are of real numbers, and the raster has others");
@@ -36,16 +45,21 @@ class ComputeStatsCommand : public RasterCommand {
       const String fault = TakeFault();
       return Fail(fault.GetLength() != 0 ? fault : "the statistics could not be computed");
     }
-    return Succeed();
+    return shares.End() ? Succeed() : Fail();
   }
 
  private:
+  static std::string KeyOfShares(const BasicRaster& raster, StatsMode mode) {
+    return fmt::format("statistics {} {} {} {} {}", MaskOf(mode), raster.DataType(), raster.Bands(),
+                       raster.Samples(), raster.Lines());
+  }
+
   static unsigned MaskOf(StatsMode mode) {
     return mode == StatsMode::kExtended ? StatsMask::Extended : StatsMask::Basic;
   }
 
   template <typename T>
-  void WriteStats(Raster<T>& raster, StatsMode mode) {
+  void WriteStats(Raster<T>& raster, StatsMode mode, bool isShare) {
     const unsigned bands = raster.Bands();
     const bool extended = mode == StatsMode::kExtended;
     const ArrayDims each(bands);
@@ -76,6 +90,7 @@ class ComputeStatsCommand : public RasterCommand {
         if (other < stats.cov.GetCount()) cov[at] = stats.cov[other];
       }
     }
+    if (isShare) return;
     Write("Min", min);
     Write("Max", max);
     Write("Mean", mean);
@@ -111,30 +126,32 @@ std::vector<OutputDeclaration> ExtendedOutputs() {
 }
 
 const CommandDeclaration kBasic{
-    "GetBasicRasterStatsCommand",
-    "Statistics",
+    "GetBasicRasterStatsCommand", "Statistics",
     "Gives the statistics of each band, computed where they are not at hand.",
-    {kUri, WaitInput()},
-    kBasicOutputs};
+    WithShareInputs({kUri, WaitInput()}), kBasicOutputs};
 
 class GetBasicRasterStatsCommand final : public ComputeStatsCommand {
   CommandResult Execute() override { return Compute(StatsMode::kBasic); }
 };
 
 const CommandFactoryT<GetBasicRasterStatsCommand> basicFactory(kBasic);
+const DivisionRegistration basicDivision({.command = "GetBasicRasterStatsCommand",
+                                          .kind = DivisionKind::kShares,
+                                          .source = "URI"});
 
 const CommandDeclaration kExtended{
-    "GetExtendedRasterStatsCommand",
-    "Statistics",
+    "GetExtendedRasterStatsCommand", "Statistics",
     "Gives the statistics of each band and between bands, computed where they are not at hand.",
-    {kUri, WaitInput()},
-    ExtendedOutputs()};
+    WithShareInputs({kUri, WaitInput()}), ExtendedOutputs()};
 
 class GetExtendedRasterStatsCommand final : public ComputeStatsCommand {
   CommandResult Execute() override { return Compute(StatsMode::kExtended); }
 };
 
 const CommandFactoryT<GetExtendedRasterStatsCommand> extendedFactory(kExtended);
+const DivisionRegistration extendedDivision({.command = "GetExtendedRasterStatsCommand",
+                                             .kind = DivisionKind::kShares,
+                                             .source = "URI"});
 
 const CommandDeclaration kSetMode{
     "SetRasterStatsModeCommand",

@@ -1,3 +1,4 @@
+#include "commands/division.h"
 #include "data/data_manager.h"
 #include "data/open_sources.h"
 #include "foundation/fault.h"
@@ -64,6 +65,7 @@ class CreateRasterCommand final : public RasterDefCommand {
 };
 
 const CommandFactoryT<CreateRasterCommand> createFactory(kCreate);
+const DivisionRegistration createDivision({.command = "CreateRasterCommand", .makes = {"ConnStr"}});
 
 const CommandDeclaration kCreateTemp{
     "CreateTempRasterCommand", "Rasters",

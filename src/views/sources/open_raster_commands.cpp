@@ -2,6 +2,7 @@
 #include <functional>
 
 #include "commands/catalog.h"
+#include "commands/division.h"
 #include "data/data_manager.h"
 #include "data/file_uri.h"
 #include "data/raster_reader.h"
@@ -207,6 +208,9 @@ class OpenRasterCommand final : public PublishCommand {
 };
 
 const CommandFactoryT<OpenRasterCommand> openFactory(kOpen);
+const DivisionRegistration openDivision({.command = "OpenRasterCommand",
+                                         .makes = {"PyramidConnStr"},
+                                         .makesWhen = "PyramidNew"});
 
 const CommandDeclaration kAccess{"AccessRasterCommand",
                                  "Rasters",

@@ -102,7 +102,10 @@ Json AsJson(const XMLElement& command, const CommandDeclaration* declaration) {
   return entry;
 }
 
-std::string ToJson(const Document& job, const Document& result) {
+}  // namespace
+
+Json ResultAsJson(const Document& job, const String& resultDocument) {
+  const Document result(resultDocument, "the result");
   const std::vector<NamedCommand> matched =
       MatchCommands(job.GetCommands(), result.GetCommands()).answered;
   Json commands = Json::array(), faults = Json::array();
@@ -117,10 +120,8 @@ std::string ToJson(const Document& job, const Document& result) {
   }
   Json all{{"commands", commands}};
   if (!faults.empty()) all["faults"] = faults;
-  return all.dump(2) + "\n";
+  return all;
 }
-
-}  // namespace
 
 Output::Output(const std::string& file, const std::string& input) {
   if (file.empty() || file == "-") return;
@@ -167,8 +168,7 @@ bool AsksForStrictChecks(const Document& job) {
 }
 
 void WriteResult(const Document& job, const String& resultDocument, bool json, Output& output) {
-  output.Write(json ? ToJson(job, Document(resultDocument, "the result"))
-                    : resultDocument.ToUTF8() + "\n");
+  output.Write((json ? ResultAsJson(job, resultDocument).dump(2) : resultDocument.ToUTF8()) + "\n");
 }
 
 int ExitCodeOf(const Document& job, const String& resultDocument) {

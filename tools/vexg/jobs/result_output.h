@@ -6,6 +6,7 @@
 #include "jobs/document.h"
 #include "jobs/progress_view.h"
 #include "options/option.h"
+#include "output/json_number.h"
 #include "output/output_file.h"
 
 namespace lumo::host {
@@ -47,12 +48,15 @@ Document ReadJob(const JobOptions& options, String& text);
 /// and the user has not asked for lenient ones.
 bool AsksForStrictChecks(const Document& job);
 
-/// Writes the result document, or the same as JSON:
+/// The result document as JSON:
 /// {"commands": [{"name", "result", "wall", "cpu", "usage", "reason", "return": {name: value}}],
 /// "faults": [text]}; "reason" and "faults" only where there are some, "wall" and "cpu" in seconds,
 /// and values as ValueAsJson gives them for what their commands declare. The values of a command
 /// that is unknown here are texts.
 /// @param job  whose result it is.
+Json ResultAsJson(const Document& job, const String& resultDocument);
+
+/// Writes the result document, or the same as JSON.
 void WriteResult(const Document& job, const String& resultDocument, bool json, Output& output);
 
 /// Says what is wrong with the document, why commands failed, and which of them left no trace in

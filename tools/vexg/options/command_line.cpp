@@ -171,19 +171,26 @@ Strings JoinLists(const Strings& arguments) {
   return joined;
 }
 
-/// Puts the arguments of the verb that "batch" is to run behind "--", where they belong to none of
-/// its own options.
-Strings MoveBatchWords(const Strings& arguments) {
-  const std::size_t batchAt = FindVerbPlace(arguments);
-  if (batchAt >= arguments.size() || arguments[batchAt] != "batch") return arguments;
-  const Verb& batch = *FindVerb("batch");
-  Strings own(arguments.begin(), arguments.begin() + static_cast<std::ptrdiff_t>(batchAt) + 1);
+/// The verbs behind which another verb stands with its arguments.
+bool TakesVerb(const std::string& verb) {
+  return verb == "batch" || verb == "plan";
+}
+
+/// Puts the arguments of the verb behind "batch" or "plan" behind "--", where they belong to none
+/// of its own options. Behind that verb an option that both have is that verb's.
+Strings MoveWordsOfVerb(const Strings& arguments) {
+  const std::size_t outerAt = FindVerbPlace(arguments);
+  if (outerAt >= arguments.size() || !TakesVerb(arguments[outerAt])) return arguments;
+  const Verb& outer = *FindVerb(arguments[outerAt]);
+  Strings own(arguments.begin(), arguments.begin() + static_cast<std::ptrdiff_t>(outerAt) + 1);
   Strings words;
   bool hasVerb = false;
-  for (std::size_t i = batchAt + 1; i < arguments.size(); ++i) {
+  const Verb* inner = nullptr;
+  for (std::size_t i = outerAt + 1; i < arguments.size(); ++i) {
     const std::string& argument = arguments[i];
     const std::string name = argument.substr(0, argument.find('='));
-    const OptionSpec* const option = name.starts_with('-') ? batch.options.Find(name) : nullptr;
+    const OptionSpec* option = name.starts_with('-') ? outer.options.Find(name) : nullptr;
+    if (inner != nullptr && inner->options.Find(name) != nullptr) option = nullptr;
     if (argument == "--") {
       words.insert(words.end(), arguments.begin() + static_cast<std::ptrdiff_t>(i) + 1,
                    arguments.end());
@@ -191,6 +198,7 @@ Strings MoveBatchWords(const Strings& arguments) {
     }
     const bool isHelp = !hasVerb && (argument == "--help" || argument == "-h");
     const bool isVerb = !hasVerb && !argument.starts_with('-');
+    if (isVerb) inner = FindVerb(argument);
     hasVerb = hasVerb || isVerb;
     (isVerb || isHelp || option != nullptr ? own : words).push_back(argument);
     const bool hasValue = option != nullptr && option->type != OptionType::kFlag;
@@ -239,7 +247,7 @@ std::string DescribeFault(const Strings& arguments, const CLI::ParseError& error
 
 CommandLine ReadCommandLine(const Strings& arguments) {
   Parser parser;
-  const Strings joined = JoinLists(MoveBatchWords(arguments));
+  const Strings joined = JoinLists(MoveWordsOfVerb(arguments));
   try {
     parser.app.parse(Strings(joined.rbegin(), joined.rend()));  // as the parser takes them
   } catch (const CLI::CallForVersion& version) {

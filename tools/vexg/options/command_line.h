@@ -15,9 +15,9 @@ struct CommandLine {
 
 /// Reads the arguments of the program into the variables of the options.
 ///
-/// Options may stand before or behind the verb. Behind "batch" and its verb stand the arguments of
-/// that one too. The elements of a list may be arguments of their own: "--gain 6 5 4" is "--gain
-/// 6,5,4".
+/// Options may stand before or behind the verb. Behind "batch" or "plan"
+/// and its verb stand the arguments of that one too. The elements of a list may be arguments of
+/// their own: "--gain 6 5 4" is "--gain 6,5,4".
 ///
 /// Failure: HostError with one line that says what is wrong, where to read on, and which verb or
 ///          option is the nearest.

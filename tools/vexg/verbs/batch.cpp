@@ -10,6 +10,7 @@
 #include "foundation/near_name.h"
 #include "foundation/thrown.h"
 #include "options/command_line.h"
+#include "output/capture.h"
 #include "platform/interrupt.h"
 #include "platform/memory_shortage.h"
 #include "verb.h"
@@ -76,20 +77,6 @@ std::vector<std::string> ArgumentsFor(const std::string& file,
   }
   return arguments;
 }
-
-/// Keeps what a verb prints while it lives.
-class Capture {
- public:
-  Capture() : before_(std::cout.rdbuf(text_.rdbuf())) {}
-  ~Capture() { std::cout.rdbuf(before_); }
-  Capture(const Capture&) = delete;
-  Capture& operator=(const Capture&) = delete;
-  std::string Text() const { return text_.str(); }
-
- private:
-  std::ostringstream text_;
-  std::streambuf* const before_;
-};
 
 /// JSON on one line; any other text as it is.
 std::string OnOneLine(const std::string& text) {

@@ -6,6 +6,7 @@
 #include "foundation/abandonment.h"
 #include "jobs/progress_view.h"
 #include "jobs/result_output.h"
+#include "plan/once.h"
 #include "platform/durability.h"
 #include "platform/interrupt.h"
 #include "verb.h"
@@ -43,12 +44,26 @@ int RunJobFile(const JobOptions& options) {
   return outcome == Outcome::kFailed && code == kExitSuccess ? kExitFailed : code;
 }
 
+int RunFileOnce(const JobOptions& options) {
+  if (options.output != "-" || options.json) {
+    throw HostError(kExitUsage, "--once keeps its result beside the document; leave -o and --json");
+  }
+  return RunOnce({options.file, ChooseProgressStyle(options.progress, options.quiet), options.quiet,
+                  options.isDurable});
+}
+
 const VerbRegistration registration(
     "run", "Runs a job document in this process and prints its result", [](OptionSet& line) {
       const auto options = std::make_shared<JobOptions>();
+      const auto isOnce = std::make_shared<bool>(false);
       line.AddExample("vexg run --json job.xml");
+      line.AddExample("vexg run --once plan/part-0003.xml");
       options->AddTo(line);
-      return VerbRegistration::Work([options] { return RunJobFile(*options); });
+      line.Add("--once", *isOnce,
+               "Do nothing where the result is there, which is kept beside the document; else make "
+               "outputs under names of their own first. For documents of vexg plan");
+      return VerbRegistration::Work(
+          [options, isOnce] { return *isOnce ? RunFileOnce(*options) : RunJobFile(*options); });
     });
 
 }  // namespace

@@ -1,0 +1,73 @@
+#pragma once
+
+#include <cstdint>
+#include <vector>
+
+#include "commands/declaration.h"
+#include "foundation/array.h"
+#include "foundation/string.h"
+
+namespace lumo {
+
+// Commands say here, beside their declarations, which files they make, and how a job of theirs can
+// be divided into several that run on their own: on other processors, or on other machines. `vexg
+// plan` makes those jobs out of it.
+
+/// The ways in which the work of a command is divided.
+enum class DivisionKind : unsigned {
+  kNone,   ///< it isn't
+  kFirst,  ///< it isn't, and what it makes or changes in place has to be there before others begin
+  kRows,   ///< each line of the raster that it writes comes from that line of the one that it reads
+  kShares  ///< by its inputs of ShareInputs
+};
+
+/// Says what becomes of a command in a job that is divided.
+struct DivisionDeclaration {
+  const char* command;  ///< class name
+  DivisionKind kind = DivisionKind::kNone;
+  const char* source = "";           ///< input that names the raster that is read
+  const char* target = "";           ///< input that names the raster to write, of kRows
+  std::vector<const char*> makes{};  ///< inputs that name files which the command makes
+  const char* makesWhen = "";        ///< input that has to be 1 for that; empty for none
+  const char* dividesWhen = "";      ///< input that has to be Exact for shares; empty for none
+};
+
+/// Registers a division: one static object beside the command.
+class VEXG_EXPORT DivisionRegistration {
+ public:
+  explicit DivisionRegistration(const DivisionDeclaration& division);
+};
+
+/// Finds the division of a command by its class name; null for one that has none.
+VEXG_EXPORT const DivisionDeclaration* FindDivision(const String& command);
+
+/// One of the shares into which work is divided: of `things` in a row it has those from Begin to
+/// before End, perhaps none.
+struct Share {
+  unsigned index = 0;
+  unsigned count = 1;
+
+  std::uint64_t Begin(std::uint64_t things) const { return At(things, index); }
+  std::uint64_t End(std::uint64_t things) const { return At(things, index + 1); }
+
+ private:
+  std::uint64_t At(std::uint64_t things, std::uint64_t number) const {
+    return things / count * number + things % count * number / count;
+  }
+};
+
+/// Reads a share out of its two numbers. False, with the fault set, for what is none.
+VEXG_EXPORT bool ReadShare(const Array<unsigned>& numbers, Share& share);
+
+/// Adds the inputs of a command that does its work in shares, all optional:
+///
+/// - Share, with ShareFile: the command does that share of its work alone and keeps it in a file;
+/// - ShareFiles: the command takes its work out of the files of all shares. What it then gives and
+///   makes is the same to the bit as without shares.
+VEXG_EXPORT std::vector<InputDeclaration> WithShareInputs(std::vector<InputDeclaration> inputs);
+
+inline constexpr const char* kShareInput = "Share";
+inline constexpr const char* kShareFileInput = "ShareFile";
+inline constexpr const char* kShareFilesInput = "ShareFiles";
+
+}  // namespace lumo

@@ -1,0 +1,276 @@
+"""vexg plan and vexg run --once: a job in parts has the bytes of the single run, whatever is killed."""
+
+import json
+import os
+import random
+import shutil
+import signal
+import subprocess
+import time
+import unittest
+
+from support import DATA, VEXG, FolderTest, needs_data, run
+
+needs_make = unittest.skipUnless(shutil.which("make"), "no make")
+SCENE = DATA / "landsat7_u16_tiled.tif"
+FLOATS = DATA / "landsat7_f32_strip.tif"
+
+# What is made, and how: @ stands for the output.
+JOBS = {
+    "copy": ("o.tif", "copy", SCENE, "@", "--bands", "3,1"),
+    "cog": ("o.tif", "copy", DATA / "RGB.byte.tif", "@", "--cog"),
+    "flat": ("o.dat", "copy", DATA / "RGB.byte.tif", "@"),
+    "calc": ("o.tif", "calc", "@", "N=(b3-b2)/(b3+b2);b0", SCENE),
+    "calibrate": ("o.tif", "calibrate", "radiance", FLOATS, "@", "--gain", "2", "--offset", "1"),
+    "warp": ("o.tif", "warp", SCENE, "@", "--to", "EPSG:4326", "--resampling", "cubic"),
+    "mosaic": ("o.tif", "mosaic", "build", "@", DATA / "mosaic_a.tif", DATA / "mosaic_b.tif", DATA / "mosaic_c.tif"),
+}
+
+
+class PlanTest(FolderTest):
+    def single(self, name):
+        """Makes a job in one run, and gives the output."""
+        place = self.folder / f"{name}.single"
+        place.mkdir()
+        output, *arguments = JOBS[name]
+        run(*(str(place / output if word == "@" else word) for word in arguments), "-q")
+        return place / output
+
+    def plan(self, name, *options):
+        """Plans a job into a folder with its name."""
+        place = self.folder / name
+        output, *arguments = JOBS[name]
+        arguments = [place / output if word == "@" else word for word in arguments]
+        self.fine("plan", "-q", "-o", place, *options, *arguments)
+        return place
+
+    def manifest(self, place):
+        return json.loads((place / "manifest.json").read_text())
+
+    def make(self, place, **options):
+        text = self.fine("plan", place, "--runner", "make")
+        makefile = self.folder / f"{place.name}.mk"
+        makefile.write_text(text)
+        return subprocess.Popen(["make", "-s", "-j2", "-C", place, "-f", makefile], stdout=subprocess.PIPE,
+                                stderr=subprocess.PIPE, text=True, env={**os.environ, "VEXG": str(VEXG)}, **options)
+
+    def made(self, place):
+        """Runs a plan to its end by make. The lines that it said."""
+        process = self.make(place)
+        out, err = process.communicate(timeout=60)
+        self.assertEqual((process.returncode, out), (0, ""), err)
+        return err
+
+    def assert_same(self, got, want):
+        self.assertEqual(got.read_bytes(), want.read_bytes(), got)
+
+
+@needs_data
+class Parts(PlanTest):
+    def test_documents_are_ordinary_and_the_manifest_tells_all_of_them(self):
+        place = self.plan("calc", "--parts", "4")
+        documents = self.manifest(place)["documents"]
+        self.assertEqual([each["document"] for each in documents],
+                         [f"part-{i:04}.xml" for i in range(4)] + ["merge.xml"])
+        self.assertEqual(documents[-1]["dependsOn"], [each["document"] for each in documents[:-1]])
+        for each in documents:
+            self.assertEqual(each["inputs"], [{"file": str(SCENE), "size": SCENE.stat().st_size,
+                                               "time": SCENE.stat().st_mtime_ns}])
+            self.assertEqual((len(each["outputs"]), each["threads"]), (1, 1 + (each == documents[-1])))
+            self.assertGreater(each["memory"], 1 << 26)
+        for each in documents:  # they run in any place that runs documents
+            self.fine("run", "-q", "-o", self.folder / "result.xml", place / each["document"])
+        self.assert_same(place / "o.tif", self.single("calc"))
+
+    def test_parts_come_by_their_number_or_their_memory(self):
+        for options, parts in ((("--parts", "3"), 3), (("--parts", "9999"), 352),
+                               (("--part-memory", "200000"), 3), (("--part-memory", "100000000"), 1)):
+            with self.subTest(options):
+                shutil.rmtree(self.folder / "copy", ignore_errors=True)
+                documents = self.manifest(self.plan("copy", *options))["documents"]
+                self.assertEqual(len(documents), parts + 1)
+
+    def test_work_that_cannot_be_divided_is_one_part_and_a_line_says_so(self):
+        place = self.folder / "plan"
+        code, out, err = run("plan", "--parts", "4", "-o", str(place), "polygonize",
+                             str(DATA / "dem_int16.tif"), str(place / "o.fxv"))
+        self.assertEqual((code, out), (0, ""))
+        self.assertRegex(err, r"\Avexg: note: PolygonizeCommand [^\n]+\n\Z")
+        self.assertEqual([each["document"] for each in self.manifest(place)["documents"]], ["part-0000.xml"])
+        self.fine("run", "--once", "-q", place / "part-0000.xml")
+        self.assertTrue((place / "o.fxv").exists())
+
+    def test_a_document_of_ones_own_can_be_planned_with_names_of_its_folder(self):
+        shutil.copyfile(SCENE, self.folder / "scene.tif")
+        job = self.folder / "job.xml"
+        job.write_text('<Job><Command Name="a" ID="OpenRasterCommand"><Input ConnStr="scene.tif"/>'
+                       '<Output URI="$a"/></Command><Command Name="b" ID="CreateRasterCommand">'
+                       '<DependsOn Name="a"/><Input ConnStr="out.tif" SrcURI="$a" Format="TIFF"/>'
+                       '<Output URI="$b"/></Command><Command Name="c" ID="CopyRasterCommand">'
+                       '<DependsOn Name="b"/><Input SrcURI="$a" DstURI="$b"/></Command></Job>')
+        here = os.getcwd()
+        os.chdir(self.folder)
+        self.addCleanup(os.chdir, here)
+        self.fine("run", "-q", "-o", "result.xml", "job.xml")
+        os.rename("out.tif", "single.tif")
+        self.fine("plan", "job.xml", "--parts", "3", "-o", "plan")
+        os.chdir("/")
+        for each in self.manifest(self.folder / "plan")["documents"]:
+            self.fine("run", "--once", "-q", self.folder / "plan" / each["document"])
+        self.assert_same(self.folder / "out.tif", self.folder / "single.tif")
+
+    def test_refuses_what_it_cannot_plan(self):
+        place = self.plan("copy", "--parts", "2")
+        output = self.folder / "x.tif"
+        for words, arguments in (
+                ("holds a plan already", ("-o", place, "--parts", "2", "copy", SCENE, output)),
+                ("give one of --parts and --part-memory", ("-o", place, "copy", SCENE, output)),
+                ("-o is required", ("--parts", "2", "copy", SCENE, output)),
+                ("no verb that works by a job", ("-o", self.folder / "f", "--parts", "2", "completion", "bash")),
+                ("can't be opened", ("-o", self.folder / "n", "--parts", "2", self.folder / "absent.xml")),
+                ("there is no plan here", (self.folder, "--runner", "make"))):
+            with self.subTest(words):
+                self.fails(2, words, "plan", *arguments)
+
+
+@needs_data
+class Once(PlanTest):
+    def test_what_is_done_is_not_done_again_and_one_result_that_has_gone_is_made_alone(self):
+        place = self.plan("copy", "--parts", "3")
+        documents = [each["document"] for each in self.manifest(place)["documents"]]
+
+        def once():
+            before = {path.name: path.stat().st_mtime_ns for path in place.glob("*.tif")}
+            for document in documents:
+                self.fine("run", "--once", "-q", place / document)
+            return sorted(path.name for path in place.glob("*.tif")
+                          if before.get(path.name) != path.stat().st_mtime_ns)
+
+        self.assertEqual(once(), ["o.tif", "part-0000.tif", "part-0001.tif", "part-0002.tif"])
+        self.assertEqual(once(), [])
+        (place / "part-0001.tif").unlink()
+        self.assertEqual(once(), ["part-0001.tif"])
+        (place / "merge.result.json").unlink()
+        self.assertEqual(once(), ["o.tif"])
+        (place / "part-0002.tif").write_bytes(b"damaged")
+        self.assertEqual(once(), ["part-0002.tif"])
+        self.assert_same(place / "o.tif", self.single("copy"))
+
+    def test_other_inputs_documents_and_orders_are_refused_in_one_line(self):
+        scene = self.folder / "scene.tif"
+        shutil.copyfile(SCENE, scene)
+        place = self.folder / "plan"
+        self.fine("plan", "--parts", "2", "-o", place, "copy", scene, self.folder / "o.tif")
+        self.fails(2, "part-0000.xml isn't done, which comes first", "run", "--once", place / "merge.xml")
+        self.fine("run", "--once", "-q", place / "part-0000.xml")
+        text = (place / "part-0001.xml").read_text()
+        (place / "part-0001.xml").write_text(text.replace("Exact", "Told"))
+        self.fails(2, "is not as it was planned", "run", "--once", place / "part-0001.xml")
+        (place / "part-0001.xml").write_text(text)
+        os.utime(scene, (1, 1))
+        for document in ("part-0000.xml", "part-0001.xml"):
+            self.fails(2, "scene.tif: has changed since", "run", "--once", place / document)
+        scene.unlink()
+        self.fails(2, "scene.tif: is not there any more", "run", "--once", place / "part-0001.xml")
+        shutil.copyfile(SCENE, place / "other.xml")
+        self.fails(2, "is no document of the plan", "run", "--once", place / "other.xml")
+        (place / "manifest.json").write_text('{"version": 1')
+        self.fails(2, "is no whole manifest", "run", "--once", place / "part-0001.xml")
+
+    def test_two_that_run_one_document_leave_it_as_one_does(self):
+        place = self.plan("cog", "--parts", "2")
+        for document in ("part-0000.xml", "part-0001.xml", "merge.xml"):
+            both = [subprocess.Popen([VEXG, "run", "--once", "-q", place / document], stderr=subprocess.PIPE)
+                    for _ in range(2)]
+            for process in both:
+                _, said = process.communicate(timeout=60)
+                self.assertEqual((process.returncode, said), (0, b""))
+        self.assert_same(place / "o.tif", self.single("cog"))
+        self.assertEqual([path for path in place.iterdir() if path.name.startswith(".")], [])
+
+    def test_a_document_without_a_plan_runs_once_too(self):
+        job = self.folder / "job.xml"
+        output = self.folder / "o.tif"
+        job.write_text(self.fine("copy", SCENE, output, "--print-job"))
+        self.fine("run", "--once", "-q", job)
+        made = output.stat().st_mtime_ns
+        self.fine("run", "--once", "-q", job)
+        self.assertEqual(output.stat().st_mtime_ns, made)
+        job.write_text(job.read_text().replace('Level="1"', "").replace("ZSTD", "DEFLATE"))
+        self.fine("run", "--once", "-q", job)
+        self.assertNotEqual(output.stat().st_mtime_ns, made)
+
+
+@needs_data
+@needs_make
+class Make(PlanTest):
+    def kill_some(self, place, kills, draw):
+        """Starts a plan and kills all of its processes, some times at random moments."""
+        for _ in range(kills):
+            process = self.make(place, start_new_session=True)
+            time.sleep(draw.uniform(0, 0.25))
+            os.killpg(process.pid, signal.SIGKILL)
+            process.communicate(timeout=60)
+
+    def test_results_are_those_of_the_single_run_whatever_was_killed(self):
+        seed = random.randrange(1 << 30)
+        draw = random.Random(seed)
+        for name in JOBS:
+            with self.subTest(name, seed=seed):
+                place = self.plan(name, "--parts", "4")
+                self.kill_some(place, 4, draw)
+                self.assertEqual(self.made(place), "")
+                want = self.single(name)
+                self.assert_same(place / want.name, want)
+                left = [path.name for path in place.iterdir() if path.name.startswith(".")]
+                self.assertEqual(left, [])
+
+    def test_a_second_run_does_nothing_and_what_has_gone_is_made_alone(self):
+        place = self.plan("calc", "--parts", "4")
+        self.made(place)
+        times = {path: path.stat().st_mtime_ns for path in place.iterdir()}
+        self.made(place)
+        self.assertEqual({path: path.stat().st_mtime_ns for path in place.iterdir()}, times)
+        gone = place / "part-0002.tif"
+        gone.unlink()
+        self.made(place)
+        changed = sorted(path.name for path in place.glob("*.tif") if path.stat().st_mtime_ns != times[path])
+        self.assertEqual(changed, [gone.name])
+
+
+@needs_data
+class Runners(PlanTest):
+    def test_each_engine_gets_its_form(self):
+        place = self.plan("calc", "--parts", "12", "--threads", "2")
+        slurm = self.fine("plan", place, "--runner", "slurm")
+        subprocess.run(["sh", "-n"], input=slurm, text=True, check=True)
+        self.assertIn("--array=1-12 --cpus-per-task=2", slurm)
+        snake = self.fine("plan", place, "--runner", "snakemake")
+        self.assertEqual(snake.count("\nrule "), 14)
+        self.assertEqual(self.fine("plan", place, "--runner", "dask"), f"python3 -m vexg.dask '{place}'\n")
+
+    def test_the_script_for_slurm_submits_arrays_that_depend_on_each_other(self):
+        # A program in the place of sbatch runs the array at once.
+        place = self.plan("mosaic", "--parts", "3")
+        programs = self.folder / "bin"
+        programs.mkdir()
+        submit = programs / "sbatch"
+        submit.write_text('#!/bin/sh\necho "$@" >>"$LOG"\ncat >"$LOG.job"\n'
+                          'for word; do case $word in --array=1-*) last=${word#--array=1-};; esac; done\n'
+                          'i=1; while [ $i -le $last ]; do SLURM_ARRAY_TASK_ID=$i sh "$LOG.job" || exit 1; '
+                          'i=$((i + 1)); done\necho "10$last"\n')
+        submit.chmod(0o755)
+        log = self.folder / "log"
+        ended = subprocess.run(["sh"], input=self.fine("plan", place, "--runner", "slurm"), text=True,
+                               capture_output=True, env={**os.environ, "PATH": f"{programs}:{os.environ['PATH']}",
+                                                         "LOG": str(log), "VEXG": str(VEXG)})
+        self.assertEqual((ended.returncode, ended.stdout, ended.stderr), (0, "101\n", ""))
+        first, parts, merge = log.read_text().splitlines()
+        self.assertNotIn("--dependency", first)
+        self.assertIn("--dependency=afterok:101 --array=1-3", parts)
+        self.assertIn("--dependency=afterok:103 --array=1-1", merge)
+        self.assert_same(place / "o.tif", self.single("mosaic"))
+
+
+if __name__ == "__main__":
+    unittest.main()
