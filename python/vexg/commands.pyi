@@ -132,6 +132,7 @@ def BuildRasterPyramidCommand(
     PyramidCanBuild: bool,
     TileDimensions: str,
     Bins: Literal["Told", "Exact"] | None = None,
+    Reduction: Literal["Told", "Average", "Mode"] | None = None,
     server: Server | None = None,
     progress: Progress = False,
 ) -> dict[str, Any]:
@@ -141,8 +142,8 @@ def BuildRasterPyramidCommand(
         URI: URI: the raster
         PyramidType: word: ORVA: a file of the library's own; DRIVER: by the driver of the
             format
-        PyramidResamplingMethod: word: Impl, Nearest, Linear, Cubic or Majority; ORVA always
-            takes every 2^level-th pixel
+        PyramidResamplingMethod: word: Impl, Nearest, Linear, Cubic or Majority; ORVA takes
+            every 2^level-th pixel
         PyramidLevelMin: integer: first level; 0 is a copy
         PyramidLevelMax: integer: last level, up to 31
         PyramidCanBuild: boolean: of the description; not read
@@ -150,6 +151,8 @@ def BuildRasterPyramidCommand(
             more in squares of 256
         Bins: word: of the histogram. Told: each a whole number wide, 256 at most; Exact: 256
             that share the range of the values, or one for each of fewer integers
+        Reduction: word: in place of the resampling method. Told: that; Average: means of the
+            valid pixels below; Mode: the most frequent ones
     """
     ...
 
@@ -724,6 +727,33 @@ def CreateGeometryROIDefCommand(
     Returns:
         URI: URI: the region
         Shapes: integer: how many records it has
+    """
+    ...
+
+class _CreateJoinedRowsRasterCommandOutputs(TypedDict, total=False):
+    URI: str
+    DataType: str
+
+def CreateJoinedRowsRasterCommand(
+    *,
+    SrcURI: str | Raster,
+    Files: str | Sequence[str | PathLike[str]],
+    Lines: ArrayLike,
+    server: Server | None = None,
+    progress: Progress = False,
+) -> _CreateJoinedRowsRasterCommandOutputs:
+    """Shows a raster with its pixels out of files that hold its lines already. A command of this
+    library's own.
+
+    Args:
+        SrcURI: URI: the raster to stand on
+        Files: text list: rasters of the source's samples, bands and pixel type, from the
+            first line to the last
+        Lines: integer array: how many lines each of them has, together those of the source
+
+    Returns:
+        URI: URI: the raster, by which further commands find it
+        DataType: word: its pixel type
     """
     ...
 
@@ -1635,6 +1665,9 @@ def FitRasterHistogramCommand(
     BinCount: int | None = None,
     BinSize: float | None = None,
     Wait: Literal["Told", "Always"] | None = None,
+    Share: ArrayLike | None = None,
+    ShareFile: str | PathLike[str] | None = None,
+    ShareFiles: str | Sequence[str | PathLike[str]] | None = None,
     server: Server | None = None,
     progress: Progress = False,
 ) -> _FitRasterHistogramCommandOutputs:
@@ -1654,6 +1687,12 @@ def FitRasterHistogramCommand(
         BinSize: number: width of a bin, instead of BinCount
         Wait: word: Told: a computation that another command runs over the raster makes this
             one fail, or leaves what it sets without effect; Always: it waits its turn
+        Share: integer array: which share of the work is done, from 0, and of how many; all of
+            it when absent, and with ShareFiles
+        ShareFile: text: the file to make of a share, with Share; nothing else is given or
+            made
+        ShareFiles: text list: the files of all shares, in order: the work is taken out of
+            them
 
     Returns:
         Histograms: text: array of histograms, one for each of the bands: band, sign, bin
@@ -1826,6 +1865,9 @@ def FxComputePixelAttributesCommand(
     Values: str | Sequence[str | PathLike[str]] | None = None,
     MeansFXA: str | PathLike[str] | None = None,
     EntropyFXA: str | PathLike[str] | None = None,
+    Share: ArrayLike | None = None,
+    ShareFile: str | PathLike[str] | None = None,
+    ShareFiles: str | Sequence[str | PathLike[str]] | None = None,
     server: Server | None = None,
     progress: Progress = False,
 ) -> dict[str, Any]:
@@ -1849,6 +1891,12 @@ def FxComputePixelAttributesCommand(
         EntropyFXA: text: the file to create of the mean entropy of windows over the number of
             their values, and of the count; none when absent, and only with exact sums and the
             value texture
+        Share: integer array: which share of the work is done, from 0, and of how many; all of
+            it when absent, and with ShareFiles
+        ShareFile: text: the file to make of a share, with Share; nothing else is given or
+            made
+        ShareFiles: text list: the files of all shares, in order: the work is taken out of
+            them
     """
     ...
 
@@ -2159,6 +2207,9 @@ def GetBasicRasterStatsCommand(
     *,
     URI: str | Raster,
     Wait: Literal["Told", "Always"] | None = None,
+    Share: ArrayLike | None = None,
+    ShareFile: str | PathLike[str] | None = None,
+    ShareFiles: str | Sequence[str | PathLike[str]] | None = None,
     server: Server | None = None,
     progress: Progress = False,
 ) -> _GetBasicRasterStatsCommandOutputs:
@@ -2168,6 +2219,12 @@ def GetBasicRasterStatsCommand(
         URI: URI: the raster
         Wait: word: Told: a computation that another command runs over the raster makes this
             one fail, or leaves what it sets without effect; Always: it waits its turn
+        Share: integer array: which share of the work is done, from 0, and of how many; all of
+            it when absent, and with ShareFiles
+        ShareFile: text: the file to make of a share, with Share; nothing else is given or
+            made
+        ShareFiles: text list: the files of all shares, in order: the work is taken out of
+            them
 
     Returns:
         Min: number array: smallest value of each band; 0 in a band without any
@@ -2198,6 +2255,9 @@ def GetExtendedRasterStatsCommand(
     *,
     URI: str | Raster,
     Wait: Literal["Told", "Always"] | None = None,
+    Share: ArrayLike | None = None,
+    ShareFile: str | PathLike[str] | None = None,
+    ShareFiles: str | Sequence[str | PathLike[str]] | None = None,
     server: Server | None = None,
     progress: Progress = False,
 ) -> _GetExtendedRasterStatsCommandOutputs:
@@ -2207,6 +2267,12 @@ def GetExtendedRasterStatsCommand(
         URI: URI: the raster
         Wait: word: Told: a computation that another command runs over the raster makes this
             one fail, or leaves what it sets without effect; Always: it waits its turn
+        Share: integer array: which share of the work is done, from 0, and of how many; all of
+            it when absent, and with ShareFiles
+        ShareFile: text: the file to make of a share, with Share; nothing else is given or
+            made
+        ShareFiles: text list: the files of all shares, in order: the work is taken out of
+            them
 
     Returns:
         Min: number array: smallest value of each band; 0 in a band without any
@@ -3495,6 +3561,9 @@ def ZonalStatisticsCommand(
     Pixels: Literal["Told", "Center", "Touched"] | None = None,
     ScanRules: Literal["Told", "Steady"] | None = None,
     Coordinates: Literal["Told", "Map", "Pixel"] | None = None,
+    Share: ArrayLike | None = None,
+    ShareFile: str | PathLike[str] | None = None,
+    ShareFiles: str | Sequence[str | PathLike[str]] | None = None,
     server: Server | None = None,
     progress: Progress = False,
 ) -> _ZonalStatisticsCommandOutputs:
@@ -3517,6 +3586,12 @@ def ZonalStatisticsCommand(
         Pixels: word: of zones without weights; see RasterizeCommand
         ScanRules: word: see CreateGeometryROIDefCommand
         Coordinates: word: see CreateGeometryROIDefCommand
+        Share: integer array: which share of the work is done, from 0, and of how many; all of
+            it when absent, and with ShareFiles
+        ShareFile: text: the file to make of a share, with Share; nothing else is given or
+            made
+        ShareFiles: text list: the files of all shares, in order: the work is taken out of
+            them
 
     Returns:
         Zones: integer: how many rows there are
