@@ -132,6 +132,7 @@ def BuildRasterPyramidCommand(
     PyramidCanBuild: bool,
     TileDimensions: str,
     Bins: Literal["Told", "Exact"] | None = None,
+    Reduction: Literal["Told", "Average", "Mode"] | None = None,
     server: Server | None = None,
     progress: Progress = False,
 ) -> dict[str, Any]:
@@ -141,8 +142,8 @@ def BuildRasterPyramidCommand(
         URI: URI: the raster
         PyramidType: word: ORVA: a file of the library's own; DRIVER: by the driver of the
             format
-        PyramidResamplingMethod: word: Impl, Nearest, Linear, Cubic or Majority; ORVA always
-            takes every 2^level-th pixel
+        PyramidResamplingMethod: word: Impl, Nearest, Linear, Cubic or Majority; ORVA takes
+            every 2^level-th pixel
         PyramidLevelMin: integer: first level; 0 is a copy
         PyramidLevelMax: integer: last level, up to 31
         PyramidCanBuild: boolean: of the description; not read
@@ -150,6 +151,8 @@ def BuildRasterPyramidCommand(
             more in squares of 256
         Bins: word: of the histogram. Told: each a whole number wide, 256 at most; Exact: 256
             that share the range of the values, or one for each of fewer integers
+        Reduction: word: in place of the resampling method. Told: that; Average: means of the
+            valid pixels below; Mode: the most frequent ones
     """
     ...
 
