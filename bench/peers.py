@@ -255,7 +255,7 @@ def memory(bench):
                 command = [bench.vexg, "calibrate", "radiance", scene, target, "--gain", "0.5", "--offset", "-3",
                  *PLAIN]
             if verb[0] == "pyramid":
-                command = [bench.vexg, "pyramid", "build", scene, "--levels", "1-5", "-q", "--output",
+                command = [bench.vexg, "pyramid", "build", scene, "--levels", "1-5", "--resampling", "nearest", "-q", "--output",
                            bench.work / "levels.pyr"]
             target.unlink(missing_ok=True)
             peaks.append(bench.once(command)[1])
@@ -272,7 +272,7 @@ def pyramid(bench):
             scene = bench.scene(type_name, layout)
             levels = ["gdaladdo", "-q", "-ro", "-r", "nearest", scene, "2", "4", "8", "16", "32"]
             bench.compare(f"pyramid {type_name} {layout}",
-                          [bench.vexg, "pyramid", "build", scene, "--levels", "1-5", "-q"],
+                          [bench.vexg, "pyramid", "build", scene, "--levels", "1-5", "--resampling", "nearest", "-q"],
                           {"gdaladdo and gdalinfo -stats": [levels, ["gdalinfo", "-stats", scene]],
                            "gdaladdo": levels},
                           {"gdaladdo and gdalinfo -stats": aim, "gdaladdo": 1.0},

@@ -460,7 +460,7 @@ bool NewRaster::IsWhole() const {
       GDALGetRasterCount(dataset.get()) != static_cast<int>(def_.bands) ||
       GDALGetRasterDataType(GDALGetRasterBand(dataset.get(), 1)) !=
           PixelTypeOf(def_.dataType).type) {
-    return Fail("the format can't hold such a raster");
+    return Fail(messages.HasError() ? messages.Text() : "the format can't hold such a raster");
   }
   for (int band = 1; band <= static_cast<int>(def_.bands); ++band) {
     double pixel[2];

@@ -387,6 +387,29 @@ def CopyRasterCommand(
     """
     ...
 
+class _CopyRasterPalettesCommandOutputs(TypedDict, total=False):
+    Return: NDArray[numpy.bool_]
+
+def CopyRasterPalettesCommand(
+    *,
+    SrcURI: str | Raster,
+    DstURI: str | Raster,
+    server: Server | None = None,
+    progress: Progress = False,
+) -> _CopyRasterPalettesCommandOutputs:
+    """Stores the colour tables of all bands of a raster with another one. A command of this
+    library's own.
+
+    Args:
+        SrcURI: URI: the raster that has them
+        DstURI: URI: the raster that gets them
+
+    Returns:
+        Return: boolean array: for each band of the first: it has none, or the other source
+            took it
+    """
+    ...
+
 class _CreateAttributeTableCommandOutputs(TypedDict, total=False):
     Regions: int
 

@@ -259,7 +259,9 @@ bool AsyncOrvaPyramidBuilder<T>::MakeHistogram(const Rasters& rasters) {
     const unsigned bands = level->Bands();
     Array<T> mins{ArrayDims(bands)}, maxes{ArrayDims(bands)};
     for (unsigned band = 0; band < bands; ++band) {
-      const auto stats = level->ComputeBandStats(band, StatsMask::Min | StatsMask::Max, apart);
+      constexpr unsigned kWanted = StatsMask::Min | StatsMask::Max;
+      const auto stats = level->ComputeBandStats(band, kWanted, apart);
+      if ((stats.mask & kWanted) != kWanted && !IsAborted()) return false;  // with the fault set
       mins[band] = stats.min;
       maxes[band] = stats.max;
     }

@@ -82,6 +82,35 @@ class SetRasterPaletteCommand final : public RasterCommand {
 
 const CommandFactoryT<SetRasterPaletteCommand> setFactory(kSet);
 
+const CommandDeclaration kCopy{
+    "CopyRasterPalettesCommand",
+    "Palettes",
+    "Stores the colour tables of all bands of a raster with another one. A command of this "
+    "library's own.",
+    {{"SrcURI", Presence::kRequired, ValueKind::kURI, "the raster that has them"},
+     {"DstURI", Presence::kRequired, ValueKind::kURI, "the raster that gets them"}},
+    {{"Return", ValueKind::kBooleanArray,
+      "for each band of the first: it has none, or the other source took it"}}};
+
+class CopyRasterPalettesCommand final : public RasterCommand {
+  CommandResult Execute() override {
+    if (!CheckInputs()) return Fail();
+    const BasicRasterPtr source = FindRaster("SrcURI");
+    const BasicRasterPtr target = source ? FindRaster("DstURI") : BasicRasterPtr();
+    if (!target) return Fail();
+    if (source->Bands() != target->Bands()) return Fail("the rasters differ in bands");
+    Array<bool> taken{ArrayDims(source->Bands())};
+    for (unsigned band = 0; band < taken.GetCount(); ++band) {
+      const PalettePtr palette = source->HasPalette(band) ? source->Palette(band) : PalettePtr();
+      taken[band] = !palette || target->WritePalette(band, palette);
+    }
+    Write("Return", taken);
+    return Succeed();
+  }
+};
+
+const CommandFactoryT<CopyRasterPalettesCommand> copyFactory(kCopy);
+
 const CommandDeclaration kDelete{
     "DeleteRasterPaletteCommand",
     "Palettes",

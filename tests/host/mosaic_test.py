@@ -89,7 +89,7 @@ class MosaicTest(FolderTest):
         # Statistics, pyramids and pictures are those of any raster; a mosaic of mosaics is as well.
         band = json.loads(self.vexg("stats", mosaic, "--json"))["bands"][1]
         self.assertAlmostEqual(band["mean"], expected[1][(expected != 0).any(0)].mean(), 6)
-        self.vexg("pyramid", "build", mosaic, "--levels", "1-2")
+        self.vexg("pyramid", "build", mosaic, "--levels", "1-2", "--resampling", "nearest")
         level = self.whole(mosaic, "--level", "1")
         np.testing.assert_array_equal(level, expected[:, ::2, ::2][:, :level.shape[1], :level.shape[2]])
         nested = self.path("N.vmosaic")
@@ -171,7 +171,7 @@ class MosaicTest(FolderTest):
         scenes = [self.scene("a.tif", ground, no_data=-1),
                   self.scene("b.tif", ground * np.float32(2) + 1, x=128, no_data=-1)]
         for scene in scenes:
-            self.vexg("pyramid", "build", scene, "--levels", "1-3")
+            self.vexg("pyramid", "build", scene, "--levels", "1-3", "--resampling", "nearest")
         mosaic = self.path("M.vmosaic")
         self.vexg("mosaic", "create", mosaic, *scenes, "--match-by", "scenes")
         before = self.whole(mosaic)

@@ -99,6 +99,11 @@ JobDraft RasterVerb::MakeDraft(const std::string& file, const FillValues& noData
   AddQuery(draft, kShown, shown);
   AddDetailsQuery(draft, kShown, shown);
   AddToCreate(draft, AddCreate(draft, PlaceAt(file), shown, GetKeptDetails(), GetNoData(noData)));
+  if (KeepsPalettes()) {
+    JobWriterCommand& palettes = draft.Step("palettes", "CopyRasterPalettesCommand");
+    palettes.AddInput("SrcURI", shown);
+    palettes.AddInput("DstURI", String("$target"));
+  }
   AddMaking(draft, {shown, file, noData});
   AddCloseTarget(draft);
   AddLastQuestions(draft, shown);
@@ -179,6 +184,11 @@ void RasterVerb::Make(JobSession& session, const Outputs& outputs) {
                                  return ReadWanted(results);
                                });
   Compare(raster, losses);
+  const RasterInfo& put = raster.put.info;
+  for (unsigned band = 0; KeepsPalettes() && band < put.bands; ++band) {
+    if (!put.hasPalette[band] || raster.made.info.hasPalette[band]) continue;
+    losses.Add(fmt::format("the palette of band {}", band));
+  }
   if (PlaceAt({}).LosesValues()) losses.Add("the values of pixels exactly");
   session.CheckInterrupt();
   losses.Settle();

@@ -74,6 +74,8 @@ class RasterVerb : public FileVerb {
   virtual void AddLastQuestions(JobDraft& /*draft*/, const String& /*shown*/) const {}
   /// Reads from the results of the job what the file shall hold.
   virtual RasterContents ReadWanted(const JobResults& results) const;
+  /// Whether the bands of the file mean what those that are shown do, and get their palettes.
+  virtual bool KeepsPalettes() const { return false; }
   /// Adds what the format did not keep to the losses.
   virtual void Compare(MadeRaster& raster, Losses& losses) const { CompareKept(raster, losses); }
 

@@ -40,10 +40,12 @@ class StackVerb final : public RasterVerb {
   RasterInfo PlanRaster(JobSession& /*session*/, const JobResults& opened,
                         const RasterInfo& source) override {
     types_ = {source.dataType};
+    haveCodes_ = HoldsCodes(source, ParseBands("", source));
     RasterInfo all = source;
     for (std::size_t i = 0; i < further_.size(); ++i) {
       const RasterInfo next = ReadInfo(opened, QueryOf(i));
       types_.push_back(next.dataType);
+      haveCodes_ = haveCodes_ || HoldsCodes(next, ParseBands("", next));
       all.bands += next.bands;
       if (conversion_.type.empty() && next.dataType != source.dataType) {
         throw HostError(kExitFailed,
@@ -79,6 +81,9 @@ class StackVerb final : public RasterVerb {
     chain.Take("bands");
   }
 
+  bool KeepsPalettes() const override { return true; }
+  std::string GetOverviewMethod() const override { return haveCodes_ ? "Nearest" : "Average"; }
+
   /// Rasters of several files have no blocks in common.
   bool CopiesBlocksOfSource() const override { return false; }
 
@@ -91,6 +96,7 @@ class StackVerb final : public RasterVerb {
 
   std::vector<unsigned> types_;  // of the rasters
   Array<unsigned> bands_;
+  bool haveCodes_ = false;  // some of them
 };
 
 const VerbRegistration registration("stack", "Puts the bands of several rasters into one file",

@@ -162,6 +162,7 @@ class WarpVerb final : public RasterVerb {
                         const RasterInfo& source) override {
     CheckNoData(source);
     bands_ = ParseBands(bandsText_, source);
+    hasCodes_ = HoldsCodes(source, bands_);
     grid_ = FindGrid(session, source);
     RasterInfo planned = source;
     planned.samples = grid_->Samples();
@@ -224,6 +225,10 @@ class WarpVerb final : public RasterVerb {
   }
 
   const char* GetKeptDetails() const override { return "Bands"; }
+  bool KeepsPalettes() const override { return resampling_ == "nearest" || resampling_ == "mode"; }
+  std::string GetOverviewMethod() const override {
+    return hasCodes_ && KeepsPalettes() ? "Nearest" : "Average";
+  }
   bool MayChooseNoData() const override { return !noData_; }
   bool FillsNoData(const FillValues& noData) const override {
     return noData_.has_value() || RasterVerb::FillsNoData(noData);
@@ -240,6 +245,7 @@ class WarpVerb final : public RasterVerb {
   std::optional<double> noData_;
 
   Array<unsigned> bands_;
+  bool hasCodes_ = false;
   GeoRefPtr grid_;
 };
 
