@@ -10,9 +10,6 @@
 namespace lumo {
 namespace {
 
-/// Segments that are merged together at least, where memory allows it.
-constexpr std::size_t kBatch = 1U << 18U;
-
 /// Calls `work(i)` for the numbers below `count`, a part of them on each thread.
 template <typename Work>
 void ForEach(std::size_t count, const Work& work) {
@@ -170,7 +167,7 @@ std::uint64_t LocalMerge::CountBytes() const {
 /// Merges when as many segments have come as pays, or when memory ends. What is left waits for
 /// the next strip; so the work on all waiting ones is never more than a part of all.
 bool LocalMerge::MergeIfDue(const AbortFlag* abort) {
-  const std::size_t batch = std::max(kBatch, live_ / 2);
+  const std::size_t batch = std::max(rules_.batch, live_ / 2);
   if (fresh_ < batch && CountBytes() <= rules_.memory / 2) return true;
   if (!Merge(abort)) return false;
   const std::uint64_t bytes = CountBytes();

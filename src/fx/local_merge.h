@@ -40,12 +40,14 @@ class VEXG_EXPORT LocalMerge {
  public:
   /// The rounds where nobody says how many.
   static constexpr unsigned kRounds = 12;
+  static constexpr std::size_t kBatch = 1U << 18U;
 
   struct Rules {
     double threshold = 0;
     unsigned rounds = kRounds;
     GrowthLimits limits;
     std::uint64_t memory = 0xFFFFFFFFFFFFFFFF;  ///< bytes that it may take, the forest excluded
+    std::size_t batch = kBatch;  ///< segments that come between two merges at least, for speed
   };
 
   /// Forgets everything. @param forest  has all labels, each by itself; it outlives the merge.

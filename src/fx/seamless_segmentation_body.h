@@ -16,6 +16,7 @@
 #include "fx/tree_cut.h"
 #include "fx/usable_pixels.h"
 #include "fx/watershed_task.h"
+#include "platform/system_memory.h"
 #include "raster/raster_def.h"
 #include "tasks/thread_limit.h"
 
@@ -113,6 +114,7 @@ SeamlessSegmentation<T>::SeamlessSegmentation(const RasterPtr<T>& segment,
 
 template <typename T>
 IPC SeamlessSegmentation<T>::NextPass() const {
+  platform::ReturnFreeMemory();  // each pass has large arrays of its own
   return IPC(ipc_.abort,
              ProgressReportPtr(new ScaledProgressReport(ipc_.progress, detail::kSeamlessPasses)));
 }
@@ -419,6 +421,7 @@ bool SeamlessSegmentation<T>::Write() {
     if (roots_[label] != label) forest_.Join(label, roots_[label]);
   }
   roots_ = {};
+  platform::ReturnFreeMemory();
   SegmentNumbers segments(watershed_, forest_, request_.bordersOnly);
   TilePool<std::int32_t> pool;
   process.Add("Labels", StageOrder::kSeveralAtOnce, [&](ArgList& token, const AbortFlag*) {

@@ -24,9 +24,9 @@ namespace lumo {
 ///
 /// Cost: a byte a pixel in a file without a name, read and written twice and read once for each
 /// labelling; in memory 9 bytes for a pixel of each strip's width, 24 a minimum that strips
-/// meet in, a few bytes a pixel of the strips that are worked on, and where minima are ranked 20 bytes
-/// for each of them.
-/// Threads: AddStrip and Label may be called for several strips at once; Connect works on all
+/// meet in, a few bytes a pixel of the strips that are worked on, and where minima are ranked 20
+/// bytes for each of them. Threads: AddStrip and Label may be called for several strips at once;
+/// Connect works on all
 ///          threads. Failure: false, with the fault set.
 ///
 ///     SeamlessWatershed watershed;

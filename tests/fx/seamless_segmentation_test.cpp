@@ -172,25 +172,53 @@ TEST(SeamlessSegmentation, GivesTheSegmentsOfOneTile) {
   CheckScene<float>(20, 3, 1);
 }
 
-TEST(SeamlessSegmentation, LocalOrderDependsOnNoStripsOrThreads) {
-  const auto scene = MakeScene<float>(300, 260, 2, 77);
+/// Segments in rounds; empty when that fails.
+template <typename T>
+Labels SegmentInRounds(const MemoryPtr<T>& scene, double mergeValue, unsigned stripLines,
+                       std::uint64_t memory) {
   SegmentRequest request;
   request.stretch = {0, 800, 0, 800};
   request.limits = ClipLimits::Of(0, 800, 40, 800);
-  request.mergeValue = 5000;
+  request.mergeValue = mergeValue;
   request.order = MergeOrder::kLocal;
-  Labels first;
-  for (const unsigned stripLines : {1U, 7U, 64U, 260U}) {
-    for (const unsigned threads : {1U, 2U, 4U}) {
+  request.memory = memory;
+  request.tileBytes =
+      static_cast<unsigned>(stripLines * scene->Samples() * scene->Bands() * sizeof(T));
+  const MemoryPtr<std::int32_t> labels(
+      new MemoryTestRaster<std::int32_t>(scene->Samples(), scene->Lines(), 1));
+  return SeamlessSegmentation<T>(scene, scene, labels, request).Run() ? labels->pixels : Labels();
+}
+
+/// Segments of rounds are the same for all strips, threads and limits of memory, or there are none.
+template <typename T>
+void CheckRounds(unsigned samples, unsigned lines, double mergeValue) {
+  const auto scene = MakeScene<T>(samples, lines, 2, 77);
+  const Labels wanted = SegmentInRounds(scene, mergeValue, lines, SegmentRequest::kNoLimit);
+  ASSERT_FALSE(wanted.empty());
+  unsigned threads = 1;
+  for (const unsigned stripLines : {1U, 7U, 64U}) {
+    for (const std::uint64_t memory : {SegmentRequest::kNoLimit, std::uint64_t{4'000'000}}) {
       const ThreadLimit limit(threads);
-      const MemoryPtr<std::int32_t> labels(new MemoryTestRaster<std::int32_t>(300, 260, 1));
-      request.tileBytes = stripLines * 300 * 2 * sizeof(float);
-      ASSERT_TRUE(SeamlessSegmentation<float>(scene, scene, labels, request).Run());
-      if (first.empty()) first = labels->pixels;
-      EXPECT_EQ(labels->pixels, first) << stripLines << " lines, " << threads << " threads";
+      threads = threads == 4 ? 1 : threads * 2;
+      EXPECT_EQ(SegmentInRounds(scene, mergeValue, stripLines, memory), wanted)
+          << samples << " by " << lines << ", merging to " << mergeValue << ", strips of "
+          << stripLines << ", memory " << memory;
     }
   }
-  EXPECT_LT(*std::max_element(first.begin(), first.end()), 5000);
+}
+
+TEST(SeamlessSegmentation, LocalOrderDependsOnNoStripsThreadsOrMemory) {
+  CheckRounds<std::uint8_t>(150, 260, 50);
+  CheckRounds<std::uint16_t>(150, 260, 5000);
+  CheckRounds<float>(150, 260, 5000);
+  CheckRounds<float>(90, 300, 1e9);
+  CheckRounds<std::uint8_t>(1, 300, 5000);
+}
+
+TEST(SeamlessSegmentation, LocalOrderSaysThatItsMemoryEnds) {
+  const auto scene = MakeScene<std::uint8_t>(200, 200, 1, 77);
+  EXPECT_TRUE(SegmentInRounds(scene, 5000, 8, 10'000).empty());
+  EXPECT_THAT(TakeFault().ToUTF8(), testing::HasSubstr("bytes of memory, and may take 10000"));
 }
 
 TEST(SeamlessSegmentation, SaysWhatMergingNeedsBeforeAnythingIsWritten) {
@@ -206,9 +234,6 @@ TEST(SeamlessSegmentation, SaysWhatMergingNeedsBeforeAnythingIsWritten) {
   EXPECT_EQ(labels->pixels, Labels(3600, 0));
   // Told bounds: 180 bytes for a segment of 4 bands with its pairs.
   EXPECT_LE(MemoryOfMerging(1000, 4, request), 180'000U);
-  SegmentRequest local = request;
-  local.order = MergeOrder::kLocal;
-  EXPECT_LE(MemoryOfMerging(1000, 4, local), 180'000U);
   request.mergeValue = 0;  // no graph is made
   EXPECT_TRUE(SeamlessSegmentation<std::uint8_t>(scene, scene, labels, request).Run());
 }
