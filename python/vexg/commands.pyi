@@ -727,6 +727,33 @@ def CreateGeometryROIDefCommand(
     """
     ...
 
+class _CreateJoinedRowsRasterCommandOutputs(TypedDict, total=False):
+    URI: str
+    DataType: str
+
+def CreateJoinedRowsRasterCommand(
+    *,
+    SrcURI: str | Raster,
+    Files: str | Sequence[str | PathLike[str]],
+    Lines: ArrayLike,
+    server: Server | None = None,
+    progress: Progress = False,
+) -> _CreateJoinedRowsRasterCommandOutputs:
+    """Shows a raster with its pixels out of files that hold its lines already. A command of this
+    library's own.
+
+    Args:
+        SrcURI: URI: the raster to stand on
+        Files: text list: rasters of the source's samples, bands and pixel type, from the
+            first line to the last
+        Lines: integer array: how many lines each of them has, together those of the source
+
+    Returns:
+        URI: URI: the raster, by which further commands find it
+        DataType: word: its pixel type
+    """
+    ...
+
 class _CreateLabelsRasterCommandOutputs(TypedDict, total=False):
     URI: str
     DataType: str
@@ -1613,6 +1640,9 @@ def FitRasterHistogramCommand(
     BinCount: int | None = None,
     BinSize: float | None = None,
     Wait: Literal["Told", "Always"] | None = None,
+    Share: ArrayLike | None = None,
+    ShareFile: str | PathLike[str] | None = None,
+    ShareFiles: str | Sequence[str | PathLike[str]] | None = None,
     server: Server | None = None,
     progress: Progress = False,
 ) -> _FitRasterHistogramCommandOutputs:
@@ -1632,6 +1662,12 @@ def FitRasterHistogramCommand(
         BinSize: number: width of a bin, instead of BinCount
         Wait: word: Told: a computation that another command runs over the raster makes this
             one fail, or leaves what it sets without effect; Always: it waits its turn
+        Share: integer array: which share of the work is done, from 0, and of how many; all of
+            it when absent, and with ShareFiles
+        ShareFile: text: the file to make of a share, with Share; nothing else is given or
+            made
+        ShareFiles: text list: the files of all shares, in order: the work is taken out of
+            them
 
     Returns:
         Histograms: text: array of histograms, one for each of the bands: band, sign, bin
@@ -1804,6 +1840,9 @@ def FxComputePixelAttributesCommand(
     Values: str | Sequence[str | PathLike[str]] | None = None,
     MeansFXA: str | PathLike[str] | None = None,
     EntropyFXA: str | PathLike[str] | None = None,
+    Share: ArrayLike | None = None,
+    ShareFile: str | PathLike[str] | None = None,
+    ShareFiles: str | Sequence[str | PathLike[str]] | None = None,
     server: Server | None = None,
     progress: Progress = False,
 ) -> dict[str, Any]:
@@ -1827,6 +1866,12 @@ def FxComputePixelAttributesCommand(
         EntropyFXA: text: the file to create of the mean entropy of windows over the number of
             their values, and of the count; none when absent, and only with exact sums and the
             value texture
+        Share: integer array: which share of the work is done, from 0, and of how many; all of
+            it when absent, and with ShareFiles
+        ShareFile: text: the file to make of a share, with Share; nothing else is given or
+            made
+        ShareFiles: text list: the files of all shares, in order: the work is taken out of
+            them
     """
     ...
 
@@ -2137,6 +2182,9 @@ def GetBasicRasterStatsCommand(
     *,
     URI: str | Raster,
     Wait: Literal["Told", "Always"] | None = None,
+    Share: ArrayLike | None = None,
+    ShareFile: str | PathLike[str] | None = None,
+    ShareFiles: str | Sequence[str | PathLike[str]] | None = None,
     server: Server | None = None,
     progress: Progress = False,
 ) -> _GetBasicRasterStatsCommandOutputs:
@@ -2146,6 +2194,12 @@ def GetBasicRasterStatsCommand(
         URI: URI: the raster
         Wait: word: Told: a computation that another command runs over the raster makes this
             one fail, or leaves what it sets without effect; Always: it waits its turn
+        Share: integer array: which share of the work is done, from 0, and of how many; all of
+            it when absent, and with ShareFiles
+        ShareFile: text: the file to make of a share, with Share; nothing else is given or
+            made
+        ShareFiles: text list: the files of all shares, in order: the work is taken out of
+            them
 
     Returns:
         Min: number array: smallest value of each band; 0 in a band without any
@@ -2176,6 +2230,9 @@ def GetExtendedRasterStatsCommand(
     *,
     URI: str | Raster,
     Wait: Literal["Told", "Always"] | None = None,
+    Share: ArrayLike | None = None,
+    ShareFile: str | PathLike[str] | None = None,
+    ShareFiles: str | Sequence[str | PathLike[str]] | None = None,
     server: Server | None = None,
     progress: Progress = False,
 ) -> _GetExtendedRasterStatsCommandOutputs:
@@ -2185,6 +2242,12 @@ def GetExtendedRasterStatsCommand(
         URI: URI: the raster
         Wait: word: Told: a computation that another command runs over the raster makes this
             one fail, or leaves what it sets without effect; Always: it waits its turn
+        Share: integer array: which share of the work is done, from 0, and of how many; all of
+            it when absent, and with ShareFiles
+        ShareFile: text: the file to make of a share, with Share; nothing else is given or
+            made
+        ShareFiles: text list: the files of all shares, in order: the work is taken out of
+            them
 
     Returns:
         Min: number array: smallest value of each band; 0 in a band without any
@@ -3473,6 +3536,9 @@ def ZonalStatisticsCommand(
     Pixels: Literal["Told", "Center", "Touched"] | None = None,
     ScanRules: Literal["Told", "Steady"] | None = None,
     Coordinates: Literal["Told", "Map", "Pixel"] | None = None,
+    Share: ArrayLike | None = None,
+    ShareFile: str | PathLike[str] | None = None,
+    ShareFiles: str | Sequence[str | PathLike[str]] | None = None,
     server: Server | None = None,
     progress: Progress = False,
 ) -> _ZonalStatisticsCommandOutputs:
@@ -3495,6 +3561,12 @@ def ZonalStatisticsCommand(
         Pixels: word: of zones without weights; see RasterizeCommand
         ScanRules: word: see CreateGeometryROIDefCommand
         Coordinates: word: see CreateGeometryROIDefCommand
+        Share: integer array: which share of the work is done, from 0, and of how many; all of
+            it when absent, and with ShareFiles
+        ShareFile: text: the file to make of a share, with Share; nothing else is given or
+            made
+        ShareFiles: text list: the files of all shares, in order: the work is taken out of
+            them
 
     Returns:
         Zones: integer: how many rows there are
