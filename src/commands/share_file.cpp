@@ -13,7 +13,7 @@ namespace {
 
 constexpr std::array<char, 8> kMagic{'S', 'H', 'A', 'R', 'E', '0', '1', '\n'};
 
-/// What stands in front of the numbers.
+/// The header in front of the numbers.
 struct ShareHeader {
   std::array<char, 8> magic = kMagic;
   std::uint64_t checksum = 0;  // of the numbers

@@ -365,7 +365,7 @@ bool SumTiles(const RasterPtr<T>& image, const RasterPtr<L>& labels, const Label
   const RasterIteratorPtr<T> imageTiles(new RasterIterator<T>(image, tiles));
   const ShareScope* const shares = ShareScope::Current();
   const Share share = shares != nullptr ? shares->GetShare() : Share();
-  std::vector<BlockPlace> places;
+  std::vector<TilePlace> places;
   for (auto row = share.Begin(imageTiles->Rows()); row < share.End(imageTiles->Rows()); ++row) {
     places.push_back({0, static_cast<unsigned>(row)});
   }

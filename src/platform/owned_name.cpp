@@ -58,8 +58,7 @@ struct Owner {
     std::string machine = FirstLine("/etc/machine-id");
     machine += '\n';
     machine += FirstLine("/proc/sys/kernel/hostname");
-    return {Digest(machine),
-            Digest(FirstLine("/proc/sys/kernel/random/boot_id")), process,
+    return {Digest(machine), Digest(FirstLine("/proc/sys/kernel/random/boot_id")), process,
             StartOf(process).value_or("0")};
   }
 

@@ -8,7 +8,7 @@
 namespace lumo {
 
 /// Names a block of the grid of an iterator.
-struct BlockPlace {
+struct TilePlace {
   unsigned column = 0;
   unsigned row = 0;
 };
@@ -50,11 +50,11 @@ class ChosenReadTask final : public SequentialTask {
 class ChosenBlocks final : public TileProcess<> {
  public:
   /// @param places  one at least.
-  ChosenBlocks(const char* name, const std::vector<BlockPlace>& places, const IPC& ipc)
+  ChosenBlocks(const char* name, const std::vector<TilePlace>& places, const IPC& ipc)
       : TileProcess<>(name, ipc),
         places_(new Array<unsigned>(ArrayDims(static_cast<unsigned>(2 * places.size())))) {
     unsigned at = 0;
-    for (const BlockPlace& place : places) {
+    for (const TilePlace& place : places) {
       (*places_)[at++] = place.column;
       (*places_)[at++] = place.row;
     }

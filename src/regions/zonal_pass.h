@@ -82,7 +82,7 @@ class VEXG_EXPORT ZonalPass {
   std::vector<std::uint32_t> firstBlocks_;    // for each zone
   std::vector<bool> isLeftOut_;               // zones of other shares; empty without
   std::vector<std::uint32_t> zonesOfShare_;
-  std::vector<BlockPlace> blocks_;  // that the zones of a share touch
+  std::vector<TilePlace> blocks_;  // that the zones of a share touch
   std::vector<double> figures_;
 };
 

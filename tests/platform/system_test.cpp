@@ -13,6 +13,7 @@
 #include "platform/process_watch.h"
 #include "platform/shared_memory.h"
 #include "platform/temporary_file.h"
+#include "support/temporary_directory.h"
 
 namespace lumo::platform {
 namespace {
@@ -108,6 +109,31 @@ TEST(ProcessWatch, TellsTheEndOfAnotherProcess) {
   waitpid(child, nullptr, 0);
   const ProcessWatch late(child, [&] { ++told; });  // of one that has ended already
   EXPECT_TRUE(until(2));
+}
+
+TEST(TemporaryFile, OfAProcessThatHasEndedIsAbandonedBeforeItsParentNotices) {
+  const test::TemporaryDirectory directory;
+  const std::string path = (directory.Path() / "scene.tif").string();
+  int ends[2];
+  ASSERT_EQ(pipe(ends), 0);
+  const pid_t child = fork();
+  if (child == 0) {
+    mkdir(TemporaryFolderBeside(path).c_str(), 0700);
+    [[maybe_unused]] const auto told = write(ends[1], "m", 1);
+    pause();
+    _exit(0);
+  }
+  char told = 0;
+  ASSERT_EQ(read(ends[0], &told, 1), 1);
+  EXPECT_TRUE(FindAbandonedFolders(path).empty());
+  kill(child, SIGKILL);
+  siginfo_t ended;
+  ASSERT_EQ(waitid(P_PID, static_cast<id_t>(child), &ended, WEXITED | WNOWAIT), 0);
+  EXPECT_EQ(FindAbandonedFolders(path).size(), 1U);
+  waitpid(child, nullptr, 0);
+  EXPECT_EQ(FindAbandonedFolders(path).size(), 1U);
+  close(ends[0]);
+  close(ends[1]);
 }
 
 TEST(TemporaryFile, IsNeverNamedToAUser) {

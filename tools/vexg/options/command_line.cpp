@@ -198,7 +198,7 @@ Strings MoveWordsOfVerb(const Strings& arguments) {
     }
     const bool isHelp = !hasVerb && (argument == "--help" || argument == "-h");
     const bool isVerb = !hasVerb && !argument.starts_with('-');
-    if (isVerb) inner = FindVerb(argument);
+    if (isVerb && !TakesVerb(argument)) inner = FindVerb(argument);
     hasVerb = hasVerb || isVerb;
     (isVerb || isHelp || option != nullptr ? own : words).push_back(argument);
     const bool hasValue = option != nullptr && option->type != OptionType::kFlag;

@@ -243,8 +243,8 @@ class Cutter {
     JobDraft draft;
     const std::string variable = *At(cut.at).Find(cut.division->source);
     std::vector<std::string> opened;
-    // What comes first is not done yet: the files that are opened are made aside, where that is
-    // what it does.
+    // The commands that come first have not run yet: those that make the files which are opened
+    // run aside.
     const Scratch scratch(FirstFiles());
     std::set<std::size_t> steps;
     for (std::size_t at = 0; at < firstEnd_; ++at) {

@@ -29,7 +29,7 @@ struct PlannedDocument {
   std::string GetResultName() const;
 };
 
-/// What `vexg plan` has made: documents, in an order in which they may run.
+/// The documents that `vexg plan` has made, in an order in which they may run.
 struct Manifest {
   std::string folder;  ///< in which the documents run
   std::vector<PlannedDocument> documents;

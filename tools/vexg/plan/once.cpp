@@ -47,7 +47,7 @@ bool IsAsTold(const Json& entry) {
          found.time == entry.value("time", std::int64_t{0});
 }
 
-/// What a run has left in its result; null for none that can be read.
+/// The result that a run has left; null for none that can be read.
 Json ReadResult(const std::string& path) {
   std::ifstream in(path, std::ios::binary);
   if (!in) return {};
@@ -140,8 +140,8 @@ class OnceRun {
                                     " isn't done, which comes first; nothing was run");
   }
 
-  /// What was done before counts as new for programs that go by the times of files. What a run that
-  /// was killed at its very end has left goes away.
+  /// A result counts as new from now on for programs that go by the times of files. The remains of
+  /// a run that was killed at its very end go away.
   int SayDone() const {
     for (const std::string& file : FindFiles(commands_.commands).made) {
       const OutputFile cleaned(file, {.overwrite = true});

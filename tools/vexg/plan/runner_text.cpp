@@ -110,7 +110,10 @@ std::string SlurmText(const Manifest& manifest, const std::string& folder) {
         "\njob=$(sbatch --parsable $SBATCH_OPTIONS $after --array=1-{} --cpus-per-task={} "
         "--mem={}M \\\n  --requeue --job-name=vexg <<END\n#!/bin/sh\n"
         "set -- {}\nshift \\$((SLURM_ARRAY_TASK_ID - 1))\n"
-        "LUMO_THREADS_HINT={} exec \"$VEXG\" run --once -q \"\\$1\"\nEND\n)\n"
+        "# A program that a signal has ended is started again, some times.\ntry=1\n"
+        "until LUMO_THREADS_HINT={} \"$VEXG\" run --once -q \"\\$1\"; do\n  code=\\$?\n"
+        "  [ \\$code -gt 128 ] && [ \\$try -lt 5 ] || exit \\$code\n  try=\\$((try + "
+        "1))\ndone\nEND\n)\n"
         "after=\"--dependency=afterok:${{job%%;*}}\"\n",
         stage.size(), threads, memory, names.substr(1), threads);
   }
