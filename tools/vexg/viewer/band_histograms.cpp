@@ -20,7 +20,8 @@ Json CountBands(const ViewedRaster& raster, const std::vector<std::uint32_t>& ba
   raster.AddTo(chain, level);
   AddCounting(draft, chain.GetTop(), counted, raster.Code(), {});
   chain.Close();
-  return {{"level", level}, {"bands", AsJson(ReadBins(RunDraft(draft), raster.Code()))}};
+  return {{"level", level},
+          {"bands", AsJson(ReadBins(raster.GetDoor().Run(draft), raster.Code()))}};
 }
 
 }  // namespace lumo::host

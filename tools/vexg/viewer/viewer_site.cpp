@@ -129,7 +129,10 @@ http::Answer ViewerSite::Route(const http::Request& request) {
   const bool isPost = request.method == "POST";
   if (parts.size() == 3 && !isPost) {
     if (what == "scene") return AsAnswer(scene_.Describe());
-    if (what == "alive") return AsAnswer({{"alive", true}});
+    if (what == "alive") {
+      scene_.Check();
+      return AsAnswer({{"alive", true}});
+    }
     if (what == "pyramid") return AsAnswer(scene_.TellPyramid());
     if (what == "pixel") {
       return AsAnswer(scene_.ReadPixel(WholeOf(request.Query("x")), WholeOf(request.Query("y")),

@@ -16,6 +16,7 @@ import {texts} from './texts.js';
 import {makeTools, showHelp, toggleDark} from './tools.js';
 
 const kAliveMs = 20000;
+const kSilentMs = 15000;
 
 function say(text, isFault = false) {
   const notice = document.getElementById('notice');
@@ -24,7 +25,7 @@ function say(text, isFault = false) {
 }
 
 function onFault(fault) {
-  say(fault.status === 0 ? texts.ended : fault.status === 403 ? texts.refused : fault.message, true);
+  say(fault.status === 403 ? texts.refused : fault.message, true);
 }
 
 function makeMap(raster) {
@@ -50,7 +51,7 @@ function makeLayers(scene, map) {
     list.push(layer);
     if (raster.role !== 'labels') map.addLayer(layer.layer);
     if (raster.role === 'labels') layer.layer.setZIndex(10);
-    const canBuild = !raster.hasLevels && raster.levels > 2 && !raster.isTree && number === 0;
+    const canBuild = !raster.hasLevels && raster.levels > 2 && raster.isFile && number === 0;
     return {name: raster.name, layer: layer.layer, number, canBuild};
   });
   return {...made, entries};
@@ -163,7 +164,7 @@ async function start() {
     ...images.filter(({style}) => style.mode === 'palette').map((image) => legendPanel({
       legend: image.raster.legend, hidden: image.style.hidden, refresh: () => image.refresh()})),
     ...classes.map(legendPanel), ...segments.map((layer) => layer.makePanel()));
-  setInterval(() => get('alive').catch(onFault), kAliveMs);
+  setInterval(() => get('alive', {signal: AbortSignal.timeout(kSilentMs)}).catch(onFault), kAliveMs);
   window.vexgView = {map, scene, images, classes, segments, region, readout, swipe};
   document.documentElement.dataset.ready = 'true';
 }

@@ -6,6 +6,7 @@ export const texts = {
   noKey: 'This address has no key. Open the whole address that vexg view has printed.',
   refused: 'The viewer does not know this key. Open the address that vexg view has printed last.',
   ended: 'The viewer has ended. Start vexg view again to go on.',
+  silent: 'The viewer does not answer.',
   working: 'Working…',
 
   fit: 'Whole raster',
