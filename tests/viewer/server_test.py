@@ -2,6 +2,7 @@
 
 import array
 import json
+import math
 import os
 import socket
 import struct
@@ -113,6 +114,39 @@ class Answers(FolderTest):
                 self.assertEqual(body, want + bytes(len(want)))
             status, headers, body = viewer.ask("/api/tile/0/0/0/0?bands=5&edge=1")
             self.assertEqual(headers["X-Vexg-Size"], "257 257")
+
+    def picture(self, viewer, query):
+        """The red, green, blue and alpha of the pixels of a picture of a tile."""
+        status, headers, body = viewer.ask(f"/api/picture/{query}")
+        self.assertEqual((status, headers.get("Content-Type")), (200, "image/png"), query)
+        file = self.folder / "tile.png"
+        file.write_bytes(body)
+        pixels = gdal_pixels(file)
+        return [tuple(pixels[4 * i:4 * i + 4]) for i in range(len(pixels) // 4)]
+
+    def test_pictures_of_tiles_are_stretched_as_they_are_asked_for(self):
+        curves = {"linear": lambda at: at, "sqrt": math.sqrt, "gamma&gamma=2.5": lambda at: at ** 0.4,
+                  "log": lambda at: math.log1p(99 * at) / math.log(100)}
+        red, green, blue = (gdal_pixels(SCENE, "-b", str(band), "-srcwin", "256", "256", "93", "96") for band in (4, 1, 2))
+        bright = lambda value, low, high, curve: curve(min(max((value - low) / (high - low), 0), 1)) * 255  # noqa: E731
+        with Viewer(SCENE) as viewer:
+            for name, curve in curves.items():
+                found = self.picture(viewer, f"0/0/1/1?bands=3,0,1&ends=20,90,40.5,120,30,77&curve={name}")
+                for color, values in zip(found, zip(red, green, blue, strict=True), strict=True):
+                    for shown, value, low, high in zip(color, values, (20, 40.5, 30), (90, 120, 77)):
+                        self.assertLessEqual(abs(shown - bright(value, low, high, curve)), 0.5 + 1e-9, name)
+                    self.assertEqual(color[3], 255)
+            everything = sorted(gdal_pixels(SCENE, "-b", "4"))
+            low, high = (everything[int(share * len(everything))] for share in (0.05, 0.95))
+            for color, value in zip(self.picture(viewer, "0/0/1/1?bands=3&cut=5"), red, strict=True):
+                self.assertLessEqual(abs(color[0] - bright(value, low, high, curves["linear"])), 0.5 + 1e-9)
+                self.assertEqual(color, (color[0],) * 3 + (255,))
+            for wrong in ("bands=0,1", "bands=0&ends=1", "bands=0&ends=2,1", "bands=0&ends=nan,1", "bands=0&curve=cubic",
+                          "bands=0&gamma=0", "bands=0&cut=50", "bands=9", ""):
+                self.assertEqual(viewer.ask(f"/api/picture/0/0/0/0?{wrong}")[0], 404, wrong)
+        with Viewer(DATA / "RGB.byte.tif") as viewer:
+            first = gdal_pixels(DATA / "RGB.byte.tif", "-b", "1", "-srcwin", "0", "0", "256", "256")
+            self.assertEqual([color[3] == 0 for color in self.picture(viewer, "0/0/0/0?bands=0")], [not value for value in first])
 
     def test_no_data_has_a_state(self):
         scene = DATA / "RGB.byte.tif"

@@ -200,6 +200,11 @@ std::shared_ptr<const ViewedRaster> ViewedScene::GetRaster(std::size_t number, d
   return raster;
 }
 
+Json ViewedScene::GetLegend(std::size_t number) const {
+  const std::lock_guard lock(mutex_);
+  return entries_.at(number).legend;
+}
+
 std::shared_ptr<SegmentAttributes> ViewedScene::GetAttributes(std::size_t number, double cost) {
   const std::shared_ptr<const ViewedRaster> labels = GetRaster(number, cost);
   std::shared_ptr<SegmentAttributes> dropped;  // goes after the lock

@@ -37,6 +37,8 @@ class ViewedScene {
   /// A raster by its number.
   /// @param cost  up to which segments of a tree are merged; of other rasters without effect.
   std::shared_ptr<const ViewedRaster> GetRaster(std::size_t number, double cost = 0);
+  /// The colours and names of a raster's values; null where it has none.
+  Json GetLegend(std::size_t number) const;
   /// The collection of shapes of a number, see ReadViewedShapes.
   const Json& GetShapes(std::size_t number) const { return shapes_.at(number); }
   std::size_t ShapesCount() const { return shapes_.size(); }

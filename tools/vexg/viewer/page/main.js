@@ -1,9 +1,10 @@
 // The page: asks what there is to see, and puts it together.
 import {bandsPanel} from './histogram_panel.js';
 import {ClassLayer, legendPanel} from './class_layer.js';
-import {el, save} from './dom.js';
+import {save} from './dom.js';
 import {ImageLayer} from './image_layer.js';
 import {layersPanel} from './layers_panel.js';
+import {PrintSheet, makePicture} from './map_picture.js';
 import {Map as OlMap, OverviewMap, Projection, TileLayer, View, Zoom} from './ol.js';
 import {Readout} from './readout.js';
 import {RegionTool} from './region_tool.js';
@@ -67,21 +68,17 @@ async function addShapes(scene, map, entries) {
   }
 }
 
-function savePicture(map) {
-  map.once('rendercomplete', () => {
-    const [width, height] = map.getSize();
-    const canvas = el('canvas', {width, height});
-    const context = canvas.getContext('2d');
-    for (const part of map.getViewport().querySelectorAll('.ol-layer canvas, canvas.ol-layer')) {
-      if (part.width === 0) continue;
-      context.globalAlpha = Number(part.style.opacity || part.parentNode.style.opacity || 1);
-      const numbers = part.style.transform.match(/^matrix\(([^)]*)\)$/)?.[1].split(',').map(Number);
-      context.setTransform(...(numbers ?? [1, 0, 0, 1, 0, 0]));
-      context.drawImage(part, 0, 0);
-    }
-    canvas.toBlob((blob) => save('view.png', blob));
-  });
-  map.render();
+async function savePicture(map) {
+  const canvas = await makePicture(map);
+  canvas.toBlob((blob) => save('view.png', blob));
+}
+
+/** The legends of what is shown, without what is hidden in them. */
+function legendsOf(layers) {
+  return layers.filter(({layer}) => layer.getVisible()).map(({raster, legend, hidden}) => ({
+    name: raster.name,
+    rows: legend.filter(({value, name, color}) => !hidden.has(value) && color[3] !== 0 && name !== ''),
+  })).filter(({rows}) => rows.length > 0);
 }
 
 function makeOverview(map, image) {
@@ -133,6 +130,9 @@ async function start() {
   map.on('singleclick', ({coordinate: [x, y]}) => {
     if (!region.isDrawing) segments.at(-1)?.choose(Math.floor(x), Math.floor(-y));
   });
+  const sheet = new PrintSheet(map, first.name, () => legendsOf([
+    ...images.filter(({style}) => style.mode === 'palette').map((image) => ({
+      layer: image.layer, raster: image.raster, legend: image.raster.legend, hidden: image.style.hidden})), ...classes]));
   const regionTool = {name: 'region', key: 'r', isToggle: true, run: () => region.toggle()};
   region.onEnd = () => regionTool.off();
   const tools = [
@@ -143,6 +143,7 @@ async function start() {
     ...(swipe ? [{name: 'swipe', key: 's', isToggle: true, run: () => swipe.toggle()}] : []),
     {name: 'overview', key: 'o', isToggle: true, run: makeOverview(map, images[0])},
     {name: 'picture', key: 'p', run: () => savePicture(map)},
+    {name: 'print', key: 'i', run: () => sheet.print()},
     {name: 'dark', key: 'd', run: () => { toggleDark(); images.forEach((image) => image.refresh()); }},
     {name: 'help', key: '?', run: showHelp},
   ];

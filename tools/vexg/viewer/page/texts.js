@@ -17,6 +17,8 @@ export const texts = {
   swipeBar: 'Where the second raster begins, in thousandths of the width',
   overview: 'Overview',
   picture: 'Save picture',
+  print: 'Print',
+  sheet: 'What is printed',
   dark: 'Dark or light',
   help: 'Keys',
 
@@ -85,7 +87,7 @@ export const texts = {
   keys: [
     ['+ −', 'Zoom'], ['Arrows', 'Move; the middle of the map is read'], ['F', 'Whole raster'],
     ['1', 'Pixel by pixel'], ['R', 'Draw a region'], ['V', 'Region of the view'], ['S', 'Swipe'],
-    ['O', 'Overview'], ['B', 'Borders of segments'], ['D', 'Dark or light'], ['P', 'Save picture'],
+    ['O', 'Overview'], ['B', 'Borders of segments'], ['D', 'Dark or light'], ['P', 'Save picture'], ['I', 'Print'],
     ['Esc', 'Give up, close'], ['?', 'Keys'],
   ],
 };
