@@ -201,6 +201,34 @@ const scenarios = {
     found.layers = await page.locator('.layer label').allTextContents();
   },
 
+  async print() {
+    await page.evaluate(() => { window.print = () => { window.printed = true; }; });
+    await page.getByLabel('Built-up', {exact: true}).uncheck();
+    await settle();
+    const state = () => page.evaluate(() => [vexgView.map.getSize(), vexgView.map.getView().getResolution()]);
+    const before = await state();
+    const [download] = await Promise.all([page.waitForEvent('download'), page.keyboard.press('p')]);
+    await download.saveAs(options.file);
+    await page.keyboard.press('i');
+    await page.waitForFunction(() => window.printed);
+    found.states = [before, await state()];
+    await page.emulateMedia({media: 'print'});
+    found.printed = await page.evaluate(() => [...document.body.children]
+      .filter((each) => each.checkVisibility()).map(({id}) => id));
+    found.legend = await page.locator('.sheet-legend p').allTextContents();
+    found.scale = await page.locator('.sheet-scale').textContent();
+    found.picture = await page.evaluate(() => {
+      const canvas = document.querySelector('#sheet canvas');
+      const line = document.querySelector('.sheet-line').getBoundingClientRect().width;
+      return [canvas.width, canvas.height, line / canvas.getBoundingClientRect().width];
+    });
+    if (options.page) await page.screenshot({path: options.page, fullPage: true});
+    await page.emulateMedia({media: 'screen'});
+    const shown = await page.evaluate(() => parseFloat(document.getElementById('scale-line').style.width) / vexgView.map.getSize()[0]);
+    found.picture.push(shown);
+    await page.getByLabel('Built-up', {exact: true}).check();
+  },
+
   async picture() {
     if (options.center) await center(...options.center);
     if (options.click) {

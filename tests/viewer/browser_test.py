@@ -182,6 +182,25 @@ class SmallScene(BrowserTest):
         x, y = pixels[0]
         self.assertIn(["", "Water", "Built-up", "Grass", "Forest"][self.map[y, x]], found["readout"])
 
+        gdal.FileFromMemBuffer("/vsimem/tile.png", self.viewer.ask("/api/picture/2/0/0/0?bands=0")[2])
+        picture = gdal.Open("/vsimem/tile.png").ReadAsArray()
+        self.assertTrue((picture == numpy.array(self.colors, "uint8")[self.map[:256, :256]].transpose(2, 0, 1)).all())
+
+    def test_pictures_and_prints_are_finer_than_the_screen(self):
+        file = self.folder / "view.png"
+        found = self.drive(self.viewer, "print", file=str(file), page=os.environ.get("VEXG_PRINT"))
+        (size, resolution), after = found["states"]
+        self.assertEqual([size, resolution], after)
+        saved = gdal.Open(str(file)).ReadAsArray()
+        self.assertEqual(saved.shape, (4, 2 * size[1], 2 * size[0]))
+        self.assertGreater((saved[3] == 255).mean(), 0.3)
+        self.assertGreater(len(numpy.unique(saved[0])), 100)
+        self.assertEqual((found["printed"], found["legend"]), (["sheet"], ["Water", "Grass", "Forest"]))
+        width, height, line, shown = found["picture"]
+        self.assertEqual([width, height], [2 * length for length in size])
+        self.assertAlmostEqual(line, shown, 2)
+        self.assertRegex(found["scale"], r"^[125]0* k?m$")
+
     def test_a_segment_that_is_clicked_tells_its_values_and_the_slider_merges(self):
         found = self.drive(self.viewer, "segment", pixel=(174, 173), axe=True)
         self.assertRegex(found["title"], r"^Segment \d+$")

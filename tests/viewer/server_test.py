@@ -1,6 +1,9 @@
 """The viewer's server: whom it refuses, and that what it gives is what other programs read."""
 
+import array
 import json
+import math
+import os
 import socket
 import struct
 import subprocess
@@ -9,7 +12,7 @@ import unittest
 
 from viewer import Viewer
 
-from support import DATA, FolderTest, gdal_pixels, needs_data, needs_gdal, run
+from support import DATA, VEXG, FolderTest, gdal_pixels, needs_data, needs_gdal, run
 
 SCENE = DATA / "landsat7_olinda.tif"
 
@@ -112,6 +115,39 @@ class Answers(FolderTest):
             status, headers, body = viewer.ask("/api/tile/0/0/0/0?bands=5&edge=1")
             self.assertEqual(headers["X-Vexg-Size"], "257 257")
 
+    def picture(self, viewer, query):
+        """The red, green, blue and alpha of the pixels of a picture of a tile."""
+        status, headers, body = viewer.ask(f"/api/picture/{query}")
+        self.assertEqual((status, headers.get("Content-Type")), (200, "image/png"), query)
+        file = self.folder / "tile.png"
+        file.write_bytes(body)
+        pixels = gdal_pixels(file)
+        return [tuple(pixels[4 * i:4 * i + 4]) for i in range(len(pixels) // 4)]
+
+    def test_pictures_of_tiles_are_stretched_as_they_are_asked_for(self):
+        curves = {"linear": lambda at: at, "sqrt": math.sqrt, "gamma&gamma=2.5": lambda at: at ** 0.4,
+                  "log": lambda at: math.log1p(99 * at) / math.log(100)}
+        red, green, blue = (gdal_pixels(SCENE, "-b", str(band), "-srcwin", "256", "256", "93", "96") for band in (4, 1, 2))
+        bright = lambda value, low, high, curve: curve(min(max((value - low) / (high - low), 0), 1)) * 255  # noqa: E731
+        with Viewer(SCENE) as viewer:
+            for name, curve in curves.items():
+                found = self.picture(viewer, f"0/0/1/1?bands=3,0,1&ends=20,90,40.5,120,30,77&curve={name}")
+                for color, values in zip(found, zip(red, green, blue, strict=True), strict=True):
+                    for shown, value, low, high in zip(color, values, (20, 40.5, 30), (90, 120, 77)):
+                        self.assertLessEqual(abs(shown - bright(value, low, high, curve)), 0.5 + 1e-9, name)
+                    self.assertEqual(color[3], 255)
+            everything = sorted(gdal_pixels(SCENE, "-b", "4"))
+            low, high = (everything[int(share * len(everything))] for share in (0.05, 0.95))
+            for color, value in zip(self.picture(viewer, "0/0/1/1?bands=3&cut=5"), red, strict=True):
+                self.assertLessEqual(abs(color[0] - bright(value, low, high, curves["linear"])), 0.5 + 1e-9)
+                self.assertEqual(color, (color[0],) * 3 + (255,))
+            for wrong in ("bands=0,1", "bands=0&ends=1", "bands=0&ends=2,1", "bands=0&ends=nan,1", "bands=0&curve=cubic",
+                          "bands=0&gamma=0", "bands=0&cut=50", "bands=9", ""):
+                self.assertEqual(viewer.ask(f"/api/picture/0/0/0/0?{wrong}")[0], 404, wrong)
+        with Viewer(DATA / "RGB.byte.tif") as viewer:
+            first = gdal_pixels(DATA / "RGB.byte.tif", "-b", "1", "-srcwin", "0", "0", "256", "256")
+            self.assertEqual([color[3] == 0 for color in self.picture(viewer, "0/0/0/0?bands=0")], [not value for value in first])
+
     def test_no_data_has_a_state(self):
         scene = DATA / "RGB.byte.tif"
         with Viewer(scene) as viewer:
@@ -141,6 +177,33 @@ class Answers(FolderTest):
             inside, outside = viewer.get("pixel?x=100&y=99")["values"], viewer.get("pixel?x=10&y=99")["values"]
             self.assertEqual(inside[0], inside[1])
             self.assertEqual(set(outside[1]), {None})
+
+    def test_levels_of_another_grid_show_the_places_that_they_cover(self):
+        side, steps = 2000, {"below": 10, "above": 3.7}  # m
+        pixels = [array.array("H", (x for _ in range(side) for x in range(side))),
+                  array.array("H", (y for y in range(side) for _ in range(side)))]
+        for name, step in steps.items():
+            (self.folder / f"{name}.img").write_bytes(b"".join(band.tobytes() for band in pixels))
+            (self.folder / f"{name}.hdr").write_text(
+                f"ENVI\nsamples = {side}\nlines = {side}\nbands = 2\ndata type = 12\ninterleave = bsq\nbyte order = 0\n"
+                f"map info = {{UTM, 1, 1, 300105, 9099895, {step}, {step}, 25, South, WGS-84}}\n")
+            subprocess.run(["gdal_translate", "-q", self.folder / f"{name}.img", self.folder / f"{name}.tif"], check=True)
+        with Viewer(self.folder / "below.tif", self.folder / "above.tif") as viewer:
+            for level in (0, 1, 3):
+                _, headers, body = viewer.ask(f"/api/tile/1/{level}/0/0?bands=0,1")
+                width, height = map(int, headers["X-Vexg-Size"].split())
+                bands = array.array("H", body[:4 * width * height])
+                size = 2 ** level * steps["below"] / steps["above"]  # of a pixel of the level, in those of the source
+                off = []
+                for at in range(0, width * height, 7):
+                    wanted = ((at % width + 0.5) * size, (at // width + 0.5) * size)
+                    if max(wanted) > side - size:
+                        continue
+                    self.assertFalse(body[4 * width * height + at])
+                    off.append([bands[at + band * width * height] + 0.5 - wanted[band] for band in (0, 1)])
+                for axis in zip(*off, strict=True):
+                    self.assertLessEqual(max(map(abs, axis)), size / 2 + 0.5, level)
+                self.assertGreater(len(off), 100)
 
     def test_a_region_has_the_statistics_that_the_command_line_gives_its_file(self):
         ring = [[20.3, 30.7], [180.2, 44.1], [150.9, 210.4], [60.5, 170.5]]
@@ -206,6 +269,59 @@ class Answers(FolderTest):
 
 
 @needs_data
+class Servers(FolderTest):
+    def setUp(self):
+        super().setUp()
+        self.name = f"viewed{os.getpid()}"
+        self.server = subprocess.Popen([VEXG, "serve", "--quiet", self.name])
+        self.addCleanup(self.server.wait)
+        self.addCleanup(self.server.kill)
+
+    def test_a_server_gives_what_the_file_has(self):
+        self.fine("segment", SCENE, self.folder / "l.tif", "--merge-value", "2000", "--tree", self.folder / "s.tree")
+        moved = self.folder / "moved.tif"
+        subprocess.run(["gdal_translate", "-q", "-srcwin", "40", "30", "200", "150", SCENE, moved], check=True)
+        files = (SCENE, moved, "--labels", self.folder / "s.tree")
+        ring = {"ring": [[20.3, 30.7], [180.2, 44.1], [150.9, 210.4]]}
+        with Viewer("--server", self.name, *files) as viewer, Viewer(*files) as own:
+            for path in ("scene", "tile/0/0/1/1?bands=2,0", "tile/0/1/0/0?bands=5", "tile/1/1/0/0?bands=1",
+                         "tile/2/0/0/0?bands=0&edge=1&cost=1500", "bands/0?bands=0,1", "pixel?x=70&y=90", "scales/2"):
+                with self.subTest(path):
+                    self.assertEqual(viewer.ask(f"/api/{path}")[::2], own.ask(f"/api/{path}")[::2])
+            self.assertEqual(viewer.post("region/0", ring), own.post("region/0", ring))
+            for _ in range(100):
+                told = viewer.get("segment/2?x=100&y=120&cost=1500")
+                if "progress" not in told:
+                    break
+                time.sleep(0.1)
+            self.assertGreater(len(told["attributes"]), 10, told)
+            with Viewer("--server", self.name) as other:
+                names = [raster["name"] for raster in other.get("scene")["rasters"]]
+                self.assertTrue({SCENE.name, moved.name} <= set(names), names)
+                first = SCENE if names[0] == SCENE.name else moved
+                viewer.end()  # which had opened them
+                want = gdal_pixels(first, "-b", "4", "-srcwin", "0", "0", "200", "150")
+                status, _, body = other.ask("/api/tile/0/0/0/0?bands=3")
+                self.assertEqual((status, bytes(body[256 * y + x] for y in range(150) for x in range(200))
+                                  if first is SCENE else body[:30000]), (200, want))
+                self.assertEqual(other.ask("/api/pyramid/0", "POST", body=b"")[0], 422)
+        self.fails(1, "has no raster open", "view", "--no-browser", "--server", self.name)
+
+    def test_a_server_that_goes_away_is_one_line_everywhere(self):
+        with Viewer("--server", self.name, SCENE) as viewer:
+            viewer.get("alive")
+            self.server.kill()
+            self.server.wait()
+            begin = time.monotonic()
+            for path in ("alive", "tile/0/0/0/0?bands=0", "pixel?x=1&y=1", "bands/0?bands=0"):
+                status, _, body = viewer.ask(f"/api/{path}")
+                self.assertEqual((status, json.loads(body)), (422, {"fault": f'the server "{self.name}" has gone away'}))
+            self.assertEqual(viewer.end(), (3, f'vexg: the server "{self.name}" has gone away\n'))
+            self.assertLess(time.monotonic() - begin, 5)
+        self.fails(3, "no server", "view", "--no-browser", "--server", self.name, "--no-wait")
+
+
+@needs_data
 class Life(FolderTest):
     def test_it_ends_by_an_interrupt_and_leaves_nothing(self):
         viewer = Viewer(SCENE)
@@ -226,7 +342,7 @@ class Life(FolderTest):
     def test_faults_are_told_at_the_start(self):
         broken = self.folder / "broken.tif"
         broken.write_bytes(b"II*\0")
-        self.fails(2, "give a raster", "view")
+        self.fails(2, "give a raster, --mosaic or --server", "view")
         for arguments in ([broken], [SCENE, self.folder / "none.tif"], [SCENE, "--labels", broken],
                           [SCENE, "--shapes", self.folder / "none.shp"]):
             code, out, err = run("view", "--no-browser", *map(str, arguments))

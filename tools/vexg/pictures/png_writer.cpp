@@ -3,6 +3,7 @@
 #include <bit>
 #include <csetjmp>
 #include <exception>
+#include <functional>
 #include <png.h>
 
 #include "verb.h"
@@ -19,9 +20,12 @@ int ColorType(unsigned channels) {
 /// Errors of libpng jump back into Guard; nothing that has a destructor may stand between.
 class PngWriter final : public PictureWriter {
  public:
-  PngWriter(const OutputFile& output, unsigned width, unsigned height, unsigned channels,
+  using Sink = std::function<void(const unsigned char*, std::size_t)>;
+
+  /// @param shown  what the user calls the picture.
+  PngWriter(Sink sink, std::string shown, unsigned width, unsigned height, unsigned channels,
             unsigned bits)
-      : file_(output), shown_(output.GetShownName()) {
+      : sink_(std::move(sink)), shown_(std::move(shown)) {
     png_ = png_create_write_struct(PNG_LIBPNG_VER_STRING, this, &OnError, &OnWarning);
     if (png_ != nullptr) info_ = png_create_info_struct(png_);
     if (info_ == nullptr) throw std::bad_alloc();
@@ -42,7 +46,6 @@ class PngWriter final : public PictureWriter {
 
   void Close() override {
     Guard([&] { png_write_end(png_, nullptr); });
-    file_.Close();
   }
 
  private:
@@ -72,7 +75,7 @@ class PngWriter final : public PictureWriter {
 
   bool TryWrite(const unsigned char* data, std::size_t bytes) {
     try {
-      file_.Write(data, bytes);
+      sink_(data, bytes);
       return true;
     } catch (...) {
       thrown_ = std::current_exception();
@@ -80,7 +83,7 @@ class PngWriter final : public PictureWriter {
     }
   }
 
-  FileWriter file_;
+  const Sink sink_;
   const std::string shown_;
   png_structp png_ = nullptr;
   png_infop info_ = nullptr;
@@ -88,11 +91,44 @@ class PngWriter final : public PictureWriter {
   std::exception_ptr thrown_;
 };
 
+class PngFileWriter final : public PictureWriter {
+ public:
+  PngFileWriter(const OutputFile& output, unsigned width, unsigned height, unsigned channels,
+                unsigned bits)
+      : file_(output),
+        writer_([this](const unsigned char* data, std::size_t bytes) { file_.Write(data, bytes); },
+                output.GetShownName(), width, height, channels, bits) {}
+
+  void WriteLine(const unsigned char* line) override { writer_.WriteLine(line); }
+  void Close() override {
+    writer_.Close();
+    file_.Close();
+  }
+
+ private:
+  FileWriter file_;
+  PngWriter writer_;
+};
+
 }  // namespace
 
 std::unique_ptr<PictureWriter> MakePngWriter(const OutputFile& output, unsigned width,
                                              unsigned height, unsigned channels, unsigned bits) {
-  return std::make_unique<PngWriter>(output, width, height, channels, bits);
+  return std::make_unique<PngFileWriter>(output, width, height, channels, bits);
+}
+
+std::string EncodePng(const unsigned char* pixels, unsigned width, unsigned height,
+                      unsigned channels) {
+  constexpr unsigned kBits = 8;
+  std::string text;
+  PngWriter writer(
+      [&text](const unsigned char* data, std::size_t bytes) { text.append(data, data + bytes); },
+      "picture", width, height, channels, kBits);
+  for (unsigned line = 0; line < height; ++line) {
+    writer.WriteLine(pixels + std::size_t{line} * width * channels);
+  }
+  writer.Close();
+  return text;
 }
 
 }  // namespace lumo::host

@@ -1,6 +1,7 @@
 #pragma once
 
 #include <memory>
+#include <string>
 
 #include "pictures/picture_writer.h"
 
@@ -12,5 +13,9 @@ namespace lumo::host {
 /// Throws HostError for a picture that PNG can't hold.
 std::unique_ptr<PictureWriter> MakePngWriter(const OutputFile& output, unsigned width,
                                              unsigned height, unsigned channels, unsigned bits);
+
+/// Makes a PNG of a picture with channels of 8 bits, line after line.
+std::string EncodePng(const unsigned char* pixels, unsigned width, unsigned height,
+                      unsigned channels);
 
 }  // namespace lumo::host

@@ -17,6 +17,7 @@
 #include "platform/random_bytes.h"
 #include "verb.h"
 #include "viewer/request_gate.h"
+#include "viewer/server_door.h"
 #include "viewer/viewer_site.h"
 
 namespace lumo::host {
@@ -24,6 +25,7 @@ namespace {
 
 struct ViewOptions {
   ViewRequest request;
+  ServerOptions server{.name = ""};  ///< no name: in this process
   unsigned port = 0;
   bool noBrowser = false;
   double idle = 5;  // minutes
@@ -41,8 +43,8 @@ http::MakeServerFunction* FindServerMaker() {
 /// Stops a server once the page has been silent for long, or the user wants it.
 class SilenceWatch {
  public:
-  SilenceWatch(const ViewerSite& site, http::Server& server, double minutes)
-      : thread_([this, &site, &server, minutes] {
+  SilenceWatch(const ViewerSite& site, http::Server& server, double minutes, WorkFolder& folder)
+      : thread_([this, &site, &server, minutes, &folder] {
           std::unique_lock lock(mutex_);
           while (!isOver_) {
             wake_.wait_for(lock, std::chrono::seconds(1));
@@ -50,8 +52,13 @@ class SilenceWatch {
             const bool isSilent = minutes != 0 && site.GetSilence() > 60.0 * minutes;
             if (isSilent || platform::WasInterrupted()) {
               server.Stop();
-              return;
+              break;
             }
+          }
+          // What is still being answered may be held up for good, as by a server that has stopped.
+          if (!wake_.wait_for(lock, std::chrono::seconds(10), [this] { return isOver_; })) {
+            folder.Remove();
+            platform::EndProcess(kExitFailed);
           }
         }) {}
   ~SilenceWatch() {
@@ -72,6 +79,14 @@ class SilenceWatch {
   std::thread thread_;
 };
 
+/// @param toServer  [out] the door, where it leads to a server.
+std::unique_ptr<JobDoor> MakeDoor(const ServerOptions& server, ServerDoor*& toServer) {
+  if (server.name.empty()) return MakeOwnDoor();
+  auto door = std::make_unique<ServerDoor>(server);
+  toServer = door.get();
+  return door;
+}
+
 int View(const ViewOptions& options) {
   http::MakeServerFunction* const make = FindServerMaker();
   std::atomic<http::Server*> running = nullptr;
@@ -84,7 +99,18 @@ int View(const ViewOptions& options) {
     folder.Remove();
     platform::EndProcess(kExitFailed);  // while files are opened
   });
-  ViewedScene scene(options.request, folder);
+  ServerDoor* toServer = nullptr;
+  const std::unique_ptr<JobDoor> door = MakeDoor(options.server, toServer);
+  ViewRequest wanted = options.request;
+  if (toServer != nullptr && wanted.files.empty() && wanted.mosaic.empty()) {
+    wanted.open = toServer->ListRasters();
+  }
+  ViewedScene scene(*door, wanted, folder);
+  if (scene.RasterCount() == 0) {
+    throw HostError(kExitFailed, "the server \"" + options.server.name +
+                                     "\" has no raster open that can be shown; name a file");
+  }
+  if (toServer != nullptr) toServer->SetServing();
   ViewerSite site(scene);
   std::unique_ptr<RequestGate> gate;
   const std::unique_ptr<http::Server> server(
@@ -106,12 +132,12 @@ int View(const ViewOptions& options) {
   }
   running = server.get();
   {
-    const SilenceWatch watch(site, *server, options.idle);
+    const SilenceWatch watch(site, *server, options.idle, folder);
     if (!platform::WasInterrupted()) server->Run();
+    running = nullptr;
+    scene.Stop();
   }
-  running = nullptr;
-  scene.Stop();
-  return kExitSuccess;
+  return toServer != nullptr && toServer->IsGone() ? kExitNoServer : kExitSuccess;
 }
 
 const VerbRegistration registration(
@@ -126,6 +152,7 @@ const VerbRegistration registration(
           "docs/viewer.md tells what the page can do.");
       line.AddExample("vexg view before.tif after.tif --labels segments.tif");
       line.AddExample("vexg view scene.tif --labels scene.tree --classes crops.tif");
+      line.AddExample("vexg view --server vexg");
       line.Add("files", options->request.files, "The rasters").IsFile();
       line.Add("--labels", options->request.labels,
                "Segments over them: a raster of labels, or a tree named .tree")
@@ -135,14 +162,20 @@ const VerbRegistration registration(
       line.Add("--mosaic", options->request.mosaic,
                "A mosaic, with the footprints and seams of its scenes")
           .IsFile("MOSAIC");
+      line.Add("--server", options->server.name,
+               "Show rasters by the server of this name; those that are open there unless files "
+               "are given")
+          .Shows("NAME");
+      options->server.AddNoWait(line);
       line.Add("--port", options->port, "Port to serve at; a free one by default")
           .Within(1024, 65535);
       line.Add("--no-browser", options->noBrowser, "Only print the address");
       line.Add("--idle", options->idle, "Minutes after which a closed page ends it; 0 never")
           .ShowsDefault();
       return VerbRegistration::Work([options] {
-        if (options->request.files.empty() && options->request.mosaic.empty()) {
-          throw HostError(kExitUsage, "give a raster, or --mosaic");
+        if (options->request.files.empty() && options->request.mosaic.empty() &&
+            options->server.name.empty()) {
+          throw HostError(kExitUsage, "give a raster, --mosaic or --server");
         }
         if (!(options->idle >= 0)) throw HostError(kExitUsage, "--idle: not below 0");
         return View(*options);

@@ -15,25 +15,70 @@ struct FreeText {
 };
 using LentText = std::unique_ptr<char, FreeText>;
 
-/// Held shared where a raster may be opened by its name, and alone where none may.
-std::shared_mutex& Opening() {
-  static std::shared_mutex mutex;
-  return mutex;
-}
-
 [[noreturn]] void Throw(char* fault) {
   const LentText owned(fault);
   throw HostError(kExitFailed, fault != nullptr ? fault : "the library gave no reason");
 }
 
+/// The door for C, whose functions run on any thread and keep rasters open by their jobs.
+class OwnDoor final : public JobDoor {
+ public:
+  JobResults Run(const JobDraft& draft, std::uint8_t* abort, double* progress) override {
+    char* fault = nullptr;
+    const LentText text(vexg_run(draft.Write().ToUTF8().c_str(), abort, progress, &fault));
+    if (!text) Throw(fault);
+    return ReadResults(draft, String(text.get()));
+  }
+
+  JobResults RunOpening(const JobDraft& draft) override {
+    const std::unique_lock alone(opening_);
+    vexg_close(nullptr, nullptr);
+    return Run(draft, nullptr, nullptr);
+  }
+
+  Json Describe(const JobDraft& raster) override {
+    const std::shared_lock shared(opening_);
+    char* fault = nullptr;
+    const LentText text(vexg_describe(raster.Write().ToUTF8().c_str(), &fault));
+    if (!text) Throw(fault);
+    return Json::parse(text.get());
+  }
+
+  NamedBlock Read(const JobDraft& raster, const SubRect& rect,
+                  const std::vector<std::uint32_t>& bands, unsigned code) override {
+    const std::size_t values = std::size_t{rect.Width()} * rect.Height() * bands.size();
+    NamedBlock read;
+    read.pixels.resize(values * DataTypeBytes(code));
+    read.states.resize(values);
+    vexg_block block{};
+    block.rect = {rect.left, rect.top, rect.right, rect.bottom};
+    block.bands = bands.data();
+    block.band_count = static_cast<std::uint32_t>(bands.size());
+    block.order = VEXG_BSQ;
+    block.data_type = code;
+    block.pixels = read.pixels.data();
+    block.size = read.pixels.size();
+    block.states = read.states.data();
+    const std::shared_lock shared(opening_);
+    char* fault = nullptr;
+    if (vexg_read(raster.Write().ToUTF8().c_str(), &block, nullptr, &fault) == 0) Throw(fault);
+    return read;
+  }
+
+ private:
+  // Held shared where a raster may be opened by its name, and alone where none may.
+  std::shared_mutex opening_;
+};
+
 }  // namespace
 
-JobResults RunDraft(const JobDraft& draft, std::uint8_t* abort, double* progress) {
-  char* fault = nullptr;
-  const LentText text(vexg_run(draft.Write().ToUTF8().c_str(), abort, progress, &fault));
-  if (!text) Throw(fault);
+std::unique_ptr<JobDoor> MakeOwnDoor() {
+  return std::make_unique<OwnDoor>();
+}
+
+JobResults ReadResults(const JobDraft& draft, const String& text) {
   JobResults results;
-  JobResultParser(results).Parse(String(text.get()));
+  JobResultParser(results).Parse(text);
   for (const JobDraft::StepInfo& step : draft.GetSteps()) {
     const JobResult& result = results.Find(step.name);
     if (result.result == "Success") continue;
@@ -41,41 +86,6 @@ JobResults RunDraft(const JobDraft& draft, std::uint8_t* abort, double* progress
     throw HostError(kExitFailed, reason.empty() ? step.id.ToUTF8() + " failed" : reason);
   }
   return results;
-}
-
-JobResults RunOpening(const JobDraft& draft) {
-  const std::unique_lock alone(Opening());
-  vexg_close(nullptr, nullptr);
-  return RunDraft(draft);
-}
-
-Json DescribeNamed(const std::string& raster) {
-  const std::shared_lock shared(Opening());
-  char* fault = nullptr;
-  const LentText text(vexg_describe(raster.c_str(), &fault));
-  if (!text) Throw(fault);
-  return Json::parse(text.get());
-}
-
-NamedBlock ReadNamed(const std::string& raster, const SubRect& rect,
-                     const std::vector<std::uint32_t>& bands, unsigned code) {
-  const std::size_t values = std::size_t{rect.Width()} * rect.Height() * bands.size();
-  NamedBlock read;
-  read.pixels.resize(values * DataTypeBytes(code));
-  read.states.resize(values);
-  vexg_block block{};
-  block.rect = {rect.left, rect.top, rect.right, rect.bottom};
-  block.bands = bands.data();
-  block.band_count = static_cast<std::uint32_t>(bands.size());
-  block.order = VEXG_BSQ;
-  block.data_type = code;
-  block.pixels = read.pixels.data();
-  block.size = read.pixels.size();
-  block.states = read.states.data();
-  const std::shared_lock shared(Opening());
-  char* fault = nullptr;
-  if (vexg_read(raster.c_str(), &block, nullptr, &fault) == 0) Throw(fault);
-  return read;
 }
 
 }  // namespace lumo::host

@@ -58,7 +58,7 @@ Extent Measure(const ViewedRaster& raster, const RegionFile& file) {
   measure.AddVariableInput("ROIDefURI", "$region");
   draft.Close("close.region", "$region");
   chain.Close();
-  const JobResults results = RunDraft(draft);
+  const JobResults results = raster.GetDoor().Run(draft);
   const Map<String, String>& told = results.Find("measure").returns;
   return {ParseValue<SubRect>(told.Find("SubRect")),
           ParseValue<unsigned long long>(told.Find("Pixels"))};
@@ -120,7 +120,7 @@ Json RegionStatistics(const ViewedRaster& raster, const Json& geoJson, WorkFolde
   stats.AddInput("Wait", Waiting::kAlways);
   draft.Close("close.region", "$region");
   chain.Close();
-  const JobResults results = RunDraft(draft);
+  const JobResults results = raster.GetDoor().Run(draft);
   Array<unsigned> bands{ArrayDims(raster.Bands())};
   for (unsigned band = 0; band < raster.Bands(); ++band) bands[band] = band;
   const BandTable table =

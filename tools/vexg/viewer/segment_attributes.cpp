@@ -54,7 +54,7 @@ void SegmentAttributes::Compute() {
     AddAttributes(draft, request, {scene.GetTop(), labels.GetTop()}, FilesOf(request, name_), "");
     labels.Close();
     scene.Close();
-    RunDraft(draft, &abort_, &progress_);
+    scene_->GetDoor().Run(draft, &abort_, &progress_);
   } catch (...) {
     fault = DescribeException();
   }

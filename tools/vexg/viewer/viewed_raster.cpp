@@ -1,12 +1,15 @@
 #include "viewer/viewed_raster.h"
 
 #include <algorithm>
+#include <cmath>
 #include <cstring>
 #include <filesystem>
 
 #include <fmt/format.h>
 
+#include "georef/derived_georef.h"
 #include "raster/pixel_types.h"
+#include "rasters/map_points.h"
 #include "verb.h"
 
 namespace lumo::host {
@@ -58,6 +61,15 @@ void AddMagnitudes(RasterChain& chain, const std::string& prefix, unsigned bands
   chain.Take(prefix + "shown");
 }
 
+/// The geo-reference of a description, with its size; empty for none.
+GeoRefPtr GeoRefOf(const Json& description) {
+  const Json& own = description["geoRef"];
+  if (!own.is_object()) return {};
+  const auto model = ParseValue<GeoRefPtr>(String(own["text"].get<std::string>()));
+  if (!model.IsNull()) model->SetDimensions(description["samples"], description["lines"]);
+  return model;
+}
+
 bool IsSameGrid(const Json& description, const GeoRef& grid) {
   const Json& own = description["geoRef"];
   if (!own.is_object() || own["transform"].is_null()) return true;  // it has no place to go to
@@ -69,16 +81,27 @@ bool IsSameGrid(const Json& description, const GeoRef& grid) {
 
 }  // namespace
 
-ViewedRaster::ViewedRaster(const SourceOptions& source, const GeoRefPtr& grid, Levels levels)
-    : name_(std::filesystem::path(FileOf(source)).filename().string()),
+ViewedRaster::ViewedRaster(JobDoor& door, const SourceOptions& source, const GeoRefPtr& grid,
+                           Levels levels)
+    : door_(door),
+      name_(std::filesystem::path(FileOf(source)).filename().string()),
       source_(source),
       wanted_(levels),
       grid_(grid) {
   Open();
 }
 
-ViewedRaster::ViewedRaster(const TreeCutRequest& request)
-    : name_(std::filesystem::path(request.tree).filename().string()), tree_(request) {
+ViewedRaster::ViewedRaster(JobDoor& door, const String& uri, const GeoRefPtr& grid, Levels levels)
+    : door_(door),
+      name_(std::filesystem::path(PathOf(uri)).filename().string()),
+      uri_(uri),
+      wanted_(levels),
+      grid_(grid) {
+  Open();
+}
+
+ViewedRaster::ViewedRaster(JobDoor& door, const TreeCutRequest& request)
+    : door_(door), name_(std::filesystem::path(request.tree).filename().string()), tree_(request) {
   Open();
 }
 
@@ -86,56 +109,71 @@ void ViewedRaster::Open() {
   JobDraft draft;
   RasterChain chain(draft);
   AddSourceTo(chain, {});
-  sourceDescription_ = DescribeNamed(draft.Write().ToUTF8());
+  sourceDescription_ = door_.Describe(draft);
   sourceCode_ = sourceDescription_["code"];
   if (!grid_.IsNull() && IsSameGrid(sourceDescription_, *grid_)) grid_ = GeoRefPtr();
-  description_ = DescribeNamed(JobOf(0));
+  description_ = door_.Describe(JobOf(0));
   code_ = description_["code"];
   samples_ = description_["samples"];
   lines_ = description_["lines"];
   bands_ = description_["bands"];
-  const Json& place = description_["geoRef"];
-  if (place.is_object()) {
-    geoRef_ = ParseValue<GeoRefPtr>(String(place["text"].get<std::string>()));
-    if (!geoRef_.IsNull()) geoRef_->SetDimensions(samples_, lines_);
-  }
+  geoRef_ = GeoRefOf(description_);
   while (std::max(samples_, lines_) >> (levelCount_ - 1) > kSmall &&
          std::min(samples_, lines_) >> levelCount_ != 0) {
     ++levelCount_;
   }
-  const Json& pyramid = description_["pyramid"];
+  FindLevels();
+  FindStep();
+}
+
+/// Finds the levels of the source's pyramid that may be shown.
+void ViewedRaster::FindLevels() {
+  // Of a carried raster it is that of the source; the views below it that change values have none.
+  const bool isChanged = IsComplex(sourceCode_) || IsLong(sourceCode_);
+  if (!grid_.IsNull() && isChanged) return;
+  const Json& pyramid = (grid_.IsNull() ? description_ : sourceDescription_)["pyramid"];
   if (!pyramid.is_object()) return;
   if (wanted_ == Levels::kPicked && pyramid["type"] != "ORVA") return;
+  const unsigned side = std::min(sourceDescription_["samples"].get<unsigned>(),
+                                 sourceDescription_["lines"].get<unsigned>());
   for (unsigned level = std::max(1U, pyramid["min"].get<unsigned>());
-       level <= pyramid["max"].get<unsigned>() && level < levelCount_; ++level) {
-    levels_.push_back(level);
+       level <= pyramid["max"].get<unsigned>() && side >> level != 0; ++level) {
+    if (!grid_.IsNull() || level < levelCount_) levels_.push_back(level);
   }
 }
 
+/// Measures in the middle of the grid how far its pixels lie apart in the source.
+void ViewedRaster::FindStep() {
+  const GeoRefPtr source = GeoRefOf(sourceDescription_);
+  if (grid_.IsNull() || source.IsNull()) return;
+  Array<double> points{ArrayDims(3, 2)};
+  const double x = samples_ / 2.0, y = lines_ / 2.0;
+  const double places[] = {x, y, x + 1, y, x, y + 1};
+  std::copy(std::begin(places), std::end(places), points.begin());
+  ShiftPixels(points, FirstPixel(*grid_));
+  if (!grid_->PixelToMap(points)) return;
+  const bool isCarried =
+      !grid_->CoordinateSystem().IsEmpty() && !source->CoordinateSystem().IsEmpty();
+  MapToPixels(*source, isCarried ? grid_->CoordinateSystem() : CoordSys(), points);
+  const double step = std::min(std::hypot(points[2] - points[0], points[3] - points[1]),
+                               std::hypot(points[4] - points[0], points[5] - points[1]));
+  if (std::isfinite(step)) step_ = step;
+}
+
 void ViewedRaster::AddSourceTo(RasterChain& chain, const std::string& prefix) const {
+  JobDraft& draft = chain.GetDraft();
   if (tree_) {
-    AddTreeLabels(chain.GetDraft(), prefix + "raster", *tree_);
+    AddTreeLabels(draft, prefix + "raster", *tree_);
+  } else if (IsFile()) {
+    AddOpenWithPyramid(draft, prefix + "raster", source_);
   } else {
-    AddOpenWithPyramid(chain.GetDraft(), prefix + "raster", source_);
+    draft.Open(prefix + "raster", "AccessRasterCommand").AddInput("SrcURI", uri_);
   }
   chain.Take(prefix + "raster");
 }
 
-void ViewedRaster::AddTo(RasterChain& chain, unsigned level, const std::string& prefix) const {
-  AddSourceTo(chain, prefix);
-  if (!grid_.IsNull()) {
-    JobWriterCommand& carried = chain.AddView(prefix + "carried", "CreateProjectedRasterCommand");
-    carried.AddInput("GeoRef", grid_);
-    carried.AddInput("ReprojectionMethod", String("Rigorous"));
-    carried.AddInput("ResamplingMethod", String("Nearest"));
-    carried.AddInput("Grid", Form::kExact);
-    carried.AddInput("Kernel", String("Nearest"));
-  }
-  if (IsComplex(sourceCode_)) AddMagnitudes(chain, prefix, sourceDescription_["bands"]);
-  if (IsLong(sourceCode_)) {
-    chain.AddView(prefix + "double", "CreateConvertedRasterCommand")
-        .AddInput("DataType", String("Double"));
-  }
+/// Stands a view of every 2^level-th pixel on the source, by the nearest stored level below it.
+void ViewedRaster::AddLevelTo(RasterChain& chain, unsigned level, const std::string& prefix) const {
   const auto behind = std::upper_bound(levels_.begin(), levels_.end(), level);
   const unsigned stored = behind == levels_.begin() ? 0 : *(behind - 1);
   if (stored != 0) {
@@ -150,11 +188,51 @@ void ViewedRaster::AddTo(RasterChain& chain, unsigned level, const std::string& 
   }
 }
 
-std::string ViewedRaster::JobOf(unsigned level) const {
+/// Carries a level of the source to a level of the grid, so that little more of it is read than can
+/// be seen. Its pixels are at most half as large: the first one of 2^n stands for all of them,
+/// which must not be off by more than half a pixel that is seen.
+void ViewedRaster::AddCarriedTo(RasterChain& chain, unsigned level,
+                                const std::string& prefix) const {
+  GeoRefPtr grid = grid_;
+  if (level > 0) {
+    const double factor = std::ldexp(1.0, static_cast<int>(level));
+    grid = ReducedGeoRef(*grid_, factor, factor, samples_ >> level, lines_ >> level);
+    const unsigned side = std::min(sourceDescription_["samples"].get<unsigned>(),
+                                   sourceDescription_["lines"].get<unsigned>());
+    unsigned below = 0;
+    while (std::ldexp(1.0, static_cast<int>(below) + 2) <= step_ * factor &&
+           side >> (below + 1) != 0) {
+      ++below;
+    }
+    AddLevelTo(chain, below, prefix);
+  }
+  JobWriterCommand& carried = chain.AddView(prefix + "carried", "CreateProjectedRasterCommand");
+  carried.AddInput("GeoRef", grid);
+  carried.AddInput("ReprojectionMethod", String("Rigorous"));
+  carried.AddInput("ResamplingMethod", String("Nearest"));
+  carried.AddInput("Grid", Form::kExact);
+  carried.AddInput("Kernel", String("Nearest"));
+}
+
+void ViewedRaster::AddTo(RasterChain& chain, unsigned level, const std::string& prefix) const {
+  AddSourceTo(chain, prefix);
+  if (IsComplex(sourceCode_)) AddMagnitudes(chain, prefix, sourceDescription_["bands"]);
+  if (IsLong(sourceCode_)) {
+    chain.AddView(prefix + "double", "CreateConvertedRasterCommand")
+        .AddInput("DataType", String("Double"));
+  }
+  if (grid_.IsNull()) {
+    AddLevelTo(chain, level, prefix);
+  } else {
+    AddCarriedTo(chain, level, prefix);
+  }
+}
+
+JobDraft ViewedRaster::JobOf(unsigned level) const {
   JobDraft draft;
   RasterChain chain(draft);
   AddTo(chain, level);
-  return draft.Write().ToUTF8();
+  return draft;
 }
 
 ViewedRaster::Size ViewedRaster::SizeOf(unsigned level) const {
@@ -163,7 +241,7 @@ ViewedRaster::Size ViewedRaster::SizeOf(unsigned level) const {
     const auto at = sizes_.find(level);
     if (at != sizes_.end()) return at->second;
   }
-  const Json description = DescribeNamed(JobOf(level));
+  const Json description = door_.Describe(JobOf(level));
   const Size size{description["samples"], description["lines"]};
   const std::lock_guard lock(mutex_);
   sizes_.emplace(level, size);
@@ -175,7 +253,7 @@ std::optional<ViewedTile> ViewedRaster::ReadTile(unsigned level, const SubRect& 
   const Size size = SizeOf(level);
   if (rect.left >= size.samples || rect.top >= size.lines) return {};
   const SubRect cut = rect.Clip(size.samples - 1, size.lines - 1);
-  const NamedBlock block = ReadNamed(JobOf(level), cut, bands, code_);
+  const NamedBlock block = door_.Read(JobOf(level), cut, bands, code_);
   ViewedTile tile{cut.Width(), cut.Height(), {}};
   tile.bytes.reserve(block.pixels.size() + block.states.size());
   tile.bytes.append(reinterpret_cast<const char*>(block.pixels.data()), block.pixels.size());
@@ -196,7 +274,7 @@ Json ViewedRaster::ReadValues(unsigned x, unsigned y) const {
   const unsigned count = grid_.IsNull() ? sourceDescription_["bands"].get<unsigned>() : bands_;
   std::vector<std::uint32_t> bands(count);
   for (unsigned band = 0; band < count; ++band) bands[band] = band;
-  const NamedBlock block = ReadNamed(draft.Write().ToUTF8(), {x, y, x, y}, bands, code);
+  const NamedBlock block = door_.Read(draft, {x, y, x, y}, bands, code);
   const std::size_t bytes = DataTypeBytes(code);
   Json values = Json::array();
   for (unsigned band = 0; band < count; ++band) {

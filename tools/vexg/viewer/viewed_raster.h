@@ -37,10 +37,15 @@ class ViewedRaster {
   enum class Levels { kAll, kPicked };
 
   /// Opens a file.
+  /// @param door  outlives the raster.
   /// @param grid  the geo-reference of a grid to show it in, pixel by pixel; empty for its own.
-  ViewedRaster(const SourceOptions& source, const GeoRefPtr& grid, Levels levels);
+  ViewedRaster(JobDoor& door, const SourceOptions& source, const GeoRefPtr& grid, Levels levels);
+  /// Takes a raster that somebody has open behind the door; it stays open with the viewer.
+  ViewedRaster(JobDoor& door, const String& uri, const GeoRefPtr& grid, Levels levels);
   /// Opens the segments of a tree.
-  explicit ViewedRaster(const TreeCutRequest& request);
+  ViewedRaster(JobDoor& door, const TreeCutRequest& request);
+
+  JobDoor& GetDoor() const { return door_; }
 
   /// The file's name without folders.
   const std::string& GetName() const { return name_; }
@@ -69,7 +74,8 @@ class ViewedRaster {
   void AddTo(RasterChain& chain, unsigned level = 0, const std::string& prefix = {}) const;
 
   const SourceOptions& GetSource() const { return source_; }
-  bool IsTree() const { return tree_.has_value(); }  ///< segments of a tree, and no file
+  bool IsFile() const { return !source_.file.empty(); }  ///< which GetSource tells
+  bool IsTree() const { return tree_.has_value(); }      ///< segments of a tree, and no file
 
  private:
   struct Size {
@@ -77,11 +83,17 @@ class ViewedRaster {
   };
   void Open();
   void AddSourceTo(RasterChain& chain, const std::string& prefix) const;
-  std::string JobOf(unsigned level) const;
+  void AddLevelTo(RasterChain& chain, unsigned level, const std::string& prefix) const;
+  void AddCarriedTo(RasterChain& chain, unsigned level, const std::string& prefix) const;
+  void FindLevels();
+  void FindStep();
+  JobDraft JobOf(unsigned level) const;
   Size SizeOf(unsigned level) const;
 
+  JobDoor& door_;
   std::string name_;
   SourceOptions source_;
+  String uri_;  // of a raster that is open; empty for none
   std::optional<TreeCutRequest> tree_;
   Levels wanted_ = Levels::kPicked;
   GeoRefPtr grid_;
@@ -91,7 +103,8 @@ class ViewedRaster {
   unsigned code_ = 0;
   unsigned samples_ = 0, lines_ = 0, bands_ = 0;
   unsigned levelCount_ = 1;
-  std::vector<unsigned> levels_;  // of the pyramid that are used, ascending
+  std::vector<unsigned> levels_;  // of the source's pyramid that are used, ascending
+  double step_ = 1;               // pixels of the source from one pixel of the grid to the next
   GeoRefPtr geoRef_;
 
   mutable std::mutex mutex_;  // of the sizes

@@ -36,7 +36,7 @@ Json ReadLegend(const ViewedRaster& raster) {
   ask.AddVariableInput("URI", chain.GetTop());
   ask.AddInput("Band", 0U);
   chain.Close();
-  const String text = RunDraft(draft).Find("categories").returns.Find("Categories");
+  const String text = raster.GetDoor().Run(draft).Find("categories").returns.Find("Categories");
   const auto names = ReadValueNames(text);
   Json legend = Json::array();
   for (unsigned value = 0; value < palette.size(); ++value) {
@@ -82,14 +82,16 @@ Json PlaceOf(const GeoRefPtr& geoRef, double x, double y) {
 
 }  // namespace
 
-ViewedScene::ViewedScene(const ViewRequest& request, WorkFolder& folder) : folder_(folder) {
+ViewedScene::ViewedScene(JobDoor& door, const ViewRequest& request, WorkFolder& folder)
+    : door_(door), folder_(folder) {
   for (const std::string& file : request.files) Add(Role::kImage, file);
+  AddOpenRasters(request.open);
   if (!request.mosaic.empty()) Add(Role::kImage, request.mosaic);
   if (!request.classes.empty()) Add(Role::kClasses, request.classes);
   if (!request.labels.empty()) Add(Role::kLabels, request.labels);
   if (!request.mosaic.empty()) {
-    shapes_.push_back(ReadMosaicShapes(request.mosaic, grid_, folder_.NewPath(".gpkg")));
-    shapeNames_.push_back(entries_[request.files.size()].raster->GetName());
+    shapes_.push_back(ReadMosaicShapes(door_, request.mosaic, grid_, folder_.NewPath(".gpkg")));
+    shapeNames_.push_back(std::filesystem::path(request.mosaic).filename().string());
   }
   if (!request.shapes.empty()) {
     shapes_.push_back(ReadViewedShapes(request.shapes, grid_));
@@ -101,11 +103,10 @@ void ViewedScene::Add(Role role, const std::string& file) {
   Entry entry{role, "", nullptr, {}};
   if (role == Role::kLabels && IsTreeName(file)) {
     entry.tree = file;
-    entry.raster = std::make_shared<ViewedRaster>(TreeCutRequest{file, {}, {}});
+    entry.raster = std::make_shared<ViewedRaster>(door_, TreeCutRequest{file, {}, {}});
   } else {
-    const bool canCarry = !grid_.IsNull() && grid_->GetType() == GeoRef::kStd;
     entry.raster = std::make_shared<ViewedRaster>(
-        SourceOptions{file, ""}, canCarry ? grid_ : GeoRefPtr(),
+        door_, SourceOptions{file, ""}, GridToCarryTo(),
         role == Role::kImage ? ViewedRaster::Levels::kAll : ViewedRaster::Levels::kPicked);
     entry.legend = ReadLegend(*entry.raster);
   }
@@ -114,6 +115,37 @@ void ViewedScene::Add(Role role, const std::string& file) {
        entry.raster->Lines() != entries_.front().raster->Lines())) {
     throw HostError(kExitFailed, file + ": --labels: the segments have another size");
   }
+  AddRaster(std::move(entry));
+}
+
+/// Adds those of the rasters that can be shown, and says of which others there are.
+void ViewedScene::AddOpenRasters(const std::vector<String>& uris) {
+  constexpr std::size_t kMostRasters = 32;
+  std::size_t left = 0;
+  for (const String& uri : uris) {
+    if (entries_.size() >= kMostRasters) {
+      ++left;
+      continue;
+    }
+    try {
+      Entry entry{Role::kImage, "", nullptr, {}};
+      entry.raster =
+          std::make_shared<ViewedRaster>(door_, uri, GridToCarryTo(), ViewedRaster::Levels::kAll);
+      entry.legend = ReadLegend(*entry.raster);
+      AddRaster(std::move(entry));
+    } catch (const HostError& error) {
+      if (error.code == kExitNoServer) throw;
+      Say(fmt::format("note: {} is not shown: {}", uri.ToUTF8(), error.what()));
+    }
+  }
+  if (left != 0) Say(fmt::format("note: {} more rasters are open, and not shown", left));
+}
+
+GeoRefPtr ViewedScene::GridToCarryTo() const {
+  return !grid_.IsNull() && grid_->GetType() == GeoRef::kStd ? grid_ : GeoRefPtr();
+}
+
+void ViewedScene::AddRaster(Entry entry) {
   if (entries_.empty()) grid_ = entry.raster->GetGeoRef();
   entries_.push_back(std::move(entry));
 }
@@ -138,6 +170,7 @@ Json ViewedScene::DescribeEntry(const Entry& entry) const {
           {"noData", told["noData"]},
           {"levels", raster.LevelCount()},
           {"hasLevels", raster.HasLevels()},
+          {"isFile", raster.IsFile()},
           {"geoRef", told["geoRef"]},
           {"legend", entry.legend}};
 }
@@ -160,11 +193,16 @@ std::shared_ptr<const ViewedRaster> ViewedScene::GetRaster(std::size_t number, d
     }
     tree = entry.tree;
   }
-  const auto raster = std::make_shared<ViewedRaster>(TreeCutRequest{tree, cost, {}});
+  const auto raster = std::make_shared<ViewedRaster>(door_, TreeCutRequest{tree, cost, {}});
   const std::lock_guard lock(mutex_);
   cuts_.push_front({number, cost, raster});
   if (cuts_.size() > kKeptCuts) cuts_.pop_back();
   return raster;
+}
+
+Json ViewedScene::GetLegend(std::size_t number) const {
+  const std::lock_guard lock(mutex_);
+  return entries_.at(number).legend;
 }
 
 std::shared_ptr<SegmentAttributes> ViewedScene::GetAttributes(std::size_t number, double cost) {
@@ -205,7 +243,7 @@ Json ViewedScene::FindScales(std::size_t number) {
   if (tree.empty()) throw HostError(kExitFailed, "there is no tree of this number");
   JobDraft draft;
   AddSuggest(draft, tree);
-  const ScaleCurve curve = ScaleCurve::Read(RunDraft(draft));
+  const ScaleCurve curve = ScaleCurve::Read(door_.Run(draft));
   return {{"costs", curve.mergeValues}, {"segments", curve.segments}, {"peaks", curve.peaks}};
 }
 
@@ -233,13 +271,13 @@ void ViewedScene::Build(const String& uri, unsigned last) {
   build.AddInput("Bins", Form::kExact);
   std::string fault;
   try {
-    RunDraft(draft, &pyramidAbort_, &pyramidProgress_);
+    door_.Run(draft, &pyramidAbort_, &pyramidProgress_);
   } catch (...) {
     fault = DescribeException();
   }
   JobDraft closing;
   closing.Close("close", uri);
-  RunOpening(closing);
+  door_.RunOpening(closing);
   if (!fault.empty()) throw HostError(kExitFailed, fault);
 }
 
@@ -254,9 +292,9 @@ void ViewedScene::RunPyramid(std::size_t number) {
     open.AddInput("PyramidConnStr",
                   ConnStrings({"Pyramid", String(PyramidPathOf(FileOf(source)))}));
     open.AddInput("PyramidNew", true);
-    Build(URIOf(RunOpening(opening), "$raster"), GetRaster(number)->LevelCount() - 1);
+    Build(URIOf(door_.RunOpening(opening), "$raster"), GetRaster(number)->LevelCount() - 1);
     const auto raster =
-        std::make_shared<ViewedRaster>(source, GeoRefPtr(), ViewedRaster::Levels::kAll);
+        std::make_shared<ViewedRaster>(door_, source, GeoRefPtr(), ViewedRaster::Levels::kAll);
     const std::lock_guard lock(mutex_);
     entries_.at(number).raster = raster;
   } catch (...) {
@@ -271,7 +309,7 @@ Json ViewedScene::BuildPyramid(std::size_t number) {
   {
     const std::lock_guard lock(mutex_);
     const Entry& entry = entries_.at(number);
-    if (!entry.tree.empty() || entry.raster->LevelCount() < 2) {
+    if (!entry.raster->IsFile() || entry.raster->LevelCount() < 2) {
       throw HostError(kExitFailed, entry.raster->GetName() + ": a pyramid is of no use to it");
     }
     if (building_ != Building::kRuns) {

@@ -12,9 +12,10 @@
 
 namespace lumo::host {
 
-/// The files that a user wants to see.
+/// What a user wants to see: files, and rasters that are open behind the door.
 struct ViewRequest {
   std::vector<std::string> files;
+  std::vector<String> open{};                   ///< URIs; those that can't be shown are left out
   std::string labels, classes, shapes, mosaic;  ///< empty for none
 };
 
@@ -25,8 +26,9 @@ struct ViewRequest {
 class ViewedScene {
  public:
   /// Opens all files, so that what can't be shown is told at the start.
-  /// @param folder  for files on the way; outlives the scene.
-  ViewedScene(const ViewRequest& request, WorkFolder& folder);
+  /// @param door    to the library; outlives the scene, as the folder does.
+  /// @param folder  for files on the way.
+  ViewedScene(JobDoor& door, const ViewRequest& request, WorkFolder& folder);
 
   /// Tells all that the page needs at its beginning.
   Json Describe() const;
@@ -35,6 +37,8 @@ class ViewedScene {
   /// A raster by its number.
   /// @param cost  up to which segments of a tree are merged; of other rasters without effect.
   std::shared_ptr<const ViewedRaster> GetRaster(std::size_t number, double cost = 0);
+  /// The colours and names of a raster's values; null where it has none.
+  Json GetLegend(std::size_t number) const;
   /// The collection of shapes of a number, see ReadViewedShapes.
   const Json& GetShapes(std::size_t number) const { return shapes_.at(number); }
   std::size_t ShapesCount() const { return shapes_.size(); }
@@ -52,6 +56,8 @@ class ViewedScene {
   Json TellPyramid();
 
   WorkFolder& GetFolder() { return folder_; }
+  /// Throws HostError when nothing can be read any more, as from a server that has gone away.
+  void Check() { door_.Check(); }
   /// Aborts what runs in the background and waits for it.
   void Stop();
 
@@ -75,11 +81,16 @@ class ViewedScene {
   };
 
   void Add(Role role, const std::string& file);
+  void AddOpenRasters(const std::vector<String>& uris);
+  void AddRaster(Entry entry);
+  /// The grid of the first raster, where others can be carried to it.
+  GeoRefPtr GridToCarryTo() const;
   Json DescribeEntry(const Entry& entry) const;
   std::shared_ptr<SegmentAttributes> GetAttributes(std::size_t number, double cost);
   void RunPyramid(std::size_t number);
   void Build(const String& uri, unsigned last);
 
+  JobDoor& door_;
   WorkFolder& folder_;
   std::vector<Json> shapes_;
   std::vector<std::string> shapeNames_;

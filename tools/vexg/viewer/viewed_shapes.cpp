@@ -94,14 +94,15 @@ Json ReadViewedShapes(const std::string& file, const GeoRefPtr& grid) {
   return document;
 }
 
-Json ReadMosaicShapes(const std::string& mosaic, const GeoRefPtr& grid, const std::string& work) {
+Json ReadMosaicShapes(JobDoor& door, const std::string& mosaic, const GeoRefPtr& grid,
+                      const std::string& work) {
   JobDraft draft;
   AddOpen(draft, "mosaic", {mosaic, ""});
   JobWriterCommand& step = draft.Step("vectors", "CreateMosaicVectorsCommand");
   step.AddVariableInput("MosaicURI", "$mosaic");
   step.AddInput("Vectors", String(work));
   draft.Close("close", "$mosaic");
-  RunDraft(draft);
+  door.Run(draft);
   return ReadViewedShapes(work, grid);
 }
 

@@ -20,6 +20,7 @@ Json ReadViewedShapes(const std::string& file, const GeoRefPtr& grid);
 
 /// Reads the footprints and seams of a mosaic likewise.
 /// @param work  a vector file that may be made for it, and is left there.
-Json ReadMosaicShapes(const std::string& mosaic, const GeoRefPtr& grid, const std::string& work);
+Json ReadMosaicShapes(JobDoor& door, const std::string& mosaic, const GeoRefPtr& grid,
+                      const std::string& work);
 
 }  // namespace lumo::host

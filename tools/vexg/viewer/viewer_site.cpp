@@ -9,8 +9,8 @@
 #include "foundation/near_name.h"
 #include "foundation/thrown.h"
 #include "verb.h"
-#include "viewer/band_histograms.h"
 #include "viewer/region_statistics.h"
+#include "viewer/tile_picture.h"
 
 namespace lumo::host {
 namespace {
@@ -41,14 +41,44 @@ unsigned WholeOf(const std::string& text) {
   return value;
 }
 
-double CostOf(const http::Request& request) {
-  const std::string text = request.Query("cost");
-  if (text.empty()) return 0;
+double RealOf(const std::string& text) {
   double value = 0;
   const char* const end = text.data() + text.size();
   const auto [next, fault] = std::from_chars(text.data(), end, value);
   if (fault != std::errc() || next != end || !std::isfinite(value)) throw NotThere();
   return value;
+}
+
+/// The number of a query, or another one where it isn't asked.
+double RealOr(const http::Request& request, const char* name, double otherwise) {
+  const std::string text = request.Query(name);
+  return text.empty() ? otherwise : RealOf(text);
+}
+
+double CostOf(const http::Request& request) {
+  return RealOr(request, "cost", 0);
+}
+
+TileStretch::Curve CurveOf(const std::string& word) {
+  constexpr const char* kWords[] = {"linear", "sqrt", "gamma", "log"};
+  if (word.empty()) return TileStretch::Curve::kLinear;
+  for (int i = 0; i < 4; ++i) {
+    if (word == kWords[i]) return static_cast<TileStretch::Curve>(i);
+  }
+  throw NotThere();
+}
+
+/// The ends "LOW,HIGH" of every band, or of all bands at once.
+std::vector<std::pair<double, double>> EndsOf(const std::string& text, std::size_t bands) {
+  const std::vector<std::string> parts = SplitAt(text, ',');
+  std::vector<std::pair<double, double>> ends;
+  for (std::size_t i = 0; i + 1 < parts.size(); i += 2) {
+    ends.emplace_back(RealOf(parts[i]), RealOf(parts[i + 1]));
+    if (!(ends.back().second > ends.back().first)) throw NotThere();
+  }
+  if (ends.size() == 1) ends.resize(bands, ends.front());
+  if (parts.size() % 2 != 0 || ends.size() != bands) throw NotThere();
+  return ends;
 }
 
 std::vector<std::uint32_t> BandsOf(const std::string& text, const ViewedRaster& raster) {
@@ -129,7 +159,10 @@ http::Answer ViewerSite::Route(const http::Request& request) {
   const bool isPost = request.method == "POST";
   if (parts.size() == 3 && !isPost) {
     if (what == "scene") return AsAnswer(scene_.Describe());
-    if (what == "alive") return AsAnswer({{"alive", true}});
+    if (what == "alive") {
+      scene_.Check();
+      return AsAnswer({{"alive", true}});
+    }
     if (what == "pyramid") return AsAnswer(scene_.TellPyramid());
     if (what == "pixel") {
       return AsAnswer(scene_.ReadPixel(WholeOf(request.Query("x")), WholeOf(request.Query("y")),
@@ -143,6 +176,7 @@ http::Answer ViewerSite::Route(const http::Request& request) {
   }
   const std::size_t number = NumberOf(parts[3], scene_.RasterCount());
   if (what == "tile" && !isPost) return GiveTile(parts, request);
+  if (what == "picture" && !isPost) return GivePicture(parts, request);
   if (parts.size() != 4) throw NotThere();
   if (what == "region" && isPost) return AsAnswer(GiveRegion(number, request.body));
   if (what == "pyramid" && isPost) return AsAnswer(scene_.BuildPyramid(number));
@@ -159,13 +193,12 @@ http::Answer ViewerSite::Route(const http::Request& request) {
   throw NotThere();
 }
 
-/// /api/tile/NUMBER/LEVEL/COLUMN/ROW?bands=B,B..., with edge=1 one pixel more to the right and
-/// below, by which the page finds the borders between segments.
-http::Answer ViewerSite::GiveTile(const std::vector<std::string>& parts,
-                                  const http::Request& request) {
+/// Reads the tile /.../.../NUMBER/LEVEL/COLUMN/ROW?bands=B,B..., with edge=1 one pixel more to the
+/// right and below, by which the page finds the borders between segments.
+ViewedTile ViewerSite::ReadTile(const std::vector<std::string>& parts, const http::Request& request,
+                                std::shared_ptr<const ViewedRaster>& raster) {
   if (parts.size() != 7) throw NotThere();
-  const std::shared_ptr<const ViewedRaster> raster =
-      scene_.GetRaster(NumberOf(parts[3], scene_.RasterCount()), CostOf(request));
+  raster = scene_.GetRaster(NumberOf(parts[3], scene_.RasterCount()), CostOf(request));
   const unsigned level = WholeOf(parts[4]), column = WholeOf(parts[5]), row = WholeOf(parts[6]);
   constexpr unsigned kMostTiles = std::numeric_limits<unsigned>::max() / kTileSide - 1;
   if (level >= raster->LevelCount() || column > kMostTiles || row > kMostTiles) throw NotThere();
@@ -174,10 +207,46 @@ http::Answer ViewerSite::GiveTile(const std::vector<std::string>& parts,
   const std::optional<ViewedTile> tile = raster->ReadTile(
       level, {left, top, left + last, top + last}, BandsOf(request.Query("bands"), *raster));
   if (!tile) throw NotThere();
+  return *tile;
+}
+
+http::Answer ViewerSite::GiveTile(const std::vector<std::string>& parts,
+                                  const http::Request& request) {
+  std::shared_ptr<const ViewedRaster> raster;
+  const ViewedTile tile = ReadTile(parts, request, raster);
   return {200,
           "application/octet-stream",
-          tile->bytes,
-          {{"X-Vexg-Size", fmt::format("{} {}", tile->width, tile->height)}}};
+          tile.bytes,
+          {{"X-Vexg-Size", fmt::format("{} {}", tile.width, tile.height)}}};
+}
+
+/// A tile as a PNG: of one band, by its palette where it has one and no ends are asked for, or of
+/// three.
+http::Answer ViewerSite::GivePicture(const std::vector<std::string>& parts,
+                                     const http::Request& request) {
+  std::shared_ptr<const ViewedRaster> raster;
+  const ViewedTile tile = ReadTile(parts, request, raster);
+  const std::size_t number = NumberOf(parts[3], scene_.RasterCount());
+  const std::vector<std::uint32_t> bands = BandsOf(request.Query("bands"), *raster);
+  if (bands.size() != 1 && bands.size() != 3) throw NotThere();
+  const Json legend = scene_.GetLegend(number);
+  const std::string ends = request.Query("ends");
+  if (!legend.is_null() && ends.empty() && bands == std::vector<std::uint32_t>{0}) {
+    return {200, "image/png", DrawTile(tile, raster->Code(), legend)};
+  }
+  TileStretch stretch;
+  stretch.curve = CurveOf(request.Query("curve"));
+  stretch.gamma = RealOr(request, "gamma", stretch.gamma);
+  const double cut = RealOr(request, "cut", 2);
+  if (!(stretch.gamma > 0) || !(cut >= 0 && cut < 50)) throw NotThere();
+  if (!ends.empty()) {
+    stretch.ends = EndsOf(ends, bands.size());
+  } else {
+    for (const std::uint32_t band : bands) {
+      stretch.ends.push_back(ends_.Find(*raster, number, band, cut));
+    }
+  }
+  return {200, "image/png", DrawTile(tile, raster->Code(), stretch)};
 }
 
 Json ViewerSite::GiveRegion(std::size_t number, const std::string& body) {

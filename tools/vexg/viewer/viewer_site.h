@@ -6,6 +6,7 @@
 #include <vector>
 
 #include "http/http_server.h"
+#include "viewer/band_histograms.h"
 #include "viewer/page_files.h"
 #include "viewer/viewed_scene.h"
 
@@ -29,12 +30,16 @@ class ViewerSite {
 
  private:
   http::Answer Route(const http::Request& request);
+  ViewedTile ReadTile(const std::vector<std::string>& parts, const http::Request& request,
+                      std::shared_ptr<const ViewedRaster>& raster);
   http::Answer GiveTile(const std::vector<std::string>& parts, const http::Request& request);
+  http::Answer GivePicture(const std::vector<std::string>& parts, const http::Request& request);
   Json GiveRegion(std::size_t number, const std::string& body);
   std::size_t NumberOf(const std::string& text, std::size_t count) const;
 
   ViewedScene& scene_;
   const PageFiles page_;
+  BandEnds ends_;
   std::atomic<std::chrono::steady_clock::time_point> last_;
 };
 

@@ -1,9 +1,10 @@
 // The page: asks what there is to see, and puts it together.
 import {bandsPanel} from './histogram_panel.js';
 import {ClassLayer, legendPanel} from './class_layer.js';
-import {el, save} from './dom.js';
+import {save} from './dom.js';
 import {ImageLayer} from './image_layer.js';
 import {layersPanel} from './layers_panel.js';
+import {PrintSheet, makePicture} from './map_picture.js';
 import {Map as OlMap, OverviewMap, Projection, TileLayer, View, Zoom} from './ol.js';
 import {Readout} from './readout.js';
 import {RegionTool} from './region_tool.js';
@@ -16,6 +17,7 @@ import {texts} from './texts.js';
 import {makeTools, showHelp, toggleDark} from './tools.js';
 
 const kAliveMs = 20000;
+const kSilentMs = 15000;
 
 function say(text, isFault = false) {
   const notice = document.getElementById('notice');
@@ -24,7 +26,7 @@ function say(text, isFault = false) {
 }
 
 function onFault(fault) {
-  say(fault.status === 0 ? texts.ended : fault.status === 403 ? texts.refused : fault.message, true);
+  say(fault.status === 403 ? texts.refused : fault.message, true);
 }
 
 function makeMap(raster) {
@@ -50,7 +52,7 @@ function makeLayers(scene, map) {
     list.push(layer);
     if (raster.role !== 'labels') map.addLayer(layer.layer);
     if (raster.role === 'labels') layer.layer.setZIndex(10);
-    const canBuild = !raster.hasLevels && raster.levels > 2 && !raster.isTree && number === 0;
+    const canBuild = !raster.hasLevels && raster.levels > 2 && raster.isFile && number === 0;
     return {name: raster.name, layer: layer.layer, number, canBuild};
   });
   return {...made, entries};
@@ -66,21 +68,17 @@ async function addShapes(scene, map, entries) {
   }
 }
 
-function savePicture(map) {
-  map.once('rendercomplete', () => {
-    const [width, height] = map.getSize();
-    const canvas = el('canvas', {width, height});
-    const context = canvas.getContext('2d');
-    for (const part of map.getViewport().querySelectorAll('.ol-layer canvas, canvas.ol-layer')) {
-      if (part.width === 0) continue;
-      context.globalAlpha = Number(part.style.opacity || part.parentNode.style.opacity || 1);
-      const numbers = part.style.transform.match(/^matrix\(([^)]*)\)$/)?.[1].split(',').map(Number);
-      context.setTransform(...(numbers ?? [1, 0, 0, 1, 0, 0]));
-      context.drawImage(part, 0, 0);
-    }
-    canvas.toBlob((blob) => save('view.png', blob));
-  });
-  map.render();
+async function savePicture(map) {
+  const canvas = await makePicture(map);
+  canvas.toBlob((blob) => save('view.png', blob));
+}
+
+/** The legends of what is shown, without what is hidden in them. */
+function legendsOf(layers) {
+  return layers.filter(({layer}) => layer.getVisible()).map(({raster, legend, hidden}) => ({
+    name: raster.name,
+    rows: legend.filter(({value, name, color}) => !hidden.has(value) && color[3] !== 0 && name !== ''),
+  })).filter(({rows}) => rows.length > 0);
 }
 
 function makeOverview(map, image) {
@@ -132,6 +130,9 @@ async function start() {
   map.on('singleclick', ({coordinate: [x, y]}) => {
     if (!region.isDrawing) segments.at(-1)?.choose(Math.floor(x), Math.floor(-y));
   });
+  const sheet = new PrintSheet(map, first.name, () => legendsOf([
+    ...images.filter(({style}) => style.mode === 'palette').map((image) => ({
+      layer: image.layer, raster: image.raster, legend: image.raster.legend, hidden: image.style.hidden})), ...classes]));
   const regionTool = {name: 'region', key: 'r', isToggle: true, run: () => region.toggle()};
   region.onEnd = () => regionTool.off();
   const tools = [
@@ -142,6 +143,7 @@ async function start() {
     ...(swipe ? [{name: 'swipe', key: 's', isToggle: true, run: () => swipe.toggle()}] : []),
     {name: 'overview', key: 'o', isToggle: true, run: makeOverview(map, images[0])},
     {name: 'picture', key: 'p', run: () => savePicture(map)},
+    {name: 'print', key: 'i', run: () => sheet.print()},
     {name: 'dark', key: 'd', run: () => { toggleDark(); images.forEach((image) => image.refresh()); }},
     {name: 'help', key: '?', run: showHelp},
   ];
@@ -163,7 +165,7 @@ async function start() {
     ...images.filter(({style}) => style.mode === 'palette').map((image) => legendPanel({
       legend: image.raster.legend, hidden: image.style.hidden, refresh: () => image.refresh()})),
     ...classes.map(legendPanel), ...segments.map((layer) => layer.makePanel()));
-  setInterval(() => get('alive').catch(onFault), kAliveMs);
+  setInterval(() => get('alive', {signal: AbortSignal.timeout(kSilentMs)}).catch(onFault), kAliveMs);
   window.vexgView = {map, scene, images, classes, segments, region, readout, swipe};
   document.documentElement.dataset.ready = 'true';
 }

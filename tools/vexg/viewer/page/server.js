@@ -1,6 +1,8 @@
 // Requests to the viewer's server. The key stands behind the # of the address, which a browser sends
 // to nobody, and goes along as a header.
 
+import {texts} from './texts.js';
+
 const key = location.hash.slice(1);
 export const hasKey = /^[0-9a-f]{32}$/.test(key);
 
@@ -18,7 +20,7 @@ async function ask(path, options = {}) {
     answer = await fetch(path, {...options, headers: {'X-Vexg-Key': key}, cache: 'no-store'});
   } catch (error) {
     if (error.name === 'AbortError') throw error;
-    throw new Fault(0, String(error));
+    throw new Fault(0, error.name === 'TimeoutError' ? texts.silent : texts.ended);
   }
   if (answer.ok) return answer;
   const told = await answer.json().catch(() => ({}));

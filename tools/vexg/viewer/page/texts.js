@@ -6,6 +6,7 @@ export const texts = {
   noKey: 'This address has no key. Open the whole address that vexg view has printed.',
   refused: 'The viewer does not know this key. Open the address that vexg view has printed last.',
   ended: 'The viewer has ended. Start vexg view again to go on.',
+  silent: 'The viewer does not answer.',
   working: 'Working…',
 
   fit: 'Whole raster',
@@ -16,6 +17,8 @@ export const texts = {
   swipeBar: 'Where the second raster begins, in thousandths of the width',
   overview: 'Overview',
   picture: 'Save picture',
+  print: 'Print',
+  sheet: 'What is printed',
   dark: 'Dark or light',
   help: 'Keys',
 
@@ -84,7 +87,7 @@ export const texts = {
   keys: [
     ['+ −', 'Zoom'], ['Arrows', 'Move; the middle of the map is read'], ['F', 'Whole raster'],
     ['1', 'Pixel by pixel'], ['R', 'Draw a region'], ['V', 'Region of the view'], ['S', 'Swipe'],
-    ['O', 'Overview'], ['B', 'Borders of segments'], ['D', 'Dark or light'], ['P', 'Save picture'],
+    ['O', 'Overview'], ['B', 'Borders of segments'], ['D', 'Dark or light'], ['P', 'Save picture'], ['I', 'Print'],
     ['Esc', 'Give up, close'], ['?', 'Keys'],
   ],
 };

@@ -12,6 +12,7 @@ const kSigns = {
   swipe: 'M4 5h16v14H4zM12 5v14M15 9l2 3-2 3M9 9l-2 3 2 3',
   overview: 'M4 4h16v16H4zM4 13h7v7',
   picture: 'M12 4v11M7 11l5 5 5-5M5 20h14',
+  print: 'M7 8V4h10v4M7 16H4V8h16v8h-3M7 13h10v7H7z',
   dark: 'M20 14a8 8 0 1 1-9-10 6 6 0 0 0 9 10z',
   help: 'M9 9a3 3 0 1 1 4.5 2.6c-1 .6-1.5 1.2-1.5 2.4M12 18v.01',
 };
