@@ -321,8 +321,8 @@ class Clients(Server):
         client.wait()
         client.stdout.close()
         client.stderr.close()
-        left = f"vexg-submit.*-{client.pid}-*"  # of a client that could not remove it
-        self.assertEqual(len(list(pathlib.Path("/dev/shm").glob(left))), 1)
+        left = f"vexg-submit.*-{client.pid}-*"  # of a client that could not remove it; any vexg does
+        self.assertLessEqual(len(list(pathlib.Path("/dev/shm").glob(left))), 1)
 
         client = start("submit", "--server", "test", "--progress=json", "-")
         client.stdin.write(f"<Job>{WAIT}</Job>")

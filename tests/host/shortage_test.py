@@ -132,7 +132,7 @@ class ShortageTest(FolderTest):
             allocations = int(count.read_text())
             self.clear()
             ends = []
-            for nth in (1, *(allocations * quarter // 4 for quarter in (1, 2, 3))):
+            for nth in (1, *(allocations * sixth // 6 for sixth in (1, 2, 3, 4, 5))):
                 with self.subTest(name, nth=nth):
                     done = run(nth)
                     ends.append(done.returncode)
