@@ -2167,8 +2167,8 @@ def FxTileSegmentMergeCommand(
         Seamless: boolean: the segments are those of one tile as large as the raster, numbered
             in raster order without gaps; TileMemorySize is then that of the strips that are
             read, and changes no label, and there is no TileBorderSize; false when absent
-        Memory: integer: bytes that merging may take when Seamless is true: it fails before
-            merging when it needs more; half the machine's when absent
+        Memory: integer: bytes that merging may take when Seamless is true: it fails when it
+            needs more, before it begins unless Order is Local; half the machine's when absent
         MinSize: integer: with Seamless and MergeAlgorithm 1: segments of fewer pixels join at
             the end the neighbour that costs least, the smallest first; 0 when absent
         MaxSize: integer: with Seamless and MergeAlgorithm 1: segments that have more pixels

@@ -48,7 +48,7 @@ class VEXG_EXPORT LabelForest {
   static constexpr std::uint32_t kPageLabels = 1U << kPageBits;
   static constexpr std::uint32_t kNumbered = 1U << 31U;  // of what is held: a number, not a label
 
-  /// What is held of a label: the one it has become part of, 0 where that is itself, or a number.
+  /// The label that a label has become part of, 0 where that is itself, or its number.
   std::uint32_t& At(std::uint32_t label) {
     std::uint32_t* const page = pages_[label >> kPageBits];
     return page != nullptr ? page[label & (kPageLabels - 1)] : Fetch(label);

@@ -5,6 +5,7 @@
 #include <numeric>
 
 #include "foundation/fault.h"
+#include "platform/system_memory.h"
 #include "tasks/parallel.h"
 
 namespace lumo {
@@ -170,6 +171,7 @@ bool LocalMerge::MergeIfDue(const AbortFlag* abort) {
   const std::size_t batch = std::max(rules_.batch, live_ / 2);
   if (fresh_ < batch && CountBytes() <= rules_.memory / 2) return true;
   if (!Merge(abort)) return false;
+  platform::ReturnFreeMemory();  // of the strips that came in between
   const std::uint64_t bytes = CountBytes();
   if (bytes <= rules_.memory) return true;
   SetFault(String("merging in rounds has " + std::to_string(live_) +

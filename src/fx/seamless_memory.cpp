@@ -20,7 +20,9 @@ std::uint64_t MemoryOfMerging(std::uint64_t basins, unsigned bands, const Segmen
 String MemoryFault(std::uint64_t basins, std::uint64_t needed, std::uint64_t allowed) {
   return String("merging " + std::to_string(basins) + " segments needs up to " +
                 std::to_string(needed) + " bytes of memory, and may take " +
-                std::to_string(allowed) + "; a higher SegmentValue makes fewer");
+                std::to_string(allowed) +
+                "; a higher SegmentValue makes fewer, and Order Local keeps but a part of "
+                "them in memory");
 }
 
 unsigned SeamlessStripBytes(const BasicRaster& raster, std::size_t elementBytes) {

@@ -17,6 +17,8 @@ namespace lumo {
 /// in raster order; all basins are merged in one graph; and labels are written once, in one pass.
 /// With a tree, merging goes on until no pair is left, and the labels are a cut of the tree.
 ///
+/// Merging in rounds needs no whole graph; see LocalMerge.
+///
 /// Memory: MemoryOfMerging for the graph, and some 100 bytes a pixel of a strip for each
 ///         thread. Failure: false, with the fault set, and nothing written unless the writing
 ///         itself failed; at an abort true.

@@ -90,8 +90,8 @@ const CommandDeclaration kSegmentMerge{
       "gaps; TileMemorySize is then that of the strips that are read, and changes no label, and "
       "there is no TileBorderSize; false when absent"},
      {"Memory", Presence::kOptional, ValueKind::kInteger,
-      "bytes that merging may take when Seamless is true: it fails before merging when it needs "
-      "more; half the machine's when absent"},
+      "bytes that merging may take when Seamless is true: it fails when it needs more, before it "
+      "begins unless Order is Local; half the machine's when absent"},
      {"MinSize", Presence::kOptional, ValueKind::kInteger,
       "with Seamless and MergeAlgorithm 1: segments of fewer pixels join at the end the neighbour "
       "that costs least, the smallest first; 0 when absent"},

@@ -211,7 +211,7 @@ TEST(SeamlessSegmentation, LocalOrderDependsOnNoStripsThreadsOrMemory) {
   CheckRounds<std::uint8_t>(150, 260, 50);
   CheckRounds<std::uint16_t>(150, 260, 5000);
   CheckRounds<float>(150, 260, 5000);
-  CheckRounds<float>(90, 300, 1e9);
+  CheckRounds<float>(400, 300, 1e9);
   CheckRounds<std::uint8_t>(1, 300, 5000);
 }
 

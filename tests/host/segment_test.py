@@ -242,6 +242,9 @@ class SegmentTest(FolderTest):
         for words, more in (("--order local goes with", ["--order", "local", "--tiled"]), ("--rounds goes", ["--rounds", 3]),
                             ("--order local goes with", ["--order", "local", "--tree", self.folder / "t"])):
             self.fails(2, words, "segment", path, self.folder / "o.dat", *more)
+        self.fails(1, "bytes of memory, and may take 1000", "segment", path, self.folder / "o.dat", "--order", "local",
+                   "--merge-value", 100, "--memory", 1000)
+        self.assertFalse((self.folder / "o.dat").exists())
 
     def test_estimate_gathers_the_costs_of_all_tiles(self):
         chance = random.Random(3)

@@ -133,7 +133,7 @@ class SegmentVerb final : public RasterVerb {
         .Shows("PIXELS")
         .Within(0, 65535);
     line.Add("--memory", request_.memory,
-             "Bytes that merging may take, else it isn't begun; half the machine's by default")
+             "Bytes that merging may take, else it fails; half the machine's by default")
         .Shows("BYTES")
         .Within(1, 1ULL << 62U);
     line.Add("--borders", request_.isBorders,
