@@ -185,6 +185,7 @@ Json ToJson(const MosaicSceneHeader& header, const std::string& systemOfMosaic) 
             {"interleave", FormatValue(header.interleave).ToUTF8()}};
   if (!header.format.empty()) json["format"] = header.format;
   if (!header.palettes.empty()) json["palettes"] = header.palettes;
+  if (!header.details.empty()) json["details"] = header.details;
   if (header.tileWidth != 0 || header.tileHeight != 0) {
     json["tile"] = {header.tileWidth, header.tileHeight};
   }
@@ -215,6 +216,14 @@ MosaicSceneHeader ReadHeader(const Json& json, const std::string& pointer,
     if (!bands.is_array()) throw JsonMisfit{fields.PointerOf("palettes"), "has to be a list"};
     for (const Json& band : bands) {
       header.palettes.push_back(JsonFields::As<unsigned>(band, fields.PointerOf("palettes")));
+    }
+  }
+  if (fields.Has("details")) {
+    const Json& details = fields.At("details");
+    const std::string at = fields.PointerOf("details");
+    if (!details.is_object()) throw JsonMisfit{at, "has to be an object"};
+    for (const auto& [name, text] : details.items()) {
+      header.details[name] = JsonFields::As<std::string>(text, at + "/" + name);
     }
   }
   const auto pair = [&](const char* name, unsigned& first, unsigned& second) {

@@ -2,6 +2,7 @@
 
 #include <array>
 #include <functional>
+#include <map>
 #include <optional>
 #include <string>
 #include <vector>
@@ -28,6 +29,8 @@ struct MosaicSceneHeader {
   unsigned levelMax = 0;
   std::vector<std::optional<double>> noData;  ///< of each band
   std::vector<unsigned> palettes;             ///< numbers of the bands that have one
+  std::map<std::string, std::string>
+      details;  ///< of the bands: "Bands/0/Unit", see raster_details.h
   GeoRefPtr geoRef;
   std::string state;  ///< of the scene's files, see StateOfScene
 };

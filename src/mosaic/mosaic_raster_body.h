@@ -17,6 +17,7 @@
 #include "raster/block_strides.h"
 #include "raster/pixel_states.h"
 #include "raster/pixel_value.h"
+#include "raster/raster_details.h"
 #include "warp/projected_raster.h"
 
 namespace lumo {
@@ -140,6 +141,8 @@ void MosaicRaster<T>::SetUp() {
   for (const RasterPtr<T>& scene : definition_->Scenes()) {
     const RasterDef def = scene ? scene->GetRasterDef() : RasterDef();
     const Place place = PlaceOf(def);
+    if (places_.empty()) AddBandDetails(def_.metadata, 0, def.metadata);
+    KeepSharedBandDetails(def_.metadata, def.metadata);
     places_.push_back(place);
     areAllOnGrid = areAllOnGrid && place.isOnGrid;
     if (place.right < place.left || place.bottom < place.top) continue;

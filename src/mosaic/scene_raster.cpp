@@ -10,6 +10,7 @@
 #include "foundation/fault.h"
 #include "pyramid/exact_levels.h"
 #include "raster/pixel_value.h"
+#include "raster/raster_details.h"
 #include "views/sources/catalog_raster_ref.h"
 #include "views/sources/file_state.h"
 
@@ -125,6 +126,12 @@ bool ReadSceneHeader(const BasicRaster& raster, const MosaicScene& scene, Mosaic
   for (unsigned band = 0; band < header.bands; ++band) {
     if (raster.HasPalette(band)) header.palettes.push_back(band);
   }
+  constexpr std::size_t kLongest = 1U << 16U;  // longer ones are for the scenes to tell
+  for (const std::string& name : DetailNames(def.metadata)) {
+    const std::string text = FindDetail(def.metadata, DetailPath(name));
+    const bool isOfBand = name.starts_with("Bands/") && !name.ends_with("/NoDataValue");
+    if (isOfBand && text.size() <= kLongest) header.details[name] = text;
+  }
   header.noData.resize(header.bands);
   for (const auto& [band, value] : def.noData) {
     if (band < header.bands && raster.HasNoDataValue(band)) header.noData[band] = value;
@@ -159,6 +166,9 @@ SceneRaster<T>::SceneRaster(const MosaicScene& scene, unsigned number,
     if (header.noData[band]) def_.noData[band] = *header.noData[band];
   }
   def_.SetGeoRef(header.geoRef);
+  for (const auto& [name, text] : header.details) {
+    def_.metadata.Set(DetailPath(name), String(text));
+  }
 }
 
 template <typename T>

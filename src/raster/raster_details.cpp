@@ -146,6 +146,18 @@ void AddBandDetails(Metadata& metadata, unsigned offset, const Metadata& other) 
   }
 }
 
+void KeepSharedBandDetails(Metadata& metadata, const Metadata& other) {
+  for (const std::string& name : DetailNames(metadata)) {
+    unsigned band = 0;
+    std::string rest;
+    if (!SplitBandName(name, band, rest)) continue;
+    const String path = DetailPath(name);
+    const bool isShared =
+        rest != "NoDataValue" && FindDetail(metadata, path) == FindDetail(other, path);
+    if (!isShared) metadata.Remove(path);
+  }
+}
+
 void MovePlaceDetails(Metadata& metadata, unsigned left, unsigned top) {
   for (const std::string& name : DetailNames(metadata)) {
     const bool isGrid = name == kGrid;

@@ -68,6 +68,10 @@ VEXG_EXPORT void ChooseBandDetails(Metadata& metadata, const Array<unsigned>& ba
 /// @param offset  band in `metadata` of the other's band 0.
 VEXG_EXPORT void AddBandDetails(Metadata& metadata, unsigned offset, const Metadata& other);
 
+/// Drops the details of bands that another raster hasn't got, or has otherwise; exact no-data
+/// values are dropped too.
+VEXG_EXPORT void KeepSharedBandDetails(Metadata& metadata, const Metadata& other);
+
 /// Moves the details of the place to an origin that lies at a pixel of the raster.
 VEXG_EXPORT void MovePlaceDetails(Metadata& metadata, unsigned left, unsigned top);
 

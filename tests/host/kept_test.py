@@ -34,7 +34,8 @@ print(1)
 VERBS = {"copy": lambda source, made: ["copy", source, made],
          "clip": lambda source, made: ["copy", source, made, "--rect", "2,3,30,20"],
          "warp": lambda source, made: ["warp", source, made, "--to", "EPSG:32634"],
-         "stack": lambda source, made: ["stack", made, source]}
+         "stack": lambda source, made: ["stack", made, source],
+         "mosaic": lambda source, made: ["mosaic", "build", made, source, "--no-matching"]}
 FORMATS = {"tiles": ("made.tif", []), "plain": ("made.tif", ["--compress", "none"]), "cog": ("made.tif", ["--cog"]),
            "imagine": ("made.img", [])}
 # LOOK at several files by one run.

@@ -424,9 +424,17 @@ class MosaicVerb final : public RasterVerb {
 
   RasterInfo PlanRaster(JobSession& /*session*/, const JobResults& /*opened*/,
                         const RasterInfo& source) override {
+    haveCodes_ = HoldsCodes(source, ParseBands("", source));
     return source;
   }
   bool CopiesBlocksOfSource() const override { return false; }
+  /// Values that are matched or mixed aren't those that the palettes are of.
+  bool KeepsPalettes() const override {
+    return isUnmatched_ && creation_.feather == 0 && creation_.resampling == "nearest";
+  }
+  std::string GetOverviewMethod() const override {
+    return haveCodes_ && KeepsPalettes() ? "Nearest" : "Average";
+  }
 
   // Showing.
 
@@ -539,6 +547,7 @@ class MosaicVerb final : public RasterVerb {
   FootprintOptions footprints_;
   unsigned level_ = 0;
   bool isUnmatched_ = false;
+  bool haveCodes_ = false;
   bool isSeamless_ = false;
   bool isJson_ = false;
   unsigned size_ = 1024;
