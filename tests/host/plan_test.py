@@ -116,6 +116,18 @@ class Parts(PlanTest):
         self.fine("run", "--once", "-q", place / "part-0000.xml")
         self.assertTrue((place / "o.fxv").exists())
 
+    def test_what_a_document_would_lose_is_said_and_complex_numbers_stay_whole(self):
+        code, _, err = run("plan", "--parts", "2", "-o", str(self.folder / "a"), "warp", str(SCENE),
+                           str(self.folder / "a.dat"), "--to", "EPSG:4326")
+        self.assertEqual(code, 0)
+        self.assertRegex(err, r"\Avexg: note: the format ORVA keeps [^\n]+\n\Z")
+        code, _, err = run("plan", "--parts", "2", "-o", str(self.folder / "b"), "copy", str(DATA / "complex64.tif"),
+                           str(self.folder / "b.tif"))
+        self.assertEqual(code, 0)
+        self.assertRegex(err, r"\Avexg: note: CopyRasterCommand [^\n]+ complex numbers [^\n]+\n\Z")
+        self.fine("run", "--once", "-q", self.folder / "b" / "part-0000.xml")
+        self.assertTrue((self.folder / "b.tif").exists())
+
     def test_a_document_of_ones_own_can_be_planned_with_names_of_its_folder(self):
         shutil.copyfile(SCENE, self.folder / "scene.tif")
         job = self.folder / "job.xml"

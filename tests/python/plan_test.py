@@ -74,7 +74,8 @@ class Dask(FolderTest):
                 process = self.start(place)
                 # Programs at work, and once a worker.
                 for victims in (b"run\0--once", b"run\0--once", b"spawn_main", b"run\0--once"):
-                    until = time.monotonic() + 10
+                    # A worker that dies before the cluster is there ends that; so programs are awaited first.
+                    until = time.monotonic() + 60
                     found = []
                     while not found and process.poll() is None and time.monotonic() < until:
                         found = [each for each in descendants(process.pid) if victims in command_of(each)]

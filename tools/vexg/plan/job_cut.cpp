@@ -88,6 +88,7 @@ class Cutter {
     FindFirst();
     FindCuts();
     for (Cut& cut : cuts_) Measure(cut);
+    DropOddTypes();
     ChoosePlaces();
     CutJobs made;
     AddFirst(made);
@@ -268,6 +269,34 @@ class Cutter {
     cut.source = ReadInfo(session.Run(draft), "measured");
   }
 
+  /// Leaves whole what there are no views on, and questions what the single run of a verb looks at
+  /// and a document doesn't.
+  void DropOddTypes() {
+    const auto isOdd = [this](const Cut& cut) {
+      const bool isEight =
+          DispatchType(EightTypes{}, cut.source.dataType, []<typename T>() { return true; });
+      if (isEight || cut.division->kind != DivisionKind::kRows) return false;
+      notes_.push_back(
+          fmt::format("{} ({}): lines of complex numbers can't be divided; one "
+                      "document does all of it",
+                      At(cut.at).id, At(cut.at).name));
+      return true;
+    };
+    std::erase_if(cuts_, isOdd);
+    for (const Cut& cut : cuts_) {
+      if (cut.division->kind != DivisionKind::kRows) continue;
+      const std::string* const format = At(cut.create).Find("Format");
+      const bool hasNoData = At(cut.create).Find("NoDataValue") != nullptr ||
+                             std::all_of(cut.source.hasNoData.begin(), cut.source.hasNoData.end(),
+                                         [](bool has) { return has; });
+      if (format == nullptr || *format != "ORVA" || hasNoData) continue;
+      notes_.emplace_back(
+          "the format ORVA keeps which pixels are valid by a no-data value alone; a verb chooses "
+          "one "
+          "where it has to, a document doesn't");
+    }
+  }
+
   static bool IsRaster(const JobOutput& output) { return output.name.ends_with("URI"); }
 
   static void AddTo(JobDraft& draft, const JobCommand& command) {
@@ -340,7 +369,7 @@ class Cutter {
     for (const Cut* const cut : cuts) {
       if (cut->division->kind != DivisionKind::kRows || cut->source.lines == 0) continue;
       const std::uint64_t line = BytesOf(*cut) / cut->source.lines;
-      memory += 3 * line * kTileLines * (isMerge ? 2 : 1);
+      memory += 3 * line * kTileLines * (isMerge ? 3 : 1);
     }
     return memory;
   }

@@ -212,10 +212,11 @@ class OnceRun {
     all["outputs"] = AsJson(made);
     all["inputs"] = AsJson(read);
     all.update(ResultAsJson(document, result));
+    const std::string text = all.dump(1) + "\n";
+    if (!request_.isDurable) return Output(resultPath_).Write(text);
     std::string fault;
-    if (!platform::ReplaceFile(resultPath_, all.dump(1) + "\n", &fault)) {
-      throw HostError(kExitFailed, "the result can't be written: " + fault);
-    }
+    if (platform::ReplaceFile(resultPath_, text, &fault)) return;
+    throw HostError(kExitFailed, "the result can't be written: " + fault);
   }
 
   const OnceRequest& request_;
