@@ -12,7 +12,6 @@
 #include "rasters/map_points.h"
 #include "rasters/value_names.h"
 #include "verb.h"
-#include "viewer/viewed_shapes.h"
 #include "views/sources/catalog_raster_ref.h"
 
 namespace lumo::host {
@@ -94,7 +93,7 @@ ViewedScene::ViewedScene(JobDoor& door, const ViewRequest& request, WorkFolder& 
     shapeNames_.push_back(std::filesystem::path(request.mosaic).filename().string());
   }
   if (!request.shapes.empty()) {
-    shapes_.push_back(ReadViewedShapes(request.shapes, grid_));
+    shapes_.emplace_back(request.shapes, grid_);
     shapeNames_.push_back(std::filesystem::path(request.shapes).filename().string());
   }
 }

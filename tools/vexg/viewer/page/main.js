@@ -60,10 +60,9 @@ function makeLayers(scene, map) {
 
 async function addShapes(scene, map, entries) {
   for (const [number, name] of scene.shapes.entries()) {
-    const collection = await get(`shapes/${number}`);
-    for (const entry of shapeLayers(name, collection)) {
+    for (const entry of await shapeLayers(map, number, name, onFault)) {
       map.addLayer(entry.layer);
-      entries.push({...entry, note: collection.more ? texts.shapesMore : undefined});
+      entries.push(entry);
     }
   }
 }
