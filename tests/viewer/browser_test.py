@@ -239,6 +239,20 @@ class SmallScene(BrowserTest):
             self.drive(viewer, "picture", file=str(folder / "view-swipe.png"), keys=["s"], point=(120, 150), dark=True)
 
 
+class Shapes(BrowserTest):
+    def test_many_shapes_come_with_the_view_and_the_page_says_what_it_leaves_out(self):
+        file = self.folder / "points.geojson"
+        file.write_text(json.dumps({"type": "FeatureCollection", "crs": None, "features": [
+            {"type": "Feature", "properties": {}, "geometry": {"type": "Point", "coordinates": [2.03 * x, 2.03 * y]}}
+            for y in range(170) for x in range(170)]}))
+        with Viewer(DATA / "landsat7_rgb.png", "--shapes", file) as viewer:
+            found = self.drive(viewer, "manyShapes", axe=True)
+        self.assertEqual(found["counts"][0], 20000)
+        self.assertEqual(found["note"], "The 8900 smallest of 28900 shapes in view are not drawn.")
+        self.assertTrue(1000 < found["counts"][1] < 20000, found)
+        self.assertEqual(found["noteAfter"], "")
+
+
 class Mosaics(BrowserTest):
     def test_footprints_and_seams_are_drawn(self):
         mosaic = self.folder / "m.vmosaic"

@@ -4,6 +4,7 @@ import array
 import json
 import math
 import os
+import re
 import socket
 import struct
 import subprocess
@@ -169,6 +170,19 @@ class Answers(FolderTest):
             real, imaginary = struct.unpack("<2f", gdal_pixels(DATA / "complex64.tif", "-srcwin", "5", "6", "1", "1"))
             self.assertAlmostEqual(complex(value.replace("i", "j")), complex(real, imaginary), 4)
             self.assertEqual(viewer.ask("/api/tile/0/0/0/0?bands=0")[0], 200)
+
+    def test_bands_are_told_with_their_names_and_wavelengths(self):
+        file = self.folder / "named.vrt"
+        subprocess.run(["gdal_translate", "-q", "-of", "VRT", "-b", "1", "-b", "2", "-b", "3", "-b", "4", SCENE, file], check=True)
+        text = file.read_text()
+        names = ("640.5 nm", "0.55 um", "vegetation", "12 dB")
+        for number, name in enumerate(names, 1):
+            text = re.sub(rf'(<VRTRasterBand [^>]*band="{number}"[^>]*>)', rf"\1<Description>{name}</Description>", text)
+        file.write_text(text)
+        subprocess.run(["gdal_translate", "-q", file, self.folder / "named.tif"], check=True)
+        with Viewer(self.folder / "named.tif") as viewer:
+            told = viewer.get("scene")["rasters"][0]
+        self.assertEqual((told["bandNames"], told["wavelengths"]), (list(names), [640.5, 550.0, None, None]))
 
     def test_another_grid_is_carried_to_the_first(self):
         moved = self.folder / "moved.tif"

@@ -18,6 +18,7 @@ import {makeTools, showHelp, toggleDark} from './tools.js';
 
 const kAliveMs = 20000;
 const kSilentMs = 15000;
+const kSmall = 4 << 20;  // pixels of a raster for which a pyramid changes nothing that can be seen
 
 function say(text, isFault = false) {
   const notice = document.getElementById('notice');
@@ -52,7 +53,7 @@ function makeLayers(scene, map) {
     list.push(layer);
     if (raster.role !== 'labels') map.addLayer(layer.layer);
     if (raster.role === 'labels') layer.layer.setZIndex(10);
-    const canBuild = !raster.hasLevels && raster.levels > 2 && raster.isFile && number === 0;
+    const canBuild = !raster.hasLevels && raster.samples * raster.lines > kSmall && raster.isFile && number === 0;
     return {name: raster.name, layer: layer.layer, number, canBuild};
   });
   return {...made, entries};
@@ -121,6 +122,7 @@ async function start() {
       const name = named.get(number)?.nameOf(value);
       return name ? `${value} ${name}` : value;
     },
+    bandsOf: (number) => images.find((image) => image.number === number)?.shownBands() ?? [0],
     costOf: () => segments.at(-1)?.cost ?? 0, onFault,
   });
   new ScaleBar(map, first);
