@@ -13,7 +13,7 @@
 
 namespace lumo::host {
 
-/// What a user wants to see: files, and rasters that are open behind the door.
+/// The files that a user wants to see, and the rasters that are open behind the door.
 struct ViewRequest {
   std::vector<std::string> files;
   std::vector<String> open{};                   ///< URIs; those that can't be shown are left out
