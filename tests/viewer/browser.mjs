@@ -204,6 +204,18 @@ const scenarios = {
     found.layers = await page.locator('.layer label').allTextContents();
   },
 
+  async serverGone() {
+    await center(150, 150);
+    process.kill(options.server);
+    await rest(300);
+    await page.mouse.move(...await screenOf(100, 100));
+    await page.locator('#notice.fault').waitFor();
+    await page.mouse.move(...await screenOf(90, 90));
+    await center(0, 0, 0.5);
+    found.notice = await page.locator('#notice').textContent();
+    found.console = found.console.filter((text) => !/status of 422/.test(text));
+  },
+
   async manyShapes() {
     const count = () => page.evaluate(() => vexgView.map.getLayers().getArray()
       .filter((layer) => layer.getSource().getFeatures && layer.getZIndex() !== 50)

@@ -15,7 +15,7 @@ import unittest
 
 from viewer import Viewer
 
-from support import BUILD, DATA, SANITIZED, SOURCE, FolderTest, needs_data, run, use_system_python
+from support import BUILD, DATA, SANITIZED, SOURCE, VEXG, FolderTest, needs_data, run, use_system_python
 
 HERE = pathlib.Path(__file__).parent
 CHROMIUM = shutil.which("chromium") or shutil.which("chromium-browser")
@@ -237,6 +237,17 @@ class SmallScene(BrowserTest):
         make_raster(infrared, [bands[number] for number in (3, 2, 1)], gdal.Open(str(SCENE)).GetGeoTransform(), 31985)
         with Viewer(SCENE, infrared) as viewer:
             self.drive(viewer, "picture", file=str(folder / "view-swipe.png"), keys=["s"], point=(120, 150), dark=True)
+
+
+class Servers(BrowserTest):
+    def test_a_page_says_in_one_line_that_its_server_has_gone(self):
+        name = f"paged{os.getpid()}"
+        with subprocess.Popen([VEXG, "serve", "--quiet", name]) as server:
+            self.addCleanup(server.kill)
+            with Viewer("--server", name, SCENE) as viewer:
+                found = self.drive(viewer, "serverGone", server=server.pid)
+                self.assertEqual(found["notice"], f'the server "{name}" has gone away')
+                self.assertEqual(viewer.end(), (3, f'vexg: the server "{name}" has gone away\n'))
 
 
 class Shapes(BrowserTest):
