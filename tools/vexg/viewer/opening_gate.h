@@ -6,8 +6,8 @@
 namespace lumo::host {
 
 /// A lock that many hold at once to read a raster, which may open it by its name, and one alone
-/// while a source is opened anew. Who wants to be alone goes before all that come later: a page that
-/// asks for tiles without end does not keep a pyramid from being built.
+/// while a source is opened anew. Who wants to be alone goes before all that come later: a page
+/// that asks for tiles without end does not keep a pyramid from being built.
 class OpeningGate {
  public:
   std::shared_lock<std::shared_mutex> Enter() {
