@@ -13,9 +13,12 @@ const origin = new URL(address).origin;
 
 const rest = (ms) => new Promise((resolve) => setTimeout(resolve, ms));
 const found = {console: [], elsewhere: []};
-const browser = await chromium.launch({executablePath, args: ['--no-sandbox', '--disable-dev-shm-usage']});
+const browser = await chromium.launch({executablePath, args: [
+  '--no-sandbox', '--disable-dev-shm-usage',
+  // The network is cut: no other host is ever found.
+  `--host-resolver-rules=MAP * ~NOTFOUND, EXCLUDE ${new URL(address).hostname}`]});
 const context = await browser.newContext({
-  viewport: {width: 1360, height: 860}, acceptDownloads: true, colorScheme: options.dark ? 'dark' : 'light'});
+  viewport: {width: options.width ?? 1360, height: 860}, acceptDownloads: true, colorScheme: options.dark ? 'dark' : 'light'});
 const page = await context.newPage();
 page.on('console', (message) => { if (message.type() !== 'log') found.console.push(message.text()); });
 page.on('pageerror', (error) => found.console.push(error.message));
@@ -201,6 +204,34 @@ const scenarios = {
     found.layers = await page.locator('.layer label').allTextContents();
   },
 
+  async serverGone() {
+    await center(150, 150);
+    process.kill(options.server);
+    await rest(300);
+    await page.mouse.move(...await screenOf(100, 100));
+    await page.locator('#notice.fault').waitFor();
+    await page.mouse.move(...await screenOf(90, 90));
+    await center(0, 0, 0.5);
+    found.notice = await page.locator('#notice').textContent();
+    found.console = found.console.filter((text) => !/status of 422/.test(text));
+  },
+
+  async manyShapes() {
+    const count = () => page.evaluate(() => vexgView.map.getLayers().getArray()
+      .filter((layer) => layer.getSource().getFeatures && layer.getZIndex() !== 50)
+      .map((layer) => layer.getSource().getFeatures().length)[0]);
+    const wait = async (before) => {
+      for (let i = 0; i < 300 && (await count()) === before; ++i) await rest(50);
+      return count();
+    };
+    await page.waitForFunction(() => document.querySelector('.layer .note')?.textContent !== '');
+    found.note = await page.locator('.layer .note').textContent();
+    found.counts = [await count()];
+    await center(200, 100, 0.25);
+    found.counts.push(await wait(found.counts[0]));
+    found.noteAfter = await page.locator('.layer .note').textContent();
+  },
+
   async print() {
     await page.evaluate(() => { window.print = () => { window.printed = true; }; });
     await page.getByLabel('Built-up', {exact: true}).uncheck();
@@ -212,6 +243,7 @@ const scenarios = {
     await page.keyboard.press('i');
     await page.waitForFunction(() => window.printed);
     found.states = [before, await state()];
+    const shown = await page.evaluate(() => parseFloat(document.getElementById('scale-line').style.width) / vexgView.map.getSize()[0]);
     await page.emulateMedia({media: 'print'});
     found.printed = await page.evaluate(() => [...document.body.children]
       .filter((each) => each.checkVisibility()).map(({id}) => id));
@@ -224,7 +256,6 @@ const scenarios = {
     });
     if (options.page) await page.screenshot({path: options.page, fullPage: true});
     await page.emulateMedia({media: 'screen'});
-    const shown = await page.evaluate(() => parseFloat(document.getElementById('scale-line').style.width) / vexgView.map.getSize()[0]);
     found.picture.push(shown);
     await page.getByLabel('Built-up', {exact: true}).check();
   },

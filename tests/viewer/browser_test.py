@@ -15,7 +15,7 @@ import unittest
 
 from viewer import Viewer
 
-from support import BUILD, DATA, SANITIZED, SOURCE, FolderTest, needs_data, run, use_system_python
+from support import BUILD, DATA, SANITIZED, SOURCE, VEXG, FolderTest, needs_data, run, use_system_python
 
 HERE = pathlib.Path(__file__).parent
 CHROMIUM = shutil.which("chromium") or shutil.which("chromium-browser")
@@ -237,6 +237,31 @@ class SmallScene(BrowserTest):
         make_raster(infrared, [bands[number] for number in (3, 2, 1)], gdal.Open(str(SCENE)).GetGeoTransform(), 31985)
         with Viewer(SCENE, infrared) as viewer:
             self.drive(viewer, "picture", file=str(folder / "view-swipe.png"), keys=["s"], point=(120, 150), dark=True)
+
+
+class Servers(BrowserTest):
+    def test_a_page_says_in_one_line_that_its_server_has_gone(self):
+        name = f"paged{os.getpid()}"
+        with subprocess.Popen([VEXG, "serve", "--quiet", name]) as server:
+            self.addCleanup(server.kill)
+            with Viewer("--server", name, SCENE) as viewer:
+                found = self.drive(viewer, "serverGone", server=server.pid)
+                self.assertEqual(found["notice"], f'the server "{name}" has gone away')
+                self.assertEqual(viewer.end(), (3, f'vexg: the server "{name}" has gone away\n'))
+
+
+class Shapes(BrowserTest):
+    def test_many_shapes_come_with_the_view_and_the_page_says_what_it_leaves_out(self):
+        file = self.folder / "points.geojson"
+        file.write_text(json.dumps({"type": "FeatureCollection", "crs": None, "features": [
+            {"type": "Feature", "properties": {}, "geometry": {"type": "Point", "coordinates": [2.03 * x, 2.03 * y]}}
+            for y in range(170) for x in range(170)]}))
+        with Viewer(DATA / "landsat7_rgb.png", "--shapes", file) as viewer:
+            found = self.drive(viewer, "manyShapes", axe=True)
+        self.assertEqual(found["counts"][0], 20000)
+        self.assertEqual(found["note"], "The 8900 smallest of 28900 shapes in view are not drawn.")
+        self.assertTrue(1000 < found["counts"][1] < 20000, found)
+        self.assertEqual(found["noteAfter"], "")
 
 
 class Mosaics(BrowserTest):

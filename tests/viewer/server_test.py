@@ -4,6 +4,7 @@ import array
 import json
 import math
 import os
+import re
 import socket
 import struct
 import subprocess
@@ -170,6 +171,19 @@ class Answers(FolderTest):
             self.assertAlmostEqual(complex(value.replace("i", "j")), complex(real, imaginary), 4)
             self.assertEqual(viewer.ask("/api/tile/0/0/0/0?bands=0")[0], 200)
 
+    def test_bands_are_told_with_their_names_and_wavelengths(self):
+        file = self.folder / "named.vrt"
+        subprocess.run(["gdal_translate", "-q", "-of", "VRT", "-b", "1", "-b", "2", "-b", "3", "-b", "4", SCENE, file], check=True)
+        text = file.read_text()
+        names = ("640.5 nm", "0.55 um", "vegetation", "12 dB")
+        for number, name in enumerate(names, 1):
+            text = re.sub(rf'(<VRTRasterBand [^>]*band="{number}"[^>]*>)', rf"\1<Description>{name}</Description>", text)
+        file.write_text(text)
+        subprocess.run(["gdal_translate", "-q", file, self.folder / "named.tif"], check=True)
+        with Viewer(self.folder / "named.tif") as viewer:
+            told = viewer.get("scene")["rasters"][0]
+        self.assertEqual((told["bandNames"], told["wavelengths"]), (list(names), [640.5, 550.0, None, None]))
+
     def test_another_grid_is_carried_to_the_first(self):
         moved = self.folder / "moved.tif"
         subprocess.run(["gdal_translate", "-q", "-srcwin", "40", "30", "200", "150", SCENE, moved], check=True)
@@ -252,6 +266,27 @@ class Answers(FolderTest):
             self.assertAlmostEqual(x, float(out[0]), 3)
             self.assertAlmostEqual(y, float(out[1]), 3)
             self.assertEqual(told["features"][0]["properties"]["name"], "a")
+
+    def test_a_view_of_many_shapes_has_those_that_it_shows(self):
+        shapes, side = self.folder / "s.geojson", 160  # squares of 1.5 pixels each way, and a large one over them
+        square = lambda x, y, size: [[[x, y], [x + size, y], [x + size, y + size], [x, y + size], [x, y]]]  # noqa: E731
+        shapes.write_text(json.dumps({"type": "FeatureCollection", "crs": None, "features": [
+            {"type": "Feature", "properties": {"n": n}, "geometry": {"type": "Polygon", "coordinates": coordinates}}
+            for n, coordinates in enumerate([square(2 * x, 2 * y, 1.5) for y in range(side) for x in range(side)]
+                                            + [square(0, 0, 340)])]}))
+        with Viewer(DATA / "landsat7_rgb.png", "--shapes", shapes) as viewer:
+            corners = lambda told: [tuple(each["geometry"]["coordinates"][0][0][0]) for each in told["features"]]  # noqa: E731
+            told = viewer.get("shapes/0?rect=20,30,60.5,50&step=0.1")
+            self.assertEqual((told["isWhole"], told["left"], told["inView"]), (False, 0, 21 * 11 + 1))
+            self.assertEqual(sorted(corners(told)), sorted([(2.0 * x, 2.0 * y) for y in range(15, 26)
+                                                            for x in range(10, 31)] + [(0, 0)]))
+            told = viewer.get("shapes/0?rect=0,0,400,400&step=1")  # each is a shape of its own there
+            self.assertEqual((told["inView"], told["left"], len(told["features"])), (25601, 5601, 20000))
+            self.assertIn(340, [point[0] for each in told["features"] for point in each["geometry"]["coordinates"][0][0]])
+            told = viewer.get("shapes/0?rect=0,0,400,400&step=8")  # of 16 on a pixel of the screen one
+            self.assertEqual((told["inView"], told["left"], len(told["features"])), (25601, 0, 1601))
+            for wrong in ("rect=1", "rect=0,0,1,x", "rect=0,0,1,1&step=0", "rect=0,0,1,1&step=-1"):
+                self.assertEqual(viewer.ask(f"/api/shapes/0?{wrong}")[0], 404, wrong)
 
     def test_a_pyramid_can_be_built_and_is_used(self):
         scene = self.folder / "scene.tif"

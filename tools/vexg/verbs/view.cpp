@@ -55,8 +55,9 @@ class SilenceWatch {
               break;
             }
           }
-          // What is still being answered may be held up for good, as by a server that has stopped.
+          // An answer on its way may be held up for good, as by a server that has stopped.
           if (!wake_.wait_for(lock, std::chrono::seconds(10), [this] { return isOver_; })) {
+            Say("what was still being read did not end within 10 s and was given up");
             folder.Remove();
             platform::EndProcess(kExitFailed);
           }

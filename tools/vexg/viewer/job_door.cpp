@@ -1,11 +1,10 @@
 #include "viewer/job_door.h"
 
 #include <memory>
-#include <mutex>
-#include <shared_mutex>
 
 #include "c/vexg.h"
 #include "verb.h"
+#include "viewer/opening_gate.h"
 
 namespace lumo::host {
 namespace {
@@ -31,13 +30,13 @@ class OwnDoor final : public JobDoor {
   }
 
   JobResults RunOpening(const JobDraft& draft) override {
-    const std::unique_lock alone(opening_);
+    const auto alone = opening_.EnterAlone();
     vexg_close(nullptr, nullptr);
     return Run(draft, nullptr, nullptr);
   }
 
   Json Describe(const JobDraft& raster) override {
-    const std::shared_lock shared(opening_);
+    const auto shared = opening_.Enter();
     char* fault = nullptr;
     const LentText text(vexg_describe(raster.Write().ToUTF8().c_str(), &fault));
     if (!text) Throw(fault);
@@ -59,15 +58,14 @@ class OwnDoor final : public JobDoor {
     block.pixels = read.pixels.data();
     block.size = read.pixels.size();
     block.states = read.states.data();
-    const std::shared_lock shared(opening_);
+    const auto shared = opening_.Enter();
     char* fault = nullptr;
     if (vexg_read(raster.Write().ToUTF8().c_str(), &block, nullptr, &fault) == 0) Throw(fault);
     return read;
   }
 
  private:
-  // Held shared where a raster may be opened by its name, and alone where none may.
-  std::shared_mutex opening_;
+  OpeningGate opening_;
 };
 
 }  // namespace

@@ -8,13 +8,13 @@
 #include <list>
 #include <mutex>
 #include <optional>
-#include <shared_mutex>
 #include <thread>
 
 #include "pictures/block_reader.h"
 #include "platform/owned_name.h"
 #include "raster/pixel_types.h"
 #include "verb.h"
+#include "viewer/opening_gate.h"
 
 namespace lumo::host {
 namespace {
@@ -101,13 +101,15 @@ class Watch {
   Watch(JobChannel& channel, std::uint8_t* abort, double* progress)
       : thread_([this, &channel, abort, progress] {
           std::unique_lock lock(mutex_);
-          do {
+          for (bool isLast = false;;) {
             if (abort != nullptr && std::atomic_ref(*abort).load() == 1) channel.Abort();
             if (progress != nullptr) {
               std::atomic_ref(*progress).store(channel.GetProgress()->GetProgress());
             }
-          } while (
-              !wake_.wait_for(lock, std::chrono::milliseconds(50), [this] { return isOver_; }));
+            if (isLast) return;
+            isLast =
+                wake_.wait_for(lock, std::chrono::milliseconds(50), [this] { return isOver_; });
+          }
         }) {}
   ~Watch() {
     {
@@ -189,8 +191,7 @@ struct ServerDoor::Impl {
   std::vector<std::unique_ptr<Line>> free;  // the one used last behind
   std::atomic<bool> isGone = false;
   std::atomic<bool> isServing = false;  // else the one who called tells the user
-  // Held shared where a raster may be opened by its job, and alone where none may.
-  std::shared_mutex opening;
+  OpeningGate opening;
 };
 
 ServerDoor::ServerDoor(const ServerOptions& server) : impl_(std::make_unique<Impl>(server)) {}
@@ -219,7 +220,7 @@ JobResults ServerDoor::Run(const JobDraft& draft, std::uint8_t* abort, double* p
 }
 
 JobResults ServerDoor::RunOpening(const JobDraft& draft) {
-  const std::unique_lock alone(impl_->opening);
+  const auto alone = impl_->opening.EnterAlone();
   std::vector<std::unique_ptr<Line>> lines;
   {
     // Who holds one only lends it for a job, and gets no other one.
@@ -248,7 +249,7 @@ JobResults ServerDoor::RunOpening(const JobDraft& draft) {
 }
 
 Json ServerDoor::Describe(const JobDraft& raster) {
-  const std::shared_lock shared(impl_->opening);
+  const auto shared = impl_->opening.Enter();
   return impl_->With([&](Line& line) {
     JobDraft draft;
     draft.Step("describe", "DescribeRasterCommand").AddInput("URI", line.Open(raster));
@@ -261,7 +262,7 @@ NamedBlock ServerDoor::Read(const JobDraft& raster, const SubRect& rect,
   BlockRequest block{rect, Array<unsigned>(ArrayDims(static_cast<unsigned>(bands.size()))),
                      Interleave::BSQ};
   std::copy(bands.begin(), bands.end(), block.bands.begin());
-  const std::shared_lock shared(impl_->opening);
+  const auto shared = impl_->opening.Enter();
   return impl_->With([&](Line& line) {
     BlockMemory& memory = line.MemoryOf(DataTypeBytes(code));
     memory.Make(block.GetCount());

@@ -3,16 +3,17 @@
 #include <algorithm>
 #include <atomic>
 #include <cmath>
+#include <cstdlib>
 #include <filesystem>
 
 #include <fmt/format.h>
 
+#include "foundation/text_case.h"
 #include "foundation/thrown.h"
 #include "raster/raster_details.h"
 #include "rasters/map_points.h"
 #include "rasters/value_names.h"
 #include "verb.h"
-#include "viewer/viewed_shapes.h"
 #include "views/sources/catalog_raster_ref.h"
 
 namespace lumo::host {
@@ -48,11 +49,24 @@ Json ReadLegend(const ViewedRaster& raster) {
   return legend;
 }
 
-/// The name of a band; empty where nothing says so.
-std::string NameOfBand(const Json& details, unsigned band) {
-  for (const char* const what : {"Name", "Meaning", "Wavelength"}) {
-    const auto at = details.find(fmt::format("Bands/{}/{}", band, what));
-    if (at != details.end() && at->is_string()) return at->get<std::string>();
+/// A detail of a band; empty where there is none.
+std::string DetailOf(const Json& details, unsigned band, const char* what) {
+  const auto at = details.find(fmt::format("Bands/{}/{}", band, what));
+  return at != details.end() && at->is_string() ? at->get<std::string>() : std::string();
+}
+
+/// The wavelength of a band in nm, from its items or its name, as "640 nm"; null for none.
+Json WavelengthOf(const Json& details, unsigned band) {
+  const std::string item = DetailOf(details, band, "Items/wavelength");
+  const std::string text = item.empty() ? DetailOf(details, band, "Description") : item;
+  const std::string unit = item.empty() ? text : DetailOf(details, band, "Items/wavelength_units");
+  char* end = nullptr;
+  const double value = std::strtod(text.c_str(), &end);
+  if (end == text.c_str() || !(value > 0)) return {};
+  const std::string lower = LowerCase(unit);
+  if (lower.ends_with("nm") || lower.starts_with("nano")) return value;
+  if (lower.ends_with("um") || lower.ends_with("\u00b5m") || lower.starts_with("micro")) {
+    return 1000 * value;
   }
   return {};
 }
@@ -94,7 +108,7 @@ ViewedScene::ViewedScene(JobDoor& door, const ViewRequest& request, WorkFolder& 
     shapeNames_.push_back(std::filesystem::path(request.mosaic).filename().string());
   }
   if (!request.shapes.empty()) {
-    shapes_.push_back(ReadViewedShapes(request.shapes, grid_));
+    shapes_.emplace_back(request.shapes, grid_);
     shapeNames_.push_back(std::filesystem::path(request.shapes).filename().string());
   }
 }
@@ -154,9 +168,12 @@ Json ViewedScene::DescribeEntry(const Entry& entry) const {
   constexpr const char* kRoles[] = {"image", "labels", "classes"};
   const ViewedRaster& raster = *entry.raster;
   const Json& told = raster.GetDescription();
-  Json names = Json::array();
+  Json names = Json::array(), meanings = Json::array(), wavelengths = Json::array();
   for (unsigned band = 0; band < raster.Bands(); ++band) {
-    names.push_back(NameOfBand(told["details"], band));
+    const std::string name = DetailOf(told["details"], band, "Description");
+    meanings.push_back(DetailOf(told["details"], band, "Meaning"));
+    names.push_back(name.empty() ? meanings.back() : Json(name));
+    wavelengths.push_back(WavelengthOf(told["details"], band));
   }
   return {{"name", raster.GetName()},
           {"role", kRoles[static_cast<int>(entry.role)]},
@@ -165,6 +182,8 @@ Json ViewedScene::DescribeEntry(const Entry& entry) const {
           {"lines", raster.Lines()},
           {"bands", raster.Bands()},
           {"bandNames", names},
+          {"bandMeanings", meanings},
+          {"wavelengths", wavelengths},
           {"type", told["type"]},
           {"format", told["format"]},
           {"noData", told["noData"]},

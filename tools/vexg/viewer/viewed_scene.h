@@ -8,11 +8,12 @@
 
 #include "viewer/segment_attributes.h"
 #include "viewer/viewed_raster.h"
+#include "viewer/viewed_shapes.h"
 #include "viewer/work_folder.h"
 
 namespace lumo::host {
 
-/// What a user wants to see: files, and rasters that are open behind the door.
+/// The files that a user wants to see, and the rasters that are open behind the door.
 struct ViewRequest {
   std::vector<std::string> files;
   std::vector<String> open{};                   ///< URIs; those that can't be shown are left out
@@ -39,8 +40,8 @@ class ViewedScene {
   std::shared_ptr<const ViewedRaster> GetRaster(std::size_t number, double cost = 0);
   /// The colours and names of a raster's values; null where it has none.
   Json GetLegend(std::size_t number) const;
-  /// The collection of shapes of a number, see ReadViewedShapes.
-  const Json& GetShapes(std::size_t number) const { return shapes_.at(number); }
+  /// The shapes of a number.
+  const ViewedShapes& GetShapes(std::size_t number) const { return shapes_.at(number); }
   std::size_t ShapesCount() const { return shapes_.size(); }
 
   /// The attributes of the segment at a pixel of a raster of labels, see SegmentAttributes::Find.
@@ -92,7 +93,7 @@ class ViewedScene {
 
   JobDoor& door_;
   WorkFolder& folder_;
-  std::vector<Json> shapes_;
+  std::vector<ViewedShapes> shapes_;
   std::vector<std::string> shapeNames_;
   GeoRefPtr grid_;  // of the first raster; empty for none
 

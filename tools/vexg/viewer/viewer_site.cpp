@@ -59,6 +59,18 @@ double CostOf(const http::Request& request) {
   return RealOr(request, "cost", 0);
 }
 
+/// The part that "rect=LEFT,TOP,RIGHT,BOTTOM&step=STEP" names; none where it isn't asked.
+std::optional<ShapeView> ViewOf(const http::Request& request) {
+  const std::string rect = request.Query("rect");
+  if (rect.empty()) return {};
+  const std::vector<std::string> sides = SplitAt(rect, ',');
+  if (sides.size() != 4) throw NotThere();
+  const ShapeView view{RealOf(sides[0]), RealOf(sides[1]), RealOf(sides[2]), RealOf(sides[3]),
+                       RealOr(request, "step", 1)};
+  if (!(view.step > 0)) throw NotThere();
+  return view;
+}
+
 TileStretch::Curve CurveOf(const std::string& word) {
   constexpr const char* kWords[] = {"linear", "sqrt", "gamma", "log"};
   if (word.empty()) return TileStretch::Curve::kLinear;
@@ -172,7 +184,8 @@ http::Answer ViewerSite::Route(const http::Request& request) {
   }
   if (parts.size() < 4) throw NotThere();
   if (what == "shapes" && !isPost) {
-    return AsAnswer(scene_.GetShapes(NumberOf(parts[3], scene_.ShapesCount())));
+    return AsAnswer(
+        scene_.GetShapes(NumberOf(parts[3], scene_.ShapesCount())).Give(ViewOf(request)));
   }
   const std::size_t number = NumberOf(parts[3], scene_.RasterCount());
   if (what == "tile" && !isPost) return GiveTile(parts, request);

@@ -3,11 +3,19 @@ import {PixelTiles, arrayOf, bandsOfTiles} from './pixel_tiles.js';
 import {get} from './server.js';
 import {BrightnessTable, colorsOf, endsOf, paintChannels, paintPalette} from './stretch.js';
 
-/** The bands that look natural: by their meanings, else the first ones. */
+const kNatural = [650, 550, 470];  // nm
+
+/** The bands that look natural: by their meanings, names or wavelengths, else the first ones. */
 function naturalBands(raster) {
-  const lower = raster.bandNames.map((name) => name.toLowerCase());
-  const named = ['red', 'green', 'blue'].map((color) => lower.indexOf(color));
-  if (named.every((band) => band >= 0)) return named;
+  for (const list of [raster.bandMeanings, raster.bandNames]) {
+    const lower = list.map((name) => name.toLowerCase());
+    const named = ['red', 'green', 'blue'].map((color) => lower.indexOf(color));
+    if (named.every((band) => band >= 0)) return named;
+  }
+  const known = raster.wavelengths.flatMap((value, band) => (value === null ? [] : [{value, band}]));
+  const nearest = kNatural.map((wanted) => known.reduce(
+    (best, each) => (Math.abs(each.value - wanted) < Math.abs(best.value - wanted) ? each : best), {value: Infinity, band: -1}));
+  if (nearest.every(({value}, at) => Math.abs(value - kNatural[at]) < 40)) return nearest.map(({band}) => band);
   if (raster.bands >= 3) return raster.bands > 4 ? [2, 1, 0] : [0, 1, 2];
   return [0, 0, 0];
 }

@@ -18,6 +18,7 @@ import {makeTools, showHelp, toggleDark} from './tools.js';
 
 const kAliveMs = 20000;
 const kSilentMs = 15000;
+const kSmall = 4 << 20;  // pixels of a raster for which a pyramid changes nothing that can be seen
 
 function say(text, isFault = false) {
   const notice = document.getElementById('notice');
@@ -52,7 +53,7 @@ function makeLayers(scene, map) {
     list.push(layer);
     if (raster.role !== 'labels') map.addLayer(layer.layer);
     if (raster.role === 'labels') layer.layer.setZIndex(10);
-    const canBuild = !raster.hasLevels && raster.levels > 2 && raster.isFile && number === 0;
+    const canBuild = !raster.hasLevels && raster.samples * raster.lines > kSmall && raster.isFile && number === 0;
     return {name: raster.name, layer: layer.layer, number, canBuild};
   });
   return {...made, entries};
@@ -60,10 +61,9 @@ function makeLayers(scene, map) {
 
 async function addShapes(scene, map, entries) {
   for (const [number, name] of scene.shapes.entries()) {
-    const collection = await get(`shapes/${number}`);
-    for (const entry of shapeLayers(name, collection)) {
+    for (const entry of await shapeLayers(map, number, name, onFault)) {
       map.addLayer(entry.layer);
-      entries.push({...entry, note: collection.more ? texts.shapesMore : undefined});
+      entries.push(entry);
     }
   }
 }
@@ -122,6 +122,7 @@ async function start() {
       const name = named.get(number)?.nameOf(value);
       return name ? `${value} ${name}` : value;
     },
+    bandsOf: (number) => images.find((image) => image.number === number)?.shownBands() ?? [0],
     costOf: () => segments.at(-1)?.cost ?? 0, onFault,
   });
   new ScaleBar(map, first);

@@ -56,10 +56,15 @@ export class PrintSheet {
     window.addEventListener('afterprint', () => { this.isMade = false; });
   }
 
-  fill(canvas) {
+  /** The scale bar of the screen: its text, and its share of the map's width. */
+  getScale() {
     const line = document.getElementById('scale-line');
+    return [document.getElementById('scale-text').textContent, parseFloat(line.style.width || '0') / this.map.getSize()[0]];
+  }
+
+  fill(canvas, [text, share] = this.getScale()) {
     const bar = el('span', {class: 'sheet-line'});
-    bar.style.width = `${(100 * parseFloat(line.style.width || '0')) / this.map.getSize()[0]}%`;
+    bar.style.width = `${100 * share}%`;
     const legends = this.legends().map(({name, rows}) => el('div', {class: 'sheet-legend'}, el('h2', {}, name),
       ...rows.map((row) => {
         const swatch = el('span', {class: 'swatch'});
@@ -67,11 +72,12 @@ export class PrintSheet {
         return el('p', {}, swatch, row.name);
       })));
     this.root.replaceChildren(el('h1', {}, this.title), canvas,
-      el('div', {class: 'sheet-scale'}, document.getElementById('scale-text').textContent, bar), ...legends);
+      el('div', {class: 'sheet-scale'}, text, bar), ...legends);
   }
 
   async print() {
-    this.fill(await makePicture(this.map));
+    const scale = this.getScale();
+    this.fill(await makePicture(this.map), scale);
     this.isMade = true;
     window.print();
   }

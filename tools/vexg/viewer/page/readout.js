@@ -9,9 +9,11 @@ const kMostBands = 12;
 export class Readout {
   /**
    * @param nameOf (number, value) => the text of a value of a raster.
+   * @param bandsOf (number) => the bands of a raster that are shown.
    * @param costOf () => the cost up to which the segments of a tree are merged.
    */
-  constructor(map, rasters, {nameOf, costOf, onFault}) {
+  constructor(map, rasters, {nameOf, bandsOf, costOf, onFault}) {
+    this.bandsOf = bandsOf;
     this.costOf = costOf;
     this.map = map;
     this.rasters = rasters;
@@ -60,8 +62,11 @@ export class Readout {
     if (told.place?.degrees) parts.push([texts.degrees, told.place.degrees.map((value) => value.toFixed(6)).join(', ')]);
     told.values.forEach((values, number) => {
       if (values === null) return;
-      const shown = values.slice(0, kMostBands).map((value) => (value === null ? texts.noData : this.nameOf(number, value)));
-      parts.push([this.rasters[number].name, shown.join('  ') + (values.length > kMostBands ? ' …' : '')]);
+      const text = (value) => (value === null ? texts.noData : this.nameOf(number, value));
+      // Of many bands those that are shown.
+      const shown = values.length <= kMostBands ? values.map(text)
+        : [...new Set(this.bandsOf(number))].map((band) => `${texts.band(band, this.rasters[number].bandNames[band])} = ${text(values[band])}`);
+      parts.push([this.rasters[number].name, shown.join(values.length <= kMostBands ? '  ' : '; ')]);
     });
     this.root.replaceChildren(...parts.map(([name, value]) =>
       el('span', {class: 'part'}, el('b', {}, name), ' ', el('span', {}, value))));

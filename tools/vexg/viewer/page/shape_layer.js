@@ -1,5 +1,8 @@
 // Shapes over the scene, drawn as lines: those of a file, or the footprints and seams of a mosaic.
+import {el} from './dom.js';
 import {CircleStyle, Fill, GeoJSON, Stroke, Style, VectorLayer, VectorSource} from './ol.js';
+import {get} from './server.js';
+import {texts} from './texts.js';
 
 const kColors = ['#4fd1ff', '#ff9d3b', '#b58cff', '#7be07b'];
 
@@ -15,8 +18,8 @@ function flip(geometry) {
   return {...geometry, coordinates: turn(geometry.coordinates)};
 }
 
-/** A layer of each kind of shapes in a collection: [{name, layer}]. */
-export function shapeLayers(name, collection) {
+/** The features of a collection by their kinds. */
+function groupsOf(collection) {
   const groups = new Map();
   for (const feature of collection.features) {
     const kind = feature.properties.layer;
@@ -24,9 +27,50 @@ export function shapeLayers(name, collection) {
     groups.get(kind).push({...feature, geometry: flip(feature.geometry)});
   }
   const format = new GeoJSON();
-  return [...groups].map(([kind, features], at) => {
-    const source = new VectorSource({features: format.readFeatures({type: 'FeatureCollection', features})});
+  for (const [kind, features] of groups) groups.set(kind, format.readFeatures({type: 'FeatureCollection', features}));
+  return groups;
+}
+
+/** Has the layers show what the server gives for each view; a large file is never here as a whole. */
+function follow(map, number, layers, note, onFault) {
+  let isAsking = false, isStale = false;
+  const ask = async () => {
+    isStale = true;
+    if (isAsking) return;
+    isAsking = true;
+    while (isStale) {
+      isStale = false;
+      const [left, bottom, right, top] = map.getView().calculateExtent(map.getSize());
+      try {
+        const told = await get(`shapes/${number}?rect=${left},${-top},${right},${-bottom}&step=${map.getView().getResolution()}`);
+        const groups = groupsOf(told);
+        for (const [kind, layer] of layers) {
+          layer.getSource().clear(true);
+          layer.getSource().addFeatures(groups.get(kind) ?? []);
+        }
+        note.textContent = told.left > 0 ? texts.shapesLeft(told.left, told.inView) : '';
+      } catch (fault) {
+        onFault(fault);
+      }
+    }
+    isAsking = false;
+  };
+  map.on('moveend', ask);
+  ask();
+}
+
+/** A layer of each kind of shapes in a collection: [{name, layer, note}]. */
+export async function shapeLayers(map, number, name, onFault) {
+  const collection = await get(`shapes/${number}`);
+  const groups = groupsOf(collection);
+  const kinds = collection.isWhole ? [...groups.keys()] : collection.layers;
+  const note = collection.isWhole ? undefined : el('span', {role: 'status'});
+  const layers = kinds.map((kind, at) => {
+    const source = new VectorSource({features: groups.get(kind) ?? []});
     const style = styleOf(kColors[at % kColors.length], kind === 'seams');
-    return {name: groups.size > 1 ? `${name}: ${kind}` : name, layer: new VectorLayer({source, style, zIndex: 20 + at})};
+    return [kind, new VectorLayer({source, style, zIndex: 20 + at})];
   });
+  if (!collection.isWhole) follow(map, number, layers, note, onFault);
+  return layers.map(([kind, layer], at) => ({
+    name: kinds.length > 1 ? `${name}: ${kind}` : name, layer, note: at === kinds.length - 1 ? note : undefined}));
 }

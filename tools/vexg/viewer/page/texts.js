@@ -25,7 +25,7 @@ export const texts = {
   layers: 'Layers',
   visible: (name) => `Show ${name}`,
   opacity: (name) => `Opacity of ${name}`,
-  shapesMore: 'only the first shapes are drawn',
+  shapesLeft: (left, count) => `The ${left} smallest of ${count} shapes in view are not drawn.`,
   buildPyramid: 'Build a pyramid',
   buildingPyramid: (percent) => `Building the pyramid: ${percent} %`,
   pyramidDone: 'The pyramid is there.',
