@@ -18,7 +18,7 @@ class StoredItems {
   /// Takes the text of the file beside a raster, `NAME.aux.xml`.
   bool TakeSideFile(const std::string& text, unsigned bands);
 
-  /// What the tag says of a band, by the names of details: Description, Unit, Meaning, Scale and
+  /// The details of a band that the tag has, by their names: Description, Unit, Meaning, Scale and
   /// Offset.
   const std::map<std::string, std::string>& Details(unsigned band) const;
   /// The statistics of a band; nothing where none of all its pixels are stored.

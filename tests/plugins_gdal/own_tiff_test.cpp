@@ -408,7 +408,7 @@ TEST(OwnTiff, StoredStatisticsAreThoseOfGdal) {
   }
 }
 
-/// What GDAL keeps of bands in a tag of the file: names, units, meanings, scales.
+/// GDAL keeps names, units, meanings and scales of bands in a tag of the file.
 TEST(OwnTiff, DetailsOfBandsAreThoseOfGdal) {
   const test::TemporaryDirectory directory;
   using Store = std::function<void(GDALRasterBandH)>;
