@@ -254,9 +254,9 @@ TEST(OwnTiff, IsReadAsGdalReadsIt) {
           Layout layout{type, block, number % 4 == 3 ? 1U : 3U};
           layout.options.push_back(std::string("COMPRESS=").append(codec));
           if (predictor != 1) layout.options.push_back("PREDICTOR=" + std::to_string(predictor));
-          layout.options.push_back(number % 2 == 0 ? "INTERLEAVE=PIXEL" : "INTERLEAVE=BAND");
-          layout.options.push_back(number % 5 == 0 ? "BIGTIFF=YES" : "BIGTIFF=NO");
-          layout.options.push_back("PHOTOMETRIC=MINISBLACK");
+          layout.options.emplace_back(number % 2 == 0 ? "INTERLEAVE=PIXEL" : "INTERLEAVE=BAND");
+          layout.options.emplace_back(number % 5 == 0 ? "BIGTIFF=YES" : "BIGTIFF=NO");
+          layout.options.emplace_back("PHOTOMETRIC=MINISBLACK");
           const char* const noData[] = {nullptr, "7", "-9999", "1e300", "nan"};
           // Left to GDAL: no-data values of doubles, and those beyond what a float can hold.
           const bool isBeyond = type == GDT_Float32 && number % 5 == 3;
