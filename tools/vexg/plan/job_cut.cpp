@@ -9,6 +9,7 @@
 #include <fmt/format.h>
 
 #include "commands/division.h"
+#include "plan/job_slices.h"
 #include "platform/temporary_file.h"
 #include "raster/creation_options.h"
 #include "raster/pixel_types.h"
@@ -30,15 +31,6 @@ struct Cut {
   RasterInfo source{};             ///< the raster that is read
   std::vector<unsigned> firsts{};  ///< of kRows: the first line of each part, and behind the last
 };
-
-/// True for a command that changes nothing that another one sees.
-bool OnlyTells(const std::string& id) {
-  const std::initializer_list<const char*> kBeginnings{"Get",   "Query", "ExtendedQuery",
-                                                       "Check", "Fit",   "Compare"};
-  return id == kClose ||
-         std::any_of(kBeginnings.begin(), kBeginnings.end(),
-                     [&](const char* beginning) { return id.starts_with(beginning); });
-}
 
 std::string NumberArray(const std::vector<unsigned>& numbers) {
   std::string text = fmt::format("1:{} [", numbers.size());
@@ -82,10 +74,10 @@ class Scratch {
 
 class Cutter {
  public:
-  Cutter(const JobCommands& job, const CutRequest& request) : job_(job), request_(request) {}
+  Cutter(const JobCommands& job, const CutRequest& request)
+      : job_(job), request_(request), slices_(job), firstEnd_(slices_.GetFirstEnd()) {}
 
   CutJobs Run() {
-    FindFirst();
     FindCuts();
     for (Cut& cut : cuts_) Measure(cut);
     DropOddTypes();
@@ -104,13 +96,6 @@ class Cutter {
 
  private:
   const JobCommand& At(std::size_t at) const { return job_.commands[at]; }
-  const DivisionDeclaration* DivisionAt(std::size_t at) const {
-    return FindDivision(String(At(at).id));
-  }
-  bool IsFirst(std::size_t at) const {
-    const DivisionDeclaration* const division = DivisionAt(at);
-    return division != nullptr && division->kind == DivisionKind::kFirst;
-  }
   Cut* FindCut(std::size_t at) {
     const auto cut =
         std::find_if(cuts_.begin(), cuts_.end(), [&](const Cut& other) { return other.at == at; });
@@ -119,16 +104,9 @@ class Cutter {
 
   // Choosing what is divided.
 
-  /// Finds where the work ends that has to be done before.
-  void FindFirst() {
-    for (std::size_t at = 0; at < job_.commands.size(); ++at) {
-      if (IsFirst(at)) firstEnd_ = at + 1;
-    }
-  }
-
   void FindCuts() {
     for (std::size_t at = firstEnd_; at < job_.commands.size(); ++at) {
-      const DivisionDeclaration* const division = DivisionAt(at);
+      const DivisionDeclaration* const division = slices_.DivisionAt(at);
       if (division == nullptr) continue;
       std::string why = "it can't be divided";
       if (division->kind == DivisionKind::kRows || division->kind == DivisionKind::kShares) {
@@ -153,11 +131,11 @@ class Cutter {
     if (!when.empty() && (form == nullptr || *form != "Exact")) return when + " is not Exact";
     const std::string* const source = command.Find(cut.division->source);
     if (source == nullptr || !source->starts_with('$')) return "its source is open before the job";
-    for (const std::size_t at : SliceOf(command, cut.at)) {
+    for (const std::size_t at : slices_.SliceOf(command, cut.at)) {
       if (const Cut* const before = FindCut(at)) cut.level = std::max(cut.level, before->level + 1);
-      if (ReadsWhatIsMade(at)) return "it works on files that the job makes";
+      if (slices_.ReadsWhatIsMade(at)) return "it works on files that the job makes";
     }
-    if (ReadsWhatIsMade(cut.at)) return "it works on files that the job makes";
+    if (slices_.ReadsWhatIsMade(cut.at)) return "it works on files that the job makes";
     if (cut.division->kind != DivisionKind::kRows) return {};
     const std::string* const target = command.Find(cut.division->target);
     if (command.Find("Bands") != nullptr) return "it chooses bands itself";
@@ -170,69 +148,6 @@ class Cutter {
       return At(at).id == kCreate ? "" : "its target is no new raster";
     }
     return "its target is open before the job";
-  }
-
-  /// True when a command reads a file that one before it in the job makes.
-  bool ReadsWhatIsMade(std::size_t at) const {
-    if (at < firstEnd_) return false;  // that is done before
-    const std::vector<JobCommand> before(
-        job_.commands.begin() + static_cast<std::ptrdiff_t>(firstEnd_),
-        job_.commands.begin() + static_cast<std::ptrdiff_t>(at));
-    const JobFiles files = FindFiles(before);
-    const std::set<std::string> made(files.made.begin(), files.made.end());
-    for (const JobInput& input : At(at).inputs) {
-      for (const std::string& piece : PiecesOf(input.value)) {
-        if (made.contains(piece)) return true;
-      }
-    }
-    return false;
-  }
-
-  /// The commands before a place that give the variables of `command`, and those that change what
-  /// these have opened; in their order.
-  std::vector<std::size_t> SliceOf(const JobCommand& command, std::size_t end) const {
-    std::set<std::string> wanted;
-    for (const JobInput& input : command.inputs) {
-      for (const std::string& variable : VariablesOf(input)) wanted.insert(variable);
-    }
-    const DivisionDeclaration* const division = FindDivision(String(command.id));
-    if (division != nullptr && division->kind == DivisionKind::kRows) {
-      const std::string* const target = command.Find(division->target);
-      if (target != nullptr) wanted.erase(*target);
-    }
-    return SliceFor(std::move(wanted), end);
-  }
-
-  std::vector<std::size_t> SliceFor(std::set<std::string> wanted, std::size_t end) const {
-    std::set<std::size_t> taken;
-    std::set<std::string> given;
-    for (std::size_t at = end; at-- > 0;) {
-      const bool gives =
-          std::any_of(At(at).outputs.begin(), At(at).outputs.end(),
-                      [&](const JobOutput& output) { return wanted.contains(output.variable); });
-      if (!gives) continue;
-      taken.insert(at);
-      for (const JobOutput& output : At(at).outputs) given.insert(output.variable);
-      for (const JobInput& input : At(at).inputs) {
-        for (const std::string& variable : VariablesOf(input)) wanted.insert(variable);
-      }
-    }
-    for (std::size_t at = 0; at < end; ++at) {
-      if (ChangesGiven(at, given)) taken.insert(at);
-    }
-    return {taken.begin(), taken.end()};
-  }
-
-  bool ChangesGiven(std::size_t at, const std::set<std::string>& given) const {
-    if (OnlyTells(At(at).id) || DivisionAt(at) != nullptr || !At(at).outputs.empty()) return false;
-    bool uses = false;
-    for (const JobInput& input : At(at).inputs) {
-      for (const std::string& variable : VariablesOf(input)) {
-        if (!given.contains(variable)) return false;
-        uses = true;
-      }
-    }
-    return uses;
   }
 
   // Measuring.
@@ -251,8 +166,8 @@ class Cutter {
     for (std::size_t at = 0; at < firstEnd_; ++at) {
       if (!FindFiles({At(at)}).inPlace.empty()) steps.insert(at);
     }
-    for (const std::size_t at : SliceFor({variable}, cut.at)) {
-      if (!IsFirst(at)) steps.insert(at);
+    for (const std::size_t at : slices_.SliceFor({variable}, cut.at)) {
+      if (!slices_.IsFirst(at)) steps.insert(at);
     }
     for (const std::size_t at : steps) {
       JobCommand command = At(at);
@@ -409,7 +324,7 @@ class Cutter {
   void AddWhole(CutJobs& made) {
     CutJob whole{"part-0000", {}, job_.WithoutCommands()};
     for (std::size_t at = 0; at < job_.commands.size(); ++at) {
-      if (!IsFirst(at)) whole.job.commands.push_back(At(at));
+      if (!slices_.IsFirst(at)) whole.job.commands.push_back(At(at));
     }
     if (firstEnd_ != 0) whole.dependsOn.push_back(0);
     whole.memory = MemoryFor({}, false);
@@ -447,8 +362,8 @@ class Cutter {
     for (const Cut& cut : cuts_) {
       if (cut.level != level) continue;
       ofLevel.push_back(&cut);
-      for (const std::size_t at : SliceOf(At(cut.at), cut.at)) {
-        if (!IsFirst(at)) steps.insert(at);
+      for (const std::size_t at : slices_.SliceOf(At(cut.at), cut.at)) {
+        if (!slices_.IsFirst(at)) steps.insert(at);
       }
     }
     std::vector<std::string> opened;
@@ -534,7 +449,7 @@ class Cutter {
     CutJob merge{"merge", {}, job_.WithoutCommands()};
     std::vector<const Cut*> all;
     for (std::size_t at = 0; at < job_.commands.size(); ++at) {
-      if (IsFirst(at)) continue;
+      if (slices_.IsFirst(at)) continue;
       const Cut* const cut = FindCut(at);
       if (cut != nullptr && cut->division->kind == DivisionKind::kRows) {
         AddJoin(*cut, merge.job);
@@ -574,7 +489,8 @@ class Cutter {
 
   const JobCommands& job_;
   const CutRequest& request_;
-  std::size_t firstEnd_ = 0;  // commands before it are done before all others
+  const JobSlices slices_;
+  const std::size_t firstEnd_;  // commands before it are done before all others
   std::vector<Cut> cuts_;
   unsigned parts_ = 1;
   std::vector<std::vector<std::string>> files_;  // by cut: those of its parts

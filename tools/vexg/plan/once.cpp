@@ -5,6 +5,7 @@
 #include <filesystem>
 #include <fstream>
 #include <iterator>
+#include <memory>
 
 #include "commands/catalog_session.h"
 #include "commands/job_parser.h"
@@ -159,12 +160,13 @@ class OnceRun {
     interruption.SetLast();
     platform::SetDurable(request_.isDurable);
     const JobFiles files = FindFiles(commands_.commands);
-    Outputs outputs(interruption, {.overwrite = true, .isDurable = request_.isDurable}, files.read);
-    for (const std::string& file : files.made) outputs.Add(file);
-    outputs.Begin(std::vector<std::uint64_t>(files.made.size(), 0));
+    const OutputRules rules{.overwrite = true, .isDurable = request_.isDurable};
+    auto outputs = std::make_unique<Outputs>(interruption, rules, files.read);
+    for (const std::string& file : files.made) outputs->Add(file);
+    outputs->Begin(std::vector<std::uint64_t>(files.made.size(), 0));
     std::map<std::string, std::string> names;
     for (std::size_t i = 0; i < files.made.size(); ++i) {
-      names[files.made[i]] = outputs.Get(i).GetWorkName();
+      names[files.made[i]] = outputs->Get(i).GetWorkName();
     }
     JobCommands renamed = commands_;
     for (JobCommand& command : renamed.commands) RenameFiles(names, command);
@@ -179,7 +181,7 @@ class OnceRun {
     if (outcome != Outcome::kDone || code != kExitSuccess || hasFault_) {
       return code == kExitSuccess ? kExitFailed : code;
     }
-    Place(outputs, document, result);
+    Place(std::move(outputs), document, result);
     interruption.SetDone();
     return kExitSuccess;
   }
@@ -200,11 +202,12 @@ class OnceRun {
 
   /// Gives the outputs their places, and writes the result. Who comes later finds it, and throws
   /// his own away.
-  void Place(Outputs& outputs, const Document& document, const String& result) {
+  void Place(std::unique_ptr<Outputs> outputs, const Document& document, const String& result) {
     const platform::FolderLock lock(resultPath_);
     lock.IsHeld();  // where there is no lock, the last one wins, with the same
     if (IsDone(ReadResult(resultPath_), planned_.hash)) return;
-    outputs.Commit([] {});
+    outputs->Commit([] {});
+    outputs.reset();  // their folders go before there is a result: nobody comes here after that
     Json all{{"document", planned_.document}, {"hash", planned_.hash}};
     std::vector<PlannedInput> made, read;
     for (const std::string& file : planned_.outputs) made.push_back(LookAt(file));
