@@ -6,6 +6,7 @@
 #include "support/file_bytes.h"
 #include "support/file_size_limit.h"
 #include "support/pyramid_scene.h"
+#include "support/test_types.h"
 
 namespace lumo::test {
 namespace {
@@ -65,13 +66,7 @@ TEST(PyramidPath, ALongRasterIsWalkedWithoutDelay) {
 
 template <typename T>
 class PyramidOfType : public testing::Test {};
-template <typename List>
-struct AsTestTypes;
-template <typename... Ts>
-struct AsTestTypes<TypeList<Ts...>> {
-  using Types = testing::Types<Ts...>;
-};
-TYPED_TEST_SUITE(PyramidOfType, typename AsTestTypes<TwelveTypes>::Types);
+TYPED_TEST_SUITE(PyramidOfType, typename test::AsTestTypes<TwelveTypes>::Types);
 
 TYPED_TEST(PyramidOfType, PixelsAreThoseOfTheRasterOnEveryPath) {
   const struct {

@@ -3,6 +3,7 @@
 
 #include "raster/level_reduction.h"
 #include "support/pyramid_scene.h"
+#include "support/test_types.h"
 
 namespace lumo::test {
 namespace {
@@ -75,13 +76,7 @@ AsyncPtr Build(BasicRaster& raster, LevelReduction reduction, unsigned levelMax)
 
 template <typename T>
 class ReducedLevelsOfType : public testing::Test {};
-template <typename List>
-struct AsTestTypes;
-template <typename... Ts>
-struct AsTestTypes<TypeList<Ts...>> {
-  using Types = testing::Types<Ts...>;
-};
-TYPED_TEST_SUITE(ReducedLevelsOfType, typename AsTestTypes<TwelveTypes>::Types);
+TYPED_TEST_SUITE(ReducedLevelsOfType, typename test::AsTestTypes<TwelveTypes>::Types);
 
 /// Of strips and squares, of bands together and each alone, with a third of the pixels masked and a
 /// no-data value in one band.

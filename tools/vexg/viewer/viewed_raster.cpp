@@ -128,7 +128,8 @@ void ViewedRaster::Open() {
 
 /// Finds the levels of the source's pyramid that may be shown.
 void ViewedRaster::FindLevels() {
-  // Of a carried raster it is that of the source; the views below it that change values have none.
+  // A raster that is carried to another grid shows its source's pyramid, unless views below it
+  // change the values: the pyramid holds the ones from before.
   const bool isChanged = IsComplex(sourceCode_) || IsLong(sourceCode_);
   if (!grid_.IsNull() && isChanged) return;
   const Json& pyramid = (grid_.IsNull() ? description_ : sourceDescription_)["pyramid"];
