@@ -29,8 +29,7 @@ class NumberBlock;
 /// Ownership: shares the raster, which does not know the view.
 /// Threads:   every operation may run on many threads at once. A block is computed by all threads.
 /// Failure:   IsValid() is false, with a fault text, where constants are missing or the raster is
-/// of
-///            another type; operations then give false, 0 or empty.
+///            of another type; operations then give false, 0 or empty.
 /// Cost:      that of reading the bands that are asked for, and of the formula.
 template <typename T>
 class CalibratedRaster final : public ComputedRaster<T> {
