@@ -5,6 +5,7 @@
 
 #include <cstdio>
 
+#include "data/plain_factory.h"
 #include "data/plain_raster_reader.h"
 #include "foundation/fault.h"
 
@@ -72,26 +73,20 @@ class PlaneConnection final : public lumo::PlainRasterConnection {
   }
 };
 
-class PlaneFactory final : public lumo::DataConnectionFactory {
+class PlaneFactory final : public lumo::PlainFactory {
  public:
-  bool IsAvailable() override { return true; }
+  PlaneFactory() : PlainFactory("Plane") {}
+
   bool CanConnect(const Array<String>& connStrings) override {
     unsigned samples = 0, lines = 0;
     return ReadSize(connStrings, samples, lines);
   }
-  lumo::DataConnectionPtr Connect(const Array<String>& connStrings, const lumo::GeoRefPtr& geoRef,
-                                  const lumo::MetadataPtr& metadata) override {
-    const lumo::DataConnectionPtr connection(new PlaneConnection);
-    return connection->Connect(connStrings, geoRef, metadata) ? connection
-                                                              : lumo::DataConnectionPtr();
-  }
   lumo::DataConnectionPtr CreateRaster(const Array<String>&, const lumo::RasterDef&) override {
-    lumo::SetFault("a plane can't be made");
-    return {};
+    return FailWith("a plane can't be made");
   }
-  lumo::DataConnectionPtr CreateVector(const Array<String>&, const lumo::VectorDef&) override {
-    return {};
-  }
+
+ private:
+  lumo::DataConnection* Make() override { return new PlaneConnection; }
 };
 
 }  // namespace

@@ -1,16 +1,15 @@
 #include "gdal_factory.h"
 
-#include "gdal_common/messages.h"
+#include "data/plain_factory.h"
 #include "gdal_connection.h"
 
 namespace lumo {
 namespace {
 
-class GdalFactory final : public DataConnectionFactory {
+class GdalFactory final : public PlainFactory {
  public:
-  explicit GdalFactory(gdal::Format format) : format_(std::move(format)) {}
-
-  bool IsAvailable() override { return true; }
+  explicit GdalFactory(gdal::Format format)
+      : PlainFactory(format.key), format_(std::move(format)) {}
 
   bool CanConnect(const Array<String>& connStrings) override {
     gdal::Source source;
@@ -18,27 +17,8 @@ class GdalFactory final : public DataConnectionFactory {
            gdal::IsOfFormat(source, format_, GDAL_OF_RASTER);
   }
 
-  DataConnectionPtr Connect(const Array<String>& connStrings, const GeoRefPtr& geoRef,
-                            const MetadataPtr& metadata) override {
-    return Open([&](DataConnection& made) { return made.Connect(connStrings, geoRef, metadata); });
-  }
-
-  DataConnectionPtr CreateRaster(const Array<String>& connStrings, const RasterDef& def) override {
-    return Open([&](RasterDataConnection& made) { return made.CreateRaster(connStrings, def); });
-  }
-
-  DataConnectionPtr CreateVector(const Array<String>&, const VectorDef&) override {
-    gdal::FailWith(format_.key, "holds no vectors");
-    return {};
-  }
-
  private:
-  template <typename Start>
-  DataConnectionPtr Open(Start&& start) {
-    auto* const made = new gdal::Connection(format_);
-    DataConnectionPtr owner(made);
-    return start(*made) ? owner : DataConnectionPtr();
-  }
+  DataConnection* Make() override { return new gdal::Connection(format_); }
 
   const gdal::Format format_;
 };

@@ -1,4 +1,5 @@
 #include "data/file_uri.h"
+#include "data/plain_factory.h"
 #include "foundation/fault.h"
 #include "mosaic_reader.h"
 
@@ -36,25 +37,19 @@ class MosaicConnection final : public PlainRasterConnection {
   }
 };
 
-class MosaicFactory final : public DataConnectionFactory {
+class MosaicFactory final : public PlainFactory {
  public:
-  bool IsAvailable() override { return true; }
+  MosaicFactory() : PlainFactory("EXTERNAL") {}
+
   bool CanConnect(const Array<String>& connStrings) override {
     return IsMosaicFile(PathOf(connStrings));
   }
-  DataConnectionPtr Connect(const Array<String>& connStrings, const GeoRefPtr& geoRef,
-                            const MetadataPtr& metadata) override {
-    const DataConnectionPtr connection(new MosaicConnection);
-    return connection->Connect(connStrings, geoRef, metadata) ? connection : DataConnectionPtr();
-  }
   DataConnectionPtr CreateRaster(const Array<String>&, const RasterDef&) override {
-    SetFault("EXTERNAL: a mosaic is made of scenes, by CreateMosaicCommand");
-    return {};
+    return FailWith("a mosaic is made of scenes, by CreateMosaicCommand");
   }
-  DataConnectionPtr CreateVector(const Array<String>&, const VectorDef&) override {
-    SetFault("EXTERNAL: no vectors");
-    return {};
-  }
+
+ private:
+  DataConnection* Make() override { return new MosaicConnection; }
 };
 
 }  // namespace

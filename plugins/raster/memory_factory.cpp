@@ -1,14 +1,14 @@
 #include "memory_factory.h"
 
-#include "foundation/fault.h"
+#include "data/plain_factory.h"
 #include "memory_connection.h"
 
 namespace lumo {
 namespace {
 
-class MemoryFactory final : public DataConnectionFactory {
+class MemoryFactory final : public PlainFactory {
  public:
-  bool IsAvailable() override { return true; }
+  MemoryFactory() : PlainFactory("MemoryRaster") {}
 
   /// Only by name: a text of unknown format is not to be taken for the address of a block.
   bool CanConnect(const Array<String>& connStrings) override {
@@ -17,22 +17,12 @@ class MemoryFactory final : public DataConnectionFactory {
            memory::ReadDescription(connStrings, block);
   }
 
-  DataConnectionPtr Connect(const Array<String>& connStrings, const GeoRefPtr& geoRef,
-                            const MetadataPtr& metadata) override {
-    auto* const made = new memory::Connection;
-    DataConnectionPtr owner(made);
-    return made->Connect(connStrings, geoRef, metadata) ? owner : DataConnectionPtr();
-  }
-
   DataConnectionPtr CreateRaster(const Array<String>&, const RasterDef&) override {
-    SetFault("MemoryRaster: a block of memory is opened, not made");
-    return {};
+    return FailWith("a block of memory is opened, not made");
   }
 
-  DataConnectionPtr CreateVector(const Array<String>&, const VectorDef&) override {
-    SetFault("MemoryRaster: no vectors");
-    return {};
-  }
+ private:
+  DataConnection* Make() override { return new memory::Connection; }
 };
 
 }  // namespace

@@ -1,5 +1,5 @@
+#include "data/plain_factory.h"
 #include "foundation/own_plugin.h"
-#include "gdal_common/messages.h"
 #include "gdal_common/source.h"
 #include "shape_connection.h"
 
@@ -8,11 +8,9 @@ VEXG_OWN_PLUGIN;
 namespace lumo::shapefile {
 namespace {
 
-class Factory final : public DataConnectionFactory {
+class Factory final : public PlainFactory {
  public:
-  explicit Factory(gdal::Format format) : format_(std::move(format)) {}
-
-  bool IsAvailable() override { return true; }
+  explicit Factory(gdal::Format format) : PlainFactory(format.key), format_(std::move(format)) {}
 
   bool CanConnect(const Array<String>& connStrings) override {
     gdal::Source source;
@@ -20,27 +18,8 @@ class Factory final : public DataConnectionFactory {
            gdal::IsOfFormat(source, format_, GDAL_OF_VECTOR);
   }
 
-  DataConnectionPtr Connect(const Array<String>& connStrings, const GeoRefPtr& geoRef,
-                            const MetadataPtr& metadata) override {
-    return Open([&](DataConnection& made) { return made.Connect(connStrings, geoRef, metadata); });
-  }
-
-  DataConnectionPtr CreateRaster(const Array<String>&, const RasterDef&) override {
-    gdal::FailWith(format_.key, "holds no rasters");
-    return {};
-  }
-
-  DataConnectionPtr CreateVector(const Array<String>& connStrings, const VectorDef& def) override {
-    return Open([&](VectorDataConnection& made) { return made.CreateVector(connStrings, def); });
-  }
-
  private:
-  template <typename Start>
-  DataConnectionPtr Open(Start&& start) {
-    auto* const made = new Connection(format_);
-    DataConnectionPtr owner(made);
-    return start(*made) ? owner : DataConnectionPtr();
-  }
+  DataConnection* Make() override { return new Connection(format_); }
 
   const gdal::Format format_;
 };
