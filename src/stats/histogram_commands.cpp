@@ -1,8 +1,8 @@
 #include <limits>
 
-#include "foundation/fault.h"
 #include "raster/raster_command.h"
 #include "stats/histogram_run.h"
+#include "stats/saving_command.h"
 
 namespace lumo {
 namespace {
@@ -175,19 +175,8 @@ const CommandDeclaration kSave{
     {{"Return", ValueKind::kBoolean, "they are stored, or the source has no place for them"},
      {"Fault", ValueKind::kText, "why they could not be stored; only then"}}};
 
-class SaveRasterHistogramCommand final : public RasterCommand {
-  CommandResult Execute() override {
-    if (!CheckInputs()) return Fail();
-    const BasicRasterPtr raster = FindRaster();
-    if (!raster) return Fail();
-    const Turn turn(raster, Read<Waiting>("Wait"), GetIPC());
-    TakeFault();
-    const bool isStored = raster->WriteHistogram();
-    const String fault = TakeFault();
-    Write("Return", isStored);
-    if (!isStored && fault.GetLength() != 0) Write("Fault", fault);
-    return Succeed();
-  }
+class SaveRasterHistogramCommand final : public SavingCommand {
+  bool Save(BasicRaster& raster) override { return raster.WriteHistogram(); }
 };
 
 const CommandFactoryT<SaveRasterHistogramCommand> saveFactory(kSave);

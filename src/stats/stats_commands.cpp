@@ -5,6 +5,7 @@
 #include "commands/share_scope.h"
 #include "foundation/fault.h"
 #include "raster/raster_command.h"
+#include "stats/saving_command.h"
 #include "stats/turn.h"
 
 namespace lumo {
@@ -215,19 +216,8 @@ const CommandDeclaration kSave{
     {{"Return", ValueKind::kBoolean, "they are stored, or the source has no place for them"},
      {"Fault", ValueKind::kText, "why they could not be stored; only then"}}};
 
-class SaveRasterStatsCommand final : public RasterCommand {
-  CommandResult Execute() override {
-    if (!CheckInputs()) return Fail();
-    const BasicRasterPtr raster = FindRaster();
-    if (!raster) return Fail();
-    const Turn turn(raster, Read<Waiting>("Wait"), GetIPC());
-    TakeFault();
-    const bool isStored = raster->WriteStats();
-    const String fault = TakeFault();
-    Write("Return", isStored);
-    if (!isStored && fault.GetLength() != 0) Write("Fault", fault);
-    return Succeed();
-  }
+class SaveRasterStatsCommand final : public SavingCommand {
+  bool Save(BasicRaster& raster) override { return raster.WriteStats(); }
 };
 
 const CommandFactoryT<SaveRasterStatsCommand> saveFactory(kSave);
