@@ -2,6 +2,7 @@
 
 #include <map>
 
+#include "data/ordered_read.h"
 #include "foundation/fault.h"
 #include "memory_connection.h"
 #include "platform/far_copy.h"
@@ -13,7 +14,7 @@ namespace lumo::memory {
 /// The reader of a block of memory. Palettes last as long as the connection; nothing else is kept
 /// beside the pixels.
 template <typename T>
-class Reader final : public RasterReader<T> {
+class Reader final : public RasterReader<T>, public ConcurrentReads {
  public:
   explicit Reader(Connection* connection)
       : RasterReader<T>(connection), block_(connection->Block()) {
