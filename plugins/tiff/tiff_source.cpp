@@ -82,7 +82,7 @@ bool HasSettings() {
   return false;
 }
 
-/// What the bands of an image mean.
+/// Tells what the bands of an image mean.
 struct Meaning {
   bool isRgb = false;
   bool isPalette = false;
