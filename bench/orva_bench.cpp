@@ -158,6 +158,36 @@ BENCHMARK_CAPTURE(ReadBlocks, BIP_3_of_4, Interleave::BIP, 4096, 256, {2, 1, 0})
 BENCHMARK_CAPTURE(ReadBlocks, BIL_1_of_4, Interleave::BIL, 4096, 256, {2})->UseRealTime();
 BENCHMARK_CAPTURE(ReadBlocks, BSQ_1_of_4, Interleave::BSQ, 4096, 256, {2})->UseRealTime();
 
+/// Reads the scene by blocks in an order of the axes, as rasters do. Arguments: samples and lines
+/// of a block.
+void ReadInOrder(benchmark::State& state, Interleave stored, Interleave order, bool hasNoData) {
+  const Source source(SceneFile(stored, false, hasNoData), true);
+  const Array<unsigned> bands = Bands({0, 1, 2, 3});
+  const auto width = static_cast<unsigned>(state.range(0));
+  const auto height = static_cast<unsigned>(state.range(1));
+  Array<Pixel> pixels;
+  Array<unsigned char> states;
+  for (auto _ : state) {
+    for (unsigned top = 0; top < kLines; top += height) {
+      for (unsigned left = 0; left < kSamples; left += width) {
+        const lumo::SubRect rect(left, top, left + width - 1, top + height - 1);
+        Require(source.reader->ReadBlock(rect, bands, 0, order, pixels, states));
+      }
+    }
+  }
+  state.SetBytesProcessed(state.iterations() *
+                          static_cast<std::int64_t>(kElements * sizeof(Pixel)));
+}
+void Blocks(benchmark::internal::Benchmark* bench) {
+  bench->Args({512, 512})->Args({4096, 32})->Args({4096, 256})->Args({4096, 1024})->UseRealTime();
+}
+BENCHMARK_CAPTURE(ReadInOrder, BIP_as_BIP, Interleave::BIP, Interleave::BIP, false)->Apply(Blocks);
+BENCHMARK_CAPTURE(ReadInOrder, BIP_as_BSQ, Interleave::BIP, Interleave::BSQ, false)->Apply(Blocks);
+BENCHMARK_CAPTURE(ReadInOrder, BIP_as_BIL, Interleave::BIP, Interleave::BIL, false)->Apply(Blocks);
+BENCHMARK_CAPTURE(ReadInOrder, BSQ_as_BIP, Interleave::BSQ, Interleave::BIP, false)->Apply(Blocks);
+BENCHMARK_CAPTURE(ReadInOrder, noData_as_BSQ, Interleave::BIP, Interleave::BSQ, true)
+    ->Apply(Blocks);
+
 /// Writes the scene line block by line block over a file that has its pages already, so that the
 /// rate is that of the calls and not of the disk.
 template <typename Write>

@@ -5,11 +5,12 @@
 #include <cmath>
 #include <cpl_conv.h>
 #include <cpl_string.h>
-#include <cstdio>
 #include <gdal_pam.h>
 #include <memory>
 #include <string>
 #include <vector>
+
+#include "gdal_common/color_name.h"
 
 namespace lumo::gdal {
 namespace {
@@ -17,18 +18,6 @@ namespace {
 std::string Item(GDALRasterBandH band, const char* name) {
   const char* const value = GDALGetMetadataItem(band, name, nullptr);
   return value != nullptr ? value : "";
-}
-
-/// The colour's own name when it has one in the table.
-String NameOf(std::uint8_t r, std::uint8_t g, std::uint8_t b, std::uint8_t a) {
-  const std::uint32_t value =
-      r | std::uint32_t{g} << 8 | std::uint32_t{b} << 16 | std::uint32_t{a} << 24;
-  for (const NamedColor& color : kNamedColors) {
-    if (color.value == value && !color.isNull) return color.name;
-  }
-  char text[8];
-  std::snprintf(text, sizeof text, "#%02x%02x%02x", r, g, b);
-  return text;
 }
 
 /// Reaches what GDAL keeps of a band beside its file, and has no operation to remove.
@@ -135,7 +124,7 @@ Palette ReadPalette(GDALRasterBandH band) {
     };
     const std::uint8_t r = part(entry.c1), g = part(entry.c2), b = part(entry.c3),
                        a = part(entry.c4);
-    palette.Append(Color(NameOf(r, g, b, a), r, g, b, a));
+    palette.Append(Color(ColorNameOf(r, g, b, a), r, g, b, a));
   }
   return palette;
 }

@@ -1,5 +1,6 @@
 #pragma once
 
+#include "data/ordered_read.h"
 #include "orva/orva_connection.h"
 #include "orva/orva_values.h"
 
@@ -9,7 +10,7 @@ namespace lumo::orva {
 /// the header. The first pixel that is written takes stored statistics and histograms away, since
 /// they belong to other pixels then.
 template <typename T>
-class Reader final : public RasterReader<T> {
+class Reader final : public RasterReader<T>, public ConcurrentReads {
  public:
   Reader(Connection* connection, BandValues<T> values);
 

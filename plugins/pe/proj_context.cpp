@@ -10,6 +10,7 @@
 #include "georef/coordsys_log.h"
 #include "platform/memory_shortage.h"
 #include "platform/process.h"
+#include "platform/system_memory.h"
 
 namespace lumo::pe {
 namespace {
@@ -28,10 +29,16 @@ void LogFromProj(void*, int, const char* text) {
   LogCoordSys(CoordSysLog::kErrors, "%s", text);
 }
 
+PJ_CONTEXT* MakeContext() {
+  constexpr std::size_t kOfDatabase = 4 << 20;  // what a first coordinate system takes
+  platform::GrowHeap(kOfDatabase);
+  return proj_context_create();
+}
+
 /// A context, and the transforms that belong to it and go before it. One thread has it at a time.
 struct ProjState {
   explicit ProjState(const std::string& givenDirectory)
-      : directory(givenDirectory), context(proj_context_create()) {
+      : directory(givenDirectory), context(MakeContext()) {
     if (context == nullptr) throw std::bad_alloc();
     proj_context_set_enable_network(context, 0);
     proj_context_use_proj4_init_rules(context, 1);

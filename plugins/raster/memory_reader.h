@@ -2,8 +2,10 @@
 
 #include <map>
 
+#include "data/ordered_read.h"
 #include "foundation/fault.h"
 #include "memory_connection.h"
+#include "platform/far_copy.h"
 #include "raster/no_data_marker.h"
 #include "raster/pixel_value.h"
 
@@ -12,7 +14,7 @@ namespace lumo::memory {
 /// The reader of a block of memory. Palettes last as long as the connection; nothing else is kept
 /// beside the pixels.
 template <typename T>
-class Reader final : public RasterReader<T> {
+class Reader final : public RasterReader<T>, public ConcurrentReads {
  public:
   explicit Reader(Connection* connection)
       : RasterReader<T>(connection), block_(connection->Block()) {
@@ -21,6 +23,8 @@ class Reader final : public RasterReader<T> {
       const auto value = def.noData.find(band);
       noData_.push_back(value != def.noData.end() ? ToPixel<T>(value->second) : std::nullopt);
     }
+    std::uint64_t bytes = 0;
+    isFar_ = block_.layout.GetBytes(sizeof(T), bytes) && bytes >= platform::kFarBytes;
   }
 
   bool OpBool() override { return true; }
@@ -105,6 +109,8 @@ class Reader final : public RasterReader<T> {
                         const T* const from = pixels + rows.BlockBegin(row);
                         if (rows.Picks()) {
                           rows.PlaceBands(row, from, span, sizeof(T));
+                        } else if (isFar_) {
+                          platform::CopyFar(span, from, rows.RowElements(row) * sizeof(T));
                         } else {
                           std::copy_n(from, rows.RowElements(row), span);
                         }
@@ -129,6 +135,7 @@ class Reader final : public RasterReader<T> {
 
   const Description& block_;
   std::vector<std::optional<T>> noData_;  // by band
+  bool isFar_ = false;                    // the block is too large for the caches
   std::map<unsigned, lumo::Palette> palettes_;
 };
 

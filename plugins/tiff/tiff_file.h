@@ -30,6 +30,7 @@ enum Tag : std::uint16_t {
   kArtist = 315,
   kHostComputer = 316,
   kPredictor = 317,
+  kColorMap = 320,
   kTileWidth = 322,
   kTileLength = 323,
   kTileOffsets = 324,

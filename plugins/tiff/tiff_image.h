@@ -9,7 +9,7 @@
 namespace lumo::tiff {
 
 /// Meanings of the tag Photometric.
-enum Photometric : std::uint16_t { kGray = 1, kRgb = 2, kYCbCr = 6 };
+enum Photometric : std::uint16_t { kGray = 1, kRgb = 2, kIndexed = 3, kYCbCr = 6 };
 
 /// How the pixels of one directory lie in its file.
 struct Image {

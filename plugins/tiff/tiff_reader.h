@@ -61,6 +61,8 @@ class Reader final : public PlainRasterReader<T> {
   RasterReader<T>* Inner();
   RasterReader<T>* Opened() { return source_.HasInner() ? Inner() : nullptr; }
   RasterReader<T>* Changing();
+  bool ReadMasked(const Rect& rect, const Array<unsigned>& bands, unsigned level, T* pixels,
+                  unsigned char* state);
   bool IsInside(unsigned left, unsigned top, unsigned width, unsigned height,
                 const Array<unsigned>& bands, unsigned level) const;
 

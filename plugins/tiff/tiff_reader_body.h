@@ -2,7 +2,9 @@
 
 #include <algorithm>
 
+#include "raster/block_strides.h"
 #include "raster/no_data_marker.h"
+#include "raster/pixel_states.h"
 #include "raster/pixel_value.h"
 #include "tiff/tiff_reader.h"
 
@@ -115,7 +117,9 @@ RasterBandStats<T> Reader<T>::ReadStats(unsigned band) {
   if constexpr (std::is_arithmetic_v<T>) {
     const auto stored = band < def_.bands ? source_.Stored().Stats(band) : std::nullopt;
     if (!stored) return stats;
-    const bool allValid = std::is_integral_v<T> && !source_.NoData();
+    const std::optional<unsigned>& masking = source_.MaskingBand();
+    const bool allValid =
+        std::is_integral_v<T> && !source_.NoData() && (!masking || band == *masking);
     stats = gdal::FromStored<T>(*stored, std::uint64_t{def_.samples} * def_.lines, allValid);
     stats.band = band;
   }
@@ -142,14 +146,14 @@ bool Reader<T>::WriteHistogram(const Array<RasterBandHistogram<T>>& histograms) 
 
 template <typename T>
 bool Reader<T>::HasPalette(unsigned band) {
-  RasterReader<T>* const inner = Opened();
-  return inner != nullptr && inner->HasPalette(band);
+  if (RasterReader<T>* const inner = Opened()) return inner->HasPalette(band);
+  return band < def_.bands && source_.Colors().GetCount() != 0;
 }
 
 template <typename T>
 lumo::Palette Reader<T>::Palette(unsigned band) {
-  RasterReader<T>* const inner = Opened();
-  return inner != nullptr ? inner->Palette(band) : lumo::Palette();
+  if (RasterReader<T>* const inner = Opened()) return inner->Palette(band);
+  return HasPalette(band) ? source_.Colors() : lumo::Palette();
 }
 
 template <typename T>
@@ -179,8 +183,7 @@ bool Reader<T>::ReadPixels(unsigned left, unsigned top, unsigned width, unsigned
                            const Array<unsigned>& bands, unsigned level, T* pixels,
                            unsigned char* state) {
   const bool isRead = !hasChanged_ && IsInside(left, top, width, height, bands, level) &&
-                      source_.Read({left, top, width, height}, bands, level,
-                                   reinterpret_cast<unsigned char*>(pixels));
+                      ReadMasked({left, top, width, height}, bands, level, pixels, state);
   if (!isRead) {
     // GDAL says what is wrong, or reads what is of another kind.
     RasterReader<T>* const inner = Inner();
@@ -191,6 +194,53 @@ bool Reader<T>::ReadPixels(unsigned left, unsigned top, unsigned width, unsigned
   const NoDataMarker<T> marker(std::vector<std::optional<T>>(bands.GetCount(), noData_),
                                def_.interleave, width, height);
   marker.Mark(0, std::uint64_t{width} * height * bands.GetCount(), pixels, state);
+  return true;
+}
+
+/// Reads a block, and marks where the masking band is 0, in the other bands. States are only
+/// touched when all is read.
+template <typename T>
+bool Reader<T>::ReadMasked(const Rect& rect, const Array<unsigned>& bands, unsigned level,
+                           T* pixels, unsigned char* state) {
+  const auto read = [&](const Array<unsigned>& chosen, T* to) {
+    return source_.Read(rect, chosen, level, reinterpret_cast<unsigned char*>(to));
+  };
+  const std::optional<unsigned>& masking = source_.MaskingBand();
+  const auto isOther = [&](unsigned band) { return band != *masking; };
+  if (!masking || std::none_of(bands.begin(), bands.end(), isOther)) return read(bands, pixels);
+  const unsigned count = bands.GetCount();
+  const std::size_t area = std::size_t{rect.width} * rect.height;
+  const bool isByPixel = def_.interleave == Interleave::BIP;
+  const BlockStrides strides(def_.interleave, rect.width, rect.height, count);
+  const auto* const at = std::find(bands.begin(), bands.end(), *masking);
+  std::vector<T> more;
+  const T* mask = pixels + static_cast<std::size_t>(at - bands.begin()) * strides.band;
+  std::size_t maskStride = strides.pixel;
+  if (at != bands.end() || !isByPixel) {
+    if (!read(bands, pixels)) return false;
+  }
+  if (at == bands.end()) {
+    // The pixels of a block are decoded once, with those of the mask among them.
+    Array<unsigned> chosen(isByPixel ? bands : Array<unsigned>());
+    const unsigned last = chosen.GetCount();
+    chosen.Resize(ArrayDims(last + 1));
+    chosen[last] = *masking;
+    maskStride = last + 1;
+    more.resize(area * maskStride);
+    if (!read(chosen, more.data())) return false;
+    mask = more.data() + last;
+    for (std::size_t pixel = 0; isByPixel && pixel < area; ++pixel) {
+      std::copy_n(&more[pixel * maskStride], count, pixels + pixel * count);
+    }
+  }
+  for (unsigned i = 0; i < count; ++i) {
+    if (!isOther(bands[i])) continue;
+    unsigned char* byte = state + i * strides.band;
+    const T* value = mask;
+    for (std::size_t pixel = 0; pixel < area; ++pixel, value += maskStride, byte += strides.pixel) {
+      if (*value == T()) SetState(*byte, PixelValueState::Masked, true);
+    }
+  }
   return true;
 }
 

@@ -7,6 +7,7 @@
 #include <limits>
 
 #include "foundation/fault.h"
+#include "gdal_common/color_name.h"
 #include "gdal_common/level_number.h"
 #include "raster/pixel_types.h"
 #include "raster/raster_details.h"
@@ -31,16 +32,43 @@ constexpr NamedTag kTexts[] = {{kImageDescription, "TIFFTAG_IMAGEDESCRIPTION"},
 
 /// Tags that are understood here. A file with another one is GDAL's.
 bool IsKnown(std::uint16_t tag) {
-  static constexpr std::uint16_t kTags[] = {
-      kSubfileType,     kImageWidth,          kImageLength,      kBitsPerSample,
-      kCompression,     kPhotometric,         kFillOrder,        kImageDescription,
-      kStripOffsets,    kOrientation,         kSamplesPerPixel,  kRowsPerStrip,
-      kStripByteCounts, kPlanarConfiguration, kSoftware,         kDateTime,
-      kArtist,          kHostComputer,        kPredictor,        kTileWidth,
-      kTileLength,      kTileOffsets,         kTileByteCounts,   kExtraSamples,
-      kSampleFormat,    kCopyright,           kModelPixelScale,  kModelTiepoint,
-      kGeoKeyDirectory, kGeoDoubleParams,     kGeoAsciiParams,   kGdalMetadata,
-      kNoData,          kJpegTables,          kYCbCrSubsampling, kReferenceBlackWhite};
+  static constexpr std::uint16_t kTags[] = {kSubfileType,
+                                            kImageWidth,
+                                            kImageLength,
+                                            kBitsPerSample,
+                                            kCompression,
+                                            kPhotometric,
+                                            kFillOrder,
+                                            kImageDescription,
+                                            kStripOffsets,
+                                            kOrientation,
+                                            kSamplesPerPixel,
+                                            kRowsPerStrip,
+                                            kStripByteCounts,
+                                            kPlanarConfiguration,
+                                            kSoftware,
+                                            kDateTime,
+                                            kArtist,
+                                            kHostComputer,
+                                            kPredictor,
+                                            kTileWidth,
+                                            kTileLength,
+                                            kTileOffsets,
+                                            kTileByteCounts,
+                                            kExtraSamples,
+                                            kColorMap,
+                                            kSampleFormat,
+                                            kCopyright,
+                                            kModelPixelScale,
+                                            kModelTiepoint,
+                                            kGeoKeyDirectory,
+                                            kGeoDoubleParams,
+                                            kGeoAsciiParams,
+                                            kGdalMetadata,
+                                            kNoData,
+                                            kJpegTables,
+                                            kYCbCrSubsampling,
+                                            kReferenceBlackWhite};
   return std::find(std::begin(kTags), std::end(kTags), tag) != std::end(kTags);
 }
 
@@ -54,18 +82,66 @@ bool HasSettings() {
   return false;
 }
 
-/// Says whether the bands mean what a plain raster's do: colours, or numbers.
-bool FindMeaning(const File& file, const Image& image, bool& isRgb) {
+/// Tells what the bands of an image mean.
+struct Meaning {
+  bool isRgb = false;
+  bool isPalette = false;
+  bool hasAlpha = false;  ///< the last band is alpha
+
+  bool operator==(const Meaning&) const = default;
+};
+
+/// The meaning of colours, numbers, or numbers of colours, and of an alpha band behind these that
+/// GDAL takes for a mask. Nothing for another one.
+std::optional<Meaning> FindMeaning(const File& file, const Image& image) {
   const Directory& directory = *image.directory;
   const unsigned bands = image.bands;
   const std::uint64_t photometric = file.Number(directory, kPhotometric, 0);
-  isRgb = photometric == kRgb || (image.jpeg != nullptr && image.jpeg->isYcc);
-  if (photometric != kGray && !(isRgb && bands >= 3)) return false;
-  const unsigned extra = bands - (isRgb ? 3 : 1);
+  Meaning meaning;
+  meaning.isRgb = photometric == kRgb || (image.jpeg != nullptr && image.jpeg->isYcc);
+  meaning.isPalette = photometric == kIndexed;
+  const bool isUsable =
+      photometric == kGray || (meaning.isRgb && bands >= 3) ||
+      (meaning.isPalette && bands == 1 && image.DataType() == kDataTypeOf<std::uint8_t>);
+  if (!isUsable || meaning.isPalette != directory.contains(kColorMap)) return std::nullopt;
+  const unsigned extra = bands - (meaning.isRgb ? 3 : 1);
   std::vector<std::uint64_t> kinds;
-  if (extra == 0) return !directory.contains(kExtraSamples);
-  return file.ReadNumbers(directory, kExtraSamples, bands, kinds) && kinds.size() == extra &&
-         std::all_of(kinds.begin(), kinds.end(), [](std::uint64_t kind) { return kind == 0; });
+  if (extra == 0) {
+    return directory.contains(kExtraSamples) ? std::nullopt : std::optional(meaning);
+  }
+  if (!file.ReadNumbers(directory, kExtraSamples, bands, kinds) || kinds.size() != extra) {
+    return std::nullopt;
+  }
+  const bool isOfMasks = bands == 2 || bands == 4;
+  const unsigned type = image.DataType();
+  const bool isOfAlpha =
+      isOfMasks && (type == kDataTypeOf<std::uint8_t> || type == kDataTypeOf<std::uint16_t>);
+  meaning.hasAlpha = isOfAlpha && (kinds.back() == 1 || kinds.back() == 2);
+  if (meaning.hasAlpha) kinds.pop_back();
+  const bool isPlain =
+      std::all_of(kinds.begin(), kinds.end(), [](std::uint64_t kind) { return kind == 0; });
+  return isPlain ? std::optional(meaning) : std::nullopt;
+}
+
+/// The colours of a palette. False for numbers of another range than the usual one, which GDAL
+/// guesses.
+bool ReadColors(const File& file, const Directory& directory, const std::optional<double>& noData,
+                Palette& colors) {
+  constexpr std::size_t kCount = 256;
+  std::vector<std::uint64_t> parts;
+  if (!file.ReadNumbers(directory, kColorMap, 3 * kCount, parts) || parts.size() != 3 * kCount ||
+      *std::max_element(parts.begin(), parts.end()) < 256) {
+    return false;
+  }
+  for (std::size_t i = 0; i < kCount; ++i) {
+    const auto part = [&](std::size_t of) {
+      return static_cast<std::uint8_t>(parts[of * kCount + i] / 256);
+    };
+    const bool isClear = noData && static_cast<double>(i) == *noData;
+    const std::uint8_t r = part(0), g = part(1), b = part(2), a = isClear ? 0 : 255;
+    colors.Append(Color(gdal::ColorNameOf(r, g, b, a), r, g, b, a));
+  }
+  return true;
 }
 
 const char* WordOf(const Image& image) {
@@ -197,12 +273,14 @@ bool Source::TakeSideFile() {
 bool Source::Describe(const String& formatKey) {
   const Image& image = levels_.at(0);
   const Directory& directory = *image.directory;
-  bool isRgb = false;
+  const std::optional<Meaning> meaning = FindMeaning(*file_, image);
   const std::optional<bool> isCloudOptimised = IsCloudOptimised(*file_);
-  if (!FindMeaning(*file_, image, isRgb) || !isCloudOptimised ||
-      !ReadNoData(*file_, image, noData_)) {
-    return false;
+  if (!meaning || !isCloudOptimised || !ReadNoData(*file_, image, noData_)) return false;
+  for (const auto& [number, level] : levels_) {
+    if (FindMeaning(*file_, level) != meaning) return false;
   }
+  if (meaning->isPalette && !ReadColors(*file_, directory, noData_, colors_)) return false;
+  if (meaning->hasAlpha && !noData_) maskingBand_ = image.bands - 1;
   const std::optional<Place> place = FindPlace(*file_, image);
   if (!place) return false;
   def_.samples = image.samples;
@@ -246,9 +324,10 @@ bool Source::Describe(const String& formatKey) {
   if (image.predictor != 1) structure("PREDICTOR", std::to_string(image.predictor));
   if (*isCloudOptimised) structure("LAYOUT", "COG");
   const char* const colors[] = {"Red", "Green", "Blue"};
-  for (unsigned band = 0; isRgb && band < 3; ++band) {
+  for (unsigned band = 0; meaning->isRgb && band < 3; ++band) {
     metadata.Set(BandDetailPath(band, "Meaning"), String(colors[band]));
   }
+  if (meaning->hasAlpha) metadata.Set(BandDetailPath(image.bands - 1, "Meaning"), String("Alpha"));
   for (unsigned band = 0; band < image.bands; ++band) {
     for (const auto& [name, text] : stored_.Details(band)) {
       const String path = BandDetailPath(band, name);

@@ -3,6 +3,7 @@
 #include <functional>
 
 #include "data/data_connection.h"
+#include "foundation/color.h"
 #include "raster/raster_def.h"
 #include "tiff/tiff_stats.h"
 #include "tiff/tiff_window.h"
@@ -29,6 +30,11 @@ class Source {
   /// The no-data value of all bands.
   const std::optional<double>& NoData() const { return noData_; }
   const std::string& Path() const { return file_->Handle().Path(); }
+
+  /// The colours of the values of the one band; none where they aren't such numbers.
+  const Palette& Colors() const { return colors_; }
+  /// The last band, where the pixels at which it is 0 are masked in all others.
+  const std::optional<unsigned>& MaskingBand() const { return maskingBand_; }
 
   /// The levels by number: 0, and a range without gaps from 1 on.
   const std::map<unsigned, Image>& Levels() const { return levels_; }
@@ -57,6 +63,8 @@ class Source {
   const Opener opener_;
   RasterDef def_;
   std::optional<double> noData_;
+  Palette colors_;
+  std::optional<unsigned> maskingBand_;
   std::map<unsigned, Image> levels_;
   std::map<unsigned, std::unique_ptr<Window>> windows_;
   StoredItems stored_;

@@ -3,12 +3,13 @@
 #include "data/band_answers.h"
 #include "data/dc_srv_call.h"
 #include "data/mt_connection.h"
+#include "data/ordered_read_body.h"
 
 namespace lumo {
 
 /// The proxy of a raster reader. It belongs to its connection, on whose thread every call runs.
 template <typename T>
-class MtRasterReader final : public RasterReader<T> {
+class MtRasterReader final : public RasterReader<T>, public OrderedReads<T> {
  public:
   explicit MtRasterReader(MtRasterDataConnection* connection)
       : RasterReader<T>(connection), proxy_(connection) {}
@@ -150,6 +151,18 @@ class MtRasterReader final : public RasterReader<T> {
       return reader.ReadPixels(left, top, width, height, bands, level, pixels, state);
     });
   }
+  std::optional<bool> ReadOrdered(const SubRect& rect, const Array<unsigned>& bands, unsigned level,
+                                  Interleave order, T* pixels, unsigned char* state) override {
+    using Answer = std::optional<bool>;
+    if (!isConcurrent_) return Answer();
+    const Answer isRead =
+        CallWith<Answer>(42, "DcSrvCmdRrReadPixels", [&](auto& reader, Answer& result) {
+          isConcurrent_ = dynamic_cast<ConcurrentReads*>(&reader) != nullptr;
+          if (!isConcurrent_) return;
+          result = detail::ReadInOrder(reader, rect, bands, level, order, pixels, state);
+        });
+    return isRead;
+  }
   bool CanWritePixels(unsigned level) override {
     return Call<bool>(43, "DcSrvCmdRrCanWritePixels",
                       [&](auto& reader) { return reader.CanWritePixels(level); });
@@ -225,6 +238,7 @@ class MtRasterReader final : public RasterReader<T> {
   }
 
   MtRasterDataConnection* proxy_;
+  std::atomic<bool> isConcurrent_{true};  // until the plug-in's reader has been looked at
   BandAnswers<bool> statsExist_;
   BandAnswers<bool> hasNoDataValue_;
   BandAnswers<T> noDataValue_;

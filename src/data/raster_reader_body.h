@@ -2,7 +2,10 @@
 
 #include <algorithm>
 
+#include "data/ordered_read_body.h"
 #include "data/raster_reader.h"
+#include "foundation/thrown.h"
+#include "platform/huge_pages.h"
 #include "raster/interleave.h"
 #include "raster/pixel_states.h"
 
@@ -21,20 +24,33 @@ bool SizeBlock(Array<E>& block, Interleave interleave, const SubRect& rect, unsi
   return true;
 }
 
-/// A block in the order of a source, on its way to another one. Its thread keeps the memory for the
-/// next one, where that isn't much: pages that are new each time cost more than the conversion.
+/// Room for a block in the order of a source, on its way to another one. Its thread keeps the
+/// memory for the next one, where that isn't much: pages that are new each time cost more than the
+/// conversion. A larger block comes in large pages, of which there are few.
 template <typename E>
 class KeptBlock {
  public:
   KeptBlock() { std::swap(block_, Kept()); }
   ~KeptBlock() {
-    constexpr std::size_t kMostBytes = 8 << 20;
-    if (block_.GetCapacity() * sizeof(E) <= kMostBytes) std::swap(block_, Kept());
+    std::swap(block_, Kept());
+    if (large_ != nullptr) platform::FreeHuge(large_, largeBytes_);
   }
   KeptBlock(const KeptBlock&) = delete;
   KeptBlock& operator=(const KeptBlock&) = delete;
-  Array<E>& operator*() { return block_; }
-  Array<E>* operator->() { return &block_; }
+
+  /// Memory for `count` elements, which hold anything; null where there is none.
+  E* Take(unsigned count) {
+    constexpr std::size_t kMostBytes = 8 << 20;
+    const std::size_t bytes = std::size_t{count} * sizeof(E);
+    if (bytes <= kMostBytes) return block_.Resize(ArrayDims(count)) ? block_.GetData() : nullptr;
+    try {
+      large_ = platform::AllocateHuge(bytes);
+      largeBytes_ = bytes;
+    } catch (...) {
+      NoteException();
+    }
+    return static_cast<E*>(large_);
+  }
 
  private:
   static Array<E>& Kept() {
@@ -43,6 +59,8 @@ class KeptBlock {
   }
 
   Array<E> block_;
+  void* large_ = nullptr;
+  std::size_t largeBytes_ = 0;
 };
 
 /// True for a format whose plug-in comes with the library and writes every pixel of a block that it
@@ -55,6 +73,42 @@ inline constexpr std::int32_t kFills = 256;
 
 inline bool IsInterleave(Interleave interleave) {
   return interleave >= Interleave::None && interleave <= Interleave::BSQ;
+}
+
+/// Reads a block of several bands in an order that isn't the source's. All pixels and states are
+/// written; they mean nothing where it gives false.
+/// @param isCleared  the source gets memory of zeros, since it may leave some pixels out.
+template <typename T>
+bool ReadConverted(RasterReader<T>& reader, const SubRect& rect, const Array<unsigned>& bands,
+                   unsigned level, Interleave order, bool isCleared, T* pixels,
+                   unsigned char* state) {
+  const Interleave native = reader.NativeInterleave();
+  if (auto* const proxy = dynamic_cast<OrderedReads<T>*>(&reader)) {
+    if (native != Interleave::None) {
+      const auto isRead = proxy->ReadOrdered(rect, bands, level, order, pixels, state);
+      if (isRead) return *isRead;
+    }
+  } else if (native != Interleave::None && dynamic_cast<ConcurrentReads*>(&reader) != nullptr) {
+    return ReadInOrder(reader, rect, bands, level, order, pixels, state);
+  }
+  const unsigned width = rect.Width(), height = rect.Height(), count = bands.GetCount();
+  const unsigned elements = width * height * count;  // fits: the arrays have as many
+  KeptBlock<T> block;
+  T* const nativePixels = block.Take(elements);
+  if (nativePixels == nullptr) return false;
+  if (isCleared) std::fill_n(nativePixels, elements, T());
+  std::fill_n(state, elements, static_cast<unsigned char>(0));
+  if (!reader.ReadPixels(rect.left, rect.top, width, height, bands, level, nativePixels, state) ||
+      !ConvertInterleave(nativePixels, native, pixels, order, width, height, count, sizeof(T))) {
+    return false;
+  }
+  // The states come in the source's order too. There is nothing to convert where all of them are 0.
+  if (!AnyHasState(state, elements, 0xFF)) return true;
+  KeptBlock<unsigned char> states;
+  unsigned char* const nativeState = states.Take(elements);
+  if (nativeState == nullptr) return false;
+  std::copy_n(state, elements, nativeState);
+  return ConvertInterleave(nativeState, native, state, order, width, height, count, 1);
 }
 
 }  // namespace detail
@@ -75,42 +129,28 @@ template <typename T>
 bool RasterReader<T>::ReadBlock(const SubRect& rect, const Array<unsigned>& bands, unsigned level,
                                 Interleave interleave, Array<T>& pixels,
                                 Array<unsigned char>& state) {
-  const unsigned width = rect.Width(), height = rect.Height();
   if (!detail::IsInterleave(interleave) || bands.GetCount() == 0) return false;
   const Array<unsigned> wanted = BandsOfBlock(bands, interleave);
   const unsigned count = wanted.GetCount();
   const Interleave native = NativeInterleave();
   const bool isCleared = (nativeInterleave_ & detail::kFills) == 0;
   const bool isStraight = native == interleave || count == 1;
-  if (!detail::SizeBlock(pixels, interleave, rect, count, isCleared) ||
-      !detail::SizeBlock(state, interleave, rect, count)) {
+  if (!detail::SizeBlock(pixels, interleave, rect, count, isCleared && isStraight) ||
+      !detail::SizeBlock(state, interleave, rect, count, isStraight)) {
     return false;
   }
-  if (isStraight) {
-    const bool isRead = ReadPixels(rect.left, rect.top, width, height, wanted, level,
-                                   pixels.GetData(), state.GetData());
-    // The pixels of an earlier block are nothing to go by.
-    if (!isRead && !isCleared) std::fill_n(pixels.GetData(), pixels.GetCount(), T());
-    return isRead;
+  const bool isRead = isStraight
+                          ? ReadPixels(rect.left, rect.top, rect.Width(), rect.Height(), wanted,
+                                       level, pixels.GetData(), state.GetData())
+                          : detail::ReadConverted(*this, rect, wanted, level, interleave, isCleared,
+                                                  pixels.GetData(), state.GetData());
+  // The pixels of an earlier block are nothing to go by.
+  if (!isRead && !(isStraight && isCleared)) {
+    std::fill_n(pixels.GetData(), pixels.GetCount(), T());
   }
-  detail::KeptBlock<T> nativePixels;
-  // The states come in the source's order too. There is nothing to convert where all of them are 0.
-  const auto orderStates = [&] {
-    if (!AnyHasState(state.GetData(), state.GetCount(), 0xFF)) return true;
-    detail::KeptBlock<unsigned char> nativeState;
-    if (!detail::SizeBlock(*nativeState, native, rect, count, false)) return false;
-    std::copy(state.begin(), state.end(), nativeState->begin());
-    return ConvertInterleave(nativeState->GetData(), native, state.GetData(), interleave, width,
-                             height, count, 1);
-  };
-  const bool isRead = detail::SizeBlock(*nativePixels, native, rect, count, isCleared) &&
-                      ReadPixels(rect.left, rect.top, width, height, wanted, level,
-                                 nativePixels->GetData(), state.GetData()) &&
-                      ConvertInterleave(nativePixels->GetData(), native, pixels.GetData(),
-                                        interleave, width, height, count, sizeof(T)) &&
-                      orderStates();
-  if (!isRead && !isCleared) std::fill_n(pixels.GetData(), pixels.GetCount(), T());
-  if (!isRead) std::fill_n(state.GetData(), state.GetCount(), static_cast<unsigned char>(0));
+  if (!isRead && !isStraight) {
+    std::fill_n(state.GetData(), state.GetCount(), static_cast<unsigned char>(0));
+  }
   return isRead;
 }
 

@@ -43,7 +43,9 @@ std::string ModuleFileName(const std::string& name) {
   return "lib" + name + ".so";
 }
 
-std::string LibraryDirectory() {
+namespace {
+
+std::string FindLibraryDirectory() {
   Dl_info info{};
   if (dladdr(reinterpret_cast<const void*>(&ModuleFileName), &info) == 0) return {};
   const std::filesystem::path folder = std::filesystem::path(info.dli_fname).parent_path();
@@ -52,6 +54,14 @@ std::string LibraryDirectory() {
   std::error_code unresolved;
   const std::filesystem::path real = std::filesystem::canonical(folder, unresolved);
   return unresolved ? folder.string() : real.string();
+}
+
+}  // namespace
+
+std::string LibraryDirectory() {
+  // Asked for with each plug-in; the system walks through all symbols of the library to tell.
+  static const std::string directory = FindLibraryDirectory();
+  return directory;
 }
 
 }  // namespace lumo::platform

@@ -7,6 +7,7 @@
 #include <utility>
 
 #include "raster/interleave_body.h"
+#include "raster/interleave_lines.h"
 
 namespace lumo {
 namespace {
@@ -126,12 +127,13 @@ bool RunNarrow(const From& from, const To& to, std::size_t pixelCount, std::size
   (std::index_sequence<2, 3, 4, 6, 8>());
 }
 
-/// `pixels` by `bands` into `bands` by `pixels`.
+/// `pixels` by `bands` into `bands` by `pixels`. @param stride  from a band to the next.
 template <typename E>
-void Split(const E* from, E* to, std::size_t pixelCount, std::size_t bandCount) {
+void Split(const E* from, E* to, std::size_t pixelCount, std::size_t bandCount,
+           std::size_t stride) {
   constexpr std::size_t kN = kLanes<E>;
   const Matrix<const E> pixels{from, bandCount};
-  const Matrix<E> bands{to, pixelCount};
+  const Matrix<E> bands{to, stride};
   if (RunNarrow<NarrowSplit, E>(pixels, bands, pixelCount, bandCount)) return;
   if (pixelCount >= 2 * kN && bandCount >= kN && HasAvx2()) {
     TransposeWide(pixels, bands, pixelCount, bandCount);
@@ -186,9 +188,10 @@ template <>
 inline constexpr std::size_t kLanes<Element16> = 1;
 
 template <>
-void Split(const Element16* from, Element16* to, std::size_t pixelCount, std::size_t bandCount) {
+void Split(const Element16* from, Element16* to, std::size_t pixelCount, std::size_t bandCount,
+           std::size_t stride) {
   const Matrix<const Element16> pixels{from, bandCount};
-  const Matrix<Element16> bands{to, pixelCount};
+  const Matrix<Element16> bands{to, stride};
   const std::size_t run = RunLength<Element16>(bandCount);
   for (std::size_t start = 0; start < pixelCount; start += run) {
     SplitPlain(pixels, bands, start, std::min(start + run, pixelCount), bandCount);
@@ -201,11 +204,12 @@ void Join(const Element16* from, Element16* to, std::size_t pixelCount, std::siz
 }
 
 /// BIL to BSQ and back: whole rows change places.
+/// @param stride  rows from one of the slow axis of `to` to the next.
 void MoveRows(const std::byte* from, std::byte* to, std::size_t slow, std::size_t fast,
-              std::size_t rowBytes) {
+              std::size_t rowBytes, std::size_t stride) {
   for (std::size_t i = 0; i < slow; ++i) {
     for (std::size_t j = 0; j < fast; ++j) {
-      std::memcpy(to + (j * slow + i) * rowBytes, from + (i * fast + j) * rowBytes, rowBytes);
+      std::memcpy(to + (j * stride + i) * rowBytes, from + (i * fast + j) * rowBytes, rowBytes);
     }
   }
 }
@@ -220,7 +224,7 @@ void Convert(const E* from, Interleave fromOrder, E* to, Interleave toOrder, std
   for (std::size_t block = 0; block < blocks; ++block) {
     const std::size_t offset = block * pixels * bands;
     if (split) {
-      Split<E>(from + offset, to + offset, pixels, bands);
+      Split<E>(from + offset, to + offset, pixels, bands, pixels);
     } else {
       Join<E>(from + offset, to + offset, pixels, bands);
     }
@@ -232,6 +236,23 @@ void Convert(const void* from, Interleave fromOrder, void* to, Interleave toOrde
              std::size_t samples, std::size_t lines, std::size_t bands) {
   Convert(static_cast<const E*>(from), fromOrder, static_cast<E*>(to), toOrder, samples, lines,
           bands);
+}
+
+/// Calls `body` for the element of a size.
+template <typename Body>
+void ForElement(std::size_t elementBytes, const Body& body) {
+  switch (elementBytes) {
+    case 1:
+      return body.template operator()<std::uint8_t>();
+    case 2:
+      return body.template operator()<std::uint16_t>();
+    case 4:
+      return body.template operator()<std::uint32_t>();
+    case 8:
+      return body.template operator()<std::uint64_t>();
+    default:
+      return body.template operator()<Element16>();
+  }
 }
 
 bool IsInterleave(Interleave interleave) {
@@ -274,29 +295,43 @@ bool ConvertInterleave(const void* from, Interleave fromOrder, void* to, Interle
     std::memcpy(to, from, samples * lines * bands * elementBytes);
   } else if (fromOrder == Interleave::BIL && toOrder == Interleave::BSQ) {
     MoveRows(static_cast<const std::byte*>(from), static_cast<std::byte*>(to), lines, bands,
-             samples * elementBytes);
+             samples * elementBytes, lines);
   } else if (fromOrder == Interleave::BSQ && toOrder == Interleave::BIL) {
     MoveRows(static_cast<const std::byte*>(from), static_cast<std::byte*>(to), bands, lines,
-             samples * elementBytes);
+             samples * elementBytes, bands);
   } else {
-    switch (elementBytes) {
-      case 1:
-        Convert<std::uint8_t>(from, fromOrder, to, toOrder, samples, lines, bands);
-        break;
-      case 2:
-        Convert<std::uint16_t>(from, fromOrder, to, toOrder, samples, lines, bands);
-        break;
-      case 4:
-        Convert<std::uint32_t>(from, fromOrder, to, toOrder, samples, lines, bands);
-        break;
-      case 8:
-        Convert<std::uint64_t>(from, fromOrder, to, toOrder, samples, lines, bands);
-        break;
-      default:
-        Convert<Element16>(from, fromOrder, to, toOrder, samples, lines, bands);
-    }
+    ForElement(elementBytes, [&]<typename E>() {
+      Convert<E>(from, fromOrder, to, toOrder, samples, lines, bands);
+    });
   }
   return true;
+}
+
+void ConvertLines(const void* from, Interleave fromOrder, const LinesOfBlock& part, void* to,
+                  Interleave toOrder, std::size_t samples, std::size_t bands,
+                  std::size_t elementBytes) {
+  const std::size_t rowBytes = samples * elementBytes;
+  auto* const out = static_cast<std::byte*>(to);
+  if (toOrder != Interleave::BSQ || bands == 1) {
+    ConvertInterleave(from, fromOrder, out + part.first * bands * rowBytes, toOrder, samples,
+                      part.count, bands, elementBytes);
+    return;
+  }
+  const auto* const in = static_cast<const std::byte*>(from);
+  std::byte* const plane = out + part.first * rowBytes;
+  if (fromOrder == Interleave::BIP) {
+    ForElement(elementBytes, [&]<typename E>() {
+      Split<E>(static_cast<const E*>(from), reinterpret_cast<E*>(plane), samples * part.count,
+               bands, samples * part.ofLines);
+    });
+  } else if (fromOrder == Interleave::BIL) {
+    MoveRows(in, plane, part.count, bands, rowBytes, part.ofLines);
+  } else {
+    for (std::size_t band = 0; band < bands; ++band) {
+      std::memcpy(plane + band * part.ofLines * rowBytes, in + band * part.count * rowBytes,
+                  part.count * rowBytes);
+    }
+  }
 }
 
 }  // namespace lumo

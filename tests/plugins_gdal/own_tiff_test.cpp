@@ -86,6 +86,69 @@ TEST(OwnTiff, JpegIsDecodedAsByGdal) {
   }
 }
 
+/// Alpha bands mask the others, unless these have no-data values; levels have them too.
+TEST(OwnTiff, AlphaBandsAreThoseOfGdal) {
+  const test::TemporaryDirectory directory;
+  const std::vector<std::vector<std::string>> blocks = {
+      {"TILED=YES", "BLOCKXSIZE=64", "BLOCKYSIZE=32", "COMPRESS=DEFLATE"}, {"BLOCKYSIZE=7"}};
+  int number = 0;
+  for (const GDALDataType type : {GDT_Byte, GDT_UInt16}) {
+    for (const auto& block : blocks) {
+      for (const char* const alpha : {"ALPHA=YES", "ALPHA=PREMULTIPLIED"}) {
+        for (const char* const order : {"INTERLEAVE=PIXEL", "INTERLEAVE=BAND"}) {
+          for (const unsigned bands : {4U, 2U}) {
+            Layout layout{type, block, bands};
+            layout.options.insert(
+                layout.options.end(),
+                {alpha, order, bands == 4 ? "PHOTOMETRIC=RGB" : "PHOTOMETRIC=MINISBLACK"});
+            layout.hasLevels = number % 3 == 0;
+            layout.noData = number % 5 == 4 ? "7" : nullptr;
+            const std::string path =
+                (directory.Path() / ("a" + std::to_string(number++) + "x.tif")).string();
+            Make(path, layout, number);
+            EXPECT_TRUE(ExpectSame(path)) << "GDAL had to read it: " << alpha << order << bands;
+          }
+        }
+      }
+    }
+  }
+}
+
+TEST(OwnTiff, PalettesAreThoseOfGdal) {
+  const test::TemporaryDirectory directory;
+  for (int number = 0; number < 6; ++number) {
+    const std::string path = (directory.Path() / ("p" + std::to_string(number) + "x.tif")).string();
+    Layout layout{GDT_Byte, {"PHOTOMETRIC=PALETTE"}, 1};
+    if (number % 2 == 0) layout.options.insert(layout.options.end(), {"TILED=YES", "COMPRESS=LZW"});
+    layout.noData = number % 3 == 1 ? "7" : nullptr;
+    layout.hasLevels = number % 3 == 2;
+    layout.changeNew = [&](GDALDatasetH file) {
+      GDALColorTableH const table = GDALCreateColorTable(GPI_RGB);
+      for (short i = 0; i < (number == 5 ? 30 : 256); ++i) {
+        const GDALColorEntry entry{i, static_cast<short>(255 - i), static_cast<short>(i * 7 % 256),
+                                   255};
+        GDALSetColorEntry(table, i, &entry);
+      }
+      EXPECT_EQ(GDALSetRasterColorTable(GDALGetRasterBand(file, 1), table), CE_None);
+      GDALDestroyColorTable(table);
+    };
+    Make(path, layout, number);
+    EXPECT_TRUE(ExpectSame(path)) << "GDAL had to read it: " << number;
+  }
+  // Colours of which all parts are small are in another range, as GDAL guesses.
+  const std::string dark = (directory.Path() / "darkx.tif").string();
+  Layout layout{GDT_Byte, {"PHOTOMETRIC=PALETTE"}, 1};
+  layout.changeNew = [](GDALDatasetH file) {
+    GDALColorTableH const table = GDALCreateColorTable(GPI_RGB);
+    const GDALColorEntry entry{0, 0, 0, 255};
+    GDALSetColorEntry(table, 0, &entry);
+    GDALSetRasterColorTable(GDALGetRasterBand(file, 1), table);
+    GDALDestroyColorTable(table);
+  };
+  Make(dark, layout, 1);
+  EXPECT_FALSE(ExpectSame(dark));
+}
+
 /// Systems of all kinds: in feet and degrees, with other meridians, withdrawn ones.
 TEST(OwnTiff, SystemsOfTheRegistryAreThoseOfGdal) {
   GDALAllRegister();
@@ -128,7 +191,9 @@ TEST(OwnTiff, LeavesToGdalWhatItDoesNotKnow) {
   EXPECT_FALSE(isOwn("packed.tif", {GDT_Byte, {"COMPRESS=PACKBITS"}}));
   EXPECT_FALSE(isOwn("bits.tif", {GDT_Byte, {"NBITS=4"}}));
   EXPECT_FALSE(isOwn("signed.tif", {GDT_Byte, {"PIXELTYPE=SIGNEDBYTE"}, 1}));
-  EXPECT_FALSE(isOwn("alpha.tif", {GDT_Byte, {"ALPHA=YES"}, 4}));
+  EXPECT_FALSE(isOwn("alpha-of-five.tif", {GDT_Byte, {"ALPHA=YES"}, 5}));
+  EXPECT_FALSE(isOwn("first-alpha.tif", {GDT_Byte, {"ALPHA=YES", "PHOTOMETRIC=MINISBLACK"}, 4}));
+  EXPECT_FALSE(isOwn("float-alpha.tif", {GDT_Float32, {"ALPHA=YES"}, 4}));
   EXPECT_FALSE(isOwn("complex.tif", {GDT_CFloat32, {}, 1}));
   EXPECT_FALSE(isOwn("other-end.tif", {GDT_UInt16, {"ENDIANNESS=BIG"}}));
   EXPECT_FALSE(isOwn("white.tif", {GDT_Byte, {"PHOTOMETRIC=MINISWHITE"}, 1}));

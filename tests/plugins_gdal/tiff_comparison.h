@@ -3,6 +3,7 @@
 #include <cmath>
 #include <cpl_string.h>
 #include <filesystem>
+#include <functional>
 #include <gdal.h>
 #include <ogr_srs_api.h>
 #include <random>
@@ -142,6 +143,12 @@ void ExpectSameStats(const RasterBandStats<T>& ours, const RasterBandStats<T>& t
   EXPECT_EQ(ours.pixelCount, theirs.pixelCount);
 }
 
+inline void ExpectSameColors(const Palette& ours, const Palette& theirs) {
+  std::ostringstream own, other;
+  own << ours, other << theirs;
+  EXPECT_EQ(own.str(), other.str());
+}
+
 /// Compares a file both ways. @return whether the library reads it itself.
 inline bool ExpectSame(const std::string& path) {
   SCOPED_TRACE(path);
@@ -165,6 +172,7 @@ inline bool ExpectSame(const std::string& path) {
     for (unsigned band = 0; band < other->Bands(); ++band) {
       EXPECT_EQ(own->HasNoDataValue(band), other->HasNoDataValue(band));
       EXPECT_EQ(own->HasPalette(band), other->HasPalette(band));
+      ExpectSameColors(own->Palette(band), other->Palette(band));
       EXPECT_EQ(own->StatsExist(band), other->StatsExist(band));
       if constexpr (std::is_arithmetic_v<T>) {
         ExpectSameStats(own->ReadStats(band), other->ReadStats(band));
@@ -189,6 +197,7 @@ struct Layout {
   int epsg = 32633;
   const char* noData = nullptr;
   bool hasLevels = false;
+  std::function<void(GDALDatasetH)> changeNew = nullptr;  // before the first pixel is written
 };
 
 inline void Make(const std::string& path, const Layout& layout, int seed) {
@@ -208,6 +217,7 @@ inline void Make(const std::string& path, const Layout& layout, int seed) {
     if (layout.epsg == 4326) grid[0] = 10, grid[1] = 0.01, grid[3] = 50, grid[5] = -0.02;
     GDALSetGeoTransform(file, grid);
   }
+  if (layout.changeNew) layout.changeNew(file);
   std::mt19937 random(static_cast<unsigned>(seed));
   std::vector<double> values(std::size_t{kWidth} * kHeight);
   for (unsigned band = 1; band <= layout.bands; ++band) {

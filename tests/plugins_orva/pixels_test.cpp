@@ -269,6 +269,38 @@ TEST(OrvaPixels, AFileThatShrinksFailsTheReadAlone) {
   EXPECT_TRUE(block.Read(*reader));
 }
 
+/// A block that is read in parts fails as a whole, and leaves nothing to the next one.
+TEST(OrvaPixels, AReadInAnotherOrderThatFailsLeavesZeroes) {
+  const TemporaryDirectory directory;
+  const auto path = directory.Path() / "scene";
+  Scene scene{500, 400, 3, Interleave::BIP, false, 0, "no data values = {1004, none, none}\n"};
+  for (const bool isDirect : {false, true}) {
+    scene.Write<float>(path);
+    DataManager& manager = GetGlobalDataManager();
+    const Array<String> strings = Strings({"ORVA", path.string()});
+    const RasterDataConnectionPtr source(isDirect ? manager.ConnectDirect(strings, {}, {})
+                                                  : manager.Connect(strings, GeoRefPtr(), {}));
+    const auto reader = ReaderOf<float>(source);
+    ASSERT_TRUE(reader) << TakeFault().ToUTF8();
+    Array<float> pixels;
+    Array<unsigned char> state;
+    const auto read = [&] {
+      return reader->ReadBlock(scene.All(), Block<float>{{}, {0, 2, 1}, {}, {}}.BandArray(), 0,
+                               Interleave::BSQ, pixels, state);
+    };
+    ASSERT_TRUE(read()) << TakeFault().ToUTF8();
+    EXPECT_EQ(pixels[std::size_t{500} * 400 + 77], RampValue<float>(77, 0, 2));
+    EXPECT_EQ(state[500 + 4], PixelValueState::NoData);
+    EXPECT_EQ(std::count(state.begin(), state.end(), 0), state.GetCount() - 1);
+    std::filesystem::resize_file(path, 300 * 6000);
+    EXPECT_FALSE(read());
+    EXPECT_EQ(TakeFault().ToUTF8(),
+              std::filesystem::canonical(path).string() + ": the file is too short");
+    EXPECT_EQ(std::count(pixels.begin(), pixels.end(), 0.0F), pixels.GetCount());
+    EXPECT_EQ(std::count(state.begin(), state.end(), 0), state.GetCount());
+  }
+}
+
 TEST(OrvaPixels, ThreadsShareOneProxy) {
   const TemporaryDirectory directory;
   Scene scene{211, 97, 3, Interleave::BIL, true, 0, ""};

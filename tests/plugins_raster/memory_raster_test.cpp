@@ -68,6 +68,28 @@ TEST(MemoryRaster, ReadsAndWritesTheBlockInEveryInterleave) {
   }
 }
 
+TEST(MemoryRaster, WritesOnlyTheWindowOfABlockThatNoCacheHolds) {
+  constexpr unsigned kSide = 2900;
+  std::vector<std::int32_t> memory(std::size_t{kSide} * kSide, 7);
+  auto source = OpenSource({"MemoryRaster", Describe(memory.data(), "large", kSide, kSide, 1, 2,
+                                                     kDataTypeOf<std::int32_t>)});
+  ASSERT_TRUE(source) << TakeFault().ToUTF8();
+  const SubRect rect(1001, 2000, 1777, 2100);
+  std::vector<std::int32_t> values(std::size_t{rect.Width()} * rect.Height());
+  for (std::size_t i = 0; i < values.size(); ++i) values[i] = static_cast<std::int32_t>(i) * 3 + 8;
+  Block<std::int32_t> block{rect, {0}, values, std::vector<unsigned char>(values.size())};
+  ASSERT_TRUE(block.Write(*ReaderOf<std::int32_t>(source)));
+  auto written = values.begin();
+  for (unsigned line = 0; line < kSide; ++line) {
+    for (unsigned sample = 0; sample < kSide; ++sample) {
+      const bool isInside =
+          sample >= rect.left && sample <= rect.right && line >= rect.top && line <= rect.bottom;
+      const std::int32_t want = isInside ? *written++ : 7;
+      ASSERT_EQ(memory[std::size_t{line} * kSide + sample], want) << sample << ' ' << line;
+    }
+  }
+}
+
 TEST(MemoryRaster, ServesAllPixelTypes) {
   alignas(16) unsigned char memory[16] = {1, 2, 3, 4};
   for (const unsigned type : {1U, 99U, 12U, 2U, 13U, 3U, 4U, 5U, 15U, 14U, 6U, 9U}) {

@@ -1,7 +1,7 @@
-#include "raster/interleave.h"
-
 #include <cstring>
 #include <random>
+
+#include "raster/interleave_lines.h"
 
 namespace lumo {
 namespace {
@@ -60,6 +60,27 @@ TEST(Interleave, PutsEveryElementWhereTheOrderOfTheAxesSays) {
                                 bytes),
                     0)
                     << s << " " << l << " " << b;
+          // Two parts of the lines, each for itself, make the same block.
+          std::vector<unsigned char> parts((count + 1) * bytes);
+          for (const auto [first, end] :
+               {std::pair(std::size_t{0}, lines / 2), {lines / 2, lines}}) {
+            std::vector<unsigned char> part;
+            for (std::size_t b = 0; b < bands; ++b) {
+              for (std::size_t l = first; l < end; ++l) {
+                for (std::size_t s = 0; s < samples; ++s) {
+                  const std::size_t at =
+                      Position(fromOrder, s, l - first, b, samples, end - first, bands);
+                  part.resize(std::max(part.size(), (at + 1) * bytes));
+                  std::memcpy(&part[at * bytes],
+                              &from[bytes * Position(fromOrder, s, l, b, samples, lines, bands)],
+                              bytes);
+                }
+              }
+            }
+            ConvertLines(part.data(), fromOrder, {first, end - first, lines}, parts.data() + bytes,
+                         toOrder, samples, bands, bytes);
+          }
+          ASSERT_EQ(parts, result);
         }
       }
     }

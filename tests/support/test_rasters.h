@@ -3,11 +3,13 @@
 #include <algorithm>
 #include <atomic>
 #include <chrono>
+#include <cstring>
 #include <mutex>
 #include <thread>
 #include <type_traits>
 #include <vector>
 
+#include "platform/far_copy.h"
 #include "raster/interleave.h"
 #include "raster/raster_view.h"
 
@@ -118,9 +120,11 @@ class MemoryTestRaster final : public TestRaster<T> {
   bool PutSubRect(const SubRect& rect, const Array<unsigned>& bands, Interleave interleave,
                   Array<T>& block, Array<unsigned char>& state) override {
     if (interleave != Interleave::BIP || rect.right >= this->Samples()) return false;
+    const bool isFar = pixels.size() * sizeof(T) >= platform::kFarBytes;
+    const auto copy = isFar ? &platform::CopyFar : &CopyNear;
     Move(rect, bands, [&](std::size_t at, std::size_t inBlock, std::size_t count) {
-      std::copy_n(&block[inBlock], count, &pixels[at]);
-      std::copy_n(&state[inBlock], count, &states[at]);
+      copy(&pixels[at], &block[inBlock], count * sizeof(T));
+      copy(&states[at], &state[inBlock], count);
     });
     return true;
   }
@@ -133,6 +137,10 @@ class MemoryTestRaster final : public TestRaster<T> {
   std::vector<unsigned char> states;
 
  private:
+  static void CopyNear(void* to, const void* from, std::size_t bytes) {
+    std::memcpy(to, from, bytes);
+  }
+
   /// Calls `move(place here, place in the block, elements)` for runs that lie together.
   template <typename F>
   void Move(const SubRect& rect, const Array<unsigned>& bands, const F& move) {

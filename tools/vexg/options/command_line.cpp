@@ -78,17 +78,18 @@ void AddTo(CLI::App& app, const OptionSet& options) {
   app.footer(FooterOf(options));
 }
 
-/// The parser of all verbs.
+/// The parser of all verbs, with the options of the one that is meant.
 struct Parser {
   CLI::App app{"Processing core for remote-sensing images: runs jobs of named commands.", "vexg"};
 
-  Parser() {
+  explicit Parser(const Verb* meant) {
     app.set_version_flag("--version", std::string("vexg ") + GetLibraryVersion());
     app.require_subcommand(1);
     app.fallthrough();
     AddTo(app, GetGeneralOptions());
     for (const Verb& verb : GetVerbs()) {
-      AddTo(*app.add_subcommand(verb.name, verb.summary), verb.options);
+      CLI::App* const added = app.add_subcommand(verb.name, verb.summary);
+      if (meant == &verb) AddTo(*added, verb.options);
     }
   }
 };
@@ -246,8 +247,9 @@ std::string DescribeFault(const Strings& arguments, const CLI::ParseError& error
 }  // namespace
 
 CommandLine ReadCommandLine(const Strings& arguments) {
-  Parser parser;
   const Strings joined = JoinLists(MoveWordsOfVerb(arguments));
+  const std::size_t verbAt = FindVerbPlace(joined);
+  Parser parser(verbAt < joined.size() ? FindVerb(joined[verbAt]) : nullptr);
   try {
     parser.app.parse(Strings(joined.rbegin(), joined.rend()));  // as the parser takes them
   } catch (const CLI::CallForVersion& version) {
@@ -278,7 +280,7 @@ void ReadVerbArguments(const Verb& verb, const Strings& arguments) {
 }
 
 std::string HelpOf(const Verb* verb) {
-  const Parser parser;
+  const Parser parser(verb);
   if (verb == nullptr) return parser.app.help();
   return parser.app.get_subcommand(verb->name)->help(parser.app.get_name());
 }

@@ -1,0 +1,29 @@
+#pragma once
+
+#include <optional>
+
+#include "data/raster_reader.h"
+
+namespace lumo {
+
+/// Marks a reader of a plug-in whose ReadPixels may run on several threads at once, and writes
+/// every pixel of its block. Blocks that are asked for in another order than the source's are then
+/// read and put in order a few lines at a time, which stay in the cache meanwhile.
+class VEXG_EXPORT ConcurrentReads {
+ public:
+  virtual ~ConcurrentReads() = default;
+};
+
+/// The road of the same to a reader on another thread.
+template <typename T>
+class OrderedReads {
+ public:
+  virtual ~OrderedReads() = default;
+  /// Reads a block as RasterReader::ReadBlock does, into memory of its size.
+  /// @return nothing, with nothing read, for a reader that isn't a ConcurrentReads.
+  virtual std::optional<bool> ReadOrdered(const SubRect& rect, const Array<unsigned>& bands,
+                                          unsigned level, Interleave order, T* pixels,
+                                          unsigned char* state) = 0;
+};
+
+}  // namespace lumo

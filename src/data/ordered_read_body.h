@@ -1,0 +1,97 @@
+#pragma once
+
+#include <algorithm>
+#include <atomic>
+#include <mutex>
+#include <vector>
+
+#include "data/ordered_read.h"
+#include "foundation/fault.h"
+#include "raster/interleave_lines.h"
+#include "raster/pixel_states.h"
+#include "tasks/crew.h"
+
+namespace lumo::detail {
+
+/// The bytes of the lines that are read at once: what becomes of them stays in the second cache.
+inline constexpr std::size_t kGroupBytes = 256 << 10;
+
+/// Clears the states of some lines of a block.
+inline void ClearLines(const LinesOfBlock& part, Interleave order, std::size_t width,
+                       std::size_t bands, unsigned char* state) {
+  const bool isByBand = order == Interleave::BSQ;
+  const std::size_t planes = isByBand ? bands : 1;
+  const std::size_t lineStates = isByBand ? width : width * bands;
+  for (std::size_t plane = 0; plane < planes; ++plane) {
+    std::fill_n(state + (plane * part.ofLines + part.first) * lineStates, part.count * lineStates,
+                static_cast<unsigned char>(0));
+  }
+}
+
+/// Room for the lines that a thread reads at once; states are 0. The thread may keep it.
+template <typename T>
+struct GroupRoom {
+  explicit GroupRoom(std::size_t elements) {
+    std::swap(pixels, Kept<T>());
+    std::swap(states, Kept<unsigned char>());
+    if (pixels.size() < elements) pixels.resize(elements);
+    if (states.size() < elements) states.resize(elements);
+  }
+  /// Keeps the room for the next lines, when the states are 0 as before.
+  void Keep() {
+    if (pixels.size() * sizeof(T) > 4 * kGroupBytes) return;
+    std::swap(pixels, Kept<T>());
+    std::swap(states, Kept<unsigned char>());
+  }
+
+  std::vector<T> pixels;
+  std::vector<unsigned char> states;
+
+ private:
+  template <typename E>
+  static std::vector<E>& Kept() {
+    thread_local std::vector<E> kept;
+    return kept;
+  }
+};
+
+/// Reads a block from a ConcurrentReads in an order that isn't its own, on this thread and those of
+/// the crew. All pixels and states are written.
+template <typename T>
+bool ReadInOrder(RasterReader<T>& reader, const SubRect& rect, const Array<unsigned>& bands,
+                 unsigned level, Interleave order, T* pixels, unsigned char* state) {
+  const Interleave native = reader.NativeInterleave();
+  const std::size_t width = rect.Width(), height = rect.Height(), count = bands.GetCount();
+  const std::size_t lineElements = width * count;
+  const std::size_t most = std::max(kGroupBytes / (lineElements * sizeof(T)), std::size_t{1});
+  const std::size_t perGroup = std::min(most, height);
+  const auto groups = static_cast<unsigned>((height + perGroup - 1) / perGroup);
+  std::atomic<bool> isRead{true};
+  String fault;
+  std::mutex faultLock;
+  RunByCrew(groups, [&](unsigned group) {
+    if (!isRead) return;
+    const LinesOfBlock part{group * perGroup, std::min(perGroup, height - group * perGroup),
+                            height};
+    const std::size_t elements = part.count * lineElements;
+    GroupRoom<T> room(elements);
+    if (!reader.ReadPixels(rect.left, rect.top + static_cast<unsigned>(part.first),
+                           static_cast<unsigned>(width), static_cast<unsigned>(part.count), bands,
+                           level, room.pixels.data(), room.states.data())) {
+      const std::lock_guard lock(faultLock);
+      if (isRead.exchange(false)) fault = TakeFault();
+      return;
+    }
+    ConvertLines(room.pixels.data(), native, part, pixels, order, width, count, sizeof(T));
+    if (AnyHasState(room.states.data(), elements, 0xFF)) {
+      ConvertLines(room.states.data(), native, part, state, order, width, count, 1);
+    } else {
+      ClearLines(part, order, width, count, state);
+      room.Keep();
+    }
+  });
+  if (!isRead && fault.GetLength() != 0) SetFault(fault);
+  return isRead;
+}
+
+}  // namespace lumo::detail
