@@ -167,13 +167,14 @@ NewRaster::~NewRaster() {
   }
 }
 
-/// GDAL's words name the temporary file; the user knows only the place.
+/// GDAL's words name the temporary files; the user knows only the place.
 std::string NewRaster::Shown(const std::string& text) const {
   std::string shown = text;
   const std::string name = fs::path(temporary_).filename().string();
-  for (const auto& [from, to] :
-       {std::pair(temporary_, path_), std::pair(name, fs::path(path_).filename().string())}) {
-    for (std::size_t at = 0; (at = shown.find(from, at)) != shown.npos; at += to.size()) {
+  for (const auto& [from, to] : {std::pair(temporary_, path_), std::pair(scratch_, path_),
+                                 std::pair(name, fs::path(path_).filename().string())}) {
+    for (std::size_t at = 0; !from.empty() && (at = shown.find(from, at)) != shown.npos;
+         at += to.size()) {
       shown.replace(at, from.size(), to);
     }
   }

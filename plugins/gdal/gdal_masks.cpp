@@ -1,6 +1,6 @@
 #include "gdal_masks.h"
 
-#include <algorithm>
+#include "raster/pixel_states.h"
 
 namespace lumo::gdal {
 
@@ -32,14 +32,18 @@ bool Masks::Apply(const BlockPlace& place, GSpacing pixel, GSpacing line, GSpaci
                      0, 0) != CE_None) {
       return false;
     }
-    if (std::find(values.begin(), values.end(), 0) == values.end()) continue;
-    for (const unsigned target : mask.targets) {
-      const unsigned char* value = values.data();
-      for (unsigned y = 0; y < place.height; ++y) {
-        unsigned char* byte = state + band * target + line * y;
-        for (unsigned x = 0; x < place.width; ++x, byte += pixel) {
-          *byte = static_cast<unsigned char>(*byte | (*value++ == 0 ? mask.bit : 0));
-        }
+    BlockStrides strides;
+    strides.pixel = static_cast<std::size_t>(pixel);
+    strides.band = static_cast<std::size_t>(band);
+    for (unsigned y = 0; y < place.height; ++y) {
+      const unsigned char* const row = &values[std::size_t{y} * place.width];
+      unsigned char* const states = state + line * y;
+      if (mask.targets.size() == place.bands.GetCount()) {
+        ExcludeMasked(row, place.width, mask.targets.size(), strides, mask.bit, states);
+        continue;
+      }
+      for (const unsigned target : mask.targets) {
+        ExcludeMasked(row, place.width, 1, strides, mask.bit, states + band * target);
       }
     }
   }

@@ -18,25 +18,46 @@ constexpr unsigned char kValid = 255;
 }  // namespace
 
 NewMask::~NewMask() {
-  mask_.reset();
-  if (isFile_) VSIUnlink(scratch_.c_str());
+  const bool isFile = file_ != nullptr;
+  file_.reset();
+  if (isFile) VSIUnlink(scratch_.c_str());
 }
 
 bool NewMask::Begin() {
-  const Messages messages;
-  isFile_ = 1.0 * samples_ * lines_ > kMaxBytesInMemory;
-  CPLStringList options;
-  if (isFile_) {
-    options.SetNameValue("COMPRESS", "DEFLATE");
-    options.SetNameValue("TILED", "YES");
-    options.SetNameValue("BIGTIFF", "IF_SAFER");
+  if (1.0 * samples_ * lines_ <= kMaxBytesInMemory) {
+    bytes_.assign(std::size_t{samples_} * lines_, kValid);
+    return true;
   }
-  mask_.reset(GDALCreate(GDALGetDriverByName(isFile_ ? "GTiff" : "MEM"), scratch_.c_str(),
-                         static_cast<int>(samples_), static_cast<int>(lines_), 1, GDT_Byte,
-                         options.List()));
-  return (mask_ != nullptr &&
-          GDALFillRaster(GDALGetRasterBand(mask_.get(), 1), kValid, 0) == CE_None) ||
+  const Messages messages;
+  CPLStringList options;
+  options.SetNameValue("COMPRESS", "DEFLATE");
+  options.SetNameValue("TILED", "YES");
+  options.SetNameValue("BIGTIFF", "IF_SAFER");
+  file_.reset(GDALCreate(GDALGetDriverByName("GTiff"), scratch_.c_str(), static_cast<int>(samples_),
+                         static_cast<int>(lines_), 1, GDT_Byte, options.List()));
+  return (file_ != nullptr &&
+          GDALFillRaster(GDALGetRasterBand(file_.get(), 1), kValid, 0) == CE_None) ||
          messages.Fail(scratch_, "a mask can't be made");
+}
+
+/// Reads values of a place from the mask, or writes them there.
+bool NewMask::Transfer(GDALRWFlag direction, const BlockPlace& place, unsigned char* values) {
+  if (bytes_.empty()) {
+    const auto at = [](unsigned number) { return static_cast<int>(number); };
+    return GDALRasterIO(GDALGetRasterBand(file_.get(), 1), direction, at(place.left), at(place.top),
+                        at(place.width), at(place.height), values, at(place.width),
+                        at(place.height), GDT_Byte, 0, 0) == CE_None;
+  }
+  for (unsigned y = 0; y < place.height; ++y) {
+    unsigned char* const here = &bytes_[std::size_t{place.top + y} * samples_ + place.left];
+    unsigned char* const there = values + std::size_t{y} * place.width;
+    if (direction == GF_Read) {
+      std::copy_n(here, place.width, there);
+    } else {
+      std::copy_n(there, place.width, here);
+    }
+  }
+  return true;
 }
 
 bool NewMask::Take(const BlockPlace& place, const std::vector<unsigned char>& excluded,
@@ -44,31 +65,21 @@ bool NewMask::Take(const BlockPlace& place, const std::vector<unsigned char>& ex
   if (excluded.empty() && (IsEmpty() || !isWhole)) return true;
   if (IsEmpty() && !Begin()) return false;
   const Messages messages;
-  const auto at = [](unsigned number) { return static_cast<int>(number); };
-  GDALRasterBandH const band = GDALGetRasterBand(mask_.get(), 1);
   std::vector<unsigned char> values(std::size_t{place.width} * place.height, kValid);
-  const auto transfer = [&](GDALRWFlag direction) {
-    return GDALRasterIO(band, direction, at(place.left), at(place.top), at(place.width),
-                        at(place.height), values.data(), at(place.width), at(place.height),
-                        GDT_Byte, 0, 0) == CE_None;
-  };
-  bool done = isWhole || transfer(GF_Read);
+  bool done = isWhole || Transfer(GF_Read, place, values.data());
   for (std::size_t i = 0; i < excluded.size(); ++i) {
-    if (excluded[i] != 0) values[i] = 0;
+    values[i] = excluded[i] != 0 ? 0 : values[i];
   }
-  done = done && transfer(GF_Write);
+  done = done && Transfer(GF_Write, place, values.data());
   return (done && !messages.HasError()) || messages.Fail(scratch_, "a mask can't be written");
 }
 
-bool NewMask::Read(const BlockPlace& place, std::vector<unsigned char>& excluded) const {
+bool NewMask::Read(const BlockPlace& place, std::vector<unsigned char>& excluded) {
   excluded.clear();
   if (IsEmpty()) return true;
   const Messages messages;
-  const auto at = [](unsigned number) { return static_cast<int>(number); };
   excluded.resize(std::size_t{place.width} * place.height);
-  if (GDALRasterIO(GDALGetRasterBand(mask_.get(), 1), GF_Read, at(place.left), at(place.top),
-                   at(place.width), at(place.height), excluded.data(), at(place.width),
-                   at(place.height), GDT_Byte, 0, 0) != CE_None) {
+  if (!Transfer(GF_Read, place, excluded.data())) {
     return messages.Fail(scratch_, "a mask can't be read");
   }
   for (unsigned char& byte : excluded) byte = byte == 0 ? 1 : 0;
@@ -108,14 +119,13 @@ bool NewMask::WriteTo(const std::string& path, const std::string& driver) {
       GDALCreateDatasetMaskBand(file.get(), GMF_PER_DATASET) != CE_None) {
     return messages.Fail(path, "the format takes no mask");
   }
-  GDALRasterBandH const source = GDALGetRasterBand(mask_.get(), 1);
   GDALRasterBandH const target = GDALGetMaskBand(GDALGetRasterBand(file.get(), 1));
   const auto width = static_cast<int>(samples_);
   std::vector<unsigned char> row(samples_);
+  const Array<unsigned> none;
   for (int line = 0; line < static_cast<int>(lines_); ++line) {
-    if (GDALRasterIO(source, GF_Read, 0, line, width, 1, row.data(), width, 1, GDT_Byte, 0, 0) !=
-            CE_None ||
-        !Excluded(before.get(), line, row) ||
+    const BlockPlace place{0, static_cast<unsigned>(line), samples_, 1, none, 0};
+    if (!Transfer(GF_Read, place, row.data()) || !Excluded(before.get(), line, row) ||
         GDALRasterIO(target, GF_Write, 0, line, width, 1, row.data(), width, 1, GDT_Byte, 0, 0) !=
             CE_None) {
       return messages.Fail(path, "the mask can't be written");

@@ -22,7 +22,7 @@ class NewMask {
   NewMask(const NewMask&) = delete;
   NewMask& operator=(const NewMask&) = delete;
 
-  bool IsEmpty() const { return mask_ == nullptr; }
+  bool IsEmpty() const { return bytes_.empty() && file_ == nullptr; }
 
   /// Takes in a block.
   /// @param excluded  a byte for each pixel of the block, not 0 where it is to be excluded; empty
@@ -32,7 +32,7 @@ class NewMask {
 
   /// Gets the pixels of a place that are excluded.
   /// @param excluded  [out] a byte for each, not 0 for those; empty while there is no mask.
-  bool Read(const BlockPlace& place, std::vector<unsigned char>& excluded) const;
+  bool Read(const BlockPlace& place, std::vector<unsigned char>& excluded);
 
   /// Gives the mask to a finished raster file: into a TIFF file, beside any other one. Pixels that
   /// hold the no-data values of all bands are excluded as well, since other programs look at the
@@ -41,13 +41,15 @@ class NewMask {
 
  private:
   bool Begin();
+  bool Transfer(GDALRWFlag direction, const BlockPlace& place, unsigned char* values);
   bool Excluded(GDALDatasetH file, int line, std::vector<unsigned char>& row) const;
 
   const std::string scratch_;
   const unsigned samples_;
   const unsigned lines_;
-  DatasetPtr mask_;  // one band: 0 excluded, else 255
-  bool isFile_ = false;
+  // One band: 0 excluded, else 255.
+  std::vector<unsigned char> bytes_;
+  DatasetPtr file_;  // of one that is too large for memory
 };
 
 }  // namespace lumo::gdal

@@ -320,9 +320,9 @@ std::vector<unsigned char> Reader<T>::FindUntold(const BlockPlace& place, const 
   if (AllValid(state, count)) return {};
   std::vector<std::optional<T>> values;
   for (const unsigned band : place.bands) values.push_back(noData_[band]);
-  std::vector<unsigned char> told(count);
   const NoDataMarker<T> marker(std::move(values), raster_.Interleave(), place.width, place.height);
-  marker.Mark(0, count, pixels, told.data());
+  std::vector<unsigned char> told(marker.IsNeeded() ? count : 0);
+  if (marker.IsNeeded()) marker.Mark(0, count, pixels, told.data());
 
   const BlockStrides strides(raster_.Interleave(), place.width, place.height, bands);
   const auto alphaAt = std::find(place.bands.begin(), place.bands.end(), alphaBand_);
@@ -330,16 +330,29 @@ std::vector<unsigned char> Reader<T>::FindUntold(const BlockPlace& place, const 
   const auto alpha = static_cast<std::size_t>(alphaAt - place.bands.begin());
   std::vector<unsigned char> untold(plane);
   bool isAny = false;
-  for (std::size_t band = 0; band < bands; ++band) {
-    if (hasAlpha && band == alpha) continue;  // an alpha band is valid everywhere
-    for (std::size_t y = 0, pixel = 0; y < place.height; ++y) {
-      for (std::size_t x = 0; x < place.width; ++x, ++pixel) {
-        const std::size_t at = y * strides.line + x * strides.pixel;
-        const std::size_t here = at + band * strides.band;
-        if (IsValidState(state[here]) || told[here] != 0) continue;
-        if (hasAlpha && pixels[at + alpha * strides.band] == T{}) continue;
-        untold[pixel] = 1;
-        isAny = true;
+  // An alpha band is valid everywhere, and says of pixels where it is 0 that they are not.
+  const auto isUntold = [&](std::size_t at, std::size_t band) {
+    const std::size_t here = at + band * strides.band;
+    return !IsValidState(state[here]) && (told.empty() || told[here] == 0) &&
+           !(hasAlpha && (band == alpha || pixels[at + alpha * strides.band] == T{}));
+  };
+  // Runs of values whose bands lie together, or of one band.
+  const bool isByPixel = strides.band == 1;
+  const std::size_t inRun = isByPixel ? bands : 1, run = place.width * inRun;
+  for (std::size_t band = 0; band < bands; band += inRun) {
+    for (std::size_t y = 0; y < place.height; ++y) {
+      const std::size_t first = y * strides.line;
+      const unsigned char* const states = state + first + band * strides.band;
+      for (std::size_t x = CountLeadingValid(states, run) / inRun; x < place.width; ++x) {
+        if (IsValidState(states[x * inRun])) {
+          x += CountLeadingValid(states + x * inRun, run - x * inRun) / inRun;
+          if (x == place.width) break;
+        }
+        for (std::size_t i = 0; i < inRun && untold[y * place.width + x] == 0; ++i) {
+          if (!isUntold(first + x * strides.pixel, band + i)) continue;
+          untold[y * place.width + x] = 1;
+          isAny = true;
+        }
       }
     }
   }

@@ -61,10 +61,56 @@ bool FindJpegForm(const File& file, Image& image) {
   return true;
 }
 
+/// Takes in how an image is cut into blocks. False for a form that GDAL has to read.
+/// @param tileWidth  in samples, where there are tiles.
+bool FindBlocks(const File& file, Image& image, std::uint64_t tileWidth) {
+  const Directory& directory = *image.directory;
+  image.isTiled = directory.contains(kTileOffsets);
+  if (image.isTiled == directory.contains(kStripOffsets)) return false;
+  const std::uint64_t rows =
+      file.Number(directory, kRowsPerStrip, directory.contains(kRowsPerStrip) ? 0 : image.lines);
+  const std::uint64_t width = image.isTiled ? tileWidth : image.samples;
+  const std::uint64_t height = image.isTiled ? file.Number(directory, kTileLength, 0)
+                                             : std::min<std::uint64_t>(rows, image.lines);
+  const bool hasBlocks = width != 0 && height != 0 && width <= kMostSide && height <= kMostSide &&
+                         width * image.PixelBytes() <= kMostBlockBytes / height;
+  if (!hasBlocks) return false;
+  image.blockWidth = static_cast<unsigned>(width);
+  image.blockHeight = static_cast<unsigned>(height);
+  const auto at = directory.find(image.isTiled ? kTileOffsets : kStripOffsets);
+  const auto sizes = directory.find(image.isTiled ? kTileByteCounts : kStripByteCounts);
+  return sizes != directory.end() && at->second.count == image.Blocks() &&
+         sizes->second.count == image.Blocks();
+}
+
 }  // namespace
 
 unsigned Image::DataType() const {
   return TypeCode(sampleFormat, elementBytes);
+}
+
+std::optional<Image> FindMask(const File& file, const Directory& directory, const Image& of) {
+  constexpr std::uint64_t kMask = 4;
+  const auto number = [&](Tag tag, std::uint64_t absent) {
+    return file.Number(directory, tag, absent);
+  };
+  const bool isUsable = number(kImageWidth, 0) == of.samples &&
+                        number(kImageLength, 0) == of.lines && number(kBitsPerSample, 1) == 1 &&
+                        number(kSamplesPerPixel, 1) == 1 && number(kPhotometric, 0) == kMask &&
+                        number(kSampleFormat, 1) == 1 && number(kPredictor, 1) == 1 &&
+                        number(kFillOrder, 1) == 1 && number(kOrientation, 1) == 1 &&
+                        IsKnown(number(kCompression, 0)) && !directory.contains(kJpegTables);
+  Image mask;
+  mask.compression = static_cast<Compression>(number(kCompression, 0));
+  if (!isUsable || mask.compression == Compression::kJpeg) return std::nullopt;
+  constexpr unsigned kBits = 8;
+  mask.samples = (of.samples - 1) / kBits + 1;
+  mask.lines = of.lines;
+  mask.bands = mask.elementBytes = 1;
+  mask.directory = &directory;
+  const std::uint64_t width = number(kTileWidth, 0);
+  if (width % kBits != 0) return std::nullopt;
+  return FindBlocks(file, mask, width / kBits) ? std::optional(mask) : std::nullopt;
 }
 
 std::optional<Image> FindImage(const File& file, const Directory& directory) {
@@ -92,31 +138,16 @@ std::optional<Image> FindImage(const File& file, const Directory& directory) {
   image.compression = static_cast<Compression>(compression);
   image.predictor = compression == 1 ? 1 : static_cast<unsigned>(predictor);
   image.byPixel = planar == 1 && bands > 1;
-  image.isTiled = directory.contains(kTileOffsets);
   image.directory = &directory;
   const bool isJpeg = image.compression == Compression::kJpeg;
   const bool hasJpegTags = directory.contains(kJpegTables) ||
                            directory.contains(kYCbCrSubsampling) ||
                            directory.contains(kReferenceBlackWhite);
   if (isJpeg ? !FindJpegForm(file, image) : hasJpegTags) return std::nullopt;
-  if (image.isTiled == directory.contains(kStripOffsets)) return std::nullopt;
-  const std::uint64_t width = image.isTiled ? number(kTileWidth, 0) : samples;
-  const std::uint64_t height =
-      image.isTiled
-          ? number(kTileLength, 0)
-          : std::min(number(kRowsPerStrip, directory.contains(kRowsPerStrip) ? 0 : lines), lines);
-  const bool hasBlocks = width != 0 && height != 0 && width <= kMostSide && height <= kMostSide &&
-                         width * image.PixelBytes() <= kMostBlockBytes / height;
-  if (!hasBlocks || image.DataType() == 0) return std::nullopt;
+  if (!FindBlocks(file, image, number(kTileWidth, 0)) || image.DataType() == 0) return std::nullopt;
   if (image.predictor == 3 && image.sampleFormat != 3) return std::nullopt;
   if (image.predictor == 2 && image.sampleFormat == 3) return std::nullopt;
-  image.blockWidth = static_cast<unsigned>(width);
-  image.blockHeight = static_cast<unsigned>(height);
-  const auto at = directory.find(image.isTiled ? kTileOffsets : kStripOffsets);
-  const auto sizes = directory.find(image.isTiled ? kTileByteCounts : kStripByteCounts);
-  const bool isWhole = sizes != directory.end() && at->second.count == image.Blocks() &&
-                       sizes->second.count == image.Blocks();
-  return isWhole ? std::optional(image) : std::nullopt;
+  return image;
 }
 
 }  // namespace lumo::tiff

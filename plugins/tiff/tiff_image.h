@@ -42,4 +42,9 @@ struct Image {
 /// Describes the pixels of a directory. Nothing for what Window can't read.
 std::optional<Image> FindImage(const File& file, const Directory& directory);
 
+/// Describes a mask of one bit for each pixel, as an image whose samples are the bytes that hold
+/// eight of them. Nothing for another form.
+/// @param of  the image whose pixels it masks.
+std::optional<Image> FindMask(const File& file, const Directory& directory, const Image& of);
+
 }  // namespace lumo::tiff

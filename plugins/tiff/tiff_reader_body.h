@@ -118,8 +118,8 @@ RasterBandStats<T> Reader<T>::ReadStats(unsigned band) {
     const auto stored = band < def_.bands ? source_.Stored().Stats(band) : std::nullopt;
     if (!stored) return stats;
     const std::optional<unsigned>& masking = source_.MaskingBand();
-    const bool allValid =
-        std::is_integral_v<T> && !source_.NoData() && (!masking || band == *masking);
+    const bool allValid = std::is_integral_v<T> && !source_.NoData() && !source_.HasMasks() &&
+                          (!masking || band == *masking);
     stats = gdal::FromStored<T>(*stored, std::uint64_t{def_.samples} * def_.lines, allValid);
     stats.band = band;
   }
@@ -182,18 +182,29 @@ template <typename T>
 bool Reader<T>::ReadPixels(unsigned left, unsigned top, unsigned width, unsigned height,
                            const Array<unsigned>& bands, unsigned level, T* pixels,
                            unsigned char* state) {
+  const Rect rect{left, top, width, height};
+  std::vector<unsigned char> mask;
   const bool isRead = !hasChanged_ && IsInside(left, top, width, height, bands, level) &&
-                      ReadMasked({left, top, width, height}, bands, level, pixels, state);
+                      (!source_.HasMasks() || source_.ReadMask(rect, level, mask)) &&
+                      ReadMasked(rect, bands, level, pixels, state);
   if (!isRead) {
     // GDAL says what is wrong, or reads what is of another kind.
     RasterReader<T>* const inner = Inner();
     return inner != nullptr &&
            inner->ReadPixels(left, top, width, height, bands, level, pixels, state);
   }
-  if (!noData_) return true;
-  const NoDataMarker<T> marker(std::vector<std::optional<T>>(bands.GetCount(), noData_),
-                               def_.interleave, width, height);
-  marker.Mark(0, std::uint64_t{width} * height * bands.GetCount(), pixels, state);
+  if (noData_) {
+    const NoDataMarker<T> marker(std::vector<std::optional<T>>(bands.GetCount(), noData_),
+                                 def_.interleave, width, height);
+    marker.Mark(0, std::uint64_t{width} * height * bands.GetCount(), pixels, state);
+  }
+  if (!mask.empty()) {
+    const BlockStrides strides(def_.interleave, width, height, bands.GetCount());
+    for (unsigned y = 0; y < height; ++y) {
+      ExcludeMasked(&mask[std::size_t{y} * width], width, bands.GetCount(), strides,
+                    PixelValueState::Masked, state + y * strides.line);
+    }
+  }
   return true;
 }
 

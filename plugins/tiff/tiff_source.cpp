@@ -219,8 +219,10 @@ std::unique_ptr<Source> Source::Open(const std::string& path, const String& form
   return isOwn ? std::move(source) : nullptr;
 }
 
+/// Bits of the tag SubfileType.
+constexpr std::uint64_t kReduced = 1, kIsMask = 4;
+
 bool Source::FindLevels() {
-  constexpr std::uint64_t kReduced = 1;
   const std::vector<Directory>& directories = file_->Directories();
   for (const Directory& directory : directories) {
     for (const auto& [tag, entry] : directory) {
@@ -235,6 +237,7 @@ bool Source::FindLevels() {
         return false;
       }
     }
+    if (!isFirst && (file_->Number(directory, kSubfileType, 0) & kIsMask) != 0) continue;
     const std::optional<Image> image = FindImage(*file_, directory);
     if (!image || file_->Number(directory, kSubfileType, 0) != (isFirst ? 0 : kReduced)) {
       return false;
@@ -261,7 +264,23 @@ bool Source::FindLevels() {
     }
     last = at->first;
   }
-  return true;
+  return FindMasks();
+}
+
+/// Finds the mask of each level. False where some level has none though another one has.
+bool Source::FindMasks() {
+  for (const Directory& directory : file_->Directories()) {
+    const std::uint64_t kind = file_->Number(directory, kSubfileType, 0);
+    if ((kind & kIsMask) == 0) continue;
+    std::optional<Image> mask;
+    for (auto level = levels_.begin(); !mask && level != levels_.end(); ++level) {
+      if (kind != (level->first == 0 ? kIsMask : kIsMask | kReduced)) continue;
+      mask = FindMask(*file_, directory, level->second);
+      if (mask && !masks_.emplace(level->first, *mask).second) return false;
+    }
+    if (!mask) return false;
+  }
+  return masks_.empty() || masks_.size() == levels_.size();
 }
 
 /// Takes the values in the file beside this one; those in the file itself were taken before.
@@ -280,6 +299,7 @@ bool Source::Describe(const String& formatKey) {
     if (FindMeaning(*file_, level) != meaning) return false;
   }
   if (meaning->isPalette && !ReadColors(*file_, directory, noData_, colors_)) return false;
+  if (meaning->hasAlpha && HasMasks()) return false;  // which of them counts is GDAL's to say
   if (meaning->hasAlpha && !noData_) maskingBand_ = image.bands - 1;
   const std::optional<Place> place = FindPlace(*file_, image);
   if (!place) return false;
@@ -348,6 +368,31 @@ bool Source::Read(const Rect& rect, const Array<unsigned>& bands, unsigned level
   std::unique_ptr<Window>& window = windows_[level];
   if (window == nullptr) window = std::make_unique<Window>(*file_, image->second);
   return window->Read(rect, bands, pixels);
+}
+
+bool Source::ReadMask(const Rect& rect, unsigned level, std::vector<unsigned char>& mask) {
+  const auto image = masks_.find(level);
+  if (image == masks_.end()) return false;
+  std::unique_ptr<Window>& window = maskWindows_[level];
+  if (window == nullptr) window = std::make_unique<Window>(*file_, image->second);
+  constexpr unsigned kBits = 8;
+  const unsigned first = rect.left / kBits, end = (rect.left + rect.width - 1) / kBits + 1;
+  const Rect bytes{first, rect.top, end - first, rect.height};
+  Array<unsigned> band(ArrayDims(1));
+  band[0] = 0;
+  std::vector<unsigned char> packed(std::size_t{bytes.width} * bytes.height);
+  if (!window->Read(bytes, band, packed.data())) return false;
+  mask.resize(std::size_t{rect.width} * rect.height);
+  const unsigned shift = rect.left % kBits;
+  for (std::size_t y = 0; y < rect.height; ++y) {
+    const unsigned char* const from = &packed[y * bytes.width];
+    unsigned char* const to = &mask[y * rect.width];
+    for (unsigned x = 0; x < rect.width; ++x) {
+      const unsigned bit = x + shift;
+      to[x] = from[bit / kBits] >> (kBits - 1 - bit % kBits) & 1;
+    }
+  }
+  return true;
 }
 
 bool Source::CanWrite() {

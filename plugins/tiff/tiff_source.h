@@ -39,6 +39,11 @@ class Source {
   /// The levels by number: 0, and a range without gaps from 1 on.
   const std::map<unsigned, Image>& Levels() const { return levels_; }
 
+  /// True when a mask says which pixels of each level are valid.
+  bool HasMasks() const { return !masks_.empty(); }
+  /// Reads the mask of a rectangle of a level: a byte for each pixel, 0 where it isn't valid.
+  bool ReadMask(const Rect& rect, unsigned level, std::vector<unsigned char>& mask);
+
   /// Reads a rectangle of a level, in the order of axes of the description.
   bool Read(const Rect& rect, const Array<unsigned>& bands, unsigned level, unsigned char* pixels);
 
@@ -57,6 +62,7 @@ class Source {
       : file_(std::move(file)), opener_(std::move(opener)) {}
   bool Describe(const String& formatKey);
   bool FindLevels();
+  bool FindMasks();
   bool TakeSideFile();
 
   const std::unique_ptr<File> file_;
@@ -66,7 +72,8 @@ class Source {
   Palette colors_;
   std::optional<unsigned> maskingBand_;
   std::map<unsigned, Image> levels_;
-  std::map<unsigned, std::unique_ptr<Window>> windows_;
+  std::map<unsigned, Image> masks_;  // of all levels, or none
+  std::map<unsigned, std::unique_ptr<Window>> windows_, maskWindows_;
   StoredItems stored_;
   std::optional<bool> canWrite_;
   RasterDataConnectionPtr inner_;

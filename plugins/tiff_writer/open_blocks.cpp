@@ -1,6 +1,7 @@
 #include "tiff_writer/open_blocks.h"
 
 #include <cstring>
+#include <filesystem>
 
 #include "foundation/fault.h"
 
@@ -24,8 +25,13 @@ std::vector<unsigned char> Repeated(const std::vector<unsigned char>& value, std
   return run;
 }
 
-OpenBlocks::OpenBlocks(std::string folder, std::vector<unsigned char> fill, std::uint64_t mostBytes)
-    : folder_(std::move(folder)),
+std::string FaultOfUnnamed(const std::string& path, const std::string& why) {
+  const std::size_t reason = why.rfind(": ");
+  return reason != why.npos ? path + why.substr(reason) : path + ": " + why;
+}
+
+OpenBlocks::OpenBlocks(std::string path, std::vector<unsigned char> fill, std::uint64_t mostBytes)
+    : path_(std::move(path)),
       slotBytes_(mostBytes),
       fill_(std::move(fill)),
       fillsZero_(std::all_of(fill_.begin(), fill_.end(), [](unsigned char b) { return b == 0; })) {}
@@ -64,14 +70,15 @@ OpenBlock* OpenBlocks::OpenWith(unsigned level, std::uint64_t block,
 bool OpenBlocks::Spill(OpenBlock& block, std::uint64_t bytes, const unsigned char* pixels) {
   std::string why;
   if (file_ == nullptr) {
-    file_ = platform::RandomAccessFile::CreateUnnamed(folder_, &why);
-    if (file_ == nullptr) return Fail(why);
+    file_ = platform::RandomAccessFile::CreateUnnamed(
+        std::filesystem::path(path_).parent_path().string(), &why);
+    if (file_ == nullptr) return Fail(FaultOfUnnamed(path_, why));
   }
   const bool isFresh = freeSlots_.empty();
   if (isFresh) {
     block.slot = slots_;
     slots_ += slotBytes_;
-    if (!file_->SetSize(slots_, &why)) return Fail(why);
+    if (!file_->SetSize(slots_, &why)) return Fail(FaultOfUnnamed(path_, why));
   } else {
     block.slot = freeSlots_.back();
     freeSlots_.pop_back();
@@ -107,7 +114,7 @@ bool OpenBlocks::Write(OpenBlock& block, std::uint64_t at, const void* data, std
     return true;
   }
   std::string why;
-  return file_->Write(block.slot + at, data, bytes, &why) || Fail(why);
+  return file_->Write(block.slot + at, data, bytes, &why) || Fail(FaultOfUnnamed(path_, why));
 }
 
 bool OpenBlocks::Read(const OpenBlock& block, std::uint64_t at, void* data,
@@ -117,7 +124,7 @@ bool OpenBlocks::Read(const OpenBlock& block, std::uint64_t at, void* data,
     return true;
   }
   std::string why;
-  return file_->Read(block.slot + at, data, bytes, &why) || Fail(why);
+  return file_->Read(block.slot + at, data, bytes, &why) || Fail(FaultOfUnnamed(path_, why));
 }
 
 bool OpenBlocks::Load(OpenBlock& block, std::uint64_t bytes) {

@@ -30,10 +30,10 @@ struct OpenBlock {
 /// Failure: false or null, with the fault set.
 class OpenBlocks {
  public:
-  /// @param folder     where the file lies.
+  /// @param path       of the raster, beside which the file lies.
   /// @param fill       bytes of one value.
   /// @param mostBytes  of a block.
-  OpenBlocks(std::string folder, std::vector<unsigned char> fill, std::uint64_t mostBytes);
+  OpenBlocks(std::string path, std::vector<unsigned char> fill, std::uint64_t mostBytes);
 
   OpenBlock* Find(unsigned level, std::uint64_t block);
   /// Opens a block that isn't open, full of the fill value.
@@ -55,7 +55,7 @@ class OpenBlocks {
  private:
   bool Spill(OpenBlock& block, std::uint64_t bytes, const unsigned char* pixels);
 
-  const std::string folder_;
+  const std::string path_;
   const std::uint64_t slotBytes_;
   const std::vector<unsigned char> fill_;
   const bool fillsZero_;
@@ -65,6 +65,10 @@ class OpenBlocks {
   std::uint64_t slots_ = 0;
   std::vector<std::uint64_t> freeSlots_;
 };
+
+/// What happened to a file without a name, which tells of itself by its folder, as a fault of the
+/// raster that it is for.
+std::string FaultOfUnnamed(const std::string& path, const std::string& why);
 
 /// A run of bytes that repeats one value.
 std::vector<unsigned char> Repeated(const std::vector<unsigned char>& value, std::uint64_t bytes);

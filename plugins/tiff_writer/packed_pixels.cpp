@@ -74,8 +74,7 @@ PackedPixels::PackedPixels(PackedRaster raster)
       packing_(PackingOf(raster_)),
       reducer_(raster_.def, raster_.layout.Depth(), raster_.hasAlpha),
       isCog_(raster_.def.creation.layout == FileLayout::kCog),
-      open_(std::filesystem::path(raster_.path).parent_path().string(), raster_.fill,
-            raster_.layout.BlockBytes(0)) {
+      open_(raster_.path, raster_.fill, raster_.layout.BlockBytes(0)) {
   MakeLevels();
   constexpr std::uint64_t kBatchBytes = 64 << 20;
   const auto cores = static_cast<std::uint64_t>(std::max(GetProcessingCores(), 1));
@@ -109,7 +108,7 @@ bool PackedPixels::MakeFile() {
   const std::string folder = std::filesystem::path(raster_.path).parent_path().string();
   file_ = isCog_ ? platform::RandomAccessFile::CreateUnnamed(folder, &why)
                  : platform::RandomAccessFile::CreateOrEmpty(raster_.path, &why);
-  return file_ != nullptr || Fail(why);
+  return file_ != nullptr || FailOfFile(why);
 }
 
 void PackedPixels::MakeLevels() {
@@ -143,7 +142,7 @@ bool PackedPixels::Unpacked(unsigned level, std::uint64_t block,
   std::string why;
   return (file_->Read(placed.offset, packed.data(), packed.size(), &why) &&
           Unpack(packing_, layout.blockWidth, layout.LinesOf(block), packed, pixels.data(), why)) ||
-         Fail(why);
+         FailOfFile(why);
 }
 
 /// Gets a block that is being filled; one that was packed before is taken up again.
@@ -169,7 +168,7 @@ OpenBlock* PackedPixels::TakeUp(unsigned level, std::uint64_t block, bool toChan
       if (!file_->Read(of.masks[block].offset, packed.data(), packed.size(), &why) ||
           !Unpack(MaskPacking(), of.layout.blockWidth, of.layout.blockHeight, packed, bits.data(),
                   why)) {
-        Fail(why);
+        FailOfFile(why);
         return nullptr;
       }
       const unsigned width = of.layout.InnerWidth(block), height = of.layout.InnerHeight(block);
@@ -356,6 +355,11 @@ bool PackedPixels::Store(Work& work) {
   return true;
 }
 
+/// Sets the fault of the file that takes the blocks.
+bool PackedPixels::FailOfFile(const std::string& why) const {
+  return Fail(isCog_ ? FaultOfUnnamed(raster_.path, why) : why);
+}
+
 bool PackedPixels::Append(const std::vector<unsigned char>& packed, PackedBlock& block) {
   std::string why;
   const bool isFull = !isCog_ && raster_.def.creation.bigTiff == BigTiffChoice::kNo &&
@@ -364,7 +368,7 @@ bool PackedPixels::Append(const std::vector<unsigned char>& packed, PackedBlock&
     return Fail(raster_.path +
                 ": takes 4 GiB or more, which is too much for a file that is no BigTIFF");
   }
-  if (!file_->Write(end_, packed.data(), packed.size(), &why)) return Fail(why);
+  if (!file_->Write(end_, packed.data(), packed.size(), &why)) return FailOfFile(why);
   block = {end_, static_cast<std::uint32_t>(packed.size())};
   end_ += packed.size() + packed.size() % 2;
   return true;

@@ -78,6 +78,7 @@ class PackedPixels final : public NewPixels {
   bool Prepare(Work& work);
   void Run(Work& work) const;
   bool Store(Work& work);
+  bool FailOfFile(const std::string& why) const;
   bool Append(const std::vector<unsigned char>& packed, PackedBlock& block);
   bool GiveToLevelAbove(const Work& work);
   void NoteQuarter(unsigned level, std::uint64_t block);

@@ -51,15 +51,6 @@ class NumberBlockOf final : public NumberBlock {
   Array<S> pixels_;
 };
 
-/// Calls `body(RasterPtr<S>)` for a raster of EightTypes.
-template <typename Body>
-bool VisitTyped(const BasicRasterPtr& raster, const Body& body) {
-  return raster && DispatchType(EightTypes{}, raster->DataType(), [&]<typename S>() {
-           body(RasterPtr<S>(raster));
-           return true;
-         });
-}
-
 std::unique_ptr<NumberBlock> MakeBlock(unsigned dataType) {
   std::unique_ptr<NumberBlock> block;
   DispatchType(EightTypes{}, dataType, [&]<typename S>() {
@@ -98,8 +89,8 @@ void Compute(const NumberBlock& block, const CalibrationFormula& formula, const 
 template <typename T>
 CalibratedRaster<T>::CalibratedRaster(const BasicRasterPtr& raster,
                                       const CalibrationConstants& constants)
-    : raster_(raster), constants_(constants) {
-  if (!SetUp()) def_.Clear();
+    : DerivedRaster<T>({raster}), constants_(constants) {
+  SetUp();
 }
 
 template <typename T>
@@ -108,32 +99,22 @@ CalibratedRaster<T>::~CalibratedRaster() {
 }
 
 template <typename T>
-bool CalibratedRaster<T>::SetUp() {
-  if (!raster_ || !raster_->IsValid() || !constants_.Fit(raster_->Bands())) return false;
-  if (!VisitTyped(raster_, [](const auto&) {})) {
+void CalibratedRaster<T>::SetUp() {
+  const BasicRasterPtr& raster = this->GetRasters().front();
+  if (!raster || !raster->IsValid() || !constants_.Fit(raster->Bands())) return;
+  if (!DispatchType(EightTypes{}, raster->DataType(), []<typename S>() { return true; })) {
     SetFault("the raster has a pixel type that can't be calibrated");
-    return false;
+    return;
   }
-  def_ = raster_->GetRasterDef();
-  def_.dataType = kDataTypeOf<T>;
-  def_.noData.clear();  // the states carry it
+  const RasterDef def = raster->GetRasterDef();
   std::vector<std::string> names;
-  for (unsigned band = 0; band < def_.bands; ++band) {
-    names.push_back(FindDetail(def_.metadata, BandDetailPath(band, "Description")));
-  }
-  for (const std::string& name : DetailNames(def_.metadata)) {
-    if (name.starts_with("Bands/") || name.starts_with("Items/")) {
-      def_.metadata.Remove(DetailPath(name));
-    }
-  }
-  Array<unsigned> all{ArrayDims(def_.bands)};
-  for (unsigned band = 0; band < def_.bands; ++band) {
+  Array<unsigned> all{ArrayDims(def.bands)};
+  for (unsigned band = 0; band < def.bands; ++band) {
+    names.push_back(FindDetail(def.metadata, BandDetailPath(band, "Description")));
     all[band] = band;
-    if (names[band].empty()) continue;
-    def_.metadata.Set(BandDetailPath(band, "Description"), String(names[band]));
   }
+  this->Describe(names);
   formula_ = MakeFormula(all);
-  return true;
 }
 
 template <typename T>
@@ -144,53 +125,11 @@ std::unique_ptr<CalibrationFormula> CalibratedRaster<T>::MakeFormula(
 
 template <typename T>
 bool CalibratedRaster<T>::IsAllBands(const Array<unsigned>& bands) const {
-  if (bands.GetCount() != def_.bands) return false;
-  for (unsigned band = 0; band < def_.bands; ++band) {
+  if (bands.GetCount() != this->Bands()) return false;
+  for (unsigned band = 0; band < this->Bands(); ++band) {
     if (bands[band] != band) return false;
   }
   return true;
-}
-
-template <typename T>
-bool CalibratedRaster<T>::IsValid() const {
-  return def_.bands != 0 && raster_->IsValid();
-}
-
-template <typename T>
-bool CalibratedRaster<T>::PyramidExists() const {
-  return def_.bands != 0 && raster_->PyramidExists();
-}
-
-template <typename T>
-PyramidDef CalibratedRaster<T>::GetPyramidDef() const {
-  return PyramidExists() ? raster_->GetPyramidDef() : PyramidDef();
-}
-
-template <typename T>
-RasterPtr<T> CalibratedRaster<T>::PyramidLevel(unsigned level) {
-  BasicRasterPtr reduced;
-  VisitTyped(raster_,
-             [&](const auto& raster) { reduced = BasicRasterPtr(raster->PyramidLevel(level)); });
-  if (!reduced || def_.bands == 0) return {};
-  const RasterPtr<T> view(new CalibratedRaster(reduced, constants_));
-  return view->IsValid() ? view : RasterPtr<T>();
-}
-
-template <typename T>
-void CalibratedRaster<T>::SetTileDimensions(const lumo::TileDimensions& tiles) {
-  if (raster_) raster_->SetTileDimensions(tiles);
-}
-
-template <typename T>
-lumo::TileDimensions CalibratedRaster<T>::TileDimensions() const {
-  return def_.bands != 0 ? raster_->TileDimensions() : lumo::TileDimensions();
-}
-
-template <typename T>
-std::uint64_t CalibratedRaster<T>::WriteCount() const {
-  std::uint64_t writes = 0;
-  VisitTyped(raster_, [&](const auto& raster) { writes = raster->WriteCount(); });
-  return writes;
 }
 
 template <typename T>
@@ -198,16 +137,17 @@ bool CalibratedRaster<T>::GetSubRect(const SubRect& rect, const Array<unsigned>&
                                      Interleave interleave, Array<T>& pixels,
                                      Array<unsigned char>& state) {
   const BlockShape shape(rect, bands, interleave);
-  if (rect.right >= def_.samples || rect.bottom >= def_.lines || !shape.Size(pixels, state)) {
+  if (rect.right >= this->Samples() || rect.bottom >= this->Lines() || !shape.Size(pixels, state)) {
     return false;
   }
   for (const unsigned band : shape.bands) {
-    if (band >= def_.bands) return false;
+    if (band >= this->Bands()) return false;
   }
   const auto borrowed = blocks_.Borrow();
   std::unique_ptr<NumberBlock>& block = *borrowed;
-  if (!block) block = MakeBlock(raster_->DataType());
-  if (!block || !block->Read(raster_, rect, shape.bands)) return false;
+  const BasicRasterPtr& raster = this->GetRasters().front();
+  if (!block) block = MakeBlock(raster->DataType());
+  if (!block || !block->Read(raster, rect, shape.bands)) return false;
   const auto some = IsAllBands(shape.bands) ? nullptr : MakeFormula(shape.bands);
   const CalibrationFormula& formula = some ? *some : *formula_;
   bool done = true;

@@ -3,9 +3,8 @@
 #include <memory>
 
 #include "calibration/calibration_constants.h"
-#include "raster/raster_def.h"
 #include "tasks/scratch_pool.h"
-#include "views/computed_raster.h"
+#include "views/derived_raster.h"
 
 namespace lumo {
 
@@ -17,53 +16,37 @@ class NumberBlock;
 /// kept; a pixel has the same bits whatever block it is read in, those that Calibrate gives it (see
 /// calibration_process.h).
 ///
-/// The states are those of the raster; a pixel that is not valid is 0. Of the details the place and
-/// the names of the bands stay. Statistics are its own. Levels of a pyramid are computed from those
-/// of the raster. It can't be written. Exists for EightTypes, on rasters of EightTypes.
+/// The states are those of the raster; a pixel that is not valid is 0. The names of the bands stay;
+/// see DerivedRaster. Exists for EightTypes, on rasters of EightTypes.
 ///
 ///     CalibrationConstants constants;  // Landsat 8, band 10: kelvins
 ///     constants.quantity = CalibrationQuantity::kTemperature;
 ///     constants.gains = …
 ///     const RasterPtr<float> kelvins(new CalibratedRaster<float>(scene, constants));
 ///
-/// Ownership: shares the raster, which does not know the view.
 /// Threads:   every operation may run on many threads at once. A block is computed by all threads.
 /// Failure:   IsValid() is false, with a fault text, where constants are missing or the raster is
 ///            of another type; operations then give false, 0 or empty.
 /// Cost:      that of reading the bands that are asked for, and of the formula.
 template <typename T>
-class CalibratedRaster final : public ComputedRaster<T> {
+class CalibratedRaster final : public DerivedRaster<T> {
  public:
   CalibratedRaster(const BasicRasterPtr& raster, const CalibrationConstants& constants);
   ~CalibratedRaster() override;
 
   URI GetURI() const override { return this->DefaultURI("CalibratedRaster"); }
-  bool IsValid() const override;
-  bool CanWrite() const override { return false; }
-  RasterDef GetRasterDef() const override { return def_; }
-  unsigned Samples() const override { return def_.samples; }
-  unsigned Lines() const override { return def_.lines; }
-  unsigned Bands() const override { return def_.bands; }
-
-  bool PyramidExists() const override;
-  PyramidDef GetPyramidDef() const override;
-  RasterPtr<T> PyramidLevel(unsigned level) override;
-
-  void SetTileDimensions(const lumo::TileDimensions& tiles) override;
-  lumo::TileDimensions TileDimensions() const override;
-  std::uint64_t WriteCount() const override;
-
   bool GetSubRect(const SubRect& rect, const Array<unsigned>& bands, Interleave interleave,
                   Array<T>& pixels, Array<unsigned char>& state) override;
 
  private:
-  bool SetUp();
+  void SetUp();
+  RasterPtr<T> MakeOn(const std::vector<BasicRasterPtr>& levels) const override {
+    return RasterPtr<T>(new CalibratedRaster(levels.front(), constants_));
+  }
   bool IsAllBands(const Array<unsigned>& bands) const;
   std::unique_ptr<CalibrationFormula> MakeFormula(const Array<unsigned>& bands) const;
 
-  const BasicRasterPtr raster_;
   const CalibrationConstants constants_;
-  RasterDef def_;                                             // cleared where the view is not valid
   std::unique_ptr<CalibrationFormula> formula_;               // of all bands
   ScratchPool<std::unique_ptr<detail::NumberBlock>> blocks_;  // memory for what is read
 };

@@ -19,6 +19,8 @@ template <typename E>
 bool SizeBlock(Array<E>& block, Interleave interleave, const SubRect& rect, unsigned bands,
                bool isCleared = true) {
   const ArrayDims dims = BlockDims(interleave, rect.Width(), rect.Height(), bands);
+  // What it held is of no use in a larger one, and would be copied there.
+  if (dims.count > block.GetCapacity() && block.OwnsData()) block = Array<E>();
   if (!block.Resize(dims) || block.GetCount() != dims.count) return false;
   if (isCleared) std::fill_n(block.GetData(), block.GetCount(), E());
   return true;

@@ -25,15 +25,35 @@ std::span<const EnumWord<InvalidPixels>> WordsOf(InvalidPixels) {
 
 /// The blocks in which pixels are copied.
 enum class CopyBlocks : unsigned {
-  kTold = 0,   ///< squares, or lines, of 8 MiB
-  kStream = 1  ///< those of the source's storage
+  kTold = 0,    ///< squares, or lines, of 8 MiB
+  kStream = 1,  ///< those of the source's storage
+  kTarget = 2   ///< those of the target's storage
 };
 
 std::span<const EnumWord<CopyBlocks>> WordsOf(CopyBlocks) {
   static constexpr EnumWord<CopyBlocks> kWords[] = {{"Told", CopyBlocks::kTold},
-                                                    {"Stream", CopyBlocks::kStream}};
+                                                    {"Stream", CopyBlocks::kStream},
+                                                    {"Target", CopyBlocks::kTarget}};
   return kWords;
 }
+
+/// Reads a raster in the blocks and the order in which another one of its size is stored, so that
+/// whole blocks are written there.
+template <typename T>
+class IteratorOfTarget final : public RasterIterator<T> {
+ public:
+  IteratorOfTarget(const RasterPtr<T>& source, const Array<unsigned>& bands,
+                   const BasicRaster& target)
+      : RasterIterator<T>(source, StreamTiles(&target, sizeof(T), kBudget, bands.GetCount()),
+                          bands) {
+    this->order_ = StreamOrder(&target);
+  }
+
+ private:
+  /// Measured with warps: a block stays in the caches from its making to its writing, and is worth
+  /// the reading of what lies around it in the source.
+  static constexpr unsigned kBudget = 0x200000;
+};
 
 /// Puts the values of `fill` where the pixels of a band, which has one, are not valid.
 template <typename T>
@@ -64,7 +84,8 @@ const CommandDeclaration kCopy{
       "takes their place, where a band has one",
       "", &WordsIn<InvalidPixels>},
      {"Blocks", Presence::kOptional, ValueKind::kWord,
-      "Told: squares or lines of 8 MiB; Stream: blocks as the source stores them, which costs less",
+      "Told: squares or lines of 8 MiB; Stream: blocks as the source stores them, which costs "
+      "less; Target: as the target stores them, for sources that are computed",
       "", &WordsIn<CopyBlocks>}},
     {{"ValidPixels", ValueKind::kIntegerArray, "of each band that was copied"}}};
 
@@ -105,8 +126,11 @@ class CopyRasterCommand final : public RasterCommand {
       if (target->HasNoDataValue(band)) fill[band] = target->NoDataValue(band);
     }
     RasterIteratorPtr<T> from;
-    if (HasInput("Blocks") && Read<CopyBlocks>("Blocks") == CopyBlocks::kStream) {
+    const auto blocks = HasInput("Blocks") ? Read<CopyBlocks>("Blocks") : CopyBlocks::kTold;
+    if (blocks == CopyBlocks::kStream) {
       from.Reset(new RasterIteratorStream<T>(source, bands));
+    } else if (blocks == CopyBlocks::kTarget) {
+      from.Reset(new IteratorOfTarget<T>(source, bands, *target));
     } else {
       from.Reset(new RasterIteratorSmart<T>(source, bands));
     }

@@ -1,6 +1,7 @@
 #pragma once
 
 #include <cstddef>
+#include <cstdint>
 
 #include "foundation/sub_rect.h"
 #include "raster/block_strides.h"
@@ -21,6 +22,13 @@ VEXG_EXPORT bool AllHaveState(const unsigned char* states, std::size_t count,
 /// True when some state has one of the bits.
 VEXG_EXPORT bool AnyHasState(const unsigned char* states, std::size_t count, unsigned char bits);
 
+/// Counts the states of valid pixels of each of several bands that lie pixel by pixel.
+/// @param counts  [in,out] one for each band, to which its number is added.
+VEXG_EXPORT void CountValid(const unsigned char* states, std::size_t pixels, std::size_t bands,
+                            std::uint64_t* counts);
+
+/// How many states of valid pixels there are before the first other one.
+VEXG_EXPORT std::size_t CountLeadingValid(const unsigned char* states, std::size_t count);
 /// How many states there are before the first of a valid pixel, and behind the last one; as many as
 /// `count` where none is valid.
 VEXG_EXPORT std::size_t CountLeadingInvalid(const unsigned char* states, std::size_t count);
@@ -30,6 +38,13 @@ VEXG_EXPORT std::size_t CountTrailingInvalid(const unsigned char* states, std::s
 inline bool AllValid(const unsigned char* states, std::size_t count) {
   return !AnyHasState(states, count, PixelValueState::NotValid);
 }
+
+/// Sets bits in the states of the pixels of a line whose byte in a mask is 0, in some bands.
+/// @param strides  of the block; that of its lines doesn't count.
+/// @param states   of the line's first pixel in the first of the bands.
+VEXG_EXPORT void ExcludeMasked(const unsigned char* mask, std::size_t width, std::size_t bands,
+                               const BlockStrides& strides, unsigned char bits,
+                               unsigned char* states);
 
 /// Sets a bit of a state, or clears it.
 inline void SetState(unsigned char& state, PixelValueState::Code bit, bool on) {

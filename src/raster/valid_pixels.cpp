@@ -18,18 +18,20 @@ void ValidPixels::Add(const BasicTile& tile) {
     for (std::uint64_t& band : counts_) band += pixels;
     return;
   }
+  // All bands of a run lie pixel by pixel, or it is of one of them.
   const BlockStrides strides(tile.Order(), tile.Width(), tile.Height(), bands);
-  for (std::size_t band = 0; band < bands; ++band) {
-    std::uint64_t valid = 0;
-    for (std::size_t line = 0; line < tile.Height(); ++line) {
-      const unsigned char* state = states + band * strides.band + line * strides.line;
-      for (unsigned x = 0; x < tile.Width(); ++x, state += strides.pixel) {
-        valid += IsValidState(*state) ? 1 : 0;
-      }
+  const bool isByPixel = strides.band == 1;
+  const bool isWhole = isByPixel || strides.line == tile.Width();
+  const std::size_t runs = isWhole ? 1 : tile.Height();
+  std::vector<std::uint64_t> valid(bands);
+  for (std::size_t band = 0; band < (isByPixel ? 1 : bands); ++band) {
+    for (std::size_t run = 0; run < runs; ++run) {
+      CountValid(states + band * strides.band + run * strides.line, pixels / runs,
+                 isByPixel ? bands : 1, &valid[band]);
     }
-    const std::lock_guard lock(mutex_);
-    counts_[band] += valid;
   }
+  const std::lock_guard lock(mutex_);
+  for (std::size_t band = 0; band < bands; ++band) counts_[band] += valid[band];
 }
 
 Array<std::uint64_t> ValidPixels::Get() const {

@@ -8,7 +8,6 @@
 #include "raster/block_shape.h"
 #include "raster/block_strides.h"
 #include "raster/pixel_value.h"
-#include "raster/raster_details.h"
 #include "tasks/parallel.h"
 #include "tasks/scratch_pool.h"
 #include "views/expression_block.h"
@@ -67,122 +66,37 @@ std::string SizeOf(const BasicRaster& raster) {
          std::to_string(raster.Lines()) + " pixels";
 }
 
-/// Leaves of the details what tells the place, and names the bands.
-void SetDetails(Metadata& metadata, const std::vector<NamedExpression>& expressions) {
-  for (const std::string& name : DetailNames(metadata)) {
-    if (name.starts_with("Bands/") || name.starts_with("Items/")) {
-      metadata.Remove(DetailPath(name));
-    }
-  }
-  for (unsigned band = 0; band < expressions.size(); ++band) {
-    const std::string& name = expressions[band].name;
-    if (!name.empty()) metadata.Set(BandDetailPath(band, "Description"), String(name));
-  }
-}
-
 }  // namespace
 
 template <typename T>
 ExpressionRaster<T>::ExpressionRaster(const std::vector<BasicRasterPtr>& rasters,
                                       const std::vector<NamedExpression>& expressions,
                                       const Metadata* details)
-    : rasters_(rasters), expressions_(expressions) {
-  if (!SetUp(details)) def_.Clear();
+    : DerivedRaster<T>(rasters), expressions_(expressions) {
+  SetUp(details);
 }
 
 template <typename T>
-bool ExpressionRaster<T>::SetUp(const Metadata* details) {
-  if (rasters_.empty() || expressions_.empty()) return false;
-  for (const BasicRasterPtr& raster : rasters_) {
-    if (!raster || !raster->IsValid()) return false;
-    const BasicRasterPtr& first = rasters_.front();
+void ExpressionRaster<T>::SetUp(const Metadata* details) {
+  const std::vector<BasicRasterPtr>& rasters = this->GetRasters();
+  if (rasters.empty() || expressions_.empty()) return;
+  for (const BasicRasterPtr& raster : rasters) {
+    if (!raster || !raster->IsValid()) return;
+    const BasicRasterPtr& first = rasters.front();
     if (raster->Samples() != first->Samples() || raster->Lines() != first->Lines()) {
       SetFault(SizeOf(*first) + " and " + SizeOf(*raster) +
                "; an expression takes rasters of one size");
-      return false;
+      return;
     }
     if (!DispatchType(TenTypes{}, raster->DataType(), []<typename S>() { return true; })) {
       SetFault(NameOf(*raster) + " is complex; an expression takes its parts");
-      return false;
+      return;
     }
   }
-  def_ = rasters_.front()->GetRasterDef();
-  def_.dataType = kDataTypeOf<T>;
-  def_.bands = static_cast<unsigned>(expressions_.size());
-  def_.noData.clear();  // the states carry it
-  if (details != nullptr) {
-    def_.metadata = *details;
-  } else {
-    SetDetails(def_.metadata, expressions_);
-  }
-  return true;
-}
-
-template <typename T>
-bool ExpressionRaster<T>::IsValid() const {
-  return Object::IsValid() && def_.bands != 0 &&
-         std::all_of(rasters_.begin(), rasters_.end(),
-                     [](const auto& raster) { return raster->IsValid(); });
-}
-
-template <typename T>
-bool ExpressionRaster<T>::PyramidExists() const {
-  return def_.bands != 0 && std::all_of(rasters_.begin(), rasters_.end(),
-                                        [](const auto& raster) { return raster->PyramidExists(); });
-}
-
-template <typename T>
-PyramidDef ExpressionRaster<T>::GetPyramidDef() const {
-  if (!PyramidExists()) return {};
-  PyramidDef common = rasters_.front()->GetPyramidDef();
-  for (const BasicRasterPtr& raster : rasters_) {
-    const PyramidDef def = raster->GetPyramidDef();
-    common.levelMin = std::max(common.levelMin, def.levelMin);
-    common.levelMax = std::min(common.levelMax, def.levelMax);
-  }
-  common.levelMin = std::min(common.levelMin, common.levelMax);
-  return common;
-}
-
-template <typename T>
-RasterPtr<T> ExpressionRaster<T>::PyramidLevel(unsigned level) {
-  std::vector<BasicRasterPtr> levels;
-  for (const BasicRasterPtr& raster : rasters_) {
-    BasicRasterPtr reduced;
-    DispatchType(TenTypes{}, raster->DataType(), [&]<typename S>() {
-      reduced = BasicRasterPtr(RasterPtr<S>(raster)->PyramidLevel(level));
-      return true;
-    });
-    if (!reduced) return {};
-    levels.push_back(reduced);
-  }
-  const RasterPtr<T> view(new ExpressionRaster(levels, expressions_));
-  return view->IsValid() ? view : RasterPtr<T>();
-}
-
-template <typename T>
-void ExpressionRaster<T>::SetTileDimensions(const lumo::TileDimensions& tiles) {
-  for (const BasicRasterPtr& raster : rasters_) {
-    if (raster) raster->SetTileDimensions(tiles);
-  }
-}
-
-template <typename T>
-lumo::TileDimensions ExpressionRaster<T>::TileDimensions() const {
-  return def_.bands != 0 ? rasters_.front()->TileDimensions() : lumo::TileDimensions();
-}
-
-template <typename T>
-std::uint64_t ExpressionRaster<T>::WriteCount() const {
-  std::uint64_t writes = 0;  // no sum comes twice, since none of them ever falls
-  for (const BasicRasterPtr& raster : rasters_) {
-    if (!raster) continue;
-    DispatchType(TenTypes{}, raster->DataType(), [&]<typename S>() {
-      writes += RasterPtr<S>(raster)->WriteCount();
-      return true;
-    });
-  }
-  return writes;
+  std::vector<std::string> names;
+  for (const NamedExpression& expression : expressions_) names.push_back(expression.name);
+  this->Describe(names);
+  if (details != nullptr) this->SetDetails(*details);
 }
 
 template <typename T>
@@ -190,15 +104,15 @@ bool ExpressionRaster<T>::GetSubRect(const SubRect& rect, const Array<unsigned>&
                                      Interleave interleave, Array<T>& pixels,
                                      Array<unsigned char>& state) {
   const BlockShape shape(rect, bands, interleave);
-  if (rect.right >= def_.samples || rect.bottom >= def_.lines || !shape.Size(pixels, state)) {
+  if (rect.right >= this->Samples() || rect.bottom >= this->Lines() || !shape.Size(pixels, state)) {
     return false;
   }
   std::vector<const Expression*> wanted;
   for (const unsigned band : shape.bands) {
-    if (band >= def_.bands) return false;
+    if (band >= this->Bands()) return false;
     wanted.push_back(&expressions_[band].expression);
   }
-  ExpressionBlock block(rasters_, std::move(wanted));
+  ExpressionBlock block(this->GetRasters(), std::move(wanted));
   if (!block.Read(rect)) return false;
 
   const BlockStrides strides(interleave, shape.width, shape.height, shape.count);

@@ -2,8 +2,7 @@
 
 #include <vector>
 
-#include "raster/raster_def.h"
-#include "views/computed_raster.h"
+#include "views/derived_raster.h"
 #include "views/expression.h"
 
 namespace lumo {
@@ -15,19 +14,16 @@ namespace lumo {
 /// A pixel whose expression uses one that isn't valid has the states of all of those. One whose
 /// result is NaN or infinite, or does not fit into T, holds no data. A result for integers is
 /// rounded to the nearest one, halves away from 0; ToPixel then decides what fits. A pixel that is
-/// not valid is 0. Place and size are those of the first raster, pixel by pixel; the names of bands
-/// are those of the expressions. Statistics are its own. Levels of a pyramid are computed from
-/// those of the rasters, where all have them. It can't be written. Exists for EightTypes, on
-/// rasters of TenTypes; 64-bit integers are rounded to 53 bits.
+/// not valid is 0. The names of bands are those of the expressions; see DerivedRaster. Exists for
+/// EightTypes, on rasters of TenTypes; 64-bit integers are rounded to 53 bits.
 ///
-/// Ownership: shares the rasters, which do not know the view.
 /// Threads:   every operation may run on many threads at once. A block is computed by all threads.
 /// Failure:   IsValid() is false, with a fault text, when rasters differ in size or are of another
 ///            type; operations then give false, 0 or empty.
 /// Cost:      that of reading the bands which the expressions use, once for each block, and of the
 ///            expressions.
 template <typename T>
-class ExpressionRaster final : public ComputedRaster<T> {
+class ExpressionRaster final : public DerivedRaster<T> {
  public:
   /// @param rasters      that the bands of the expressions are of.
   /// @param expressions  one for each band.
@@ -39,30 +35,16 @@ class ExpressionRaster final : public ComputedRaster<T> {
   ~ExpressionRaster() override { this->StopComputing(); }
 
   URI GetURI() const override { return this->DefaultURI("ExpressionRaster"); }
-  bool IsValid() const override;
-  bool CanWrite() const override { return false; }
-  RasterDef GetRasterDef() const override { return def_; }
-  unsigned Samples() const override { return def_.samples; }
-  unsigned Lines() const override { return def_.lines; }
-  unsigned Bands() const override { return def_.bands; }
-
-  bool PyramidExists() const override;
-  PyramidDef GetPyramidDef() const override;
-  RasterPtr<T> PyramidLevel(unsigned level) override;
-
-  void SetTileDimensions(const lumo::TileDimensions& tiles) override;
-  lumo::TileDimensions TileDimensions() const override;
-  std::uint64_t WriteCount() const override;
-
   bool GetSubRect(const SubRect& rect, const Array<unsigned>& bands, Interleave interleave,
                   Array<T>& pixels, Array<unsigned char>& state) override;
 
  private:
-  bool SetUp(const Metadata* details);
+  void SetUp(const Metadata* details);
+  RasterPtr<T> MakeOn(const std::vector<BasicRasterPtr>& levels) const override {
+    return RasterPtr<T>(new ExpressionRaster(levels, expressions_));
+  }
 
-  std::vector<BasicRasterPtr> rasters_;
   std::vector<NamedExpression> expressions_;
-  RasterDef def_;  // cleared where the view is not valid
 };
 
 VEXG_EXTERN(EIGHT, ExpressionRaster);

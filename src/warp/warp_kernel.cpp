@@ -60,9 +60,11 @@ double WeightAt(WarpKernel kernel, double x) {
                                         : WeightAt<WarpKernel::kLanczos>(x);
 }
 
-/// The part of a pixel between two places; 0 for next to nothing.
+/// The part of a pixel between two places; 0 for next to nothing. Functions of the library that are
+/// not compiled for this set of instructions, as std::min is not, stay calls and end vector code.
 [[gnu::always_inline]] inline double Covered(double at, double from, double end, double nothing) {
-  const double part = std::min(end, at + 1.0) - std::max(from, at);
+  const double right = at + 1.0 < end ? at + 1.0 : end, left = from < at ? at : from;
+  const double part = right - left;
   return part > nothing ? part : 0.0;
 }
 
@@ -126,7 +128,7 @@ template <WarpKernel kKernel>
   for (unsigned k = 0; k < weights.taps; ++k) {
     for (unsigned i = 0; i < count; ++i) {
       const double centre = weights.first[i] + static_cast<std::int32_t>(k) + 0.5;
-      weights.of[k][i] = WeightAt<kKernel>(std::abs(centre - positions[i]) / stretch);
+      weights.of[k][i] = WeightAt<kKernel>(std::fabs(centre - positions[i]) / stretch);
     }
   }
   Share(count, weights);

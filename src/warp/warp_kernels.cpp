@@ -61,13 +61,52 @@ template <typename T>
 
 using FourDoubles [[gnu::vector_size(32)]] = double;
 
+/// Reads four values in a row. The compiler converts small whole numbers one by one, but widens
+/// them by moving bytes: to the lower end of four integers, or to the upper one, where a shift
+/// takes the sign along.
+template <typename T>
+[[gnu::always_inline]] inline void ReadFour(const T* at, FourDoubles& read) {
+  if constexpr (std::is_integral_v<T> && sizeof(T) < 4) {
+    using Bytes [[gnu::vector_size(16)]] = unsigned char;
+    using Four [[gnu::vector_size(16)]] = std::int32_t;
+    using Word = std::conditional_t<sizeof(T) == 1, std::int32_t, std::int64_t>;
+    using Words [[gnu::vector_size(16)]] = Word;
+    Word word;
+    std::memcpy(&word, at, sizeof word);
+    const Words words{word};
+    const Bytes bytes = reinterpret_cast<Bytes>(words);
+    constexpr bool kIsSigned = std::is_signed_v<T>;
+    Bytes wide;  // place 15 holds a 0
+    if constexpr (sizeof(T) == 1 && !kIsSigned) {
+      wide = __builtin_shufflevector(bytes, bytes, 0, 15, 15, 15, 1, 15, 15, 15, 2, 15, 15, 15, 3,
+                                     15, 15, 15);
+    } else if constexpr (sizeof(T) == 1) {
+      wide = __builtin_shufflevector(bytes, bytes, 15, 15, 15, 0, 15, 15, 15, 1, 15, 15, 15, 2, 15,
+                                     15, 15, 3);
+    } else if constexpr (!kIsSigned) {
+      wide = __builtin_shufflevector(bytes, bytes, 0, 1, 15, 15, 2, 3, 15, 15, 4, 5, 15, 15, 6, 7,
+                                     15, 15);
+    } else {
+      wide = __builtin_shufflevector(bytes, bytes, 15, 15, 0, 1, 15, 15, 2, 3, 15, 15, 4, 5, 15, 15,
+                                     6, 7);
+    }
+    Four values = reinterpret_cast<Four>(wide);
+    if constexpr (kIsSigned) values >>= 8 * static_cast<int>(4 - sizeof(T));
+    read = __builtin_convertvector(values, FourDoubles);
+  } else {
+    using Four [[gnu::vector_size(4 * sizeof(T))]] = T;
+    Four values;
+    std::memcpy(&values, at, sizeof values);
+    read = __builtin_convertvector(values, FourDoubles);
+  }
+}
+
 /// Adds four values in a row, each times a weight.
 template <typename T>
 [[gnu::always_inline]] inline void AddFour(double weight, const T* at, FourDoubles& sums) {
-  using Four [[gnu::vector_size(4 * sizeof(T))]] = T;
-  Four values;
-  std::memcpy(&values, at, sizeof values);
-  sums += weight * __builtin_convertvector(values, FourDoubles);
+  FourDoubles values;
+  ReadFour(at, values);
+  sums += weight * values;
 }
 
 /// Sums of four bands, or eight.

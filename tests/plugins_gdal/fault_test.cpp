@@ -60,8 +60,9 @@ RasterDef BytesDef(const char* format) {
 }
 
 Block<std::uint8_t> NoiseFor(const RasterDef& def) {
-  Block<std::uint8_t> block{{0, 0, def.samples - 1, def.lines - 1}, {0}, {}, {}};
-  block.pixels.resize(std::size_t{def.samples} * def.lines);
+  Block<std::uint8_t> block{{0, 0, def.samples - 1, def.lines - 1}, {}, {}, {}};
+  for (unsigned band = 0; band < def.bands; ++band) block.bands.push_back(band);
+  block.pixels.resize(std::size_t{def.samples} * def.lines * def.bands);
   unsigned seed = 1;
   for (auto& pixel : block.pixels) {
     seed = seed * 1664525 + 1013904223;
@@ -251,45 +252,74 @@ TEST(GdalFaults, ANewFileTakesThePlaceOfTheOlderOneWithAllThatBelongsToIt) {
   EXPECT_TRUE(ReadsWhole(OpenSource({path})));
 }
 
-/// Wherever the disk is full while a TIFF file's directories, its pixels or the file beside it are
-/// written, the run comes to its end, with the whole file or with the older one.
+/// A raster of several TIFF blocks in one of the forms that files have, some of whose pixels are
+/// excluded by a mask.
+RasterDef MaskedDef(BlockCompression compression, FileLayout layout) {
+  RasterDef def = BytesDef("TIFF");
+  def.samples = def.lines = 130;
+  def.bands = 3;
+  def.interleave = Interleave::BIP;
+  def.tileWidth = def.tileHeight = 16;
+  def.creation.compression = compression;
+  def.creation.layout = layout;
+  def.creation.tile = 16;
+  return def;
+}
+
+/// A raster with long texts, so that the directory takes several writes.
+RasterDef WordyDef() {
+  RasterDef def = BytesDef("TIFF");
+  def.samples = def.lines = 20;
+  def.bands = 60;
+  for (unsigned band = 0; band < def.bands; ++band) {
+    def.metadata.Set(BandDetailPath(band, "Description"), String(std::string(30, 'x')));
+  }
+  return def;
+}
+
+/// Wherever the disk is full while a TIFF file's directories, its blocks, its levels, its mask or
+/// the file beside it are written, the run comes to its end, with the whole file or with the older
+/// one.
 TEST(GdalFaults, ATiffFileIsGivenUpAfterItsFirstFailedWrite) {
   test::TemporaryDirectory directory;
   const std::string path = (directory.Path() / "a.tif").string();
-  PutContents(path, "older");
-  RasterDef def = BytesDef("TIFF");
-  def.samples = def.lines = 20;
-  for (unsigned band = 0; band < 60; ++band) {
-    def.metadata.Set(BandDetailPath(band, "Description"), String(std::string(30, 'x')));
-  }
-  def.bands = 60;
-  Block<std::uint8_t> block{{0, 0, 19, 19}, {}, std::vector<std::uint8_t>(60 * 400, 7), {}};
-  block.state.resize(block.pixels.size());
-  for (unsigned band = 0; band < 60; ++band) block.bands.push_back(band);
-  unsigned failed = 0;
-  for (rlim_t bytes = 0;; bytes += 700) {
-    SCOPED_TRACE(bytes);
-    std::string fault;
-    bool isMade = false;
-    {
-      const test::FileSizeLimit limit(bytes);
-      TakeFault();
-      auto made = CreateSource({path}, def);
-      isMade = made && block.Write(*ReaderOf<std::uint8_t>(made));
-      fault = TakeFault().ToUTF8();
-      const std::string late = made ? Release(made) : "";
-      isMade = isMade && late.empty();
-      if (fault.empty()) fault = late;
+  const RasterDef defs[] = {WordyDef(), MaskedDef(BlockCompression::kNone, FileLayout::kTold),
+                            MaskedDef(BlockCompression::kZstd, FileLayout::kTold),
+                            MaskedDef(BlockCompression::kDeflate, FileLayout::kCog)};
+  for (const RasterDef& def : defs) {
+    SCOPED_TRACE(testing::Message() << "form " << &def - defs);
+    PutContents(path, "older");
+    Block<std::uint8_t> block = NoiseFor(def);
+    if (&def != defs) {
+      for (std::size_t i = 0; i < block.state.size(); i += 3 * 7) {
+        std::fill_n(&block.state[i], 3, static_cast<unsigned char>(PixelValueState::Masked));
+      }
     }
-    if (isMade) break;
-    ++failed;
-    EXPECT_EQ(fault, path + ": File too large");
-    ASSERT_EQ(Contents(path), "older");
-    ASSERT_EQ(NamesIn(directory.Path()), std::vector<std::string>{"a.tif"});
-    ASSERT_LT(bytes, 1U << 20);
+    unsigned failed = 0;
+    for (rlim_t bytes = 0;; bytes += 700) {
+      SCOPED_TRACE(bytes);
+      std::string fault;
+      bool isMade = false;
+      {
+        const test::FileSizeLimit limit(bytes);
+        TakeFault();
+        auto made = CreateSource({path}, def);
+        isMade = made && block.Write(*ReaderOf<std::uint8_t>(made));
+        fault = TakeFault().ToUTF8();
+        const std::string late = made ? Release(made) : "";
+        isMade = isMade && late.empty();
+        if (fault.empty()) fault = late;
+      }
+      if (isMade) break;
+      ++failed;
+      EXPECT_EQ(fault, path + ": File too large");
+      ASSERT_EQ(Contents(path), "older");
+      ASSERT_EQ(NamesIn(directory.Path()), std::vector<std::string>{"a.tif"});
+      ASSERT_LT(bytes, 1U << 20);
+    }
+    EXPECT_GT(failed, 10U);
+    EXPECT_TRUE(ReadsWhole(OpenSource({path})));
   }
-  EXPECT_GT(failed, 10U);
-  EXPECT_TRUE(ReadsWhole(OpenSource({path})));
 }
 
 /// Two that make a file at one place at once: the first to be whole stays, the other says so.

@@ -55,6 +55,36 @@ TEST(OwnTiff, IsReadAsGdalReadsIt) {
   EXPECT_GT(number, 100);
 }
 
+/// Masks in strips and tiles, of levels and of cloud-optimised files, beside no-data values.
+TEST(OwnTiff, MasksExcludeWhatTheyDoForGdal) {
+  const test::TemporaryDirectory directory;
+  const auto path = [&](const std::string& name) { return (directory.Path() / name).string(); };
+  int number = 0;
+  for (const std::vector<std::string>& block :
+       {std::vector<std::string>{"TILED=YES", "BLOCKXSIZE=64", "BLOCKYSIZE=32"},
+        {"TILED=YES", "BLOCKXSIZE=16", "BLOCKYSIZE=16", "COMPRESS=DEFLATE"},
+        {"BLOCKYSIZE=7", "COMPRESS=ZSTD"},
+        {"BLOCKYSIZE=149", "COMPRESS=LZW", "INTERLEAVE=BAND"}}) {
+    for (const GDALDataType type : {GDT_Byte, GDT_Float32}) {
+      Layout layout{type, block};
+      layout.options.emplace_back("PHOTOMETRIC=MINISBLACK");
+      layout.hasMask = true;
+      layout.hasLevels = number % 2 == 0;
+      layout.noData = number % 3 == 0 ? "7" : nullptr;
+      const std::string plain = path("m" + std::to_string(number) + "x.tif");
+      Make(plain, layout, number);
+      EXPECT_TRUE(ExpectSame(plain)) << "GDAL had to read it";
+      const std::string cog = path("c" + std::to_string(number++) + "x.tif");
+      const char* const options[] = {"BLOCKSIZE=128", "COMPRESS=DEFLATE", nullptr};
+      GDALDatasetH const source = GDALOpen(plain.c_str(), GA_ReadOnly);
+      GDALClose(GDALCreateCopy(GDALGetDriverByName("COG"), cog.c_str(), source, FALSE,
+                               const_cast<char**>(options), nullptr, nullptr));
+      GDALClose(source);
+      EXPECT_TRUE(ExpectSame(cog)) << "GDAL had to read it";
+    }
+  }
+}
+
 /// JPEG in its forms; the bands of each are grey, or colours that may be stored as such or not.
 TEST(OwnTiff, JpegIsDecodedAsByGdal) {
   const test::TemporaryDirectory directory;

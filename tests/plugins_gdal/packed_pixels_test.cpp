@@ -173,6 +173,58 @@ TEST(PackedPixels, AreWhatWasWrittenWithAnyOptions) {
   }
 }
 
+/// Writes noise of which some runs of pixels aren't valid, in one band or in all.
+/// @return a byte for each pixel, 255 where it is valid.
+template <typename T>
+std::vector<double> WriteWithHoles(const RasterDataConnectionPtr& made, const RasterDef& def,
+                                   std::mt19937& random) {
+  std::vector<double> valid(std::size_t{def.samples} * def.lines, 255);
+  test::Block<T> block{{0, 0, def.samples - 1, def.lines - 1}, {}, {}, {}};
+  for (unsigned band = 0; band < def.bands; ++band) block.bands.push_back(band);
+  block.pixels.resize(valid.size() * def.bands);
+  for (T& pixel : block.pixels) pixel = static_cast<T>(random() % 100);  // no-data is 101
+  block.state.resize(block.pixels.size());
+  const unsigned onlyBand = random() % 2 == 0 ? random() % def.bands : def.bands;
+  std::size_t at = 0;
+  std::vector<bool> holes(valid.size());
+  for (std::size_t i = 1; i < holes.size(); ++i) holes[i] = holes[i - 1] != (random() % 20 == 0);
+  test::VisitBlock(test::ReaderOf<T>(made)->RasterDef().interleave, block.rect, block.bands,
+                   [&](unsigned x, unsigned y, unsigned band) {
+                     const std::size_t pixel = std::size_t{y} * def.samples + x;
+                     const bool isHole =
+                         holes[pixel] && (onlyBand == def.bands || onlyBand == band);
+                     block.state[at++] = isHole ? PixelValueState::Masked : 0;
+                     if (isHole) valid[pixel] = 0;
+                   });
+  EXPECT_TRUE(block.Write(*test::ReaderOf<T>(made))) << TakeFault().ToUTF8();
+  return valid;
+}
+
+TEST(PackedPixels, TheMaskSaysWhatWasNotValidWithAnyOptions) {
+  const test::TemporaryDirectory directory;
+  for (unsigned seed = 0; seed < 60; ++seed) {
+    std::mt19937 random(seed);
+    RasterDef def = RandomDef(random);
+    if (seed % 4 == 0) def.creation.compression = BlockCompression::kNone;
+    const bool isPlain = def.creation.compression == BlockCompression::kNone;
+    if (isPlain) def.creation = {}, def.tileWidth = def.tileHeight = 16 * (1 + random() % 4);
+    const std::string path = (directory.Path() / ("m" + std::to_string(seed) + ".tif")).string();
+    SCOPED_TRACE(path);
+    DispatchType(EightTypes{}, def.dataType, [&]<typename T>() {
+      auto made = test::CreateSource({path}, def);
+      EXPECT_TRUE(made) << TakeFault().ToUTF8();
+      if (!made) return false;
+      const std::vector<double> valid = WriteWithHoles<T>(made, def, random);
+      EXPECT_EQ(test::Release(made), "");
+      const Peer peer(path);
+      const auto mask = Peer::Pixels(GDALGetMaskBand(peer.Band(0)));
+      EXPECT_TRUE(std::equal(mask.begin(), mask.end(), valid.begin(), valid.end(),
+                             [](const auto& a, double b) { return a.real() == b; }));
+      return true;
+    });
+  }
+}
+
 TEST(PackedPixels, OptionsThatDontFitAreRefusedBeforeAnythingIsMade) {
   const struct {
     const char* name;

@@ -1,6 +1,7 @@
 #pragma once
 
 #include <cmath>
+#include <cpl_conv.h>
 #include <cpl_string.h>
 #include <filesystem>
 #include <functional>
@@ -198,7 +199,21 @@ struct Layout {
   const char* noData = nullptr;
   bool hasLevels = false;
   std::function<void(GDALDatasetH)> changeNew = nullptr;  // before the first pixel is written
+  bool hasMask = false;
 };
+
+/// Excludes some runs of pixels of a new file by a mask inside.
+inline void AddMask(GDALDatasetH file, std::mt19937& random) {
+  const CPLConfigOptionSetter inside("GDAL_TIFF_INTERNAL_MASK", "YES", false);
+  ASSERT_EQ(GDALCreateDatasetMaskBand(file, GMF_PER_DATASET), CE_None);
+  const int width = GDALGetRasterXSize(file), height = GDALGetRasterYSize(file);
+  std::vector<unsigned char> mask(static_cast<std::size_t>(width) * height);
+  unsigned char last = 0;
+  for (unsigned char& value : mask) value = last = random() % 16 == 0 ? 255 - last : last;
+  ASSERT_EQ(GDALRasterIO(GDALGetMaskBand(GDALGetRasterBand(file, 1)), GF_Write, 0, 0, width, height,
+                         mask.data(), width, height, GDT_Byte, 0, 0),
+            CE_None);
+}
 
 inline void Make(const std::string& path, const Layout& layout, int seed) {
   GDALAllRegister();
@@ -233,6 +248,7 @@ inline void Make(const std::string& path, const Layout& layout, int seed) {
                            GDT_Float64, 0, 0),
               CE_None);
   }
+  if (layout.hasMask) AddMask(file, random);
   if (layout.hasLevels) {
     int factors[] = {2, 4, 8};
     ASSERT_EQ(GDALBuildOverviews(file, "NEAREST", 3, factors, 0, nullptr, nullptr, nullptr),

@@ -20,7 +20,7 @@ TEST(CopyRasterCommand, CopiesTheSameInAllBlocks) {
   for (std::uint16_t& pixel : source->pixels) pixel = static_cast<std::uint16_t>(random());
   for (unsigned char& state : source->states) state = random() % 40 == 0 ? 2 : 0;
   catalog::Add(source);
-  for (const char* blocks : {"Told", "Stream"}) {
+  for (const char* blocks : {"Told", "Stream", "Target"}) {
     SCOPED_TRACE(blocks);
     const Pointer<MemoryTestRaster<std::uint16_t>> target(
         new MemoryTestRaster<std::uint16_t>(kWidth, kHeight, 2));

@@ -176,6 +176,48 @@ TEST(WarpKernel, MakesPixelsByItsDefinition) {
   }
 }
 
+/// Half a pixel on, a linear kernel gives the mean of four pixels.
+template <typename T>
+void ExpectMeansOfFour(unsigned bands) {
+  SCOPED_TRACE(testing::Message() << "type " << kDataTypeOf<T> << ", bands " << bands);
+  constexpr unsigned kSide = 9;
+  std::mt19937_64 random(bands);
+  const auto made =
+      MakePlaced<T>(MakeGrid(0, 0, 10, kSide, kSide, "EPSG:32633"), bands, [&](auto...) -> T {
+        if constexpr (std::is_floating_point_v<T>) return static_cast<T>(random() % 4096) / 8 - 99;
+        const T ends[] = {std::numeric_limits<T>::min(), std::numeric_limits<T>::max()};
+        return random() % 4 == 0 ? ends[random() % 2] : static_cast<T>(random());
+      });
+  ProjectedRaster<T> view(RasterPtr<T>(made),
+                          MakeGrid(5, -5, 10, kSide - 1, kSide - 1, "EPSG:32633"),
+                          ReprojectionMethod::kPolynomial, PyramidResamplingMethod::kNearest,
+                          {ProjectedGrid::kExact, {}, {}, WarpKernel::kLinear});
+  Array<unsigned> all{ArrayDims(bands)};
+  for (unsigned band = 0; band < bands; ++band) all[band] = band;
+  Array<T> pixels;
+  Array<unsigned char> state;
+  ASSERT_TRUE(view.GetSubRect({0, 0, kSide - 2, kSide - 2}, all, Interleave::BIP, pixels, state));
+  std::size_t at = 0;
+  for (unsigned y = 0; y + 1 < kSide; ++y) {
+    for (unsigned x = 0; x + 1 < kSide; ++x) {
+      for (unsigned band = 0; band < bands; ++band) {
+        double sum = 0;
+        for (const unsigned i : {0U, 1U, 2U, 3U}) {
+          sum += static_cast<double>(made->pixels[made->At(x + i % 2, y + i / 2, band)]);
+        }
+        const double mean = std::is_integral_v<T> ? std::floor(sum / 4 + 0.5) : sum / 4;
+        ASSERT_EQ(static_cast<double>(pixels[at++]), mean) << x << " " << y << " " << band;
+      }
+    }
+  }
+}
+
+TEST(WarpKernel, MeansOfFourAreRightInTheWholeRangeOfEveryType) {
+  for (const unsigned bands : {1U, 3U, 7U, 9U}) {
+    [bands]<typename... Ts>(TypeList<Ts...>) { (ExpectMeansOfFour<Ts>(bands), ...); }(EightTypes{});
+  }
+}
+
 TEST(WarpKernel, ReadsRastersOfOneColumnInEveryOrder) {
   // Bands lie next to one another there whatever the order is called.
   for (const unsigned lines : {1U, 9U}) {

@@ -44,7 +44,7 @@ void RasterVerb::AddMaking(JobDraft& draft, const Making& making) const {
   copy.AddVariableInput("SrcURI", making.shown);
   copy.AddVariableInput("DstURI", "$target");
   copy.AddInput("Invalid", String(FillsNoData(making.noData) ? "NoData" : "Told"));
-  if (CopiesBlocksOfSource()) copy.AddInput("Blocks", String("Stream"));
+  copy.AddInput("Blocks", String(CopiesBlocksOfSource() ? "Stream" : "Target"));
 }
 
 RasterContents RasterVerb::ReadWanted(const JobResults& results) const {

@@ -64,7 +64,7 @@ class RasterVerb : public FileVerb {
   virtual void AddMaking(JobDraft& draft, const Making& making) const;
   /// Whether a copy has the no-data value of the file in the place of pixels that are not valid.
   virtual bool FillsNoData(const FillValues& noData) const { return !noData.empty(); }
-  /// Whether a copy goes through the blocks of the source's storage, and not through large squares.
+  /// Whether a copy goes through the blocks of the source's storage, and not of the file's.
   virtual bool CopiesBlocksOfSource() const { return true; }
   /// Whether pixels that are not valid may get a no-data value where the format has nothing else.
   virtual bool MayChooseNoData() const { return true; }

@@ -234,7 +234,7 @@ class WarpVerb final : public RasterVerb {
     return noData_.has_value() || RasterVerb::FillsNoData(noData);
   }
 
-  /// Squares cover least of a source that lies turned in the grid.
+  /// A source that lies turned in the grid has no blocks that suit it.
   bool CopiesBlocksOfSource() const override { return false; }
 
   std::string to_;
