@@ -24,6 +24,29 @@ DatasetPtr OpenRows(const RowsFile& file) {
   return dataset;
 }
 
+/// True when the files are those of the lines of a dataset. They hold pixels of its type, as many
+/// in a line and as many bands.
+bool FitsRows(const RowsFiles& rows, GDALDatasetH dataset) {
+  const Messages messages;
+  const auto typeOf = [](GDALDatasetH of) {
+    return GDALGetRasterDataType(GDALGetRasterBand(of, 1));
+  };
+  std::uint64_t lines = 0;
+  for (const RowsFile& file : rows.files) {
+    const DatasetPtr part = OpenRows(file);
+    if (part == nullptr) return false;
+    if (GDALGetRasterXSize(part.get()) != GDALGetRasterXSize(dataset) ||
+        GDALGetRasterCount(part.get()) != GDALGetRasterCount(dataset) ||
+        typeOf(part.get()) != typeOf(dataset) ||
+        static_cast<unsigned>(GDALGetRasterYSize(part.get())) != file.lines) {
+      return messages.Fail(file.file.ToUTF8(), "doesn't hold lines of the raster");
+    }
+    lines += file.lines;
+  }
+  return lines == static_cast<std::uint64_t>(GDALGetRasterYSize(dataset)) ||
+         messages.Fail(GDALGetDescription(dataset), "has other lines than the files");
+}
+
 bool HasMask(GDALDatasetH dataset) {
   const int flags = GDALGetMaskFlags(GDALGetRasterBand(dataset, 1));
   return (flags & GMF_PER_DATASET) != 0 && (flags & GMF_ALPHA) == 0;
@@ -97,7 +120,7 @@ bool TakeRowsMasks(const RowsFiles& rows, unsigned samples, NewMask& mask) {
 bool AddRowsToVrt(const RowsFiles& rows, GDALDatasetH dataset) {
   const Messages messages;
   bool hasMask = false;
-  if (!FindRowsMask(rows, hasMask)) return false;
+  if (!FitsRows(rows, dataset) || !FindRowsMask(rows, hasMask)) return false;
   const int samples = GDALGetRasterXSize(dataset), bands = GDALGetRasterCount(dataset);
   if (hasMask && GDALCreateDatasetMaskBand(dataset, GMF_PER_DATASET) != CE_None) {
     return messages.Fail(GDALGetDescription(dataset), "no mask can be made");
