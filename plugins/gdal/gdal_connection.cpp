@@ -32,6 +32,7 @@ bool Connection::CreateRaster(const Array<String>& connStrings, const lumo::Rast
   made.noData = raster_->KeptNoData();
   made.SetGeoRef(def.geoRef);
   made.metadata = def.metadata;
+  if (raster_->HasRows()) made.creation.rows = def.creation.rows;
   return MakeReader(ConnStrings({String(format_.key), String(source.name)}), source, made);
 }
 

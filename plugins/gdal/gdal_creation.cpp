@@ -13,6 +13,7 @@
 #include "gdal_details.h"
 #include "gdal_georef.h"
 #include "gdal_no_data.h"
+#include "gdal_rows.h"
 #include "gdal_side_file.h"
 #include "gdal_tiff_options.h"
 #include "gdal_types.h"
@@ -22,6 +23,7 @@
 #include "platform/folder_lock.h"
 #include "platform/random_access_file.h"
 #include "platform/temporary_file.h"
+#include "raster/copy_blocks.h"
 #include "tiff_writer/packed_pixels.h"
 #include "tiff_writer/plain_pixels.h"
 
@@ -45,6 +47,7 @@ struct Maker {
 constexpr Maker kMakers[] = {
     {"GTiff", false, "SPARSE_OK=TRUE"},
     {"HFA", false, ""},
+    {"VRT", false, ""},  // on files that hold the lines
     {"BMP", true, ""},
     {"NITF", true, "", true},  // corners to the metre or the second
     {"PNG", true, ""},
@@ -203,7 +206,7 @@ std::unique_ptr<NewRaster> NewRaster::Begin(const Format& format, const std::str
                                             const RasterDef& def, DatasetPtr& dataset) {
   const std::string& driver = format.drivers.front();
   std::unique_ptr<NewRaster> made(new NewRaster(driver, path, def));
-  if (FindMaker(driver) == nullptr) {
+  if (FindMaker(driver) == nullptr || (driver == "VRT" && def.creation.rows == nullptr)) {
     made->Fail("rasters of the format " + format.key + " are only read");
     return nullptr;
   }
@@ -305,6 +308,10 @@ DatasetPtr NewRaster::MakeDirectly() {
     Fail(messages.Text());
     return nullptr;
   }
+  if (driver_ == "VRT") {
+    hasRows_ = AddRowsToVrt(*def_.creation.rows, dataset.get()) || ShowFault();
+    return hasRows_ ? std::move(dataset) : nullptr;
+  }
   return driver_ == "GTiff" ? BeginPixels(std::move(dataset)) : std::move(dataset);
 }
 
@@ -357,8 +364,33 @@ bool NewRaster::BeginPacked(const tiff::BlockLayout& layout) {
   raster.getExcluded = [this](const BlockPlace& place, std::vector<unsigned char>& excluded) {
     return mask_.Read(place, excluded);
   };
-  pixels_ = tiff::PackedPixels::Begin(std::move(raster));
-  return pixels_ != nullptr;
+  std::unique_ptr<tiff::PackedPixels> packed = tiff::PackedPixels::Begin(std::move(raster));
+  if (packed == nullptr) return false;
+  if (def_.creation.rows != nullptr && !TakeRows(*packed)) return false;
+  pixels_ = std::move(packed);
+  return true;
+}
+
+/// Takes packed blocks out of files where they are packed alike. Levels are not made of what masks
+/// hide, and a mask in a file has more than a block that is written would bring: a file with levels
+/// has its pixels written then.
+bool NewRaster::TakeRows(tiff::PackedPixels& packed) {
+  RowsFiles rows = *def_.creation.rows;
+  if (rows.walksAsTarget) {
+    const TileDimensions blocks = StreamTiles(
+        def_, GDALGetDataTypeSizeBytes(PixelTypeOf(def_.dataType).type), kTargetBudget, def_.bands);
+    rows.walkWidth = blocks.width;
+    rows.walkHeight = blocks.height;
+  }
+  bool hasMask = false;
+  if (def_.creation.LosesValues() || !FindRowsMask(rows, hasMask)) {
+    TakeFault();
+    return true;
+  }
+  const bool hasLevels = def_.creation.layout == FileLayout::kCog;
+  if (hasMask && hasLevels) return true;
+  return packed.TakeRows(rows, hasRows_) &&
+         (!hasRows_ || !hasMask || TakeRowsMasks(rows, def_.samples, mask_));
 }
 
 DatasetPtr NewRaster::MakeForCopy() {
@@ -409,7 +441,11 @@ bool NewRaster::Finish(DatasetPtr dataset) {
     pixels_.reset();
     if (isPacked_) Remove(scratch_);
   }
-  return WriteBeside() && WriteMask() && IsWhole() && TakePlace();
+  return WriteBeside() && WriteMask() && IsWhole() && NameRows() && TakePlace();
+}
+
+bool NewRaster::NameRows() const {
+  return driver_ != "VRT" || NameRowsOfVrt(*def_.creation.rows, temporary_) || ShowFault();
 }
 
 DatasetPtr NewRaster::CopyTo(const std::string& name, GDALDatasetH dataset) const {
@@ -432,7 +468,8 @@ bool NewRaster::CopyToFormat(DatasetPtr dataset) {
 /// Writes the values that the format has no room for into a file beside the raster.
 bool NewRaster::WriteBeside() const {
   const Messages messages;
-  const bool isSet = CompleteBeside(temporary_, driver_, def_, histograms_);
+  // A VRT file has room for all of them.
+  const bool isSet = driver_ == "VRT" || CompleteBeside(temporary_, driver_, def_, histograms_);
   if (!isSet || messages.HasError()) return Fail(messages.Text());
   std::string why;
   if (!def_.creation.worldFile ||

@@ -11,7 +11,7 @@
 #include "platform/file_identity.h"
 #include "platform/file_swap.h"
 #include "raster/raster_def.h"
-#include "tiff_writer/new_pixels.h"
+#include "tiff_writer/packed_pixels.h"
 
 namespace lumo::gdal {
 
@@ -25,7 +25,8 @@ namespace lumo::gdal {
 ///
 /// The pixels of a TIFF file are written past GDAL (plugins/tiff_writer). Of one whose blocks are
 /// packed, or in an order of its own, GDAL makes a file without pixels beside the place, whose tags
-/// the file gets.
+/// the file gets. Packed blocks may come out of files that hold the lines of the raster; a VRT file
+/// is made on such files alone.
 class NewRaster {
  public:
   /// Whether the format can hold such a raster is found out here.
@@ -50,6 +51,9 @@ class NewRaster {
   /// True when the last band will mark which pixels of the others are valid.
   bool KeepsAlpha() const { return keepsAlpha_; }
 
+  /// True when the raster has its pixels from the files of CreationOptions::rows.
+  bool HasRows() const { return hasRows_; }
+
   /// True when what GDAL has open is not the file with the pixels.
   bool IsDescribedBeside() const { return isPacked_ && pixels_ != nullptr; }
 
@@ -70,6 +74,8 @@ class NewRaster {
   DatasetPtr MakeDirectly();
   DatasetPtr BeginPixels(DatasetPtr dataset);
   bool BeginPacked(const tiff::BlockLayout& layout);
+  bool TakeRows(tiff::PackedPixels& packed);
+  bool NameRows() const;
   DatasetPtr MakeForCopy();
   bool Describe(GDALDatasetH dataset) const;
   bool CopyToFormat(DatasetPtr dataset);
@@ -98,6 +104,7 @@ class NewRaster {
   /// The part that the format is given to keep; the rest goes beside the file.
   enum class Given { kNothing, kBands, kAll } given_ = Given::kAll;
   bool keepsAlpha_ = false;
+  bool hasRows_ = false;
   bool isDoomed_ = false;
 };
 

@@ -379,6 +379,10 @@ std::map<unsigned, double> OpenRaster::KeptNoData() const {
   return newRaster_ != nullptr ? newRaster_->Definition().noData : std::map<unsigned, double>();
 }
 
+bool OpenRaster::HasRows() const {
+  return newRaster_ != nullptr && newRaster_->HasRows();
+}
+
 bool OpenRaster::KeepsAlpha() const {
   return newRaster_ != nullptr && newRaster_->KeepsAlpha();
 }

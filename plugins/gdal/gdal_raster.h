@@ -52,6 +52,8 @@ class OpenRaster {
   bool IsNew() const { return newRaster_ != nullptr; }
   /// The no-data values that a new raster keeps.
   std::map<unsigned, double> KeptNoData() const;
+  /// True for a new raster that has its pixels out of files already.
+  bool HasRows() const;
   /// True for a new raster whose last band will be alpha.
   bool KeepsAlpha() const;
   lumo::Interleave Interleave() const { return interleave_; }

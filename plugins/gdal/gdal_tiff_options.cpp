@@ -4,19 +4,9 @@
 #include <string>
 
 #include "raster/pixel_types.h"
+#include "raster/strip_lines.h"
 
 namespace lumo::gdal {
-namespace {
-
-/// The lines of strips that are large enough to be packed well.
-std::string StripLines(const RasterDef& def, bool byPixel) {
-  constexpr double kStripBytes = 256 << 10;
-  const double row = BytesOf(def) / def.lines / (byPixel ? 1 : def.bands);
-  return std::to_string(std::clamp(static_cast<unsigned>(kStripBytes / row), 1U, def.lines));
-}
-
-}  // namespace
-
 double BytesOf(const RasterDef& def) {
   return 1.0 * def.samples * def.lines * def.bands * DataTypeBytes(def.dataType);
 }
@@ -43,7 +33,10 @@ void AddLayout(const RasterDef& def, CPLStringList& options) {
   const bool byPixel = def.interleave == Interleave::BIP || def.interleave == Interleave::BIL;
   options.SetNameValue("INTERLEAVE", byPixel ? "PIXEL" : "BAND");
   if (def.tileWidth <= 1 || def.tileHeight <= 1) {
-    if (IsPacked(def)) options.SetNameValue("BLOCKYSIZE", StripLines(def, byPixel).c_str());
+    const std::uint64_t row =
+        std::uint64_t{def.samples} * (byPixel ? def.bands : 1) * DataTypeBytes(def.dataType);
+    if (IsPacked(def))
+      options.SetNameValue("BLOCKYSIZE", std::to_string(StripLines(def.lines, row)).c_str());
     return;
   }
   static constexpr unsigned kStep = 16, kMaxTile = 4096;  // sides are multiples of 16

@@ -61,9 +61,10 @@ bool IsFilled(const std::vector<unsigned char>& pixels, const std::vector<unsign
 struct PackedPixels::Work {
   unsigned level;
   std::uint64_t block;
-  OpenBlock* open;
+  OpenBlock* open = nullptr;
   unsigned width = 0, height = 0;  ///< inside the raster
   bool isFill = false;
+  bool isTaken = false;  ///< packed by somebody else
   std::vector<unsigned char> packed, packedMask;
   std::vector<unsigned char> reduced, reducedExcluded;  ///< of the level above
   std::string why;
@@ -292,8 +293,9 @@ void PackedPixels::Run(Work& work) const {
                                        [](unsigned char e) { return e != 0; });
   if (!hasExcluded) open.excluded.clear();
   work.isFill = !hasExcluded && IsFilled(open.pixels, raster_.fill);
-  if (!work.isFill && !Pack(packing_, layout.blockWidth, layout.LinesOf(work.block),
-                            open.pixels.data(), work.packed, work.why)) {
+  if (!work.isFill && !work.isTaken &&
+      !Pack(packing_, layout.blockWidth, layout.LinesOf(work.block), open.pixels.data(),
+            work.packed, work.why)) {
     if (work.why.empty()) work.why = "a block can't be packed";
     return;
   }
@@ -428,6 +430,80 @@ void PackedPixels::NoteQuarter(unsigned level, std::uint64_t block) {
   OpenBlock* const open = open_.Find(level, block);
   if (levels_[level].quarters[block] != all || open == nullptr || open->wasPlaced) return;
   Queue(level, block, *open);
+}
+
+bool PackedPixels::TakeRows(const RowsFiles& rows, bool& taken) {
+  taken = false;
+  const std::unique_ptr<PackedRows> files = rows.walkWidth != 0 && rows.walkHeight != 0
+                                                ? PackedRows::Find(rows, raster_.layout, packing_)
+                                                : nullptr;
+  if (files == nullptr) return true;
+  const BlockLayout& layout = raster_.layout;
+  Array<unsigned> bands(ArrayDims(layout.bands));
+  for (unsigned band = 0; band < layout.bands; ++band) bands[band] = band;
+  std::vector<std::uint64_t> written(layout.Blocks());
+  std::vector<std::uint64_t> blocks;
+  const auto note = [&](const BlockRun& run) {
+    written[run.block] += std::uint64_t{run.width} * run.height;
+    const std::uint64_t all =
+        std::uint64_t{layout.InnerWidth(run.block)} * layout.InnerHeight(run.block);
+    if (written[run.block] == all) blocks.push_back(run.block);
+    if (blocks.size() < batch_) return true;
+    const bool done = TakeBlocks(*files, blocks);
+    blocks.clear();
+    return done;
+  };
+  for (unsigned top = 0; top < layout.lines; top += std::min(rows.walkHeight, layout.lines - top)) {
+    const unsigned height = std::min(rows.walkHeight, layout.lines - top);
+    for (unsigned left = 0; left < layout.samples;
+         left += std::min(rows.walkWidth, layout.samples - left)) {
+      const unsigned width = std::min(rows.walkWidth, layout.samples - left);
+      if (!ForRuns(layout, {left, top, width, height, bands, 0}, note)) return false;
+    }
+  }
+  taken = true;
+  return TakeBlocks(*files, blocks);
+}
+
+/// Places packed blocks; of a file with levels these get what belongs to them.
+bool PackedPixels::TakeBlocks(PackedRows& rows, const std::vector<std::uint64_t>& blocks) {
+  std::vector<Work> batch;
+  for (const std::uint64_t block : blocks) {
+    Work work;
+    work.level = 0;
+    work.block = block;
+    work.isTaken = true;
+    if (!rows.Read(block, work.packed)) return false;
+    if (isCog_) {
+      batch.push_back(std::move(work));
+    } else if (!Append(work.packed, levels_[0].blocks[block])) {
+      return false;
+    }
+  }
+  std::vector<std::vector<unsigned char>> pixels(batch.size());
+  ParallelFor(static_cast<unsigned>(batch.size()), nullptr, [&](unsigned i) {
+    const BlockLayout& layout = raster_.layout;
+    pixels[i].resize(layout.BlockBytes(batch[i].block));
+    if (!Unpack(packing_, layout.blockWidth, layout.LinesOf(batch[i].block), batch[i].packed,
+                pixels[i].data(), batch[i].why) &&
+        batch[i].why.empty()) {
+      batch[i].why = "a block can't be unpacked";
+    }
+  });
+  for (std::size_t i = 0; i < batch.size(); ++i) {
+    batch[i].open = open_.OpenWith(0, batch[i].block, std::move(pixels[i]));
+    if (batch[i].open == nullptr) return false;
+    batch[i].open->isChanged = true;
+  }
+  for (Work& work : batch) {
+    if (!work.why.empty()) return Fail(raster_.path + ": " + work.why);
+    if (!Prepare(work)) return false;
+  }
+  ParallelFor(static_cast<unsigned>(batch.size()), nullptr, [&](unsigned i) { Run(batch[i]); });
+  for (Work& work : batch) {
+    if (!Store(work)) return false;
+  }
+  return PackQueued(false);
 }
 
 /// Packs what is left, from the raster up, since each level gives to the one above.

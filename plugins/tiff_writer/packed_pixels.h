@@ -12,6 +12,7 @@
 #include "tiff_writer/block_reducer.h"
 #include "tiff_writer/new_pixels.h"
 #include "tiff_writer/open_blocks.h"
+#include "tiff_writer/packed_rows.h"
 #include "tiff_writer/tiff_directory.h"
 
 namespace lumo::tiff {
@@ -62,6 +63,12 @@ class PackedPixels final : public NewPixels {
   bool Read(const BlockPlace& place, void* pixels) override;
   bool Finish() override;
 
+  /// Takes all blocks out of files that hold the lines of the raster, as they are packed there, in
+  /// the order in which they would be complete if the pixels were written in the blocks of
+  /// `rows.walkWidth` by `rows.walkHeight`. Comes before anything is written.
+  /// @param taken  [out] false when the files are packed otherwise; nothing has changed then.
+  bool TakeRows(const RowsFiles& rows, bool& taken);
+
  private:
   struct Work;
   explicit PackedPixels(PackedRaster raster);
@@ -82,6 +89,7 @@ class PackedPixels final : public NewPixels {
   bool Append(const std::vector<unsigned char>& packed, PackedBlock& block);
   bool GiveToLevelAbove(const Work& work);
   void NoteQuarter(unsigned level, std::uint64_t block);
+  bool TakeBlocks(PackedRows& rows, const std::vector<std::uint64_t>& blocks);
   bool PackRest();
   bool GetFill(unsigned lines, std::vector<unsigned char>& packed);
   bool WriteUntouched();

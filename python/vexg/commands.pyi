@@ -367,6 +367,9 @@ def CopyRasterCommand(
     Bands: ArrayLike | None = None,
     Invalid: Literal["Told", "NoData"] | None = None,
     Blocks: Literal["Told", "Stream"] | None = None,
+    Share: ArrayLike | None = None,
+    ShareFile: str | PathLike[str] | None = None,
+    ShareFiles: str | Sequence[str | PathLike[str]] | None = None,
     server: Server | None = None,
     progress: Progress = False,
 ) -> _CopyRasterCommandOutputs:
@@ -381,6 +384,11 @@ def CopyRasterCommand(
             target's no-data value takes their place, where a band has one
         Blocks: word: Told: squares or lines of 8 MiB; Stream: blocks as the source stores
             them, which costs less
+        Share: integer array: which of several parts of a raster's lines the source is, from
+            0, and of how many
+        ShareFile: text: the file to make of ValidPixels, with Share
+        ShareFiles: text list: such files of all parts, for a target that has taken the pixels
+            out of files already
 
     Returns:
         ValidPixels: integer array: of each band that was copied
@@ -762,6 +770,8 @@ def CreateJoinedRowsRasterCommand(
     SrcURI: str | Raster,
     Files: str | Sequence[str | PathLike[str]],
     Lines: ArrayLike,
+    Names: str | Sequence[str | PathLike[str]] | None = None,
+    Blocks: Literal["Told", "Stream"] | None = None,
     server: Server | None = None,
     progress: Progress = False,
 ) -> _CreateJoinedRowsRasterCommandOutputs:
@@ -773,6 +783,11 @@ def CreateJoinedRowsRasterCommand(
         Files: text list: rasters of the source's samples, bands and pixel type, from the
             first line to the last
         Lines: integer array: how many lines each of them has, together those of the source
+        Names: text list: the files as a VRT file names them, relative to its place; as in
+            Files when absent
+        Blocks: word: those of the CopyRasterCommand that will read it: a file that takes
+            packed blocks as they are, by RowsURI of CreateRasterCommand, has them in the
+            order of that copy
 
     Returns:
         URI: URI: the raster, by which further commands find it
@@ -1125,6 +1140,7 @@ def CreateRasterCommand(
     Format: str | PathLike[str] | None = None,
     Interleave: Literal["None", "BIP", "BIL", "BSQ"] | None = None,
     Details: Literal["Told", "Names", "Bands", "All"] | None = None,
+    RowsURI: str | Raster | None = None,
     Categories: str | Sequence[str | PathLike[str]] | None = None,
     SrcURI: str | Raster | None = None,
     Samples: int | None = None,
@@ -1154,6 +1170,9 @@ def CreateRasterCommand(
         Details: word: of the raster in SrcURI, as far as the format has room for them. Told:
             none; Names: the names of bands; Bands: all of the bands and the raster, such as
             units, scales and further items; All: also the place, as control points
+        RowsURI: URI: a raster of CreateJoinedRowsRasterCommand that is to be copied into the
+            new one: that takes the packed blocks of its files as they are where it packs
+            alike, or is a VRT file on them, and the copy has nothing left to do
         Categories: text list: names of the values of the first band, from 0 on
         SrcURI: URI: an open raster whose description is the start
         Samples: integer: pixels of a line
@@ -1805,6 +1824,9 @@ def FxComputeFuzzyClassificationCommand(
     AttributeDefinition: ArrayLike,
     LabelValues: ArrayLike,
     ClassFXC: str | PathLike[str],
+    Share: ArrayLike | None = None,
+    ShareFile: str | PathLike[str] | None = None,
+    ShareFiles: str | Sequence[str | PathLike[str]] | None = None,
     server: Server | None = None,
     progress: Progress = False,
 ) -> dict[str, Any]:
@@ -1821,6 +1843,12 @@ def FxComputeFuzzyClassificationCommand(
             S-curve; tolerance in percent
         LabelValues: integer array: the regions to score; all where the first is 4294967295
         ClassFXC: text: the file to create, with a score of each region for each class
+        Share: integer array: which share of the work is done, from 0, and of how many; all of
+            it when absent, and with ShareFiles
+        ShareFile: text: the file to make of a share, with Share; nothing else is given or
+            made
+        ShareFiles: text list: the files of all shares, in order: the work is taken out of
+            them
     """
     ...
 
@@ -1833,6 +1861,9 @@ def FxComputeKNNClassificationCommand(
     AttributeDefinition: ArrayLike,
     ClassFXC: str | PathLike[str],
     Scores: Literal["Told", "Votes"] | None = None,
+    Share: ArrayLike | None = None,
+    ShareFile: str | PathLike[str] | None = None,
+    ShareFiles: str | Sequence[str | PathLike[str]] | None = None,
     server: Server | None = None,
     progress: Progress = False,
 ) -> dict[str, Any]:
@@ -1847,6 +1878,12 @@ def FxComputeKNNClassificationCommand(
         ClassFXC: text: the file to create, with a score of each region for each class
         Scores: word: Told: the squared distance from the mean of the class that wins, 0 for
             the others; Votes: the share of the votes of each class
+        Share: integer array: which share of the work is done, from 0, and of how many; all of
+            it when absent, and with ShareFiles
+        ShareFile: text: the file to make of a share, with Share; nothing else is given or
+            made
+        ShareFiles: text list: the files of all shares, in order: the work is taken out of
+            them
     """
     ...
 
@@ -1860,6 +1897,9 @@ def FxComputePCAClassificationCommand(
     Weights: ArrayLike,
     Thresholds: ArrayLike,
     ClassFXC: str | PathLike[str],
+    Share: ArrayLike | None = None,
+    ShareFile: str | PathLike[str] | None = None,
+    ShareFiles: str | Sequence[str | PathLike[str]] | None = None,
     server: Server | None = None,
     progress: Progress = False,
 ) -> dict[str, Any]:
@@ -1874,6 +1914,12 @@ def FxComputePCAClassificationCommand(
         Weights: number array: a row for each component, a column for each class
         Thresholds: number array: the same
         ClassFXC: text: the file to create, with a score of each region for each class
+        Share: integer array: which share of the work is done, from 0, and of how many; all of
+            it when absent, and with ShareFiles
+        ShareFile: text: the file to make of a share, with Share; nothing else is given or
+            made
+        ShareFiles: text list: the files of all shares, in order: the work is taken out of
+            them
     """
     ...
 
@@ -1955,6 +2001,9 @@ def FxComputeVectorAttributesCommand(
     PixelYSize: float | None = None,
     Parts: Literal["Told", "Together"] | None = None,
     LabelURI: str | Raster | None = None,
+    Share: ArrayLike | None = None,
+    ShareFile: str | PathLike[str] | None = None,
+    ShareFiles: str | Sequence[str | PathLike[str]] | None = None,
     server: Server | None = None,
     progress: Progress = False,
 ) -> dict[str, Any]:
@@ -1971,7 +2020,13 @@ def FxComputeVectorAttributesCommand(
             Told: the values of the last one stay; Together: all their rings are one shape,
             and its hole count counts holes
         LabelURI: URI: the labels, of type Int or UInt, whose polygons are taken as they are
-            found, in place of a file
+            found, in place of a file; shares are of these alone
+        Share: integer array: which share of the work is done, from 0, and of how many; all of
+            it when absent, and with ShareFiles
+        ShareFile: text: the file to make of a share, with Share; nothing else is given or
+            made
+        ShareFiles: text list: the files of all shares, in order: the work is taken out of
+            them
     """
     ...
 
@@ -2521,6 +2576,9 @@ def GetRasterPercentilesCommand(
     URI: str | Raster,
     Percents: ArrayLike,
     Bands: ArrayLike | None = None,
+    Share: ArrayLike | None = None,
+    ShareFile: str | PathLike[str] | None = None,
+    ShareFiles: str | Sequence[str | PathLike[str]] | None = None,
     server: Server | None = None,
     progress: Progress = False,
 ) -> _GetRasterPercentilesCommandOutputs:
@@ -2531,6 +2589,12 @@ def GetRasterPercentilesCommand(
         URI: URI: the raster
         Percents: number array: 0 to 100, 128 of them at most; 50 is the median
         Bands: integer array: from 0; all when absent
+        Share: integer array: which share of the work is done, from 0, and of how many; all of
+            it when absent, and with ShareFiles
+        ShareFile: text: the file to make of a share, with Share; nothing else is given or
+            made
+        ShareFiles: text list: the files of all shares, in order: the work is taken out of
+            them
 
     Returns:
         Percentiles: number array: bands by percentages; between the values at the two ranks
@@ -2681,6 +2745,9 @@ def MakeMosaicFootPrintsCommand(
     NoData: float | None = None,
     Tolerance: float | None = None,
     MaskURIs: Sequence[str | Raster] | None = None,
+    Share: ArrayLike | None = None,
+    ShareFile: str | PathLike[str] | None = None,
+    ShareFiles: str | Sequence[str | PathLike[str]] | None = None,
     server: Server | None = None,
     progress: Progress = False,
 ) -> _MakeMosaicFootPrintsCommandOutputs:
@@ -2696,6 +2763,12 @@ def MakeMosaicFootPrintsCommand(
         Tolerance: number in pixel values: see MosaicFootPrintsCommand
         MaskURIs: URI array: for each scene a mask, see MosaicFootPrintsCommand; empty for
             none
+        Share: integer array: which share of the work is done, from 0, and of how many; all of
+            it when absent, and with ShareFiles
+        ShareFile: text: the file to make of a share, with Share; nothing else is given or
+            made
+        ShareFiles: text list: the files of all shares, in order: the work is taken out of
+            them
 
     Returns:
         Made: integer: how many footprints were made
@@ -2796,6 +2869,9 @@ def MosaicStatsCommand(
     *,
     MosaicURI: str | Raster,
     Level: int,
+    Share: ArrayLike | None = None,
+    ShareFile: str | PathLike[str] | None = None,
+    ShareFiles: str | Sequence[str | PathLike[str]] | None = None,
     server: Server | None = None,
     progress: Progress = False,
 ) -> _MosaicStatsCommandOutputs:
@@ -2806,6 +2882,12 @@ def MosaicStatsCommand(
         MosaicURI: URI: the mosaic, of one of eight types
         Level: integer: the pyramid level whose pixels are counted; 0, and one that there
             isn't, stand for the mosaic itself
+        Share: integer array: which share of the work is done, from 0, and of how many; all of
+            it when absent, and with ShareFiles
+        ShareFile: text: the file to make of a share, with Share; nothing else is given or
+            made
+        ShareFiles: text list: the files of all shares, in order: the work is taken out of
+            them
 
     Returns:
         Success: boolean: the tables were made
@@ -2872,6 +2954,9 @@ def PolygonizeCommand(
     Layer: str | PathLike[str] | None = None,
     Field: str | PathLike[str] | None = None,
     MinSize: float | None = None,
+    Share: ArrayLike | None = None,
+    ShareFile: str | PathLike[str] | None = None,
+    ShareFiles: str | Sequence[str | PathLike[str]] | None = None,
     server: Server | None = None,
     progress: Progress = False,
 ) -> _PolygonizeCommandOutputs:
@@ -2889,6 +2974,12 @@ def PolygonizeCommand(
         Field: text: name of the column of values; label when absent
         MinSize: number in pixels: smaller polygons are left out, which leaves their places
             empty; none when absent
+        Share: integer array: which share of the work is done, from 0, and of how many; all of
+            it when absent, and with ShareFiles
+        ShareFile: text: the file to make of a share, with Share; nothing else is given or
+            made
+        ShareFiles: text list: the files of all shares, in order: the work is taken out of
+            them
 
     Returns:
         Polygons: integer: how many were written

@@ -16,6 +16,7 @@ namespace lumo {
 /// The ways in which the work of a command is divided.
 enum class DivisionKind : unsigned {
   kNone,   ///< it isn't
+  kEach,   ///< it isn't, and costs so little that who needs what it makes does it for himself
   kFirst,  ///< it isn't, and what it makes or changes in place has to be there before others begin
   kRows,   ///< each line of the raster that it writes comes from that line of the one that it reads
   kShares  ///< by its inputs of ShareInputs
@@ -25,11 +26,14 @@ enum class DivisionKind : unsigned {
 struct DivisionDeclaration {
   const char* command;  ///< class name
   DivisionKind kind = DivisionKind::kNone;
-  const char* source = "";           ///< input that names the raster that is read
+  const char* source = "";           ///< input that names the raster; kFirst with it: by shares
   const char* target = "";           ///< input that names the raster to write, of kRows
   std::vector<const char*> makes{};  ///< inputs that name files which the command makes
   const char* makesWhen = "";        ///< input that has to be 1 for that; empty for none
   const char* dividesWhen = "";      ///< input that has to be Exact for shares; empty for none
+  /// Of shares that are done in several rounds, how many there are for a data type: those of a
+  /// round get the files of all rounds before as ShareFiles. Null for one round.
+  unsigned (*rounds)(unsigned dataType) = nullptr;
 };
 
 /// Registers a division: one static object beside the command.

@@ -51,6 +51,7 @@ class FxComputeAttributesStatsCommand final : public RegionCommand {
 
 const CommandFactoryT<FxComputeAttributesStatsCommand> factory(kAttributesStats);
 const DivisionRegistration division({.command = "FxComputeAttributesStatsCommand",
+                                     .kind = DivisionKind::kEach,
                                      .makes = {"StatsFXAS"}});
 
 }  // namespace

@@ -2,6 +2,7 @@
 
 #include <functional>
 
+#include "commands/division.h"
 #include "commands/value_text.h"
 #include "fx/attribute_inputs.h"
 #include "fx/chosen_attributes.h"
@@ -15,7 +16,7 @@ struct ClassExample {
   unsigned region = 0;
 };
 
-/// Helps the commands that score regions for classes.
+/// Helps the commands that score regions for classes. They may do it in shares of the regions.
 class ClassScoresCommand : public RegionCommand {
  protected:
   /// Opens the files of the inputs "AttributesFXA" and, where they are asked for, "StatsFXAS".
@@ -26,8 +27,10 @@ class ClassScoresCommand : public RegionCommand {
   /// the largest index and 1.
   bool ReadExamples();
 
-  /// Makes the file of the input "ClassFXC", for so many classes.
+  /// Makes the file of the input "ClassFXC", for so many classes; for a share none.
   bool CreateScores(unsigned classes);
+  /// True where a share of the regions is scored alone: nothing but its file is made.
+  bool IsShare() const { return HasInput(kShareInput); }
 
   /// Computes scores of regions, many at once: `count` regions from `first` of `regions` on, or of
   /// all where that is null. `values` are those of their attributes, as ChosenAttributes::Read
@@ -44,6 +47,15 @@ class ClassScoresCommand : public RegionCommand {
   std::vector<ClassExample> examples_;
   unsigned classCount_ = 0;
   std::unique_ptr<RegionClassificationProbabilityFile> scores_;
+
+ private:
+  /// Scores regions in blocks, and hands the scores of each block on.
+  using Store = std::function<void(const unsigned* regions, unsigned count, const float* scores)>;
+  bool ScoreBlocks(const unsigned* regions, std::size_t count, const ScoreBlock& score,
+                   const Store& store);
+  bool MakeShare(const std::vector<unsigned>& regions, const ScoreBlock& score);
+  bool TakeShares(const std::vector<unsigned>& regions);
+  std::string KeyOfShares(const std::vector<unsigned>& regions) const;
 };
 
 /// The inputs that the commands share.

@@ -12,19 +12,21 @@ const CommandDeclaration kFuzzy{
     "FxComputeFuzzyClassificationCommand",
     "Feature extraction",
     "Scores regions for classes by rules on their attributes.",
-    {{"ClassDefinition", Presence::kRequired, ValueKind::kNumberArray,
-      "the threshold of each class"},
-     {"RuleDefinition", Presence::kRequired, ValueKind::kNumberArray,
-      "rows of 2: the class that a rule feeds, and its weight there"},
-     AttributesInput(),
-     {"AttributeDefinition", Presence::kRequired, ValueKind::kNumberArray,
-      "rows of 10, one for each test: rule, file, attribute, band; comparison 0 between a and b, 1 "
-      "at least a, 2 at most a, 3 outside of a and b; a; b; weight in the rule; membership 0 "
-      "crisp, "
-      "1 linear, 2 an S-curve; tolerance in percent"},
-     {"LabelValues", Presence::kRequired, ValueKind::kIntegerArray,
-      "the regions to score; all where the first is 4294967295"},
-     ScoresInput()},
+    WithShareInputs(
+        {{"ClassDefinition", Presence::kRequired, ValueKind::kNumberArray,
+          "the threshold of each class"},
+         {"RuleDefinition", Presence::kRequired, ValueKind::kNumberArray,
+          "rows of 2: the class that a rule feeds, and its weight there"},
+         AttributesInput(),
+         {"AttributeDefinition", Presence::kRequired, ValueKind::kNumberArray,
+          "rows of 10, one for each test: rule, file, attribute, band; comparison 0 between a and "
+          "b, 1 "
+          "at least a, 2 at most a, 3 outside of a and b; a; b; weight in the rule; membership 0 "
+          "crisp, "
+          "1 linear, 2 an S-curve; tolerance in percent"},
+         {"LabelValues", Presence::kRequired, ValueKind::kIntegerArray,
+          "the regions to score; all where the first is 4294967295"},
+         ScoresInput()}),
     {}};
 
 class FxComputeFuzzyClassificationCommand final : public ClassScoresCommand {
@@ -74,6 +76,7 @@ class FxComputeFuzzyClassificationCommand final : public ClassScoresCommand {
 
 const CommandFactoryT<FxComputeFuzzyClassificationCommand> factory(kFuzzy);
 const DivisionRegistration division({.command = "FxComputeFuzzyClassificationCommand",
+                                     .kind = DivisionKind::kShares,
                                      .makes = {"ClassFXC"}});
 
 }  // namespace

@@ -21,21 +21,22 @@ std::span<const EnumWord<NeighborScores>> WordsOf(NeighborScores) {
 
 namespace {
 
-const CommandDeclaration kKnn{
-    "FxComputeKNNClassificationCommand",
-    "Feature extraction",
-    "Scores regions for classes by the votes of the nearest examples.",
-    {ExamplesInput(),
-     {"Neighbors", Presence::kRequired, ValueKind::kInteger, "how many examples vote"},
-     AttributesInput(),
-     StatisticsInput(),
-     ChoicesInput(),
-     ScoresInput(),
-     {"Scores", Presence::kOptional, ValueKind::kWord,
-      "Told: the squared distance from the mean of the class that wins, 0 for the others; Votes: "
-      "the share of the votes of each class",
-      "", &WordsIn<NeighborScores>}},
-    {}};
+const CommandDeclaration kKnn{"FxComputeKNNClassificationCommand",
+                              "Feature extraction",
+                              "Scores regions for classes by the votes of the nearest examples.",
+                              WithShareInputs({ExamplesInput(),
+                                               {"Neighbors", Presence::kRequired,
+                                                ValueKind::kInteger, "how many examples vote"},
+                                               AttributesInput(),
+                                               StatisticsInput(),
+                                               ChoicesInput(),
+                                               ScoresInput(),
+                                               {"Scores", Presence::kOptional, ValueKind::kWord,
+                                                "Told: the squared distance from the mean of the "
+                                                "class that wins, 0 for the others; Votes: "
+                                                "the share of the votes of each class",
+                                                "", &WordsIn<NeighborScores>}}),
+                              {}};
 
 class FxComputeKNNClassificationCommand final : public ClassScoresCommand {
   CommandResult Execute() override {
@@ -53,7 +54,7 @@ class FxComputeKNNClassificationCommand final : public ClassScoresCommand {
     const bool isDone =
         ScoreRegions(regions, [&](const unsigned*, unsigned count, const double* values,
                                   double* scores) { Score(nearest, count, values, scores); });
-    if (isDone) PlaceExamples();
+    if (isDone && !IsShare()) PlaceExamples();
     return Finish(isDone);
   }
 
@@ -136,6 +137,7 @@ class FxComputeKNNClassificationCommand final : public ClassScoresCommand {
 
 const CommandFactoryT<FxComputeKNNClassificationCommand> factory(kKnn);
 const DivisionRegistration division({.command = "FxComputeKNNClassificationCommand",
+                                     .kind = DivisionKind::kShares,
                                      .makes = {"ClassFXC"}});
 
 }  // namespace

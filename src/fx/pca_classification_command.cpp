@@ -12,16 +12,16 @@ const CommandDeclaration kPca{
     "FxComputePCAClassificationCommand",
     "Feature extraction",
     "Scores regions for classes by a model of principal components of their attributes.",
-    {ExamplesInput(),
-     AttributesInput(),
-     StatisticsInput(),
-     ChoicesInput(),
-     {"PCACoefficients", Presence::kRequired, ValueKind::kNumberArray,
-      "a row for each attribute, a column for each component"},
-     {"Weights", Presence::kRequired, ValueKind::kNumberArray,
-      "a row for each component, a column for each class"},
-     {"Thresholds", Presence::kRequired, ValueKind::kNumberArray, "the same"},
-     ScoresInput()},
+    WithShareInputs({ExamplesInput(),
+                     AttributesInput(),
+                     StatisticsInput(),
+                     ChoicesInput(),
+                     {"PCACoefficients", Presence::kRequired, ValueKind::kNumberArray,
+                      "a row for each attribute, a column for each component"},
+                     {"Weights", Presence::kRequired, ValueKind::kNumberArray,
+                      "a row for each component, a column for each class"},
+                     {"Thresholds", Presence::kRequired, ValueKind::kNumberArray, "the same"},
+                     ScoresInput()}),
     {}};
 
 class FxComputePCAClassificationCommand final : public ClassScoresCommand {
@@ -38,7 +38,7 @@ class FxComputePCAClassificationCommand final : public ClassScoresCommand {
     const bool isDone =
         ScoreRegions(regions, [&](const unsigned*, unsigned count, const double* values,
                                   double* scores) { Score(count, values, scores); });
-    if (isDone) PlaceExamples(regions);
+    if (isDone && !IsShare()) PlaceExamples(regions);
     return Finish(isDone);
   }
 
@@ -103,6 +103,7 @@ class FxComputePCAClassificationCommand final : public ClassScoresCommand {
 
 const CommandFactoryT<FxComputePCAClassificationCommand> factory(kPca);
 const DivisionRegistration division({.command = "FxComputePCAClassificationCommand",
+                                     .kind = DivisionKind::kShares,
                                      .makes = {"ClassFXC"}});
 
 }  // namespace

@@ -1,4 +1,8 @@
+#include <algorithm>
 #include <cmath>
+#include <map>
+
+#include <fmt/format.h>
 
 #include "commands/division.h"
 #include "foundation/fault.h"
@@ -6,6 +10,7 @@
 #include "fx/attribute_inputs.h"
 #include "fx/region_shapes.h"
 #include "fx/vector_attributes_process.h"
+#include "geometry/area_share.h"
 #include "geometry/fxv_file.h"
 
 namespace lumo {
@@ -15,21 +20,25 @@ const CommandDeclaration kVectorAttributes{
     "FxComputeVectorAttributesCommand",
     "Feature extraction",
     "Computes the shapes of regions from their polygons.",
-    {{"VectorFXV", Presence::kOptional, ValueKind::kText,
-      "the file of polygons; required unless LabelURI is there"},
-     {"SpatialFXA", Presence::kRequired, ValueKind::kText, "the file to create of shapes"},
-     {"PixelXSize", Presence::kOptional, ValueKind::kNumber,
-      "width of a pixel, whose sign does not count; 1 when absent", "map units"},
-     {"PixelYSize", Presence::kOptional, ValueKind::kNumber,
-      "height of a pixel, whose sign does not count; 1 when absent", "map units"},
-     {"Parts", Presence::kOptional, ValueKind::kWord,
-      "of several polygons of one label, as those that touch at a corner alone. Told: the values "
-      "of the last one stay; Together: all their rings are one shape, and its hole count counts "
-      "holes",
-      "", &WordsIn<RegionParts>},
-     {"LabelURI", Presence::kOptional, ValueKind::kURI,
-      "the labels, of type Int or UInt, whose polygons are taken as they are found, in place of a "
-      "file"}},
+    WithShareInputs(
+        {{"VectorFXV", Presence::kOptional, ValueKind::kText,
+          "the file of polygons; required unless LabelURI is there"},
+         {"SpatialFXA", Presence::kRequired, ValueKind::kText, "the file to create of shapes"},
+         {"PixelXSize", Presence::kOptional, ValueKind::kNumber,
+          "width of a pixel, whose sign does not count; 1 when absent", "map units"},
+         {"PixelYSize", Presence::kOptional, ValueKind::kNumber,
+          "height of a pixel, whose sign does not count; 1 when absent", "map units"},
+         {"Parts", Presence::kOptional, ValueKind::kWord,
+          "of several polygons of one label, as those that touch at a corner alone. Told: the "
+          "values "
+          "of the last one stay; Together: all their rings are one shape, and its hole count "
+          "counts "
+          "holes",
+          "", &WordsIn<RegionParts>},
+         {"LabelURI", Presence::kOptional, ValueKind::kURI,
+          "the labels, of type Int or UInt, whose polygons are taken as they are found, in place "
+          "of a "
+          "file; shares are of these alone"}}),
     {}};
 
 using FxvReader = FxvPolygonReader<std::int32_t, std::uint32_t>;
@@ -39,6 +48,9 @@ class FxComputeVectorAttributesCommand final : public RegionCommand {
   CommandResult Execute() override {
     if (!CheckInputs() || !ReadSize()) return Fail();
     if (HasInput("Parts")) setup_->parts = Read<RegionParts>("Parts");
+    if (HasInput(kShareInput)) {
+      return MakeShare() ? Succeed() : Fail(TakeFaultOr("the shapes could not be computed"));
+    }
     const bool isFile = HasInput("VectorFXV") || !HasInput("LabelURI");
     const bool isDone = isFile ? FromFile() : FromLabels();
     if (isDone) return Succeed();
@@ -114,9 +126,72 @@ class FxComputeVectorAttributesCommand final : public RegionCommand {
     return true;
   }
 
+  static std::string KeyOfShares(const BasicRaster& labels) {
+    return fmt::format("shapes {} {} {}", labels.DataType(), labels.Samples(), labels.Lines());
+  }
+
+  /// Keeps the polygons of a share of the labels.
+  bool MakeShare() {
+    const BasicRasterPtr labels = FindLabels(nullptr);
+    lumo::Share share;
+    if (!labels || !ReadShare(Read<Array<unsigned>>(kShareInput), share)) return false;
+    const std::string file = Read<String>(kShareFileInput).ToUTF8();
+    if (file.empty() || HasInput(kShareFilesInput)) {
+      SetFault("Share goes with ShareFile, and not with ShareFiles");
+      return false;
+    }
+    ShareWriter out;
+    const bool isDone = DispatchType(LabelTypes{}, labels->DataType(), [&]<typename L>() {
+      return PutAreas<L>(RasterPtr<L>(labels), 0, {}, share, out, GetIPC());
+    });
+    return isDone && out.Write(file, KeyOfShares(*labels), share);
+  }
+
+  /// Finishes the shapes of the polygons of all shares.
+  bool FromShares(const BasicRaster& labels, RecordSpool& spool) {
+    std::vector<std::string> files;
+    for (const String& file : Read<Array<String>>(kShareFilesInput)) {
+      files.push_back(file.ToUTF8());
+    }
+    JoinedAreas areas(files, KeyOfShares(labels), labels.Lines());
+    const bool isTogether = setup_->parts == RegionParts::kTogether;
+    std::map<std::uint32_t, ShapeSums> shapes;
+    const auto finish = [&](std::uint32_t label, const ShapeSums& shape) {
+      return AddShape(spool, label, shape.GetValues(setup_->size, isTogether));
+    };
+    TracedPolygon polygon;
+    double label = 0;
+    for (std::uint64_t i = 0; areas.Next(label, polygon); ++i) {
+      if (label < 0) {
+        SetFault(String(fmt::format("there is a label below 0: {:.0f}", label)));
+        return false;
+      }
+      ShapeSums shape;
+      shape.Add(polygon, setup_->size);
+      const auto region = static_cast<std::uint32_t>(label);
+      if (isTogether) {
+        const auto [at, isNew] = shapes.try_emplace(region, shape);
+        if (!isNew) at->second.Merge(shape);
+      } else if (!finish(region, shape)) {
+        return false;
+      }
+      if (i % 1024 != 0 || !GetIPC().abort->IsSet()) continue;
+      SetFault("the work was aborted");
+      return false;
+    }
+    return !areas.HasFailed() && std::all_of(shapes.begin(), shapes.end(), [&](const auto& shape) {
+      return finish(shape.first, shape.second);
+    });
+  }
+
   bool FromLabels() {
     const BasicRasterPtr labels = FindLabels(nullptr);
     if (!labels) return false;
+    if (HasInput(kShareFilesInput)) {
+      if (!CreateFile()) return false;
+      RecordSpool joined(*setup_->file);
+      return FromShares(*labels, joined) && joined.Flush() && setup_->file->Close();
+    }
     LabelCensus census;
     if (!census.Run(labels, Share(1)) || !CreateFile()) return false;
     RecordSpool spool(*setup_->file);
@@ -143,6 +218,8 @@ class FxComputeVectorAttributesCommand final : public RegionCommand {
 
 const CommandFactoryT<FxComputeVectorAttributesCommand> factory(kVectorAttributes);
 const DivisionRegistration division({.command = "FxComputeVectorAttributesCommand",
+                                     .kind = DivisionKind::kShares,
+                                     .source = "LabelURI",
                                      .makes = {"SpatialFXA"}});
 
 }  // namespace

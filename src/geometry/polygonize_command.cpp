@@ -1,7 +1,10 @@
 #include <filesystem>
 
+#include <fmt/format.h>
+
 #include "commands/division.h"
 #include "foundation/fault.h"
+#include "geometry/area_share.h"
 #include "geometry/fxv_file.h"
 #include "geometry/raster_to_vector.h"
 #include "geometry/record_writer.h"
@@ -16,19 +19,20 @@ const CommandDeclaration kPolygonize{
     "Vectors",
     "Turns areas of equal value of a raster into polygons of a vector file. A command of this "
     "library's own.",
-    {{"URI", Presence::kRequired, ValueKind::kURI, "the raster"},
-     {"Vectors", Presence::kRequired, ValueKind::kText,
-      "the file to make, in the format of its ending: .fxv, or one of a vector plug-in"},
-     {"Band", Presence::kOptional, ValueKind::kInteger, "from 0; 0 when absent"},
-     {"MaskURI", Presence::kOptional, ValueKind::kURI,
-      "a raster of the same size; where its first band is 0 or not valid, pixels do not count"},
-     {"Layer", Presence::kOptional, ValueKind::kText,
-      "name of the layer; the file's name without its ending when absent"},
-     {"Field", Presence::kOptional, ValueKind::kText,
-      "name of the column of values; label when absent"},
-     {"MinSize", Presence::kOptional, ValueKind::kNumber,
-      "smaller polygons are left out, which leaves their places empty; none when absent",
-      "pixels"}},
+    WithShareInputs(
+        {{"URI", Presence::kRequired, ValueKind::kURI, "the raster"},
+         {"Vectors", Presence::kRequired, ValueKind::kText,
+          "the file to make, in the format of its ending: .fxv, or one of a vector plug-in"},
+         {"Band", Presence::kOptional, ValueKind::kInteger, "from 0; 0 when absent"},
+         {"MaskURI", Presence::kOptional, ValueKind::kURI,
+          "a raster of the same size; where its first band is 0 or not valid, pixels do not count"},
+         {"Layer", Presence::kOptional, ValueKind::kText,
+          "name of the layer; the file's name without its ending when absent"},
+         {"Field", Presence::kOptional, ValueKind::kText,
+          "name of the column of values; label when absent"},
+         {"MinSize", Presence::kOptional, ValueKind::kNumber,
+          "smaller polygons are left out, which leaves their places empty; none when absent",
+          "pixels"}}),
     {{"Polygons", ValueKind::kInteger, "how many were written"},
      {"LeftOut", ValueKind::kInteger, "how many were too small"},
      {"Warning", ValueKind::kText,
@@ -49,11 +53,13 @@ class PolygonizeCommand final : public RasterCommand {
     if (HasInput("MaskURI") && !FindMask(*raster)) return Fail();
     bool isDone = false;
     const bool isKnown = DispatchType(EightTypes{}, raster->DataType(), [&]<typename T>() {
-      isDone = Polygonize(RasterPtr<T>(raster));
+      const RasterPtr<T> source(raster);
+      isDone = HasInput(kShareInput) ? MakeShare(source) : Polygonize(source);
       return true;
     });
     if (!isKnown) return Fail("URI: a raster of this pixel type can't be vectorized");
     if (!isDone) return Fail(TakeFaultOr("the raster could not be vectorized"));
+    if (HasInput(kShareInput)) return Succeed();
     Write("Polygons", written_);
     Write("LeftOut", leftOut_);
     if (changed_ != 0) {
@@ -81,9 +87,59 @@ class PolygonizeCommand final : public RasterCommand {
     return IsFxvName(path_) ? ToFxv<T>(raster) : ToRecords<T>(raster);
   }
 
+  std::string KeyOfShares(const BasicRaster& raster) const {
+    return fmt::format("polygons {} {} {} {} {}", raster.DataType(), raster.Samples(),
+                       raster.Lines(), band_, bool(mask_));
+  }
+
+  template <typename T>
+  bool MakeShare(const RasterPtr<T>& raster) {
+    Share share;
+    if (!ReadShare(Read<Array<unsigned>>(kShareInput), share)) return false;
+    const std::string file = Read<String>(kShareFileInput).ToUTF8();
+    if (file.empty() || HasInput(kShareFilesInput)) {
+      SetFault("Share goes with ShareFile, and not with ShareFiles");
+      return false;
+    }
+    ShareWriter out;
+    return PutAreas<T>(raster, band_, mask_, share, out, GetIPC()) &&
+           out.Write(file, KeyOfShares(*raster), share);
+  }
+
+  /// Writes the polygons of all shares.
+  template <typename T>
+  bool TakeShares(const BasicRaster& raster, const ObjectPtr& writer) {
+    constexpr unsigned kAtOnce = 1024;
+    std::vector<std::string> files;
+    for (const String& file : Read<Array<String>>(kShareFilesInput)) {
+      files.push_back(file.ToUTF8());
+    }
+    JoinedAreas areas(files, KeyOfShares(raster), raster.Lines());
+    LabelCounts counts;
+    TracedPolygon polygon;
+    double label = 0;
+    PolygonBatch batch;
+    bool isThere = true;
+    while (isThere) {
+      batch.Clear();
+      for (unsigned i = 0; i < kAtOnce && isThere; ++i) {
+        isThere = areas.Next(label, polygon);
+        if (isThere) batch.Take(label, polygon);
+      }
+      if (areas.HasFailed() || !batch.WriteTo<T>(*writer, counts)) return false;
+      if (!GetIPC().abort->IsSet()) continue;
+      SetFault("the vectorizing was aborted");
+      return false;
+    }
+    changed_ = counts.changed;
+    written_ = counts.polygons;
+    return true;
+  }
+
   /// Runs the process into a writer. False, with the fault set, when not all polygons are written.
   template <typename T>
   bool Run(const RasterPtr<T>& raster, const ObjectPtr& writer) {
+    if (HasInput(kShareFilesInput)) return TakeShares<T>(*raster, writer);
     RasterToVectorProcess<T> process(raster, band_, writer, GetIPC());
     process.SetMask(mask_);
     const bool hasRun = process.RunProcess(process.kHere);
@@ -147,7 +203,10 @@ class PolygonizeCommand final : public RasterCommand {
 };
 
 const CommandFactoryT<PolygonizeCommand> factory(kPolygonize);
-const DivisionRegistration division({.command = "PolygonizeCommand", .makes = {"Vectors"}});
+const DivisionRegistration division({.command = "PolygonizeCommand",
+                                     .kind = DivisionKind::kShares,
+                                     .source = "URI",
+                                     .makes = {"Vectors"}});
 
 }  // namespace
 }  // namespace lumo

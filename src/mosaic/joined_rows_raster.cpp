@@ -8,6 +8,7 @@
 #include "foundation/fault.h"
 #include "raster/block_strides.h"
 #include "raster/interleave.h"
+#include "raster/valid_pixels.h"
 #include "views/publish_raster.h"
 #include "views/sources/catalog_raster_ref.h"
 #include "views/view_command.h"
@@ -38,10 +39,18 @@ void PlaceLines(const Array<E>& from, Array<E>& to, const SubRect& size, unsigne
 
 template <typename T>
 JoinedRowsRaster<T>::JoinedRowsRaster(const RasterPtr<T>& parent,
-                                      const std::vector<RowsFile>& files)
-    : ComputedRaster<T>(parent), files_(files), firsts_{0}, open_(kMostOpenFiles) {
-  for (const RowsFile& file : files_) firsts_.push_back(firsts_.back() + file.lines);
+                                      const std::vector<RowsFile>& files, CopyBlocks walk)
+    : ComputedRaster<T>(parent), firsts_{0}, open_(kMostOpenFiles) {
+  for (const RowsFile& file : files) firsts_.push_back(firsts_.back() + file.lines);
   isWhole_ = parent && firsts_.back() == parent->Lines();
+  RowsFiles rows{files};
+  rows.walksAsTarget = walk == CopyBlocks::kTarget;
+  if (isWhole_ && !rows.walksAsTarget) {
+    const auto blocks = MakeCopyIterator<T>(parent, AllBands(*parent), walk, *parent)->Dimensions();
+    rows.walkWidth = blocks.width;
+    rows.walkHeight = blocks.height;
+  }
+  rows_ = std::make_shared<const RowsFiles>(std::move(rows));
 }
 
 template <typename T>
@@ -55,16 +64,16 @@ RasterPtr<T> JoinedRowsRaster<T>::Open(std::size_t file) {
   const auto open = [&]() -> BasicRasterPtr {
     TakeFault();
     const DataConnectionPtr source = GetGlobalDataManager().Connect(
-        ConnStrings({files_[file].file}), GeoRefPtr(), MetadataPtr());
+        ConnStrings({rows_->files[file].file}), GeoRefPtr(), MetadataPtr());
     return source ? MakeReaderRaster(source) : BasicRasterPtr();
   };
   const RasterPtr<T> raster(open_.Get(file, open));
   const bool fits = raster && raster->Samples() == this->Samples() &&
-                    raster->Lines() == files_[file].lines && raster->Bands() == this->Bands();
+                    raster->Lines() == rows_->files[file].lines && raster->Bands() == this->Bands();
   if (fits) return raster;
-  const std::string otherwise =
-      fmt::format("{}: doesn't hold {} lines of {} samples and {} bands",
-                  files_[file].file.ToUTF8(), files_[file].lines, this->Samples(), this->Bands());
+  const std::string otherwise = fmt::format(
+      "{}: doesn't hold {} lines of {} samples and {} bands", rows_->files[file].file.ToUTF8(),
+      rows_->files[file].lines, this->Samples(), this->Bands());
   SetFault(TakeFaultOr(otherwise.c_str()));
   return {};
 }
@@ -113,17 +122,25 @@ const CommandDeclaration kJoinRows{
      {"Files", Presence::kRequired, ValueKind::kTextList,
       "rasters of the source's samples, bands and pixel type, from the first line to the last"},
      {"Lines", Presence::kRequired, ValueKind::kIntegerArray,
-      "how many lines each of them has, together those of the source"}},
+      "how many lines each of them has, together those of the source"},
+     {"Names", Presence::kOptional, ValueKind::kTextList,
+      "the files as a VRT file names them, relative to its place; as in Files when absent"},
+     {"Blocks", Presence::kOptional, ValueKind::kWord,
+      "those of the CopyRasterCommand that will read it: a file that takes packed blocks as they "
+      "are, by RowsURI of CreateRasterCommand, has them in the order of that copy",
+      "", &WordsIn<CopyBlocks>}},
     PublishedOutputs()};
 
 class CreateJoinedRowsRasterCommand final : public ViewCommand {
   CommandResult Execute() override {
     const auto names = Read<Array<String>>("Files");
     const auto lines = Read<Array<unsigned>>("Lines");
+    const auto shown = HasInput("Names") ? Read<Array<String>>("Names") : names;
     std::vector<RowsFile> files;
     std::uint64_t all = 0;
+    if (shown.GetCount() != names.GetCount()) return Fail("Names has to be as long as Files");
     for (unsigned i = 0; i < names.GetCount() && i < lines.GetCount(); ++i) {
-      files.push_back({names[i], lines[i]});
+      files.push_back({names[i], lines[i], shown[i]});
       all += lines[i];
     }
     const BasicRasterPtr source = FindRaster("SrcURI");
@@ -131,7 +148,7 @@ class CreateJoinedRowsRasterCommand final : public ViewCommand {
       return Fail("Files and Lines don't make up the lines of the raster");
     }
     TakeFault();
-    return PublishView<JoinedRowsRaster>(files);
+    return PublishView<JoinedRowsRaster>(files, Read<CopyBlocks>("Blocks"));
   }
 };
 

@@ -2,6 +2,7 @@
 
 #include "foundation/fault.h"
 #include "mosaic/mosaic_raster.h"
+#include "mosaic/scene_shares.h"
 #include "raster/raster_command.h"
 
 namespace lumo {
@@ -25,6 +26,20 @@ class MosaicCommand : public RasterCommand {
     });
     if (!isKnown) SetFault("MosaicURI: a raster of this pixel type is no mosaic");
     return isDone;
+  }
+
+  /// Reads the inputs of work that may be done in shares of the scenes.
+  /// @param what  says of which work.
+  template <typename T>
+  bool BeginShares(const char* what, const MosaicRasterDef<T>& definition,
+                   SceneShares& shares) const {
+    const ShareInputs inputs{HasInput(kShareInput), Read<Array<unsigned>>(kShareInput),
+                             Read<String>(kShareFileInput), Read<Array<String>>(kShareFilesInput)};
+    std::string key = what;
+    for (unsigned i = 0; i < definition.SceneCount(); ++i) {
+      key.append(" ").append(definition.SceneKey(i).ToUTF8());
+    }
+    return shares.Begin(inputs, key, definition.SceneCount());
   }
 
   /// Stores the output Success, and ends the command by it.

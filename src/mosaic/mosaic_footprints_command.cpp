@@ -11,15 +11,16 @@ const CommandDeclaration kMake{
     "Mosaics",
     "Makes the footprints of a mosaic's scenes that have none, and stores them in its definition. "
     "A command of this library's own.",
-    {{"MosaicURI", Presence::kRequired, ValueKind::kURI, "the mosaic"},
-     {"Again", Presence::kOptional, ValueKind::kBoolean, "1: of all scenes"},
-     {"SmoothParameter", Presence::kOptional, ValueKind::kNumber,
-      "how far outlines may lie from the pixels; 3.1 when absent", "square pixels"},
-     {"NoData", Presence::kOptional, ValueKind::kNumber, "see MosaicFootPrintsCommand"},
-     {"Tolerance", Presence::kOptional, ValueKind::kNumber, "see MosaicFootPrintsCommand",
-      "pixel values"},
-     {"MaskURIs", Presence::kOptional, ValueKind::kURIArray,
-      "for each scene a mask, see MosaicFootPrintsCommand; empty for none"}},
+    WithShareInputs(
+        {{"MosaicURI", Presence::kRequired, ValueKind::kURI, "the mosaic"},
+         {"Again", Presence::kOptional, ValueKind::kBoolean, "1: of all scenes"},
+         {"SmoothParameter", Presence::kOptional, ValueKind::kNumber,
+          "how far outlines may lie from the pixels; 3.1 when absent", "square pixels"},
+         {"NoData", Presence::kOptional, ValueKind::kNumber, "see MosaicFootPrintsCommand"},
+         {"Tolerance", Presence::kOptional, ValueKind::kNumber, "see MosaicFootPrintsCommand",
+          "pixel values"},
+         {"MaskURIs", Presence::kOptional, ValueKind::kURIArray,
+          "for each scene a mask, see MosaicFootPrintsCommand; empty for none"}}),
     {{"Made", ValueKind::kInteger, "how many footprints were made"}}};
 
 class MakeMosaicFootPrintsCommand final : public MosaicCommand {
@@ -32,17 +33,23 @@ class MakeMosaicFootPrintsCommand final : public MosaicCommand {
     if (HasInput("Tolerance")) options.tolerance = Read<double>("Tolerance");
     options.masks = Read<Array<URI>>("MaskURIs");
     unsigned made = 0;
-    const bool isDone = OnMosaic([&]<typename T>(const MosaicRasterPtr<T>& mosaic) {
-      return MakeMissingFootprints(*mosaic->Definition(), options, GetIPC(), made);
-    });
-    Write("Made", made);
+    const auto make = [&]<typename T>(const MosaicRasterPtr<T>& mosaic) {
+      SceneShares shares;
+      return BeginShares("footprints", *mosaic->Definition(), shares) &&
+             MakeMissingFootprints(*mosaic->Definition(), options, GetIPC(), made, shares) &&
+             shares.End();
+    };
+    const bool isDone =
+        OnMosaic(make, HasInput(kShareInput) ? Storing::kNothing : Storing::kDefinition);
+    if (!HasInput(kShareInput)) Write("Made", made);
     return isDone ? Succeed() : Fail(TakeFaultOr("the footprints could not be made"));
   }
 };
 
 const CommandFactoryT<MakeMosaicFootPrintsCommand> factory(kMake);
 const DivisionRegistration division({.command = "MakeMosaicFootPrintsCommand",
-                                     .kind = DivisionKind::kFirst});
+                                     .kind = DivisionKind::kFirst,
+                                     .source = "MosaicURI"});
 
 }  // namespace
 }  // namespace lumo

@@ -101,22 +101,70 @@ class TableFiles {
 template <typename T>
 class Matching {
  public:
-  Matching(MosaicRasterDef<T>& definition, const IPC& ipc) : definition_(definition), ipc_(ipc) {}
+  Matching(MosaicRasterDef<T>& definition, const IPC& ipc, SceneShares& shares)
+      : definition_(definition), ipc_(ipc), shares_(shares) {}
 
   bool Run() {
-    if (!CheckScenes() || !Prepare()) return false;
+    if (!CheckScenes()) return false;
+    if (shares_.IsShare()) return MakeShare();
+    if (!shares_.Joins() && !Prepare()) return false;
     const unsigned bands = reference_.raster->Bands();
     TableFiles files(definition_.LutPath(), definition_.SceneCount(), bands);
     for (unsigned scene = 0; scene < definition_.SceneCount(); ++scene) {
       if (definition_.MatchFlags()[scene] == 0) continue;
+      ShareReader* done = nullptr;
+      if (!shares_.Find(scene, done)) return false;
       for (unsigned band = 0; band < bands; ++band) {
-        if (!MatchBand(scene, band, files)) return false;
+        BandTable table;
+        const bool isThere =
+            done != nullptr ? Restore(*done, table) : MatchBand(scene, band, table);
+        if (!isThere || !Write(scene, band, table, files)) return false;
       }
     }
     return files.Keep();
   }
 
  private:
+  /// The table of a band of a scene, and the range that it covers.
+  struct BandTable {
+    double min = 0;
+    double max = 0;
+    std::vector<double> entries{};
+  };
+
+  /// Makes the tables of the scenes of a share.
+  bool MakeShare() {
+    for (unsigned scene = 0; scene < definition_.SceneCount(); ++scene) {
+      if (definition_.MatchFlags()[scene] == 0 || !shares_.IsWanted(scene)) continue;
+      const IPC ipc = StepOf(ipc_, 1.0 / definition_.SceneCount());
+      const bool isPrepared =
+          definition_.ColourMatchMode() == kMatchWhole || scene == definition_.ReferenceIndex()
+              ? PrepareWhole(Side(scene), ipc)
+              : PrepareOverlap(scene, ipc);
+      if (!isPrepared) return false;
+      ShareWriter& out = shares_.Out(scene);
+      for (unsigned band = 0; band < reference_.raster->Bands(); ++band) {
+        BandTable table;
+        if (!MatchBand(scene, band, table)) return false;
+        const std::uint64_t count = table.entries.size();
+        out.Put(table.min);
+        out.Put(table.max);
+        out.Put(count);
+        out.PutAll(table.entries.data(), table.entries.size());
+      }
+    }
+    return true;
+  }
+
+  static bool Restore(ShareReader& in, BandTable& table) {
+    std::uint64_t count = 0;
+    if (in.Get(table.min) && in.Get(table.max) && in.Get(count) && count <= kMosaicTableBins) {
+      table.entries.resize(count);
+      if (in.GetAll(table.entries.data(), table.entries.size())) return true;
+    }
+    return Refuse("the file of a share of the tables is damaged");
+  }
+
   MatchSide<T> Side(unsigned scene) const {
     return {definition_.Scenes()[scene], definition_.SceneKey(scene).ToUTF8()};
   }
@@ -270,7 +318,7 @@ class Matching {
   }
 
   /// Makes the table of a band of a scene.
-  bool MatchBand(unsigned scene, unsigned band, TableFiles& files) {
+  bool MatchBand(unsigned scene, unsigned band, BandTable& made) {
     MatchSide<T> ofScene = Side(scene), ofReference = reference_;
     const IPC ipc(ipc_.abort, ProgressReportPtr(new StandardProgressReport));
     bool isLarge = false;
@@ -286,11 +334,15 @@ class Matching {
         !FindCounts(ofReference, band, ipc, referenceCounts)) {
       return false;
     }
-    const std::vector<double> table =
-        MatchDistributions(referenceCounts.Reference(), sceneCounts.Scene());
-    files.items.Ref(scene, band) = {static_cast<double>(sceneCounts.min),
-                                    static_cast<double>(sceneCounts.max),
-                                    static_cast<std::uint32_t>(table.size()), 0};
+    made = {static_cast<double>(sceneCounts.min), static_cast<double>(sceneCounts.max),
+            MatchDistributions(referenceCounts.Reference(), sceneCounts.Scene())};
+    return true;
+  }
+
+  static bool Write(unsigned scene, unsigned band, const BandTable& made, TableFiles& files) {
+    const std::vector<double>& table = made.entries;
+    files.items.Ref(scene, band) = {made.min, made.max, static_cast<std::uint32_t>(table.size()),
+                                    0};
     // With its window over this table alone the file stays sparse.
     files.entries.At(scene, band, kMosaicTableBins - 1);
     for (unsigned bin = 0; bin < table.size(); ++bin) {
@@ -302,6 +354,7 @@ class Matching {
 
   MosaicRasterDef<T>& definition_;
   const IPC& ipc_;
+  SceneShares& shares_;
   MatchSide<T> reference_;
 };
 
@@ -328,13 +381,13 @@ HistogramRequest<T> MatchingHistogram(T min, T max, Form bins) {
 }
 
 template <typename T>
-bool MatchScenes(MosaicRasterDef<T>& definition, const IPC& ipc) {
-  return Matching<T>(definition, ipc).Run();
+bool MatchScenes(MosaicRasterDef<T>& definition, const IPC& ipc, SceneShares& shares) {
+  return Matching<T>(definition, ipc, shares).Run();
 }
 
 #define VEXG_MATCHING(T)                                                     \
   template VEXG_EXPORT HistogramRequest<T> MatchingHistogram<T>(T, T, Form); \
-  template VEXG_EXPORT bool MatchScenes<T>(MosaicRasterDef<T>&, const IPC&);
+  template VEXG_EXPORT bool MatchScenes<T>(MosaicRasterDef<T>&, const IPC&, SceneShares&);
 VEXG_FOR_ALL(EIGHT, VEXG_MATCHING);
 #undef VEXG_MATCHING
 

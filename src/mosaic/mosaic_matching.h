@@ -2,6 +2,7 @@
 
 #include "foundation/run_controls.h"
 #include "mosaic/mosaic_raster_def.h"
+#include "mosaic/scene_shares.h"
 
 namespace lumo {
 
@@ -21,7 +22,15 @@ VEXG_EXPORT HistogramRequest<T> MatchingHistogram(T min, T max, Form bins);
 /// reference of one bin, leave the values of the scene as they are.
 ///
 /// Failure: false, with the fault set; files that were there before stay then.
+/// @param shares  of a share, the tables of its scenes are put to it, and no file is made.
 template <typename T>
-VEXG_EXPORT bool MatchScenes(MosaicRasterDef<T>& definition, const IPC& ipc);
+VEXG_EXPORT bool MatchScenes(MosaicRasterDef<T>& definition, const IPC& ipc, SceneShares& shares);
+
+/// The same for all scenes at once.
+template <typename T>
+bool MatchScenes(MosaicRasterDef<T>& definition, const IPC& ipc) {
+  SceneShares none;
+  return MatchScenes(definition, ipc, none);
+}
 
 }  // namespace lumo

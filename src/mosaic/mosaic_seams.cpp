@@ -213,11 +213,55 @@ bool RefuseAborted() {
   return Refuse("the work on the mosaic was aborted");
 }
 
+bool ReadWholeFile(const std::string& path, std::string& bytes, std::string& why) {
+  const auto file =
+      platform::RandomAccessFile::Open(path, platform::RandomAccessFile::Access::kRead, &why);
+  std::uint64_t size = 0;
+  if (file == nullptr || !file->GetSize(size, &why)) return false;
+  bytes.resize(size);
+  return file->Read(0, bytes.data(), bytes.size(), &why);
+}
+
+/// Makes the footprint of a scene aside, and puts the bytes of its file.
+template <typename T>
+bool PutFootprint(MosaicRasterDef<T>& definition, unsigned scene, const FootprintOptions& options,
+                  const IPC& ipc, SceneShares& shares) {
+  const String key = definition.SceneKey(scene);
+  const RasterPtr<T>& raster = definition.Scenes()[scene];
+  const std::string path =
+      platform::TemporaryPathBeside((fs::temp_directory_path() / "vexg_footprint.msf").string());
+  catalog::Add(raster);
+  const String reason = RunFootprintJob(
+      URI(key), path, options, options.masks.GetCount() != 0 ? options.masks[scene] : URI(), ipc);
+  catalog::Remove(raster);
+  if (reason.GetLength() != 0) return Refuse(SceneFileOf(key) + ": " + reason.ToUTF8());
+  std::string bytes, why;
+  const bool isRead = ReadWholeFile(path, bytes, why);
+  std::error_code ignored;
+  fs::remove(path, ignored);
+  if (!isRead) return Refuse(why);
+  ShareWriter& out = shares.Out(scene);
+  const std::uint64_t count = bytes.size();
+  out.Put(count);
+  out.PutAll(bytes.data(), bytes.size());
+  return true;
+}
+
+/// Makes the file of a footprint out of its bytes. @return no text, or why it failed.
+String TakeFootprint(const std::string& path, ShareReader& in) {
+  std::uint64_t count = 0;
+  if (!in.Get(count) || count > in.Left()) return "the file of its share is damaged";
+  std::string bytes(count, '\0');
+  std::string why;
+  if (!in.GetAll(bytes.data(), bytes.size())) return "the file of its share is damaged";
+  return platform::ReplaceFile(path, bytes, &why) ? String() : String(why);
+}
+
 }  // namespace
 
 template <typename T>
 bool MakeMissingFootprints(MosaicRasterDef<T>& definition, const FootprintOptions& options,
-                           const IPC& ipc, unsigned& made) {
+                           const IPC& ipc, unsigned& made, SceneShares& shares) {
   made = 0;
   const unsigned count = definition.SceneCount();
   if (options.masks.GetCount() != 0 && options.masks.GetCount() != count) {
@@ -231,15 +275,26 @@ bool MakeMissingFootprints(MosaicRasterDef<T>& definition, const FootprintOption
   for (unsigned i = 0; i < count && !ipc.abort->IsSet(); ++i) {
     const String key = definition.SceneKey(i);
     const bool isThere = definition.Footprints().HasKey(key);
-    if (isThere && !options.again) continue;
+    if ((isThere && !options.again) || !shares.IsWanted(i)) continue;
+    if (shares.IsShare()) {
+      if (!PutFootprint(definition, i, options, StepOf(ipc, 1.0 / count), shares)) return false;
+      continue;
+    }
     const std::string path =
         isThere ? definition.Footprints().Find(key).ToUTF8()
                 : names.Find(definition.WorkingDirectory().ToUTF8(), 10000, "_footprint.msf");
     const RasterPtr<T>& scene = definition.Scenes()[i];
     const URI mask = options.masks.GetCount() != 0 ? options.masks[i] : URI();
-    catalog::Add(scene);
-    const String reason = RunFootprintJob(URI(key), path, options, mask, StepOf(ipc, 1.0 / count));
-    catalog::Remove(scene);
+    ShareReader* done = nullptr;
+    if (!shares.Find(i, done)) return false;
+    String reason;
+    if (done != nullptr) {
+      reason = TakeFootprint(path, *done);
+    } else {
+      catalog::Add(scene);
+      reason = RunFootprintJob(URI(key), path, options, mask, StepOf(ipc, 1.0 / count));
+      catalog::Remove(scene);
+    }
     if (reason.GetLength() == 0) {
       definition.Footprints()[key] = String(path);
       isKept = false;
@@ -301,7 +356,9 @@ bool MakeSeams(MosaicRaster<T>& mosaic, const IPC& ipc, Form sides) {
     if (!definition.Footprints().HasKey(definition.SceneKey(i))) rest = 0.1;
   }
   unsigned made = 0;
-  if (rest < 1 && !MakeMissingFootprints(definition, {}, StepOf(ipc, 0.9), made)) return false;
+  SceneShares none;
+  if (rest < 1 && !MakeMissingFootprints(definition, {}, StepOf(ipc, 0.9), made, none))
+    return false;
 
   SeamFiles files(definition.SeamFiles());
   files.NameAll(definition);
@@ -334,7 +391,7 @@ bool MakeSeams(MosaicRaster<T>& mosaic, const IPC& ipc, Form sides) {
 
 #define VEXG_SEAMS(T)                                                                              \
   template VEXG_EXPORT bool MakeMissingFootprints<T>(MosaicRasterDef<T>&, const FootprintOptions&, \
-                                                     const IPC&, unsigned&);                       \
+                                                     const IPC&, unsigned&, SceneShares&);         \
   template VEXG_EXPORT Polygon2D<double> LoadFootprint<T>(MosaicRasterDef<T>&, unsigned,           \
                                                           const GeoRef&);                          \
   template VEXG_EXPORT bool MakeSeams<T>(MosaicRaster<T>&, const IPC&, Form);

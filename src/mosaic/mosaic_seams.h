@@ -5,6 +5,7 @@
 #include "foundation/run_controls.h"
 #include "geometry/polygon2d.h"
 #include "mosaic/mosaic_raster.h"
+#include "mosaic/scene_shares.h"
 
 namespace lumo {
 
@@ -20,13 +21,14 @@ struct FootprintOptions {
 /// Makes the footprints that a mosaic's scenes don't have yet, each by a job with
 /// MosaicFootPrintsCommand, in files of its working directory. The definition is stored now and
 /// then, so that what was made is found by a later run.
-/// @param made  [out] how many.
+/// @param made    [out] how many.
+/// @param shares  of a share, nothing is stored but its file, with the bytes of footprints.
 /// @return false, with the fault set, when one could not be made, or it was aborted; the others
 ///         are in the definition.
 template <typename T>
 VEXG_EXPORT bool MakeMissingFootprints(MosaicRasterDef<T>& definition,
                                        const FootprintOptions& options, const IPC& ipc,
-                                       unsigned& made);
+                                       unsigned& made, SceneShares& shares);
 
 /// The footprint of a scene in pixels of the mosaic. Exists for EightTypes.
 /// @return a polygon that isn't valid, with the fault set, when it can't be read, or not be carried

@@ -1,10 +1,15 @@
+#include <algorithm>
 #include <optional>
 #include <vector>
 
 #include "commands/division.h"
+#include "commands/share_file.h"
 #include "foundation/fault.h"
 #include "raster/block_strides.h"
+#include "raster/copy_blocks.h"
 #include "raster/raster_command.h"
+#include "raster/raster_def.h"
+#include "raster/rows_files.h"
 #include "raster/tile_functions.h"
 #include "raster/valid_pixels.h"
 
@@ -22,38 +27,6 @@ std::span<const EnumWord<InvalidPixels>> WordsOf(InvalidPixels) {
                                                        {"NoData", InvalidPixels::kNoData}};
   return kWords;
 }
-
-/// The blocks in which pixels are copied.
-enum class CopyBlocks : unsigned {
-  kTold = 0,    ///< squares, or lines, of 8 MiB
-  kStream = 1,  ///< those of the source's storage
-  kTarget = 2   ///< those of the target's storage
-};
-
-std::span<const EnumWord<CopyBlocks>> WordsOf(CopyBlocks) {
-  static constexpr EnumWord<CopyBlocks> kWords[] = {{"Told", CopyBlocks::kTold},
-                                                    {"Stream", CopyBlocks::kStream},
-                                                    {"Target", CopyBlocks::kTarget}};
-  return kWords;
-}
-
-/// Reads a raster in the blocks and the order in which another one of its size is stored, so that
-/// whole blocks are written there.
-template <typename T>
-class IteratorOfTarget final : public RasterIterator<T> {
- public:
-  IteratorOfTarget(const RasterPtr<T>& source, const Array<unsigned>& bands,
-                   const BasicRaster& target)
-      : RasterIterator<T>(source, StreamTiles(&target, sizeof(T), kBudget, bands.GetCount()),
-                          bands) {
-    this->order_ = StreamOrder(&target);
-  }
-
- private:
-  /// Measured with warps: a block stays in the caches from its making to its writing, and is worth
-  /// the reading of what lies around it in the source.
-  static constexpr unsigned kBudget = 0x200000;
-};
 
 /// Puts the values of `fill` where the pixels of a band, which has one, are not valid.
 template <typename T>
@@ -84,9 +57,14 @@ const CommandDeclaration kCopy{
       "takes their place, where a band has one",
       "", &WordsIn<InvalidPixels>},
      {"Blocks", Presence::kOptional, ValueKind::kWord,
-      "Told: squares or lines of 8 MiB; Stream: blocks as the source stores them, which costs "
-      "less; Target: as the target stores them, for sources that are computed",
-      "", &WordsIn<CopyBlocks>}},
+      "Told: squares or lines of 8 MiB; Stream: blocks as the source stores them, which costs less",
+      "", &WordsIn<CopyBlocks>},
+     {kShareInput, Presence::kOptional, ValueKind::kIntegerArray,
+      "which of several parts of a raster's lines the source is, from 0, and of how many"},
+     {kShareFileInput, Presence::kOptional, ValueKind::kText,
+      "the file to make of ValidPixels, with Share"},
+     {kShareFilesInput, Presence::kOptional, ValueKind::kTextList,
+      "such files of all parts, for a target that has taken the pixels out of files already"}},
     {{"ValidPixels", ValueKind::kIntegerArray, "of each band that was copied"}}};
 
 class CopyRasterCommand final : public RasterCommand {
@@ -107,6 +85,8 @@ class CopyRasterCommand final : public RasterCommand {
     if (!CheckBands(*source, bands)) return Fail();
     if (bands.GetCount() != target->Bands()) return Fail("the numbers of bands differ");
 
+    if (HoldsPixels(*source, *target) && HasInput(kShareFilesInput)) return TakeCounts(bands);
+
     const bool copied = DispatchType(TwelveTypes{}, source->DataType(), [&]<typename T>() {
       return Copied<T>(RasterPtr<T>(source), RasterPtr<T>(target), bands);
     });
@@ -125,22 +105,51 @@ class CopyRasterCommand final : public RasterCommand {
     for (unsigned band = 0; fills && band < bands.GetCount(); ++band) {
       if (target->HasNoDataValue(band)) fill[band] = target->NoDataValue(band);
     }
-    RasterIteratorPtr<T> from;
-    const auto blocks = HasInput("Blocks") ? Read<CopyBlocks>("Blocks") : CopyBlocks::kTold;
-    if (blocks == CopyBlocks::kStream) {
-      from.Reset(new RasterIteratorStream<T>(source, bands));
-    } else if (blocks == CopyBlocks::kTarget) {
-      from.Reset(new IteratorOfTarget<T>(source, bands, *target));
-    } else {
-      from.Reset(new RasterIteratorSmart<T>(source, bands));
-    }
+    const RasterIteratorPtr<T> from =
+        MakeCopyIterator<T>(source, bands, Read<CopyBlocks>("Blocks"), *target);
     const auto check = [&](Tile<T>& tile) {
       valid.Add(tile);
       Fill(tile, fill);
     };
     if (!CopyTiles("CopyProcess", TilesBy(from), target, check, GetIPC())) return false;
-    Write("ValidPixels", valid.Get());
-    return true;
+    const Array<std::uint64_t> counts = valid.Get();
+    Write("ValidPixels", counts);
+    return !HasInput(kShareInput) || KeepCounts(counts);
+  }
+
+  /// True when a new raster has taken all pixels of the source out of the files that hold them.
+  static bool HoldsPixels(const BasicRaster& source, const BasicRaster& target) {
+    const auto* const files = dynamic_cast<const RowsSource*>(&source);
+    return files != nullptr && files->GetRows() == target.GetRasterDef().creation.rows;
+  }
+
+  static constexpr const char* kKey = "CopyRasterCommand";
+
+  /// Writes how many pixels of a part are valid.
+  bool KeepCounts(const Array<std::uint64_t>& counts) const {
+    Share share;
+    if (!ReadShare(Read<Array<unsigned>>(kShareInput), share)) return false;
+    ShareWriter out;
+    out.PutAll(counts.GetData(), counts.GetCount());
+    return out.Write(Read<String>(kShareFileInput).ToUTF8(), kKey, share);
+  }
+
+  /// Gives how many pixels of all parts are valid.
+  CommandResult TakeCounts(const Array<unsigned>& bands) {
+    const auto files = Read<Array<String>>(kShareFilesInput);
+    Array<std::uint64_t> sums(ArrayDims(bands.GetCount())), counts(sums);
+    std::fill(sums.begin(), sums.end(), 0);
+    for (unsigned i = 0; i < files.GetCount(); ++i) {
+      ShareReader in;
+      if (!in.Open(files[i].ToUTF8(), kKey, {i, files.GetCount()})) return Fail();
+      if (!in.GetAll(counts.GetData(), counts.GetCount()) || !in.IsAtEnd()) {
+        SetShareFault(files[i].ToUTF8());
+        return Fail();
+      }
+      for (unsigned band = 0; band < counts.GetCount(); ++band) sums[band] += counts[band];
+    }
+    Write("ValidPixels", sums);
+    return Succeed();
   }
 };
 

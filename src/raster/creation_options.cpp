@@ -234,6 +234,7 @@ std::string FindCreationMisfit(const RasterDef& def) {
   if (def.format == "ORVA" && def.creation.worldFile) return "the format ORVA takes no world file";
   CreationOptions ofTiff = def.creation;
   ofTiff.worldFile = false;
+  ofTiff.rows.reset();
   if (def.format != "TIFF" && !ofTiff.IsTold()) {
     return fmt::format(
         "compression, level, predictor, tiles, BigTIFF and COG are of TIFF files, and the format "

@@ -1,6 +1,7 @@
 #pragma once
 
 #include <functional>
+#include <memory>
 #include <optional>
 #include <span>
 #include <string>
@@ -11,6 +12,7 @@
 namespace lumo {
 
 struct RasterDef;
+struct RowsFiles;
 
 /// The codec that packs the blocks of a file. WebP loses nothing unless it is given a level; JPEG
 /// always does.
@@ -44,6 +46,9 @@ struct VEXG_EXPORT CreationOptions {
   FileLayout layout = FileLayout::kTold;
   OverviewMethod overviews = OverviewMethod::kTold;
   bool worldFile = false;  ///< the grid also lies in a text file beside the raster
+  /// Files whose packed blocks the new one is to take as they are; null for none. The description
+  /// of a raster that was made has them when it did, and so holds their pixels already.
+  std::shared_ptr<const RowsFiles> rows;
 
   /// True when nothing is asked for.
   bool IsTold() const;

@@ -9,10 +9,8 @@
 namespace lumo {
 namespace {
 
-TileDimensions AllBands(const BasicRaster& raster, unsigned width, unsigned height,
-                        unsigned border) {
-  return {
-      std::max(width, 1U), std::max(height, 1U), raster.Bands(), border, border, border, border, 0};
+TileDimensions AllBands(unsigned bands, unsigned width, unsigned height, unsigned border) {
+  return {std::max(width, 1U), std::max(height, 1U), bands, border, border, border, border, 0};
 }
 
 unsigned DividedBy(unsigned number, unsigned divisor) {
@@ -53,7 +51,7 @@ TileDimensions WideTiles(const BasicRaster* raster, std::size_t elementBytes, un
   if (raster == nullptr) return {};
   const auto units = static_cast<unsigned>(budget / elementBytes);
   const unsigned lines = DividedBy(DividedBy(units, raster->Bands()), raster->Samples());
-  return AllBands(*raster, raster->Samples(), lines, border);
+  return AllBands(raster->Bands(), raster->Samples(), lines, border);
 }
 
 TileDimensions SquareTiles(const BasicRaster* raster, std::size_t elementBytes, unsigned budget,
@@ -61,7 +59,7 @@ TileDimensions SquareTiles(const BasicRaster* raster, std::size_t elementBytes, 
   if (raster == nullptr) return {};
   const auto units = static_cast<unsigned>(budget / elementBytes);
   const auto side = static_cast<unsigned>(std::sqrt(DividedBy(units, raster->Bands())));
-  return AllBands(*raster, side, side, border);
+  return AllBands(raster->Bands(), side, side, border);
 }
 
 TileDimensions SmartTiles(const BasicRaster* raster, std::size_t elementBytes, unsigned budget,
@@ -73,12 +71,21 @@ TileDimensions SmartTiles(const BasicRaster* raster, std::size_t elementBytes, u
 
 TileDimensions StreamTiles(const BasicRaster* raster, std::size_t elementBytes, unsigned budget,
                            unsigned bands) {
-  if (raster == nullptr || raster->Samples() == 0 || raster->Lines() == 0) return {};
-  const RasterDef def = raster->GetRasterDef();
+  if (raster == nullptr) return {};
+  RasterDef def = raster->GetRasterDef();
+  def.samples = raster->Samples();
+  def.lines = raster->Lines();
+  def.bands = raster->Bands();
+  return StreamTiles(def, elementBytes, budget, bands);
+}
+
+TileDimensions StreamTiles(const RasterDef& def, std::size_t elementBytes, unsigned budget,
+                           unsigned bands) {
+  if (def.samples == 0 || def.lines == 0) return {};
   const std::uint64_t pixelBytes = std::max<std::uint64_t>(elementBytes * bands, 1);
   const std::uint64_t pixels = std::max<std::uint64_t>(budget / pixelBytes, 1);
-  const std::uint64_t samples = raster->Samples();
-  const std::uint64_t lines = raster->Lines();
+  const std::uint64_t samples = def.samples;
+  const std::uint64_t lines = def.lines;
 
   // A block of the source that is far over the budget is read in parts: there may be none better.
   constexpr std::uint64_t kMostOver = 16;
@@ -98,7 +105,7 @@ TileDimensions StreamTiles(const BasicRaster* raster, std::size_t elementBytes, 
   const std::uint64_t width = std::min(steps(pixels / stepY, stepX), samples);
   const std::uint64_t height =
       width < samples ? stepY : std::min(steps(pixels / samples, stepY), lines);
-  return AllBands(*raster, static_cast<unsigned>(width), static_cast<unsigned>(height), 0);
+  return AllBands(def.bands, static_cast<unsigned>(width), static_cast<unsigned>(height), 0);
 }
 
 Interleave StreamOrder(const BasicRaster* raster) {

@@ -33,6 +33,9 @@ VEXG_EXPORT TileDimensions SquareTiles(const BasicRaster* raster, std::size_t el
 /// @param bands  how many bands are read.
 VEXG_EXPORT TileDimensions StreamTiles(const BasicRaster* raster, std::size_t elementBytes,
                                        unsigned budget, unsigned bands);
+/// The same for a raster that is to be made.
+VEXG_EXPORT TileDimensions StreamTiles(const RasterDef& def, std::size_t elementBytes,
+                                       unsigned budget, unsigned bands);
 /// SquareTiles for a raster whose source is stored in true tiles, else WideTiles.
 VEXG_EXPORT TileDimensions SmartTiles(const BasicRaster* raster, std::size_t elementBytes,
                                       unsigned budget, unsigned border);

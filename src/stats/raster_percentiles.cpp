@@ -5,9 +5,13 @@
 #include <bit>
 #include <cmath>
 
+#include <fmt/format.h>
+
+#include "commands/share_file.h"
 #include "foundation/fault.h"
 #include "raster/block_strides.h"
 #include "raster/raster_iterator.h"
+#include "raster/raster_lines.h"
 #include "raster/tile_process.h"
 #include "stats/quantile_rank.h"
 #include "tasks/parallel.h"
@@ -75,6 +79,34 @@ class RankSearch {
       }
       Add(Ordered::Of(value));
     }
+  }
+
+  /// Writes the tables of a pass, without what is 0.
+  void Store(ShareWriter& out) const {
+    for (std::size_t first = 0; first < counts_.size(); first += kDigits) {
+      const std::uint64_t* const table = &counts_[first];
+      out.Put(kDigits - static_cast<std::size_t>(std::count(table, table + kDigits, 0U)));
+      for (std::uint32_t digit = 0; digit < kDigits; ++digit) {
+        if (table[digit] == 0) continue;
+        out.Put(digit);
+        out.Put(table[digit]);
+      }
+    }
+  }
+
+  /// Adds tables that were written. False when there are none.
+  bool Restore(ShareReader& in) {
+    for (std::size_t first = 0; first < counts_.size(); first += kDigits) {
+      std::size_t entries = 0;
+      if (!in.Get(entries)) return false;
+      for (std::size_t i = 0; i < entries; ++i) {
+        std::uint32_t digit = 0;
+        std::uint64_t count = 0;
+        if (!in.Get(digit) || !in.Get(count) || digit >= kDigits) return false;
+        counts_[first + digit] += count;
+      }
+    }
+    return true;
   }
 
   /// Finds the digit of each rank that is wanted.
@@ -163,10 +195,15 @@ class RankSearch {
 };
 
 /// Reads bands once, and counts each on one thread at a time.
+/// @param share  of the raster that is read; null for all of it.
 template <typename T>
 bool ReadPass(const RasterPtr<T>& raster, const Array<unsigned>& bands,
-              std::vector<RankSearch<T>>& searches, const IPC& ipc) {
-  const RasterIteratorPtr<T> iterator(new RasterIteratorStream<T>(raster, bands));
+              std::vector<RankSearch<T>>& searches, const IPC& ipc, const Share* share) {
+  const RasterIteratorStream<T> whole(raster, bands);
+  if (share != nullptr && RasterIteratorShare<T>::IsEmpty(whole, *share)) return true;
+  const RasterIteratorPtr<T> iterator(
+      share != nullptr ? static_cast<RasterIterator<T>*>(new RasterIteratorShare<T>(whole, *share))
+                       : new RasterIteratorStream<T>(raster, bands));
   TileProcess<> process("Percentiles", ipc);
   const auto slot = process.Read(iterator);
   process.Add("Percentiles", StageOrder::kOneByOne, [&](ArgList& token, const AbortFlag* abort) {
@@ -190,38 +227,123 @@ bool ReadPass(const RasterPtr<T>& raster, const Array<unsigned>& bands,
   return false;
 }
 
+/// The tables of passes that were done in shares, and of the one that is being done.
+class PassTables {
+ public:
+  /// @param passes  over the raster in all.
+  PassTables(const PercentileShares& shares, unsigned passes)
+      : shares_(shares),
+        passes_(passes),
+        parts_(shares.hasShare ? shares.share.count
+                               : static_cast<unsigned>(shares.files.size() / passes)),
+        done_(parts_ == 0 ? 0 : static_cast<unsigned>(shares.files.size() / parts_)) {}
+
+  /// Opens all files.
+  bool Open() {
+    const bool fits = shares_.files.size() == std::size_t{done_} * parts_ &&
+                      (shares_.hasShare ? done_ < passes_ : done_ == 0 || done_ == passes_);
+    if (!fits) {
+      SetFault("the files are not those of all shares of whole passes");
+      return false;
+    }
+    readers_.resize(shares_.files.size());
+    for (unsigned i = 0; i < readers_.size(); ++i) {
+      if (!readers_[i].Open(shares_.files[i], KeyOf(i / parts_), {i % parts_, parts_}))
+        return false;
+    }
+    return true;
+  }
+
+  bool Has(unsigned pass) const { return pass < done_; }
+  /// The pass behind the last that is wanted.
+  unsigned GetEnd() const { return shares_.hasShare ? done_ + 1 : passes_; }
+  ShareWriter& Out() { return out_; }
+
+  template <typename Search>
+  bool Restore(unsigned pass, std::vector<Search>& searches) {
+    for (std::size_t i = std::size_t{pass} * parts_; i < std::size_t{pass + 1} * parts_; ++i) {
+      for (Search& search : searches) {
+        if (search.Restore(readers_[i])) continue;
+        SetShareFault(shares_.files[i]);
+        return false;
+      }
+    }
+    return true;
+  }
+
+  /// Writes the file of the share; looks whether all of the others was taken.
+  bool Close() const {
+    for (std::size_t i = 0; i < readers_.size(); ++i) {
+      if (readers_[i].IsAtEnd()) continue;
+      SetShareFault(shares_.files[i]);
+      return false;
+    }
+    return !shares_.hasShare || out_.Write(shares_.file, KeyOf(done_), shares_.share);
+  }
+
+ private:
+  std::string KeyOf(unsigned pass) const { return fmt::format("{} pass {}", shares_.key, pass); }
+
+  const PercentileShares& shares_;
+  const unsigned passes_;
+  const unsigned parts_;
+  const unsigned done_;  // passes
+  std::vector<ShareReader> readers_;
+  ShareWriter out_;
+};
+
 }  // namespace
+
+unsigned PercentilePasses(unsigned dataType) {
+  unsigned passes = 1;
+  DispatchType(TenTypes{}, dataType, [&]<typename T>() {
+    passes = RankSearch<T>::kPasses;
+    return true;
+  });
+  return passes;
+}
 
 template <typename T>
 bool ComputePercentiles(const RasterPtr<T>& raster, const std::vector<unsigned>& bands,
                         const std::vector<double>& percents, const IPC& ipc,
-                        std::vector<double>& result) {
+                        std::vector<double>& result, const PercentileShares& shares) {
   using Search = RankSearch<T>;
   result.assign(bands.size() * percents.size(), std::nan(""));
-  const std::size_t tables = Search::kPasses == 1 ? 1 : 2 * percents.size();
-  const std::size_t tableBytes = tables * Search::kDigits * sizeof(std::uint64_t);
+  PassTables tables(shares, Search::kPasses);
+  if (!tables.Open()) return false;
+  const std::size_t tableCount = Search::kPasses == 1 ? 1 : 2 * percents.size();
+  const std::size_t tableBytes = tableCount * Search::kDigits * sizeof(std::uint64_t);
   const std::size_t atOnce = std::max<std::size_t>(1, kTableBudget / tableBytes);
   for (std::size_t first = 0; first < bands.size(); first += atOnce) {
     const std::size_t count = std::min(atOnce, bands.size() - first);
     Array<unsigned> group{ArrayDims(static_cast<unsigned>(count))};
     std::copy_n(bands.begin() + static_cast<std::ptrdiff_t>(first), count, group.begin());
     std::vector<Search> searches(count, Search(percents));
-    for (unsigned pass = 0; pass < Search::kPasses; ++pass) {
+    for (unsigned pass = 0; pass < tables.GetEnd(); ++pass) {
       for (Search& search : searches) search.BeginPass(pass);
-      if (!ReadPass(raster, group, searches, ipc)) return false;
-      for (Search& search : searches) search.EndPass();
+      if (tables.Has(pass)) {
+        if (!tables.Restore(pass, searches)) return false;
+      } else if (!ReadPass(raster, group, searches, ipc,
+                           shares.hasShare ? &shares.share : nullptr)) {
+        return false;
+      }
+      if (shares.hasShare && !tables.Has(pass)) {
+        for (const Search& search : searches) search.Store(tables.Out());
+      } else {
+        for (Search& search : searches) search.EndPass();
+      }
     }
-    for (std::size_t i = 0; i < count; ++i) {
+    for (std::size_t i = 0; !shares.hasShare && i < count; ++i) {
       searches[i].Write(&result[(first + i) * percents.size()]);
     }
   }
-  return true;
+  return tables.Close();
 }
 
 #define VEXG_PERCENTILES_ONE(T)                                                          \
   template bool ComputePercentiles<T>(const RasterPtr<T>&, const std::vector<unsigned>&, \
                                       const std::vector<double>&, const IPC&,            \
-                                      std::vector<double>&);
+                                      std::vector<double>&, const PercentileShares&);
 VEXG_FOR(TEN, VEXG_PERCENTILES_ONE);
 #undef VEXG_PERCENTILES_ONE
 

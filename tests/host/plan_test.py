@@ -11,7 +11,8 @@ import tempfile
 import time
 import unittest
 
-from support import DATA, VEXG, FolderTest, needs_data, run
+from field_scene import FieldScene
+from support import DATA, VEXG, FolderTest, gdal_pixels, needs_data, needs_gdal, run
 
 needs_make = unittest.skipUnless(shutil.which("make"), "no make")
 SCENE = DATA / "landsat7_u16_tiled.tif"
@@ -20,14 +21,22 @@ FLOATS = DATA / "landsat7_f32_strip.tif"
 # Outputs, and how they are made: @ stands for the output.
 JOBS = {
     "copy": ("o.tif", "copy", SCENE, "@", "--bands", "3,1"),
+    "bands": ("o.tif", "copy", SCENE, "@", "--tile", "64", "--interleave", "bsq", "--compress", "deflate"),
+    "strips": ("o.tif", "copy", FLOATS, "@", "--tile", "strip", "--no-data", "none"),
+    "levels": ("o.tif", "copy", SCENE, "@", "--cog", "--tile", "64", "--overviews", "mode"),
+    "masked": ("o.tif", "warp", SCENE, "@", "--to", "EPSG:4326", "--tile", "64"),
     "cog": ("o.tif", "copy", DATA / "RGB.byte.tif", "@", "--cog"),
     "flat": ("o.dat", "copy", DATA / "RGB.byte.tif", "@"),
     "calc": ("o.tif", "calc", "@", "N=(b3-b2)/(b3+b2);b0", SCENE),
     "calibrate": ("o.tif", "calibrate", "radiance", FLOATS, "@", "--gain", "2", "--offset", "1"),
     "warp": ("o.tif", "warp", SCENE, "@", "--to", "EPSG:4326", "--resampling", "cubic"),
     "mosaic": ("o.tif", "mosaic", "build", "@", DATA / "mosaic_a.tif", DATA / "mosaic_b.tif", DATA / "mosaic_c.tif"),
+    "matched": ("o.tif", "mosaic", "build", "@", DATA / "mosaic_a.tif", DATA / "mosaic_b.tif", DATA / "mosaic_c.tif",
+                "--match-by", "scenes", "--feather", "4", "--tile", "64"),
     "zonal": ("o.csv", "zonal", FLOATS, "ZONES", "-o", "@", "--stats", "mean,std,p10,median"),
     "shares": ("o.csv", "zonal", SCENE, "ZONES", "-o", "@", "--weights", "coverage"),
+    "polygons": ("o.fxv", "polygonize", "LABELS", "@"),
+    "areas": ("o.geojson", "polygonize", DATA / "dem_int16.tif", "@", "--min-size", "2"),
     "attributes": ("o", "attributes", FLOATS, "LABELS", "-o", "@", "--spectral", "--texture", "--shape"),
 }
 
@@ -92,7 +101,8 @@ class Parts(PlanTest):
         for each in documents:
             self.assertEqual(each["inputs"], [{"file": str(SCENE), "size": SCENE.stat().st_size,
                                                "time": SCENE.stat().st_mtime_ns}])
-            self.assertEqual((len(each["outputs"]), each["threads"]), (1, 1 + (each == documents[-1])))
+            is_merge = each == documents[-1]
+            self.assertEqual((len(each["outputs"]), each["threads"]), (1 if is_merge else 2, 2 if is_merge else 1))
             self.assertGreater(each["memory"], 1 << 26)
         for each in documents:  # they run in any place that runs documents
             self.fine("run", "-q", "-o", self.folder / "result.xml", place / each["document"])
@@ -108,13 +118,12 @@ class Parts(PlanTest):
 
     def test_work_that_cannot_be_divided_is_one_part_and_a_line_says_so(self):
         place = self.folder / "plan"
-        code, out, err = run("plan", "--parts", "4", "-o", str(place), "polygonize",
-                             str(DATA / "dem_int16.tif"), str(place / "o.fxv"))
+        code, out, err = run("plan", "--parts", "4", "-o", str(place), "segment", str(SCENE), str(place / "o.tif"))
         self.assertEqual((code, out), (0, ""))
-        self.assertRegex(err, r"\Avexg: note: PolygonizeCommand [^\n]+\n\Z")
+        self.assertRegex(err, r"\A(vexg: note: [^\n]+\n)+\Z")
         self.assertEqual([each["document"] for each in self.manifest(place)["documents"]], ["part-0000.xml"])
         self.fine("run", "--once", "-q", place / "part-0000.xml")
-        self.assertTrue((place / "o.fxv").exists())
+        self.assertTrue((place / "o.tif").exists())
 
     def test_what_a_document_would_lose_is_said_and_complex_numbers_stay_whole(self):
         code, _, err = run("plan", "--parts", "2", "-o", str(self.folder / "a"), "warp", str(SCENE),
@@ -159,6 +168,55 @@ class Parts(PlanTest):
                 ("there is no plan here", (self.folder, "--runner", "make"))):
             with self.subTest(words):
                 self.fails(2, words, "plan", *arguments)
+
+
+@needs_data
+@needs_gdal
+class Joining(PlanTest):
+    def test_packed_blocks_come_into_the_file_as_they_are(self):
+        place = self.plan("bands", "--parts", "3")
+        parts = [place / f"part-000{i}.tif" for i in range(3)]
+        for part in parts:
+            self.fine("run", "-q", place / part.with_suffix(".xml").name)
+        plain = sum(part.stat().st_size for part in parts)
+        for part in parts:  # of the same pixels, packed in another way
+            packed = part.with_name("packed.tif")
+            self.fine("copy", part, packed, "-q", "--tile", "64", "--interleave", "bsq", "--compress", "deflate",
+                      "--compress-level", "1", "--predictor", "2")
+            packed.rename(part)
+        other = sum(part.stat().st_size for part in parts)
+        self.fine("run", "-q", place / "merge.xml")
+        self.assertNotAlmostEqual(plain, other, delta=4000)
+        self.assertAlmostEqual((place / "o.tif").stat().st_size, other, delta=4000)
+        self.assertEqual(gdal_pixels(place / "o.tif"), gdal_pixels(self.single("bands")))
+
+    def test_files_packed_otherwise_are_joined_by_their_pixels(self):
+        place = self.plan("bands", "--parts", "3")
+        for i in range(3):
+            self.fine("run", "-q", place / f"part-000{i}.xml")
+        self.fine("copy", place / "part-0001.tif", place / "other.tif", "-q", "--tile", "128")
+        (place / "other.tif").rename(place / "part-0001.tif")
+        self.fine("run", "-q", place / "merge.xml")
+        self.assert_same(place / "o.tif", self.single("bands"))
+
+    def test_a_vrt_file_shows_the_files_of_the_parts_and_moves_with_them(self):
+        for name, parts in (("masked", 3), ("calc", 4), ("cog", 2)):
+            with self.subTest(name):
+                place = self.plan(name, "--join", "vrt", "--parts", str(parts))
+                for each in self.manifest(place)["documents"]:
+                    self.fine("run", "--once", "-q", place / each["document"])
+                self.assertFalse((place / "o.tif").exists())
+                moved = self.folder / f"{name}.moved"
+                place.rename(moved)
+                text = (moved / "o.vrt").read_text()
+                self.assertIn('<SourceFilename relativeToVRT="1">part-0001.tif</SourceFilename>', text)
+                single = self.single(name)
+                self.assertEqual(gdal_pixels(moved / "o.vrt"), gdal_pixels(single))
+                self.assertEqual(*([[band[item] for item in ("count", "min", "max")] for band in
+                                    json.loads(self.fine("stats", file, "--json"))["bands"]]
+                                   for file in (moved / "o.vrt", single)))  # as their masks say
+        self.fails(2, "--join vrt: no raster of the job is written by lines", "plan", "-o", self.folder / "none",
+                   "--parts", "2", "--join", "vrt", "stats", SCENE)
 
 
 @needs_data
@@ -239,6 +297,7 @@ class Sums(PlanTest):
     def test_statistics_and_histograms_have_all_digits_of_the_single_run(self):
         for parts, arguments in ((3, ("stats", FLOATS)), (5, ("stats", FLOATS, "--extended", "--bands", "2,0")),
                                  (4, ("stats", SCENE, "--extended")), (4, ("hist", FLOATS)), (40, ("hist", SCENE)),
+                                 (3, ("stats", FLOATS, "--percentiles", "2,50,98.5")), (4, ("stats", SCENE, "--percentiles", "50")),
                                  (3, ("stats", DATA / "all-nodata.tif"))):
             with self.subTest(parts=parts, arguments=arguments):
                 place = self.folder / "plan"
@@ -307,6 +366,38 @@ class Make(PlanTest):
         self.assertEqual(changed, [gone.name])
 
 
+@needs_gdal
+class Classes(FieldScene):
+    def test_a_map_of_classes_and_its_scores_come_by_regions(self):
+        self.fine("segment", self.folder / "scene.tif", self.folder / "segments.tif", "--merge-percent", 70, "-q")
+        self.fine("attributes", self.folder / "scene.tif", self.folder / "segments.tif", "-o", self.folder / "fields",
+                  "--spectral", "--shape", "-q")
+        rules = {"classes": [{"name": "water"}, {"name": "other"}],
+                 "rules": [{"class": "water", "tests": [{"attribute": "mean_b2", "atMost": 50}]},
+                           {"class": "other", "tests": [{"attribute": "mean_b2", "atLeast": 40, "membership": "linear",
+                                                         "tolerance": 10}]}]}
+        (self.folder / "rules.json").write_text(json.dumps(rules))
+        training = ("--training", self.folder / "train.geojson", "--class-field", "cover")
+        for name, options in (("knn", training), ("pca", (*training, "--method", "pca")),
+                              ("rules", ("--rules", self.folder / "rules.json"))):
+            with self.subTest(name):
+                place = self.folder / name
+                words = ("classify", self.folder / "segments.tif", place / "map.tif", "--attributes",
+                         self.folder / "fields", *options)
+                self.fine("plan", "-q", "-o", place, "--parts", "3", *words)
+                documents = [each["document"] for each in json.loads((place / "manifest.json").read_text())["documents"]]
+                self.assertEqual(documents, ["part-0000.xml", "part-0001.xml", "part-0002.xml", "merge.xml"])
+                for document in documents:
+                    self.fine("run", "--once", "-q", place / document)
+                made = {path.name: path.read_bytes() for path in place.glob("map.tif*")}
+                for path in place.glob("map.tif*"):
+                    path.unlink()
+                job = self.folder / "job.xml"
+                job.write_text(self.fine(*words, "--print-job"))
+                self.fine("run", "-q", "-o", self.folder / "result.xml", job)
+                self.assertEqual({path.name: path.read_bytes() for path in place.glob("map.tif*")}, made)
+
+
 @needs_data
 class Runners(PlanTest):
     def test_each_engine_gets_its_form(self):
@@ -334,10 +425,10 @@ class Runners(PlanTest):
                                capture_output=True, env={**os.environ, "PATH": f"{programs}:{os.environ['PATH']}",
                                                          "LOG": str(log), "VEXG": str(VEXG)})
         self.assertEqual((ended.returncode, ended.stdout, ended.stderr), (0, "101\n", ""))
-        first, parts, merge = log.read_text().splitlines()
+        first, scenes, gather, parts, merge = log.read_text().splitlines()
         self.assertNotIn("--dependency", first)
-        self.assertIn("--dependency=afterok:101 --array=1-3", parts)
-        self.assertIn("--dependency=afterok:103 --array=1-1", merge)
+        for after, count, stage in ((101, 3, scenes), (103, 1, gather), (101, 3, parts), (103, 1, merge)):
+            self.assertIn(f"--dependency=afterok:{after} --array=1-{count}", stage)
         self.assert_same(place / "o.tif", self.single("mosaic"))
 
 

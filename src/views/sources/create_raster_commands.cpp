@@ -3,6 +3,7 @@
 #include "data/open_sources.h"
 #include "foundation/fault.h"
 #include "raster/raster_details.h"
+#include "raster/rows_files.h"
 #include "views/sources/raster_def_command.h"
 #include "views/sources/temp_raster.h"
 
@@ -31,6 +32,10 @@ const CommandDeclaration kCreate{
           "such as units, scales and further items; All: also the place, as control "
           "points",
           "", &WordsIn<KeptDetails>},
+         {"RowsURI", Presence::kOptional, ValueKind::kURI,
+          "a raster of CreateJoinedRowsRasterCommand that is to be copied into the new one: that "
+          "takes the packed blocks of its files as they are where it packs alike, or is a VRT file "
+          "on them, and the copy has nothing left to do"},
          {"Categories", Presence::kOptional, ValueKind::kTextList,
           "names of the values of the first band, from 0 on"}})),
     PublishedOutputs()};
@@ -41,6 +46,12 @@ class CreateRasterCommand final : public RasterDefCommand {
     if (!CheckInputs() || !ReadRasterDef(def) || !ReadCreation(def)) return Fail();
     KeepDetails(def.metadata, Read<KeptDetails>("Details"));
     if (HasInput("Categories")) SetCategories(def.metadata, 0, Read<Array<String>>("Categories"));
+    if (HasInput("RowsURI")) {
+      const BasicRasterPtr rows = FindRaster("RowsURI");
+      const auto* const files = dynamic_cast<const RowsSource*>(rows.Get());
+      if (files == nullptr) return Fail("RowsURI: is no raster of files that hold its lines");
+      def.creation.rows = files->GetRows();
+    }
     const auto connStrings = Read<Array<String>>("ConnStr");
     const SourceClaim claim(connStrings);
     if (!claim.IsGranted()) {

@@ -64,7 +64,9 @@ std::string FileAmong(const std::vector<std::string>& pieces) {
   return pieces.empty() ? std::string() : pieces.back();
 }
 
+/// True for a command that makes its files where they will be.
 bool IsFirst(const JobCommand& command) {
+  if (command.Find(kShareInput) != nullptr) return false;
   const DivisionDeclaration* const division = FindDivision(String(command.id));
   return division != nullptr && division->kind == DivisionKind::kFirst;
 }
@@ -125,6 +127,12 @@ JobCommands JobCommands::WithoutCommands() const {
   return empty;
 }
 
+void JobCommands::AddCloses(const std::vector<std::string>& variables) {
+  for (auto raster = variables.rbegin(); raster != variables.rend(); ++raster) {
+    commands.push_back({"close." + raster->substr(1), "CloseRasterCommand", {{"URI", *raster}}});
+  }
+}
+
 std::string JobCommands::Write() const {
   XMLDocumentRoot root;
   root.name = "Job";
@@ -153,6 +161,20 @@ std::string JobCommands::Write() const {
     }
   }
   return XMLSimpleWriter().Write(root).ToUTF8();
+}
+
+std::string NumberArray(const std::vector<unsigned>& numbers) {
+  std::string text = fmt::format("1:{} [", numbers.size());
+  for (std::size_t i = 0; i < numbers.size(); ++i) {
+    text += fmt::format("{}{}", i == 0 ? "" : " ", numbers[i]);
+  }
+  return text + "] ";
+}
+
+std::string JoinedByBars(const std::vector<std::string>& texts) {
+  std::string joined;
+  for (const std::string& text : texts) joined += (joined.empty() ? "" : "|") + text;
+  return joined;
 }
 
 std::vector<std::string> PiecesOf(const std::string& value) {

@@ -51,11 +51,19 @@ class JobCommands {
   /// get names.
   std::string Write() const;
 
+  /// Adds the closing of rasters, the last one first.
+  /// @param variables  that have their URIs.
+  void AddCloses(const std::vector<std::string>& variables);
+
   std::vector<JobCommand> commands{};
 
  private:
   std::string checks_;  // empty: the document says nothing of them
 };
+
+/// Numbers, and texts, as inputs of a command have them.
+std::string NumberArray(const std::vector<unsigned>& numbers);
+std::string JoinedByBars(const std::vector<std::string>& texts);
 
 /// The pieces of the value of an input that may name files.
 std::vector<std::string> PiecesOf(const std::string& value);

@@ -9,9 +9,9 @@
 #include <fmt/format.h>
 
 #include "commands/division.h"
+#include "plan/first_jobs.h"
+#include "plan/job_measure.h"
 #include "plan/job_slices.h"
-#include "platform/temporary_file.h"
-#include "raster/creation_options.h"
 #include "raster/pixel_types.h"
 #include "rasters/raster_source.h"
 #include "verb.h"
@@ -20,56 +20,16 @@ namespace lumo::host {
 namespace {
 
 constexpr const char* kCreate = "CreateRasterCommand";
-constexpr const char* kClose = "CloseRasterCommand";
 
 /// A command that is divided.
 struct Cut {
   std::size_t at;  ///< in the job
   const DivisionDeclaration* division;
   unsigned level = 1;              ///< 1: it needs nothing of other divided commands
+  unsigned rounds = 1;             ///< of shares
   std::size_t create = 0;          ///< of kRows: the command that makes the target
   RasterInfo source{};             ///< the raster that is read
   std::vector<unsigned> firsts{};  ///< of kRows: the first line of each part, and behind the last
-};
-
-std::string NumberArray(const std::vector<unsigned>& numbers) {
-  std::string text = fmt::format("1:{} [", numbers.size());
-  for (std::size_t i = 0; i < numbers.size(); ++i) {
-    text += fmt::format("{}{}", i == 0 ? "" : " ", numbers[i]);
-  }
-  return text + "] ";
-}
-
-std::string JoinedByBars(const std::vector<std::string>& texts) {
-  std::string joined;
-  for (const std::string& text : texts) joined += (joined.empty() ? "" : "|") + text;
-  return joined;
-}
-
-/// Files in a folder of their own in the place of those that a job makes, while it is measured.
-class Scratch {
- public:
-  explicit Scratch(const std::vector<std::string>& files) {
-    namespace fs = std::filesystem;
-    if (files.empty()) return;
-    folder_ = platform::TemporaryFolderBeside((fs::temp_directory_path() / "vexg-plan").string());
-    fs::create_directory(folder_);
-    for (const std::string& file : files) {
-      names_[file] = (fs::path(folder_) / fs::path(file).filename()).string();
-    }
-  }
-  ~Scratch() {
-    std::error_code ignored;
-    if (!folder_.empty()) std::filesystem::remove_all(folder_, ignored);
-  }
-  Scratch(const Scratch&) = delete;
-  Scratch& operator=(const Scratch&) = delete;
-
-  void Rename(JobCommand& command) const { RenameFiles(names_, command); }
-
- private:
-  std::string folder_;
-  std::map<std::string, std::string> names_;
 };
 
 class Cutter {
@@ -81,9 +41,11 @@ class Cutter {
     FindCuts();
     for (Cut& cut : cuts_) Measure(cut);
     DropOddTypes();
+    CheckJoin();
     ChoosePlaces();
     CutJobs made;
-    AddFirst(made);
+    AddFirstJobs(job_, slices_, request_, parts_, MemoryFor({}, false), made);
+    firstJobs_ = made.jobs.size();
     if (cuts_.empty()) {
       AddWhole(made);
     } else {
@@ -115,7 +77,8 @@ class Cutter {
         if (why.empty()) cuts_.push_back(cut);
       }
       const bool isWork =
-          division->kind != DivisionKind::kNone || !FindFiles({At(at)}).made.empty();
+          division->kind != DivisionKind::kEach &&
+          (division->kind != DivisionKind::kNone || !FindFiles({At(at)}).made.empty());
       if (!why.empty() && isWork && At(at).id != kCreate) {
         notes_.push_back(
             fmt::format("{} ({}): {}; one document does all of it", At(at).id, At(at).name, why));
@@ -130,9 +93,14 @@ class Cutter {
     const std::string* const form = when.empty() ? nullptr : command.Find(when);
     if (!when.empty() && (form == nullptr || *form != "Exact")) return when + " is not Exact";
     const std::string* const source = command.Find(cut.division->source);
-    if (source == nullptr || !source->starts_with('$')) return "its source is open before the job";
+    if (HasSource(cut) && (source == nullptr || !source->starts_with('$'))) {
+      return "its source is open before the job";
+    }
     for (const std::size_t at : slices_.SliceOf(command, cut.at)) {
-      if (const Cut* const before = FindCut(at)) cut.level = std::max(cut.level, before->level + 1);
+      if (const Cut* const before = FindCut(at)) {
+        const unsigned rounds = before->division->rounds != nullptr ? kMostRounds : 1;
+        cut.level = std::max(cut.level, before->level + rounds);
+      }
       if (slices_.ReadsWhatIsMade(at)) return "it works on files that the job makes";
     }
     if (slices_.ReadsWhatIsMade(cut.at)) return "it works on files that the job makes";
@@ -153,36 +121,14 @@ class Cutter {
   // Measuring.
 
   /// Asks the source of a cut for its size.
-  void Measure(Cut& cut) {
-    RasterJobOptions options;
-    JobSession session(options);
-    JobDraft draft;
-    const std::string variable = *At(cut.at).Find(cut.division->source);
-    std::vector<std::string> opened;
-    // The commands that come first have not run yet: those that make the files which are opened
-    // run aside.
-    const Scratch scratch(FirstFiles());
-    std::set<std::size_t> steps;
-    for (std::size_t at = 0; at < firstEnd_; ++at) {
-      if (!FindFiles({At(at)}).inPlace.empty()) steps.insert(at);
-    }
-    for (const std::size_t at : slices_.SliceFor({variable}, cut.at)) {
-      if (!slices_.IsFirst(at)) steps.insert(at);
-    }
-    for (const std::size_t at : steps) {
-      JobCommand command = At(at);
-      scratch.Rename(command);
-      AddTo(draft, command);
-      for (const JobOutput& output : command.outputs) {
-        if (IsRaster(output)) opened.push_back(output.variable);
-      }
-    }
-    AddQuery(draft, "measured", String(variable));
-    for (auto raster = opened.rbegin(); raster != opened.rend(); ++raster) {
-      draft.Close("close." + raster->substr(1), String(*raster));
-    }
-    cut.source = ReadInfo(session.Run(draft), "measured");
+  void Measure(Cut& cut) const {
+    if (!HasSource(cut)) return;
+    cut.source = MeasureRaster(job_, slices_, *At(cut.at).Find(cut.division->source), cut.at);
+    if (cut.division->rounds != nullptr) cut.rounds = cut.division->rounds(cut.source.dataType);
   }
+
+  /// False for work on files alone.
+  static bool HasSource(const Cut& cut) { return *cut.division->source != '\0'; }
 
   /// Leaves whole what there are no views on, and questions what the single run of a verb looks at
   /// and a document doesn't.
@@ -204,7 +150,9 @@ class Cutter {
       const bool hasNoData = At(cut.create).Find("NoDataValue") != nullptr ||
                              std::all_of(cut.source.hasNoData.begin(), cut.source.hasNoData.end(),
                                          [](bool has) { return has; });
-      if (format == nullptr || *format != "ORVA" || hasNoData) continue;
+      if (format == nullptr || *format != "ORVA" || hasNoData || request_.join == Join::kVrt) {
+        continue;
+      }
       notes_.emplace_back(
           "the format ORVA keeps which pixels are valid by a no-data value alone; a verb chooses "
           "one "
@@ -212,26 +160,14 @@ class Cutter {
     }
   }
 
-  static bool IsRaster(const JobOutput& output) { return output.name.ends_with("URI"); }
-
-  static void AddTo(JobDraft& draft, const JobCommand& command) {
-    JobWriterCommand& step = draft.Step(command.name, command.id.c_str());
-    for (const JobInput& input : command.inputs) {
-      if (input.isExpanded) {
-        step.AddExpandedInput(String(input.name), String(input.value));
-      } else {
-        step.AddInput(String(input.name), String(input.value));
-      }
-    }
-    for (const JobOutput& output : command.outputs) {
-      step.AddOutput(String(output.name), String(output.variable));
-    }
-  }
-
-  std::vector<std::string> FirstFiles() const {
-    const std::vector<JobCommand> first(
-        job_.commands.begin(), job_.commands.begin() + static_cast<std::ptrdiff_t>(firstEnd_));
-    return FindFiles(first).inPlace;
+  /// Refuses a VRT file where there are no lines for one.
+  void CheckJoin() const {
+    if (request_.join == Join::kFile) return;
+    const bool canJoin = std::any_of(cuts_.begin(), cuts_.end(), [this](const Cut& cut) {
+      return cut.division->kind == DivisionKind::kRows && IsTaken(cut);
+    });
+    if (canJoin) return;
+    throw HostError(kExitUsage, "--join vrt: no raster of the job is written by lines");
   }
 
   // Choosing the places where it is cut.
@@ -242,9 +178,20 @@ class Cutter {
            DataTypeBytes(cut.source.dataType);
   }
 
-  /// The lines at which cuts lie: those of the tiles of usual files, where there are enough.
-  static unsigned UnitOf(const Cut& cut, std::uint64_t parts) {
-    for (const unsigned unit : {512U, 64U, 16U}) {
+  RowParts RowsOf(const Cut& cut) const {
+    return {At(cut.create),       At(cut.at), cut.division->source,
+            cut.division->target, cut.source, request_.join};
+  }
+
+  /// The lines at which cuts lie: those of the blocks of the file that is written, and of the tiles
+  /// of usual files, where there are enough.
+  unsigned UnitOf(const Cut& cut, std::uint64_t parts) const {
+    const unsigned block = BlockLinesOf(RowsOf(cut));
+    for (const unsigned lines : {512U, 64U, 16U, 1U}) {
+      const unsigned unit = block != 0 ? (lines + block - 1) / block * block : lines;
+      if (cut.source.lines / unit >= parts) return unit;
+    }
+    for (const unsigned unit : {64U, 16U}) {
       if (cut.source.lines / unit >= parts) return unit;
     }
     return 1;
@@ -256,7 +203,7 @@ class Cutter {
     std::uint64_t parts = request_.parts;
     if (parts == 0) parts = (bytes + request_.partMemory - 1) / request_.partMemory;
     for (const Cut& cut : cuts_) {
-      parts = std::min<std::uint64_t>(parts, std::max(cut.source.lines, 1U));
+      if (HasSource(cut)) parts = std::min<std::uint64_t>(parts, std::max(cut.source.lines, 1U));
     }
     if (parts > kMostParts) {
       throw HostError(kExitUsage, fmt::format("{} parts are more than {}; make larger ones", parts,
@@ -297,36 +244,12 @@ class Cutter {
     return (std::filesystem::path(request_.folder) / (name + ending)).string();
   }
 
-  /// Adds what has to be there before the parts begin.
-  void AddFirst(CutJobs& made) {
-    if (firstEnd_ == 0) return;
-    CutJob first{"prepare", {}, job_.WithoutCommands()};
-    std::vector<std::string> opened;
-    for (std::size_t at = 0; at < firstEnd_; ++at) {
-      if (At(at).id == kCreate) continue;
-      first.job.commands.push_back(At(at));
-      for (const JobOutput& output : At(at).outputs) {
-        if (IsRaster(output)) opened.push_back(output.variable);
-      }
-    }
-    AddCloses(opened, first.job);
-    first.memory = MemoryFor({}, false);
-    first.threads = request_.threads;
-    made.jobs.push_back(std::move(first));
-  }
-
-  static void AddCloses(const std::vector<std::string>& opened, JobCommands& job) {
-    for (auto raster = opened.rbegin(); raster != opened.rend(); ++raster) {
-      job.commands.push_back({"close." + raster->substr(1), kClose, {{"URI", *raster}}});
-    }
-  }
-
   void AddWhole(CutJobs& made) {
     CutJob whole{"part-0000", {}, job_.WithoutCommands()};
     for (std::size_t at = 0; at < job_.commands.size(); ++at) {
       if (!slices_.IsFirst(at)) whole.job.commands.push_back(At(at));
     }
-    if (firstEnd_ != 0) whole.dependsOn.push_back(0);
+    if (firstJobs_ != 0) whole.dependsOn.push_back(firstJobs_ - 1);
     whole.memory = MemoryFor({}, false);
     whole.threads = request_.threads;
     if (notes_.empty()) notes_.push_back("no command of the job can be divided: it is one part");
@@ -339,12 +262,16 @@ class Cutter {
 
   void AddParts(CutJobs& made) {
     unsigned last = 0;
-    for (const Cut& cut : cuts_) last = std::max(last, cut.level);
+    for (const Cut& cut : cuts_) last = std::max(last, cut.level + cut.rounds - 1);
     unsigned number = 0;
     std::vector<std::size_t> before;
-    if (firstEnd_ != 0) before.push_back(0);
+    if (firstJobs_ != 0) before.push_back(firstJobs_ - 1);
     files_.resize(cuts_.size());
+    counts_.resize(cuts_.size());
     for (unsigned level = 1; level <= last; ++level) {
+      const bool hasWork = std::any_of(cuts_.begin(), cuts_.end(),
+                                       [&](const Cut& cut) { return IsOfLevel(cut, level); });
+      if (!hasWork) continue;
       std::vector<std::size_t> ofLevel;
       for (unsigned part = 0; part < parts_; ++part) {
         ofLevel.push_back(made.jobs.size());
@@ -355,35 +282,49 @@ class Cutter {
     }
   }
 
+  static bool IsOfLevel(const Cut& cut, unsigned level) {
+    return cut.level <= level && level < cut.level + cut.rounds;
+  }
+
   CutJob MakePart(const std::string& name, unsigned level, unsigned part) {
     CutJob made{name, {}, job_.WithoutCommands()};
     std::set<std::size_t> steps;
     std::vector<const Cut*> ofLevel;
     for (const Cut& cut : cuts_) {
-      if (cut.level != level) continue;
+      if (!IsOfLevel(cut, level)) continue;
       ofLevel.push_back(&cut);
       for (const std::size_t at : slices_.SliceOf(At(cut.at), cut.at)) {
         if (!slices_.IsFirst(at)) steps.insert(at);
       }
     }
     std::vector<std::string> opened;
+    std::map<std::string, std::string> names;  // of files that each part makes for itself
     for (const std::size_t at : steps) {
       made.job.commands.push_back(AsDone(at));
+      for (const std::string& file : FindFiles({At(at)}).made) {
+        const std::string own =
+            fmt::format("{}.{}", name, std::filesystem::path(file).filename().string());
+        names[file] = (std::filesystem::path(request_.folder) / own).string();
+      }
       for (const JobOutput& output : At(at).outputs) {
-        if (IsRaster(output)) opened.push_back(output.variable);
+        if (NamesRaster(output)) opened.push_back(output.variable);
       }
     }
     for (const Cut* const cut : ofLevel) {
       const auto number = static_cast<std::size_t>(cut - cuts_.data());
       if (cut->division->kind == DivisionKind::kRows) {
         files_[number].push_back(FileOfPart(name, number, ".tif"));
-        AddRows(*cut, part, files_[number].back(), made.job);
+        counts_[number].push_back(IsTaken(*cut) ? FileOfPart(name, number, ".share") : "");
+        AddRows(RowsOf(*cut), cut->firsts[part], cut->firsts[part + 1], files_[number].back(),
+                counts_[number].back(), {part, parts_}, made.job);
       } else {
-        files_[number].push_back(FileOfPart(name, number, ".share"));
-        AddShare(*cut, part, files_[number].back(), made.job);
+        const std::string file = FileOfPart(name, number, ".share");
+        AddShare(*cut, level - cut->level, part, file, made.job);
+        files_[number].push_back(file);
       }
     }
-    AddCloses(opened, made.job);
+    made.job.AddCloses(opened);
+    for (JobCommand& command : made.job.commands) RenameFiles(names, command);
     made.memory = MemoryFor(ofLevel, false);
     made.threads = request_.threads;
     return made;
@@ -399,46 +340,13 @@ class Cutter {
     return command;
   }
 
-  /// Adds the making of some lines, in a file of their own that loses nothing.
-  void AddRows(const Cut& cut, unsigned part, const std::string& file, JobCommands& job) const {
-    const unsigned first = cut.firsts[part], end = cut.firsts[part + 1];
-    const std::string tag = At(cut.at).name;
-    const std::string rows = "$" + tag + ".rows", target = "$" + tag + ".part";
-    JobCommand subset{tag + ".rows", "CreateSpatialSubsetRasterCommand"};
-    subset.Set("SrcURI", *At(cut.at).Find(cut.division->source));
-    subset.Set("SubRect", fmt::format("0 {} {} {}", first, cut.source.samples - 1, end - 1));
-    subset.Set("Placing", "Exact");
-    subset.outputs.push_back({"URI", rows});
-    job.commands.push_back(subset);
-
-    JobCommand create = At(cut.create);
-    create.name = tag + ".part";
-    create.outputs = {{"URI", target}};
-    for (const CreationValue& value : CreationValues()) create.Remove(value.input);
-    for (const char* const input : {"Interleave", "Categories", "Samples", "Lines", "GeoRef"}) {
-      create.Remove(input);
-    }
-    create.Set("ConnStr", file);
-    create.Set("SrcURI", rows);
-    create.Set("Format", "TIFF");
-    create.Set("Compress", "ZSTD");
-    create.Set("Level", "1");
-    create.Set("Predictor", "Auto");
-    create.Set("Tile", "512");
-    create.Set("BigTIFF", "Auto");
-    job.commands.push_back(create);
-
-    JobCommand copy = At(cut.at);
-    copy.outputs.clear();
-    copy.Set(cut.division->source, rows);
-    copy.Set(cut.division->target, target);
-    job.commands.push_back(copy);
-    AddCloses({rows, target}, job);
-  }
-
-  void AddShare(const Cut& cut, unsigned part, const std::string& file, JobCommands& job) {
+  void AddShare(const Cut& cut, unsigned round, unsigned part, const std::string& file,
+                JobCommands& job) const {
     JobCommand share = At(cut.at);
     share.outputs.clear();
+    const auto number = static_cast<std::size_t>(&cut - cuts_.data());
+    const auto end = files_[number].begin() + static_cast<std::ptrdiff_t>(round * parts_);
+    if (round != 0) share.Set(kShareFilesInput, JoinedByBars({files_[number].begin(), end}));
     share.Set(kShareInput, NumberArray({part, parts_}));
     share.Set(kShareFileInput, file);
     job.commands.push_back(share);
@@ -447,53 +355,74 @@ class Cutter {
   /// Adds the job itself, whose divided commands take what the parts have made.
   void AddMerge(CutJobs& made) {
     CutJob merge{"merge", {}, job_.WithoutCommands()};
-    std::vector<const Cut*> all;
-    for (std::size_t at = 0; at < job_.commands.size(); ++at) {
-      if (slices_.IsFirst(at)) continue;
-      const Cut* const cut = FindCut(at);
-      if (cut != nullptr && cut->division->kind == DivisionKind::kRows) {
-        AddJoin(*cut, merge.job);
-      } else {
-        merge.job.commands.push_back(AsDone(at));
+    std::map<std::size_t, std::vector<JobCommand>> joins;  // in the place of commands
+    std::map<std::string, std::string> names;              // of files that are made
+    for (const Cut& cut : cuts_) {
+      if (cut.division->kind != DivisionKind::kRows) continue;
+      JoinedRows joined = JoinOf(cut);
+      joins[cut.create] = std::move(joined.create);
+      joins[cut.at] = std::move(joined.copy);
+      for (const std::string& file : FindFiles({At(cut.create)}).made) {
+        names[file] = FileOfJoin(file, request_.join);
       }
     }
+    for (std::size_t at = 0; at < job_.commands.size(); ++at) {
+      if (slices_.IsFirst(at)) continue;
+      const auto join = joins.find(at);
+      if (join == joins.end()) {
+        merge.job.commands.push_back(AsDone(at));
+        RenameFiles(names, merge.job.commands.back());
+      } else {
+        merge.job.commands.insert(merge.job.commands.end(), join->second.begin(),
+                                  join->second.end());
+      }
+    }
+    std::vector<const Cut*> all;
     for (const Cut& cut : cuts_) all.push_back(&cut);
     merge.memory = MemoryFor(all, true);
     merge.threads = 2 * request_.threads;  // it runs alone
-    for (std::size_t part = firstEnd_ != 0 ? 1 : 0; part < made.jobs.size(); ++part) {
+    for (std::size_t part = firstJobs_; part < made.jobs.size(); ++part) {
       merge.dependsOn.push_back(part);
     }
     made.jobs.push_back(std::move(merge));
   }
 
-  void AddJoin(const Cut& cut, JobCommands& job) {
+  JoinedRows JoinOf(const Cut& cut) const {
     const auto number = static_cast<std::size_t>(&cut - cuts_.data());
-    const std::string joined = "$" + At(cut.at).name + ".joined";
     std::vector<unsigned> lines;
     for (unsigned part = 0; part < parts_; ++part) {
       lines.push_back(cut.firsts[part + 1] - cut.firsts[part]);
     }
-    JobCommand join{At(cut.at).name + ".joined", "CreateJoinedRowsRasterCommand"};
-    join.Set("SrcURI", *At(cut.at).Find(cut.division->source));
-    join.Set("Files", JoinedByBars(files_[number]));
-    join.Set("Lines", NumberArray(lines));
-    join.outputs.push_back({"URI", joined});
-    job.commands.push_back(join);
-    JobCommand copy = At(cut.at);
-    copy.Set(cut.division->source, joined);
-    job.commands.push_back(copy);
-    AddCloses({joined}, job);
+    return JoinRows(RowsOf(cut), lines, files_[number],
+                    IsTaken(cut) ? counts_[number] : std::vector<std::string>(), IsTaken(cut));
+  }
+
+  /// True when the file that is made takes the pixels out of those of the parts as they are: then
+  /// the raster that is read has to be open before it.
+  bool IsTaken(const Cut& cut) const {
+    const RowParts rows = RowsOf(cut);
+    if (rows.join == Join::kFile && BlockLinesOf(rows) == 0) return false;
+    const std::string& source = *rows.copy.Find(rows.source);
+    return std::any_of(
+        job_.commands.begin(), job_.commands.begin() + static_cast<std::ptrdiff_t>(cut.create),
+        [&](const JobCommand& command) {
+          return std::any_of(command.outputs.begin(), command.outputs.end(),
+                             [&](const JobOutput& output) { return output.variable == source; });
+        });
   }
 
   static constexpr std::uint64_t kMostParts = 10000;  // of four digits
+  static constexpr unsigned kMostRounds = 4;
 
   const JobCommands& job_;
   const CutRequest& request_;
   const JobSlices slices_;
   const std::size_t firstEnd_;  // commands before it are done before all others
+  std::size_t firstJobs_ = 0;   // that do these
   std::vector<Cut> cuts_;
   unsigned parts_ = 1;
-  std::vector<std::vector<std::string>> files_;  // by cut: those of its parts
+  std::vector<std::vector<std::string>> files_;   // by cut: those of its parts
+  std::vector<std::vector<std::string>> counts_;  // of kRows: of valid pixels
   std::vector<std::string> notes_;
 };
 

@@ -5,6 +5,7 @@
 #include <vector>
 
 #include "plan/job_commands.h"
+#include "plan/row_parts.h"
 
 namespace lumo::host {
 
@@ -14,6 +15,7 @@ struct CutRequest {
   std::uint64_t partMemory = 0;  ///< bytes of the pixels of a part
   unsigned threads = 1;          ///< of each worker
   std::string folder;            ///< of the plan, absolute; what parts make goes there
+  Join join = Join::kFile;       ///< of the lines of rasters
 };
 
 /// One job of several into which one was cut.

@@ -5,6 +5,23 @@
 
 namespace lumo::host {
 
+namespace {
+
+/// True for a command that every part does for itself.
+bool IsForEach(const JobCommand& command) {
+  const DivisionDeclaration* const division = FindDivision(String(command.id));
+  return division != nullptr && division->kind == DivisionKind::kEach;
+}
+
+/// Adds what may be names of files in the inputs of a command.
+void AddPieces(const JobCommand& command, std::set<std::string>& pieces) {
+  for (const JobInput& input : command.inputs) {
+    for (const std::string& piece : PiecesOf(input.value)) pieces.insert(piece);
+  }
+}
+
+}  // namespace
+
 bool OnlyTells(const std::string& id) {
   const std::initializer_list<const char*> kBeginnings{"Get",   "Query", "ExtendedQuery",
                                                        "Check", "Fit",   "Compare"};
@@ -28,11 +45,15 @@ bool JobSlices::IsFirst(std::size_t at) const {
   return division != nullptr && division->kind == DivisionKind::kFirst;
 }
 
+bool JobSlices::IsFirstInShares(std::size_t at) const {
+  return IsFirst(at) && *DivisionAt(at)->source != '\0';
+}
+
 bool JobSlices::ReadsWhatIsMade(std::size_t at) const {
   if (at < firstEnd_) return false;  // that is done before
-  const std::vector<JobCommand> before(
-      job_.commands.begin() + static_cast<std::ptrdiff_t>(firstEnd_),
-      job_.commands.begin() + static_cast<std::ptrdiff_t>(at));
+  std::vector<JobCommand> before(job_.commands.begin() + static_cast<std::ptrdiff_t>(firstEnd_),
+                                 job_.commands.begin() + static_cast<std::ptrdiff_t>(at));
+  std::erase_if(before, [](const JobCommand& command) { return IsForEach(command); });
   const JobFiles files = FindFiles(before);
   const std::set<std::string> made(files.made.begin(), files.made.end());
   for (const JobInput& input : At(at).inputs) {
@@ -53,18 +74,26 @@ std::vector<std::size_t> JobSlices::SliceOf(const JobCommand& command, std::size
     const std::string* const target = command.Find(division->target);
     if (target != nullptr) wanted.erase(*target);
   }
-  return SliceFor(std::move(wanted), end);
+  std::set<std::string> files;
+  AddPieces(command, files);
+  return SliceFor(std::move(wanted), std::move(files), end);
 }
 
-std::vector<std::size_t> JobSlices::SliceFor(std::set<std::string> wanted, std::size_t end) const {
+std::vector<std::size_t> JobSlices::SliceFor(std::set<std::string> wanted,
+                                             std::set<std::string> files, std::size_t end) const {
   std::set<std::size_t> taken;
   std::set<std::string> given;
   for (std::size_t at = end; at-- > 0;) {
     const bool gives =
         std::any_of(At(at).outputs.begin(), At(at).outputs.end(),
                     [&](const JobOutput& output) { return wanted.contains(output.variable); });
-    if (!gives) continue;
+    const std::vector<std::string> made =
+        IsForEach(At(at)) ? FindFiles({At(at)}).made : std::vector<std::string>();
+    const bool makes = std::any_of(made.begin(), made.end(),
+                                   [&](const std::string& file) { return files.contains(file); });
+    if (!gives && !makes) continue;
     taken.insert(at);
+    AddPieces(At(at), files);
     for (const JobOutput& output : At(at).outputs) given.insert(output.variable);
     for (const JobInput& input : At(at).inputs) {
       for (const std::string& variable : VariablesOf(input)) wanted.insert(variable);

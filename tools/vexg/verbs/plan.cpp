@@ -28,6 +28,7 @@ struct Options {
   std::vector<std::string> words;
   std::string folder;
   std::string runner;
+  std::string join = "file";
   std::uint64_t parts = 0;
   std::uint64_t partMemory = 0;
   unsigned threads = 1;
@@ -53,7 +54,8 @@ class Planner {
     const JobCommands job(Document(String(ReadWork()), options_.work));
     if (job.commands.empty()) throw HostError(kExitUsage, options_.work + ": holds no Command");
     const CutJobs cut =
-        CutIntoJobs(job, {options_.parts, options_.partMemory, options_.threads, folder_.string()});
+        CutIntoJobs(job, {options_.parts, options_.partMemory, options_.threads, folder_.string(),
+                          options_.join == "vrt" ? Join::kVrt : Join::kFile});
     const Manifest manifest = Write(cut);
     if (!options_.runner.empty()) {
       std::cout << RunnerText(options_.runner, manifest, folder_.string());
@@ -188,6 +190,11 @@ const VerbRegistration registration(
           .Within(1, 1ULL << 62U);
       line.Add("--threads", options->threads, "Threads of each worker; the merge has twice as many")
           .Within(1, 1024)
+          .ShowsDefault();
+      line.Add("--join", options->join,
+               "What the parts of a raster become: a file as the single run makes it, or a VRT "
+               "file on those of the parts, whose name ends with .vrt")
+          .Takes(OneOf({"file", "vrt"}))
           .ShowsDefault();
       line.Add("--runner", options->runner, "Print what runs the plan").Takes(OneOf(RunnerNames()));
       line.Add("--replace", options->replaces, "Make the plan of a folder anew");

@@ -1,0 +1,35 @@
+#pragma once
+
+#include <memory>
+#include <vector>
+
+#include "foundation/string.h"
+
+namespace lumo {
+
+/// Gives one of the files that hold the lines of a raster, and how many of them.
+struct RowsFile {
+  String file;  ///< a raster of as many samples and bands as the whole, and of its pixel type
+  unsigned lines = 0;  ///< its own, which follow those of the file before
+  String name{};       ///< as a VRT file names it, relative to its place
+};
+
+/// Describes files that hold all lines of a raster, from the first to the last, and the order in
+/// which a copy of the raster would go through its pixels.
+struct RowsFiles {
+  std::vector<RowsFile> files{};
+  unsigned walkWidth = 0;   ///< pixels of the blocks of the copy, which go line by line of them
+  unsigned walkHeight = 0;  ///< lines
+  bool walksAsTarget =
+      false;  ///< the blocks are those of StreamTiles for the copy, with kTargetBudget
+};
+
+/// Answers for a raster whose pixels lie in files which a new raster may take them from.
+class RowsSource {
+ public:
+  virtual ~RowsSource() = default;
+
+  virtual std::shared_ptr<const RowsFiles> GetRows() const = 0;
+};
+
+}  // namespace lumo
