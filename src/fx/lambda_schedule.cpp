@@ -1,71 +1,32 @@
 #include "fx/lambda_schedule.h"
 
 #include <algorithm>
-#include <memory>
+#include <cmath>
 
 #include "tasks/parallel.h"
 
 namespace lumo {
+
 void LambdaSchedule::Begin(std::uint32_t labelCount, std::uint32_t bands) {
-  bands_ = bands;
-  count_ = labelCount;
-  stride_ = BytesOfSegment(bands);
-  regions_.resize(labelCount * stride_);
-  for (std::uint32_t label = 0; label < labelCount; ++label) {
-    std::byte* const at = regions_.data() + label * stride_;
-    (new (at) Region)->rank = label;
-    std::uninitialized_fill_n(reinterpret_cast<double*>(at + sizeof(Region)), bands, 0.0);
-  }
-  limits_ = {};
-  pairs_.clear();
+  graph_.Begin(labelCount, bands);
   queue_.clear();
+  hubs_.Clear();
+  hubNeighbours_ = MergeHubs::kNeighbours;
+  grown_.clear();
 }
 
 void LambdaSchedule::CompareBy(std::vector<std::uint32_t>&& ranks) {
-  for (std::uint32_t label = 0; label < count_; ++label) RegionOf(label).rank = ranks[label];
-  ranks = {};
-}
-
-void LambdaSchedule::AddPair(const LabelPair& pair) {
-  Pair& added = pairs_.emplace_back();
-  added.ids[0] = pair.low;
-  added.ids[1] = pair.high;
-  added.length = pair.length;
-}
-
-void LambdaSchedule::Link(std::uint32_t pair, std::uint32_t region) {
-  Pair& linked = pairs_[pair];
-  Region& owner = RegionOf(region);
-  linked.next[linked.SlotOf(region)] = owner.first;
-  owner.first = pair;
-}
-
-/// Calls `visit(pair)` for the pairs of a region, and takes those out that are none any more.
-template <typename Visit>
-void LambdaSchedule::ForEachPair(std::uint32_t region, Visit&& visit) {
-  std::uint32_t* link = &RegionOf(region).first;
-  while (*link != kNone) {
-    Pair& at = pairs_[*link];
-    const unsigned slot = at.SlotOf(region);
-    if (at.length == 0) {
-      *link = at.next[slot];
-      continue;
-    }
-    link = &at.next[slot];
-    visit(static_cast<std::uint32_t>(&at - pairs_.data()));
+  constexpr std::uint32_t kBits = 0x7FFFFFFF;
+  for (std::uint32_t label = 0; label < graph_.Count(); ++label) {
+    graph_.RegionOf(label).rank = ranks[label] & kBits;
   }
-}
-
-double LambdaSchedule::CostOf(const Pair& pair) const {
-  return MergeCost({RegionOf(pair.ids[0]).area, MeansOf(pair.ids[0])},
-                   {RegionOf(pair.ids[1]).area, MeansOf(pair.ids[1])}, bands_, pair.length,
-                   limits_);
+  ranks = {};
 }
 
 /// Makes a pair the nearest of a region, and queues it when it is that of both of its regions.
 void LambdaSchedule::Choose(std::uint32_t region, std::uint32_t pair) {
-  Pair& chosen = pairs_[pair];
-  RegionOf(region).minimum = pair;
+  Pair& chosen = graph_.PairOf(pair);
+  graph_.RegionOf(region).minimum = pair;
   if (chosen.isChosen) {
     chosen.isQueued = true;
     Push({chosen.cost, pair});
@@ -74,9 +35,18 @@ void LambdaSchedule::Choose(std::uint32_t region, std::uint32_t pair) {
   }
 }
 
+/// Makes a pair no longer the nearest of one of its regions.
+void LambdaSchedule::Drop(Pair& chosen) {
+  if (chosen.isQueued) {
+    chosen.isQueued = false;  // that of the other one still
+  } else {
+    chosen.isChosen = false;
+  }
+}
+
 /// Puts a pair into the queue, which holds fewer pairs that count than there are segments.
 void LambdaSchedule::Push(const Queued& entry) {
-  if (queue_.size() == queue_.capacity() && queue_.size() >= count_) {
+  if (queue_.size() == queue_.capacity() && queue_.size() >= graph_.Count()) {
     std::erase_if(queue_, [this](const Queued& queued) { return !IsCurrent(queued); });
     std::make_heap(queue_.begin(), queue_.end());
   }
@@ -86,27 +56,37 @@ void LambdaSchedule::Push(const Queued& entry) {
 
 /// The pair of a region that costs least; of equal costs the one with the lowest neighbour.
 std::uint32_t LambdaSchedule::NearestOf(std::uint32_t region) {
-  std::uint32_t best = kNone;
-  double bestCost = kMergeCostLimit;
-  ForEachPair(region, [&](std::uint32_t pair) {
-    const double cost = pairs_[pair].cost;
-    if (!(cost <= bestCost)) return;  // nor is a cost that is no number ever the least
-    if (cost == bestCost && (best == kNone || RankOf(pairs_[pair].Other(region)) >
-                                                  RankOf(pairs_[best].Other(region)))) {
-      return;
-    }
-    best = pair;
-    bestCost = cost;
-  });
-  return best;
+  MergeGraph::Least least(graph_, region);
+  graph_.ForEachPair(region, [&](std::uint32_t pair) { least.Look(pair); });
+  return least.Found();
 }
 
+/// Finds the nearest neighbour of a region again.
 void LambdaSchedule::FindNearest(std::uint32_t region) {
-  const std::uint32_t best = NearestOf(region);
+  std::uint32_t best = kNone;
+  if (graph_.IsHub(region)) {
+    best = hubs_.FindLeast(region);
+  } else {
+    std::uint32_t neighbours = 0;
+    bool isWatched = false;
+    MergeGraph::Least least(graph_, region);
+    graph_.ForEachPair(region, [&](std::uint32_t pair) {
+      Pair& at = graph_.PairOf(pair);
+      if (!at.IsPlain()) {
+        at.cost = graph_.CostOf(at);
+        isWatched = true;
+      }
+      least.Look(pair);
+      ++neighbours;
+    });
+    best = least.Found();
+    if (isWatched) toExamine_.push_back(region);
+    if (neighbours > hubNeighbours_) grown_.push_back(region);
+  }
   if (best != kNone) {
     Choose(region, best);
   } else {
-    RegionOf(region).minimum = kNone;
+    graph_.RegionOf(region).minimum = kNone;
   }
 }
 
@@ -127,112 +107,135 @@ void LambdaSchedule::Build() {
       }
     });
   };
-  for (std::uint32_t i = 0; i < pairs_.size(); ++i) {
-    Link(i, pairs_[i].ids[0]);
-    Link(i, pairs_[i].ids[1]);
+  const std::uint32_t count = graph_.Count();
+  for (std::uint32_t i = 0; i < graph_.PairCount(); ++i) {
+    for (const std::uint32_t region : graph_.PairOf(i).ids) graph_.Link(i, region);
   }
-  forEach(count_, [this](std::uint32_t label) {
-    const double area = RegionOf(label).area;
+  forEach(count, [this](std::uint32_t label) {
+    const double area = graph_.RegionOf(label).area;
     if (area == 0) return;
-    double* const means = MeansOf(label);
-    for (std::uint32_t band = 0; band < bands_; ++band) means[band] /= area;
+    double* const means = graph_.MeansOf(label);
+    for (std::uint32_t band = 0; band < graph_.Bands(); ++band) means[band] /= area;
   });
-  forEach(pairs_.size(), [this](std::uint32_t pair) { pairs_[pair].cost = CostOf(pairs_[pair]); });
-  forEach(count_, [this](std::uint32_t label) {
-    if (label != 0 && RegionOf(label).area > 0) RegionOf(label).minimum = NearestOf(label);
+  forEach(graph_.PairCount(), [this](std::uint32_t pair) {
+    graph_.PairOf(pair).cost = graph_.CostOf(graph_.PairOf(pair));
   });
-  queue_.reserve(count_);
-  for (std::uint32_t label = 1; label < count_; ++label) {
-    const std::uint32_t nearest = RegionOf(label).minimum;
+  forEach(count, [this](std::uint32_t label) {
+    if (label != 0 && graph_.RegionOf(label).area > 0) {
+      graph_.RegionOf(label).minimum = NearestOf(label);
+    }
+  });
+  queue_.reserve(count);
+  for (std::uint32_t label = 1; label < count; ++label) {
+    const std::uint32_t nearest = graph_.RegionOf(label).minimum;
     if (nearest != kNone) Choose(label, nearest);
   }
 }
 
-void LambdaSchedule::JoinMeans(std::uint32_t lower, std::uint32_t higher) {
-  const double a = RegionOf(lower).area, b = RegionOf(higher).area;
-  double* const u = MeansOf(lower);
-  const double* const v = MeansOf(higher);
-  for (std::uint32_t band = 0; band < bands_; ++band) {
-    u[band] = JoinedMean(a, u[band], b, v[band]);
+/// Gives the region that is kept the means and the pixels of both. @return how far its means move.
+double LambdaSchedule::JoinMeans(std::uint32_t lower, std::uint32_t higher, std::uint32_t kept) {
+  const double a = graph_.RegionOf(lower).area, b = graph_.RegionOf(higher).area;
+  const double* const u = graph_.MeansOf(lower);
+  const double* const v = graph_.MeansOf(higher);
+  double* const means = graph_.MeansOf(kept);
+  double sum = 0;
+  for (std::uint32_t band = 0; band < graph_.Bands(); ++band) {
+    const double mean = JoinedMean(a, u[band], b, v[band]), by = mean - means[band];
+    means[band] = mean;
+    sum += by * by;
   }
-  RegionOf(lower).area = a + b;
+  graph_.RegionOf(kept).area = a + b;
+  return std::sqrt(sum);
 }
 
-/// Gives the pairs of `higher` to `lower`, joining those with common neighbours.
-void LambdaSchedule::TakeOverPairs(std::uint32_t lower, std::uint32_t higher) {
-  ForEachPair(lower,
-              [&](std::uint32_t pair) { RegionOf(pairs_[pair].Other(lower)).pairTo = pair; });
-  for (std::uint32_t pair = RegionOf(higher).first; pair != kNone;) {
-    Pair& taken = pairs_[pair];
-    const unsigned slot = taken.SlotOf(higher);
-    const std::uint32_t next = taken.next[slot];
-    if (taken.length != 0) {
-      const std::uint32_t common = RegionOf(taken.ids[1 - slot]).pairTo;
-      if (common != kNone) {
-        pairs_[common].length += taken.length;
-        taken.length = 0;
-      } else {
-        taken.ids[slot] = lower;
-        Link(pair, lower);
-      }
+/// Gives the pairs of the region that goes to the other one, joining those with common neighbours.
+void LambdaSchedule::TakeOverPairs(const Joined& joined) {
+  const auto [kept, gone] = joined;
+  graph_.ForEachPair(kept, [&, kept = kept](std::uint32_t pair) {
+    graph_.RegionOf(graph_.PairOf(pair).Other(kept)).pairTo = pair;
+  });
+  graph_.TakePairs(gone, [&, kept = kept, gone = gone](std::uint32_t pair) {
+    Pair& taken = graph_.PairOf(pair);
+    const unsigned slot = taken.SlotOf(gone);
+    const std::uint32_t common = graph_.RegionOf(taken.ids[1 - slot]).pairTo;
+    if (common != kNone) {
+      graph_.PairOf(common).length += taken.length;
+      taken.length = 0;
+    } else {
+      taken.ids[slot] = kept;
+      graph_.Link(pair, kept);
     }
-    pair = next;
-  }
-  RegionOf(higher).first = kNone;
-  ForEachPair(lower,
-              [&](std::uint32_t pair) { RegionOf(pairs_[pair].Other(lower)).pairTo = kNone; });
+  });
+  graph_.ForEachPair(kept, [&, kept = kept](std::uint32_t pair) {
+    graph_.RegionOf(graph_.PairOf(pair).Other(kept)).pairTo = kNone;
+  });
 }
 
-/// Looks whether the nearest of a neighbour of `lower` has changed by the merge.
-/// @param pair  of the neighbour and `lower`.
-void LambdaSchedule::UpdateNearest(std::uint32_t neighbour, std::uint32_t pair, std::uint32_t lower,
-                                   std::uint32_t higher) {
-  const std::uint32_t minimum = RegionOf(neighbour).minimum;
+/// Joins the segments of a pair, and leaves costs as they were. Of hubs that of more neighbours is
+/// kept, whichever has the lower label. @param merge  [out] who they are.
+LambdaSchedule::Joined LambdaSchedule::Join(std::uint32_t pair, Merge& merge) {
+  Pair& merged = graph_.PairOf(pair);
+  std::uint32_t lower = merged.ids[0], higher = merged.ids[1];
+  if (graph_.RankOf(lower) > graph_.RankOf(higher)) std::swap(lower, higher);
+  merge.lower = hubs_.LabelOf(lower);
+  merge.higher = hubs_.LabelOf(higher);
+  merge.border = merged.length;
+  merged.length = 0;
+  const bool isLowerHub = graph_.IsHub(lower), isHigherHub = graph_.IsHub(higher);
+  const bool keepsHigher =
+      isHigherHub && (!isLowerHub || hubs_.SizeOf(higher) > hubs_.SizeOf(lower));
+  const Joined joined = keepsHigher ? Joined{higher, lower} : Joined{lower, higher};
+  moved_ = JoinMeans(lower, higher, joined.kept);
+  changed_.clear();
+  if (!isLowerHub && !isHigherHub) {
+    TakeOverPairs(joined);
+    return joined;
+  }
+  hubs_.TakeOver(joined.kept, joined.gone, !keepsHigher, changed_);
+  hubs_.SetLabel(joined.kept, merge.lower);
+  graph_.RegionOf(joined.kept).rank = graph_.RankOf(lower);
+  return joined;
+}
+
+/// Looks whether the nearest of a neighbour of the segment of a merge has changed.
+/// @param pair  of both.
+void LambdaSchedule::UpdateNearest(std::uint32_t pair, const Joined& joined) {
+  const Pair& changed = graph_.PairOf(pair);
+  const std::uint32_t neighbour = changed.Other(joined.kept);
+  const std::uint32_t minimum = graph_.RegionOf(neighbour).minimum;
   if (minimum == kNone) return FindNearest(neighbour);
-  Pair& nearest = pairs_[minimum];
-  const Pair& changed = pairs_[pair];
+  Pair& nearest = graph_.PairOf(minimum);
   const std::uint32_t far = nearest.Other(neighbour);
-  const bool isOfMerged = minimum == pair || far == lower || far == higher;
+  const bool isOfMerged = minimum == pair || far == joined.kept || far == joined.gone;
   if (isOfMerged) {
-    nearest.isChosen = false;
+    Drop(nearest);
     FindNearest(neighbour);
     return;
+  }
+  const bool isWatched = !nearest.IsPlain() && !graph_.IsHub(neighbour);
+  if (isWatched) {
+    nearest.cost = graph_.CostOf(nearest);
+    toExamine_.push_back(neighbour);
   }
   const bool isBeaten =
       nearest.cost > changed.cost || (nearest.cost == changed.cost && pair < minimum);
   if (!isBeaten) return;
-  if (nearest.isQueued) {
-    nearest.isQueued = false;
-  } else {
-    nearest.isChosen = false;
-  }
+  Drop(nearest);
   Choose(neighbour, pair);
-}
-
-/// Joins the segments of a pair, and leaves costs as they were. @param merge  [out] who they are.
-void LambdaSchedule::Join(std::uint32_t pair, Merge& merge) {
-  std::uint32_t lower = pairs_[pair].ids[0], higher = pairs_[pair].ids[1];
-  if (RankOf(lower) > RankOf(higher)) std::swap(lower, higher);
-  merge.lower = lower;
-  merge.higher = higher;
-  merge.border = pairs_[pair].length;
-  pairs_[pair].length = 0;
-  JoinMeans(lower, higher);
-  TakeOverPairs(lower, higher);
 }
 
 /// Finds the pair of a segment that costs least, by the segments as they are now.
 bool LambdaSchedule::FindCheapest(std::uint32_t region, std::uint32_t& pair, double& cost) const {
   pair = kNone;
   std::uint32_t bestRank = 0;
-  for (std::uint32_t at = RegionOf(region).first; at != kNone;) {
-    const Pair& seen = pairs_[at];
+  for (std::uint32_t at = graph_.RegionOf(region).first; at != kNone;) {
+    const Pair& seen = graph_.PairOf(at);
     at = seen.next[seen.SlotOf(region)];
     if (seen.length == 0) continue;
-    const double costs = CostOf(seen);
-    const std::uint32_t rank = RankOf(seen.Other(region));
+    const double costs = graph_.CostOf(seen);
+    const std::uint32_t rank = graph_.RankOf(seen.Other(region));
     if (pair == kNone || costs < cost || (!(costs > cost) && rank < bestRank)) {
-      pair = static_cast<std::uint32_t>(&seen - pairs_.data());
+      pair = graph_.NumberOf(seen);
       cost = costs;
       bestRank = rank;
     }
@@ -244,14 +247,15 @@ bool LambdaSchedule::FindCheapest(std::uint32_t region, std::uint32_t& pair, dou
 void LambdaSchedule::FetchNext() const {
   constexpr std::size_t kAhead = 7;  // the three uppermost rows of the heap
   for (std::size_t i = 1; i < std::min(kAhead, queue_.size()); ++i) {
-    const Pair& pair = pairs_[queue_[i].pair];
+    const Pair& pair = graph_.PairOf(queue_[i].pair);
     if (i > 2) {
       __builtin_prefetch(&pair);
       continue;
     }
     for (const std::uint32_t region : pair.ids) {
-      __builtin_prefetch(&RegionOf(region));
-      __builtin_prefetch(&pairs_[std::min<std::size_t>(RegionOf(region).first, pairs_.size() - 1)]);
+      const std::uint32_t first = graph_.RegionOf(region).first;
+      __builtin_prefetch(&graph_.RegionOf(region));
+      if (first != kNone) __builtin_prefetch(&graph_.PairOf(first));
     }
   }
 }
@@ -266,21 +270,69 @@ bool LambdaSchedule::Step(Merge& merge) {
   const Queued top = queue_.front();
   pop();
   FetchNext();
-  Pair& merged = pairs_[top.pair];
-  merged.isQueued = false;
+  graph_.PairOf(top.pair).isQueued = false;
   merge.lambda = top.cost;
-  Join(top.pair, merge);
-  const std::uint32_t lower = merge.lower, higher = merge.higher;
-  ForEachPair(lower, [&](std::uint32_t pair) {
-    pairs_[pair].cost = CostOf(pairs_[pair]);
-    const std::uint32_t nearest = RegionOf(pairs_[pair].Other(lower)).minimum;
-    if (nearest != kNone) __builtin_prefetch(&pairs_[nearest]);
-  });
-  ForEachPair(lower, [&](std::uint32_t pair) {
-    UpdateNearest(pairs_[pair].Other(lower), pair, lower, higher);
-  });
-  FindNearest(lower);
+  const Joined joined = Join(top.pair, merge);
+  if (graph_.IsHub(joined.kept)) {
+    UpdateAroundHub(joined);
+  } else {
+    UpdateAround(joined);
+  }
+  for (const std::uint32_t region : grown_) {
+    if (!graph_.IsHub(region)) hubs_.Make(region, region);
+  }
+  grown_.clear();
   return true;
+}
+
+/// Brings costs and nearest neighbours around a merge up to date. Those of hubs come last, since
+/// they look at what the others have found.
+void LambdaSchedule::UpdateAround(const Joined& joined) {
+  const std::uint32_t kept = joined.kept;
+  graph_.ForEachPair(kept, [&](std::uint32_t pair) {
+    Pair& changed = graph_.PairOf(pair);
+    changed.cost = graph_.CostOf(changed);
+    const std::uint32_t nearest = graph_.RegionOf(changed.Other(kept)).minimum;
+    if (nearest != kNone) __builtin_prefetch(&graph_.PairOf(nearest));
+  });
+  hubPairs_.clear();
+  graph_.ForEachPair(kept, [&](std::uint32_t pair) {
+    if (graph_.PairOf(pair).IsPlain()) {
+      UpdateNearest(pair, joined);
+    } else {
+      hubPairs_.push_back(pair);
+    }
+  });
+  FindNearest(kept);
+  ExamineChanged();
+  for (const std::uint32_t pair : hubPairs_) UpdateNearest(pair, joined);
+}
+
+/// The same around a hub, but for the pairs that need not be looked at.
+void LambdaSchedule::UpdateAroundHub(const Joined& joined) {
+  hubs_.Move(joined.kept, moved_, changed_);
+  const auto update = [&](std::uint32_t pair) {
+    Pair& changed = graph_.PairOf(pair);
+    changed.cost = graph_.CostOf(changed);
+    UpdateNearest(pair, joined);
+  };
+  for (const std::uint32_t pair : changed_) {
+    const std::uint32_t neighbour = graph_.PairOf(pair).Other(joined.kept);
+    if (graph_.IsHub(neighbour)) continue;
+    update(pair);
+    toExamine_.push_back(neighbour);
+  }
+  ExamineChanged();
+  hubs_.ForEachPeer(joined.kept, update);
+  FindNearest(joined.kept);
+}
+
+/// Has the watched pairs looked at of regions whose nearest neighbour has changed.
+void LambdaSchedule::ExamineChanged() {
+  std::sort(toExamine_.begin(), toExamine_.end());
+  toExamine_.erase(std::unique(toExamine_.begin(), toExamine_.end()), toExamine_.end());
+  for (const std::uint32_t region : toExamine_) hubs_.Examine(region);
+  toExamine_.clear();
 }
 
 }  // namespace lumo

@@ -3,13 +3,11 @@
 #include <cstddef>
 #include <cstdint>
 #include <limits>
-#include <new>
 #include <queue>
 #include <vector>
 
-#include "fx/label_pairs.h"
-#include "fx/merge_cost.h"
-#include "platform/huge_pages.h"
+#include "fx/merge_graph.h"
+#include "fx/merge_hubs.h"
 
 namespace lumo {
 
@@ -22,7 +20,8 @@ namespace lumo {
 /// that was found first in the image is merged first.
 ///
 /// Cost: a merge looks at the neighbours of the two segments, and at those of neighbours whose
-/// nearest was one of the two.
+/// nearest was one of the two; of segments with very many neighbours only at those for whom it may
+/// matter (MergeHubs).
 /// Threads: one at a time; the arrays are kept from image to image.
 ///
 ///     schedule.Begin(labelCount + 1, bands);
@@ -32,6 +31,10 @@ namespace lumo {
 ///     while (schedule.Step(merge) && merge.lambda < most) parent[merge.higher] = merge.lower;
 class VEXG_EXPORT LambdaSchedule {
  public:
+  LambdaSchedule() = default;
+  LambdaSchedule(const LambdaSchedule&) = delete;
+  LambdaSchedule& operator=(const LambdaSchedule&) = delete;
+
   /// A merge of `higher` into `lower`.
   struct Merge {
     double lambda = 0;  ///< the cost
@@ -48,26 +51,30 @@ class VEXG_EXPORT LambdaSchedule {
   void CompareBy(std::vector<std::uint32_t>&& ranks);
 
   /// Limits how segments grow; see GrowthLimits. Behind Begin.
-  void Limit(const GrowthLimits& limits) { limits_ = limits; }
+  void Limit(const GrowthLimits& limits) { graph_.Limit(limits); }
+  /// Watches segments of more neighbours than this as hubs, which changes no merge. Behind Begin.
+  void MakeHubsAbove(std::uint32_t neighbours) { hubNeighbours_ = neighbours; }
 
   /// Adds a pixel to its segment.
   /// @param label   not 0.
   /// @param values  one for each band.
   template <typename T>
   void AddPixel(std::uint32_t label, const T* values, std::size_t bandStride) {
-    double* const sums = MeansOf(label);
-    for (std::uint32_t band = 0; band < bands_; ++band) {
+    double* const sums = graph_.MeansOf(label);
+    for (std::uint32_t band = 0; band < graph_.Bands(); ++band) {
       sums[band] += static_cast<double>(values[band * bandStride]);
     }
-    RegionOf(label).area += 1.0;
+    graph_.RegionOf(label).area += 1.0;
   }
 
   /// Makes room for pairs of neighbours.
-  void ReservePairs(std::size_t count) { pairs_.reserve(count); }
+  void ReservePairs(std::size_t count) { graph_.ReservePairs(count); }
   /// Adds a pair of neighbours, behind those that were found before. None has the label 0.
-  void AddPair(const LabelPair& pair);
+  void AddPair(const LabelPair& pair) { graph_.AddPair(pair); }
   /// Adds to the common boundary of a pair. @param pair  by the order in which pairs were added.
-  void Lengthen(std::size_t pair, std::uint32_t length) { pairs_[pair].length += length; }
+  void Lengthen(std::size_t pair, std::uint32_t length) {
+    graph_.PairOf(static_cast<std::uint32_t>(pair)).length += length;
+  }
 
   /// Computes means and costs, and finds the nearest neighbours. Behind all pixels and pairs. All
   /// threads work on many pairs.
@@ -75,15 +82,17 @@ class VEXG_EXPORT LambdaSchedule {
   /// Adds pairs first.
   void Build(const std::vector<LabelPair>& pairs);
 
-  /// The pixels of a segment, and the mean of one of its bands. Behind Build.
-  double AreaOf(std::uint32_t label) const { return RegionOf(label).area; }
-  double MeanOf(std::uint32_t label, std::uint32_t band) const { return MeansOf(label)[band]; }
+  /// The pixels of a segment, and the mean of one of its bands. Behind Build, before any step.
+  double AreaOf(std::uint32_t label) const { return graph_.RegionOf(label).area; }
+  double MeanOf(std::uint32_t label, std::uint32_t band) const {
+    return graph_.MeansOf(label)[band];
+  }
 
   /// The bytes that a segment and a pair of neighbours take, less what stands in the queue.
   static constexpr std::size_t BytesOfSegment(std::uint32_t bands) {
-    return sizeof(Region) + bands * sizeof(double);
+    return MergeGraph::BytesOfRegion(bands);
   }
-  static constexpr std::size_t BytesOfPair() { return sizeof(Pair); }
+  static constexpr std::size_t BytesOfPair() { return sizeof(MergeGraph::Pair); }
   /// The bytes that the queue takes for each segment at most.
   static constexpr std::size_t BytesInQueue() { return sizeof(Queued); }
 
@@ -98,32 +107,8 @@ class VEXG_EXPORT LambdaSchedule {
   void JoinSmall(double least, Visit&& visit);
 
  private:
-  static constexpr std::uint32_t kNone = 0xFFFFFFFF;
-
-  /// A segment; the means of its bands follow it in memory, as they are read with it.
-  struct Region {
-    double area = 0;
-    std::uint32_t minimum = kNone;  // pair
-    std::uint32_t first = kNone;    // of its pairs
-    std::uint32_t pairTo = kNone;   // the pair with the region that is merged into
-    std::uint32_t rank = 0;
-  };
-
-  /// A pair stands in the lists of both of its regions; slot i of the links belongs to ids[i]. One
-  /// that was merged, or joined to another, has no length any more, and leaves a list when somebody
-  /// goes through it next.
-  struct Pair {
-    std::uint32_t ids[2] = {};
-    std::uint32_t next[2] = {};
-    double cost = 0;
-    std::uint32_t length = 0;
-    bool isChosen = false;
-    bool isQueued = false;
-
-    unsigned SlotOf(std::uint32_t region) const { return ids[0] == region ? 0 : 1; }
-    std::uint32_t Other(std::uint32_t region) const { return ids[0] == region ? ids[1] : ids[0]; }
-  };
-  static_assert(sizeof(Region) == 24 && sizeof(Pair) == 32);
+  using Pair = MergeGraph::Pair;
+  static constexpr std::uint32_t kNone = MergeGraph::kNone;
 
   /// A pair in the queue. It is out of date when the pair has left the queue since, or has come
   /// back at another cost.
@@ -135,40 +120,30 @@ class VEXG_EXPORT LambdaSchedule {
     }
   };
 
+  /// Two regions of which one is left, by their numbers in the graph.
+  struct Joined {
+    std::uint32_t kept;
+    std::uint32_t gone;
+  };
+
   bool IsCurrent(const Queued& entry) const {
-    const Pair& pair = pairs_[entry.pair];
+    const Pair& pair = graph_.PairOf(entry.pair);
     return pair.isQueued && pair.cost == entry.cost;
   }
-  Region& RegionOf(std::uint32_t label) {
-    return *std::launder(reinterpret_cast<Region*>(regions_.data() + label * stride_));
-  }
-  const Region& RegionOf(std::uint32_t label) const {
-    return *std::launder(reinterpret_cast<const Region*>(regions_.data() + label * stride_));
-  }
-  double* MeansOf(std::uint32_t label) {
-    return std::launder(
-        reinterpret_cast<double*>(regions_.data() + label * stride_ + sizeof(Region)));
-  }
-  const double* MeansOf(std::uint32_t label) const {
-    return std::launder(
-        reinterpret_cast<const double*>(regions_.data() + label * stride_ + sizeof(Region)));
-  }
-  std::uint32_t RankOf(std::uint32_t label) const { return RegionOf(label).rank; }
-  template <typename Visit>
-  void ForEachPair(std::uint32_t region, Visit&& visit);
-  void Link(std::uint32_t pair, std::uint32_t region);
-  double CostOf(const Pair& pair) const;
-  void Join(std::uint32_t pair, Merge& merge);
+  Joined Join(std::uint32_t pair, Merge& merge);
+  double JoinMeans(std::uint32_t lower, std::uint32_t higher, std::uint32_t kept);
+  void TakeOverPairs(const Joined& joined);
   bool FindCheapest(std::uint32_t region, std::uint32_t& pair, double& cost) const;
   void Choose(std::uint32_t region, std::uint32_t pair);
+  static void Drop(Pair& chosen);
   std::uint32_t NearestOf(std::uint32_t region);
   void FindNearest(std::uint32_t region);
   void Push(const Queued& entry);
   void FetchNext() const;
-  void JoinMeans(std::uint32_t lower, std::uint32_t higher);
-  void TakeOverPairs(std::uint32_t lower, std::uint32_t higher);
-  void UpdateNearest(std::uint32_t neighbour, std::uint32_t pair, std::uint32_t lower,
-                     std::uint32_t higher);
+  void UpdateNearest(std::uint32_t pair, const Joined& joined);
+  void UpdateAround(const Joined& joined);
+  void UpdateAroundHub(const Joined& joined);
+  void ExamineChanged();
 
   /// A segment that is too small; the smallest is on top.
   struct Small {
@@ -180,34 +155,38 @@ class VEXG_EXPORT LambdaSchedule {
     }
   };
 
-  GrowthLimits limits_;
-  std::uint32_t bands_ = 0;
-  std::uint32_t count_ = 0;  // of regions
-  std::size_t stride_ = sizeof(Region);
-  std::vector<std::byte, platform::HugePageAllocator<std::byte>> regions_;  // by label
-  std::vector<Pair, platform::HugePageAllocator<Pair>> pairs_;
+  MergeGraph graph_;           // a region that is no hub has the number of its label
   std::vector<Queued> queue_;  // a heap
+  MergeHubs hubs_{graph_};
+  std::uint32_t hubNeighbours_ = MergeHubs::kNeighbours;
+  double moved_ = 0;                      // by how much the last merge moved the means of a hub
+  std::vector<std::uint32_t> changed_;    // pairs of the hub of a merge
+  std::vector<std::uint32_t> hubPairs_;   // pairs of a merge with hubs
+  std::vector<std::uint32_t> toExamine_;  // regions whose watched pairs have to be looked at
+  std::vector<std::uint32_t> grown_;      // regions that have become hubs
 };
 
 template <typename Visit>
 void LambdaSchedule::JoinSmall(double least, Visit&& visit) {
-  limits_.mostPixels = std::numeric_limits<double>::infinity();
+  GrowthLimits limits = graph_.Limits();
+  limits.mostPixels = std::numeric_limits<double>::infinity();
+  graph_.Limit(limits);
   std::priority_queue<Small> small;
   const auto note = [&](std::uint32_t region) {
-    const double area = RegionOf(region).area;
-    if (area > 0 && area < least) small.push({area, RankOf(region), region});
+    const double area = graph_.RegionOf(region).area;
+    if (area > 0 && area < least) small.push({area, graph_.RankOf(region), region});
   };
-  for (std::uint32_t region = 1; region < count_; ++region) note(region);
+  for (std::uint32_t region = 1; region < graph_.Count(); ++region) note(region);
   while (!small.empty()) {
     const Small top = small.top();
     small.pop();
-    if (RegionOf(top.region).area != top.area) continue;  // it has joined another, or grown
+    if (graph_.RegionOf(top.region).area != top.area) continue;  // it has joined another, or grown
     Merge merge;
     std::uint32_t pair = kNone;
     if (!FindCheapest(top.region, pair, merge.lambda)) continue;
-    Join(pair, merge);
-    RegionOf(merge.higher).area = 0;
-    note(merge.lower);
+    const Joined joined = Join(pair, merge);
+    graph_.RegionOf(joined.gone).area = 0;
+    note(joined.kept);
     visit(merge);
   }
 }

@@ -26,11 +26,13 @@ struct Scene {
 };
 
 /// A scene of random labels, some pixels of none, and few values, so that many costs are equal.
-Scene MakeScene(std::mt19937& random) {
-  Scene scene{1 + static_cast<std::uint32_t>(random() % 9),
-              1 + static_cast<std::uint32_t>(random() % 9),
+Scene MakeScene(std::mt19937& random, unsigned mostSide, unsigned values) {
+  const std::uint32_t width = 1 + static_cast<std::uint32_t>(random() % mostSide);
+  const std::uint32_t height = 1 + static_cast<std::uint32_t>(random() % mostSide);
+  Scene scene{width,
+              height,
               1 + static_cast<std::uint32_t>(random() % 3),
-              2 + static_cast<std::uint32_t>(random() % 14),
+              2 + static_cast<std::uint32_t>(random() % (5 + width * height / 4)),
               {},
               {}};
   scene.labels.resize(std::size_t{scene.width} * scene.height);
@@ -38,7 +40,7 @@ Scene MakeScene(std::mt19937& random) {
     label = static_cast<std::int32_t>(random() % scene.labelCount);
   }
   scene.values.resize(scene.labels.size() * scene.bands);
-  for (double& value : scene.values) value = static_cast<double>(random() % 4);
+  for (double& value : scene.values) value = static_cast<double>(random() % values);
   return scene;
 }
 
@@ -178,8 +180,10 @@ class PlainSchedule {
   std::set<std::pair<double, int>> queue_;
 };
 
-MergeList RunFast(LambdaSchedule& schedule, LabelPairs& pairs, const Scene& scene) {
+MergeList RunFast(LambdaSchedule& schedule, LabelPairs& pairs, const Scene& scene,
+                  std::uint32_t hubNeighbours = MergeHubs::kNeighbours) {
   schedule.Begin(scene.labelCount, scene.bands);
+  schedule.MakeHubsAbove(hubNeighbours);
   pairs.Begin(scene.labelCount);
   for (std::size_t pixel = 0; pixel < scene.labels.size(); ++pixel) {
     if (scene.labels[pixel] == 0) continue;
@@ -204,12 +208,63 @@ TEST(LambdaSchedule, MergesAsThePlainFormDoesTiesIncluded) {
   LabelPairs pairs;
   std::size_t merged = 0;
   for (int round = 0; round < 3000; ++round) {
-    const Scene scene = MakeScene(random);
+    const Scene scene = MakeScene(random, 9, 4);
     const MergeList merges = RunFast(schedule, pairs, scene);
     ASSERT_EQ(merges, PlainSchedule(scene).Run()) << "round " << round;
     merged += merges.size();
   }
   EXPECT_GT(merged, 10'000U);
+}
+
+TEST(LambdaSchedule, MergesHubsAsThePlainFormDoesTiesIncluded) {
+  std::mt19937 random(6);
+  LambdaSchedule schedule;
+  LabelPairs pairs;
+  for (int round = 0; round < 300; ++round) {
+    // Of few values many costs are equal; of many, and large scenes, hubs move by little.
+    const Scene scene = MakeScene(random, round % 10 == 0 ? 60 : 15, round % 2 == 0 ? 4 : 999);
+    const MergeList wanted = PlainSchedule(scene).Run();
+    for (const std::uint32_t neighbours : {0U, 1U, 3U, 8U}) {
+      ASSERT_EQ(RunFast(schedule, pairs, scene, neighbours), wanted)
+          << "round " << round << ", hubs above " << neighbours;
+    }
+  }
+}
+
+/// With limits of growth, and joins of small segments at the end, hubs change nothing either.
+TEST(LambdaSchedule, JoinsTheSameSmallSegmentsWithHubs) {
+  std::mt19937 random(7);
+  for (int round = 0; round < 200; ++round) {
+    const Scene scene = MakeScene(random, 25, 300);
+    LabelPairs pairs;
+    pairs.Begin(scene.labelCount);
+    ForEachEdge({scene.width, scene.height, scene.width, scene.height}, scene.labels.data(),
+                nullptr, [&](std::uint32_t a, std::uint32_t b) {
+                  if (a != 0 && b != 0) pairs.AddEdge(a, b);
+                });
+    const auto run = [&](std::uint32_t neighbours) {
+      LambdaSchedule schedule;
+      schedule.Begin(scene.labelCount, scene.bands);
+      schedule.MakeHubsAbove(neighbours);
+      schedule.Limit({30.0 + round, round % 3 * 0.5});
+      for (std::size_t pixel = 0; pixel < scene.labels.size(); ++pixel) {
+        if (scene.labels[pixel] == 0) continue;
+        schedule.AddPixel(static_cast<std::uint32_t>(scene.labels[pixel]),
+                          scene.values.data() + pixel, scene.labels.size());
+      }
+      schedule.Build(pairs.Pairs());
+      MergeList merges;
+      const auto add = [&](const LambdaSchedule::Merge& merge) {
+        merges.emplace_back(merge.lambda, merge.lower, merge.higher);
+      };
+      LambdaSchedule::Merge merge;
+      while (merges.size() < scene.labelCount / 2 && schedule.Step(merge)) add(merge);
+      schedule.JoinSmall(20, add);
+      return merges;
+    };
+    const MergeList wanted = run(0xFFFFFFFF);
+    for (const std::uint32_t neighbours : {0U, 2U, 7U}) ASSERT_EQ(run(neighbours), wanted) << round;
+  }
 }
 
 TEST(LabelPairs, NumbersPairsByTheirFirstEdgeHoweverManyThereAre) {
