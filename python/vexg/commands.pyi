@@ -366,7 +366,7 @@ def CopyRasterCommand(
     DstURI: str | Raster,
     Bands: ArrayLike | None = None,
     Invalid: Literal["Told", "NoData"] | None = None,
-    Blocks: Literal["Told", "Stream"] | None = None,
+    Blocks: Literal["Told", "Stream", "Target"] | None = None,
     Share: ArrayLike | None = None,
     ShareFile: str | PathLike[str] | None = None,
     ShareFiles: str | Sequence[str | PathLike[str]] | None = None,
@@ -771,7 +771,7 @@ def CreateJoinedRowsRasterCommand(
     Files: str | Sequence[str | PathLike[str]],
     Lines: ArrayLike,
     Names: str | Sequence[str | PathLike[str]] | None = None,
-    Blocks: Literal["Told", "Stream"] | None = None,
+    Blocks: Literal["Told", "Stream", "Target"] | None = None,
     server: Server | None = None,
     progress: Progress = False,
 ) -> _CreateJoinedRowsRasterCommandOutputs:
