@@ -189,57 +189,75 @@ bool UnpackByLibrary(const Packing& packing, unsigned width, unsigned height,
   return done;
 }
 
+/// Calls `run` with the unsigned type of this many bytes.
+template <typename Run>
+void WithWord(std::size_t bytes, const Run& run) {
+  if (bytes == 1) run.template operator()<std::uint8_t>();
+  if (bytes == 2) run.template operator()<std::uint16_t>();
+  if (bytes == 4) run.template operator()<std::uint32_t>();
+  if (bytes == 8) run.template operator()<std::uint64_t>();
+}
+
+/// @param stride  values from one to that which its difference is to.
 template <typename T>
-void Difference(unsigned char* row, std::size_t count, std::size_t stride) {
-  auto* const values = reinterpret_cast<T*>(row);
-  for (std::size_t i = count; i-- > stride;) {
-    values[i] = static_cast<T>(values[i] - values[i - stride]);
-  }
+void Difference(const T* __restrict from, std::size_t count, std::size_t stride, T* __restrict to) {
+  std::copy_n(from, std::min(count, stride), to);
+  for (std::size_t i = stride; i < count; ++i) to[i] = static_cast<T>(from[i] - from[i - stride]);
 }
 
 template <typename T>
-void Sum(unsigned char* row, std::size_t count, std::size_t stride) {
-  auto* const values = reinterpret_cast<T*>(row);
+void Sum(T* values, std::size_t count, std::size_t stride) {
   for (std::size_t i = stride; i < count; ++i) {
     values[i] = static_cast<T>(values[i] + values[i - stride]);
   }
 }
 
-/// Makes differences of the values of a row, or values of differences (TIFF 6.0, section 14; Adobe
-/// Photoshop TIFF Technical Note 3 of 2005 for floating-point numbers).
-template <bool kToFile>
-void Predict(const Packing& packing, unsigned char* row, std::size_t bytes) {
-  const std::size_t each = packing.bits / 8, count = bytes / each;
-  const auto run = [&]<typename T>() {
-    if constexpr (kToFile) {
-      Difference<T>(row, bytes / sizeof(T), packing.depth);
-    } else {
-      Sum<T>(row, bytes / sizeof(T), packing.depth);
-    }
-  };
-  if (packing.predictor == BlockPredictor::kWhole) {
-    if (each == 1) run.template operator()<std::uint8_t>();
-    if (each == 2) run.template operator()<std::uint16_t>();
-    if (each == 4) run.template operator()<std::uint32_t>();
-    if (each == 8) run.template operator()<std::uint64_t>();
-    return;
+/// Lays the bytes of values apart by their weight, the highest ones first.
+template <typename T>
+void LayApart(const T* __restrict from, std::size_t count, unsigned char* __restrict to) {
+  for (std::size_t shift = 8 * sizeof(T); shift > 0; to += count) {
+    shift -= 8;
+    for (std::size_t i = 0; i < count; ++i) to[i] = static_cast<unsigned char>(from[i] >> shift);
   }
-  if (packing.predictor != BlockPredictor::kFloat) return;
-  // Bytes lie by their weight, the highest ones first.
-  thread_local std::vector<unsigned char> copy;
-  if constexpr (!kToFile) run.template operator()<std::uint8_t>();
-  copy.assign(row, row + bytes);
-  for (std::size_t byte = 0; byte < each; ++byte) {
-    const std::size_t plane = (each - 1 - byte) * count;
-    for (std::size_t i = 0; i < count; ++i) {
-      if constexpr (kToFile) {
-        row[plane + i] = copy[i * each + byte];
-      } else {
-        row[i * each + byte] = copy[plane + i];
-      }
-    }
+}
+
+template <typename T>
+void LayTogether(const unsigned char* from, std::size_t count, T* to) {
+  std::fill_n(to, count, T{});
+  for (std::size_t shift = 8 * sizeof(T); shift > 0; from += count) {
+    shift -= 8;
+    for (std::size_t i = 0; i < count; ++i) to[i] = static_cast<T>(to[i] | T{from[i]} << shift);
   }
-  if constexpr (kToFile) run.template operator()<std::uint8_t>();
+}
+
+/// Makes differences of the values of a row (TIFF 6.0, section 14; Adobe Photoshop TIFF Technical
+/// Note 3 of 2005 for floating-point numbers).
+void Predict(const Packing& packing, const unsigned char* row, std::size_t bytes,
+             std::vector<unsigned char>& scratch, unsigned char* to) {
+  const std::size_t each = packing.bits / 8;
+  WithWord(each, [&]<typename T>() {
+    const auto* const values = reinterpret_cast<const T*>(row);
+    if (packing.predictor == BlockPredictor::kWhole) {
+      return Difference(values, bytes / each, packing.depth, reinterpret_cast<T*>(to));
+    }
+    scratch.resize(bytes);
+    LayApart(values, bytes / each, scratch.data());
+    Difference(scratch.data(), bytes, packing.depth, to);
+  });
+}
+
+/// Makes values of the differences of a row.
+void Restore(const Packing& packing, unsigned char* row, std::size_t bytes) {
+  const std::size_t each = packing.bits / 8;
+  WithWord(each, [&]<typename T>() {
+    auto* const values = reinterpret_cast<T*>(row);
+    if (packing.predictor == BlockPredictor::kWhole) {
+      return Sum(values, bytes / each, packing.depth);
+    }
+    Sum(row, bytes, packing.depth);
+    const std::vector<unsigned char> planes(row, row + bytes);
+    LayTogether(planes.data(), bytes / each, values);
+  });
 }
 
 struct ZstdPackDeleter {
@@ -250,12 +268,15 @@ struct ZstdPackDeleter {
 bool PackZstd(const Packing& packing, unsigned width, unsigned height, const unsigned char* block,
               std::vector<unsigned char>& packed, std::string& why) {
   thread_local const std::unique_ptr<ZSTD_CCtx, ZstdPackDeleter> context(ZSTD_createCCtx());
-  thread_local std::vector<unsigned char> differences;
+  thread_local std::vector<unsigned char> kept, keptRow;
+  std::vector<unsigned char>&differences = kept, &scratch = keptRow;  // looked up once
   const std::size_t row = packing.RowBytes(width), bytes = row * height;
   const unsigned char* from = block;
   if (packing.predictor != BlockPredictor::kNone) {
-    differences.assign(block, block + bytes);
-    for (unsigned y = 0; y < height; ++y) Predict<true>(packing, &differences[y * row], row);
+    differences.resize(bytes);
+    for (std::size_t y = 0; y < height; ++y) {
+      Predict(packing, block + y * row, row, scratch, &differences[y * row]);
+    }
     from = differences.data();
   }
   packed.resize(ZSTD_compressBound(bytes));
@@ -279,7 +300,8 @@ bool UnpackZstd(const Packing& packing, unsigned width, unsigned height,
     why = "a block can't be unpacked";
     return false;
   }
-  for (unsigned y = 0; y < height; ++y) Predict<false>(packing, block + y * row, row);
+  if (packing.predictor == BlockPredictor::kNone) return true;
+  for (std::size_t y = 0; y < height; ++y) Restore(packing, block + y * row, row);
   return true;
 }
 

@@ -49,19 +49,31 @@ T MeanOf(const T* values, unsigned count) {
 
 /// Whether four values have a mean by the short formula.
 template <typename T>
-constexpr bool kHasShortMean = std::is_integral_v<T> && sizeof(T) <= 4;
+constexpr bool kHasShortMean = std::is_floating_point_v<T> ||
+                               (std::is_integral_v<T> && sizeof(T) <= 4);
 
 /// Makes the means of pixels that all count, of two lines.
 /// @param count  pixels of the level.
+/// @return false where some mean is no number; then all have to be made one by one.
 template <typename T>
-void ShortMeans(const T* upper, const T* lower, unsigned count, unsigned depth, T* to) {
-  using Sum = std::conditional_t<sizeof(T) == 4, std::int64_t, std::int32_t>;
+bool ShortMeans(const T* upper, const T* lower, unsigned count, unsigned depth, T* to) {
+  bool areNumbers = true;
   for (unsigned x = 0; x < count; ++x, upper += 2 * depth, lower += 2 * depth, to += depth) {
     for (unsigned band = 0; band < depth; ++band) {
-      const Sum sum = Sum{upper[band]} + upper[depth + band] + lower[band] + lower[depth + band];
-      to[band] = static_cast<T>((sum + 2) >> 2);  // rounds down, of negative numbers too
+      if constexpr (std::is_integral_v<T>) {
+        using Sum = std::conditional_t<sizeof(T) == 4, std::int64_t, std::int32_t>;
+        const Sum sum = Sum{upper[band]} + upper[depth + band] + lower[band] + lower[depth + band];
+        to[band] = static_cast<T>((sum + 2) >> 2);  // rounds down, of negative numbers too
+      } else {
+        const auto quarter = [](T value) { return static_cast<double>(value) / 4; };
+        const double sum = 0 + quarter(upper[band]) + quarter(upper[depth + band]) +
+                           quarter(lower[band]) + quarter(lower[depth + band]);
+        to[band] = static_cast<T>(sum);
+        areNumbers &= sum == sum;
+      }
     }
   }
+  return areNumbers;
 }
 
 }  // namespace
@@ -114,8 +126,10 @@ void BlockReducer::ReduceAs(const Reduction& work) const {
       if (isPlain && rows == 2) {
         const unsigned char* const upper = work.pixels + 2 * std::size_t{y} * work.line;
         done = work.width / 2;
-        ShortMeans(reinterpret_cast<const T*>(upper), reinterpret_cast<const T*>(upper + work.line),
-                   done, depth_, to);
+        const bool areMade =
+            ShortMeans(reinterpret_cast<const T*>(upper),
+                       reinterpret_cast<const T*>(upper + work.line), done, depth_, to);
+        if (!areMade) done = 0;
         to += std::size_t{done} * depth_;
       }
     }

@@ -7,7 +7,7 @@
 #include "foundation/fault.h"
 #include "foundation/library.h"
 #include "raster/pixel_types.h"
-#include "tasks/parallel.h"
+#include "tasks/crew.h"
 #include "tiff_writer/cog_file.h"
 #include "tiff_writer/directory_writer.h"
 
@@ -261,7 +261,8 @@ bool PackedPixels::PackQueued(bool all) {
       if (!Prepare(work)) return false;
       batch.push_back(std::move(work));
     }
-    ParallelFor(static_cast<unsigned>(batch.size()), nullptr, [&](unsigned i) { Run(batch[i]); });
+    // The engine's threads wait for this one, or are at other stages.
+    RunByCrew(static_cast<unsigned>(batch.size()), [&](unsigned i) { Run(batch[i]); });
     for (Work& work : batch) {
       if (!Store(work)) return false;
     }
