@@ -19,6 +19,7 @@ void LabelForest::Begin(std::uint64_t labelCount, std::uint64_t bytes) {
   frames_.clear();
   file_.reset();
   numbers_ = 0;
+  joins_ = 0;
   isWell_ = true;
 }
 

@@ -30,7 +30,12 @@ class VEXG_EXPORT LabelForest {
   void Begin(std::uint64_t labelCount, std::uint64_t bytes = kBytes);
 
   /// Makes a label part of another one; both stand for themselves until then, and have no number.
-  void Join(std::uint32_t label, std::uint32_t other) { At(label) = other; }
+  void Join(std::uint32_t label, std::uint32_t other) {
+    At(label) = other;
+    ++joins_;
+  }
+  /// How many joins there were, each of which makes one fewer.
+  std::uint64_t Joins() const { return joins_; }
 
   /// The label that stands for what a label has become. Not 0, and not one that has a number.
   std::uint32_t RootOf(std::uint32_t label);
@@ -68,6 +73,7 @@ class VEXG_EXPORT LabelForest {
   std::deque<Frame> frames_;  // as they came
   std::unique_ptr<platform::RandomAccessFile> file_;
   std::uint32_t numbers_ = 0;
+  std::uint64_t joins_ = 0;
   bool isWell_ = true;
   std::uint32_t none_ = 0;  // what is held of labels that can't be fetched
 };

@@ -35,12 +35,14 @@ std::uint64_t BytesOf(const Container& container) {
 
 }  // namespace
 
-void LocalMerge::Begin(std::uint32_t bands, const Rules& rules, LabelForest& forest) {
+void LocalMerge::Begin(std::uint32_t bands, const Rules& rules, LabelForest& forest,
+                       Listener* listener) {
   *this = {};
   bands_ = bands;
   rules_ = rules;
   rules_.threshold = std::min(rules.threshold, kMergeCostLimit);
   forest_ = &forest;
+  listener_ = listener;
   segments_.resize(std::size_t{rules.rounds} + 1);
   pairs_.resize(std::size_t{rules.rounds} + 1);
 }
@@ -101,6 +103,7 @@ void LocalMerge::Enter(const StripBasins& strip) {
 void LocalMerge::Complete(std::uint32_t slot) {
   double* const means = means_.data() + std::size_t{slot} * bands_;
   for (std::uint32_t band = 0; band < bands_; ++band) means[band] /= pixels_[slot];
+  if (listener_ != nullptr) listener_->OnSegment(labels_[slot], SideOf(slot));
   levels_[slot] = 0;
   segments_[0].push_back(slot);
   ++fresh_;
@@ -310,7 +313,11 @@ void LocalMerge::Advance(unsigned round) {
   std::size_t kept = 0;
   for (const std::uint32_t slot : segments) {
     if (roots_[slot] != slot) {
-      forest_->Join(labels_[slot], labels_[roots_[slot]]);
+      const std::uint32_t lower = labels_[roots_[slot]], pair = chosen_[slot];
+      forest_->Join(labels_[slot], lower);
+      if (listener_ != nullptr) {
+        listener_->OnJoin({costs_[pair], lower, labels_[slot], pairs_[round][pair].length, round});
+      }
     } else if (waits_[slot] != 0) {
       segments[kept++] = slot;
       continue;

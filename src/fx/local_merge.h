@@ -50,8 +50,27 @@ class VEXG_EXPORT LocalMerge {
     std::size_t batch = kBatch;  ///< segments that come between two merges at least, for speed
   };
 
+  /// Two segments that become one, by their labels, which are the lowest of their basins.
+  struct Join {
+    double cost = 0;
+    std::uint32_t lower = 0;
+    std::uint32_t higher = 0;
+    std::uint32_t border = 0;  ///< length of the common boundary, in pixel edges
+    std::uint32_t round = 0;
+  };
+  /// Hears what becomes of segments: of all joins of a segment in the order of their rounds.
+  class Listener {
+   public:
+    virtual ~Listener() = default;
+    /// A segment is whole, before any join of it. @param means  of its bands.
+    virtual void OnSegment(std::uint32_t label, const MergeSide& segment) = 0;
+    virtual void OnJoin(const Join& join) = 0;
+  };
+
   /// Forgets everything. @param forest  has all labels, each by itself; it outlives the merge.
-  void Begin(std::uint32_t bands, const Rules& rules, LabelForest& forest);
+  /// @param listener  outlives it as well; null for none.
+  void Begin(std::uint32_t bands, const Rules& rules, LabelForest& forest,
+             Listener* listener = nullptr);
 
   /// Adds the next strip, and merges where enough has come.
   /// @param values  of its pixels, band by band for each.
@@ -125,6 +144,7 @@ class VEXG_EXPORT LocalMerge {
   std::uint32_t bands_ = 0;
   Rules rules_;
   LabelForest* forest_ = nullptr;
+  Listener* listener_ = nullptr;
   std::uint64_t mostBytes_ = 0;
 
   // By place. A place is free again when its segment has gone.

@@ -12,7 +12,7 @@ namespace {
 constexpr double kInfinity = std::numeric_limits<double>::infinity();
 // Distances and costs have relative errors far below this.
 constexpr double kSafe = 1e-9;
-constexpr double kGrowth = 1.25;  // of the area of a hub, up to which its distances hold
+constexpr double kGrowth = 2;  // of the area of a hub, up to which its distances hold
 
 }  // namespace
 
@@ -77,7 +77,6 @@ void MergeHubs::TakeOver(std::uint32_t hub, std::uint32_t gone, bool keepsOwn,
   if (!isHubGone) return;
   hubs_.erase(gone);
   graph_.RegionOf(gone).isHub = 0;
-  hubs_.at(hub)->mostArea = 0;  // it has moved far
 }
 
 /// Begins anew to watch all pairs of a hub. Those without a place are listed already.
@@ -193,9 +192,9 @@ void MergeHubs::Place(Pair& pair, const Reach& reach, double room) {
     key = 0;
     room = 0;
   } else {
-    // Half of the way to the cost that the hub's own least pair had.
+    // Most of the way from the cost that the hub's own least pair had.
     const double root = std::sqrt(pair.cost), leastRoot = std::sqrt(hub.leastCost);
-    const double keyRoot = root > leastRoot ? (root + leastRoot) / 2 : root * 0.9;
+    const double keyRoot = root > leastRoot ? leastRoot + (root - leastRoot) * 0.75 : root * 0.9;
     const double least = keyRoot * keyRoot * (1 - 1e-6);
     key = least > kLeastKey ? static_cast<float>(least) : 0;
     room = std::min(room, reach.near - reach.DistanceAt(key, reach.factor) * (1 + kSafe));

@@ -1,3 +1,4 @@
+#include "fx/seamless_local_body.h"
 #include "fx/seamless_segmentation_body.h"
 
 namespace lumo {

@@ -17,7 +17,8 @@ namespace lumo {
 /// in raster order; all basins are merged in one graph; and labels are written once, in one pass.
 /// With a tree, merging goes on until no pair is left, and the labels are a cut of the tree.
 ///
-/// Merging in rounds needs no whole graph; see LocalMerge.
+/// Merging in rounds needs no whole graph; see LocalMerge. It does for joining small segments at
+/// its end, of the segments that rounds leave; and a tree of it keeps all its merges.
 ///
 /// Memory: MemoryOfMerging for the graph, and some 100 bytes a pixel of a strip for each
 ///         thread. Failure: false, with the fault set, and nothing written unless the writing
@@ -46,10 +47,16 @@ class SeamlessSegmentation {
   bool KeepLines(const std::vector<std::int32_t>& labels);
   template <typename V>
   void AddSquares(std::uint32_t label, const V* values, unsigned bands);
-  bool KeepBasins(const LambdaSchedule& schedule);
+  void BeginBasins();
+  void CenterSquares(const LambdaSchedule& schedule);
+  template <typename PixelsOf>
+  bool KeepBasins(const PixelsOf& pixelsOf);
   bool CutOwnTree();
   bool MergeRigorously();
   bool MergeLocally();
+  bool MergeInRounds(const LocalMerge::Rules& rules, LocalMerge::Listener* listener);
+  bool KeepRounds(const LocalMerge::Rules& rules);
+  bool JoinSmallSegments();
   bool Write();
   IPC NextPass() const;
   TileDimensions Strips(unsigned border) const;
@@ -63,6 +70,7 @@ class SeamlessSegmentation {
   SeamlessWatershed watershed_;
   std::vector<std::uint32_t> roots_;  // by basin: one that stands for its segment; empty for itself
   LabelForest forest_;                // what basins have become
+  std::optional<LabelForest> joined_;  // what segments of rounds have become that were small
   std::optional<SegmentTreeWriter> tree_;
   // With a tree, by basin: its number in raster order of first pixels, and the squares of its
   // values.

@@ -7,10 +7,8 @@
 #include "foundation/progress.h"
 #include "fx/gradient_stages.h"
 #include "fx/lambda_schedule.h"
-#include "fx/local_merge.h"
 #include "fx/rigorous_merge.h"
 #include "fx/seamless_segmentation.h"
-#include "fx/strip_basins.h"
 #include "fx/strip_numbers.h"
 #include "fx/task_setup.h"
 #include "fx/tree_cut.h"
@@ -233,15 +231,15 @@ bool SeamlessSegmentation<T>::MergeBySchedule() {
   schedule.Begin(count + 1, merge_->Bands());
   schedule.Limit(request_.growth);
   schedule.CompareBy(watershed_.TakeRanks());
-  if (tree_) {
-    order_.assign(std::size_t{count} + 1, 0);
-    squares_.assign(std::size_t{count} + 1, 0);
-  }
+  if (tree_) BeginBasins();
   schedule.ReservePairs(std::size_t{3} * count);  // more pairs of areas touch in no plane
   if (!Gather(schedule, schedule)) return false;
   if (IsAborted()) return true;
   schedule.Build();
-  if (tree_ && !KeepBasins(schedule)) return false;
+  if (tree_) {
+    CenterSquares(schedule);
+    if (!KeepBasins([&](std::uint32_t label) { return schedule.AreaOf(label); })) return false;
+  }
   return DoSteps(schedule) && (!tree_ || IsAborted() || CutOwnTree());
 }
 
@@ -288,6 +286,7 @@ bool SeamlessSegmentation<T>::BeginTree() {
   scene.lines = segment_->Lines();
   scene.bands = merge_->Bands();
   scene.dataType = merge_->DataType();
+  scene.isNested = request_.order == MergeOrder::kLocal;
   scene.compactness = request_.growth.compactness;
   scene.mostPixels = request_.growth.mostPixels;
   const RasterDef def = segment_->GetRasterDef();
@@ -296,6 +295,12 @@ bool SeamlessSegmentation<T>::BeginTree() {
   scene.interleave = def.interleave;
   scene.geoRef = def.geoRef;
   return tree_.emplace().Begin(request_.tree, scene);
+}
+
+template <typename T>
+void SeamlessSegmentation<T>::BeginBasins() {
+  order_.assign(std::size_t{watershed_.Count()} + 1, 0);
+  squares_.assign(std::size_t{watershed_.Count()} + 1, 0);
 }
 
 /// Gives the basins of the next strip their numbers in raster order, and puts them into the tree.
@@ -322,22 +327,30 @@ void SeamlessSegmentation<T>::AddSquares(std::uint32_t label, const V* values, u
   squares_[label] += sum;
 }
 
+/// Takes the squares of the means of a basin from those of its values.
 template <typename T>
-bool SeamlessSegmentation<T>::KeepBasins(const LambdaSchedule& schedule) {
+void SeamlessSegmentation<T>::CenterSquares(const LambdaSchedule& schedule) {
+  for (std::uint32_t label = 1; label <= watershed_.Count(); ++label) {
+    const double area = schedule.AreaOf(label);
+    for (unsigned band = 0; band < merge_->Bands(); ++band) {
+      const double mean = schedule.MeanOf(label, band);
+      squares_[label] -= area * mean * mean;
+    }
+  }
+}
+
+/// Puts the basins into the tree. `pixelsOf(label)` gives their sizes.
+template <typename T>
+template <typename PixelsOf>
+bool SeamlessSegmentation<T>::KeepBasins(const PixelsOf& pixelsOf) {
   const std::uint32_t count = watershed_.Count();
   TreeBasins basins;
   basins.pixels.resize(count);
   basins.squares.resize(count);
   for (std::uint32_t label = 1; label <= count; ++label) {
-    const double area = schedule.AreaOf(label);
-    double squares = squares_[label];
-    for (unsigned band = 0; band < merge_->Bands(); ++band) {
-      const double mean = schedule.MeanOf(label, band);
-      squares -= area * mean * mean;
-    }
     const std::uint32_t at = order_[label] - 1;
-    basins.pixels[at] = static_cast<std::uint32_t>(area);
-    basins.squares[at] = squares > 0 ? squares : 0;  // not for values that are no numbers
+    basins.pixels[at] = static_cast<std::uint32_t>(pixelsOf(label));
+    basins.squares[at] = squares_[label] > 0 ? squares_[label] : 0;  // not for those of no numbers
   }
   squares_ = {};
   return tree_->AddBasins(basins);
@@ -377,40 +390,6 @@ bool SeamlessSegmentation<T>::MergeRigorously() {
 }
 
 template <typename T>
-bool SeamlessSegmentation<T>::MergeLocally() {
-  LocalMerge merge;
-  merge.Begin(merge_->Bands(),
-              {request_.mergeValue, request_.rounds, request_.growth, request_.memory}, forest_);
-  const RasterIteratorPtr<T> strips(new RasterIterator<T>(merge_, Strips(0)));
-  detail::StripProcess process("SeamlessRounds", NextPass());
-  const auto tiles = process.Read(strips);
-  const auto found = process.template TakeSlot<ValueSlot<StripBasins>>();
-  ScratchPool<LabelPairs> pairs;
-  process.Add("Basins", StageOrder::kSeveralAtOnce, [&](ArgList& token, const AbortFlag*) {
-    const TilePtr<T> tile = tiles.In(token);
-    if (!tile || !tile->IsValid()) return false;
-    const unsigned strip = tile->Index().second;
-    std::vector<std::int32_t> labels(std::size_t{watershed_.Width()} * watershed_.LinesOf(strip));
-    if (!watershed_.Label(strip, labels.data())) return false;
-    const SeamlessWatershed::Labels own = watershed_.LabelsOf(strip);
-    StripBasins basins;
-    basins.Find({labels.data(), labels.size(), watershed_.Width(), watershed_.LabelsBelow(strip),
-                 strip > 0},
-                {own.first, own.count}, *pairs.Borrow());
-    basins.AddUp(labels.data(), labels.size(), tile->PixelArray().GetData(), tile->Bands());
-    return found.Put(token, std::move(basins));
-  });
-  process.Add("Rounds", StageOrder::kOneByOne, [&](ArgList& token, const AbortFlag* abort) {
-    const StripBasins* const basins = found.In(token);
-    return basins != nullptr &&
-           merge.AddStrip(*basins, tiles.In(token)->PixelArray().GetData(), abort);
-  });
-  process.Close();
-  if (!process.RunProcess(process.kHere)) return false;
-  return IsAborted() || merge.Finish(ipc_.abort.Get());
-}
-
-template <typename T>
 bool SeamlessSegmentation<T>::Write() {
   detail::StripProcess process("SeamlessLabels", NextPass());
   const auto numbers = process.template TakeSlot<TileSlot<Scalar<unsigned>>>();
@@ -422,7 +401,7 @@ bool SeamlessSegmentation<T>::Write() {
   }
   roots_ = {};
   platform::ReturnFreeMemory();
-  SegmentNumbers segments(watershed_, forest_, request_.bordersOnly);
+  SegmentNumbers segments(watershed_, forest_, joined_ ? &*joined_ : nullptr, request_.bordersOnly);
   TilePool<std::int32_t> pool;
   process.Add("Labels", StageOrder::kSeveralAtOnce, [&](ArgList& token, const AbortFlag*) {
     const TilePtr<std::int32_t> tile = pool.Take();

@@ -187,9 +187,8 @@ class FxTileSegmentMergeCommand final : public SegmentCommand {
     };
     if (HasInput("Order")) request.order = Read<MergeOrder>("Order");
     const bool isLocal = request.order == MergeOrder::kLocal;
-    if (isLocal && (!isSeamless_ || isRigorous_ || HasInput("MinSize") || HasInput("Tree"))) {
-      return refuse(
-          "Order Local goes with Seamless and MergeAlgorithm 1, without MinSize and Tree");
+    if (isLocal && (!isSeamless_ || isRigorous_)) {
+      return refuse("Order Local goes with Seamless and MergeAlgorithm 1");
     }
     if (!HasInput("Rounds")) return true;
     if (!isLocal) return refuse("Rounds goes with Order Local");

@@ -98,6 +98,7 @@ bool SegmentTreeWriter::Begin(const std::string& path, const TreeScene& scene) {
   header_.tileWidth = scene.tileWidth;
   header_.tileHeight = scene.tileHeight;
   header_.interleave = static_cast<std::int32_t>(scene.interleave);
+  header_.isNested = scene.isNested ? 1 : 0;
   header_.compactness = scene.compactness;
   header_.mostPixels = scene.mostPixels;
   const std::uint64_t width = std::max(scene.samples, 1U);
@@ -270,6 +271,7 @@ const char* SegmentTree::FindFault(std::uint64_t fileBytes) const {
     return "more basins than pixels";
   }
   if (h.merges >= std::max(h.basins, 1U)) return "more merges than basins";
+  if (h.isNested > 1) return "no such order of merges";
   if (!std::isfinite(h.compactness) || !(h.compactness >= 0)) return "no such compactness";
   if (!(h.mostPixels >= 1)) return "no such limit of sizes";
   return nullptr;
@@ -328,6 +330,7 @@ bool SegmentTree::ReadValues() {
   scene_.tileWidth = header_.tileWidth;
   scene_.tileHeight = header_.tileHeight;
   scene_.interleave = static_cast<Interleave>(header_.interleave);
+  scene_.isNested = header_.isNested != 0;
   scene_.compactness = header_.compactness;
   scene_.mostPixels = header_.mostPixels;
   const std::uint64_t bytes = header_.values.bytes;

@@ -25,7 +25,10 @@ struct TreeScene {
   Interleave interleave = Interleave::None;                     ///< of the same storage
   double compactness = 0;                                       ///< see GrowthLimits
   double mostPixels = std::numeric_limits<double>::infinity();  ///< see GrowthLimits
-  GeoRefPtr geoRef;                                             ///< of the labels; null for none
+  /// True where segments merged in rounds. Merges come by the most that any merge of the same
+  /// segment costs, so that those up to a cost are whole segments; see CutTree.
+  bool isNested = false;
+  GeoRefPtr geoRef;  ///< of the labels; null for none
 };
 
 /// One merge of two segments, which are called by the basins that stand for them.
@@ -60,7 +63,7 @@ struct TreeHeader {
   std::uint32_t stripLines, basins;
   std::uint32_t tileWidth, tileHeight;
   std::int32_t interleave;
-  std::uint32_t reserved;
+  std::uint32_t isNested;
   std::uint64_t merges;
   std::uint64_t fileBytes;
   double compactness, mostPixels;
@@ -72,7 +75,8 @@ struct TreeHeader {
 }  // namespace detail
 
 /// Writes the tree of a segmentation: the basins of a raster, numbered from 1 in raster order of
-/// their first pixels, and all merges in their order. See docs/file-formats.md.
+/// their first pixels, and all merges in their order (TreeScene::isNested). See
+/// docs/file-formats.md.
 ///
 /// The file grows under another name beside its place, and has no header until it is whole. What
 /// isn't placed goes with the writer.

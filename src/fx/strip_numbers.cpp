@@ -46,7 +46,9 @@ bool SegmentNumbers::FindBasins(unsigned strip, Tile<std::int32_t>& tile) const 
 }
 
 void SegmentNumbers::FindRoots(std::int32_t* labels, std::size_t count) {
-  ReplaceLabels(labels, count, [this](std::uint32_t label) { return forest_.RootOf(label); });
+  ReplaceLabels(labels, count, [this](std::uint32_t label) {
+    return joined_ == nullptr ? forest_.RootOf(label) : joined_->RootOf(forest_.NumberOf(label));
+  });
 }
 
 void SegmentNumbers::MarkBorders(Tile<std::int32_t>& tile) {
@@ -93,9 +95,12 @@ bool SegmentNumbers::Number(Tile<std::int32_t>& tile) {
     MarkBorders(tile);
   } else {
     ReplaceLabels(tile.PixelArray().GetData(), tile.PixelArray().GetCount(),
-                  [this](std::uint32_t label) { return forest_.NumberOf(label); });
+                  [this](std::uint32_t label) {
+                    const std::uint32_t number = forest_.NumberOf(label);
+                    return joined_ == nullptr ? number : joined_->NumberOf(number);
+                  });
   }
-  return forest_.IsWell();
+  return forest_.IsWell() && (joined_ == nullptr || joined_->IsWell());
 }
 
 }  // namespace lumo

@@ -30,8 +30,11 @@ class VEXG_EXPORT StripNumberTask final : public SequentialTask {
 class VEXG_EXPORT SegmentNumbers {
  public:
   /// @param forest  what basins have become; outlives this.
-  SegmentNumbers(const SeamlessWatershed& basins, LabelForest& forest, bool bordersOnly)
-      : basins_(basins), forest_(forest), bordersOnly_(bordersOnly) {}
+  /// @param joined  what the numbers of that have become in turn, each of which is given already;
+  ///                null for themselves.
+  SegmentNumbers(const SeamlessWatershed& basins, LabelForest& forest, LabelForest* joined,
+                 bool bordersOnly)
+      : basins_(basins), forest_(forest), joined_(joined), bordersOnly_(bordersOnly) {}
 
   /// Makes a tile of a strip whose pixels are basins.
   bool FindBasins(unsigned strip, Tile<std::int32_t>& tile) const;
@@ -45,6 +48,7 @@ class VEXG_EXPORT SegmentNumbers {
 
   const SeamlessWatershed& basins_;
   LabelForest& forest_;
+  LabelForest* joined_;
   bool bordersOnly_;
 };
 

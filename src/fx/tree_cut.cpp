@@ -54,11 +54,15 @@ bool CutTree(const SegmentTree& tree, const std::vector<double>& mergeValues,
   const auto isNext = [&] { return cuts.size() < mergeValues.size(); };
   while (isNext() && !(mergeValues[cuts.size()] > 0)) cuts.push_back(forest.Cut());
   bool isWell = true;
+  const auto cutBelow = [&](double cost) {
+    while (isNext() && cost > mergeValues[cuts.size()]) cuts.push_back(forest.Cut());
+  };
+  const bool isNested = tree.Scene().isNested;
   const auto join = [&](const TreeMerge& merge) {
+    if (isNested) cutBelow(merge.cost);
+    if (!isNext()) return false;
     isWell = forest.Join(merge);
-    while (isWell && isNext() && merge.cost > mergeValues[cuts.size()]) {
-      cuts.push_back(forest.Cut());
-    }
+    if (isWell && !isNested) cutBelow(merge.cost);
     return isWell && isNext();
   };
   if (isNext() && !tree.ForEachMerge(join)) return false;
@@ -80,8 +84,10 @@ bool CutTree(const SegmentTree& tree, double mergeValue, TreeCut& cut) {
 bool FindMergeValue(const SegmentTree& tree, double percent, double& mergeValue) {
   std::vector<double> costs;
   costs.reserve(tree.Merges());
+  double most = 0;
   const bool isRead = tree.ForEachMerge([&](const TreeMerge& merge) {
-    costs.push_back(merge.cost);
+    most = std::max(most, merge.cost);
+    costs.push_back(tree.Scene().isNested ? most : merge.cost);
     return true;
   });
   if (!isRead) return false;

@@ -15,8 +15,9 @@ struct TreeCut {
 };
 
 /// Finds the segments that merging up to a cost leaves: those of all merges in their order, up to
-/// the first that costs more, which counts; none unless the cost is above 0. False, with the fault
-/// set, where the tree can't be read.
+/// the first that costs more, which counts; none unless the cost is above 0. In a nested tree that
+/// one does not count: segments are the largest all of whose merges cost no more. False, with the
+/// fault set, where the tree can't be read.
 VEXG_EXPORT bool CutTree(const SegmentTree& tree, double mergeValue, TreeCut& cut);
 
 /// The same for several costs, in one pass. Segments of one cut lie within those of the next.

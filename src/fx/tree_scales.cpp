@@ -106,14 +106,20 @@ bool FindScales(const SegmentTree& tree, std::vector<ScaleLevel>& levels) {
   const auto note = [&] {
     levels.push_back({CostOfLevel(next++), deviations.Count(), deviations.Mean(), 0, 0, 0});
   };
-  const bool isRead = tree.ForEachMerge([&](const TreeMerge& merge) {
-    isWell = merge.cost >= 0 && std::isfinite(merge.cost) && deviations.Join(merge);
-    if (!isWell || merge.cost == 0) return isWell;
+  const bool isNested = tree.Scene().isNested;
+  const auto noteBelow = [&](double cost) {
+    if (cost == 0) return;
     if (levels.empty()) {
-      next = static_cast<std::int64_t>(std::ceil(std::log2(merge.cost) * kStepsPerOctave)) - 1;
+      next = static_cast<std::int64_t>(std::ceil(std::log2(cost) * kStepsPerOctave)) - 1;
     }
-    while (merge.cost > CostOfLevel(next)) note();
-    return true;
+    while (cost > CostOfLevel(next)) note();
+  };
+  const bool isRead = tree.ForEachMerge([&](const TreeMerge& merge) {
+    isWell = merge.cost >= 0 && std::isfinite(merge.cost);
+    if (isWell && isNested) noteBelow(merge.cost);
+    isWell = isWell && deviations.Join(merge);
+    if (isWell && !isNested) noteBelow(merge.cost);
+    return isWell;
   });
   if (!isRead) return false;
   if (!isWell) {

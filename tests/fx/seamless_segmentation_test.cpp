@@ -175,13 +175,15 @@ TEST(SeamlessSegmentation, GivesTheSegmentsOfOneTile) {
 /// Segments in rounds; empty when that fails.
 template <typename T>
 Labels SegmentInRounds(const MemoryPtr<T>& scene, double mergeValue, unsigned stripLines,
-                       std::uint64_t memory) {
+                       std::uint64_t memory, double leastPixels = 0, bool bordersOnly = false) {
   SegmentRequest request;
   request.stretch = {0, 800, 0, 800};
   request.limits = ClipLimits::Of(0, 800, 40, 800);
   request.mergeValue = mergeValue;
   request.order = MergeOrder::kLocal;
   request.memory = memory;
+  request.leastPixels = leastPixels;
+  request.bordersOnly = bordersOnly;
   request.tileBytes =
       static_cast<unsigned>(stripLines * scene->Samples() * scene->Bands() * sizeof(T));
   const MemoryPtr<std::int32_t> labels(
@@ -205,6 +207,38 @@ void CheckRounds(unsigned samples, unsigned lines, double mergeValue) {
           << stripLines << ", memory " << memory;
     }
   }
+}
+
+/// Small segments that join at the end: none is left, each lies in one of those without them as a
+/// whole or holds some, and strips and threads don't matter; nor do they for the borders.
+TEST(SeamlessSegmentation, LocalOrderJoinsSmallSegments) {
+  const auto scene = MakeScene<float>(150, 120, 2, 78);
+  constexpr std::uint64_t kMemory = SegmentRequest::kNoLimit;
+  const Labels plain = SegmentInRounds(scene, 300, 120, kMemory);
+  const Labels wanted = SegmentInRounds(scene, 300, 120, kMemory, 40);
+  std::map<std::int32_t, unsigned> pixels;
+  std::map<std::int32_t, std::int32_t> holder;
+  for (std::size_t i = 0; i < wanted.size(); ++i) {
+    ++pixels[wanted[i]];
+    ASSERT_EQ(holder.emplace(plain[i], wanted[i]).first->second, wanted[i]);
+  }
+  ASSERT_GT(pixels.size(), 20U);
+  ASSERT_GT(holder.size(), pixels.size());
+  for (const auto& [label, count] : pixels) {
+    EXPECT_TRUE(label == 0 || count >= 40) << label;
+  }
+  const Labels borders = SegmentInRounds(scene, 300, 120, kMemory, 40, true);
+  for (const unsigned stripLines : {1U, 9U, 64U}) {
+    const ThreadLimit limit(1 + stripLines % 4);
+    EXPECT_EQ(SegmentInRounds(scene, 300, stripLines, kMemory, 40), wanted) << stripLines;
+    EXPECT_EQ(SegmentInRounds(scene, 300, stripLines, kMemory, 40, true), borders) << stripLines;
+  }
+  for (std::size_t i = 0; i + 2 < 150; ++i) {  // of the first line
+    const bool isBorder = wanted[i] != wanted[i + 1] || wanted[i] != wanted[i + 150];
+    EXPECT_EQ(borders[i], isBorder ? 1 : 0) << i;
+  }
+  EXPECT_TRUE(SegmentInRounds(scene, 300, 8, 30'000, 40).empty());
+  EXPECT_THAT(TakeFault().ToUTF8(), testing::HasSubstr("bytes of memory, and may take 30000"));
 }
 
 TEST(SeamlessSegmentation, LocalOrderDependsOnNoStripsThreadsOrMemory) {

@@ -29,7 +29,10 @@ struct Run {
   unsigned stripLines = 16;
   GrowthLimits growth = {};
   std::optional<double> mergePercent = {};
+  MergeOrder order = MergeOrder::kTold;
 };
+
+constexpr MergeOrder kOrders[] = {MergeOrder::kTold, MergeOrder::kLocal};
 
 /// The labels of a run; none where it failed.
 template <typename T>
@@ -41,6 +44,7 @@ Labels Segment(const MemoryPtr<T>& scene, const Run& run, const IPC& ipc = {}) {
   request.mergePercent = run.mergePercent;
   request.tree = run.tree;
   request.growth = run.growth;
+  request.order = run.order;
   request.tileBytes =
       static_cast<unsigned>(run.stripLines * scene->Samples() * scene->Bands() * sizeof(T));
   const MemoryPtr<std::int32_t> labels(
@@ -115,15 +119,17 @@ TEST(SegmentTree, CutsAreTheLabelsOfFreshRuns) {
 TEST(SegmentTree, IsTheSameForAnyStripsAndThreads) {
   const test::TemporaryDirectory folder;
   const auto scene = MakeScene<float>(120, 95, 2, 7);
-  std::string first;
-  for (const unsigned stripLines : {1U, 7U, 64U, 95U}) {
-    for (const unsigned threads : {1U, 4U}) {
-      const ThreadLimit limit(threads);
-      const std::string file = folder.Path() / "a.tree";
-      ASSERT_FALSE(Segment(scene, {0, file, stripLines}).empty());
-      const std::string bytes = test::FileBytes(file);
-      if (first.empty()) first = bytes;
-      EXPECT_EQ(bytes, first) << stripLines << " lines, " << threads << " threads";
+  for (const MergeOrder order : kOrders) {
+    std::string first;
+    for (const unsigned stripLines : {1U, 7U, 64U, 95U}) {
+      for (const unsigned threads : {1U, 4U}) {
+        const ThreadLimit limit(threads);
+        const std::string file = folder.Path() / "a.tree";
+        ASSERT_FALSE(Segment(scene, {0, file, stripLines, {}, {}, order}).empty());
+        const std::string bytes = test::FileBytes(file);
+        if (first.empty()) first = bytes;
+        EXPECT_EQ(bytes, first) << stripLines << " lines, " << threads << " threads";
+      }
     }
   }
 }
@@ -135,6 +141,9 @@ TEST(SegmentTree, KnowsItsBasinsLevelsAndPercentages) {
   const Labels half = Segment(scene, {0, file, 16, {}, 50});
   const SegmentTreePtr tree = SegmentTree::Open(file);
   ASSERT_TRUE(tree);
+  ASSERT_FALSE(Segment(scene, {0, file + ".local", 9, {}, {}, MergeOrder::kLocal}).empty());
+  const SegmentTreePtr local = SegmentTree::Open(file + ".local");
+  ASSERT_TRUE(local && local->Scene().isNested && !tree->Scene().isNested);
   const Labels basinOf = Cut(tree, 0);
 
   // Pixels and squares, added up pixel by pixel about the means.
@@ -158,8 +167,13 @@ TEST(SegmentTree, KnowsItsBasinsLevelsAndPercentages) {
       }
     }
   }
-  EXPECT_EQ(basins.pixels, pixels);
-  for (std::size_t i = 0; i < squares.size(); ++i) ASSERT_NEAR(basins.squares[i], squares[i], 1e-6);
+  for (const SegmentTreePtr& each : {tree, local}) {
+    ASSERT_TRUE(each->ReadBasins(basins));
+    EXPECT_EQ(basins.pixels, pixels);
+    for (std::size_t i = 0; i < squares.size(); ++i) {
+      ASSERT_NEAR(basins.squares[i], squares[i], 1e-6);
+    }
+  }
 
   double value = 0;
   ASSERT_TRUE(FindMergeValue(*tree, 50, value));
@@ -380,12 +394,15 @@ class AbortAt final : public StandardProgressReport {
 TEST(SegmentTree, LeavesNothingBehindAfterAnAbort) {
   const test::TemporaryDirectory folder;
   const auto scene = MakeScene<std::uint8_t>(200, 150, 1, 12);
-  for (double fraction = 0; fraction < 0.9; fraction += 0.07) {
-    const AbortFlagPtr flag(new StandardAbortFlag);
-    Segment(scene, {5, folder.Path() / "a.tree", 10},
-            IPC(flag, ProgressReportPtr(new AbortAt(flag, fraction))));
-    EXPECT_TRUE(flag->IsSet());
-    EXPECT_TRUE(std::filesystem::is_empty(folder.Path())) << fraction;
+  for (const MergeOrder order : kOrders) {
+    const double end = order == MergeOrder::kLocal ? 0.7 : 0.9;  // it has three passes
+    for (double fraction = 0; fraction < end; fraction += 0.07) {
+      const AbortFlagPtr flag(new StandardAbortFlag);
+      Segment(scene, {5, folder.Path() / "a.tree", 10, {}, {}, order},
+              IPC(flag, ProgressReportPtr(new AbortAt(flag, fraction))));
+      EXPECT_TRUE(flag->IsSet());
+      EXPECT_TRUE(std::filesystem::is_empty(folder.Path())) << fraction;
+    }
   }
 }
 
@@ -396,14 +413,17 @@ TEST(SegmentTree, LeavesNothingBehindWhereItCanNotBeWritten) {
   const auto files = [&] {
     return std::distance(std::filesystem::directory_iterator(folder.Path()), {});
   };
-  ASSERT_FALSE(Segment(scene, {5, file}).empty());
-  const std::string older = test::FileBytes(file);
-  for (std::size_t size = 9000; size < older.size(); size += older.size() / 9) {  // cells have 9000
-    const test::FileSizeLimit full(size);
-    EXPECT_TRUE(Segment(scene, {900, file}).empty());
-    EXPECT_THAT(TakeFault().ToUTF8(), testing::StartsWith(file + ": "));
-    EXPECT_EQ(files(), 1);
-    EXPECT_EQ(test::FileBytes(file), older);
+  for (const MergeOrder order : kOrders) {
+    ASSERT_FALSE(Segment(scene, {5, file, 16, {}, {}, order}).empty());
+    const std::string older = test::FileBytes(file);
+    // Cells have 9000 bytes.
+    for (std::size_t size = 9000; size < older.size(); size += older.size() / 9) {
+      const test::FileSizeLimit full(size);
+      EXPECT_TRUE(Segment(scene, {900, file, 16, {}, {}, order}).empty());
+      EXPECT_THAT(TakeFault().ToUTF8(), testing::StartsWith(file + ": "));
+      EXPECT_EQ(files(), 1);
+      EXPECT_TRUE(test::FileBytes(file) == older) << size;
+    }
   }
   Write(file, "something else");
   EXPECT_TRUE(Segment(scene, {5, file}).empty());

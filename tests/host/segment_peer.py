@@ -278,7 +278,22 @@ def merge_schedule(values, labels, pairs, threshold, MinSize=0, MaxSize=float("i
     return result
 
 
-def merge_local(values, labels, pairs, threshold, rounds, most=float("inf"), compactness=0):
+def cut_nested(labels, merges, threshold):
+    """The largest regions of a merge in rounds all of whose merges cost no more than a threshold."""
+    parent, most = {}, {}
+    for cost, a, b in merges:
+        most[a] = max(cost, most.get(a, 0), most.get(b, 0))
+        if most[a] <= threshold:
+            parent[b] = a
+    result = []
+    for label in labels:
+        while label in parent:
+            label = parent[label]
+        result.append(label)
+    return result
+
+
+def merge_local(values, labels, pairs, threshold, rounds, most=float("inf"), compactness=0, merges=None):
     """In rounds: each region chooses its cheapest pair, and pairs that were chosen twice merge at once."""
     plain = Schedule(values, labels, pairs, len(values), most, compactness)
     area, mean, parent = dict(plain.area), plain.mean, {}
@@ -307,6 +322,8 @@ def merge_local(values, labels, pairs, threshold, rounds, most=float("inf"), com
             mean[a] = [n / (m + n) * v + m / (m + n) * u for u, v in zip(mean[a], mean[b])]
             area[a] += area[b]
             into[b] = parent[b] = a
+            if merges is not None:
+                merges.append((choice[a][0], a, b))
         joined = {}
         for (a, b), (length, index) in edges.items():
             a, b = sorted((into.get(a, a), into.get(b, b)))

@@ -217,7 +217,12 @@ class SegmentTest(FolderTest):
                 self.assertEqual(got, labels)
 
     def test_local_order_beside_the_plain_form(self):
-        chance, runs, wanted = random.Random(31), [], []
+        chance, runs, wanted, cuts = random.Random(31), [], [], {}
+
+        def renumbered(labels):
+            numbers = {0: 0}
+            return [numbers.setdefault(label, len(numbers)) for label in labels]
+
         for number in range(30):
             path, image, invalid = self.make_image(f"image{number}.dat", chance, chance.choice(["Byte", "Single"]), 2)
             limits = chance.choice([{}, {}, {"MaxSize": 20}, {"Compactness": 0.7}])
@@ -226,21 +231,39 @@ class SegmentTest(FolderTest):
                          "MergeValue": chance.choice([5, 1000, 1e9]), "LambdaEstimate": False, "Seamless": True,
                          "TileMemorySize": chance.choice([1, 100, 100000]), "Order": "Local",
                          **({"Rounds": rounds} if rounds != 12 else {}), **limits}
+            if number % 3 == 1:
+                arguments.update(MinSize=chance.choice([4, 15, 1000]), MergeValue=chance.choice([0, 5, 1000]))
+            if number % 3 == 2:
+                arguments["Tree"] = self.folder / f"image{number}.tree"
             runs.append((path, arguments))
             width, height, values = image.width, image.height, image.intensity()[0]
             out = [hole for row in invalid for hole in row]
             labels, _ = peer.flood([peer.cut(v / 200 * 200) for row in values for v in row], out, width, height)
             pairs = peer.adjacency(labels, out, width, height, width, height, False)
             bands = [[float(v) for row in band for v in row] for band in image.bands]
-            labels = peer.merge_local(bands, labels, pairs, arguments["MergeValue"], rounds,
-                                      limits.get("MaxSize", float("inf")), limits.get("Compactness", 0))
-            numbers = {0: 0}
-            wanted.append([numbers.setdefault(label, len(numbers)) for label in labels])
+            most, merges = 2147483647 if "Tree" in arguments else arguments["MergeValue"], []
+            merged = peer.merge_local(bands, labels, pairs, most, rounds, limits.get("MaxSize", float("inf")),
+                                      limits.get("Compactness", 0), merges)
+            if "Tree" in arguments:
+                merged = peer.cut_nested(labels, merges, arguments["MergeValue"])
+                cuts[number] = labels, merges
+            labels = renumbered(merged)
+            if "MinSize" in arguments:
+                pairs = peer.adjacency(labels, out, width, height, width, height, False)
+                labels = renumbered(peer.merge_schedule(bands, labels, pairs, 0, MinSize=arguments["MinSize"], **limits))
+            wanted.append(labels)
         for (path, arguments), got, labels in zip(runs, self.segment_all(runs), wanted):
             with self.subTest(path.name, **arguments):
                 self.assertEqual(got, labels)
+        for number, (labels, merges) in list(cuts.items())[:4]:  # a cut of any other cost
+            cost = sorted(merge[0] for merge in merges)[len(merges) // 2] if merges else 1
+            cut = self.folder / f"cut{number}.tif"
+            self.fine("segment", "cut", self.folder / f"image{number}.tree", cut, "--merge-value", repr(cost), "-q")
+            self.assertEqual(list(struct.unpack(f"<{len(labels)}i", gdal_pixels(cut))),
+                             renumbered(peer.cut_nested(labels, merges, cost)))
+            self.fine("segment", "--suggest", self.folder / f"image{number}.tree")
         for words, more in (("--order local goes with", ["--order", "local", "--tiled"]), ("--rounds goes", ["--rounds", 3]),
-                            ("--order local goes with", ["--order", "local", "--tree", self.folder / "t"])):
+                            ("--order local goes with", ["--order", "local", "--merge-algorithm", "rigorous"])):
             self.fails(2, words, "segment", path, self.folder / "o.dat", *more)
         self.fails(1, "bytes of memory, and may take 1000", "segment", path, self.folder / "o.dat", "--order", "local",
                    "--merge-value", 100, "--memory", 1000)

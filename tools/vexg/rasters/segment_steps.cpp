@@ -32,12 +32,8 @@ void SegmentRequest::Check() const {
         "--tiled");
   }
   const bool isLocal = order == "local";
-  if (isLocal &&
-      (isTiled || isEstimate || mergeAlgorithm != "schedule" || minSize || !tree.empty())) {
-    refuse(
-        "--order local goes with --merge-algorithm schedule, without --tiled, --estimate, --tree "
-        "and "
-        "--min-size");
+  if (isLocal && (isTiled || isEstimate || mergeAlgorithm != "schedule")) {
+    refuse("--order local goes with --merge-algorithm schedule, without --tiled and --estimate");
   }
   if (rounds && !isLocal) refuse("--rounds goes with --order local");
   if (!tree.empty() && (isTiled || isEstimate || mergeAlgorithm != "schedule" || minSize)) {
