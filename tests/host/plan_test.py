@@ -28,7 +28,7 @@ JOBS = {
     "cog": ("o.tif", "copy", DATA / "RGB.byte.tif", "@", "--cog"),
     "flat": ("o.dat", "copy", DATA / "RGB.byte.tif", "@"),
     "calc": ("o.tif", "calc", "@", "N=(b3-b2)/(b3+b2);b0", SCENE),
-    "calibrate": ("o.tif", "calibrate", "radiance", FLOATS, "@", "--gain", "2", "--offset", "1"),
+    "calibrate": ("o.tif", "calibrate", "radiance", FLOATS, "@", "--gain", "2", "--offset", "1", "--tile", "64"),
     "warp": ("o.tif", "warp", SCENE, "@", "--to", "EPSG:4326", "--resampling", "cubic"),
     "mosaic": ("o.tif", "mosaic", "build", "@", DATA / "mosaic_a.tif", DATA / "mosaic_b.tif", DATA / "mosaic_c.tif"),
     "matched": ("o.tif", "mosaic", "build", "@", DATA / "mosaic_a.tif", DATA / "mosaic_b.tif", DATA / "mosaic_c.tif",
@@ -82,7 +82,7 @@ class PlanTest(FolderTest):
     def made(self, place):
         """Runs a plan to its end by make. The lines that it said."""
         process = self.make(place)
-        out, err = process.communicate(timeout=60)
+        out, err = process.communicate(timeout=300)
         self.assertEqual((process.returncode, out), (0, ""), err)
         return err
 
@@ -269,7 +269,7 @@ class Once(PlanTest):
             both = [subprocess.Popen([VEXG, "run", "--once", "-q", place / document], stderr=subprocess.PIPE)
                     for _ in range(2)]
             for process in both:
-                _, said = process.communicate(timeout=60)
+                _, said = process.communicate(timeout=300)
                 self.assertEqual((process.returncode, said), (0, b""))
         self.assert_same(place / "o.tif", self.single("cog"))
         self.assertEqual([path for path in place.iterdir() if path.name.startswith(".")], [])
@@ -338,7 +338,7 @@ class Make(PlanTest):
             process = self.make(place, start_new_session=True)
             time.sleep(draw.uniform(0, 0.25))
             os.killpg(process.pid, signal.SIGKILL)
-            process.communicate(timeout=60)
+            process.communicate(timeout=300)
 
     def test_results_are_those_of_the_single_run_whatever_was_killed(self):
         seed = random.randrange(1 << 30)

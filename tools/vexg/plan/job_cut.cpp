@@ -189,7 +189,7 @@ class Cutter {
     const unsigned block = BlockLinesOf(RowsOf(cut));
     for (const unsigned lines : {512U, 64U, 16U, 1U}) {
       const unsigned unit = block != 0 ? (lines + block - 1) / block * block : lines;
-      if (cut.source.lines / unit >= parts) return unit;
+      if ((cut.source.lines + unit - 1) / unit >= parts) return unit;
     }
     for (const unsigned unit : {64U, 16U}) {
       if (cut.source.lines / unit >= parts) return unit;
@@ -394,21 +394,32 @@ class Cutter {
       lines.push_back(cut.firsts[part + 1] - cut.firsts[part]);
     }
     return JoinRows(RowsOf(cut), lines, files_[number],
-                    IsTaken(cut) ? counts_[number] : std::vector<std::string>(), IsTaken(cut));
+                    IsTaken(cut) ? counts_[number] : std::vector<std::string>(), TakingOf(cut));
   }
 
-  /// True when the file that is made takes the pixels out of those of the parts as they are: then
-  /// the raster that is read has to be open before it.
-  bool IsTaken(const Cut& cut) const {
+  /// True when the file that is made takes the pixels out of those of the parts as they are.
+  bool IsTaken(const Cut& cut) const { return TakingOf(cut) != Taking::kNone; }
+
+  /// Where that is done: the raster that is read has to be open before.
+  Taking TakingOf(const Cut& cut) const {
     const RowParts rows = RowsOf(cut);
-    if (rows.join == Join::kFile && BlockLinesOf(rows) == 0) return false;
-    const std::string& source = *rows.copy.Find(rows.source);
-    return std::any_of(
-        job_.commands.begin(), job_.commands.begin() + static_cast<std::ptrdiff_t>(cut.create),
-        [&](const JobCommand& command) {
-          return std::any_of(command.outputs.begin(), command.outputs.end(),
-                             [&](const JobOutput& output) { return output.variable == source; });
-        });
+    if (rows.join == Join::kFile && BlockLinesOf(rows) == 0) return Taking::kNone;
+    const auto begin = job_.commands.begin();
+    const auto create = begin + static_cast<std::ptrdiff_t>(cut.create);
+    const auto copy = begin + static_cast<std::ptrdiff_t>(cut.at);
+    const auto givesSource = [&](const JobCommand& command) {
+      return std::any_of(
+          command.outputs.begin(), command.outputs.end(),
+          [&](const JobOutput& output) { return output.variable == *rows.copy.Find(rows.source); });
+    };
+    if (std::any_of(begin, create, givesSource)) return Taking::kAtCreate;
+    const auto usesTarget = [&](const JobCommand& command) {
+      return std::any_of(command.inputs.begin(), command.inputs.end(), [&](const JobInput& input) {
+        const std::vector<std::string> used = VariablesOf(input);
+        return std::find(used.begin(), used.end(), *rows.copy.Find(rows.target)) != used.end();
+      });
+    };
+    return std::any_of(create + 1, copy, usesTarget) ? Taking::kNone : Taking::kAtCopy;
   }
 
   static constexpr std::uint64_t kMostParts = 10000;  // of four digits

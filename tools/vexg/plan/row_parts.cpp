@@ -121,10 +121,10 @@ void AddRows(const RowParts& parts, unsigned first, unsigned end, const std::str
 
 JoinedRows JoinRows(const RowParts& parts, const std::vector<unsigned>& lines,
                     const std::vector<std::string>& files, const std::vector<std::string>& counts,
-                    bool isEarly) {
+                    Taking taking) {
   namespace fs = std::filesystem;
   const std::string joined = "$" + parts.copy.name + ".joined";
-  const bool takes = isEarly && (parts.join == Join::kVrt || BlockLinesOf(parts) != 0);
+  const bool takes = taking != Taking::kNone;
   JobCommand join{parts.copy.name + ".joined", "CreateJoinedRowsRasterCommand"};
   join.Set("SrcURI", *parts.copy.Find(parts.source));
   join.Set("Files", JoinedByBars(files));
@@ -151,8 +151,9 @@ JoinedRows JoinRows(const RowParts& parts, const std::vector<unsigned>& lines,
     create.Set("ConnStr", file);
   }
   copy.Set(parts.source, joined);
-  if (takes) made.create.push_back(join);
-  made.create.push_back(create);
+  std::vector<JobCommand>& early = taking == Taking::kAtCopy ? made.copy : made.create;
+  if (takes) early.push_back(join);
+  early.push_back(create);
   if (!takes) made.copy.push_back(join);
   made.copy.push_back(copy);
   made.copy.push_back({"close." + joined.substr(1), "CloseRasterCommand", {{"URI", joined}}});

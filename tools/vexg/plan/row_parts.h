@@ -43,14 +43,20 @@ struct JoinedRows {
   std::vector<JobCommand> copy;
 };
 
+/// Says where the file that is made takes the pixels of those of the parts.
+enum class Taking {
+  kNone,      ///< it doesn't: they are copied
+  kAtCreate,  ///< where it was created
+  kAtCopy     ///< where pixels were copied into it; it is created there
+};
+
 /// Makes the commands that join parts.
 /// @param lines   of each part.
 /// @param files   of each part.
 /// @param counts  of each part; empty for none.
-/// @param isEarly  the raster that is read is open before `create`.
 JoinedRows JoinRows(const RowParts& parts, const std::vector<unsigned>& lines,
                     const std::vector<std::string>& files, const std::vector<std::string>& counts,
-                    bool isEarly);
+                    Taking taking);
 
 /// The file that is made in the place of `file`.
 std::string FileOfJoin(const std::string& file, Join join);

@@ -112,7 +112,7 @@ std::string SlurmText(const Manifest& manifest, const std::string& folder) {
         "set -- {}\nshift \\$((SLURM_ARRAY_TASK_ID - 1))\n"
         "# A program that a signal has ended is started again, some times.\ntry=1\n"
         "until LUMO_THREADS_HINT={} \"$VEXG\" run --once -q \"\\$1\"; do\n  code=\\$?\n"
-        "  [ \\$code -gt 128 ] && [ \\$try -lt 5 ] || exit \\$code\n  try=\\$((try + "
+        "  [ \\$code -gt 128 ] && [ \\$try -lt 25 ] || exit \\$code\n  try=\\$((try + "
         "1))\ndone\nEND\n)\n"
         "after=\"--dependency=afterok:${{job%%;*}}\"\n",
         stage.size(), threads, memory, names.substr(1), threads);
