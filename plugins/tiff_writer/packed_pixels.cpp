@@ -482,7 +482,7 @@ bool PackedPixels::TakeBlocks(PackedRows& rows, const std::vector<std::uint64_t>
     }
   }
   std::vector<std::vector<unsigned char>> pixels(batch.size());
-  ParallelFor(static_cast<unsigned>(batch.size()), nullptr, [&](unsigned i) {
+  RunByCrew(static_cast<unsigned>(batch.size()), [&](unsigned i) {
     const BlockLayout& layout = raster_.layout;
     pixels[i].resize(layout.BlockBytes(batch[i].block));
     if (!Unpack(packing_, layout.blockWidth, layout.LinesOf(batch[i].block), batch[i].packed,
