@@ -62,7 +62,7 @@ TEST(Interleave, PutsEveryElementWhereTheOrderOfTheAxesSays) {
                     << s << " " << l << " " << b;
           // Two parts of the lines, each for itself, make the same block.
           std::vector<unsigned char> parts((count + 1) * bytes);
-          for (const auto [first, end] :
+          for (const auto& [first, end] :
                {std::pair(std::size_t{0}, lines / 2), {lines / 2, lines}}) {
             std::vector<unsigned char> part;
             for (std::size_t b = 0; b < bands; ++b) {
