@@ -1,9 +1,11 @@
 #include "tiff/tiff_source.h"
 
 #include <algorithm>
+#include <array>
 #include <charconv>
 #include <cmath>
 #include <cstdlib>
+#include <cstring>
 #include <limits>
 
 #include "foundation/fault.h"
@@ -192,6 +194,22 @@ std::optional<bool> IsCloudOptimised(const File& file) {
   const std::string_view words(head.data(), std::min<std::size_t>(head.size(), 4096));
   if (words.find("KNOWN_INCOMPATIBLE_EDITION=YES") != words.npos) return std::nullopt;
   return words.find("LAYOUT=IFDS_BEFORE_DATA") != words.npos;
+}
+
+/// The bits of a byte as bytes of 0 and 1, the highest first.
+const unsigned char* SpreadBits(unsigned char byte) {
+  constexpr unsigned kBits = 8;
+  using Table = std::array<std::array<unsigned char, kBits>, 256>;
+  static constexpr Table kTable = [] {
+    Table table{};
+    for (unsigned number = 0; number < table.size(); ++number) {
+      for (unsigned bit = 0; bit < kBits; ++bit) {
+        table[number][bit] = number >> (kBits - 1 - bit) & 1;
+      }
+    }
+    return table;
+  }();
+  return kTable[byte].data();
 }
 
 /// The text of a whole file. False when it can't be read, or is too long for what is looked for.
@@ -384,13 +402,12 @@ bool Source::ReadMask(const Rect& rect, unsigned level, std::vector<unsigned cha
   if (!window->Read(bytes, band, packed.data())) return false;
   mask.resize(std::size_t{rect.width} * rect.height);
   const unsigned shift = rect.left % kBits;
+  std::vector<unsigned char> row(std::size_t{bytes.width} * kBits);
   for (std::size_t y = 0; y < rect.height; ++y) {
-    const unsigned char* const from = &packed[y * bytes.width];
-    unsigned char* const to = &mask[y * rect.width];
-    for (unsigned x = 0; x < rect.width; ++x) {
-      const unsigned bit = x + shift;
-      to[x] = from[bit / kBits] >> (kBits - 1 - bit % kBits) & 1;
+    for (std::size_t x = 0; x < bytes.width; ++x) {
+      std::memcpy(&row[x * kBits], SpreadBits(packed[y * bytes.width + x]), kBits);
     }
+    std::copy_n(&row[shift], rect.width, &mask[y * rect.width]);
   }
   return true;
 }

@@ -40,7 +40,7 @@ void Snap(double* positions, double noise) {
 VEXG_VECTOR_CLONES
 bool TakeAxisApart(const double* positions, unsigned count, double low, double high, double shift,
                    std::int32_t* whole, double* rest, std::uint8_t* inside) {
-  unsigned outside = 0;
+  double outside = 0;  // counted as the positions are, which makes it one vector
   for (unsigned i = 0; i < count; ++i) {
     const double position = positions[i];
     const double shifted = position - shift;
@@ -49,11 +49,16 @@ bool TakeAxisApart(const double* positions, unsigned count, double low, double h
     const double down = std::floor(cut);
     whole[i] = static_cast<std::int32_t>(down);
     rest[i] = cut - down;
-    const bool isInside = position >= low && position < high;
-    inside[i] = isInside ? 1 : 0;
-    outside += isInside ? 0U : 1U;
+    outside += position >= low && position < high ? 0.0 : 1.0;
   }
-  return outside == 0;
+  if (outside == 0) {
+    std::fill_n(inside, count, std::uint8_t{1});
+    return true;
+  }
+  for (unsigned i = 0; i < count; ++i) {
+    inside[i] = positions[i] >= low && positions[i] < high ? 1 : 0;
+  }
+  return false;
 }
 
 }  // namespace
