@@ -105,10 +105,18 @@ bool PackedRows::Open(std::size_t number, Part& part) const {
   }
   part.offsets = NumbersOf(tags, own.isTiled ? kTileOffsets : kStripOffsets);
   part.counts = NumbersOf(tags, own.isTiled ? kTileByteCounts : kStripByteCounts);
-  if (own.lines != 0 && IsAlike(tags, own, packing_) && part.offsets.size() == own.Blocks() &&
-      part.counts.size() == own.Blocks()) {
-    return true;
+  std::uint64_t size = 0;
+  if (!part.file->GetSize(size, &why)) {
+    SetFault(why);
+    return false;
   }
+  bool fits = own.lines != 0 && IsAlike(tags, own, packing_) &&
+              part.offsets.size() == own.Blocks() && part.counts.size() == own.Blocks();
+  for (std::size_t block = 0; fits && block < part.offsets.size(); ++block) {
+    fits = part.offsets[block] <= size && part.counts[block] <= size - part.offsets[block] &&
+           part.counts[block] != 0;
+  }
+  if (fits) return true;
   SetFault(path + ": isn't packed as the file that is to be made");
   return false;
 }

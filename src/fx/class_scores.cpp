@@ -72,7 +72,7 @@ bool ClassScoresCommand::CreateScores(unsigned classes) {
 bool ClassScoresCommand::ScoreRegions(const std::vector<unsigned>& regions,
                                       const ScoreBlock& score) {
   if (IsShare()) return MakeShare(regions, score);
-  if (HasInput(kShareFilesInput)) return TakeShares(regions);
+  if (Joins()) return TakeShares(regions);
   const auto store = [this](const unsigned* of, unsigned count, const float* scores) {
     for (unsigned i = 0; i < count; ++i) {
       for (unsigned c = 0; c < classCount_; ++c) scores_->Value(of[i], 0, c) = *scores++;
@@ -118,7 +118,7 @@ bool ClassScoresCommand::MakeShare(const std::vector<unsigned>& regions, const S
   Share share;
   if (!ReadShare(Read<Array<unsigned>>(kShareInput), share)) return false;
   const std::string file = Read<String>(kShareFileInput).ToUTF8();
-  if (file.empty() || HasInput(kShareFilesInput)) {
+  if (file.empty() || Joins()) {
     return Refuse("Share goes with ShareFile, and not with ShareFiles");
   }
   ShareWriter out;

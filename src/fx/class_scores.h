@@ -31,6 +31,8 @@ class ClassScoresCommand : public RegionCommand {
   bool CreateScores(unsigned classes);
   /// True where a share of the regions is scored alone: nothing but its file is made.
   bool IsShare() const { return HasInput(kShareInput); }
+  /// True where the scores come out of the files of shares.
+  bool Joins() const { return Read<Array<String>>(kShareFilesInput).GetCount() != 0; }
 
   /// Computes scores of regions, many at once: `count` regions from `first` of `regions` on, or of
   /// all where that is null. `values` are those of their attributes, as ChosenAttributes::Read

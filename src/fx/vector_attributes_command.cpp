@@ -126,6 +126,9 @@ class FxComputeVectorAttributesCommand final : public RegionCommand {
     return true;
   }
 
+  /// True where the polygons come out of the files of shares.
+  bool Joins() const { return Read<Array<String>>(kShareFilesInput).GetCount() != 0; }
+
   static std::string KeyOfShares(const BasicRaster& labels) {
     return fmt::format("shapes {} {} {}", labels.DataType(), labels.Samples(), labels.Lines());
   }
@@ -136,7 +139,7 @@ class FxComputeVectorAttributesCommand final : public RegionCommand {
     lumo::Share share;
     if (!labels || !ReadShare(Read<Array<unsigned>>(kShareInput), share)) return false;
     const std::string file = Read<String>(kShareFileInput).ToUTF8();
-    if (file.empty() || HasInput(kShareFilesInput)) {
+    if (file.empty() || Joins()) {
       SetFault("Share goes with ShareFile, and not with ShareFiles");
       return false;
     }
@@ -187,7 +190,7 @@ class FxComputeVectorAttributesCommand final : public RegionCommand {
   bool FromLabels() {
     const BasicRasterPtr labels = FindLabels(nullptr);
     if (!labels) return false;
-    if (HasInput(kShareFilesInput)) {
+    if (Joins()) {
       if (!CreateFile()) return false;
       RecordSpool joined(*setup_->file);
       return FromShares(*labels, joined) && joined.Flush() && setup_->file->Close();

@@ -87,6 +87,9 @@ class PolygonizeCommand final : public RasterCommand {
     return IsFxvName(path_) ? ToFxv<T>(raster) : ToRecords<T>(raster);
   }
 
+  /// True where the polygons come out of the files of shares.
+  bool Joins() const { return Read<Array<String>>(kShareFilesInput).GetCount() != 0; }
+
   std::string KeyOfShares(const BasicRaster& raster) const {
     return fmt::format("polygons {} {} {} {} {}", raster.DataType(), raster.Samples(),
                        raster.Lines(), band_, bool(mask_));
@@ -97,7 +100,7 @@ class PolygonizeCommand final : public RasterCommand {
     Share share;
     if (!ReadShare(Read<Array<unsigned>>(kShareInput), share)) return false;
     const std::string file = Read<String>(kShareFileInput).ToUTF8();
-    if (file.empty() || HasInput(kShareFilesInput)) {
+    if (file.empty() || Joins()) {
       SetFault("Share goes with ShareFile, and not with ShareFiles");
       return false;
     }
@@ -139,7 +142,7 @@ class PolygonizeCommand final : public RasterCommand {
   /// Runs the process into a writer. False, with the fault set, when not all polygons are written.
   template <typename T>
   bool Run(const RasterPtr<T>& raster, const ObjectPtr& writer) {
-    if (HasInput(kShareFilesInput)) return TakeShares<T>(*raster, writer);
+    if (Joins()) return TakeShares<T>(*raster, writer);
     RasterToVectorProcess<T> process(raster, band_, writer, GetIPC());
     process.SetMask(mask_);
     const bool hasRun = process.RunProcess(process.kHere);

@@ -228,8 +228,7 @@ bool PutFootprint(MosaicRasterDef<T>& definition, unsigned scene, const Footprin
                   const IPC& ipc, SceneShares& shares) {
   const String key = definition.SceneKey(scene);
   const RasterPtr<T>& raster = definition.Scenes()[scene];
-  const std::string path =
-      platform::TemporaryPathBeside((fs::temp_directory_path() / "vexg_footprint.msf").string());
+  const std::string path = platform::TemporaryPathBeside(shares.GetFile());
   catalog::Add(raster);
   const String reason = RunFootprintJob(
       URI(key), path, options, options.masks.GetCount() != 0 ? options.masks[scene] : URI(), ipc);

@@ -35,6 +35,8 @@ class VEXG_EXPORT SceneShares {
   bool IsWanted(unsigned scene) const {
     return !isShare_ || (share_.Begin(scenes_) <= scene && scene < share_.End(scenes_));
   }
+  /// The file of the share, beside which it may lay others for a while.
+  const std::string& GetFile() const { return file_; }
   /// Takes the work on a scene; scenes come in their order.
   ShareWriter& Out(unsigned scene) {
     out_.Put(scene);

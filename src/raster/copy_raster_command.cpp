@@ -85,7 +85,8 @@ class CopyRasterCommand final : public RasterCommand {
     if (!CheckBands(*source, bands)) return Fail();
     if (bands.GetCount() != target->Bands()) return Fail("the numbers of bands differ");
 
-    if (HoldsPixels(*source, *target) && HasInput(kShareFilesInput)) return TakeCounts(bands);
+    const bool hasCounts = Read<Array<String>>(kShareFilesInput).GetCount() != 0;
+    if (hasCounts && HoldsPixels(*source, *target)) return TakeCounts(bands);
 
     const bool copied = DispatchType(TwelveTypes{}, source->DataType(), [&]<typename T>() {
       return Copied<T>(RasterPtr<T>(source), RasterPtr<T>(target), bands);

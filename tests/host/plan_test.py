@@ -198,6 +198,15 @@ class Joining(PlanTest):
         (place / "other.tif").rename(place / "part-0001.tif")
         self.fine("run", "-q", place / "merge.xml")
         self.assert_same(place / "o.tif", self.single("bands"))
+        (place / "o.tif").unlink()
+        whole = (place / "part-0002.tif").read_bytes()
+        for name, data in (("cut off", whole[:-200]), ("without pixels", whole[:100]), ("empty", b"")):
+            with self.subTest(name):
+                (place / "part-0002.tif").write_bytes(data)
+                code, _, err = run("run", "-q", str(place / "merge.xml"))
+                self.assertEqual(code, 1)
+                self.assertIn("part-0002.tif", err)
+                (place / "o.tif").unlink()  # of a document that runs without --once
 
     def test_a_vrt_file_shows_the_files_of_the_parts_and_moves_with_them(self):
         for name, parts in (("masked", 3), ("calc", 4), ("cog", 2)):
