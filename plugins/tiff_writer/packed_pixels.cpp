@@ -500,7 +500,7 @@ bool PackedPixels::TakeBlocks(PackedRows& rows, const std::vector<std::uint64_t>
     if (!work.why.empty()) return Fail(raster_.path + ": " + work.why);
     if (!Prepare(work)) return false;
   }
-  ParallelFor(static_cast<unsigned>(batch.size()), nullptr, [&](unsigned i) { Run(batch[i]); });
+  RunByCrew(static_cast<unsigned>(batch.size()), [&](unsigned i) { Run(batch[i]); });
   for (Work& work : batch) {
     if (!Store(work)) return false;
   }
