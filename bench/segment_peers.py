@@ -135,6 +135,30 @@ def two_threads(bench, what, command, labels, aim):
     print(f"  {what}: two threads {ratio:.2f} times one (aim {aim}{'' if ratio >= aim else ', MISSED'})")
 
 
+def make_noise(path, size):
+    import numpy
+    from osgeo import gdal
+    gdal.UseExceptions()
+    out = gdal.GetDriverByName("GTiff").Create(str(path), size, size, 1, gdal.GDT_Byte)
+    out.WriteArray(numpy.random.default_rng(5).integers(0, 256, (size, size), dtype=numpy.uint8))
+
+
+def high(bench, labels):
+    """Noise with a threshold that joins all of it, beside a usual one, and how that grows with the raster."""
+    per_pixel = []
+    for size in (1000, 2000):
+        scene = bench.work / f"noise-{size}.tif"
+        if not scene.exists():
+            maker = multiprocessing.get_context("spawn").Process(target=make_noise, args=(scene, size))
+            maker.start()
+            maker.join()
+        run = [bench.vexg, "segment", scene, labels, "-q", "--merge-value"]
+        took, _ = bench.compare(f"noise {size} x {size}, all joined", [*run, "1e9"], {"few joined": [*run, "300"]}, 4, clean=[labels])
+        per_pixel.append(took / size ** 2)
+    growth = per_pixel[1] / per_pixel[0]
+    print(f"  a pixel of four times as much noise takes {growth:.2f} times as long (aim 1.6{'' if growth <= 1.6 else ', MISSED'})")
+
+
 def whole(bench, merged, scene, labels):
     """A raster as a whole beside tiles and smaller ones, in rounds, with a tree, and its cuts."""
     on = lambda file, *options: [file if word == scene else word for word in merged] + list(options)
@@ -149,6 +173,7 @@ def whole(bench, merged, scene, labels):
     cut = [bench.vexg, "segment", "cut", tree, labels, "-q", "--merge-value", "100"]
     bench.compare("a cut", cut, {"a run": on(large)}, clean=[labels])
     tree.unlink(missing_ok=True)
+    high(bench, labels)
     small, _ = bench.compare("as a whole, 1000 x 1000 x 6", merged, {"in tiles": [*merged, "--tiled"]}, 1.3, clean=[labels])
     huge, _ = fields(bench, 10000)
     most, _ = bench.compare("as a whole, 10,000 x 10,000 x 6", on(huge), {"in tiles": on(huge, "--tiled")}, 1.3, clean=[labels])
