@@ -66,8 +66,8 @@ class OpenBlocks {
   std::vector<std::uint64_t> freeSlots_;
 };
 
-/// What happened to a file without a name, which tells of itself by its folder, as a fault of the
-/// raster that it is for.
+/// Words what happened to a file without a name, which tells of itself by its folder, as a fault of
+/// the raster that it is for.
 std::string FaultOfUnnamed(const std::string& path, const std::string& why);
 
 /// A run of bytes that repeats one value.

@@ -19,7 +19,7 @@ template <typename E>
 bool SizeBlock(Array<E>& block, Interleave interleave, const SubRect& rect, unsigned bands,
                bool isCleared = true) {
   const ArrayDims dims = BlockDims(interleave, rect.Width(), rect.Height(), bands);
-  // What it held is of no use in a larger one, and would be copied there.
+  // A larger one would get a copy of the old contents, which are of no use.
   if (dims.count > block.GetCapacity() && block.OwnsData()) block = Array<E>();
   if (!block.Resize(dims) || block.GetCount() != dims.count) return false;
   if (isCleared) std::fill_n(block.GetData(), block.GetCount(), E());

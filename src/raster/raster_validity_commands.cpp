@@ -50,7 +50,7 @@ class QueryRasterValidityCommand final : public RasterCommand {
       counts.Add(tile);
       if (wantsValues) NoteValues(tile, *uses.Borrow(tile.Bands()));
     };
-    const RasterIteratorPtr<T> tiles(new RasterIteratorSmart<T>(raster, AllBands(*raster)));
+    const RasterIteratorPtr<T> tiles(new RasterIteratorStream<T>(raster));
     if (!ForEachTile("QueryRasterValidity", TilesBy(tiles), look, GetIPC())) return false;
     std::vector<ValueUse<T>> use(raster->Bands());
     for (const auto& ofThread : uses.TakeAll()) {
