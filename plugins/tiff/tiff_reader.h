@@ -2,6 +2,7 @@
 
 #include <optional>
 
+#include "data/ordered_read.h"
 #include "data/plain_raster_reader.h"
 #include "tiff/tiff_source.h"
 
@@ -10,7 +11,7 @@ namespace lumo::tiff {
 /// Reads a Source; what that can't do itself goes to GDAL's reader, and so does everything that
 /// changes the file, and what is read after it.
 template <typename T>
-class Reader final : public PlainRasterReader<T> {
+class Reader final : public PlainRasterReader<T>, public OrderedReads<T> {
  public:
   /// @param source    outlives the reader.
   Reader(RasterDataConnection* connection, Source& source, const RasterDef& def);
@@ -53,6 +54,9 @@ class Reader final : public PlainRasterReader<T> {
   bool ReadPixels(unsigned left, unsigned top, unsigned width, unsigned height,
                   const Array<unsigned>& bands, unsigned level, T* pixels,
                   unsigned char* state) override;
+  /// Takes bands that lie pixel by pixel apart while blocks are decoded.
+  std::optional<bool> ReadOrdered(const SubRect& rect, const Array<unsigned>& bands, unsigned level,
+                                  Interleave order, T* pixels, unsigned char* state) override;
   bool WritePixels(unsigned left, unsigned top, unsigned width, unsigned height,
                    const Array<unsigned>& bands, unsigned level, const T* pixels,
                    const unsigned char* state) override;
@@ -61,6 +65,8 @@ class Reader final : public PlainRasterReader<T> {
   RasterReader<T>* Inner();
   RasterReader<T>* Opened() { return source_.HasInner() ? Inner() : nullptr; }
   RasterReader<T>* Changing();
+  void MarkNoData(unsigned width, unsigned height, unsigned bands, Interleave order,
+                  const T* pixels, unsigned char* state) const;
   bool ReadMasked(const Rect& rect, const Array<unsigned>& bands, unsigned level, T* pixels,
                   unsigned char* state);
   bool IsInside(unsigned left, unsigned top, unsigned width, unsigned height,

@@ -193,11 +193,7 @@ bool Reader<T>::ReadPixels(unsigned left, unsigned top, unsigned width, unsigned
     return inner != nullptr &&
            inner->ReadPixels(left, top, width, height, bands, level, pixels, state);
   }
-  if (noData_) {
-    const NoDataMarker<T> marker(std::vector<std::optional<T>>(bands.GetCount(), noData_),
-                                 def_.interleave, width, height);
-    marker.Mark(0, std::uint64_t{width} * height * bands.GetCount(), pixels, state);
-  }
+  MarkNoData(width, height, bands.GetCount(), def_.interleave, pixels, state);
   if (!mask.empty()) {
     const BlockStrides strides(def_.interleave, width, height, bands.GetCount());
     for (unsigned y = 0; y < height; ++y) {
@@ -205,6 +201,30 @@ bool Reader<T>::ReadPixels(unsigned left, unsigned top, unsigned width, unsigned
                     PixelValueState::Masked, state + y * strides.line);
     }
   }
+  return true;
+}
+
+template <typename T>
+void Reader<T>::MarkNoData(unsigned width, unsigned height, unsigned bands, Interleave order,
+                           const T* pixels, unsigned char* state) const {
+  if (!noData_) return;
+  const NoDataMarker<T> marker(std::vector<std::optional<T>>(bands, noData_), order, width, height);
+  marker.Mark(0, std::uint64_t{width} * height * bands, pixels, state);
+}
+
+template <typename T>
+std::optional<bool> Reader<T>::ReadOrdered(const SubRect& rect, const Array<unsigned>& bands,
+                                           unsigned level, Interleave order, T* pixels,
+                                           unsigned char* state) {
+  const unsigned width = rect.Width(), height = rect.Height(), count = bands.GetCount();
+  const bool isRead = order == Interleave::BSQ && def_.interleave == Interleave::BIP &&
+                      !source_.MaskingBand() && !source_.HasMasks() && !hasChanged_ &&
+                      IsInside(rect.left, rect.top, width, height, bands, level) &&
+                      source_.Read({rect.left, rect.top, width, height}, bands, level,
+                                   reinterpret_cast<unsigned char*>(pixels), true);
+  if (!isRead) return std::nullopt;
+  std::fill_n(state, std::size_t{width} * height * count, static_cast<unsigned char>(0));
+  MarkNoData(width, height, count, order, pixels, state);
   return true;
 }
 

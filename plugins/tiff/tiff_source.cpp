@@ -380,12 +380,12 @@ bool Source::Describe(const String& formatKey) {
 }
 
 bool Source::Read(const Rect& rect, const Array<unsigned>& bands, unsigned level,
-                  unsigned char* pixels) {
+                  unsigned char* pixels, bool splits) {
   const auto image = levels_.find(level);
   if (image == levels_.end()) return false;
   std::unique_ptr<Window>& window = windows_[level];
   if (window == nullptr) window = std::make_unique<Window>(*file_, image->second);
-  return window->Read(rect, bands, pixels);
+  return window->Read(rect, bands, pixels, splits);
 }
 
 bool Source::ReadMask(const Rect& rect, unsigned level, std::vector<unsigned char>& mask) {

@@ -45,7 +45,9 @@ class Source {
   bool ReadMask(const Rect& rect, unsigned level, std::vector<unsigned char>& mask);
 
   /// Reads a rectangle of a level, in the order of axes of the description.
-  bool Read(const Rect& rect, const Array<unsigned>& bands, unsigned level, unsigned char* pixels);
+  /// @param splits  band after band, whatever that order.
+  bool Read(const Rect& rect, const Array<unsigned>& bands, unsigned level, unsigned char* pixels,
+            bool splits = false);
 
   /// True when the file may be written.
   bool CanWrite();

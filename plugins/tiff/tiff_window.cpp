@@ -5,6 +5,7 @@
 #include <cstring>
 #include <utility>
 
+#include "raster/interleave_lines.h"
 #include "tasks/crew.h"
 
 namespace lumo::tiff {
@@ -13,16 +14,24 @@ namespace {
 /// Decoded bytes that are worth a task of their own.
 constexpr std::size_t kTaskBytes = 64 << 10;
 
-/// Copies rows of pixels, all bands of them or some.
+/// Copies rows of pixels, all bands of them or some, as they are or band after band.
 struct Carrier {
   std::size_t element;                      // bytes of a value
   std::size_t pixel;                        // bytes of a pixel in the block
   std::size_t bands;                        // that are wanted
   const Array<unsigned>* chosen = nullptr;  // null: all, in their order
+  std::size_t plane = 0;                    // values from a band to the next; 0: bands by pixel
+
+  /// True where rows are copied as they are.
+  bool IsPlain() const { return chosen == nullptr && plane == 0; }
 
   void Row(const unsigned char* from, unsigned char* to, std::size_t width) const {
-    if (chosen == nullptr) {
+    if (IsPlain()) {
       std::memcpy(to, from, width * pixel);
+      return;
+    }
+    if (chosen == nullptr) {
+      SplitPixels(from, to, width, bands, plane, element);
       return;
     }
     switch (element) {
@@ -40,9 +49,11 @@ struct Carrier {
  private:
   template <std::size_t kBytes>
   void Pick(const unsigned char* from, unsigned char* to, std::size_t width) const {
-    for (std::size_t x = 0; x < width; ++x, from += pixel) {
-      for (std::size_t i = 0; i < bands; ++i, to += kBytes) {
-        std::memcpy(to, from + (*chosen)[static_cast<unsigned>(i)] * kBytes, kBytes);
+    const std::size_t across = plane != 0 ? kBytes : bands * kBytes;
+    const std::size_t down = plane != 0 ? plane * kBytes : kBytes;
+    for (std::size_t x = 0; x < width; ++x, from += pixel, to += across) {
+      for (std::size_t i = 0; i < bands; ++i) {
+        std::memcpy(to + i * down, from + (*chosen)[static_cast<unsigned>(i)] * kBytes, kBytes);
       }
     }
   }
@@ -113,7 +124,7 @@ bool Window::ReadPlain(const Piece& piece) {
   const std::uint64_t first =
       offsets_[piece.block] + piece.top * rowBytes + piece.left * pixelBytes;
   const std::size_t bytes = piece.width * pixelBytes;
-  const bool isPlain = piece.carrier->chosen == nullptr;
+  const bool isPlain = piece.carrier->IsPlain();
   if (isPlain && bytes == rowBytes && piece.stride == rowBytes) {
     return file_.Handle().Read(first, piece.to, piece.height * rowBytes);
   }
@@ -174,7 +185,7 @@ bool Window::ReadPiece(const Piece& piece) {
       piece.height == piece.lines &&
       (isWholeWidth || piece.left + piece.width == image_.samples % image_.blockWidth);
   const bool isPassing = isWhole && !piece.isKept;
-  if (isPassing && isWholeWidth && piece.stride == rowBytes && piece.carrier->chosen == nullptr) {
+  if (isPassing && isWholeWidth && piece.stride == rowBytes && piece.carrier->IsPlain()) {
     return DecodeBlock(piece.block, piece.lines, piece.to);
   }
   const std::size_t bytes = piece.lines * rowBytes;
@@ -193,13 +204,16 @@ bool Window::ReadPiece(const Piece& piece) {
   return true;
 }
 
-bool Window::Read(const Rect& rect, const Array<unsigned>& bands, unsigned char* pixels) {
+bool Window::Read(const Rect& rect, const Array<unsigned>& bands, unsigned char* pixels,
+                  bool splits) {
   if (!FindBlocks()) return false;
   const unsigned count = bands.GetCount();
   Carrier carrier{image_.elementBytes, image_.PixelBytes(), count};
   if (image_.byPixel && !AreAll(bands, image_.bands)) carrier.chosen = &bands;
+  const bool isByPixel = image_.byPixel && !splits;  // where the pixels go
+  if (image_.byPixel && splits) carrier.plane = std::size_t{rect.width} * rect.height;
   const std::size_t rowBytes =
-      std::size_t{rect.width} * image_.elementBytes * (image_.byPixel ? count : 1);
+      std::size_t{rect.width} * image_.elementBytes * (isByPixel ? count : 1);
   const unsigned planes = image_.byPixel ? 1 : count;
   const std::uint64_t perPlane = std::uint64_t{image_.BlocksAcross()} * image_.BlocksDown();
   const unsigned bottom = rect.top + rect.height, right = rect.left + rect.width;

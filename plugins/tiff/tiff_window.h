@@ -28,7 +28,9 @@ class Window {
 
   /// Reads a rectangle inside the image, in the image's order of axes: pixel by pixel, or band
   /// after band.
-  bool Read(const Rect& rect, const Array<unsigned>& bands, unsigned char* pixels);
+  /// @param splits  band after band also where the image has them pixel by pixel.
+  bool Read(const Rect& rect, const Array<unsigned>& bands, unsigned char* pixels,
+            bool splits = false);
 
  private:
   struct Piece;

@@ -154,14 +154,16 @@ class MtRasterReader final : public RasterReader<T>, public OrderedReads<T> {
   std::optional<bool> ReadOrdered(const SubRect& rect, const Array<unsigned>& bands, unsigned level,
                                   Interleave order, T* pixels, unsigned char* state) override {
     using Answer = std::optional<bool>;
-    if (!isConcurrent_) return Answer();
-    const Answer isRead =
-        CallWith<Answer>(42, "DcSrvCmdRrReadPixels", [&](auto& reader, Answer& result) {
-          isConcurrent_ = dynamic_cast<ConcurrentReads*>(&reader) != nullptr;
-          if (!isConcurrent_) return;
-          result = detail::ReadInOrder(reader, rect, bands, level, order, pixels, state);
-        });
-    return isRead;
+    if (!maybeOrders_) return Answer();
+    return CallWith<Answer>(42, "DcSrvCmdRrReadPixels", [&](auto& reader, Answer& result) {
+      if (auto* const orders = dynamic_cast<OrderedReads<T>*>(&reader)) {
+        result = orders->ReadOrdered(rect, bands, level, order, pixels, state);
+      } else if (dynamic_cast<ConcurrentReads*>(&reader) != nullptr) {
+        result = detail::ReadInOrder(reader, rect, bands, level, order, pixels, state);
+      } else {
+        maybeOrders_ = false;
+      }
+    });
   }
   bool CanWritePixels(unsigned level) override {
     return Call<bool>(43, "DcSrvCmdRrCanWritePixels",
@@ -238,7 +240,7 @@ class MtRasterReader final : public RasterReader<T>, public OrderedReads<T> {
   }
 
   MtRasterDataConnection* proxy_;
-  std::atomic<bool> isConcurrent_{true};  // until the plug-in's reader has been looked at
+  std::atomic<bool> maybeOrders_{true};  // until the plug-in's reader has been looked at
   BandAnswers<bool> statsExist_;
   BandAnswers<bool> hasNoDataValue_;
   BandAnswers<T> noDataValue_;

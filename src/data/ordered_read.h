@@ -14,13 +14,14 @@ class VEXG_EXPORT ConcurrentReads {
   virtual ~ConcurrentReads() = default;
 };
 
-/// The road of the same to a reader on another thread.
+/// Marks a reader that brings blocks in other orders than the source's by itself.
 template <typename T>
 class OrderedReads {
  public:
   virtual ~OrderedReads() = default;
-  /// Reads a block as RasterReader::ReadBlock does, into memory of its size.
-  /// @return nothing, with nothing read, for a reader that isn't a ConcurrentReads.
+  /// Reads a block as RasterReader::ReadBlock does, into memory of its size, all of which is
+  /// written, the states too.
+  /// @return nothing where this block has to be read by ReadPixels and put in order then.
   virtual std::optional<bool> ReadOrdered(const SubRect& rect, const Array<unsigned>& bands,
                                           unsigned level, Interleave order, T* pixels,
                                           unsigned char* state) = 0;

@@ -85,9 +85,9 @@ bool ReadConverted(RasterReader<T>& reader, const SubRect& rect, const Array<uns
                    unsigned level, Interleave order, bool isCleared, T* pixels,
                    unsigned char* state) {
   const Interleave native = reader.NativeInterleave();
-  if (auto* const proxy = dynamic_cast<OrderedReads<T>*>(&reader)) {
+  if (auto* const orders = dynamic_cast<OrderedReads<T>*>(&reader)) {
     if (native != Interleave::None) {
-      const auto isRead = proxy->ReadOrdered(rect, bands, level, order, pixels, state);
+      const auto isRead = orders->ReadOrdered(rect, bands, level, order, pixels, state);
       if (isRead) return *isRead;
     }
   } else if (native != Interleave::None && dynamic_cast<ConcurrentReads*>(&reader) != nullptr) {

@@ -1,11 +1,13 @@
 #include "platform/module.h"
 
 #include <algorithm>
+#include <atomic>
 #include <cerrno>
 #include <cstring>
 #include <dlfcn.h>
 #include <filesystem>
 #include <iterator>
+#include <memory>
 
 #include "platform/memory_shortage.h"
 
@@ -59,9 +61,15 @@ std::string FindLibraryDirectory() {
 }  // namespace
 
 std::string LibraryDirectory() {
-  // Asked for with each plug-in; the system walks through all symbols of the library to tell.
-  static const std::string directory = FindLibraryDirectory();
-  return directory;
+  // Asked for with each plug-in; the system walks through all symbols of the library to tell. Who
+  // comes first waits for nobody: the loader may hold its lock there.
+  static std::atomic<const std::string*> known{nullptr};
+  const std::string* directory = known;
+  if (directory == nullptr) {
+    auto fresh = std::make_unique<const std::string>(FindLibraryDirectory());
+    if (known.compare_exchange_strong(directory, fresh.get())) directory = fresh.release();
+  }
+  return *directory;
 }
 
 }  // namespace lumo::platform

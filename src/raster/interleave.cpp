@@ -307,6 +307,13 @@ bool ConvertInterleave(const void* from, Interleave fromOrder, void* to, Interle
   return true;
 }
 
+void SplitPixels(const void* from, void* to, std::size_t pixels, std::size_t bands,
+                 std::size_t bandStride, std::size_t elementBytes) {
+  ForElement(elementBytes, [&]<typename E>() {
+    Split<E>(static_cast<const E*>(from), static_cast<E*>(to), pixels, bands, bandStride);
+  });
+}
+
 void ConvertLines(const void* from, Interleave fromOrder, const LinesOfBlock& part, void* to,
                   Interleave toOrder, std::size_t samples, std::size_t bands,
                   std::size_t elementBytes) {
@@ -320,10 +327,7 @@ void ConvertLines(const void* from, Interleave fromOrder, const LinesOfBlock& pa
   const auto* const in = static_cast<const std::byte*>(from);
   std::byte* const plane = out + part.first * rowBytes;
   if (fromOrder == Interleave::BIP) {
-    ForElement(elementBytes, [&]<typename E>() {
-      Split<E>(static_cast<const E*>(from), reinterpret_cast<E*>(plane), samples * part.count,
-               bands, samples * part.ofLines);
-    });
+    SplitPixels(from, plane, samples * part.count, bands, samples * part.ofLines, elementBytes);
   } else if (fromOrder == Interleave::BIL) {
     MoveRows(in, plane, part.count, bands, rowBytes, part.ofLines);
   } else {

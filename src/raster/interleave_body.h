@@ -8,6 +8,8 @@
 #include <cstring>
 #include <utility>
 
+#include "platform/lane_shuffle.h"
+
 #if defined(__x86_64__)
 #include <immintrin.h>
 #endif
@@ -47,8 +49,8 @@ template <std::size_t kHalf, typename E, std::size_t kBytes>
   constexpr std::size_t kN = kLanes<E>;
   constexpr std::size_t kAll = kBytes / sizeof(E);
   [&]<std::size_t... I>(std::index_sequence<I...>) __attribute__((always_inline)) {
-    out.lanes = __builtin_shufflevector(
-        a.lanes, b.lanes, (I / kN * kN + kHalf * kN / 2 + I % kN / 2 + I % 2 * kAll)...);
+    platform::ShuffleLanes<static_cast<int>(I / kN * kN + kHalf * kN / 2 + I % kN / 2 +
+                                            I % 2 * kAll)...>(a.lanes, b.lanes, out.lanes);
   }
   (std::make_index_sequence<kAll>());
 }
@@ -58,7 +60,7 @@ template <std::size_t kOdd, typename E>
 [[gnu::always_inline]] inline void Unzip(const Register<E>& a, const Register<E>& b,
                                          Register<E>& out) {
   [&]<std::size_t... I>(std::index_sequence<I...>) __attribute__((always_inline)) {
-    out.lanes = __builtin_shufflevector(a.lanes, b.lanes, (2 * I + kOdd)...);
+    platform::ShuffleLanes<static_cast<int>(2 * I + kOdd)...>(a.lanes, b.lanes, out.lanes);
   }
   (std::make_index_sequence<kLanes<E>>());
 }

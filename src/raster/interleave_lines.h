@@ -22,4 +22,9 @@ VEXG_EXPORT void ConvertLines(const void* from, Interleave fromOrder, const Line
                               void* to, Interleave toOrder, std::size_t samples, std::size_t bands,
                               std::size_t elementBytes);
 
+/// Takes pixels of several bands apart, each band to a place of its own in a larger block.
+/// @param bandStride  elements from a band's place to the next one's, `pixels` or more.
+VEXG_EXPORT void SplitPixels(const void* from, void* to, std::size_t pixels, std::size_t bands,
+                             std::size_t bandStride, std::size_t elementBytes);
+
 }  // namespace lumo

@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <cstring>
 
+#include "platform/lane_shuffle.h"
 #include "platform/vector_clones.h"
 
 namespace lumo {
@@ -78,17 +79,17 @@ template <typename T>
     constexpr bool kIsSigned = std::is_signed_v<T>;
     Bytes wide;  // place 15 holds a 0
     if constexpr (sizeof(T) == 1 && !kIsSigned) {
-      wide = __builtin_shufflevector(bytes, bytes, 0, 15, 15, 15, 1, 15, 15, 15, 2, 15, 15, 15, 3,
-                                     15, 15, 15);
+      platform::ShuffleLanes<0, 15, 15, 15, 1, 15, 15, 15, 2, 15, 15, 15, 3, 15, 15, 15>(
+          bytes, bytes, wide);
     } else if constexpr (sizeof(T) == 1) {
-      wide = __builtin_shufflevector(bytes, bytes, 15, 15, 15, 0, 15, 15, 15, 1, 15, 15, 15, 2, 15,
-                                     15, 15, 3);
+      platform::ShuffleLanes<15, 15, 15, 0, 15, 15, 15, 1, 15, 15, 15, 2, 15, 15, 15, 3>(
+          bytes, bytes, wide);
     } else if constexpr (!kIsSigned) {
-      wide = __builtin_shufflevector(bytes, bytes, 0, 1, 15, 15, 2, 3, 15, 15, 4, 5, 15, 15, 6, 7,
-                                     15, 15);
+      platform::ShuffleLanes<0, 1, 15, 15, 2, 3, 15, 15, 4, 5, 15, 15, 6, 7, 15, 15>(bytes, bytes,
+                                                                                     wide);
     } else {
-      wide = __builtin_shufflevector(bytes, bytes, 15, 15, 0, 1, 15, 15, 2, 3, 15, 15, 4, 5, 15, 15,
-                                     6, 7);
+      platform::ShuffleLanes<15, 15, 0, 1, 15, 15, 2, 3, 15, 15, 4, 5, 15, 15, 6, 7>(bytes, bytes,
+                                                                                     wide);
     }
     Four values = reinterpret_cast<Four>(wide);
     if constexpr (kIsSigned) values >>= 8 * static_cast<int>(4 - sizeof(T));

@@ -130,6 +130,15 @@ void ExpectSamePixels(RasterReader<T>& ours, RasterReader<T>& theirs, unsigned l
     EXPECT_EQ(0, std::memcmp(own.data(), other.data(), count * sizeof(T)))
         << left << " " << top << " " << width << " " << height;
     EXPECT_EQ(ownState, otherState);
+    Array<T> ordered, otherOrdered;
+    Array<unsigned char> orderedState, otherOrderedState;
+    const SubRect rect(left, top, left + width - 1, top + height - 1);
+    const Interleave order = i % 2 == 0 ? Interleave::BSQ : Interleave::BIL;
+    ASSERT_TRUE(ours.ReadBlock(rect, bands, level, order, ordered, orderedState));
+    ASSERT_TRUE(theirs.ReadBlock(rect, bands, level, order, otherOrdered, otherOrderedState));
+    EXPECT_EQ(0, std::memcmp(ordered.GetData(), otherOrdered.GetData(), count * sizeof(T)));
+    EXPECT_TRUE(std::equal(orderedState.begin(), orderedState.end(), otherOrderedState.begin(),
+                           otherOrderedState.end()));
   }
 }
 
