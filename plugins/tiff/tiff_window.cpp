@@ -158,7 +158,7 @@ bool Window::ReadPlainOrKept(const Piece& piece) {
   if (const Bytes kept = cache.Find(group_, piece.block)) return Carry(piece, kept.get());
   if (std::exchange(wasAsked_[piece.block], 1) == 0) return ReadPlain(piece);
   if (offsets_[piece.block] == 0 || sizes_[piece.block] < bytes) return false;
-  auto block = std::make_shared_for_overwrite<unsigned char[]>(bytes);
+  std::shared_ptr<unsigned char[]> block(std::make_unique_for_overwrite<unsigned char[]>(bytes));
   if (!file_.Handle().Read(offsets_[piece.block], block.get(), bytes)) return false;
   Carry(piece, block.get());
   hasKept_ = true;
@@ -196,7 +196,7 @@ bool Window::ReadPiece(const Piece& piece) {
   }
   BlockCache& cache = BlockCache::Get();
   if (const Bytes kept = cache.Find(group_, piece.block)) return Carry(piece, kept.get());
-  auto decoded = std::make_shared_for_overwrite<unsigned char[]>(bytes);
+  std::shared_ptr<unsigned char[]> decoded(std::make_unique_for_overwrite<unsigned char[]>(bytes));
   if (!DecodeBlock(piece.block, piece.lines, decoded.get())) return false;
   Carry(piece, decoded.get());
   hasKept_ = true;
