@@ -37,7 +37,7 @@ if(VEXG_CCACHE AND NOT CMAKE_CXX_COMPILER_LAUNCHER)
       CCACHE_NOHASHDIR=1 CCACHE_SLOPPINESS=pch_defines,time_macros ${VEXG_CCACHE})
 endif()
 find_program(VEXG_MOLD mold)
-if(VEXG_MOLD)
+if(VEXG_MOLD AND NOT CMAKE_CROSSCOMPILING)
   add_link_options(-fuse-ld=mold)
 endif()
 

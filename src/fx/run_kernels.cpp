@@ -59,12 +59,10 @@ VEXG_INLINE void AddPiece(const T* value, std::uint32_t count, std::size_t bands
   using Square = typename Lanes<std::uint32_t, kLanes>::Type;
   using SquareSum = std::conditional_t<sizeof(T) == 1, std::uint32_t, std::uint64_t>;
   using Squares = typename Lanes<SquareSum, kLanes>::Type;
-  Wide sum{}, min{}, max{};
+  Wide sum{};
+  Wide min = sum + std::int32_t{std::numeric_limits<T>::max()};
+  Wide max = sum + std::int32_t{std::numeric_limits<T>::lowest()};
   Squares squares{};
-  for (std::size_t i = 0; i < kLanes; ++i) {
-    min[i] = std::numeric_limits<T>::max();
-    max[i] = std::numeric_limits<T>::lowest();
-  }
   for (std::uint32_t i = 0; i < count; ++i, value += bands) {
     Wide wide;
     Widen<kLanes>(value, wide);
