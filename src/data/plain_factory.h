@@ -10,7 +10,7 @@ namespace lumo {
 /// class. A plug-in's own derives from it, and has to recognise its sources and to make a
 /// connection; the connection opens or makes the source.
 ///
-/// What a format doesn't hold, rasters or vectors, can't be made: the fault says so.
+/// Rasters or vectors can't be made where a format doesn't hold them: the fault says so.
 class VEXG_EXPORT PlainFactory : public DataConnectionFactory {
  public:
   /// True.
