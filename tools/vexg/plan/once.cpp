@@ -216,8 +216,7 @@ class OnceRun {
     all["inputs"] = AsJson(read);
     all.update(ResultAsJson(document, result));
     const std::string text = all.dump(1) + "\n";
-    if (!request_.isDurable) return Output(resultPath_).Write(text);
-    std::string fault;
+    std::string fault;  // a kill leaves the whole result or none, and nothing beside the whole one
     if (platform::ReplaceFile(resultPath_, text, &fault)) return;
     throw HostError(kExitFailed, "the result can't be written: " + fault);
   }
