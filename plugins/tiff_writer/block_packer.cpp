@@ -8,6 +8,8 @@
 #include <tiffio.h>
 #include <zstd.h>
 
+#include "raster/pixel_types.h"
+
 namespace lumo::tiff {
 namespace {
 
@@ -356,6 +358,36 @@ bool Unpack(const Packing& packing, unsigned width, unsigned height,
     return UnpackZstd(packing, width, height, packed, block, why);
   }
   return UnpackByLibrary(packing, width, height, packed, block, why);
+}
+
+namespace {
+
+/// The number of tag 339.
+unsigned SampleFormatOf(unsigned dataType) {
+  unsigned format = 1;
+  DispatchType(TwelveTypes{}, dataType, [&]<typename T>() {
+    format = std::is_floating_point_v<T> ? 3
+             : !std::is_integral_v<T>    ? 6
+             : std::is_signed_v<T>       ? 2
+                                         : 1;
+    return true;
+  });
+  return format;
+}
+
+}  // namespace
+
+Packing PackingOf(const RasterDef& def, const BlockLayout& layout) {
+  Packing packing;
+  const CreationOptions& wanted = def.creation;
+  packing.compression = wanted.compression;
+  packing.predictor = PredictorOf(def);
+  packing.level = wanted.level;
+  packing.bits = layout.element * 8;
+  packing.depth = layout.Depth();
+  packing.sampleFormat = SampleFormatOf(def.dataType);
+  packing.isTiled = layout.isTiled;
+  return packing;
 }
 
 }  // namespace lumo::tiff

@@ -5,7 +5,8 @@
 #include <string>
 #include <vector>
 
-#include "raster/creation_options.h"
+#include "raster/raster_def.h"
+#include "tiff_writer/block_layout.h"
 
 namespace lumo::tiff {
 
@@ -28,6 +29,9 @@ struct Packing {
     return (std::uint64_t{width} * depth * bits + 7) / 8;
   }
 };
+
+/// Gives the packing of a raster whose creation options name a codec.
+Packing PackingOf(const RasterDef& def, const BlockLayout& layout);
 
 /// Packs a block.
 ///

@@ -6,7 +6,6 @@
 
 #include "foundation/fault.h"
 #include "foundation/library.h"
-#include "raster/pixel_types.h"
 #include "tasks/crew.h"
 #include "tiff_writer/cog_file.h"
 #include "tiff_writer/directory_writer.h"
@@ -22,57 +21,11 @@ bool Fail(const std::string& why) {
   return false;
 }
 
-/// The number of tag 339.
-unsigned SampleFormatOf(unsigned dataType) {
-  unsigned format = 1;
-  DispatchType(TwelveTypes{}, dataType, [&]<typename T>() {
-    format = std::is_floating_point_v<T> ? 3
-             : !std::is_integral_v<T>    ? 6
-             : std::is_signed_v<T>       ? 2
-                                         : 1;
-    return true;
-  });
-  return format;
-}
-
-Packing PackingOf(const PackedRaster& raster) {
-  Packing packing;
-  const CreationOptions& wanted = raster.def.creation;
-  packing.compression = wanted.compression;
-  packing.predictor = PredictorOf(raster.def);
-  packing.level = wanted.level;
-  packing.bits = raster.layout.element * 8;
-  packing.depth = raster.layout.Depth();
-  packing.sampleFormat = SampleFormatOf(raster.def.dataType);
-  packing.isTiled = raster.layout.isTiled;
-  return packing;
-}
-
-bool IsFilled(const std::vector<unsigned char>& pixels, const std::vector<unsigned char>& fill) {
-  const std::size_t each = fill.size();
-  // Equal to itself one value on, and its first value the fill value.
-  return std::memcmp(pixels.data(), fill.data(), each) == 0 &&
-         std::memcmp(pixels.data(), pixels.data() + each, pixels.size() - each) == 0;
-}
-
 }  // namespace
-
-/// A block that is being packed.
-struct PackedPixels::Work {
-  unsigned level;
-  std::uint64_t block;
-  OpenBlock* open = nullptr;
-  unsigned width = 0, height = 0;  ///< inside the raster
-  bool isFill = false;
-  bool isTaken = false;  ///< packed by somebody else
-  std::vector<unsigned char> packed, packedMask;
-  std::vector<unsigned char> reduced, reducedExcluded;  ///< of the level above
-  std::string why;
-};
 
 PackedPixels::PackedPixels(PackedRaster raster)
     : raster_(std::move(raster)),
-      packing_(PackingOf(raster_)),
+      packing_(PackingOf(raster_.def, raster_.layout)),
       reducer_(raster_.def, raster_.layout.Depth(), raster_.hasAlpha),
       isCog_(raster_.def.creation.layout == FileLayout::kCog),
       open_(raster_.path, raster_.fill, raster_.layout.BlockBytes(0)) {
@@ -253,25 +206,34 @@ void PackedPixels::Queue(unsigned level, std::uint64_t block, OpenBlock& open) {
 /// @param all  also the last ones, which are fewer.
 bool PackedPixels::PackQueued(bool all) {
   while (!queue_.empty() && (all || queue_.size() >= batch_)) {
-    std::vector<Work> batch;
+    std::vector<BlockWork> batch;
     for (; !queue_.empty() && batch.size() < batch_; queue_.pop_front()) {
-      Work work;
+      BlockWork work;
       std::tie(work.level, work.block) = queue_.front();
       work.open = open_.Find(work.level, work.block);
       if (!Prepare(work)) return false;
       batch.push_back(std::move(work));
     }
-    // The engine's threads wait for this one, or are at other stages.
-    RunByCrew(static_cast<unsigned>(batch.size()), [&](unsigned i) { Run(batch[i]); });
-    for (Work& work : batch) {
-      if (!Store(work)) return false;
-    }
+    if (!PackBatch(batch)) return false;
   }
   return true;
 }
 
+/// Packs prepared blocks by all threads, and stores them in their order.
+bool PackedPixels::PackBatch(std::vector<BlockWork>& batch) {
+  // The engine's threads wait for this one, or are at other stages.
+  RunByCrew(static_cast<unsigned>(batch.size()), [&](unsigned i) {
+    BlockWork& work = batch[i];
+    const auto levels = !isCog_                            ? BlockWork::Levels::kNone
+                        : work.level + 1 == levels_.size() ? BlockWork::Levels::kLast
+                                                           : BlockWork::Levels::kMore;
+    work.Run(packing_, reducer_, raster_.fill, levels_[work.level].layout, levels);
+  });
+  return std::all_of(batch.begin(), batch.end(), [this](BlockWork& work) { return Store(work); });
+}
+
 /// Does what has to be done by one thread before a block is packed.
-bool PackedPixels::Prepare(Work& work) {
+bool PackedPixels::Prepare(BlockWork& work) {
   const BlockLayout& layout = levels_[work.level].layout;
   work.width = layout.InnerWidth(work.block);
   work.height = layout.InnerHeight(work.block);
@@ -287,56 +249,8 @@ bool PackedPixels::Prepare(Work& work) {
   return raster_.getExcluded(place, work.open->excluded);
 }
 
-void PackedPixels::Run(Work& work) const {
-  const BlockLayout& layout = levels_[work.level].layout;
-  OpenBlock& open = *work.open;
-  const bool hasExcluded = std::any_of(open.excluded.begin(), open.excluded.end(),
-                                       [](unsigned char e) { return e != 0; });
-  if (!hasExcluded) open.excluded.clear();
-  work.isFill = !hasExcluded && IsFilled(open.pixels, raster_.fill);
-  if (!work.isFill && !work.isTaken &&
-      !Pack(packing_, layout.blockWidth, layout.LinesOf(work.block), open.pixels.data(),
-            work.packed, work.why)) {
-    if (work.why.empty()) work.why = "a block can't be packed";
-    return;
-  }
-  if (!isCog_) return;
-  if (!work.isFill) {
-    std::vector<unsigned char> excluded = open.excluded;
-    excluded.resize(std::size_t{work.width} * work.height);
-    reducer_.ExcludeNoData(open.pixels.data(), work.width, work.height, layout.RowBytes(),
-                           excluded);
-    const bool isAny =
-        std::any_of(excluded.begin(), excluded.end(), [](unsigned char e) { return e != 0; });
-    const auto bits =
-        isAny ? MaskBits(layout, work.width, work.height, excluded) : std::vector<unsigned char>();
-    if (isAny && !Pack(MaskPacking(), layout.blockWidth, layout.blockHeight, bits.data(),
-                       work.packedMask, work.why)) {
-      if (work.why.empty()) work.why = "a mask can't be packed";
-      return;
-    }
-  }
-  if (work.level + 1 == levels_.size()) return;
-  const unsigned width = (work.width + 1) / 2, height = (work.height + 1) / 2;
-  work.reduced.resize(std::size_t{width} * height * layout.PixelBytes());
-  Reduction reduction{};
-  reduction.pixels = open.pixels.data();
-  reduction.width = work.width;
-  reduction.height = work.height;
-  reduction.line = layout.RowBytes();
-  reduction.firstBand = static_cast<unsigned>(work.block / layout.PlaneBlocks());
-  reduction.reduced = work.reduced.data();
-  if (hasExcluded) {
-    work.reducedExcluded.resize(std::size_t{width} * height);
-    reduction.excluded = open.excluded.data();
-    reduction.excludedLine = work.width;
-    reduction.reducedExcluded = work.reducedExcluded.data();
-  }
-  reducer_.Reduce(reduction);
-}
-
 /// Writes a packed block, gives its quarter to the level above and lets it go.
-bool PackedPixels::Store(Work& work) {
+bool PackedPixels::Store(BlockWork& work) {
   if (!work.why.empty()) return Fail(raster_.path + ": " + work.why);
   PackedLevel& level = levels_[work.level];
   PackedBlock& placed = level.blocks[work.block];
@@ -363,21 +277,23 @@ bool PackedPixels::FailOfFile(const std::string& why) const {
   return Fail(isCog_ ? FaultOfUnnamed(raster_.path, why) : why);
 }
 
+bool PackedPixels::FailOfSize() const {
+  return Fail(raster_.path +
+              ": takes 4 GiB or more, which is too much for a file that is no BigTIFF");
+}
+
 bool PackedPixels::Append(const std::vector<unsigned char>& packed, PackedBlock& block) {
   std::string why;
   const bool isFull = !isCog_ && raster_.def.creation.bigTiff == BigTiffChoice::kNo &&
                       end_ + packed.size() >= kFourGigabytes;
-  if (isFull) {
-    return Fail(raster_.path +
-                ": takes 4 GiB or more, which is too much for a file that is no BigTIFF");
-  }
+  if (isFull) return FailOfSize();
   if (!file_->Write(end_, packed.data(), packed.size(), &why)) return FailOfFile(why);
   block = {end_, static_cast<std::uint32_t>(packed.size())};
   end_ += packed.size() + packed.size() % 2;
   return true;
 }
 
-bool PackedPixels::GiveToLevelAbove(const Work& work) {
+bool PackedPixels::GiveToLevelAbove(const BlockWork& work) {
   const BlockLayout& below = levels_[work.level].layout;
   const unsigned level = work.level + 1;
   PackedLevel& above = levels_[level];
@@ -468,9 +384,9 @@ bool PackedPixels::TakeRows(const RowsFiles& rows, bool& taken) {
 
 /// Places packed blocks; of a file with levels these get what belongs to them.
 bool PackedPixels::TakeBlocks(PackedRows& rows, const std::vector<std::uint64_t>& blocks) {
-  std::vector<Work> batch;
+  std::vector<BlockWork> batch;
   for (const std::uint64_t block : blocks) {
-    Work work;
+    BlockWork work;
     work.level = 0;
     work.block = block;
     work.isTaken = true;
@@ -496,15 +412,11 @@ bool PackedPixels::TakeBlocks(PackedRows& rows, const std::vector<std::uint64_t>
     if (batch[i].open == nullptr) return false;
     batch[i].open->isChanged = true;
   }
-  for (Work& work : batch) {
+  for (BlockWork& work : batch) {
     if (!work.why.empty()) return Fail(raster_.path + ": " + work.why);
     if (!Prepare(work)) return false;
   }
-  RunByCrew(static_cast<unsigned>(batch.size()), [&](unsigned i) { Run(batch[i]); });
-  for (Work& work : batch) {
-    if (!Store(work)) return false;
-  }
-  return PackQueued(false);
+  return PackBatch(batch) && PackQueued(false);
 }
 
 /// Packs what is left, from the raster up, since each level gives to the one above.
@@ -564,10 +476,7 @@ bool PackedPixels::WriteDirectory() {
   };
   const BigTiffChoice wanted = raster_.def.creation.bigTiff;
   const bool isLarge = end_ + make(false).Bytes() >= kFourGigabytes;
-  if (isLarge && wanted == BigTiffChoice::kNo) {
-    return Fail(raster_.path +
-                ": takes 4 GiB or more, which is too much for a file that is no BigTIFF");
-  }
+  if (isLarge && wanted == BigTiffChoice::kNo) return FailOfSize();
   const bool isBig = isLarge || wanted == BigTiffChoice::kYes;
   std::vector<unsigned char> bytes;
   make(isBig).AppendTo(bytes, end_, 0);

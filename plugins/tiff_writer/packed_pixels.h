@@ -10,6 +10,7 @@
 #include "raster/raster_def.h"
 #include "tiff_writer/block_packer.h"
 #include "tiff_writer/block_reducer.h"
+#include "tiff_writer/block_work.h"
 #include "tiff_writer/new_pixels.h"
 #include "tiff_writer/open_blocks.h"
 #include "tiff_writer/packed_rows.h"
@@ -70,7 +71,6 @@ class PackedPixels final : public NewPixels {
   bool TakeRows(const RowsFiles& rows, bool& taken);
 
  private:
-  struct Work;
   explicit PackedPixels(PackedRaster raster);
   bool MakeFile();
   void MakeLevels();
@@ -82,12 +82,13 @@ class PackedPixels final : public NewPixels {
 
   void Queue(unsigned level, std::uint64_t block, OpenBlock& open);
   bool PackQueued(bool all);
-  bool Prepare(Work& work);
-  void Run(Work& work) const;
-  bool Store(Work& work);
+  bool Prepare(BlockWork& work);
+  bool PackBatch(std::vector<BlockWork>& batch);
+  bool Store(BlockWork& work);
   bool FailOfFile(const std::string& why) const;
+  bool FailOfSize() const;
   bool Append(const std::vector<unsigned char>& packed, PackedBlock& block);
-  bool GiveToLevelAbove(const Work& work);
+  bool GiveToLevelAbove(const BlockWork& work);
   void NoteQuarter(unsigned level, std::uint64_t block);
   bool TakeBlocks(PackedRows& rows, const std::vector<std::uint64_t>& blocks);
   bool PackRest();
