@@ -5,34 +5,10 @@
 #include <fmt/format.h>
 
 #include "foundation/fault.h"
+#include "tiff_writer/tiff_tags.h"
 
 namespace lumo::tiff {
 namespace {
-
-enum Tag : std::uint16_t {
-  kNewSubfileType = 254,
-  kImageWidth = 256,
-  kImageLength = 257,
-  kBitsPerSample = 258,
-  kCompression = 259,
-  kPhotometric = 262,
-  kStripOffsets = 273,
-  kSamplesPerPixel = 277,
-  kRowsPerStrip = 278,
-  kStripByteCounts = 279,
-  kPlanarConfiguration = 284,
-  kPredictor = 317,
-  kColorMap = 320,
-  kTileWidth = 322,
-  kTileLength = 323,
-  kTileOffsets = 324,
-  kTileByteCounts = 325,
-  kExtraSamples = 338,
-  kSampleFormat = 339,
-  kYcbcrSubsampling = 530,
-  kReferenceBlackWhite = 532,
-  kNoDataText = 42113
-};
 
 constexpr std::uint64_t kEdge = 4;  // bytes in front of a block, and behind it
 constexpr std::uint32_t kReduced = 1, kMask = 4;
@@ -42,7 +18,7 @@ constexpr std::uint64_t kFourGigabytes = std::uint64_t{1} << 32;
 bool IsOfLevels(std::uint16_t tag) {
   static constexpr std::uint16_t kTags[] = {kBitsPerSample,       kPhotometric, kSamplesPerPixel,
                                             kPlanarConfiguration, kColorMap,    kExtraSamples,
-                                            kSampleFormat,        kNoDataText};
+                                            kSampleFormat,        kNoData};
   return std::find(std::begin(kTags), std::end(kTags), tag) != std::end(kTags);
 }
 
@@ -120,7 +96,7 @@ class CogWriter {
       directory.SetShorts(kPlanarConfiguration, {1});
       directory.SetShorts(kSampleFormat, {1});
     }
-    if (image.kind != 0) directory.SetLongs(kNewSubfileType, {image.kind});
+    if (image.kind != 0) directory.SetLongs(kSubfileType, {image.kind});
     directory.SetLongs(kImageWidth, {layout.samples});
     directory.SetLongs(kImageLength, {layout.lines});
     SetBlockTags(directory, layout, image.isMask ? MaskPacking() : parts_.packing, image.offsets,
@@ -254,7 +230,7 @@ void SetBlockTags(DirectoryWriter& directory, const BlockLayout& layout, const P
       for (unsigned i = 0; i < 4; ++i) range.push_back(static_cast<unsigned char>(number >> 8 * i));
     }
     directory.SetShorts(kPhotometric, {6});
-    directory.SetShorts(kYcbcrSubsampling, {2, 2});
+    directory.SetShorts(kYCbCrSubsampling, {2, 2});
     directory.Set({kReferenceBlackWhite, kRational, 6, range});
   }
   if (layout.isTiled) {

@@ -9,6 +9,7 @@
 #include "tasks/crew.h"
 #include "tiff_writer/cog_file.h"
 #include "tiff_writer/directory_writer.h"
+#include "tiff_writer/tiff_tags.h"
 
 namespace lumo::tiff {
 namespace {
@@ -52,7 +53,6 @@ bool PackedPixels::MakeFile() {
   const auto description = platform::RandomAccessFile::Open(
       raster_.description, platform::RandomAccessFile::Access::kRead, &why);
   if (description == nullptr || !ReadTags(*description, tags_, why)) return Fail(why);
-  constexpr std::uint16_t kPhotometric = 262;
   for (const TagValue& tag : tags_) {
     const bool isColors = tag.tag == kPhotometric && !tag.bytes.empty() && tag.bytes[0] == 2;
     if (isColors && packing_.compression == BlockCompression::kJpeg && packing_.depth == 3) {

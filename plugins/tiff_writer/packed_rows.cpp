@@ -5,28 +5,10 @@
 
 #include "foundation/fault.h"
 #include "tiff_writer/tiff_directory.h"
+#include "tiff_writer/tiff_tags.h"
 
 namespace lumo::tiff {
 namespace {
-
-enum Tag : std::uint16_t {
-  kImageWidth = 256,
-  kImageLength = 257,
-  kBitsPerSample = 258,
-  kCompression = 259,
-  kFillOrder = 266,
-  kStripOffsets = 273,
-  kSamplesPerPixel = 277,
-  kRowsPerStrip = 278,
-  kStripByteCounts = 279,
-  kPlanarConfiguration = 284,
-  kPredictor = 317,
-  kTileWidth = 322,
-  kTileLength = 323,
-  kTileOffsets = 324,
-  kTileByteCounts = 325,
-  kSampleFormat = 339
-};
 
 constexpr unsigned kContiguous = 1, kSeparate = 2;
 

@@ -5,27 +5,13 @@
 #include <map>
 #include <optional>
 
+#include "tiff_writer/tiff_tags.h"
+
 namespace lumo::tiff {
 namespace {
 
 /// Places of blocks begin at multiples of this.
 constexpr std::uint64_t kAlignment = 4096;
-
-enum Tag : std::uint16_t {
-  kImageWidth = 256,
-  kImageLength = 257,
-  kBitsPerSample = 258,
-  kCompression = 259,
-  kStripOffsets = 273,
-  kSamplesPerPixel = 277,
-  kRowsPerStrip = 278,
-  kStripByteCounts = 279,
-  kPlanarConfiguration = 284,
-  kTileWidth = 322,
-  kTileLength = 323,
-  kTileOffsets = 324,
-  kTileByteCounts = 325
-};
 
 /// Where the values of a tag lie.
 struct Entry {
