@@ -32,7 +32,8 @@ class ClipVerb final : public RasterVerb {
   std::string shapes_;
 };
 
-const VerbRegistration registration("clip", "Leaves out what is not in shapes", &SetUp<ClipVerb>);
+const VerbRegistration clipVerbRegistration("clip", "Leaves out what is not in shapes",
+                                            &SetUp<ClipVerb>);
 
 }  // namespace
 }  // namespace lumo::host

@@ -16,7 +16,7 @@ class ExampleMirrorCommand final : public ViewCommand {
   CommandResult Execute() override { return PublishView<MirroredRaster>(); }
 };
 
-const CommandFactoryT<ExampleMirrorCommand> factory(kMirror);
+const CommandFactoryT<ExampleMirrorCommand> exampleMirrorFactory(kMirror);
 
 }  // namespace
 }  // namespace lumo::example

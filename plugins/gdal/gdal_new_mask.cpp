@@ -12,7 +12,7 @@ namespace lumo::gdal {
 namespace {
 
 /// Up to this size a mask waits in memory.
-constexpr double kMaxBytesInMemory = 64 << 20;
+constexpr double kMaxMaskBytesInMemory = 64 << 20;
 constexpr unsigned char kValid = 255;
 
 }  // namespace
@@ -24,7 +24,7 @@ NewMask::~NewMask() {
 }
 
 bool NewMask::Begin() {
-  if (1.0 * samples_ * lines_ <= kMaxBytesInMemory) {
+  if (1.0 * samples_ * lines_ <= kMaxMaskBytesInMemory) {
     bytes_.assign(std::size_t{samples_} * lines_, kValid);
     return true;
   }

@@ -10,11 +10,6 @@ namespace {
 
 constexpr std::uint64_t kMostHeld = std::uint64_t{256} << 20;
 
-bool Fail(const std::string& why) {
-  SetFault(why);
-  return false;
-}
-
 }  // namespace
 
 std::vector<unsigned char> Repeated(const std::vector<unsigned char>& value, std::uint64_t bytes) {
@@ -72,13 +67,13 @@ bool OpenBlocks::Spill(OpenBlock& block, std::uint64_t bytes, const unsigned cha
   if (file_ == nullptr) {
     file_ = platform::RandomAccessFile::CreateUnnamed(
         std::filesystem::path(path_).parent_path().string(), &why);
-    if (file_ == nullptr) return Fail(FaultOfUnnamed(path_, why));
+    if (file_ == nullptr) return Refuse(FaultOfUnnamed(path_, why));
   }
   const bool isFresh = freeSlots_.empty();
   if (isFresh) {
     block.slot = slots_;
     slots_ += slotBytes_;
-    if (!file_->SetSize(slots_, &why)) return Fail(FaultOfUnnamed(path_, why));
+    if (!file_->SetSize(slots_, &why)) return Refuse(FaultOfUnnamed(path_, why));
   } else {
     block.slot = freeSlots_.back();
     freeSlots_.pop_back();
@@ -114,7 +109,7 @@ bool OpenBlocks::Write(OpenBlock& block, std::uint64_t at, const void* data, std
     return true;
   }
   std::string why;
-  return file_->Write(block.slot + at, data, bytes, &why) || Fail(FaultOfUnnamed(path_, why));
+  return file_->Write(block.slot + at, data, bytes, &why) || Refuse(FaultOfUnnamed(path_, why));
 }
 
 bool OpenBlocks::Read(const OpenBlock& block, std::uint64_t at, void* data,
@@ -124,7 +119,7 @@ bool OpenBlocks::Read(const OpenBlock& block, std::uint64_t at, void* data,
     return true;
   }
   std::string why;
-  return file_->Read(block.slot + at, data, bytes, &why) || Fail(FaultOfUnnamed(path_, why));
+  return file_->Read(block.slot + at, data, bytes, &why) || Refuse(FaultOfUnnamed(path_, why));
 }
 
 bool OpenBlocks::Load(OpenBlock& block, std::uint64_t bytes) {

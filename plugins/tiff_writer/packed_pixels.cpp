@@ -17,11 +17,6 @@ namespace {
 constexpr std::uint64_t kMostBlockBytes = std::uint64_t{1} << 30;
 constexpr std::uint64_t kFourGigabytes = std::uint64_t{1} << 32;
 
-bool Fail(const std::string& why) {
-  SetFault(why);
-  return false;
-}
-
 }  // namespace
 
 PackedPixels::PackedPixels(PackedRaster raster)
@@ -39,9 +34,9 @@ PackedPixels::PackedPixels(PackedRaster raster)
 
 std::unique_ptr<PackedPixels> PackedPixels::Begin(PackedRaster raster) {
   if (raster.layout.BlockBytes(0) > kMostBlockBytes) {
-    Fail(raster.path +
-         ": a block with all bands would take more than 1 GiB; give smaller tiles, "
-         "or the order by band");
+    Refuse(raster.path +
+           ": a block with all bands would take more than 1 GiB; give smaller tiles, "
+           "or the order by band");
     return nullptr;
   }
   std::unique_ptr<PackedPixels> made(new PackedPixels(std::move(raster)));
@@ -52,7 +47,7 @@ bool PackedPixels::MakeFile() {
   std::string why;
   const auto description = platform::RandomAccessFile::Open(
       raster_.description, platform::RandomAccessFile::Access::kRead, &why);
-  if (description == nullptr || !ReadTags(*description, tags_, why)) return Fail(why);
+  if (description == nullptr || !ReadTags(*description, tags_, why)) return Refuse(why);
   for (const TagValue& tag : tags_) {
     const bool isColors = tag.tag == kPhotometric && !tag.bytes.empty() && tag.bytes[0] == 2;
     if (isColors && packing_.compression == BlockCompression::kJpeg && packing_.depth == 3) {
@@ -251,7 +246,7 @@ bool PackedPixels::Prepare(BlockWork& work) {
 
 /// Writes a packed block, gives its quarter to the level above and lets it go.
 bool PackedPixels::Store(BlockWork& work) {
-  if (!work.why.empty()) return Fail(raster_.path + ": " + work.why);
+  if (!work.why.empty()) return Refuse(raster_.path + ": " + work.why);
   PackedLevel& level = levels_[work.level];
   PackedBlock& placed = level.blocks[work.block];
   if (work.level == 0 && !work.open->excluded.empty()) hasExcluded_ = true;
@@ -274,12 +269,12 @@ bool PackedPixels::Store(BlockWork& work) {
 
 /// Sets the fault of the file that takes the blocks.
 bool PackedPixels::FailOfFile(const std::string& why) const {
-  return Fail(isCog_ ? FaultOfUnnamed(raster_.path, why) : why);
+  return Refuse(isCog_ ? FaultOfUnnamed(raster_.path, why) : why);
 }
 
 bool PackedPixels::FailOfSize() const {
-  return Fail(raster_.path +
-              ": takes 4 GiB or more, which is too much for a file that is no BigTIFF");
+  return Refuse(raster_.path +
+                ": takes 4 GiB or more, which is too much for a file that is no BigTIFF");
 }
 
 bool PackedPixels::Append(const std::vector<unsigned char>& packed, PackedBlock& block) {
@@ -413,7 +408,7 @@ bool PackedPixels::TakeBlocks(PackedRows& rows, const std::vector<std::uint64_t>
     batch[i].open->isChanged = true;
   }
   for (BlockWork& work : batch) {
-    if (!work.why.empty()) return Fail(raster_.path + ": " + work.why);
+    if (!work.why.empty()) return Refuse(raster_.path + ": " + work.why);
     if (!Prepare(work)) return false;
   }
   return PackBatch(batch) && PackQueued(false);
@@ -440,7 +435,7 @@ bool PackedPixels::GetFill(unsigned lines, std::vector<unsigned char>& packed) {
   if (fill.empty()) {
     const auto pixels = Repeated(raster_.fill, lines * layout.RowBytes());
     if (!Pack(packing_, layout.blockWidth, lines, pixels.data(), fill, why)) {
-      return Fail(raster_.path + ": " + why);
+      return Refuse(raster_.path + ": " + why);
     }
   }
   packed = fill;
@@ -484,7 +479,7 @@ bool PackedPixels::WriteDirectory() {
   std::string why;
   return (file_->Write(end_, bytes.data(), bytes.size(), &why) &&
           file_->Write(0, header.data(), header.size(), &why) && file_->Close(&why)) ||
-         Fail(why);
+         Refuse(why);
 }
 
 bool PackedPixels::Finish() {
@@ -492,7 +487,7 @@ bool PackedPixels::Finish() {
   // The description holds whatever was told of the raster since it was begun.
   const auto description = platform::RandomAccessFile::Open(
       raster_.description, platform::RandomAccessFile::Access::kRead, &why);
-  if (description == nullptr || !ReadTags(*description, tags_, why)) return Fail(why);
+  if (description == nullptr || !ReadTags(*description, tags_, why)) return Refuse(why);
   if (!PackRest()) return false;
   if (!isCog_) return WriteUntouched() && WriteDirectory();
   CogParts parts{*file_,
@@ -513,7 +508,7 @@ bool PackedPixels::Finish() {
             why) ||
       !Pack(MaskPacking(), layout.blockWidth, layout.blockHeight, none.data(), parts.noneValid,
             why)) {
-    return Fail(raster_.path + ": " + why);
+    return Refuse(raster_.path + ": " + why);
   }
   return WriteCog(raster_.path, parts);
 }

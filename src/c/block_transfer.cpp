@@ -19,11 +19,6 @@ namespace {
 
 constexpr std::uint64_t kPieceBytes = 4 << 20;
 
-bool Refuse(const std::string& why) {
-  SetFault(String(why));
-  return false;
-}
-
 /// Looks whether the block lies in the raster and its memory holds it.
 bool CheckBlock(const BasicRaster& raster, const vexg_block& block) {
   const vexg_rect& rect = block.rect;

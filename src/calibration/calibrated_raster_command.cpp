@@ -83,7 +83,7 @@ class CreateCalibratedRasterCommand final : public PublishCommand {
   }
 };
 
-const CommandFactoryT<CreateCalibratedRasterCommand> factory(kCalibrated);
+const CommandFactoryT<CreateCalibratedRasterCommand> createCalibratedRasterFactory(kCalibrated);
 
 }  // namespace
 }  // namespace lumo

@@ -117,7 +117,7 @@ class GetMetadataCalibrationCommand final : public RasterCommand {
   }
 };
 
-const CommandFactoryT<GetMetadataCalibrationCommand> factory(kGetCalibration);
+const CommandFactoryT<GetMetadataCalibrationCommand> getMetadataCalibrationFactory(kGetCalibration);
 
 }  // namespace
 }  // namespace lumo

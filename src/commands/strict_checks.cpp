@@ -9,6 +9,7 @@
 #include <string_view>
 
 #include "foundation/near_name.h"
+#include "foundation/text_form.h"
 
 namespace lumo {
 namespace {
@@ -16,12 +17,6 @@ namespace {
 using Tokens = std::vector<std::string_view>;
 
 constexpr std::string_view kBlanks = " \t\r\n";
-
-std::string_view Trimmed(std::string_view text) {
-  const std::size_t first = text.find_first_not_of(kBlanks);
-  if (first == text.npos) return {};
-  return text.substr(first, text.find_last_not_of(kBlanks) - first + 1);
-}
 
 Tokens SplitAtBlanks(std::string_view text) {
   Tokens tokens;

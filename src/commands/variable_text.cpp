@@ -4,10 +4,12 @@
 #include <cctype>
 #include <string_view>
 
+#include "foundation/text_form.h"
+
 namespace lumo {
 namespace {
 
-bool IsNamePart(char c) {
+bool IsVariablePart(char c) {
   return std::isalnum(static_cast<unsigned char>(c)) != 0 || c == '_';
 }
 
@@ -22,7 +24,7 @@ std::string TakeVariable(std::string_view text, std::size_t& at) {
     at = close + 1;
     return name;
   }
-  while (end < text.size() && IsNamePart(text[end])) ++end;
+  while (end < text.size() && IsVariablePart(text[end])) ++end;
   if (end == at + 1) return {};
   const std::string name(text.substr(at, end - at));
   at = end;
@@ -47,13 +49,6 @@ void Walk(std::string_view text, Plain&& plain, Variable&& variable) {
   }
 }
 
-std::string Trimmed(const std::string& text) {
-  constexpr const char* kBlanks = " \t\r\n";
-  const std::size_t first = text.find_first_not_of(kBlanks);
-  if (first == std::string::npos) return {};
-  return text.substr(first, text.find_last_not_of(kBlanks) - first + 1);
-}
-
 bool IsArray(ValueKind kind) {
   return kind == ValueKind::kIntegerArray || kind == ValueKind::kNumberArray ||
          kind == ValueKind::kBooleanArray || kind == ValueKind::kURIArray;
@@ -63,11 +58,11 @@ bool IsArray(ValueKind kind) {
 std::string MakeArray(const std::string& list) {
   std::string elements;
   unsigned count = 0;
-  for (std::string rest = Trimmed(list); !rest.empty(); ++count) {
+  for (std::string_view rest = Trimmed(list); !rest.empty(); ++count) {
     const bool isURI = rest[0] == '[';
     const std::size_t end = isURI ? rest.find(']') : rest.find_first_of(" \t\r\n");
     const std::size_t length = end == std::string::npos ? rest.size() : end + (isURI ? 1 : 0);
-    elements += rest.substr(0, length) + " ";
+    elements.append(rest.substr(0, length)) += " ";
     rest = Trimmed(rest.substr(length));
   }
   return std::string("1:").append(std::to_string(count)).append(" [").append(elements) + "] ";
@@ -90,7 +85,7 @@ bool ExpandVariables(const String& text, ValueKind kind, const VariableReader& r
       [&](const std::string& name) {
         String value;
         isWhole = read(String(name), value) && isWhole;
-        made += IsArray(kind) ? value.ToUTF8() : Trimmed(value.ToUTF8());
+        made += IsArray(kind) ? value.ToUTF8() : std::string(Trimmed(value.ToUTF8()));
       });
   if (!isWhole) return false;
   // "1:2 [...": an array as it stands.

@@ -68,7 +68,7 @@ class ListFormatsCommand final : public Command {
   }
 };
 
-const CommandFactoryT<ListFormatsCommand> factory(kList);
+const CommandFactoryT<ListFormatsCommand> listFormatsFactory(kList);
 
 }  // namespace
 }  // namespace lumo

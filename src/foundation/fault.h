@@ -12,6 +12,12 @@ namespace lumo {
 /// is in. A later one replaces it.
 VEXG_EXPORT void SetFault(const String& text);
 
+/// Sets the fault and gives false, for `return Refuse(...)`.
+inline bool Refuse(const String& text) {
+  SetFault(text);
+  return false;
+}
+
 /// Takes the text off the thread; no text when none was set since the last call.
 VEXG_EXPORT String TakeFault();
 

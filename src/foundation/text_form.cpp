@@ -10,25 +10,23 @@
 #include <string_view>
 
 namespace lumo {
-namespace {
 
-String Trimmed(const std::string& text) {
-  constexpr auto kBlanks = " \r\n\t";
+std::string_view Trimmed(std::string_view text) {
+  constexpr std::string_view kBlanks = " \r\n\t";
   const std::size_t first = text.find_first_not_of(kBlanks);
-  if (first == std::string::npos) return {};
-  return String(text.substr(first, text.find_last_not_of(kBlanks) - first + 1));
+  if (first == text.npos) return {};
+  return text.substr(first, text.find_last_not_of(kBlanks) - first + 1);
 }
 
-}  // namespace
-
 String ReadWholeText(std::istream& in) {
-  return Trimmed({std::istreambuf_iterator<char>(in), std::istreambuf_iterator<char>()});
+  const std::string text{std::istreambuf_iterator<char>(in), std::istreambuf_iterator<char>()};
+  return String(std::string(Trimmed(text)));
 }
 
 String ReadWordText(std::istream& in) {
   std::string word;
   in >> word;
-  return Trimmed(word);
+  return String(std::string(Trimmed(word)));
 }
 
 String ReadBracketedText(std::istream& in) {

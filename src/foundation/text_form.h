@@ -2,6 +2,7 @@
 
 #include <iosfwd>
 #include <sstream>
+#include <string_view>
 #include <type_traits>
 
 #include "foundation/string.h"
@@ -10,6 +11,9 @@ namespace lumo {
 
 // The narrow text forms of values, as job and result documents carry them. All decode UTF-8 and
 // use the classic locale, whatever the host has set.
+
+/// The part of a text without blanks, tabs, carriage returns and line feeds at both ends.
+VEXG_EXPORT std::string_view Trimmed(std::string_view text);
 
 /// Reads the whole form: every character to the end of the stream, with blanks, carriage returns,
 /// line feeds and tabs taken off both ends.

@@ -184,7 +184,7 @@ class AccuracyCommand final : public RasterCommand {
   bool isNamed_ = false;            // they are names of the values from 1 on
 };
 
-const CommandFactoryT<AccuracyCommand> factory(kAccuracy);
+const CommandFactoryT<AccuracyCommand> accuracyFactory(kAccuracy);
 
 }  // namespace
 }  // namespace lumo

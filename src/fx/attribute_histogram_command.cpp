@@ -80,9 +80,10 @@ class FxComputeAttributesHistogramCommand final : public RegionCommand {
   }
 };
 
-const CommandFactoryT<FxComputeAttributesHistogramCommand> factory(kAttributesHistogram);
-const DivisionRegistration division({.command = "FxComputeAttributesHistogramCommand",
-                                     .makes = {"HistogramFXAH"}});
+const CommandFactoryT<FxComputeAttributesHistogramCommand> fxComputeAttributesHistogramFactory(
+    kAttributesHistogram);
+const DivisionRegistration fxComputeAttributesHistogramDivision(
+    {.command = "FxComputeAttributesHistogramCommand", .makes = {"HistogramFXAH"}});
 
 }  // namespace
 }  // namespace lumo

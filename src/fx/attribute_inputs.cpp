@@ -9,11 +9,6 @@
 namespace lumo {
 namespace {
 
-bool Refuse(const std::string& why) {
-  SetFault(String(why));
-  return false;
-}
-
 bool AreSameFile(const std::string& a, const std::string& b) {
   std::error_code none;
   return a == b || std::filesystem::equivalent(a, b, none);

@@ -136,7 +136,7 @@ class QueryAttributesCommand final : public RegionCommand {
   }
 };
 
-const CommandFactoryT<QueryAttributesCommand> factory(kQueryAttributes);
+const CommandFactoryT<QueryAttributesCommand> queryAttributesFactory(kQueryAttributes);
 
 }  // namespace
 }  // namespace lumo

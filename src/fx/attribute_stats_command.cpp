@@ -49,10 +49,12 @@ class FxComputeAttributesStatsCommand final : public RegionCommand {
   }
 };
 
-const CommandFactoryT<FxComputeAttributesStatsCommand> factory(kAttributesStats);
-const DivisionRegistration division({.command = "FxComputeAttributesStatsCommand",
-                                     .kind = DivisionKind::kEach,
-                                     .makes = {"StatsFXAS"}});
+const CommandFactoryT<FxComputeAttributesStatsCommand> fxComputeAttributesStatsFactory(
+    kAttributesStats);
+const DivisionRegistration fxComputeAttributesStatsDivision(
+    {.command = "FxComputeAttributesStatsCommand",
+     .kind = DivisionKind::kEach,
+     .makes = {"StatsFXAS"}});
 
 }  // namespace
 }  // namespace lumo

@@ -315,8 +315,9 @@ class CreateAttributeTableCommand final : public RegionCommand {
   std::uint64_t rows_ = 0;
 };
 
-const CommandFactoryT<CreateAttributeTableCommand> factory(kAttributeTable);
-const DivisionRegistration division({.command = "CreateAttributeTableCommand", .makes = {"Table"}});
+const CommandFactoryT<CreateAttributeTableCommand> createAttributeTableFactory(kAttributeTable);
+const DivisionRegistration createAttributeTableDivision({.command = "CreateAttributeTableCommand",
+                                                         .makes = {"Table"}});
 
 }  // namespace
 }  // namespace lumo

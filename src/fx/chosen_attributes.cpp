@@ -10,11 +10,6 @@
 namespace lumo {
 namespace {
 
-bool Refuse(const std::string& why) {
-  SetFault(String(why));
-  return false;
-}
-
 /// Opens a store for each name. @param open  makes one.
 template <typename Store, typename Open>
 bool OpenAll(const Array<String>& names, const char* input, const char* kind,

@@ -140,7 +140,7 @@ class FindClassExamplesCommand final : public RegionCommand {
   std::map<Pair, std::uint64_t> pairs_;  // pixels, under mutex_
 };
 
-const CommandFactoryT<FindClassExamplesCommand> factory(kExamples);
+const CommandFactoryT<FindClassExamplesCommand> findClassExamplesFactory(kExamples);
 
 }  // namespace
 }  // namespace lumo

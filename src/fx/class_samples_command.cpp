@@ -41,7 +41,7 @@ class QueryClassSamplesCommand final : public Command {
   }
 };
 
-const CommandFactoryT<QueryClassSamplesCommand> factory(kSamples);
+const CommandFactoryT<QueryClassSamplesCommand> queryClassSamplesFactory(kSamples);
 
 }  // namespace
 }  // namespace lumo

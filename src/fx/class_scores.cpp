@@ -9,15 +9,6 @@
 #include "tasks/parallel.h"
 
 namespace lumo {
-namespace {
-
-bool Refuse(const std::string& why) {
-  SetFault(String(why));
-  return false;
-}
-
-}  // namespace
-
 bool ClassScoresCommand::OpenFiles(bool withStatistics) {
   if (!columns_.Open(Read<Array<String>>("AttributesFXA"))) return false;
   return !withStatistics || columns_.OpenStatistics(Read<Array<String>>("StatsFXAS"));

@@ -74,7 +74,7 @@ class CreateClassStyleCommand final : public Command {
   }
 };
 
-const CommandFactoryT<CreateClassStyleCommand> factory(kStyle);
+const CommandFactoryT<CreateClassStyleCommand> createClassStyleFactory(kStyle);
 
 }  // namespace
 }  // namespace lumo

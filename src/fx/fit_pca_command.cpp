@@ -8,7 +8,7 @@
 namespace lumo {
 namespace {
 
-const CommandDeclaration kFit{
+const CommandDeclaration kFitPCA{
     "FitPCAModelCommand",
     "Feature extraction",
     "Fits the model by which FxComputePCAClassificationCommand scores regions, from examples. A "
@@ -96,7 +96,7 @@ class FitPCAModelCommand final : public ClassScoresCommand {
   }
 };
 
-const CommandFactoryT<FitPCAModelCommand> factory(kFit);
+const CommandFactoryT<FitPCAModelCommand> fitPCAModelFactory(kFitPCA);
 
 }  // namespace
 }  // namespace lumo

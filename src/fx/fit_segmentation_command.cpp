@@ -10,7 +10,7 @@ namespace {
 
 constexpr double kManyLevels = 65000;
 
-const CommandDeclaration kFit{
+const CommandDeclaration kFitSegmentation{
     "FitSegmentationCommand",
     "Feature extraction",
     "Finds what FxTileSegmentMergeCommand needs to know of the gradients of a raster, and of what "
@@ -135,7 +135,7 @@ class FitSegmentationCommand final : public SegmentCommand {
   double low_ = 0, high_ = 0, stretch_ = 0, segmentValue_ = 0, mergeValue_ = 0;
 };
 
-const CommandFactoryT<FitSegmentationCommand> factory(kFit);
+const CommandFactoryT<FitSegmentationCommand> fitSegmentationFactory(kFitSegmentation);
 
 }  // namespace
 }  // namespace lumo

@@ -74,10 +74,12 @@ class FxComputeFuzzyClassificationCommand final : public ClassScoresCommand {
   }
 };
 
-const CommandFactoryT<FxComputeFuzzyClassificationCommand> factory(kFuzzy);
-const DivisionRegistration division({.command = "FxComputeFuzzyClassificationCommand",
-                                     .kind = DivisionKind::kShares,
-                                     .makes = {"ClassFXC"}});
+const CommandFactoryT<FxComputeFuzzyClassificationCommand> fxComputeFuzzyClassificationFactory(
+    kFuzzy);
+const DivisionRegistration fxComputeFuzzyClassificationDivision(
+    {.command = "FxComputeFuzzyClassificationCommand",
+     .kind = DivisionKind::kShares,
+     .makes = {"ClassFXC"}});
 
 }  // namespace
 }  // namespace lumo

@@ -9,11 +9,6 @@
 namespace lumo {
 namespace {
 
-bool Refuse(const std::string& why) {
-  SetFault(String(why));
-  return false;
-}
-
 /// From 0 below `low` to 1 above `high`.
 double Rise(double x, double low, double high) {
   if (x < low) return 0;

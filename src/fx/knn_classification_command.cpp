@@ -135,10 +135,11 @@ class FxComputeKNNClassificationCommand final : public ClassScoresCommand {
   std::vector<double> means_;    // of the classes, row by row
 };
 
-const CommandFactoryT<FxComputeKNNClassificationCommand> factory(kKnn);
-const DivisionRegistration division({.command = "FxComputeKNNClassificationCommand",
-                                     .kind = DivisionKind::kShares,
-                                     .makes = {"ClassFXC"}});
+const CommandFactoryT<FxComputeKNNClassificationCommand> fxComputeKNNClassificationFactory(kKnn);
+const DivisionRegistration fxComputeKNNClassificationDivision(
+    {.command = "FxComputeKNNClassificationCommand",
+     .kind = DivisionKind::kShares,
+     .makes = {"ClassFXC"}});
 
 }  // namespace
 }  // namespace lumo

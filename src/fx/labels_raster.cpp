@@ -58,7 +58,7 @@ class CreateLabelsRasterCommand final : public ViewCommand {
   }
 };
 
-const CommandFactoryT<CreateLabelsRasterCommand> factory(kLabels);
+const CommandFactoryT<CreateLabelsRasterCommand> createLabelsRasterFactory(kLabels);
 
 }  // namespace
 }  // namespace lumo

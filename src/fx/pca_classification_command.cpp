@@ -101,10 +101,11 @@ class FxComputePCAClassificationCommand final : public ClassScoresCommand {
   std::vector<float> largest_;  // score of each class
 };
 
-const CommandFactoryT<FxComputePCAClassificationCommand> factory(kPca);
-const DivisionRegistration division({.command = "FxComputePCAClassificationCommand",
-                                     .kind = DivisionKind::kShares,
-                                     .makes = {"ClassFXC"}});
+const CommandFactoryT<FxComputePCAClassificationCommand> fxComputePCAClassificationFactory(kPca);
+const DivisionRegistration fxComputePCAClassificationDivision(
+    {.command = "FxComputePCAClassificationCommand",
+     .kind = DivisionKind::kShares,
+     .makes = {"ClassFXC"}});
 
 }  // namespace
 }  // namespace lumo

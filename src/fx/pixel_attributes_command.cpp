@@ -175,13 +175,14 @@ class FxComputePixelAttributesCommand final : public RegionCommand {
   RegionPassPlan plan_;
 };
 
-const CommandFactoryT<FxComputePixelAttributesCommand> factory(kPixelAttributes);
-const DivisionRegistration division({.command = "FxComputePixelAttributesCommand",
-                                     .kind = DivisionKind::kShares,
-                                     .source = "SrcURI",
-                                     .makes = {"SpectralFXA", "TextureFXA", "MeansFXA",
-                                               "EntropyFXA"},
-                                     .dividesWhen = "Sums"});
+const CommandFactoryT<FxComputePixelAttributesCommand> fxComputePixelAttributesFactory(
+    kPixelAttributes);
+const DivisionRegistration fxComputePixelAttributesDivision(
+    {.command = "FxComputePixelAttributesCommand",
+     .kind = DivisionKind::kShares,
+     .source = "SrcURI",
+     .makes = {"SpectralFXA", "TextureFXA", "MeansFXA", "EntropyFXA"},
+     .dividesWhen = "Sums"});
 
 }  // namespace
 }  // namespace lumo

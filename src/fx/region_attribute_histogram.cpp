@@ -6,7 +6,7 @@
 namespace lumo {
 namespace {
 
-constexpr std::string_view kMark = "FXAH50";
+constexpr std::string_view kHistogramMark = "FXAH50";
 constexpr std::size_t kLimitsAt = 12;  // in the header
 
 /// True when the header has room for the limits. Else the fault names the file.
@@ -55,7 +55,7 @@ template <typename T>
 RegionAttributeHistogramFile<T>::RegionAttributeHistogramFile(const URI& uri, unsigned bands,
                                                               unsigned attributes)
     : Base(bands, attributes, kBins),
-      file_(uri, kMark, {bands, attributes, kBins}, ArrayDims(bands, attributes, kBins),
+      file_(uri, kHistogramMark, {bands, attributes, kBins}, ArrayDims(bands, attributes, kBins),
             BasicBuffer::kPageSize, HasRoom(uri, bands, attributes, kMostPairs)) {
   const std::span<unsigned char> header = file_.Elements().Header();
   if (!header.empty()) Base::PutLimits(reinterpret_cast<T*>(&header[kLimitsAt]));

@@ -5,7 +5,7 @@
 namespace lumo {
 namespace {
 
-constexpr std::string_view kMark = "FXAS50";
+constexpr std::string_view kStatsMark = "FXAS50";
 
 }  // namespace
 
@@ -18,7 +18,7 @@ const unsigned RegionAttributeStatsFile<T>::TypeCode =
 
 template <typename T>
 RegionAttributeStatsFile<T>::RegionAttributeStatsFile(const URI& uri)
-    : Base(0, 0), file_(uri, kMark, BasicBuffer::kPageSize, BasicBuffer::kReadWrite) {
+    : Base(0, 0), file_(uri, kStatsMark, BasicBuffer::kPageSize, BasicBuffer::kReadWrite) {
   this->SetCounts(file_.Counts().bands, file_.Counts().attributes);
 }
 
@@ -26,7 +26,7 @@ template <typename T>
 RegionAttributeStatsFile<T>::RegionAttributeStatsFile(const URI& uri, unsigned bands,
                                                       unsigned attributes)
     : Base(bands, attributes),
-      file_(uri, kMark, {bands, attributes}, ArrayDims(bands, attributes, Base::kStatistics),
+      file_(uri, kStatsMark, {bands, attributes}, ArrayDims(bands, attributes, Base::kStatistics),
             BasicBuffer::kPageSize) {}
 
 template class RegionAttributeStats<float>;

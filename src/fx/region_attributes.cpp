@@ -9,7 +9,7 @@
 namespace lumo {
 namespace {
 
-constexpr std::string_view kMark = "FXA50";
+constexpr std::string_view kAttributesMark = "FXA50";
 
 }  // namespace
 
@@ -55,14 +55,16 @@ Array<unsigned> RegionAttributesMap<T>::GetRegions() const {
 template <typename T>
 RegionAttributesFile<T>::RegionAttributesFile(const URI& uri, bool writable)
     : Base(0, 0),
-      file_(uri, kMark, kPageSize, writable ? BasicBuffer::kReadWrite : BasicBuffer::kReadOnly) {
+      file_(uri, kAttributesMark, kPageSize,
+            writable ? BasicBuffer::kReadWrite : BasicBuffer::kReadOnly) {
   this->SetCounts(file_.Counts().bands, file_.Counts().attributes);
 }
 
 template <typename T>
 RegionAttributesFile<T>::RegionAttributesFile(const URI& uri, unsigned bands, unsigned attributes)
     : Base(bands, attributes),
-      file_(uri, kMark, {bands, attributes}, ArrayDims(1, bands, attributes), kPageSize) {}
+      file_(uri, kAttributesMark, {bands, attributes}, ArrayDims(1, bands, attributes), kPageSize) {
+}
 
 template <typename T>
 void RegionAttributesFile<T>::Require(unsigned bands, unsigned attributes) {

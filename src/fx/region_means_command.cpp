@@ -88,9 +88,10 @@ class FxComputeRegionMeansRasterCommand final : public RegionCommand {
   Pointer<RegionMeansFile> means_;
 };
 
-const CommandFactoryT<FxComputeRegionMeansRasterCommand> factory(kRegionMeans);
-const DivisionRegistration division({.command = "FxComputeRegionMeansRasterCommand",
-                                     .makes = {"MeansFXA"}});
+const CommandFactoryT<FxComputeRegionMeansRasterCommand> fxComputeRegionMeansRasterFactory(
+    kRegionMeans);
+const DivisionRegistration fxComputeRegionMeansRasterDivision(
+    {.command = "FxComputeRegionMeansRasterCommand", .makes = {"MeansFXA"}});
 
 }  // namespace
 }  // namespace lumo

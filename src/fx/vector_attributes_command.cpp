@@ -219,11 +219,13 @@ class FxComputeVectorAttributesCommand final : public RegionCommand {
   Pointer<Setup> setup_{new Setup};
 };
 
-const CommandFactoryT<FxComputeVectorAttributesCommand> factory(kVectorAttributes);
-const DivisionRegistration division({.command = "FxComputeVectorAttributesCommand",
-                                     .kind = DivisionKind::kShares,
-                                     .source = "LabelURI",
-                                     .makes = {"SpatialFXA"}});
+const CommandFactoryT<FxComputeVectorAttributesCommand> fxComputeVectorAttributesFactory(
+    kVectorAttributes);
+const DivisionRegistration fxComputeVectorAttributesDivision(
+    {.command = "FxComputeVectorAttributesCommand",
+     .kind = DivisionKind::kShares,
+     .source = "LabelURI",
+     .makes = {"SpatialFXA"}});
 
 }  // namespace
 }  // namespace lumo

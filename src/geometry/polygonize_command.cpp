@@ -20,7 +20,7 @@ const CommandDeclaration kPolygonize{
     "Turns areas of equal value of a raster into polygons of a vector file. A command of this "
     "library's own.",
     WithShareInputs(
-        {{"URI", Presence::kRequired, ValueKind::kURI, "the raster"},
+        {RasterURIInput(),
          {"Vectors", Presence::kRequired, ValueKind::kText,
           "the file to make, in the format of its ending: .fxv, or one of a vector plug-in"},
          {"Band", Presence::kOptional, ValueKind::kInteger, "from 0; 0 when absent"},
@@ -205,11 +205,11 @@ class PolygonizeCommand final : public RasterCommand {
   std::uint64_t changed_ = 0;
 };
 
-const CommandFactoryT<PolygonizeCommand> factory(kPolygonize);
-const DivisionRegistration division({.command = "PolygonizeCommand",
-                                     .kind = DivisionKind::kShares,
-                                     .source = "URI",
-                                     .makes = {"Vectors"}});
+const CommandFactoryT<PolygonizeCommand> polygonizeFactory(kPolygonize);
+const DivisionRegistration polygonizeDivision({.command = "PolygonizeCommand",
+                                               .kind = DivisionKind::kShares,
+                                               .source = "URI",
+                                               .makes = {"Vectors"}});
 
 }  // namespace
 }  // namespace lumo

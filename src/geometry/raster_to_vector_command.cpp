@@ -48,8 +48,9 @@ class FxRasterToVectorCommand final : public RasterCommand {
   }
 };
 
-const CommandFactoryT<FxRasterToVectorCommand> factory(kRasterToVector);
-const DivisionRegistration division({.command = "FxRasterToVectorCommand", .makes = {"VectorFXV"}});
+const CommandFactoryT<FxRasterToVectorCommand> fxRasterToVectorFactory(kRasterToVector);
+const DivisionRegistration fxRasterToVectorDivision({.command = "FxRasterToVectorCommand",
+                                                     .makes = {"VectorFXV"}});
 
 }  // namespace
 }  // namespace lumo

@@ -111,7 +111,7 @@ class QueryVectorsCommand final : public Command {
   }
 };
 
-const CommandFactoryT<QueryVectorsCommand> factory(kQueryVectors);
+const CommandFactoryT<QueryVectorsCommand> queryVectorsFactory(kQueryVectors);
 
 }  // namespace
 }  // namespace lumo

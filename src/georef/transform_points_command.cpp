@@ -56,7 +56,7 @@ class TransformPointsCommand final : public Command {
   }
 };
 
-const CommandFactoryT<TransformPointsCommand> factory(kTransform);
+const CommandFactoryT<TransformPointsCommand> transformPointsFactory(kTransform);
 
 }  // namespace
 }  // namespace lumo

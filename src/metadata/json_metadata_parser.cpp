@@ -11,7 +11,7 @@ namespace {
 
 using Json = nlohmann::ordered_json;
 
-constexpr unsigned kMaxDepth = 64;
+constexpr unsigned kMaxNesting = 64;
 
 /// Calls `visit(path, text)` for every value. False where values are nested too deep.
 template <typename Visit>
@@ -20,7 +20,7 @@ bool VisitValues(const Json& json, const String& path, unsigned depth, const Vis
     if (!json.is_null()) visit(path, json.is_string() ? json.get<std::string>() : json.dump());
     return true;
   }
-  if (depth == kMaxDepth) return false;
+  if (depth == kMaxNesting) return false;
   unsigned number = 0;
   for (const auto& [name, value] : json.items()) {
     ++number;

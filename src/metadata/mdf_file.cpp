@@ -18,7 +18,6 @@ constexpr char16_t kStart = u'[';
 constexpr char16_t kEnd = u']';
 constexpr char16_t kSeparator = u'=';
 constexpr char16_t kComment = u'#';
-constexpr char16_t kRepeat = u'#';
 constexpr std::size_t kKeptLines = 6;
 constexpr std::size_t kShortestPath = 3;
 constexpr std::uint64_t kMaxSharedElements = 65536;  // of an array that many entries fill
@@ -110,7 +109,7 @@ Fault EntryDraft::TakeFormat(const std::string& name, std::u16string_view value)
   return {};
 }
 
-Fault ReadNumber(std::u16string_view text, std::uint32_t& number) {
+Fault ParseNumber(std::u16string_view text, std::uint32_t& number) {
   std::uint64_t wide = 0;
   if (ReadUnsigned(text, wide) != text.size() || text.front() == u'-' ||
       wide > std::numeric_limits<std::uint32_t>::max()) {
@@ -151,7 +150,7 @@ Fault EntryDraft::Set(const std::string& name, std::u16string_view value) {
     entry_.*path->second = ToString(NormalPath(value));
     return {};
   }
-  return number != kNumbers.end() ? ReadNumber(value, entry_.*number->second)
+  return number != kNumbers.end() ? ParseNumber(value, entry_.*number->second)
                                   : ReadType(value, entry_.dt);
 }
 

@@ -192,7 +192,7 @@ class GetMetadataCommand final : public MetadataCommand {
   }
 };
 
-const CommandFactoryT<GetMetadataCommand> getFactory(kGet);
+const CommandFactoryT<GetMetadataCommand> getMetadataFactory(kGet);
 
 const CommandDeclaration kSet{
     "SetMetadataCommand",

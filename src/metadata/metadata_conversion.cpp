@@ -9,8 +9,6 @@
 namespace lumo {
 namespace {
 
-constexpr std::u16string_view kBlanks = u" \t\r\n";
-
 /// Splits a list at its delimiters; the piece behind the last one counts unless it is blank.
 std::vector<std::u16string_view> SplitList(std::u16string_view text, const MdfFormat& format) {
   const char16_t delimiters[] = {format.vsep, format.em, 0};

@@ -95,7 +95,7 @@ class FindMetadataSourceCommand final : public Command {
   }
 };
 
-const CommandFactoryT<FindMetadataSourceCommand> factory(kFind);
+const CommandFactoryT<FindMetadataSourceCommand> findMetadataSourceFactory(kFind);
 
 }  // namespace
 

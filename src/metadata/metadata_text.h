@@ -27,6 +27,11 @@ String ToString(std::u16string_view text);
 /// The units of a String, as long as it lives unchanged.
 std::u16string_view View(const String& text);
 
+/// Blanks and the ends of lines.
+inline constexpr std::u16string_view kBlanks = u" \t\r\n";
+/// Stands in a source of a definition file for the number of a repeated group.
+inline constexpr char16_t kRepeat = u'#';
+
 /// `text` without the characters of `marks` at both ends.
 std::u16string_view Trimmed(std::u16string_view text, std::u16string_view marks = u" \t");
 

@@ -12,9 +12,6 @@
 namespace lumo {
 namespace {
 
-constexpr char16_t kRepeat = u'#';
-constexpr std::u16string_view kBlanks = u" \t\r\n";
-
 /// Calls `visit(path, text)` for every text of a collection.
 template <typename Visit>
 void VisitTexts(const MetadataContainer& container, const String& path, const Visit& visit) {

@@ -13,7 +13,7 @@
 namespace lumo {
 namespace {
 
-constexpr unsigned kMaxDepth = 200;
+constexpr unsigned kMaxElementDepth = 200;
 constexpr unsigned kMaxExpansions = 10000;
 constexpr std::size_t kMaxEntityLength = 1024;
 
@@ -41,7 +41,7 @@ class MDXmlHandler final : public XmlListener {
       : writer_(collection), joinsTexts_(joinsTexts) {}
 
   bool OnElement(const char16_t* name, const Attribute* attributes, std::size_t count) override {
-    if (writer_.Depth() >= kMaxDepth) return Refuse("elements are nested too deep");
+    if (writer_.Depth() >= kMaxElementDepth) return Refuse("elements are nested too deep");
     PutPieces();
     writer_.StartElement(name);
     for (std::size_t i = 0; i < count; ++i) {

@@ -221,10 +221,10 @@ class CreateMosaicCommand final : public RasterCommand {
   MosaicDocument document_;
 };
 
-const CommandFactoryT<CreateMosaicCommand> factory(kCreate);
-const DivisionRegistration division({.command = "CreateMosaicCommand",
-                                     .kind = DivisionKind::kFirst,
-                                     .makes = {"File"}});
+const CommandFactoryT<CreateMosaicCommand> createMosaicFactory(kCreate);
+const DivisionRegistration createMosaicDivision({.command = "CreateMosaicCommand",
+                                                 .kind = DivisionKind::kFirst,
+                                                 .makes = {"File"}});
 
 }  // namespace
 }  // namespace lumo

@@ -110,7 +110,7 @@ class MosaicFootPrintsCommand final : public RasterCommand {
   }
 };
 
-const CommandFactoryT<MosaicFootPrintsCommand> factory(kFootPrints);
+const CommandFactoryT<MosaicFootPrintsCommand> mosaicFootPrintsFactory(kFootPrints);
 
 }  // namespace
 }  // namespace lumo

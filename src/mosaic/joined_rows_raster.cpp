@@ -152,7 +152,7 @@ class CreateJoinedRowsRasterCommand final : public ViewCommand {
   }
 };
 
-const CommandFactoryT<CreateJoinedRowsRasterCommand> factory(kJoinRows);
+const CommandFactoryT<CreateJoinedRowsRasterCommand> createJoinedRowsRasterFactory(kJoinRows);
 
 }  // namespace
 

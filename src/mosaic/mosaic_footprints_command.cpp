@@ -46,10 +46,10 @@ class MakeMosaicFootPrintsCommand final : public MosaicCommand {
   }
 };
 
-const CommandFactoryT<MakeMosaicFootPrintsCommand> factory(kMake);
-const DivisionRegistration division({.command = "MakeMosaicFootPrintsCommand",
-                                     .kind = DivisionKind::kFirst,
-                                     .source = "MosaicURI"});
+const CommandFactoryT<MakeMosaicFootPrintsCommand> makeMosaicFootPrintsFactory(kMake);
+const DivisionRegistration makeMosaicFootPrintsDivision({.command = "MakeMosaicFootPrintsCommand",
+                                                         .kind = DivisionKind::kFirst,
+                                                         .source = "MosaicURI"});
 
 }  // namespace
 }  // namespace lumo

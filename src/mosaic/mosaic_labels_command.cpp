@@ -140,7 +140,7 @@ class CreateMosaicLabelsCommand final : public PublishCommand {
   }
 };
 
-const CommandFactoryT<CreateMosaicLabelsCommand> factory(kLabels);
+const CommandFactoryT<CreateMosaicLabelsCommand> createMosaicLabelsFactory(kLabels);
 
 }  // namespace
 }  // namespace lumo

@@ -189,11 +189,6 @@ class Matching {
     return true;
   }
 
-  static bool Refuse(const std::string& why) {
-    SetFault(String(why));
-    return false;
-  }
-
   /// Computes statistics and histograms of all that will be asked for.
   bool Prepare() {
     const unsigned scenes = definition_.SceneCount();

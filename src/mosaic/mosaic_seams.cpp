@@ -27,11 +27,6 @@ namespace fs = std::filesystem;
 // The definition is stored as footprints come in, but not more often than this.
 constexpr std::chrono::seconds kKeepInterval{2};
 
-bool Refuse(const std::string& why) {
-  SetFault(String(why));
-  return false;
-}
-
 /// Finds names for side files that nobody has. Numbers start at random.
 class FreeNames {
  public:

@@ -6,7 +6,7 @@
 namespace lumo {
 namespace {
 
-const CommandDeclaration kSeams{
+const CommandDeclaration kSeamGeneration{
     "MosaicAutoSeamGenCommand",
     "Mosaics",
     "Decides which scene of a mosaic shows which ground: cuts the footprints of its scenes along "
@@ -28,9 +28,9 @@ class MosaicAutoSeamGenCommand final : public MosaicCommand {
   }
 };
 
-const CommandFactoryT<MosaicAutoSeamGenCommand> factory(kSeams);
-const DivisionRegistration division({.command = "MosaicAutoSeamGenCommand",
-                                     .kind = DivisionKind::kFirst});
+const CommandFactoryT<MosaicAutoSeamGenCommand> mosaicAutoSeamGenFactory(kSeamGeneration);
+const DivisionRegistration mosaicAutoSeamGenDivision({.command = "MosaicAutoSeamGenCommand",
+                                                      .kind = DivisionKind::kFirst});
 
 }  // namespace
 }  // namespace lumo

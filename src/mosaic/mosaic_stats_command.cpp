@@ -37,10 +37,10 @@ class MosaicStatsCommand final : public MosaicCommand {
   }
 };
 
-const CommandFactoryT<MosaicStatsCommand> factory(kStats);
-const DivisionRegistration division({.command = "MosaicStatsCommand",
-                                     .kind = DivisionKind::kFirst,
-                                     .source = "MosaicURI"});
+const CommandFactoryT<MosaicStatsCommand> mosaicStatsFactory(kStats);
+const DivisionRegistration mosaicStatsDivision({.command = "MosaicStatsCommand",
+                                                .kind = DivisionKind::kFirst,
+                                                .source = "MosaicURI"});
 
 }  // namespace
 }  // namespace lumo

@@ -181,9 +181,9 @@ class CreateMosaicVectorsCommand final : public MosaicCommand {
   VectorRecordSinkPtr sink_;
 };
 
-const CommandFactoryT<CreateMosaicVectorsCommand> factory(kVectors);
-const DivisionRegistration division({.command = "CreateMosaicVectorsCommand",
-                                     .makes = {"Vectors"}});
+const CommandFactoryT<CreateMosaicVectorsCommand> createMosaicVectorsFactory(kVectors);
+const DivisionRegistration createMosaicVectorsDivision({.command = "CreateMosaicVectorsCommand",
+                                                        .makes = {"Vectors"}});
 
 }  // namespace
 }  // namespace lumo

@@ -68,7 +68,7 @@ class QueryMosaicCommand final : public MosaicCommand {
   }
 };
 
-const CommandFactoryT<QueryMosaicCommand> factory(kQuery);
+const CommandFactoryT<QueryMosaicCommand> queryMosaicFactory(kQuery);
 
 }  // namespace
 }  // namespace lumo

@@ -12,10 +12,6 @@ using Point = Point2D<double>;
 // The neighbour of a spike lies this near to the edge to the other one, squared.
 constexpr double kSpikeWidth = 0.25 * 0.25;
 
-double SquaredLength(const Point& a, const Point& b) {
-  return (b.x - a.x) * (b.x - a.x) + (b.y - a.y) * (b.y - a.y);
-}
-
 /// The angle at v between u and w, by the law of cosines; 0 where two of them are one.
 double AngleAt(const Point& v, const Point& u, const Point& w) {
   const double vu = SquaredLength(v, u), vw = SquaredLength(v, w), uw = SquaredLength(u, w);

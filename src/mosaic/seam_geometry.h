@@ -8,6 +8,11 @@ namespace lumo {
 
 // Measures and repairs of outlines in pixels, as seams need them.
 
+/// The squared distance of two points.
+inline double SquaredLength(const Point2D<double>& a, const Point2D<double>& b) {
+  return (b.x - a.x) * (b.x - a.x) + (b.y - a.y) * (b.y - a.y);
+}
+
 /// The squared distance of a point from the segment from `s` to `e`.
 VEXG_EXPORT double SquaredDistanceToSegment(const Point2D<double>& p, const Point2D<double>& s,
                                             const Point2D<double>& e);

@@ -71,10 +71,6 @@ Points Reversed(Points points) {
   return points;
 }
 
-double SquaredLength(const Point& a, const Point& b) {
-  return (b.x - a.x) * (b.x - a.x) + (b.y - a.y) * (b.y - a.y);
-}
-
 /// The edges of the outer rings of an outline by the rows that they lie in, to find those near a
 /// point without a look at all: outlines that follow pixels have ten thousands.
 class EdgeRows {

@@ -17,13 +17,13 @@ namespace {
 constexpr std::size_t kMostFolders = 8;
 constexpr const char* kOlderOutput = ".old";
 
-struct Slot {
+struct FolderSlot {
   std::atomic<bool> isWhole{false};
   char path[PATH_MAX] = {};
 };
 
 // No constructor at run time: a handler may read it at any moment.
-constinit std::array<Slot, kMostFolders> gSlots{};
+constinit std::array<FolderSlot, kMostFolders> gFolders{};
 std::atomic<std::size_t> gNext{0};
 
 /// Removes the files of a folder; false when it holds what is to stay.
@@ -44,15 +44,15 @@ bool RemoveFiles(int folder) {
 }  // namespace
 
 void KeepUnfinishedFolder(const std::string& path) noexcept {
-  if (path.size() >= sizeof(Slot::path)) return;
-  Slot& slot = gSlots[gNext.fetch_add(1) % kMostFolders];
+  if (path.size() >= sizeof(FolderSlot::path)) return;
+  FolderSlot& slot = gFolders[gNext.fetch_add(1) % kMostFolders];
   slot.isWhole = false;
   std::memcpy(slot.path, path.c_str(), path.size() + 1);
   slot.isWhole = true;
 }
 
 void RemoveUnfinishedFolders() noexcept {
-  for (const Slot& slot : gSlots) {
+  for (const FolderSlot& slot : gFolders) {
     if (!slot.isWhole) continue;
     const int folder = open(slot.path, O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC);
     if (folder < 0) continue;

@@ -10,13 +10,12 @@ namespace lumo {
 namespace {
 
 constexpr const char* kGroup = "Pyramids";
-const InputDeclaration kUri{"URI", Presence::kRequired, ValueKind::kURI, "the raster"};
 
 const CommandDeclaration kGet{
     "GetRasterPyramidCommand",
     kGroup,
     "Gives a level of the pyramid of a raster as a raster of its own.",
-    {kUri,
+    {RasterURIInput(),
      {"Level", Presence::kRequired, ValueKind::kInteger,
       "halves samples and lines so many times; 0 is the size of the raster"},
      {"Placing", Presence::kOptional, ValueKind::kWord,
@@ -48,7 +47,7 @@ class GetRasterPyramidCommand final : public RasterCommand {
   }
 };
 
-const CommandFactoryT<GetRasterPyramidCommand> getFactory(kGet);
+const CommandFactoryT<GetRasterPyramidCommand> getRasterPyramidFactory(kGet);
 
 /// Carries the progress of a build to a command, and the abort of the command to the build.
 class BuildObserver final : public AsyncCallback {
@@ -84,7 +83,7 @@ const CommandDeclaration kBuild{
     "BuildRasterPyramidCommand",
     kGroup,
     "Builds the pyramid of a raster, with its statistics and a histogram, where it was opened.",
-    {kUri,
+    {RasterURIInput(),
      {"PyramidType", Presence::kRequired, ValueKind::kWord,
       "ORVA: a file of the library's own; DRIVER: by the driver of the format", "",
       &WordsIn<PyramidType>},
@@ -144,7 +143,7 @@ const CommandDeclaration kRefresh{
     "RefreshRasterPyramidCommand",
     kGroup,
     "Has a raster show the levels that its pyramid holds by now.",
-    {kUri},
+    {RasterURIInput()},
     {{"Return", ValueKind::kBoolean, "it has a pyramid that could be looked at"}}};
 
 class RefreshRasterPyramidCommand final : public RasterCommand {
@@ -162,7 +161,7 @@ const CommandFactoryT<RefreshRasterPyramidCommand> refreshFactory(kRefresh);
 const CommandDeclaration kDelete{"DeleteRasterPyramidCommand",
                                  kGroup,
                                  "Removes the pyramid of a raster.",
-                                 {kUri},
+                                 {RasterURIInput()},
                                  {{"Return", ValueKind::kBoolean, "it is gone"},
                                   {"Fault", ValueKind::kText, "why it is not; only then"}}};
 

@@ -12,8 +12,7 @@ const CommandDeclaration kCompare{
     "CompareRasterGridsCommand",
     "Rasters",
     "Tells how the grid of a raster lies in that of another one. A command of this library's own.",
-    {{"URI", Presence::kRequired, ValueKind::kURI, "the raster"},
-     {"OtherURI", Presence::kRequired, ValueKind::kURI, "the other one"}},
+    {RasterURIInput(), {"OtherURI", Presence::kRequired, ValueKind::kURI, "the other one"}},
     {{"SameSize", ValueKind::kBoolean, "both have as many samples and lines"},
      {"SameSystem", ValueKind::kBoolean, "both have one coordinate system, or none"},
      {"ShiftX", ValueKind::kNumber,
@@ -77,7 +76,7 @@ class CompareRasterGridsCommand final : public RasterCommand {
   }
 };
 
-const CommandFactoryT<CompareRasterGridsCommand> factory(kCompare);
+const CommandFactoryT<CompareRasterGridsCommand> compareRasterGridsFactory(kCompare);
 
 }  // namespace
 }  // namespace lumo

@@ -154,8 +154,9 @@ class CopyRasterCommand final : public RasterCommand {
   }
 };
 
-const CommandFactoryT<CopyRasterCommand> factory(kCopy);
-const DivisionRegistration division({"CopyRasterCommand", DivisionKind::kRows, "SrcURI", "DstURI"});
+const CommandFactoryT<CopyRasterCommand> copyRasterFactory(kCopy);
+const DivisionRegistration copyRasterDivision({"CopyRasterCommand", DivisionKind::kRows, "SrcURI",
+                                               "DstURI"});
 
 }  // namespace
 }  // namespace lumo

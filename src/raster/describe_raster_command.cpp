@@ -8,7 +8,7 @@ const CommandDeclaration kDescribe{
     "DescribeRasterCommand",
     "Rasters",
     "Tells all that a raster says of itself in one text. A command of this library's own.",
-    {{"URI", Presence::kRequired, ValueKind::kURI, "the raster"}},
+    {RasterURIInput()},
     {{"Description", ValueKind::kText,
       "a JSON object, as vexg_describe of the C interface gives it"}}};
 
@@ -22,7 +22,7 @@ class DescribeRasterCommand final : public RasterCommand {
   }
 };
 
-const CommandFactoryT<DescribeRasterCommand> factory(kDescribe);
+const CommandFactoryT<DescribeRasterCommand> describeRasterFactory(kDescribe);
 
 }  // namespace
 }  // namespace lumo

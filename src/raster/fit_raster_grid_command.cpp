@@ -11,7 +11,7 @@ const CommandDeclaration kFit{
     "Coordinates",
     "Finds the grid of a coordinate system that shows all of a raster, for "
     "CreateProjectedRasterCommand. A command of this library's own.",
-    {{"URI", Presence::kRequired, ValueKind::kURI, "the raster"},
+    {RasterURIInput(),
      {"CoordSys", Presence::kRequired, ValueKind::kText,
       "the coordinate system: EPSG:n, WKT or PROJ text"},
      {"PixelSize", Presence::kOptional, ValueKind::kNumber,
@@ -48,7 +48,7 @@ class FitRasterGridCommand final : public RasterCommand {
   }
 };
 
-const CommandFactoryT<FitRasterGridCommand> factory(kFit);
+const CommandFactoryT<FitRasterGridCommand> fitRasterGridFactory(kFit);
 
 }  // namespace
 }  // namespace lumo

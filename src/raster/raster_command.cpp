@@ -4,6 +4,10 @@
 
 namespace lumo {
 
+InputDeclaration RasterURIInput() {
+  return {"URI", Presence::kRequired, ValueKind::kURI, "the raster"};
+}
+
 BasicRasterPtr RasterCommand::FindRaster(const char* name) const {
   const URI uri = Read<URI>(name);
   const BasicRasterPtr raster(CatalogFind(uri));

@@ -1,9 +1,13 @@
 #pragma once
 
 #include "commands/command.h"
+#include "commands/declaration.h"
 #include "raster/raster.h"
 
 namespace lumo {
+
+/// The required input URI, which names the raster that a command is about.
+VEXG_EXPORT InputDeclaration RasterURIInput();
 
 /// Helps commands that work on rasters of the catalog to find them:
 ///

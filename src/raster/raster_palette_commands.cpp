@@ -5,15 +5,14 @@
 namespace lumo {
 namespace {
 
-const InputDeclaration kUri{"URI", Presence::kRequired, ValueKind::kURI, "the raster"};
-const InputDeclaration kBands{"Bands", Presence::kRequired, ValueKind::kIntegerArray,
-                              "the bands, from 0"};
+const InputDeclaration kPaletteBands{"Bands", Presence::kRequired, ValueKind::kIntegerArray,
+                                     "the bands, from 0"};
 
-const CommandDeclaration kGet{
+const CommandDeclaration kGetPalette{
     "GetRasterPaletteCommand",
     "Palettes",
     "Gives the colour tables of bands.",
-    {kUri, kBands},
+    {RasterURIInput(), kPaletteBands},
     {{"Palettes", ValueKind::kPaletteArray, "one for each band given; empty where it has none"}}};
 
 class GetRasterPaletteCommand final : public RasterCommand {
@@ -33,13 +32,13 @@ class GetRasterPaletteCommand final : public RasterCommand {
   }
 };
 
-const CommandFactoryT<GetRasterPaletteCommand> getFactory(kGet);
+const CommandFactoryT<GetRasterPaletteCommand> getRasterPaletteFactory(kGetPalette);
 
 const CommandDeclaration kCategories{
     "GetRasterCategoriesCommand",
     "Palettes",
     "Gives the names that the values of a band have. A command of this library's own.",
-    {kUri, {"Band", Presence::kRequired, ValueKind::kInteger, "from 0"}},
+    {RasterURIInput(), {"Band", Presence::kRequired, ValueKind::kInteger, "from 0"}},
     {{"Categories", ValueKind::kTextList, "of the values from 0 on; empty where it has none"}}};
 
 class GetRasterCategoriesCommand final : public RasterCommand {
@@ -63,7 +62,7 @@ const CommandDeclaration kSet{
     "SetRasterPaletteCommand",
     "Palettes",
     "Stores the colour table of a band through the data source.",
-    {kUri,
+    {RasterURIInput(),
      {"Band", Presence::kRequired, ValueKind::kInteger, "the band, from 0"},
      {"Palette", Presence::kRequired, ValueKind::kPalette, "the colour table"}},
     {{"Return", ValueKind::kBoolean, "the source took it"}}};
@@ -82,7 +81,7 @@ class SetRasterPaletteCommand final : public RasterCommand {
 
 const CommandFactoryT<SetRasterPaletteCommand> setFactory(kSet);
 
-const CommandDeclaration kCopy{
+const CommandDeclaration kCopyPalettes{
     "CopyRasterPalettesCommand",
     "Palettes",
     "Stores the colour tables of all bands of a raster with another one. A command of this "
@@ -109,13 +108,13 @@ class CopyRasterPalettesCommand final : public RasterCommand {
   }
 };
 
-const CommandFactoryT<CopyRasterPalettesCommand> copyFactory(kCopy);
+const CommandFactoryT<CopyRasterPalettesCommand> copyFactory(kCopyPalettes);
 
 const CommandDeclaration kDelete{
     "DeleteRasterPaletteCommand",
     "Palettes",
     "Takes the colour tables of bands away from the data source.",
-    {kUri, kBands},
+    {RasterURIInput(), kPaletteBands},
     {{"Return", ValueKind::kBooleanArray, "for each band given: it has none any more"}}};
 
 class DeleteRasterPaletteCommand final : public RasterCommand {

@@ -9,7 +9,7 @@ namespace {
 
 std::vector<InputDeclaration> BlockInputs() {
   return {
-      {"URI", Presence::kRequired, ValueKind::kURI, "the raster"},
+      RasterURIInput(),
       {"SubRect", Presence::kRequired, ValueKind::kRectangle, "the block, pixels of the raster"},
       {"Bands", Presence::kRequired, ValueKind::kIntegerArray, "the bands, in any order"},
       {"Interleave", Presence::kRequired, ValueKind::kWord,
@@ -125,7 +125,7 @@ class GetRasterSubRectCommand final : public BlockCommand {
   }
 };
 
-const CommandFactoryT<GetRasterSubRectCommand> getFactory(kGet);
+const CommandFactoryT<GetRasterSubRectCommand> getRasterSubRectFactory(kGet);
 
 const CommandDeclaration kPut{
     "PutRasterSubRectCommand",

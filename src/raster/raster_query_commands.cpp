@@ -46,10 +46,8 @@ const std::vector<OutputDeclaration> kQueryOutputs{
     {"PyramidLevelMax", ValueKind::kInteger, "last level"},
     {"PyramidCanBuild", ValueKind::kBoolean, "a pyramid can be built"}};
 
-const InputDeclaration kUri{"URI", Presence::kRequired, ValueKind::kURI, "the raster"};
-
 const CommandDeclaration kQuery{
-    "QueryRasterCommand", "Rasters", "Tells what a raster is.", {kUri}, kQueryOutputs};
+    "QueryRasterCommand", "Rasters", "Tells what a raster is.", {RasterURIInput()}, kQueryOutputs};
 
 class QueryRasterCommand final : public QueryCommand {
   CommandResult Execute() override {
@@ -79,7 +77,7 @@ std::vector<OutputDeclaration> ExtendedOutputs() {
 const CommandDeclaration kExtendedQuery{"ExtendedQueryRasterCommand",
                                         "Rasters",
                                         "Tells what a raster is, and what it knows of each band.",
-                                        {kUri},
+                                        {RasterURIInput()},
                                         ExtendedOutputs()};
 
 class ExtendedQueryRasterCommand final : public QueryCommand {
@@ -128,7 +126,7 @@ const CommandDeclaration kGetGeoRef{
     "GetRasterGeoRefCommand",
     "Rasters",
     "Tells where the pixels of a raster lie.",
-    {kUri},
+    {RasterURIInput()},
     {{"GeoRef", ValueKind::kGeoRef, "the geo-reference; Unknown when it has none"}}};
 
 class GetRasterGeoRefCommand final : public RasterCommand {
@@ -147,7 +145,7 @@ const CommandDeclaration kSetTiles{
     "SetDefaultTileSizeCommand",
     "Rasters",
     "Sets the blocks in which a raster is worked on, where it has a use for that.",
-    {kUri, {"TileDimensions", Presence::kRequired, ValueKind::kTiles, "the blocks"}},
+    {RasterURIInput(), {"TileDimensions", Presence::kRequired, ValueKind::kTiles, "the blocks"}},
     {}};
 
 class SetDefaultTileSizeCommand final : public RasterCommand {

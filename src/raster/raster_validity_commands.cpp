@@ -17,7 +17,7 @@ const CommandDeclaration kValidity{
     "QueryRasterValidityCommand",
     "Pixels",
     "Counts the valid pixels of each band of a raster, by reading all of it.",
-    {{"URI", Presence::kRequired, ValueKind::kURI, "the raster"},
+    {RasterURIInput(),
      {"Values", Presence::kOptional, ValueKind::kBoolean,
       "whether to look for a value that no valid pixel has; not when absent"}},
     {{"ValidPixels", ValueKind::kIntegerArray, "for each band"},
@@ -99,7 +99,7 @@ const CommandDeclaration kDetails{
     "QueryRasterDetailsCommand",
     "Rasters",
     "Tells what a raster says beside its size, type, place and no-data values.",
-    {{"URI", Presence::kRequired, ValueKind::kURI, "the raster"}},
+    {RasterURIInput()},
     {{"Details", ValueKind::kTextList,
       "texts \"name=value\", such as \"Bands/0/Unit=K\"; a bar in one is written as a blank"}}};
 

@@ -144,7 +144,7 @@ const CommandDeclaration kMeasure{
     "MeasureROICommand",
     "Regions",
     "Tells which pixels of a raster a region of interest covers. A command of this library's own.",
-    {{"URI", Presence::kRequired, ValueKind::kURI, "the raster"},
+    {RasterURIInput(),
      {"ROIDefURI", Presence::kRequired, ValueKind::kURI, "the region"},
      {"SubRect", Presence::kOptional, ValueKind::kRectangle,
       "of the raster, where alone it is looked for; all when absent"}},

@@ -19,7 +19,7 @@ const CommandDeclaration kZonal{
     "Makes a table of what the pixels inside each shape of a vector file add up to. A command of "
     "this library's own.",
     WithShareInputs(
-        {{"URI", Presence::kRequired, ValueKind::kURI, "the raster"},
+        {RasterURIInput(),
          {"Vectors", Presence::kRequired, ValueKind::kText, "the file of shapes, one zone each"},
          {"Table", Presence::kRequired, ValueKind::kText,
           "the file to make, in the format of its ending: a row for each record with its own "
@@ -248,11 +248,11 @@ class ZonalStatisticsCommand final : public RasterCommand {
   std::uint64_t empty_ = 0;
 };
 
-const CommandFactoryT<ZonalStatisticsCommand> factory(kZonal);
-const DivisionRegistration division({.command = "ZonalStatisticsCommand",
-                                     .kind = DivisionKind::kShares,
-                                     .source = "URI",
-                                     .makes = {"Table"}});
+const CommandFactoryT<ZonalStatisticsCommand> zonalStatisticsFactory(kZonal);
+const DivisionRegistration zonalStatisticsDivision({.command = "ZonalStatisticsCommand",
+                                                    .kind = DivisionKind::kShares,
+                                                    .source = "URI",
+                                                    .makes = {"Table"}});
 
 }  // namespace
 }  // namespace lumo

@@ -21,7 +21,7 @@ const CommandDeclaration kFit{
     "Chooses bins for the values of bands, counts them, and gives the histograms. (An addition of "
     "this library.)",
     WithShareInputs(
-        {{"URI", Presence::kRequired, ValueKind::kURI, "the raster"},
+        {RasterURIInput(),
          {"Bands", Presence::kOptional, ValueKind::kIntegerArray, "which bands; all when absent"},
          {"Lowest", Presence::kOptional, ValueKind::kNumberArray,
           "for each of the bands its smallest value, from which its bins begin; the type's for 8 "

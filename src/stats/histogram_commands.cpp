@@ -7,13 +7,11 @@
 namespace lumo {
 namespace {
 
-const InputDeclaration kUri{"URI", Presence::kRequired, ValueKind::kURI, "the raster"};
-
 const CommandDeclaration kCalculate{
     "CalculateRasterHistogramCommand",
     "Statistics",
     "Counts the histograms of bands; GetRasterHistogramCommand then has them.",
-    {kUri,
+    {RasterURIInput(),
      {"LowerBound", Presence::kRequired, ValueKind::kNumber,
       "smallest value that counts; one that the pixel type can't hold is limited to it"},
      {"UpperBound", Presence::kRequired, ValueKind::kNumber,
@@ -95,11 +93,11 @@ class CalculateRasterHistogramCommand final : public RasterCommand {
 
 const CommandFactoryT<CalculateRasterHistogramCommand> calculateFactory(kCalculate);
 
-const CommandDeclaration kGet{
+const CommandDeclaration kGetHistogram{
     "GetRasterHistogramCommand",
     "Statistics",
     "Gives the histograms at hand of bands.",
-    {kUri,
+    {RasterURIInput(),
      {"Bands", Presence::kRequired, ValueKind::kIntegerArray, "the bands, in the order wanted"},
      WaitInput()},
     {{"Histograms", ValueKind::kText,
@@ -134,12 +132,12 @@ class GetRasterHistogramCommand final : public RasterCommand {
   }
 };
 
-const CommandFactoryT<GetRasterHistogramCommand> getFactory(kGet);
+const CommandFactoryT<GetRasterHistogramCommand> getRasterHistogramFactory(kGetHistogram);
 
 const CommandDeclaration kSet{"SetRasterBandHistogramCommand",
                               "Statistics",
                               "Enters a known histogram of one band.",
-                              {kUri,
+                              {RasterURIInput(),
                                {"RasterBandHistogram", Presence::kRequired, ValueKind::kText,
                                 "band, sign, bin size, bins, bounds, source and counts"},
                                WaitInput()},
@@ -167,11 +165,11 @@ class SetRasterBandHistogramCommand final : public RasterCommand {
 
 const CommandFactoryT<SetRasterBandHistogramCommand> setFactory(kSet);
 
-const CommandDeclaration kSave{
+const CommandDeclaration kSaveHistogram{
     "SaveRasterHistogramCommand",
     "Statistics",
     "Stores the histograms of a raster through its data source.",
-    {kUri, WaitInput()},
+    {RasterURIInput(), WaitInput()},
     {{"Return", ValueKind::kBoolean, "they are stored, or the source has no place for them"},
      {"Fault", ValueKind::kText, "why they could not be stored; only then"}}};
 
@@ -179,7 +177,7 @@ class SaveRasterHistogramCommand final : public SavingCommand {
   bool Save(BasicRaster& raster) override { return raster.WriteHistogram(); }
 };
 
-const CommandFactoryT<SaveRasterHistogramCommand> saveFactory(kSave);
+const CommandFactoryT<SaveRasterHistogramCommand> saveRasterHistogramFactory(kSaveHistogram);
 
 }  // namespace
 }  // namespace lumo

@@ -15,7 +15,7 @@ const CommandDeclaration kPercentiles{
     "Statistics",
     "Gives percentiles of the valid pixels of each band, exactly. A command of this library's own.",
     WithShareInputs(
-        {{"URI", Presence::kRequired, ValueKind::kURI, "the raster"},
+        {RasterURIInput(),
          {"Percents", Presence::kRequired, ValueKind::kNumberArray,
           "0 to 100, 128 of them at most; 50 is the median"},
          {"Bands", Presence::kOptional, ValueKind::kIntegerArray, "from 0; all when absent"}}),
@@ -84,10 +84,10 @@ class GetRasterPercentilesCommand final : public RasterCommand {
 };
 
 const CommandFactoryT<GetRasterPercentilesCommand> percentilesFactory(kPercentiles);
-const DivisionRegistration division({.command = "GetRasterPercentilesCommand",
-                                     .kind = DivisionKind::kShares,
-                                     .source = "URI",
-                                     .rounds = &PercentilePasses});
+const DivisionRegistration getRasterPercentilesDivision({.command = "GetRasterPercentilesCommand",
+                                                         .kind = DivisionKind::kShares,
+                                                         .source = "URI",
+                                                         .rounds = &PercentilePasses});
 
 }  // namespace
 }  // namespace lumo

@@ -11,8 +11,6 @@
 namespace lumo {
 namespace {
 
-const InputDeclaration kUri{"URI", Presence::kRequired, ValueKind::kURI, "the raster"};
-
 /// Base of the commands that compute statistics and write them.
 class ComputeStatsCommand : public RasterCommand {
  protected:
@@ -129,7 +127,7 @@ std::vector<OutputDeclaration> ExtendedOutputs() {
 const CommandDeclaration kBasic{
     "GetBasicRasterStatsCommand", "Statistics",
     "Gives the statistics of each band, computed where they are not at hand.",
-    WithShareInputs({kUri, WaitInput()}), kBasicOutputs};
+    WithShareInputs({RasterURIInput(), WaitInput()}), kBasicOutputs};
 
 class GetBasicRasterStatsCommand final : public ComputeStatsCommand {
   CommandResult Execute() override { return Compute(StatsMode::kBasic); }
@@ -143,7 +141,7 @@ const DivisionRegistration basicDivision({.command = "GetBasicRasterStatsCommand
 const CommandDeclaration kExtended{
     "GetExtendedRasterStatsCommand", "Statistics",
     "Gives the statistics of each band and between bands, computed where they are not at hand.",
-    WithShareInputs({kUri, WaitInput()}), ExtendedOutputs()};
+    WithShareInputs({RasterURIInput(), WaitInput()}), ExtendedOutputs()};
 
 class GetExtendedRasterStatsCommand final : public ComputeStatsCommand {
   CommandResult Execute() override { return Compute(StatsMode::kExtended); }
@@ -158,7 +156,7 @@ const CommandDeclaration kSetMode{
     "SetRasterStatsModeCommand",
     "Statistics",
     "Sets which statistics a raster computes.",
-    {kUri,
+    {RasterURIInput(),
      {"StatsMode", Presence::kRequired, ValueKind::kWord,
       "DoBasic, or DoExtended: with those between bands", "", &WordsIn<StatsMode>},
      WaitInput()},
@@ -181,7 +179,7 @@ const CommandFactoryT<SetRasterStatsModeCommand> setModeFactory(kSetMode);
 const CommandDeclaration kSetStats{"SetRasterBandStatsCommand",
                                    "Statistics",
                                    "Enters known statistics of one band.",
-                                   {kUri,
+                                   {RasterURIInput(),
                                     {"RasterBandStats", Presence::kRequired, ValueKind::kText,
                                      "band, mask, min, max, mean, deviation, sum, sum of squares, "
                                      "root mean square, and the arrays "
@@ -208,11 +206,11 @@ class SetRasterBandStatsCommand final : public RasterCommand {
 
 const CommandFactoryT<SetRasterBandStatsCommand> setStatsFactory(kSetStats);
 
-const CommandDeclaration kSave{
+const CommandDeclaration kSaveStats{
     "SaveRasterStatsCommand",
     "Statistics",
     "Stores the statistics of a raster through its data source.",
-    {kUri, WaitInput()},
+    {RasterURIInput(), WaitInput()},
     {{"Return", ValueKind::kBoolean, "they are stored, or the source has no place for them"},
      {"Fault", ValueKind::kText, "why they could not be stored; only then"}}};
 
@@ -220,7 +218,7 @@ class SaveRasterStatsCommand final : public SavingCommand {
   bool Save(BasicRaster& raster) override { return raster.WriteStats(); }
 };
 
-const CommandFactoryT<SaveRasterStatsCommand> saveFactory(kSave);
+const CommandFactoryT<SaveRasterStatsCommand> saveRasterStatsFactory(kSaveStats);
 
 }  // namespace
 }  // namespace lumo

@@ -118,7 +118,7 @@ class CreateConvertedRasterCommand final : public PublishCommand {
   Metadata details_;
 };
 
-const CommandFactoryT<CreateConvertedRasterCommand> factory(kConverted);
+const CommandFactoryT<CreateConvertedRasterCommand> createConvertedRasterFactory(kConverted);
 
 }  // namespace
 }  // namespace lumo

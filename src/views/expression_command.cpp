@@ -95,7 +95,7 @@ class CreateExpressionRasterCommand final : public CombineCommand {
   }
 };
 
-const CommandFactoryT<CreateExpressionRasterCommand> factory(kExpression);
+const CommandFactoryT<CreateExpressionRasterCommand> createExpressionRasterFactory(kExpression);
 
 }  // namespace
 }  // namespace lumo

@@ -115,7 +115,7 @@ class RasterizeCommand final : public PublishCommand {
   ValuedShapes shapes_;
 };
 
-const CommandFactoryT<RasterizeCommand> factory(kRasterize);
+const CommandFactoryT<RasterizeCommand> rasterizeFactory(kRasterize);
 
 }  // namespace
 }  // namespace lumo

@@ -6,7 +6,7 @@
 namespace lumo {
 namespace {
 
-std::string Text(const String& text) {
+std::string Utf8(const String& text) {
   return text.GetUTF8() != nullptr ? text.GetUTF8() : "<none>";
 }
 
@@ -26,11 +26,11 @@ TEST(TextForm, ReadsTextsInThreeForms) {
   for (const auto& c : cases) {
     SCOPED_TRACE(c.in);
     auto whole = MakeTextReader(c.in);
-    EXPECT_EQ(Text(ReadWholeText(whole)), c.whole);
+    EXPECT_EQ(Utf8(ReadWholeText(whole)), c.whole);
     auto word = MakeTextReader(c.in);
-    EXPECT_EQ(Text(ReadWordText(word)), c.word);
+    EXPECT_EQ(Utf8(ReadWordText(word)), c.word);
     auto bracketed = MakeTextReader(c.in);
-    EXPECT_EQ(Text(ReadBracketedText(bracketed)), c.bracketed);
+    EXPECT_EQ(Utf8(ReadBracketedText(bracketed)), c.bracketed);
   }
 }
 
@@ -40,9 +40,9 @@ TEST(TextForm, BracketedTextsFollowOneAnother) {
   WriteBracketedText(out, "\xE2\x82\xAC");
   EXPECT_EQ(out.str(), "[first one] [\xE2\x82\xAC] ");
   auto in = MakeTextReader(out.str());
-  EXPECT_EQ(Text(ReadBracketedText(in)), "first one");
-  EXPECT_EQ(Text(ReadBracketedText(in)), "\xE2\x82\xAC");
-  EXPECT_EQ(Text(ReadBracketedText(in)), "<none>");
+  EXPECT_EQ(Utf8(ReadBracketedText(in)), "first one");
+  EXPECT_EQ(Utf8(ReadBracketedText(in)), "\xE2\x82\xAC");
+  EXPECT_EQ(Utf8(ReadBracketedText(in)), "<none>");
 }
 
 template <typename T>

@@ -17,13 +17,13 @@ namespace {
 using M = PolygonMeasure;
 
 /// A square of 10 with a hole of 2 by 4 in it, clockwise on axes that run right and down.
-Contour2DArray<double> Frame() {
+Contour2DArray<double> HollowFrame() {
   return {{{{0, 0}, {10, 0}, {10, 10}, {0, 10}, {0, 0}}, false},
           {{{1, 1}, {1, 5}, {3, 5}, {3, 1}, {1, 1}}, true}};
 }
 
 TEST(Polygon2D, MeasuresFollowFromRectangles) {
-  const Polygon2D<double> frame(Frame(), 5);
+  const Polygon2D<double> frame(HollowFrame(), 5);
   EXPECT_EQ(frame.Label(), 5);
   EXPECT_FALSE(frame.HasMeasure(4));
   EXPECT_DOUBLE_EQ(frame.Measure(M::kSignedArea), 92);
@@ -103,7 +103,7 @@ TEST(Polygon2D, MeasuresAreThoseOfGeos) {
 }
 
 TEST(Polygon2D, MovesKeepWhatStaysTrue) {
-  Polygon2D<double> frame(Frame());
+  Polygon2D<double> frame(HollowFrame());
   const double ixx = frame.Measure(M::kIxx);
   frame.Translate(-3, 4);
   EXPECT_TRUE(frame.HasMeasure(static_cast<unsigned>(M::kIxx)));

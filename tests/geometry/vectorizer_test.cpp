@@ -25,7 +25,7 @@ struct Labels {
   unsigned char& StateAt(unsigned x, unsigned y) { return states[std::size_t{y} * width + x]; }
 };
 
-struct Shape {
+struct TracedShape {
   std::int32_t label;
   TracedPolygon rings;
 };
@@ -36,11 +36,11 @@ class Collect final : public LabelPolygonSink {
     shapes.push_back({static_cast<std::int32_t>(label), polygon});
     return shapes.size() < stopAt;
   }
-  std::vector<Shape> shapes;
+  std::vector<TracedShape> shapes;
   std::size_t stopAt = SIZE_MAX;
 };
 
-std::vector<Shape> Vectorize(const Labels& labels) {
+std::vector<TracedShape> Vectorize(const Labels& labels) {
   Collect sink;
   LabelVectorizer<std::int32_t> vectorizer(labels.width, sink);
   for (unsigned y = 0; y < labels.height; ++y) {
@@ -97,7 +97,7 @@ std::int64_t TwiceArea(const TracedPolygon& rings, std::size_t ring) {
 
 /// Looks at the rings of a polygon for themselves: closed, with turning points only, the first one
 /// around an area and the others around holes.
-void CheckRings(const Shape& shape) {
+void CheckRings(const TracedShape& shape) {
   const TracedPolygon& rings = shape.rings;
   ASSERT_EQ(rings.holes.size(), rings.starts.size());
   for (std::size_t ring = 0; ring < rings.starts.size(); ++ring) {
@@ -125,11 +125,11 @@ void CheckRings(const Shape& shape) {
 void CheckAgainstFlood(const Labels& labels) {
   int count = 0;
   const std::vector<int> areas = Flood(labels, count);
-  const std::vector<Shape> shapes = Vectorize(labels);
+  const std::vector<TracedShape> shapes = Vectorize(labels);
   ASSERT_EQ(shapes.size(), static_cast<std::size_t>(count));
   std::vector<int> filled(areas.size(), -1);
   for (std::size_t number = 0; number < shapes.size(); ++number) {
-    const Shape& shape = shapes[number];
+    const TracedShape& shape = shapes[number];
     CheckRings(shape);
     std::map<unsigned, std::vector<unsigned>> crossings;  // of each line, unordered
     for (std::size_t ring = 0; ring < shape.rings.starts.size(); ++ring) {
@@ -219,7 +219,7 @@ TEST(Vectorizer, LongBoundariesAndManyHolesCostWhatTheyAre) {
     for (unsigned x = y; x < kSide; ++x) stairs.At(x, y) = 1;
   }
   std::size_t vertices = 0;
-  for (const Shape& shape : Vectorize(stairs)) vertices += shape.rings.coordinates.size() / 2;
+  for (const TracedShape& shape : Vectorize(stairs)) vertices += shape.rings.coordinates.size() / 2;
   EXPECT_EQ(vertices, 4 * kSide + 4);
 
   Labels comb(kSide + 1, kSide);  // one boundary that goes up and down on every second column
@@ -232,7 +232,7 @@ TEST(Vectorizer, LongBoundariesAndManyHolesCostWhatTheyAre) {
   constexpr unsigned kHoles = 5000;
   Labels holes(2 * kHoles + 1, 3);
   for (unsigned hole = 0; hole < kHoles; ++hole) holes.At(2 * hole + 1, 1) = 1;
-  const std::vector<Shape> shapes = Vectorize(holes);
+  const std::vector<TracedShape> shapes = Vectorize(holes);
   ASSERT_EQ(shapes.size(), kHoles + 1);
   EXPECT_EQ(shapes.back().rings.starts.size(), kHoles + 1);
 }

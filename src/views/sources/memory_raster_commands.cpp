@@ -25,7 +25,7 @@ class CreateMemoryRasterCommand final : public RasterDefCommand {
   }
 };
 
-const CommandFactoryT<CreateMemoryRasterCommand> factory(kCreate);
+const CommandFactoryT<CreateMemoryRasterCommand> createMemoryRasterFactory(kCreate);
 
 }  // namespace
 }  // namespace lumo

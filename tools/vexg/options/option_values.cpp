@@ -13,6 +13,7 @@
 #include "data/format_table.h"
 #include "foundation/near_name.h"
 #include "foundation/text_case.h"
+#include "foundation/text_form.h"
 #include "raster/pixel_types.h"
 #include "verb.h"
 
@@ -20,13 +21,6 @@ namespace lumo::host {
 namespace {
 
 using Strings = std::vector<std::string>;
-
-std::string Trimmed(const std::string& text) {
-  constexpr const char* kBlanks = " \t\r\n";
-  const std::size_t first = text.find_first_not_of(kBlanks);
-  if (first == std::string::npos) return {};
-  return text.substr(first, text.find_last_not_of(kBlanks) + 1 - first);
-}
 
 /// The one of `words` that differs in its case at most; none otherwise.
 std::optional<std::string> FindWord(const Strings& words, const std::string& text) {
@@ -151,13 +145,13 @@ ValueRule CoordSysName() {
 }
 
 bool ReadQuantity(const std::string& text, Quantity& quantity) {
-  const std::string trimmed = Trimmed(text);
+  const std::string trimmed(Trimmed(text));
   const char* first = trimmed.data();
   const char* const last = first + trimmed.size();
   if (first != last && *first == '+') ++first;
   const auto [end, fault] = std::from_chars(first, last, quantity.value);
   if (fault != std::errc()) return false;
-  quantity.unit = LowerCase(Trimmed(std::string(end, last)));
+  quantity.unit = LowerCase(std::string(Trimmed({end, last})));
   // "nan", "inf" are read with the number; a unit is letters, or a sign of degrees.
   return std::all_of(quantity.unit.begin(), quantity.unit.end(), [](char c) {
     return (c >= 'a' && c <= 'z') || static_cast<unsigned char>(c) >= 0x80;

@@ -66,9 +66,8 @@ class AccuracyVerb final : public FileVerb {
   bool isJson_ = false;
 };
 
-const VerbRegistration registration("accuracy",
-                                    "Compares a map of classes with samples of known classes",
-                                    &SetUp<AccuracyVerb>);
+const VerbRegistration accuracyRegistration(
+    "accuracy", "Compares a map of classes with samples of known classes", &SetUp<AccuracyVerb>);
 
 }  // namespace
 }  // namespace lumo::host

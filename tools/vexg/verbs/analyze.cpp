@@ -462,8 +462,9 @@ class AnalyzeVerb final {
   std::string format_;
 };
 
-const VerbRegistration registration("analyze", "Makes a map of classes out of a scene by a recipe",
-                                    &SetUp<AnalyzeVerb>);
+const VerbRegistration analyzeRegistration("analyze",
+                                           "Makes a map of classes out of a scene by a recipe",
+                                           &SetUp<AnalyzeVerb>);
 
 }  // namespace
 }  // namespace lumo::host

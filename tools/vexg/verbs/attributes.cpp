@@ -343,9 +343,9 @@ class AttributesVerb final : public FileVerb {
   AttributeRequest request_;
 };
 
-const VerbRegistration registration("attributes",
-                                    "Computes values and shapes of the regions of a label raster",
-                                    &SetUp<AttributesVerb>);
+const VerbRegistration attributesRegistration(
+    "attributes", "Computes values and shapes of the regions of a label raster",
+    &SetUp<AttributesVerb>);
 
 }  // namespace
 }  // namespace lumo::host

@@ -20,7 +20,7 @@ namespace {
 
 namespace fs = std::filesystem;
 
-struct Options {
+struct BatchOptions {
   std::string verb;
   std::string list;
   std::vector<std::string> words;
@@ -94,7 +94,7 @@ bool TakesAFile(const Verb& verb) {
 
 class Batch {
  public:
-  explicit Batch(const Options& options) : options_(options) {}
+  explicit Batch(const BatchOptions& options) : options_(options) {}
 
   int Run() {
     const Verb* const verb = FindVerb(options_.verb);
@@ -156,14 +156,14 @@ class Batch {
     }
   }
 
-  const Options& options_;
+  const BatchOptions& options_;
   int code_ = kExitSuccess;
   bool hasPrinted_ = false;
 };
 
-const VerbRegistration registration(
+const VerbRegistration batchRegistration(
     "batch", "Runs a verb on many files, one after the other, in one process", [](OptionSet& line) {
-      const auto options = std::make_shared<Options>();
+      const auto options = std::make_shared<BatchOptions>();
       line.AddNote(
           "What stands behind the verb goes to it; {} is the file, {name} its name without "
           "folders, "

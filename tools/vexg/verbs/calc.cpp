@@ -180,8 +180,8 @@ class CalcVerb final : public RasterVerb {
   unsigned bands_ = 0;
 };
 
-const VerbRegistration registration("calc", "Computes a raster from the bands of others",
-                                    &SetUp<CalcVerb>);
+const VerbRegistration calcRegistration("calc", "Computes a raster from the bands of others",
+                                        &SetUp<CalcVerb>);
 
 }  // namespace
 }  // namespace lumo::host

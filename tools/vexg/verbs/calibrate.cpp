@@ -144,7 +144,7 @@ class CalibrateVerb final : public RasterVerb {
   unsigned bands_ = 0;
 };
 
-const VerbRegistration registration(
+const VerbRegistration calibrateRegistration(
     "calibrate", "Turns digital numbers into radiance, reflectance or temperature",
     &SetUp<CalibrateVerb>);
 

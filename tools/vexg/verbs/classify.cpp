@@ -248,8 +248,9 @@ class ClassifyVerb final : public RasterVerb {
   ClassRequest request_;
 };
 
-const VerbRegistration registration("classify", "Gives the regions of a label raster classes",
-                                    &SetUp<ClassifyVerb>);
+const VerbRegistration classifyRegistration("classify",
+                                            "Gives the regions of a label raster classes",
+                                            &SetUp<ClassifyVerb>);
 
 }  // namespace
 }  // namespace lumo::host

@@ -8,14 +8,14 @@
 namespace lumo::host {
 namespace {
 
-struct Options {
+struct CommandsOptions {
   bool json = false;
   bool markdown = false;
   bool names = false;
   std::string output = "-";
 };
 
-int List(const Options& options) {
+int List(const CommandsOptions& options) {
   Output(options.output)
       .Write(options.json       ? CommandsAsJson()
              : options.markdown ? CommandsAsMarkdown()
@@ -24,9 +24,9 @@ int List(const Options& options) {
   return kExitSuccess;
 }
 
-const VerbRegistration registration(
+const VerbRegistration commandsRegistration(
     "commands", "Lists the commands that a job may name", [](OptionSet& line) {
-      const auto options = std::make_shared<Options>();
+      const auto options = std::make_shared<CommandsOptions>();
       line.AddExample("vexg commands --json");
       line.Add("--json", options->json, "All that they declare, as JSON");
       line.Add("--markdown", options->markdown, "All that they declare, as a document");

@@ -8,7 +8,7 @@
 namespace lumo::host {
 namespace {
 
-const VerbRegistration registration(
+const VerbRegistration completionRegistration(
     "completion", "Prints a script with which a shell completes command lines",
     [](OptionSet& line) {
       const auto shell = std::make_shared<std::string>();

@@ -118,7 +118,7 @@ class CopyVerb final : public RasterVerb {
   bool hasCodes_ = false;  // in a band that is copied
 };
 
-const VerbRegistration registration(
+const VerbRegistration copyRegistration(
     "copy", "Copies a raster into a new file, of the same or another format", &SetUp<CopyVerb>);
 
 }  // namespace

@@ -16,7 +16,7 @@ namespace {
 
 namespace fs = std::filesystem;
 
-struct Options {
+struct FormatsOptions {
   RasterJobOptions job;
   bool json = false;
 };
@@ -138,7 +138,7 @@ std::string AsText(const std::vector<Format>& formats) {
   return text;
 }
 
-int ListFormats(const Options& options) {
+int ListFormats(const FormatsOptions& options) {
   if (options.job.printJob) {
     std::cout << ListDraft().Write().ToUTF8() << '\n';
     return kExitSuccess;
@@ -156,10 +156,10 @@ int ListFormats(const Options& options) {
   return kExitSuccess;
 }
 
-const VerbRegistration registration(
+const VerbRegistration formatsRegistration(
     "formats", "Lists the formats of files, and which of them can be read and written here",
     [](OptionSet& line) {
-      const auto options = std::make_shared<Options>();
+      const auto options = std::make_shared<FormatsOptions>();
       line.AddNote(
           "Whether a format can be written is tried, in this process, with a raster of a few "
           "pixels.");

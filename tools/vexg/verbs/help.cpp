@@ -11,7 +11,7 @@
 namespace lumo::host {
 namespace {
 
-struct Options {
+struct HelpOptions {
   std::string name;
   bool json = false;
   bool manual = false;
@@ -25,7 +25,7 @@ struct Options {
                                   "; see vexg commands");
 }
 
-std::string TextOf(const Options& options) {
+std::string TextOf(const HelpOptions& options) {
   if (options.json) return VerbsAsJson();
   const CommandFactory* const factory = GetCommandRegistry().Find(String(options.name));
   if (factory != nullptr) {
@@ -37,9 +37,9 @@ std::string TextOf(const Options& options) {
   return options.manual ? VerbAsManual(verb) : HelpOf(verb);
 }
 
-const VerbRegistration registration(
+const VerbRegistration helpRegistration(
     "help", "Tells about a command of jobs, or a verb", [](OptionSet& line) {
-      const auto options = std::make_shared<Options>();
+      const auto options = std::make_shared<HelpOptions>();
       line.AddExample("vexg help OpenRasterCommand");
       line.AddExample("vexg help --man read | man -l -");
       line.Add("name", options->name, "The command or verb").Shows("NAME");

@@ -195,8 +195,8 @@ class HistVerb final : public FileVerb {
   std::vector<BandBins> all_;
 };
 
-const VerbRegistration registration("hist", "Counts the values of a raster's bands into bins",
-                                    &SetUp<HistVerb>);
+const VerbRegistration histRegistration("hist", "Counts the values of a raster's bands into bins",
+                                        &SetUp<HistVerb>);
 
 }  // namespace
 }  // namespace lumo::host

@@ -16,7 +16,7 @@
 namespace lumo::host {
 namespace {
 
-struct Options {
+struct InfoOptions {
   std::vector<std::string> files;
   bool compare = false;
   bool wkt = false;
@@ -284,7 +284,7 @@ JobDraft MakeDraft(const SourceOptions& source) {
 }
 
 /// The job that compares two rasters.
-JobDraft MakeComparison(const Options& options) {
+JobDraft MakeComparison(const InfoOptions& options) {
   JobDraft draft;
   const char* const names[] = {"first", "second"};
   for (unsigned i = 0; i < 2; ++i) {
@@ -300,7 +300,7 @@ JobDraft MakeComparison(const Options& options) {
 }
 
 /// How the first raster lies in the second.
-Json ComparisonAsJson(const Options& options, const JobResults& results) {
+Json ComparisonAsJson(const InfoOptions& options, const JobResults& results) {
   const Map<String, String>& found = results.Find("compare").returns;
   const RasterInfo first = ReadInfo(results, "first"), second = ReadInfo(results, "second");
   const auto flag = [&](const char* name) { return ParseValue<bool>(found.Find(name)); };
@@ -349,7 +349,7 @@ std::string ComparisonAsText(const Json& all) {
   return text + fmt::format("  offset         {} pixels at most\n", number(all["largestOffset"]));
 }
 
-int Compare(const Options& options) {
+int Compare(const InfoOptions& options) {
   if (options.files.size() != 2) throw HostError(kExitUsage, "--compare: takes two rasters");
   const JobDraft draft = MakeComparison(options);
   if (options.job.printJob) {
@@ -362,7 +362,7 @@ int Compare(const Options& options) {
   return all["sameGrid"].get<bool>() ? kExitSuccess : kExitFailed;
 }
 
-int PrintJobs(const Options& options) {
+int PrintJobs(const InfoOptions& options) {
   for (const std::string& file : options.files) {
     if (IsVectorName(file)) {
       std::cout << MakeVectorQuery(file, 0).Write().ToUTF8() << '\n';
@@ -376,7 +376,7 @@ int PrintJobs(const Options& options) {
 }
 
 /// Adds what a file is to one of the two.
-void Tell(JobSession& session, const Options& options, const std::string& file, Json& all,
+void Tell(JobSession& session, const InfoOptions& options, const std::string& file, Json& all,
           std::string& text) {
   const char* const gap = text.empty() ? "" : "\n";
   if (IsVectorName(file)) {
@@ -393,7 +393,7 @@ void Tell(JobSession& session, const Options& options, const std::string& file, 
                : void(text.append(gap).append(AsText(file, info, notes, options.wkt)));
 }
 
-int Info(const Options& options) {
+int Info(const InfoOptions& options) {
   if (options.job.printJob) return PrintJobs(options);
   JobSession session(options.job);
   ExitCode code = kExitSuccess;
@@ -416,9 +416,9 @@ int Info(const Options& options) {
   return code;
 }
 
-const VerbRegistration registration(
+const VerbRegistration infoRegistration(
     "info", "Tells what a raster or vector file is and where it lies", [](OptionSet& line) {
-      const auto options = std::make_shared<Options>();
+      const auto options = std::make_shared<InfoOptions>();
       line.AddNote(
           "With --json, one file gives an object and several give a list of them; no-data values "
           "are a list with null for a band that has none, and \"nan\" or \"inf\" as a text. Of a "

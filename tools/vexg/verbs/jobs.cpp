@@ -39,7 +39,7 @@ int List(const ServerListOptions& options) {
   return kExitSuccess;
 }
 
-const VerbRegistration registration(
+const VerbRegistration jobsRegistration(
     "jobs", "Lists the jobs that a server is running, and who sent them", [](OptionSet& line) {
       const auto options = std::make_shared<ServerListOptions>();
       line.AddNote("A job is named by its number, a client by the number of its process.");

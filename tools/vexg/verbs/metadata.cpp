@@ -13,7 +13,7 @@
 namespace lumo::host {
 namespace {
 
-struct Options {
+struct MetadataOptions {
   std::string source;
   std::vector<std::string> paths{"/"};
   RasterJobOptions job;
@@ -40,7 +40,7 @@ void AddNames(JobDraft& draft, const std::string& path, std::size_t position, bo
   command.AddInput("DOPRIVATE", isPrivate ? 1 : 0);
 }
 
-JobDraft MakeDraft(const Options& options, const MetadataSource& source) {
+JobDraft MakeDraft(const MetadataOptions& options, const MetadataSource& source) {
   JobDraft draft;
   draft.Open("metadata", "CreateMetadataCommand").AddInput("ConnStr", ConnStringsOf(source));
   for (std::size_t i = 0; i < options.paths.size(); ++i) {
@@ -52,7 +52,7 @@ JobDraft MakeDraft(const Options& options, const MetadataSource& source) {
 
 /// The paths of the values to show, in order. Throws HostError for a path below which there is
 /// none.
-std::vector<std::string> ReadPaths(const Options& options, const JobResults& results) {
+std::vector<std::string> ReadPaths(const MetadataOptions& options, const JobResults& results) {
   std::vector<std::string> paths;
   for (std::size_t i = 0; i < options.paths.size(); ++i) {
     const std::size_t before = paths.size();
@@ -157,7 +157,7 @@ std::string AsText(const Json& json) {
   return text;
 }
 
-int PrintMetadata(const Options& options) {
+int PrintMetadata(const MetadataOptions& options) {
   const MetadataSource source = ParseMetadataSource(options.source);
   JobDraft draft = MakeDraft(options, source);
   if (options.job.printJob) {
@@ -186,9 +186,9 @@ int PrintMetadata(const Options& options) {
   return kExitSuccess;
 }
 
-const VerbRegistration registration(
+const VerbRegistration metadataRegistration(
     "metadata", "Tells what a scene's header or side file says of it", [](OptionSet& line) {
-      const auto options = std::make_shared<Options>();
+      const auto options = std::make_shared<MetadataOptions>();
       line.AddNote(
           "The paths, and what they mean, stand in docs/metadata.md. What is not known there comes "
           "under the name that it has in the file.");

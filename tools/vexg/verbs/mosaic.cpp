@@ -562,9 +562,8 @@ class MosaicVerb final : public RasterVerb {
   Array<unsigned> bands_;
 };
 
-const VerbRegistration registration("mosaic",
-                                    "Joins scenes into one raster: footprints, colours, seams",
-                                    &SetUp<MosaicVerb>);
+const VerbRegistration mosaicRegistration(
+    "mosaic", "Joins scenes into one raster: footprints, colours, seams", &SetUp<MosaicVerb>);
 
 }  // namespace
 }  // namespace lumo::host

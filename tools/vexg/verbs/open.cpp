@@ -31,7 +31,7 @@ int List(const ServerListOptions& options) {
   return kExitSuccess;
 }
 
-const VerbRegistration registration(
+const VerbRegistration openRegistration(
     "open", "Lists what is open in a server, and who has opened it", [](OptionSet& line) {
       const auto options = std::make_shared<ServerListOptions>();
       line.AddNote(

@@ -23,7 +23,7 @@ namespace {
 
 namespace fs = std::filesystem;
 
-struct Options {
+struct PlanOptions {
   std::string work;  ///< a verb, a document, or the folder of a plan
   std::vector<std::string> words;
   std::string folder;
@@ -38,7 +38,7 @@ struct Options {
 
 class Planner {
  public:
-  explicit Planner(const Options& options) : options_(options) {}
+  explicit Planner(const PlanOptions& options) : options_(options) {}
 
   int Run() {
     std::error_code ignored;
@@ -158,14 +158,14 @@ class Planner {
     throw HostError(kExitFailed, (folder_ / name).string() + ": can't be written");
   }
 
-  const Options& options_;
+  const PlanOptions& options_;
   fs::path folder_;
 };
 
-const VerbRegistration registration(
+const VerbRegistration planRegistration(
     "plan", "Cuts a job into documents that run on many processors or machines",
     [](OptionSet& line) {
-      const auto options = std::make_shared<Options>();
+      const auto options = std::make_shared<PlanOptions>();
       line.AddNote(
           "Makes part-0000.xml and so on, merge.xml and manifest.json in a folder that all workers "
           "see under the same name. vexg run --once runs one of them; results are those of the "

@@ -107,9 +107,9 @@ class PolygonizeVerb final : public FileVerb {
   double leastPixels_ = 0;
 };
 
-const VerbRegistration registration("polygonize",
-                                    "Makes polygons of areas of equal value, in a vector file",
-                                    &SetUp<PolygonizeVerb>);
+const VerbRegistration polygonizeRegistration(
+    "polygonize", "Makes polygons of areas of equal value, in a vector file",
+    &SetUp<PolygonizeVerb>);
 
 }  // namespace
 }  // namespace lumo::host

@@ -16,7 +16,7 @@
 namespace lumo::host {
 namespace {
 
-struct Options {
+struct PyramidOptions {
   std::string action;
   std::string output;
   std::string levels;
@@ -311,15 +311,14 @@ class PyramidVerb final : public FileVerb {
 
   static constexpr const char* kBuildStep = "build";
 
-  Options options_;
+  PyramidOptions options_;
   String raster_;  // URI
   Levels levels_;
   const char* reduction_ = "Told";
 };
 
-const VerbRegistration registration("pyramid",
-                                    "Builds, tells of or deletes the reduced copies of a raster",
-                                    &SetUp<PyramidVerb>);
+const VerbRegistration pyramidRegistration(
+    "pyramid", "Builds, tells of or deletes the reduced copies of a raster", &SetUp<PyramidVerb>);
 
 }  // namespace
 }  // namespace lumo::host

@@ -219,9 +219,9 @@ class QuicklookVerb final : public FileVerb {
   bool hasPalette_ = false;  // the picture is in the colours of the band
 };
 
-const VerbRegistration registration("quicklook",
-                                    "Makes a picture of a raster at the size of a screen",
-                                    &SetUp<QuicklookVerb>);
+const VerbRegistration quicklookRegistration("quicklook",
+                                             "Makes a picture of a raster at the size of a screen",
+                                             &SetUp<QuicklookVerb>);
 
 }  // namespace
 }  // namespace lumo::host

@@ -66,8 +66,9 @@ class RasterizeVerb final : public RasterVerb {
   std::string field_, type_;
 };
 
-const VerbRegistration registration("rasterize", "Draws the shapes of a vector file into a raster",
-                                    &SetUp<RasterizeVerb>);
+const VerbRegistration rasterizeRegistration("rasterize",
+                                             "Draws the shapes of a vector file into a raster",
+                                             &SetUp<RasterizeVerb>);
 
 }  // namespace
 }  // namespace lumo::host

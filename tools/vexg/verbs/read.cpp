@@ -298,9 +298,9 @@ class ReadVerb final : public FileVerb {
   bool isExcluded_ = false;
 };
 
-const VerbRegistration registration("read",
-                                    "Reads pixels of a raster into an array or a PNG picture",
-                                    &SetUp<ReadVerb>);
+const VerbRegistration readRegistration("read",
+                                        "Reads pixels of a raster into an array or a PNG picture",
+                                        &SetUp<ReadVerb>);
 
 }  // namespace
 }  // namespace lumo::host

@@ -52,7 +52,7 @@ int RunFileOnce(const JobOptions& options) {
                   options.isDurable});
 }
 
-const VerbRegistration registration(
+const VerbRegistration runRegistration(
     "run", "Runs a job document in this process and prints its result", [](OptionSet& line) {
       const auto options = std::make_shared<JobOptions>();
       const auto isOnce = std::make_shared<bool>(false);

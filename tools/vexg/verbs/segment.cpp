@@ -468,8 +468,9 @@ class SegmentVerb final : public RasterVerb {
   SegmentCurves curves_;
 };
 
-const VerbRegistration registration("segment", "Divides a raster into segments of alike pixels",
-                                    &SetUp<SegmentVerb>);
+const VerbRegistration segmentRegistration("segment",
+                                           "Divides a raster into segments of alike pixels",
+                                           &SetUp<SegmentVerb>);
 
 }  // namespace
 }  // namespace lumo::host

@@ -128,7 +128,7 @@ int Serve(const ServeOptions& options) {
   return kExitSuccess;
 }
 
-const VerbRegistration registration(
+const VerbRegistration serveRegistration(
     "serve", "Serves jobs of other processes of this user, until it is stopped",
     [](OptionSet& line) {
       const auto options = std::make_shared<ServeOptions>();

@@ -99,8 +99,8 @@ class StackVerb final : public RasterVerb {
   bool haveCodes_ = false;  // some of them
 };
 
-const VerbRegistration registration("stack", "Puts the bands of several rasters into one file",
-                                    &SetUp<StackVerb>);
+const VerbRegistration stackRegistration("stack", "Puts the bands of several rasters into one file",
+                                         &SetUp<StackVerb>);
 
 }  // namespace
 }  // namespace lumo::host

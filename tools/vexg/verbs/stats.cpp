@@ -198,8 +198,8 @@ class StatsVerb final : public FileVerb {
   BandTable table_;
 };
 
-const VerbRegistration registration("stats", "Tells the statistics of a raster's bands",
-                                    &SetUp<StatsVerb>);
+const VerbRegistration statsRegistration("stats", "Tells the statistics of a raster's bands",
+                                         &SetUp<StatsVerb>);
 
 }  // namespace
 }  // namespace lumo::host

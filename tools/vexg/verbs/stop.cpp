@@ -17,7 +17,7 @@ int Stop(const ServerOptions& server) {
   return kExitSuccess;
 }
 
-const VerbRegistration registration(
+const VerbRegistration stopRegistration(
     "stop", "Ends a server, once the jobs that it is running are done", [](OptionSet& line) {
       const auto server = std::make_shared<ServerOptions>();
       line.AddExample("vexg stop vexg");

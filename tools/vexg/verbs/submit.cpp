@@ -43,7 +43,7 @@ int SubmitJobFile(const JobOptions& options, const ServerOptions& server) {
   return ExitCodeAfter(outcome, ExitCodeOf(document, result));
 }
 
-const VerbRegistration registration(
+const VerbRegistration submitRegistration(
     "submit", "Has a server run a job document and prints its result", [](OptionSet& line) {
       const auto options = std::make_shared<JobOptions>();
       const auto server = std::make_shared<ServerOptions>();

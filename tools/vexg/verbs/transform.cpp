@@ -236,7 +236,7 @@ int Transform(const TransformOptions& options) {
   return kExitSuccess;
 }
 
-const VerbRegistration registration(
+const VerbRegistration transformRegistration(
     "transform",
     "Carries points from one coordinate system to another, or from a file's pixels to its map",
     [](OptionSet& line) {

@@ -141,7 +141,7 @@ int View(const ViewOptions& options) {
   return toServer != nullptr && toServer->IsGone() ? kExitNoServer : kExitSuccess;
 }
 
-const VerbRegistration registration(
+const VerbRegistration viewRegistration(
     "view", "Shows rasters, segments, classes and shapes in the browser", [](OptionSet& line) {
       const auto options = std::make_shared<ViewOptions>();
       line.AddNote(

@@ -249,8 +249,9 @@ class WarpVerb final : public RasterVerb {
   GeoRefPtr grid_;
 };
 
-const VerbRegistration registration("warp", "Carries a raster to another coordinate system or grid",
-                                    &SetUp<WarpVerb>);
+const VerbRegistration warpRegistration("warp",
+                                        "Carries a raster to another coordinate system or grid",
+                                        &SetUp<WarpVerb>);
 
 }  // namespace
 }  // namespace lumo::host

@@ -95,8 +95,8 @@ class ZonalVerb final : public FileVerb {
   Array<unsigned> bands_;
 };
 
-const VerbRegistration registration("zonal", "Makes a table of the pixels inside each shape",
-                                    &SetUp<ZonalVerb>);
+const VerbRegistration zonalRegistration("zonal", "Makes a table of the pixels inside each shape",
+                                         &SetUp<ZonalVerb>);
 
 }  // namespace
 }  // namespace lumo::host
