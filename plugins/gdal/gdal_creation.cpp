@@ -3,15 +3,14 @@
 #include <climits>
 #include <cpl_string.h>
 #include <cpl_vsi.h>
-#include <cstring>
 #include <filesystem>
-#include <set>
 
 #include "foundation/abandonment.h"
 #include "foundation/fault.h"
 #include "gdal_common/messages.h"
 #include "gdal_details.h"
 #include "gdal_georef.h"
+#include "gdal_makers.h"
 #include "gdal_no_data.h"
 #include "gdal_rows.h"
 #include "gdal_side_file.h"
@@ -35,34 +34,6 @@ namespace fs = std::filesystem;
 /// Up to this size a raster that is to be copied waits in memory.
 constexpr double kMaxBytesInMemory = 64 << 20;
 
-/// How the formats that can be made are made. What isn't here is only read: the drivers of GDAL
-/// that are left out make a file that differs from what was written.
-struct Maker {
-  const char* driver;
-  bool isCopied;        ///< written in one go
-  const char* options;  ///< separated by blanks; those that keep every value
-  bool roundsGrid = false;
-  bool changesValues = false;  ///< a no-data value would not stay one
-};
-constexpr Maker kMakers[] = {
-    {"GTiff", false, "SPARSE_OK=TRUE"},
-    {"HFA", false, ""},
-    {"VRT", false, ""},  // on files that hold the lines
-    {"BMP", true, ""},
-    {"NITF", true, "", true},  // corners to the metre or the second
-    {"PNG", true, ""},
-    {"GIF", true, ""},
-    {"JPEG", true, "QUALITY=95", false, true},  // the one format here that loses something
-    {"JP2OpenJPEG", true, "QUALITY=100 REVERSIBLE=YES YCBCR420=NO"},
-};
-
-const Maker* FindMaker(const std::string& driver) {
-  for (const Maker& maker : kMakers) {
-    if (driver == maker.driver) return &maker;
-  }
-  return nullptr;
-}
-
 /// Files that belong to a raster by their name alone, and describe its pixels.
 constexpr const char* kSideFiles[] = {".aux.xml", ".ovr", ".msk"};
 
@@ -79,74 +50,6 @@ void Remove(const std::string& path) {
 /// With the extension at the end, since drivers choose by it.
 std::string TemporaryPath(const std::string& path) {
   return platform::TemporaryPathBeside(path) + fs::path(path).extension().string();
-}
-
-CPLStringList OptionsOf(const Maker& maker) {
-  return CPLStringList(CSLTokenizeString2(maker.options, " ", 0), TRUE);
-}
-
-/// True when not all bands have the same no-data value.
-bool DiffersByBand(const RasterDef& def) {
-  if (def.noData.empty()) return false;
-  if (def.noData.size() != def.bands) return true;
-  const auto first = NoDataOf(def, def.noData.begin()->first);
-  for (const auto& [band, value] : def.noData) {
-    if (!NoDataOf(def, band)->IsSame(*first)) return true;
-  }
-  return false;
-}
-
-bool SetNoData(GDALDatasetH dataset, const RasterDef& def) {
-  for (const auto& [band, value] : def.noData) {
-    if (band >= def.bands) continue;
-    const GDALRasterBandH target = GDALGetRasterBand(dataset, static_cast<int>(band) + 1);
-    if (!WriteNoData(target, *NoDataOf(def, band))) return false;
-  }
-  return true;
-}
-
-/// The value of pixels that nobody writes, of a raster with one no-data value or none: that value
-/// where pixels can hold it, else 0.
-std::vector<unsigned char> FillValueOf(const RasterDef& def) {
-  std::vector<unsigned char> bytes(DataTypeBytes(def.dataType));
-  const auto value = DiffersByBand(def) ? std::nullopt : NoDataOf(def, 0);
-  DispatchType(TwelveTypes{}, def.dataType, [&]<typename T>() {
-    const std::optional<T> pixel = value ? value->As<T>() : std::nullopt;
-    if (pixel) std::memcpy(bytes.data(), &*pixel, sizeof(T));
-    return true;
-  });
-  return bytes;
-}
-
-/// Adds the options by which a TIFF file states the meaning of its bands. Without them GDAL takes
-/// the fourth of four bands of bytes for alpha.
-void AddMeaning(const RasterDef& def, CPLStringList& options) {
-  if (IsInColors(def)) options.SetNameValue("PHOTOMETRIC", "RGB");
-  if (def.bands < 2) return;
-  options.SetNameValue("ALPHA", IsAlpha(def, def.bands - 1) ? "NON-PREMULTIPLIED" : "NO");
-  const bool isPlain = !IsInColors(def) && def.bands != 3;
-  if (isPlain) options.SetNameValue("PHOTOMETRIC", "MINISBLACK");
-}
-
-bool HoldsSignedBytes(GDALDriverH driver) {
-  const char* const list = GDALGetMetadataItem(driver, GDAL_DMD_CREATIONOPTIONLIST, nullptr);
-  return list != nullptr && std::string(list).find("SIGNEDBYTE") != std::string::npos;
-}
-
-/// The part of a definition that a format keeps in any case.
-RasterDef AsKept(const std::string& driver, const RasterDef& def) {
-  RasterDef kept = def;
-  const Maker* const maker = FindMaker(driver);
-  if (maker != nullptr && maker->changesValues) kept.noData.clear();
-  if (driver != "GTiff") return kept;
-  const CreationOptions& wanted = def.creation;
-  if (wanted.LosesValues()) kept.noData.clear();
-  if (wanted.tile) kept.tileWidth = kept.tileHeight = *wanted.tile;
-  if (wanted.layout != FileLayout::kCog) return kept;
-  constexpr unsigned kUsualTile = 512;
-  if (!wanted.tile) kept.tileWidth = kept.tileHeight = kUsualTile;
-  kept.interleave = Interleave::BIP;
-  return kept;
 }
 
 }  // namespace

@@ -1,7 +1,6 @@
 #include "gdal_raster.h"
 
 #include <algorithm>
-#include <cmath>
 #include <cpl_minixml.h>
 #include <filesystem>
 
@@ -9,10 +8,10 @@
 #include "foundation/warnings.h"
 #include "gdal_band_values.h"
 #include "gdal_common/file_guard.h"
-#include "gdal_common/level_number.h"
 #include "gdal_common/messages.h"
 #include "gdal_creation.h"
 #include "gdal_georef.h"
+#include "gdal_levels.h"
 #include "gdal_masks.h"
 #include "gdal_open.h"
 #include "gdal_overviews.h"
@@ -30,41 +29,6 @@ Interleave ReadInterleave(GDALDatasetH dataset) {
   // With one band all are the same.
   if (GDALGetRasterCount(dataset) == 1) return Interleave::BSQ;
   return text == "PIXEL" ? Interleave::BIP : text == "LINE" ? Interleave::BIL : Interleave::BSQ;
-}
-
-unsigned SizeOf(int size) {
-  return static_cast<unsigned>(std::max(size, 0));
-}
-
-/// Overview `index` of every band; without bands when the bands don't all have one of this size.
-RasterLevel OverviewOf(const RasterLevel& full, int index) {
-  RasterLevel level;
-  for (const GDALRasterBandH band : full.bands) {
-    const GDALRasterBandH overview =
-        index < GDALGetOverviewCount(band) ? GDALGetOverview(band, index) : nullptr;
-    const unsigned samples = overview != nullptr ? SizeOf(GDALGetRasterBandXSize(overview)) : 0;
-    const unsigned lines = overview != nullptr ? SizeOf(GDALGetRasterBandYSize(overview)) : 0;
-    if (samples == 0 || (level.samples != 0 && level.samples != samples) ||
-        (level.lines != 0 && level.lines != lines)) {
-      return {};
-    }
-    level.samples = samples;
-    level.lines = lines;
-    level.bands.push_back(overview);
-  }
-  GDALDatasetH const owner = GDALGetBandDataset(level.bands.front());
-  if (owner == nullptr || SizeOf(GDALGetRasterXSize(owner)) != level.samples ||
-      SizeOf(GDALGetRasterYSize(owner)) != level.lines) {
-    return level;
-  }
-  for (std::size_t i = 0; i < level.bands.size(); ++i) {
-    const auto number = static_cast<int>(i + 1);
-    if (GDALGetRasterCount(owner) < number || GDALGetRasterBand(owner, number) != level.bands[i]) {
-      return level;
-    }
-  }
-  level.dataset = owner;
-  return level;
 }
 
 bool DriverUpdates(const Format& format) {
@@ -180,7 +144,7 @@ bool OpenRaster::TakeDataset(DatasetPtr dataset) {
   dataType_ = CommonDataType(dataset_.get(), Name());
   if (dataType_ == 0) return false;
   interleave_ = ReadInterleave(dataset_.get());
-  FindLevels();
+  levels_ = FindLevels(dataset_.get());
   // The overviews are looked for only now, and a file may name one anywhere.
   return IsWithoutFault(messages, source_) && WasRefusedNothing();
 }
@@ -199,30 +163,6 @@ bool OpenRaster::TakeAgain(DatasetPtr dataset) {
   levels_.clear();
   dataset_.reset();
   return FailWith(Name(), "has become another raster since it was opened");
-}
-
-void OpenRaster::FindLevels() {
-  levels_.clear();
-  if (dataset_ == nullptr) return;
-  RasterLevel& full = levels_[0];
-  full.dataset = dataset_.get();
-  full.samples = SizeOf(GDALGetRasterXSize(full.dataset));
-  full.lines = SizeOf(GDALGetRasterYSize(full.dataset));
-  for (int i = 1; i <= GDALGetRasterCount(full.dataset); ++i) {
-    full.bands.push_back(GDALGetRasterBand(full.dataset, i));
-  }
-  std::map<unsigned, RasterLevel> reduced;
-  const int count = GDALGetOverviewCount(full.bands.front());
-  for (int i = 0; i < count; ++i) {
-    RasterLevel level = OverviewOf(full, i);
-    const unsigned number = LevelNumber(full.samples, full.lines, level.samples, level.lines);
-    if (number != 0) reduced.try_emplace(number, std::move(level));
-  }
-  for (auto& [number, level] : reduced) {
-    const unsigned last = levels_.rbegin()->first;
-    if (last != 0 && number != last + 1) break;
-    levels_.emplace(number, std::move(level));
-  }
 }
 
 bool OpenRaster::Close() {
@@ -255,9 +195,9 @@ RasterDef OpenRaster::Describe(bool hasSystem) const {
   int width = 0, height = 0;
   GDALGetBlockSize(full.bands.front(), &width, &height);
   // Blocks of whole lines are no tiles, however many lines they have.
-  const bool isTiled = SizeOf(width) != full.samples && height > 1;
-  def.tileWidth = SizeOf(width);
-  def.tileHeight = isTiled ? SizeOf(height) : 1;
+  const bool isTiled = static_cast<unsigned>(width) != full.samples && height > 1;
+  def.tileWidth = static_cast<unsigned>(width);
+  def.tileHeight = isTiled ? static_cast<unsigned>(height) : 1;
   def.SetGeoRef(ReadGeoRef(full.dataset, hasSystem));
   return def;
 }
@@ -460,7 +400,7 @@ bool OpenRaster::BuildOverviews(const char* method, unsigned levelMin, unsigned 
   const bool isInside = isUpdated_ && levels_.size() > 1 && !HasLevelFile(Name());
   if (isInside) {
     const bool isBuilt = gdal::BuildOverviews(dataset_.get(), method, factors, Name());
-    FindLevels();
+    levels_ = FindLevels(dataset_.get());
     return isBuilt;
   }
   if (isUpdated_) {
@@ -528,7 +468,7 @@ bool OpenRaster::DeleteOverviews() {
   const Messages messages;
   const CPLErr result =
       GDALBuildOverviews(dataset_.get(), "NONE", 0, nullptr, 0, nullptr, nullptr, nullptr);
-  FindLevels();
+  levels_ = FindLevels(dataset_.get());
   return (result == CE_None && !messages.HasError()) || messages.Fail(Name());
 }
 

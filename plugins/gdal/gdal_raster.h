@@ -5,6 +5,7 @@
 #include <memory>
 
 #include "gdal_common/source.h"
+#include "gdal_levels.h"
 #include "raster/raster_def.h"
 #include "tiff_writer/block_layout.h"
 
@@ -12,14 +13,6 @@ namespace lumo::gdal {
 
 class NewRaster;
 class Twins;
-
-/// One resolution of a raster, the whole or a reduced one.
-struct RasterLevel {
-  unsigned samples = 0;
-  unsigned lines = 0;
-  std::vector<GDALRasterBandH> bands;
-  GDALDatasetH dataset = nullptr;  ///< that has just these bands; null when there is none
-};
 
 /// A raster that GDAL holds open: all that does not depend on the pixel type.
 ///
@@ -102,7 +95,6 @@ class OpenRaster {
   bool TakeDataset(DatasetPtr dataset);
   bool TakeAgain(DatasetPtr dataset);
   bool Reopen();
-  void FindLevels();
   struct Strides;
   bool Transfer(GDALRWFlag direction, const BlockPlace& place, void* pixels) const;
   bool Transfer(GDALRWFlag direction, const BlockPlace& place, const Strides& strides,
