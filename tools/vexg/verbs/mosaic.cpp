@@ -12,6 +12,7 @@
 #include "pictures/picture_writer.h"
 #include "pictures/quicklook_maker.h"
 #include "platform/temporary_file.h"
+#include "rasters/mosaic_options.h"
 #include "rasters/raster_verb.h"
 #include "rasters/scene_list.h"
 #include "rasters/vector_info.h"
@@ -32,83 +33,6 @@ std::string Capital(std::string word) {
   if (!word.empty() && word[0] >= 'a' && word[0] <= 'z') word[0] += 'A' - 'a';
   return word;
 }
-
-/// Holds what the command line says of a mosaic that is to be made.
-struct CreationOptions {
-  std::string grid;  // coordinate system, or a raster
-  std::optional<double> pixelSize;
-  std::string reference;               // scene, by its name or number
-  std::vector<std::string> unmatched;  // scenes that keep their colours
-  std::string matchBy = "overlaps";
-  std::string resampling = "nearest";
-  double feather = 0;
-  std::optional<double> noData;
-  std::string workingDirectory;
-  std::string asset;
-
-  void AddTo(OptionSet& line) {
-    line.Add("--grid", grid,
-             "create, build: coordinate system of the mosaic (EPSG:n, WKT, PROJ text), or a raster "
-             "whose grid it gets; by default the first scene's")
-        .Shows("CS|FILE")
-        .Example("EPSG:32633");
-    line.Add("--pixel-size", pixelSize, "create, build: side of a pixel in units of the system")
-        .Shows("SIZE");
-    line.Add("--resampling", resampling,
-             "create, build: how pixels are made of scenes that don't lie on the grid")
-        .Takes(OneOf({"nearest", "linear", "cubic"}))
-        .ShowsDefault();
-    line.Add("--reference", reference,
-             "create, build: the scene that others are matched to; the first by default")
-        .Shows("SCENE");
-    line.Add("--keep-colours", unmatched, "create, build: a scene that is not matched")
-        .Shows("SCENE");
-    line.Add("--match-by", matchBy,
-             "create, build: scenes are matched where they overlap with the reference, or as "
-             "wholes")
-        .Takes(OneOf({"overlaps", "scenes"}))
-        .ShowsDefault();
-    line.Add("--feather", feather,
-             "create, build: width in which scenes go over into each other at seams, in pixels")
-        .Shows("PIXELS");
-    line.Add("--no-data", noData,
-             "create, build: value of pixels without a scene; by default the scenes'")
-        .Shows("VALUE");
-    line.Add("--work-dir", workingDirectory,
-             "create: folder of footprints, tables and seams; by default that of the definition")
-        .IsFile("FOLDER");
-    line.Add("--asset", asset, "create, build: key of the raster in STAC items").Shows("KEY");
-  }
-};
-
-/// Holds what the command line says of footprints.
-struct FootprintOptions {
-  std::optional<double> noData;
-  double tolerance = 0;
-  double smooth = 3.1;
-  std::string mask;
-  bool again = false;
-
-  void AddTo(OptionSet& line) {
-    line.Add("--outside", noData,
-             "footprints, build: pixels with this value in all bands are outside; by default the "
-             "no-data values")
-        .Shows("VALUE");
-    line.Add("--tolerance", tolerance,
-             "footprints, build: values so close to no data are outside as well, where they touch "
-             "the outside")
-        .Shows("N");
-    line.Add("--mask", mask,
-             "footprints: rasters whose zeros are outside; * stands for a scene's name without its "
-             "ending")
-        .Shows("PATTERN")
-        .Example("masks/*_valid.tif");
-    line.Add("--smooth", smooth, "footprints, build: how far outlines may lie from the pixels")
-        .Shows("PIXELS2")
-        .ShowsDefault();
-    line.Add("--again", again, "footprints: of all scenes, also those that have one");
-  }
-};
 
 class MosaicVerb final : public RasterVerb {
  public:
@@ -543,8 +467,8 @@ class MosaicVerb final : public RasterVerb {
 
   std::string action_, file_, layer_, bandsText_;
   std::vector<std::string> more_;
-  CreationOptions creation_;
-  FootprintOptions footprints_;
+  MosaicCreationOptions creation_;
+  MosaicFootprintOptions footprints_;
   unsigned level_ = 0;
   bool isUnmatched_ = false;
   bool haveCodes_ = false;
