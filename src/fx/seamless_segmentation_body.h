@@ -180,7 +180,9 @@ bool SeamlessSegmentation<T>::Merge() {
 template <typename T>
 template <typename Graph, typename Pairs>
 bool SeamlessSegmentation<T>::Gather(Graph& graph, Pairs& pairs) {
-  detail::PairJoin<Pairs> join(pairs, watershed_.MarkSeamBasins());
+  std::vector<bool> atSeams;
+  if (!watershed_.MarkSeamBasins(atSeams)) return false;
+  detail::PairJoin<Pairs> join(pairs, std::move(atSeams));
   const RasterIteratorPtr<T> strips(new RasterIterator<T>(merge_, Strips(0)));
   detail::StripProcess process("SeamlessGraph", NextPass());
   const auto tiles = process.Read(strips);
@@ -192,12 +194,16 @@ bool SeamlessSegmentation<T>::Gather(Graph& graph, Pairs& pairs) {
                 const std::uint32_t width = watershed_.Width();
                 detail::StripGraph made;
                 made.labels.resize(std::size_t{width} * watershed_.LinesOf(strip));
-                if (!watershed_.Label(strip, made.labels.data())) return false;
+                std::vector<std::int32_t> below;
+                if (!watershed_.Label(strip, made.labels.data()) ||
+                    !watershed_.ReadLabelsBelow(strip, below)) {
+                  return false;
+                }
                 if (abort != nullptr && abort->IsSet()) return false;
                 const auto found = scratch.Borrow();
                 found->Begin(watershed_.Count() / watershed_.Strips() + 1);
                 ForEachStripEdge(made.labels.data(), made.labels.size(), width,
-                                 watershed_.LabelsBelow(strip),
+                                 below.empty() ? nullptr : below.data(),
                                  [&](std::uint32_t a, std::uint32_t b) { found->AddEdge(a, b); });
                 made.pairs = found->Pairs();
                 return graphs.Put(token, std::move(made));

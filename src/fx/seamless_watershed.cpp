@@ -5,6 +5,7 @@
 #include <numeric>
 
 #include "foundation/fault.h"
+#include "fx/seam_ways.h"
 #include "fx/work_file.h"
 #include "tasks/parallel.h"
 
@@ -12,12 +13,6 @@ namespace lumo {
 namespace {
 
 using Cell = StripDrains::Cell;
-
-/// Gives the memory of some containers back.
-template <typename... Containers>
-void Release(Containers&... containers) {
-  ((containers = {}), ...);
-}
 
 }  // namespace
 
@@ -31,6 +26,7 @@ bool SeamlessWatershed::Begin(const Cut& cut) {
   }
   file_ = MakeWorkFile();
   if (!file_) return false;
+  lines_.Begin(*file_, std::uint64_t{cut.width} * cut.height, cut.width);
   parts_.clear();
   strips_.clear();
   strips_.resize((std::uint64_t{cut.height} + cut.stripLines - 1) / cut.stripLines);
@@ -61,7 +57,7 @@ bool SeamlessWatershed::WriteCells(unsigned strip, const std::vector<Cell>& cell
 bool SeamlessWatershed::AddStrip(unsigned strip, const StripLevels& from) {
   const auto drains = drains_.Borrow();
   const std::uint32_t width = cut_.width, lines = LinesOf(strip);
-  const bool hasAbove = strip > 0, hasBelow = strip + 1 < strips_.size();
+  const bool hasAbove = strip > 0, hasBelow = HasBelow(strip);
   std::vector<Cell> cells = drains->TakeCells();
   cells.resize(std::size_t{width} * lines);
   for (std::uint32_t y = 0; y < lines; ++y) {
@@ -79,14 +75,17 @@ bool SeamlessWatershed::AddStrip(unsigned strip, const StripLevels& from) {
     }
     StripDrains::MarkLine(levels, width, cells.data() + std::size_t{width} * y);
   }
-  Strip& made = strips_[strip];
-  made.same.assign(cells.begin(), cells.begin() + width);
-  if (!WriteCells(strip, cells)) return false;
+  const std::vector<Cell> same(cells.begin(), cells.begin() + width);
+  if (!lines_.Write(strip, SeamLines::kSame, same) || !WriteCells(strip, cells)) return false;
   drains->Begin(std::move(cells), width);
-  made.first.resize(width);
-  made.last.resize(width);
-  drains->DrainPlateaus({}, made.first.data(), made.last.data());
+  std::vector<std::uint32_t> firstLine(width), lastLine(width);
+  drains->DrainPlateaus({}, firstLine.data(), lastLine.data());
+  if (!lines_.Write(strip, SeamLines::kFirstDistances, firstLine) ||
+      !lines_.Write(strip, SeamLines::kLastDistances, lastLine)) {
+    return false;
+  }
   if (!cut_.isRanked) return true;
+  Strip& made = strips_[strip];
   const std::int32_t* const levels = from.levels + (hasAbove ? width : 0);
   drains->ForEachMinimum([&](std::uint32_t first) {
     made.minima.push_back({first, levels[first]});
@@ -95,28 +94,40 @@ bool SeamlessWatershed::AddStrip(unsigned strip, const StripLevels& from) {
   return true;
 }
 
-StripDrains::Beyond SeamlessWatershed::BeyondOf(unsigned strip) const {
-  StripDrains::Beyond beyond;
-  if (strip > 0) beyond.above = strips_[strip - 1].last.data();
-  if (strip + 1 < strips_.size()) beyond.below = strips_[strip + 1].first.data();
-  return beyond;
+bool SeamlessWatershed::ReadBeside(unsigned strip, Beside& beside) const {
+  return (strip == 0 || lines_.Read(strip - 1, SeamLines::kLastDistances, beside.above)) &&
+         (!HasBelow(strip) || lines_.Read(strip + 1, SeamLines::kFirstDistances, beside.below));
 }
 
-/// True when a line beside a strip brings lower ground nearer to it.
-bool SeamlessWatershed::ComesNearer(unsigned strip) const {
-  const auto isNearer = [this](const std::vector<Cell>& same,
-                               const std::vector<std::uint32_t>& from,
-                               const std::vector<std::uint32_t>& to) {
-    for (std::uint32_t x = 0; x < cut_.width; ++x) {
-      if (from[x] >= to[x] || to[x] - from[x] < 2) continue;
-      if ((same[x] & StripDrains::SameBit(StripDrains::kUp)) != 0) return true;
-    }
+/// Finds whether the upper one of two strips brings lower ground nearer to the other, or the lower
+/// one to it.
+bool SeamlessWatershed::IsNearer(unsigned upper, bool isUpward, bool& isNearer) const {
+  std::vector<Cell> same;
+  std::vector<std::uint32_t> last, first;
+  if (!lines_.Read(upper + 1, SeamLines::kSame, same) ||
+      !lines_.Read(upper, SeamLines::kLastDistances, last) ||
+      !lines_.Read(upper + 1, SeamLines::kFirstDistances, first)) {
     return false;
-  };
-  const Strip& own = strips_[strip];
-  if (strip > 0 && isNearer(own.same, strips_[strip - 1].last, own.first)) return true;
-  return strip + 1 < strips_.size() &&
-         isNearer(strips_[strip + 1].same, strips_[strip + 1].first, own.last);
+  }
+  const std::vector<std::uint32_t>& from = isUpward ? first : last;
+  const std::vector<std::uint32_t>& to = isUpward ? last : first;
+  for (std::uint32_t x = 0; x < cut_.width && !isNearer; ++x) {
+    if (from[x] >= to[x] || to[x] - from[x] < 2) continue;
+    isNearer = (same[x] & StripDrains::SameBit(StripDrains::kUp)) != 0;
+  }
+  return true;
+}
+
+/// Finds whether a line beside a strip brings lower ground nearer to it. Only a line that has
+/// changed since can.
+bool SeamlessWatershed::ComesNearer(unsigned strip, bool& comes) {
+  Strip& own = strips_[strip];
+  comes = false;
+  if (strip > 0 && std::exchange(own.isAboveNew, false) && !IsNearer(strip - 1, false, comes)) {
+    return false;
+  }
+  return !HasBelow(strip) || !std::exchange(own.isBelowNew, false) || comes ||
+         IsNearer(strip, true, comes);
 }
 
 template <typename Work>
@@ -129,12 +140,23 @@ bool SeamlessWatershed::ForEachStrip(const std::vector<unsigned>& strips, const 
   return result.Close();
 }
 
-/// Finds the drains on the plateaus of a strip anew, with the distances beside it as they are.
-bool SeamlessWatershed::Drain(unsigned strip, StripDrains& drains) {
-  if (!ReadCells(strip, drains)) return false;
-  Strip& own = strips_[strip];
-  drains.DrainPlateaus(BeyondOf(strip), own.first.data(), own.last.data());
-  return true;
+std::vector<unsigned> SeamlessWatershed::AllStrips() const {
+  std::vector<unsigned> all(strips_.size());
+  std::iota(all.begin(), all.end(), 0U);
+  return all;
+}
+
+/// Finds the distances in the lines of a strip anew, with those beside it as they are.
+bool SeamlessWatershed::Drain(unsigned strip) {
+  const auto drains = drains_.Borrow();
+  Beside beside;
+  if (!ReadBeside(strip, beside) || !ReadCells(strip, *drains)) return false;
+  std::vector<std::uint32_t> first(cut_.width), last(cut_.width);
+  drains->DrainPlateaus(beside.Distances(), first.data(), last.data());
+  if (strip > 0) strips_[strip - 1].isBelowNew = true;
+  if (HasBelow(strip)) strips_[strip + 1].isAboveNew = true;
+  return lines_.Write(strip, SeamLines::kFirstDistances, first) &&
+         lines_.Write(strip, SeamLines::kLastDistances, last);
 }
 
 /// Has strips begin again as long as lower ground comes nearer. Every second one at once, as each
@@ -144,12 +166,12 @@ bool SeamlessWatershed::Settle(const AbortFlag* abort) {
     if (abort != nullptr && abort->IsSet()) return true;
     std::vector<unsigned> again;
     for (unsigned strip = parity; strip < strips_.size(); strip += 2) {
-      if (ComesNearer(strip)) again.push_back(strip);
+      bool comes = false;
+      if (!ComesNearer(strip, comes)) return false;
+      if (comes) again.push_back(strip);
     }
     quiet = again.empty() ? quiet + 1 : 0;
-    const bool well = ForEachStrip(
-        again, abort, [this](unsigned strip) { return Drain(strip, *drains_.Borrow()); });
-    if (!well) return false;
+    if (!ForEachStrip(again, abort, [this](unsigned strip) { return Drain(strip); })) return false;
   }
   return true;
 }
@@ -159,10 +181,11 @@ bool SeamlessWatershed::Settle(const AbortFlag* abort) {
 /// -1 - x, or of the line below as -1 - width - x.
 bool SeamlessWatershed::FindWays(unsigned strip) {
   const auto drains = drains_.Borrow();
-  if (!ReadCells(strip, *drains)) return false;
+  Beside beside;
+  if (!ReadBeside(strip, beside) || !ReadCells(strip, *drains)) return false;
   Strip& own = strips_[strip];
-  std::vector<std::uint32_t> first(cut_.width), last(cut_.width);  // others read those kept
-  drains->DrainPlateaus(BeyondOf(strip), first.data(), last.data());
+  std::vector<std::uint32_t> first(cut_.width), last(cut_.width);  // the same as are kept
+  drains->DrainPlateaus(beside.Distances(), first.data(), last.data());
   if (!WriteCells(strip, drains->Cells())) return false;
   // Those found in the strip alone, less those which drain into another one.
   std::size_t candidate = 0;
@@ -182,49 +205,52 @@ bool SeamlessWatershed::FindWays(unsigned strip) {
       [width](std::uint32_t x) { return -1 - width - static_cast<std::int32_t>(x); });
   own.minimumCount = kept;
   if (cut_.isRanked) own.minima.resize(kept);
-  own.firstLabels.assign(labels.begin(), labels.begin() + width);
-  own.lastLabels.assign(labels.end() - width, labels.end());
-  return true;
+  const std::vector<std::int32_t> lastLabels(labels.end() - width, labels.end());
+  labels.resize(cut_.width);
+  return lines_.Write(strip, SeamLines::kFirstLabels, labels) &&
+         lines_.Write(strip, SeamLines::kLastLabels, lastLabels);
 }
 
-/// Finds the ways of all strips, and the minima that go on in the strip below. Some strips at a
-/// time: with their numbers the distances can go.
+/// Finds the ways of all strips, and the minima that go on in the strip below.
 bool SeamlessWatershed::FindAllWays(const AbortFlag* abort, std::vector<Join>& joins) {
-  constexpr std::size_t kAtOnce = 16;
+  const bool well =
+      ForEachStrip(AllStrips(), abort, [this](unsigned strip) { return FindWays(strip); });
+  if (!well) return false;
+  if (abort != nullptr && abort->IsSet()) return true;
   std::uint64_t total = 0;
-  for (std::size_t begin = 0; begin < strips_.size(); begin += kAtOnce) {
-    if (abort != nullptr && abort->IsSet()) return true;
-    std::vector<unsigned> now(std::min(kAtOnce, strips_.size() - begin));
-    std::iota(now.begin(), now.end(), static_cast<unsigned>(begin));
-    if (!ForEachStrip(now, abort, [this](unsigned strip) { return FindWays(strip); })) return false;
-    if (abort != nullptr && abort->IsSet()) return true;
-    for (const unsigned strip : now) {
-      strips_[strip].firstNumber = static_cast<std::uint32_t>(total);
-      total += strips_[strip].minimumCount;
-      if (total > static_cast<std::uint64_t>(std::numeric_limits<std::int32_t>::max())) {
-        SetFault("the raster has more minima than labels have numbers");
-        return false;
-      }
-      if (strip == 0) continue;
-      ListJoins(strip, joins);
-      Release(strips_[strip - 1].first, strips_[strip - 1].last, strips_[strip - 1].same);
+  for (unsigned strip = 0; strip < strips_.size(); ++strip) {
+    strips_[strip].firstNumber = static_cast<std::uint32_t>(total);
+    total += strips_[strip].minimumCount;
+    if (total > static_cast<std::uint64_t>(std::numeric_limits<std::int32_t>::max())) {
+      SetFault("the raster has more minima than labels have numbers");
+      return false;
     }
+    if (strip > 0 && !ListJoins(strip, joins)) return false;
   }
   return true;
 }
 
 /// Lists the minima that go on from the strip above.
-void SeamlessWatershed::ListJoins(unsigned strip, std::vector<Join>& joins) const {
-  const Strip& upper = strips_[strip - 1];
-  const Strip& lower = strips_[strip];
+bool SeamlessWatershed::ListJoins(unsigned strip, std::vector<Join>& joins) const {
+  std::vector<std::uint32_t> upper, lower;  // distances
+  std::vector<std::int32_t> upperLabels, lowerLabels;
+  if (!lines_.Read(strip - 1, SeamLines::kLastDistances, upper) ||
+      !lines_.Read(strip - 1, SeamLines::kLastLabels, upperLabels) ||
+      !lines_.Read(strip, SeamLines::kFirstDistances, lower) ||
+      !lines_.Read(strip, SeamLines::kFirstLabels, lowerLabels)) {
+    return false;
+  }
+  const std::uint32_t upperFirst = strips_[strip - 1].firstNumber;
+  const std::uint32_t lowerFirst = strips_[strip].firstNumber;
   for (std::uint32_t x = 0; x < cut_.width; ++x) {
     // On one level, or one of them would have a way down.
-    if (upper.last[x] != StripDrains::kFar || lower.first[x] != StripDrains::kFar) continue;
-    if (upper.lastLabels[x] <= 0 || lower.firstLabels[x] <= 0) continue;  // excluded
-    const Join join{upper.firstNumber + static_cast<std::uint32_t>(upper.lastLabels[x]) - 1,
-                    lower.firstNumber + static_cast<std::uint32_t>(lower.firstLabels[x]) - 1};
+    if (upper[x] != StripDrains::kFar || lower[x] != StripDrains::kFar) continue;
+    if (upperLabels[x] <= 0 || lowerLabels[x] <= 0) continue;  // excluded
+    const Join join{upperFirst + static_cast<std::uint32_t>(upperLabels[x]) - 1,
+                    lowerFirst + static_cast<std::uint32_t>(lowerLabels[x]) - 1};
     if (joins.empty() || joins.back() != join) joins.push_back(join);
   }
+  return true;
 }
 
 /// Finds which parts of minima are one.
@@ -310,55 +336,46 @@ void SeamlessWatershed::RankMinima() {
       const auto level = static_cast<std::uint64_t>(std::int64_t{minimum.level} - kLeast);
       keys.push_back(level << 32U | (keys.size() + 1));
     }
-    Release(strip.minima);
+    strip.minima = {};
   }
   std::sort(keys.begin(), keys.end());
   ranks_.assign(std::size_t{count_} + 1, 0);
   for (std::uint32_t i = 0; i < count_; ++i) ranks_[keys[i] & 0xFFFFFFFFU] = i + 1;
 }
 
-/// The label at the place that a label below 0, of a strip, stands for.
-std::int32_t& SeamlessWatershed::SeamLabel(unsigned strip, std::int32_t beyond) {
-  const auto at = static_cast<std::uint32_t>(-1 - beyond);
-  return at < cut_.width ? strips_[strip - 1].lastLabels[at]
-                         : strips_[strip + 1].firstLabels[at - cut_.width];
+/// Gives the pixels of the lines of a strip that drain to one of its minima the label of that.
+/// @param isOpen  [out] true where others drain out of the strip.
+bool SeamlessWatershed::NameSeam(unsigned strip, bool& isOpen) {
+  isOpen = false;
+  std::vector<std::int32_t> line;
+  for (const SeamLines::Kind kind : {SeamLines::kFirstLabels, SeamLines::kLastLabels}) {
+    if (!lines_.Read(strip, kind, line)) return false;
+    std::int32_t last = 0, found = 0;
+    for (std::int32_t& label : line) {
+      if (label < 0) isOpen = true;
+      if (label <= 0) continue;
+      if (std::exchange(last, label) != label) {
+        found = static_cast<std::int32_t>(LabelOf(strip, static_cast<std::uint32_t>(label) - 1));
+      }
+      label = found;
+    }
+    if (!lines_.Write(strip, kind, line)) return false;
+  }
+  return true;
 }
 
 /// Gives all pixels where strips meet the labels of the minima that they drain to.
-void SeamlessWatershed::FollowSeams() {
-  for (unsigned strip = 0; strip < strips_.size(); ++strip) {
-    for (std::vector<std::int32_t>* const line :
-         {&strips_[strip].firstLabels, &strips_[strip].lastLabels}) {
-      for (std::int32_t& label : *line) {
-        if (label <= 0) continue;
-        label = static_cast<std::int32_t>(LabelOf(strip, static_cast<std::uint32_t>(label) - 1));
-      }
-    }
-  }
-  const auto stripBeyond = [this](unsigned strip, std::int32_t beyond) {
-    return static_cast<std::uint32_t>(-1 - beyond) < cut_.width ? strip - 1 : strip + 1;
-  };
-  for (unsigned strip = 0; strip < strips_.size(); ++strip) {
-    for (std::vector<std::int32_t>* const line :
-         {&strips_[strip].firstLabels, &strips_[strip].lastLabels}) {
-      for (std::int32_t& start : *line) {
-        unsigned at = strip;
-        std::int32_t label = start;
-        while (label < 0) {
-          const std::int32_t beyond = label;
-          label = SeamLabel(at, beyond);
-          at = stripBeyond(at, beyond);
-        }
-        at = strip;
-        for (std::int32_t* way = &start; *way < 0;) {
-          const std::int32_t beyond = *way;
-          *way = label;
-          way = &SeamLabel(at, beyond);
-          at = stripBeyond(at, beyond);
-        }
-      }
-    }
-  }
+bool SeamlessWatershed::FollowSeams(const AbortFlag* abort) {
+  std::vector<std::uint8_t> open(strips_.size());
+  const bool well = ForEachStrip(AllStrips(), abort, [&](unsigned strip) {
+    bool isOpen = false;
+    if (!NameSeam(strip, isOpen)) return false;
+    open[strip] = isOpen ? 1 : 0;
+    return true;
+  });
+  if (!well) return false;
+  return (abort != nullptr && abort->IsSet()) ||
+         SeamWays(lines_, cut_.width, std::move(open)).Follow(abort);
 }
 
 bool SeamlessWatershed::Connect(const AbortFlag* abort) {
@@ -371,35 +388,44 @@ bool SeamlessWatershed::Connect(const AbortFlag* abort) {
   FindParts(joins);
   NumberMinima();
   if (cut_.isRanked) RankMinima();
-  FollowSeams();
+  return FollowSeams(abort);
+}
+
+bool SeamlessWatershed::MarkSeamBasins(std::vector<bool>& marks) const {
+  marks.assign(std::size_t{count_} + 1, false);
+  std::vector<std::int32_t> line;
+  for (unsigned strip = 1; strip < strips_.size(); ++strip) {
+    if (!lines_.Read(strip, SeamLines::kFirstLabels, line)) return false;
+    for (const std::int32_t label : line) marks[static_cast<std::size_t>(label)] = true;
+  }
   return true;
 }
 
-std::vector<bool> SeamlessWatershed::MarkSeamBasins() const {
-  std::vector<bool> marks(std::size_t{count_} + 1);
-  for (std::size_t strip = 1; strip < strips_.size(); ++strip) {
-    for (const std::int32_t label : strips_[strip].firstLabels) {
-      marks[static_cast<std::size_t>(label)] = true;
-    }
-  }
-  return marks;
+bool SeamlessWatershed::ReadLabelsAbove(unsigned strip, std::vector<std::int32_t>& line) const {
+  line.clear();
+  return strip == 0 || lines_.Read(strip - 1, SeamLines::kLastLabels, line);
+}
+
+bool SeamlessWatershed::ReadLabelsBelow(unsigned strip, std::vector<std::int32_t>& line) const {
+  line.clear();
+  return !HasBelow(strip) || lines_.Read(strip + 1, SeamLines::kFirstLabels, line);
 }
 
 bool SeamlessWatershed::Label(unsigned strip, std::int32_t* labels) const {
   const auto drains = drains_.Borrow();
+  std::vector<std::int32_t> above, below;
+  if (!ReadLabelsAbove(strip, above) || !ReadLabelsBelow(strip, below)) return false;
   if (!ReadCells(strip, *drains)) return false;
   const Strip& own = strips_[strip];
   std::uint32_t number = own.firstNumber, label = own.firstLabel;
   auto part = parts_.cbegin() + static_cast<std::ptrdiff_t>(own.firstPart);
-  const std::int32_t* const above = LabelsAbove(strip);
-  const std::int32_t* const below = LabelsBelow(strip);
   drains->Label(
       labels,
       [&](std::uint32_t) {
         const bool isPart = part != parts_.cend() && part->number == number++;
         return static_cast<std::int32_t>(isPart ? (part++)->label : ++label);
       },
-      [above](std::uint32_t x) { return above[x]; }, [below](std::uint32_t x) { return below[x]; });
+      [&](std::uint32_t x) { return above[x]; }, [&](std::uint32_t x) { return below[x]; });
   return true;
 }
 

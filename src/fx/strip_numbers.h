@@ -39,12 +39,12 @@ class VEXG_EXPORT SegmentNumbers {
   /// Makes a tile of a strip whose pixels are basins.
   bool FindBasins(unsigned strip, Tile<std::int32_t>& tile) const;
   /// Gives the pixels of the next strip the numbers of their segments, or marks borders of these.
-  /// False, with the fault set, when the forest is not well.
+  /// False, with the fault set, when the forest is not well or labels can't be read.
   bool Number(Tile<std::int32_t>& tile);
 
  private:
   void FindRoots(std::int32_t* labels, std::size_t count);
-  void MarkBorders(Tile<std::int32_t>& tile);
+  bool MarkBorders(Tile<std::int32_t>& tile);
 
   const SeamlessWatershed& basins_;
   LabelForest& forest_;
