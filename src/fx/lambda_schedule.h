@@ -67,6 +67,13 @@ class VEXG_EXPORT LambdaSchedule {
     graph_.RegionOf(label).area += 1.0;
   }
 
+  /// Adds pixels to their segment. @param sums  of their values, one for each band.
+  void AddSums(std::uint32_t label, double pixels, const double* sums) {
+    double* const to = graph_.MeansOf(label);
+    for (std::uint32_t band = 0; band < graph_.Bands(); ++band) to[band] += sums[band];
+    graph_.RegionOf(label).area += pixels;
+  }
+
   /// Makes room for pairs of neighbours.
   void ReservePairs(std::size_t count) { graph_.ReservePairs(count); }
   /// Adds a pair of neighbours, behind those that were found before. None has the label 0.

@@ -32,6 +32,7 @@ bool SeamlessSegmentation<T>::MergeInRounds(const LocalMerge::Rules& rules,
                                             LocalMerge::Listener* listener) {
   LocalMerge merge;
   merge.Begin(merge_->Bands(), rules, forest_, listener);
+  if (shares_ != nullptr) return MergeShares(merge);
   const RasterIteratorPtr<T> strips(new RasterIterator<T>(merge_, Strips(0)));
   detail::StripProcess process("SeamlessRounds", NextPass());
   const auto tiles = process.Read(strips);
@@ -48,7 +49,7 @@ bool SeamlessSegmentation<T>::MergeInRounds(const LocalMerge::Rules& rules,
     }
     detail::StripOfBasins made;
     if (tree_) made.labels = labels;
-    const SeamlessWatershed::Labels own = watershed_.LabelsOf(strip);
+    const SeamlessWatershed::Labels own = flood_.LabelsOf(strip);
     made.basins.Find({labels.data(), labels.size(), watershed_.Width(),
                       below.empty() ? nullptr : below.data(), strip > 0},
                      {own.first, own.count}, *pairs.Borrow());

@@ -5,18 +5,17 @@
 
 #include "foundation/fault.h"
 #include "foundation/progress.h"
-#include "fx/gradient_stages.h"
 #include "fx/lambda_schedule.h"
 #include "fx/rigorous_merge.h"
 #include "fx/seamless_segmentation.h"
 #include "fx/strip_numbers.h"
+#include "fx/strip_process.h"
 #include "fx/task_setup.h"
 #include "fx/tree_cut.h"
 #include "fx/usable_pixels.h"
 #include "fx/watershed_task.h"
 #include "platform/system_memory.h"
 #include "raster/raster_def.h"
-#include "tasks/thread_limit.h"
 
 namespace lumo {
 namespace detail {
@@ -87,28 +86,22 @@ std::vector<std::uint32_t> FindFirstOfGroups(std::size_t count, const GroupOf& g
   return found;
 }
 
-/// The pipeline of a pass, with as many strips in flight as there are threads and one more.
-class StripProcess : public TileProcess<> {
- public:
-  StripProcess(const char* name, const IPC& ipc) : TileProcess<>(name, ipc) {
-    this->GetPipeline().SetTokenLimit(ThreadLimit::GetCurrent() + 1);
-  }
-  void SetStrips(unsigned strips) { this->GetPipeline().SetTotalTokens(strips); }
-};
-
 }  // namespace detail
 
 template <typename T>
 SeamlessSegmentation<T>::SeamlessSegmentation(const RasterPtr<T>& segment,
                                               const RasterPtr<T>& merge,
                                               const RasterPtr<std::int32_t>& labels,
-                                              const SegmentRequest& request, const IPC& ipc)
+                                              const SegmentRequest& request, const IPC& ipc,
+                                              const SegmentShares* shares)
     : segment_(segment),
       merge_(merge),
       labels_(labels),
       request_(request),
       ipc_(ipc),
-      stripLines_(SeamlessStripLines(*segment, sizeof(T), request.tileBytes)) {}
+      stripLines_(SeamlessStripLines(*segment, sizeof(T), request.tileBytes)),
+      shares_(shares),
+      watershed_(shares != nullptr ? static_cast<BasinLabels&>(shared_) : flood_) {}
 
 template <typename T>
 IPC SeamlessSegmentation<T>::NextPass() const {
@@ -119,12 +112,7 @@ IPC SeamlessSegmentation<T>::NextPass() const {
 
 template <typename T>
 TileDimensions SeamlessSegmentation<T>::Strips(unsigned border) const {
-  TileDimensions strips;
-  strips.width = segment_->Samples();
-  strips.height = stripLines_;
-  strips.borderTop = strips.borderBottom = border;
-  strips.borderClamp = 1;
-  return strips;
+  return detail::StripTiles(*segment_, stripLines_, border);
 }
 
 template <typename T>
@@ -141,28 +129,25 @@ bool SeamlessSegmentation<T>::Run() {
 
 template <typename T>
 bool SeamlessSegmentation<T>::FindBasins() {
+  if (shares_ != nullptr) return OpenShares();
   const bool isRanked = request_.order != MergeOrder::kLocal;
-  if (!watershed_.Begin({segment_->Samples(), segment_->Lines(), stripLines_, isRanked})) {
+  if (!flood_.Begin({segment_->Samples(), segment_->Lines(), stripLines_, isRanked})) {
     return false;
   }
   const RasterIteratorPtr<T> strips(
       new RasterIterator<T>(segment_, Strips(detail::GradientBorder(request_.algorithm, 1))));
   detail::StripProcess process("SeamlessBasins", NextPass());
   const ArgID slot = process.Read(strips).id;
-  const Array<ArgID> inPlace = ArgIDs({slot, slot});
-  detail::AddGradient<T>(process, request_.algorithm, slot, slot, 1);
-  process.AddTask<RasterLinearStretchTask<double, std::int32_t>>(inPlace,
-                                                                 MakeSetup(request_.stretch));
-  process.AddTask<RasterClipInPlaceTask<std::int32_t>>(inPlace, MakeSetup(request_.limits));
+  detail::AddLevels<T>(process, request_, slot);
   process.Add("Basins", StageOrder::kSeveralAtOnce, [this, slot](ArgList& token, const AbortFlag*) {
     const TilePtr<std::int32_t> levels = TileSlot<std::int32_t>{slot}.In(token);
     if (!levels || !levels->IsValid()) return false;
-    return watershed_.AddStrip(levels->Index().second,
-                               {levels->PixelArray().GetData(), FindExcluded(*levels)});
+    return flood_.AddStrip(levels->Index().second,
+                           {levels->PixelArray().GetData(), FindExcluded(*levels)});
   });
   process.Close();
   if (!process.RunProcess(process.kHere)) return false;
-  return IsAborted() || watershed_.Connect(ipc_.abort.Get());
+  return IsAborted() || flood_.Connect(ipc_.abort.Get());
 }
 
 template <typename T>
@@ -180,6 +165,7 @@ bool SeamlessSegmentation<T>::Merge() {
 template <typename T>
 template <typename Graph, typename Pairs>
 bool SeamlessSegmentation<T>::Gather(Graph& graph, Pairs& pairs) {
+  if (shares_ != nullptr) return GatherShares(graph, pairs);
   std::vector<bool> atSeams;
   if (!watershed_.MarkSeamBasins(atSeams)) return false;
   detail::PairJoin<Pairs> join(pairs, std::move(atSeams));
@@ -325,12 +311,7 @@ bool SeamlessSegmentation<T>::KeepLines(const std::vector<std::int32_t>& labels)
 template <typename T>
 template <typename V>
 void SeamlessSegmentation<T>::AddSquares(std::uint32_t label, const V* values, unsigned bands) {
-  double sum = 0;
-  for (unsigned band = 0; band < bands; ++band) {
-    const auto value = static_cast<double>(values[band]);
-    sum += value * value;
-  }
-  squares_[label] += sum;
+  squares_[label] += SharedGraph<V>::SumOfSquares(values, bands);
 }
 
 /// Takes the squares of the means of a basin from those of its values.

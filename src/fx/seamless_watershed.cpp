@@ -1,7 +1,6 @@
 #include "fx/seamless_watershed.h"
 
 #include <algorithm>
-#include <limits>
 #include <numeric>
 
 #include "foundation/fault.h"
@@ -27,7 +26,7 @@ bool SeamlessWatershed::Begin(const Cut& cut) {
   file_ = MakeWorkFile();
   if (!file_) return false;
   lines_.Begin(*file_, std::uint64_t{cut.width} * cut.height, cut.width);
-  parts_.clear();
+  numbers_.Clear();
   strips_.clear();
   strips_.resize((std::uint64_t{cut.height} + cut.stripLines - 1) / cut.stripLines);
   return true;
@@ -60,21 +59,8 @@ bool SeamlessWatershed::AddStrip(unsigned strip, const StripLevels& from) {
   const bool hasAbove = strip > 0, hasBelow = HasBelow(strip);
   std::vector<Cell> cells = drains->TakeCells();
   cells.resize(std::size_t{width} * lines);
-  for (std::uint32_t y = 0; y < lines; ++y) {
-    const std::size_t at = std::size_t{width} * (y + (hasAbove ? 1 : 0));
-    StripDrains::Levels levels;
-    levels.line = from.levels + at;
-    if (from.excluded != nullptr) levels.excluded = from.excluded + at;
-    if (y > 0 || hasAbove) {
-      levels.above = levels.line - width;
-      if (from.excluded != nullptr) levels.excludedAbove = levels.excluded - width;
-    }
-    if (y + 1 < lines || hasBelow) {
-      levels.below = levels.line + width;
-      if (from.excluded != nullptr) levels.excludedBelow = levels.excluded + width;
-    }
-    StripDrains::MarkLine(levels, width, cells.data() + std::size_t{width} * y);
-  }
+  StripDrains::MarkLines({from.levels, from.excluded, lines, hasAbove, hasBelow}, width,
+                         cells.data());
   const std::vector<Cell> same(cells.begin(), cells.begin() + width);
   if (!lines_.Write(strip, SeamLines::kSame, same) || !WriteCells(strip, cells)) return false;
   drains->Begin(std::move(cells), width);
@@ -176,9 +162,7 @@ bool SeamlessWatershed::Settle(const AbortFlag* abort) {
   return true;
 }
 
-/// Finds the final drains of a strip, its minima, and where the pixels of its first and its last
-/// line drain to: a minimum, by its number in the strip and 1, or a column x of the line above as
-/// -1 - x, or of the line below as -1 - width - x.
+/// Finds the final drains of a strip, its minima, and its StripWays.
 bool SeamlessWatershed::FindWays(unsigned strip) {
   const auto drains = drains_.Borrow();
   Beside beside;
@@ -187,28 +171,11 @@ bool SeamlessWatershed::FindWays(unsigned strip) {
   std::vector<std::uint32_t> first(cut_.width), last(cut_.width);  // the same as are kept
   drains->DrainPlateaus(beside.Distances(), first.data(), last.data());
   if (!WriteCells(strip, drains->Cells())) return false;
-  // Those found in the strip alone, less those which drain into another one.
-  std::size_t candidate = 0;
-  std::uint32_t kept = 0;
-  const auto width = static_cast<std::int32_t>(cut_.width);
-  std::vector<std::int32_t> labels(drains->Cells().size());
-  drains->Label(
-      labels.data(),
-      [&](std::uint32_t pixel) {
-        if (cut_.isRanked) {
-          while (own.minima[candidate].first != pixel) ++candidate;
-          own.minima[kept] = own.minima[candidate];
-        }
-        return static_cast<std::int32_t>(++kept);
-      },
-      [](std::uint32_t x) { return -1 - static_cast<std::int32_t>(x); },
-      [width](std::uint32_t x) { return -1 - width - static_cast<std::int32_t>(x); });
-  own.minimumCount = kept;
-  if (cut_.isRanked) own.minima.resize(kept);
-  const std::vector<std::int32_t> lastLabels(labels.end() - width, labels.end());
-  labels.resize(cut_.width);
-  return lines_.Write(strip, SeamLines::kFirstLabels, labels) &&
-         lines_.Write(strip, SeamLines::kLastLabels, lastLabels);
+  const StripWays ways =
+      StripWays::Find(*drains, cut_.width, cut_.isRanked ? &own.minima : nullptr);
+  own.minimumCount = ways.minima;
+  return lines_.Write(strip, SeamLines::kFirstLabels, ways.firstLabels) &&
+         lines_.Write(strip, SeamLines::kLastLabels, ways.lastLabels);
 }
 
 /// Finds the ways of all strips, and the minima that go on in the strip below.
@@ -217,14 +184,8 @@ bool SeamlessWatershed::FindAllWays(const AbortFlag* abort, std::vector<Join>& j
       ForEachStrip(AllStrips(), abort, [this](unsigned strip) { return FindWays(strip); });
   if (!well) return false;
   if (abort != nullptr && abort->IsSet()) return true;
-  std::uint64_t total = 0;
   for (unsigned strip = 0; strip < strips_.size(); ++strip) {
-    strips_[strip].firstNumber = static_cast<std::uint32_t>(total);
-    total += strips_[strip].minimumCount;
-    if (total > static_cast<std::uint64_t>(std::numeric_limits<std::int32_t>::max())) {
-      SetFault("the raster has more minima than labels have numbers");
-      return false;
-    }
+    if (!numbers_.AddStrip(strips_[strip].minimumCount)) return false;
     if (strip > 0 && !ListJoins(strip, joins)) return false;
   }
   return true;
@@ -240,8 +201,8 @@ bool SeamlessWatershed::ListJoins(unsigned strip, std::vector<Join>& joins) cons
       !lines_.Read(strip, SeamLines::kFirstLabels, lowerLabels)) {
     return false;
   }
-  const std::uint32_t upperFirst = strips_[strip - 1].firstNumber;
-  const std::uint32_t lowerFirst = strips_[strip].firstNumber;
+  const std::uint32_t upperFirst = numbers_.FirstNumberOf(strip - 1);
+  const std::uint32_t lowerFirst = numbers_.FirstNumberOf(strip);
   for (std::uint32_t x = 0; x < cut_.width; ++x) {
     // On one level, or one of them would have a way down.
     if (upper[x] != StripDrains::kFar || lower[x] != StripDrains::kFar) continue;
@@ -253,94 +214,14 @@ bool SeamlessWatershed::ListJoins(unsigned strip, std::vector<Join>& joins) cons
   return true;
 }
 
-/// Finds which parts of minima are one.
-void SeamlessWatershed::FindParts(const std::vector<Join>& joins) {
-  parts_.reserve(2 * joins.size());
-  for (const auto& [a, b] : joins) {
-    parts_.push_back({a, a});
-    parts_.push_back({b, b});
-  }
-  std::sort(parts_.begin(), parts_.end(),
-            [](const Part& a, const Part& b) { return a.number < b.number; });
-  const auto isSame = [](const Part& a, const Part& b) { return a.number == b.number; };
-  parts_.erase(std::unique(parts_.begin(), parts_.end(), isSame), parts_.end());
-  const auto partOf = [this](std::uint32_t number) -> Part& {
-    return *std::lower_bound(parts_.begin(), parts_.end(), number,
-                             [](const Part& part, std::uint32_t at) { return part.number < at; });
-  };
-  const auto rootOf = [&](std::uint32_t number) {
-    for (Part* part = &partOf(number); part->label != part->number; part = &partOf(part->label)) {
-      number = part->label = partOf(part->label).label;
-    }
-    return number;
-  };
-  for (const auto& [a, b] : joins) {
-    const std::uint32_t one = rootOf(a), other = rootOf(b);
-    partOf(std::max(one, other)).label = std::min(one, other);
-  }
-  for (Part& part : parts_) part.label = rootOf(part.number);
-  std::erase_if(parts_, [](const Part& part) { return part.label == part.number; });
-  parts_.shrink_to_fit();
-}
-
-/// Numbers minima in raster order, those that strips cut where they begin.
-void SeamlessWatershed::NumberMinima() {
-  std::size_t part = 0;
-  for (Strip& strip : strips_) {
-    strip.firstPart = part;
-    strip.firstLabel = strip.firstNumber - static_cast<std::uint32_t>(part);
-    while (part < parts_.size() && parts_[part].number < strip.firstNumber + strip.minimumCount) {
-      ++part;
-    }
-  }
-  count_ = strips_.back().firstNumber + strips_.back().minimumCount -
-           static_cast<std::uint32_t>(parts_.size());
-  // A whole is no part, so that the number of parts in front of it is known.
-  const auto isBefore = [](const Part& at, std::uint32_t number) { return at.number < number; };
-  for (Part& at : parts_) {
-    const auto before = std::lower_bound(parts_.begin(), parts_.end(), at.label, isBefore);
-    at.label = at.label + 1 - static_cast<std::uint32_t>(before - parts_.begin());
-  }
-}
-
-/// Gives the label of a minimum of a strip, counted there from 0.
-std::uint32_t SeamlessWatershed::LabelOf(unsigned strip, std::uint32_t minimum) const {
-  const Strip& own = strips_[strip];
-  const std::uint32_t number = own.firstNumber + minimum;
-  const auto part = std::lower_bound(
-      parts_.begin() + static_cast<std::ptrdiff_t>(own.firstPart), parts_.end(), number,
-      [](const Part& at, std::uint32_t wanted) { return at.number < wanted; });
-  if (part != parts_.end() && part->number == number) return part->label;
-  return number + 1 - static_cast<std::uint32_t>(part - parts_.begin());
-}
-
-SeamlessWatershed::Labels SeamlessWatershed::LabelsOf(unsigned strip) const {
-  const std::uint32_t first = strips_[strip].firstLabel;
-  const std::uint32_t end = strip + 1 < strips_.size() ? strips_[strip + 1].firstLabel : count_;
-  return {first, end - first};
-}
-
 /// Ranks the minima by their levels.
 void SeamlessWatershed::RankMinima() {
-  constexpr std::int64_t kLeast = std::numeric_limits<std::int32_t>::min();
-  std::vector<std::uint64_t> keys;
-  keys.reserve(count_);
-  auto part = parts_.cbegin();
-  std::uint32_t number = 0;
+  MinimumNumbers::Ranking ranking(numbers_);
   for (Strip& strip : strips_) {
-    for (const Minimum& minimum : strip.minima) {
-      if (part != parts_.cend() && part->number == number++) {
-        ++part;
-        continue;
-      }
-      const auto level = static_cast<std::uint64_t>(std::int64_t{minimum.level} - kLeast);
-      keys.push_back(level << 32U | (keys.size() + 1));
-    }
+    for (const StripMinimum& minimum : strip.minima) ranking.Add(minimum.level);
     strip.minima = {};
   }
-  std::sort(keys.begin(), keys.end());
-  ranks_.assign(std::size_t{count_} + 1, 0);
-  for (std::uint32_t i = 0; i < count_; ++i) ranks_[keys[i] & 0xFFFFFFFFU] = i + 1;
+  ranks_ = ranking.Finish();
 }
 
 /// Gives the pixels of the lines of a strip that drain to one of its minima the label of that.
@@ -355,7 +236,8 @@ bool SeamlessWatershed::NameSeam(unsigned strip, bool& isOpen) {
       if (label < 0) isOpen = true;
       if (label <= 0) continue;
       if (std::exchange(last, label) != label) {
-        found = static_cast<std::int32_t>(LabelOf(strip, static_cast<std::uint32_t>(label) - 1));
+        const auto minimum = static_cast<std::uint32_t>(label) - 1;
+        found = static_cast<std::int32_t>(numbers_.LabelOf(strip, minimum));
       }
       label = found;
     }
@@ -385,14 +267,13 @@ bool SeamlessWatershed::Connect(const AbortFlag* abort) {
   std::vector<Join> joins;
   if (!FindAllWays(abort, joins)) return false;
   if (isAborted()) return true;
-  FindParts(joins);
-  NumberMinima();
+  numbers_.Connect(joins);
   if (cut_.isRanked) RankMinima();
   return FollowSeams(abort);
 }
 
 bool SeamlessWatershed::MarkSeamBasins(std::vector<bool>& marks) const {
-  marks.assign(std::size_t{count_} + 1, false);
+  marks.assign(std::size_t{Count()} + 1, false);
   std::vector<std::int32_t> line;
   for (unsigned strip = 1; strip < strips_.size(); ++strip) {
     if (!lines_.Read(strip, SeamLines::kFirstLabels, line)) return false;
@@ -416,16 +297,7 @@ bool SeamlessWatershed::Label(unsigned strip, std::int32_t* labels) const {
   std::vector<std::int32_t> above, below;
   if (!ReadLabelsAbove(strip, above) || !ReadLabelsBelow(strip, below)) return false;
   if (!ReadCells(strip, *drains)) return false;
-  const Strip& own = strips_[strip];
-  std::uint32_t number = own.firstNumber, label = own.firstLabel;
-  auto part = parts_.cbegin() + static_cast<std::ptrdiff_t>(own.firstPart);
-  drains->Label(
-      labels,
-      [&](std::uint32_t) {
-        const bool isPart = part != parts_.cend() && part->number == number++;
-        return static_cast<std::int32_t>(isPart ? (part++)->label : ++label);
-      },
-      [&](std::uint32_t x) { return above[x]; }, [&](std::uint32_t x) { return below[x]; });
+  LabelStrip(*drains, {numbers_, strip}, above.data(), below.data(), labels);
   return true;
 }
 

@@ -2,8 +2,8 @@
 
 #include <vector>
 
+#include "fx/basin_labels.h"
 #include "fx/label_forest.h"
-#include "fx/seamless_watershed.h"
 #include "raster/raster_tasks.h"
 
 namespace lumo {
@@ -32,7 +32,7 @@ class VEXG_EXPORT SegmentNumbers {
   /// @param forest  what basins have become; outlives this.
   /// @param joined  what the numbers of that have become in turn, each of which is given already;
   ///                null for themselves.
-  SegmentNumbers(const SeamlessWatershed& basins, LabelForest& forest, LabelForest* joined,
+  SegmentNumbers(const BasinLabels& basins, LabelForest& forest, LabelForest* joined,
                  bool bordersOnly)
       : basins_(basins), forest_(forest), joined_(joined), bordersOnly_(bordersOnly) {}
 
@@ -46,7 +46,7 @@ class VEXG_EXPORT SegmentNumbers {
   void FindRoots(std::int32_t* labels, std::size_t count);
   bool MarkBorders(Tile<std::int32_t>& tile);
 
-  const SeamlessWatershed& basins_;
+  const BasinLabels& basins_;
   LabelForest& forest_;
   LabelForest* joined_;
   bool bordersOnly_;
