@@ -31,8 +31,8 @@ using DivisionInputs = std::function<const std::string*(const std::string& input
 struct DivisionDeclaration {
   const char* command;  ///< class name
   DivisionKind kind = DivisionKind::kNone;
-  const char* source = "";           ///< input that names the raster; kFirst with it: by shares
-  const char* target = "";           ///< input that names the raster to write; kShares don't need it
+  const char* source = "";  ///< input that names the raster; kFirst with it: by shares
+  const char* target = "";  ///< input that names the raster to write; kShares don't need it
   std::vector<const char*> makes{};  ///< inputs that name files which the command makes
   const char* makesWhen = "";        ///< input that has to be 1 for that; empty for none
   const char* dividesWhen = "";      ///< input that has to be Exact for shares; empty for none
@@ -43,6 +43,9 @@ struct DivisionDeclaration {
   /// Says why a command with these inputs can't be divided; null where it can. Null for all that
   /// can.
   const char* (*whyNot)(const DivisionInputs& inputs) = nullptr;
+
+  /// Bytes of memory that a share takes for each of its pixels, and joining for each of all.
+  unsigned shareBytes = 0, joinBytes = 0;
 
   static constexpr unsigned kMostRounds = 4;
 };

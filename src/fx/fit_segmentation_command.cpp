@@ -20,18 +20,19 @@ const CommandDeclaration kFitSegmentation{
     "Feature extraction",
     "Finds what FxTileSegmentMergeCommand needs to know of the gradients of a raster, and of what "
     "merging costs.",
-    WithShareInputs({{"SegmentURI", Presence::kRequired, ValueKind::kURI,
-      "the raster from which the gradients are computed"},
-     {"SegmentAlgorithm", Presence::kRequired, ValueKind::kInteger,
-      "1: the largest Sobel gradient of the bands; else the mean of the bands"},
-     {"SegmentValue", Presence::kOptional, ValueKind::kNumber,
-      "gradients up to this one are one flat level; the smallest gradient when absent"},
-     {"SegmentPercent", Presence::kOptional, ValueKind::kNumber,
-      "percentage of the pixels whose gradients are one flat level, instead of SegmentValue"},
-     {"MergeURI", Presence::kOptional, ValueKind::kURI,
-      "the raster whose bands drive merging; that of SegmentURI when absent"},
-     {"MergePercent", Presence::kOptional, ValueKind::kNumber,
-      "percentage of all merges to do; MergeValue is their cost"}}),
+    WithShareInputs(
+        {{"SegmentURI", Presence::kRequired, ValueKind::kURI,
+          "the raster from which the gradients are computed"},
+         {"SegmentAlgorithm", Presence::kRequired, ValueKind::kInteger,
+          "1: the largest Sobel gradient of the bands; else the mean of the bands"},
+         {"SegmentValue", Presence::kOptional, ValueKind::kNumber,
+          "gradients up to this one are one flat level; the smallest gradient when absent"},
+         {"SegmentPercent", Presence::kOptional, ValueKind::kNumber,
+          "percentage of the pixels whose gradients are one flat level, instead of SegmentValue"},
+         {"MergeURI", Presence::kOptional, ValueKind::kURI,
+          "the raster whose bands drive merging; that of SegmentURI when absent"},
+         {"MergePercent", Presence::kOptional, ValueKind::kNumber,
+          "percentage of all merges to do; MergeValue is their cost"}}),
     {{"MinGradient", ValueKind::kNumber, "the smallest gradient; 0 with SegmentAlgorithm 1"},
      {"MaxGradient", ValueKind::kNumber, "the largest gradient"},
      {"StretchValue", ValueKind::kNumber,
@@ -242,7 +243,9 @@ class FitSegmentationCommand final : public SegmentCommand {
       lambdas.insert(lambdas.end(), found.begin(), found.end());
       return true;
     };
-    if (!DoPass(compute, [&](ShareWriter& to) { PutList(to, lambdas); }, get)) return false;
+    if (!DoPass(
+            compute, [&](ShareWriter& to) { PutList(to, lambdas); }, get))
+      return false;
     CountLambdas(lambdas, *histogram, binSize->value);
     mergeValue_ = BinAt(*histogram, Read<double>("MergePercent") / 100) * binSize->value;
     return true;
@@ -259,11 +262,12 @@ const DivisionRegistration fitSegmentationDivision(
     {.command = "FitSegmentationCommand",
      .kind = DivisionKind::kShares,
      .source = "SegmentURI",
-     .rounds = [](unsigned, const DivisionInputs& inputs) {
-       const std::string* const percent = inputs("MergePercent");
-       return PassesOf(inputs("SegmentPercent") != nullptr,
-                       percent != nullptr ? std::atof(percent->c_str()) : 0);
-     },
+     .rounds =
+         [](unsigned, const DivisionInputs& inputs) {
+           const std::string* const percent = inputs("MergePercent");
+           return PassesOf(inputs("SegmentPercent") != nullptr,
+                           percent != nullptr ? std::atof(percent->c_str()) : 0);
+         },
      .whyNot = [](const DivisionInputs& inputs) -> const char* {
        const std::string* const percent = inputs("MergePercent");
        return percent != nullptr && percent->starts_with('$') ? "MergePercent isn't known before"

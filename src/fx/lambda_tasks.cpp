@@ -2,8 +2,7 @@
 
 namespace lumo {
 
-void CountLambdas(const std::vector<double>& lambdas, Array<unsigned>& histogram,
-                         double& binSize) {
+void CountLambdas(const std::vector<double>& lambdas, Array<unsigned>& histogram, double& binSize) {
   const auto largest = std::max_element(lambdas.begin(), lambdas.end());
   const unsigned bins = histogram.GetCount();
   if (largest == lambdas.end() || !(*largest > 0) || bins < 2) return;

@@ -207,7 +207,8 @@ class SeamWave {
     const std::size_t behind = zone.Count() - zone.last.size();
     if (at.strip + 1 < strips_.size() && at.pixel >= behind) {
       const std::uint32_t x = zone.last[at.pixel - behind];
-      if (strips_[at.strip + 1].isSameAbove[x] != 0) go(at.strip + 1, zones_[at.strip + 1].first[x]);
+      if (strips_[at.strip + 1].isSameAbove[x] != 0)
+        go(at.strip + 1, zones_[at.strip + 1].first[x]);
     }
   }
 
@@ -215,7 +216,8 @@ class SeamWave {
     for (std::size_t strip = 0; strip < strips_.size(); ++strip) {
       const Zone& zone = zones_[strip];
       for (std::uint32_t x = 0; x < width_; ++x) {
-        if (zone.first[x] != kNone) strips_[strip].first[x] = distances_[zone.begin + zone.first[x]];
+        if (zone.first[x] != kNone)
+          strips_[strip].first[x] = distances_[zone.begin + zone.first[x]];
         if (zone.last[x] != kNone) strips_[strip].last[x] = distances_[zone.begin + zone.last[x]];
       }
     }

@@ -17,10 +17,11 @@ struct VEXG_EXPORT SeamZone {
   /// Stands for no pixel.
   static constexpr std::uint32_t kNone = 0xFFFFFFFF;
 
-  std::vector<std::uint32_t> up;      ///< by pixel: the one above it on its plateau, or kNone
-  std::vector<std::uint8_t> hasLeft;  ///< by pixel: the one before it is on its left, on its plateau
-  std::vector<std::uint32_t> first;   ///< columns of those in the first line of the strip
-  std::vector<std::uint32_t> last;    ///< columns of those in the last line
+  std::vector<std::uint32_t> up;  ///< by pixel: the one above it on its plateau, or kNone
+  std::vector<std::uint8_t>
+      hasLeft;                       ///< by pixel: the one before it is on its left, on its plateau
+  std::vector<std::uint32_t> first;  ///< columns of those in the first line of the strip
+  std::vector<std::uint32_t> last;   ///< columns of those in the last line
 
   std::size_t Count() const { return up.size(); }
 
@@ -44,7 +45,8 @@ struct SeamStrip {
 /// wind through them.
 ///
 /// Memory: 13 bytes for each pixel of the zones. Cost: a step for each of these.
-/// @param strips  of the whole image, from above; `first` and `last` are of each strip alone before,
+/// @param strips  of the whole image, from above; `first` and `last` are of each strip alone
+/// before,
 ///                and of the image behind.
 VEXG_EXPORT void SettleSeams(std::vector<SeamStrip>& strips, std::uint32_t width);
 

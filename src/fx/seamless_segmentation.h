@@ -4,9 +4,9 @@
 #include "fx/label_pairs.h"
 #include "fx/seamless_watershed.h"
 #include "fx/segment_process.h"
+#include "fx/segment_tree.h"
 #include "fx/shared_basins.h"
 #include "fx/shared_graph.h"
-#include "fx/segment_tree.h"
 
 namespace lumo {
 
@@ -22,8 +22,8 @@ namespace lumo {
 /// Merging in rounds needs no whole graph; see LocalMerge. It does for joining small segments at
 /// its end, of the segments that rounds leave; and a tree of it keeps all its merges.
 ///
-/// Where shares have found the basins and their neighbours (SegmentShare), only merging is left, and
-/// the result is the same to the bit.
+/// Where shares have found the basins and their neighbours (SegmentShare), only merging is left,
+/// and the result is the same to the bit.
 ///
 /// Memory: MemoryOfMerging for the graph, and some 100 bytes a pixel of a strip for each
 ///         thread. Failure: false, with the fault set, and nothing written unless the writing
@@ -85,9 +85,9 @@ class SeamlessSegmentation {
   IPC ipc_;
   unsigned stripLines_ = 1;
   const SegmentShares* shares_;
-  SeamlessWatershed flood_;  // of one that makes its basins itself
-  SharedBasins shared_;      // of one that has shares
-  BasinLabels& watershed_;   // the one of both that there is
+  SeamlessWatershed flood_;           // of one that makes its basins itself
+  SharedBasins shared_;               // of one that has shares
+  BasinLabels& watershed_;            // the one of both that there is
   std::vector<std::uint32_t> roots_;  // by basin: one that stands for its segment; empty for itself
   LabelForest forest_;                // what basins have become
   std::optional<LabelForest> joined_;  // what segments of rounds have become that were small

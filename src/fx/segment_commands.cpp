@@ -80,73 +80,85 @@ const CommandDeclaration kSegmentMerge{
     "FxTileSegmentMergeCommand",
     "Feature extraction",
     "Segments a raster into labels, or counts what merging its segments costs.",
-    WithShareInputs({{"SegmentURI", Presence::kRequired, ValueKind::kURI,
-      "the raster from which the gradients are computed"},
-     {"SegmentAlgorithm", Presence::kRequired, ValueKind::kInteger,
-      "1: the largest Sobel gradient of the bands; else the mean of the bands"},
-     {"SegmentValue", Presence::kRequired, ValueKind::kNumber,
-      "gradients up to this one are one flat level"},
-     {"MinGradient", Presence::kRequired, ValueKind::kNumber, "the gradient that becomes level 0"},
-     {"MaxGradient", Presence::kRequired, ValueKind::kNumber,
-      "the gradient that becomes the highest level"},
-     {"MergeURI", Presence::kRequired, ValueKind::kURI,
-      "the raster whose bands drive merging, of the same size and pixel type"},
-     {"MergeAlgorithm", Presence::kOptional, ValueKind::kInteger,
-      "1: full lambda schedule; 2: rigorous; others: no merging; 1 when absent"},
-     {"MergeValue", Presence::kOptional, ValueKind::kNumber,
-      "cost up to which segments are merged; none unless above 0, as when absent"},
-     {"StretchValue", Presence::kRequired, ValueKind::kNumber, "the highest level"},
-     {"LambdaEstimate", Presence::kRequired, ValueKind::kBoolean,
-      "count the costs of merging, and write no raster"},
-     {"LabelURI", Presence::kOptional, ValueKind::kURI,
-      "the raster of one band and type Int32 that receives the labels; needed without an estimate"},
-     {"TileMemorySize", Presence::kOptional, ValueKind::kInteger,
-      "bytes of the pixels of a tile; 8388608 when absent"},
-     {"TileBorderSize", Presence::kOptional, ValueKind::kInteger,
-      "overlap of the tiles on each side, in pixels; 1 when absent"},
-     {"SegmentBorder", Presence::kOptional, ValueKind::kInteger,
-      "1: an image of the borders between segments, of 0 and 1, instead of labels"},
-     {"Sums", Presence::kOptional, ValueKind::kWord,
-      "how the rigorous merge adds up. Told: in single precision; Exact: in double precision", "",
-      &WordsIn<Form>},
-     {"Seamless", Presence::kOptional, ValueKind::kBoolean,
-      "the segments are those of one tile as large as the raster, numbered in raster order without "
-      "gaps; TileMemorySize is then that of the strips that are read, and changes no label, and "
-      "there is no TileBorderSize; false when absent"},
-     {"Memory", Presence::kOptional, ValueKind::kInteger,
-      "bytes that merging may take when Seamless is true: it fails when it needs more, before it "
-      "begins unless Order is Local; half the machine's when absent"},
-     {"MinSize", Presence::kOptional, ValueKind::kInteger,
-      "with Seamless and MergeAlgorithm 1: segments of fewer pixels join at the end the neighbour "
-      "that costs least, the smallest first; 0 when absent"},
-     {"MaxSize", Presence::kOptional, ValueKind::kInteger,
-      "with Seamless and MergeAlgorithm 1: segments that have more pixels together are not merged, "
-      "except by MinSize; none when absent"},
-     {"Compactness", Presence::kOptional, ValueKind::kNumber,
-      "with Seamless and MergeAlgorithm 1: costs are divided by the length of the common border to "
-      "the power of this besides, 0 to 10; 0 when absent"},
-     {"Order", Presence::kOptional, ValueKind::kWord,
-      "with Seamless and MergeAlgorithm 1: the order of merging. Told: the cheapest pair anywhere "
-      "first; Local: in rounds, all pairs at once that cost both of their segments least, and less "
-      "than MergeValue",
-      "", &WordsIn<MergeOrder>},
-     {"Rounds", Presence::kOptional, ValueKind::kInteger,
-      "of Order Local, 1 to 1000; 12 when absent"},
-     {"Tree", Presence::kOptional, ValueKind::kText,
-      "with Seamless and MergeAlgorithm 1: the file to make of all merges, from which segments of "
-      "every MergeValue can be made (CreateTreeLabelsRasterCommand); none when absent"},
-     {"MergePercent", Presence::kOptional, ValueKind::kNumber,
-      "with Tree: percentage of all merges to do, in place of MergeValue"}}),
+    WithShareInputs(
+        {{"SegmentURI", Presence::kRequired, ValueKind::kURI,
+          "the raster from which the gradients are computed"},
+         {"SegmentAlgorithm", Presence::kRequired, ValueKind::kInteger,
+          "1: the largest Sobel gradient of the bands; else the mean of the bands"},
+         {"SegmentValue", Presence::kRequired, ValueKind::kNumber,
+          "gradients up to this one are one flat level"},
+         {"MinGradient", Presence::kRequired, ValueKind::kNumber,
+          "the gradient that becomes level 0"},
+         {"MaxGradient", Presence::kRequired, ValueKind::kNumber,
+          "the gradient that becomes the highest level"},
+         {"MergeURI", Presence::kRequired, ValueKind::kURI,
+          "the raster whose bands drive merging, of the same size and pixel type"},
+         {"MergeAlgorithm", Presence::kOptional, ValueKind::kInteger,
+          "1: full lambda schedule; 2: rigorous; others: no merging; 1 when absent"},
+         {"MergeValue", Presence::kOptional, ValueKind::kNumber,
+          "cost up to which segments are merged; none unless above 0, as when absent"},
+         {"StretchValue", Presence::kRequired, ValueKind::kNumber, "the highest level"},
+         {"LambdaEstimate", Presence::kRequired, ValueKind::kBoolean,
+          "count the costs of merging, and write no raster"},
+         {"LabelURI", Presence::kOptional, ValueKind::kURI,
+          "the raster of one band and type Int32 that receives the labels; needed without an "
+          "estimate"},
+         {"TileMemorySize", Presence::kOptional, ValueKind::kInteger,
+          "bytes of the pixels of a tile; 8388608 when absent"},
+         {"TileBorderSize", Presence::kOptional, ValueKind::kInteger,
+          "overlap of the tiles on each side, in pixels; 1 when absent"},
+         {"SegmentBorder", Presence::kOptional, ValueKind::kInteger,
+          "1: an image of the borders between segments, of 0 and 1, instead of labels"},
+         {"Sums", Presence::kOptional, ValueKind::kWord,
+          "how the rigorous merge adds up. Told: in single precision; Exact: in double precision",
+          "", &WordsIn<Form>},
+         {"Seamless", Presence::kOptional, ValueKind::kBoolean,
+          "the segments are those of one tile as large as the raster, numbered in raster order "
+          "without "
+          "gaps; TileMemorySize is then that of the strips that are read, and changes no label, "
+          "and "
+          "there is no TileBorderSize; false when absent"},
+         {"Memory", Presence::kOptional, ValueKind::kInteger,
+          "bytes that merging may take when Seamless is true: it fails when it needs more, before "
+          "it "
+          "begins unless Order is Local; half the machine's when absent"},
+         {"MinSize", Presence::kOptional, ValueKind::kInteger,
+          "with Seamless and MergeAlgorithm 1: segments of fewer pixels join at the end the "
+          "neighbour "
+          "that costs least, the smallest first; 0 when absent"},
+         {"MaxSize", Presence::kOptional, ValueKind::kInteger,
+          "with Seamless and MergeAlgorithm 1: segments that have more pixels together are not "
+          "merged, "
+          "except by MinSize; none when absent"},
+         {"Compactness", Presence::kOptional, ValueKind::kNumber,
+          "with Seamless and MergeAlgorithm 1: costs are divided by the length of the common "
+          "border to "
+          "the power of this besides, 0 to 10; 0 when absent"},
+         {"Order", Presence::kOptional, ValueKind::kWord,
+          "with Seamless and MergeAlgorithm 1: the order of merging. Told: the cheapest pair "
+          "anywhere "
+          "first; Local: in rounds, all pairs at once that cost both of their segments least, and "
+          "less "
+          "than MergeValue",
+          "", &WordsIn<MergeOrder>},
+         {"Rounds", Presence::kOptional, ValueKind::kInteger,
+          "of Order Local, 1 to 1000; 12 when absent"},
+         {"Tree", Presence::kOptional, ValueKind::kText,
+          "with Seamless and MergeAlgorithm 1: the file to make of all merges, from which segments "
+          "of "
+          "every MergeValue can be made (CreateTreeLabelsRasterCommand); none when absent"},
+         {"MergePercent", Presence::kOptional, ValueKind::kNumber,
+          "with Tree: percentage of all merges to do, in place of MergeValue"}}),
     {{"LambdaHistogram", ValueKind::kIntegerArray,
       "cumulative counts of the costs of all merges, in 10000 bins from 0 on"},
      {"LambdaBinSize", ValueKind::kNumber, "width of these bins"}}};
 
 /// Why a segmentation can't be done in shares; null where it can.
 const char* WhyNoShares(bool isSeamless, bool isEstimate, bool isRigorous, bool isExact) {
-  return isEstimate                ? "an estimate goes by tiles"
-         : !isSeamless             ? "Seamless is not true, and tiles depend on those before"
-         : isRigorous && !isExact  ? "the rigorous merge adds up in single precision"
-                                   : nullptr;
+  return isEstimate               ? "an estimate goes by tiles"
+         : !isSeamless            ? "Seamless is not true, and tiles depend on those before"
+         : isRigorous && !isExact ? "the rigorous merge adds up in single precision"
+                                  : nullptr;
 }
 
 class FxTileSegmentMergeCommand final : public SegmentCommand {
@@ -370,14 +382,17 @@ const DivisionRegistration segmentMergeDivision(
      .target = "LabelURI",
      .makes = {"Tree"},
      .rounds = [](unsigned, const DivisionInputs&) { return kSegmentRounds; },
-     .whyNot = [](const DivisionInputs& inputs) {
-       const auto is = [&](const char* name, const char* word) {
-         const std::string* const text = inputs(name);
-         return text != nullptr && *text == word;
-       };
-       return WhyNoShares(is("Seamless", "1"), is("LambdaEstimate", "1"),
-                          is("MergeAlgorithm", "2"), is("Sums", "Exact"));
-     }});
+     .whyNot =
+         [](const DivisionInputs& inputs) {
+           const auto is = [&](const char* name, const char* word) {
+             const std::string* const text = inputs(name);
+             return text != nullptr && *text == word;
+           };
+           return WhyNoShares(is("Seamless", "1"), is("LambdaEstimate", "1"),
+                              is("MergeAlgorithm", "2"), is("Sums", "Exact"));
+         },
+     .shareBytes = 28,
+     .joinBytes = 24});  // of texture, a tenth of whose pixels are basins
 
 const CommandDeclaration kHistogram{
     "FxTileSegmentHistogramCommand",

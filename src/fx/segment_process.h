@@ -93,15 +93,13 @@ class RasterTileWatershedSegmentFLSEstimateProcess final : public WatershedProce
   /// @param histogram  [out] cumulative counts, as many as it has bins.
   /// @param binSize    [out]
   /// @param tiles      of SegmentGrid.
-  /// @param lambdas    gets the costs, in any order, in place of `histogram` and `binSize`; outlives
+  /// @param lambdas    gets the costs, in any order, in place of `histogram` and `binSize`;
+  /// outlives
   ///                   the process. Null for none.
-  RasterTileWatershedSegmentFLSEstimateProcess(const RasterPtr<T>& segment,
-                                               const RasterPtr<T>& merge,
-                                               const SegmentRequest& request,
-                                               const Pointer<Array<unsigned>>& histogram,
-                                               const ScalarPtr<double>& binSize,
-                                               const IPC& ipc = {}, const TileRange& tiles = {},
-                                               std::vector<double>* lambdas = nullptr);
+  RasterTileWatershedSegmentFLSEstimateProcess(
+      const RasterPtr<T>& segment, const RasterPtr<T>& merge, const SegmentRequest& request,
+      const Pointer<Array<unsigned>>& histogram, const ScalarPtr<double>& binSize,
+      const IPC& ipc = {}, const TileRange& tiles = {}, std::vector<double>* lambdas = nullptr);
 };
 
 /// Segments a raster, and merges by RasterFullLambdaScheduleTask.

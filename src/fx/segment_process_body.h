@@ -142,8 +142,7 @@ RasterSegmentHistogramProcess<T>::RasterSegmentHistogramProcess(const RasterPtr<
 template <typename T>
 RasterSegmentLimitsProcess<T>::RasterSegmentLimitsProcess(const RasterPtr<T>& raster,
                                                           SegmentAlgorithm algorithm,
-                                                          const IPC& ipc,
-                                                          const TileRange& tiles)
+                                                          const IPC& ipc, const TileRange& tiles)
     : SomeTilesProcess("RasterSegmentLimitsProcess", ipc),
       least_(std::numeric_limits<double>::infinity()),
       most_(-least_) {

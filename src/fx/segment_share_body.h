@@ -22,6 +22,10 @@ SegmentShare<T>::SegmentShare(const RasterPtr<T>& segment, const RasterPtr<T>& m
 template <typename T>
 bool SegmentShare<T>::Run(unsigned share, const std::string& file) {
   constexpr std::uint64_t kMostPixels = 1U << 30U;  // of a share
+  if (cut_.width == 0 || cut_.height == 0) {
+    SetFault("SegmentURI: the raster has no pixels");
+    return false;
+  }
   if (std::uint64_t{cut_.width} * cut_.shareLines > kMostPixels || cut_.width > kMostPixels / 2) {
     SetFault("a share has too many pixels; more shares have fewer");
     return false;
@@ -42,10 +46,10 @@ bool SegmentShare<T>::Run(unsigned share, const std::string& file) {
 template <typename T>
 TileSlot<T> SegmentShare<T>::ReadStrips(detail::StripProcess& process, const RasterPtr<T>& raster,
                                         unsigned share, unsigned border) const {
-  return process.ReadSome(RasterIteratorPtr<T>(new RasterIterator<T>(
-                              raster, detail::StripTiles(*raster, cut_.stripLines, border))),
-                          {cut_.FirstLineOf(share) / cut_.stripLines,
-                           (cut_.LinesOf(share) - 1) / cut_.stripLines + 1});
+  return process.ReadSome(
+      RasterIteratorPtr<T>(
+          new RasterIterator<T>(raster, detail::StripTiles(*raster, cut_.stripLines, border))),
+      {cut_.FirstLineOf(share) / cut_.stripLines, (cut_.LinesOf(share) - 1) / cut_.stripLines + 1});
 }
 
 template <typename T>
@@ -64,9 +68,8 @@ bool SegmentShare<T>::Flood(unsigned share, ShareWriter& out) {
     const bool hasAbove = line > 0;
     const std::int32_t* const from = tile->PixelArray().GetData();
     const std::size_t at = std::size_t{cut_.width} * (line - cut_.FirstLineOf(share));
-    StripDrains::MarkLines(
-        {from, FindExcluded(*tile), lines, hasAbove, line + lines < cut_.height}, cut_.width,
-        cells.data() + at);
+    StripDrains::MarkLines({from, FindExcluded(*tile), lines, hasAbove, line + lines < cut_.height},
+                           cut_.width, cells.data() + at);
     if (IsRanked()) {
       std::copy_n(from + (hasAbove ? cut_.width : 0), std::size_t{cut_.width} * lines,
                   levels.data() + at);
@@ -87,8 +90,7 @@ bool SegmentShare<T>::Flood(unsigned share, ShareWriter& out) {
   drains.DrainPlateaus({}, seams.first.data(), seams.last.data());
   std::vector<StripMinimum> minima;
   if (IsRanked()) {
-    drains.ForEachMinimum(
-        [&](std::uint32_t first) { minima.push_back({first, levels[first]}); });
+    drains.ForEachMinimum([&](std::uint32_t first) { minima.push_back({first, levels[first]}); });
   }
   levels = {};
   seams.zone = SeamZone::Find(cells, cut_.width);
@@ -150,8 +152,8 @@ bool SegmentShare<T>::Gather(unsigned share, ShareWriter& out) {
     if (!ReadCells(1, share, cells, from)) return false;
     StripDrains drains;
     drains.Begin(std::move(cells), cut_.width);
-    LabelStrip(drains, {seams.Numbers(), share}, seams.LabelsAbove(share),
-               seams.LabelsBelow(share), labels.data());
+    LabelStrip(drains, {seams.Numbers(), share}, seams.LabelsAbove(share), seams.LabelsBelow(share),
+               labels.data());
   }
   PutLabels(out, labels.data(), cut_.width, cut_.LinesOf(share));
   SharedGraph<T> graph;
@@ -159,8 +161,9 @@ bool SegmentShare<T>::Gather(unsigned share, ShareWriter& out) {
     StripBasins basins;
     LabelPairs pairs;
     const MinimumNumbers::Labels own = seams.Numbers().LabelsOf(share);
-    basins.Find({labels.data(), labels.size(), cut_.width, seams.LabelsBelow(share), share > 0},
-                {own.first, own.count}, pairs);
+    basins.FindInParts(
+        {labels.data(), labels.size(), cut_.width, seams.LabelsBelow(share), share > 0},
+        {own.first, own.count}, pairs);
     graph.Begin(std::move(basins), SumsOf(*merge_, request_));
   }
   detail::StripProcess process("SegmentShareGraph", ipc_);

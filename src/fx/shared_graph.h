@@ -24,7 +24,7 @@ struct GraphSums {
 template <typename T>
 class SharedGraph {
  public:
-  /// What StripBasins::Find has made, with runs of the pixels in `values` alone.
+  /// The basins as StripBasins::Find made them, with runs of the pixels in `values` alone.
   StripBasins basins;
   std::vector<double> squares;  ///< by number; of those that don't continue
   std::vector<T> values;        ///< of the runs, band by band for each pixel

@@ -149,8 +149,7 @@ std::int32_t SharedSeams::Follow(const std::vector<ShareWays>& ways, unsigned sh
     }
   }
   if (label == 0) return 0;
-  return static_cast<std::int32_t>(
-      numbers_.LabelOf(share, static_cast<std::uint32_t>(label) - 1));
+  return static_cast<std::int32_t>(numbers_.LabelOf(share, static_cast<std::uint32_t>(label) - 1));
 }
 
 std::vector<bool> SharedSeams::MarkSeamBasins() const {

@@ -15,8 +15,8 @@ struct StripMinimum {
 };
 
 /// Holds where the pixels at the edges of a strip drain to, whose drains are final: a minimum, by
-/// its number in the strip and 1, or a column x of the line above as -1 - x, or of the line below as
-/// -1 - width - x; 0 for excluded ones.
+/// its number in the strip and 1, or a column x of the line above as -1 - x, or of the line below
+/// as -1 - width - x; 0 for excluded ones.
 struct VEXG_EXPORT StripWays {
   std::uint32_t minima = 0;  ///< of the strip
   std::vector<std::int32_t> firstLabels, lastLabels;

@@ -17,7 +17,7 @@ namespace {
 
 using Labels = std::vector<std::int32_t>;
 
-/// What a segmentation makes; empty where it fails.
+/// Holds the outputs of a segmentation; empty where it fails.
 struct Made {
   Labels labels;
   std::string tree;
@@ -37,7 +37,8 @@ class SegmentShareTest : public testing::Test {
   }
 
   std::string FileOf(unsigned round, unsigned share) const {
-    return (directory_.Path() / (std::to_string(round) + "-" + std::to_string(share) + ".share")).string();
+    return (directory_.Path() / (std::to_string(round) + "-" + std::to_string(share) + ".share"))
+        .string();
   }
   std::vector<std::string> FilesOf(unsigned rounds, unsigned count) const {
     std::vector<std::string> files;
@@ -76,8 +77,8 @@ class SegmentShareTest : public testing::Test {
   template <typename T>
   void Check(const MemoryPtr<T>& segment, const MemoryPtr<T>& merge, SegmentRequest request,
              unsigned stripLines, const char* what) const {
-    request.tileBytes = static_cast<unsigned>(stripLines * segment->Samples() * segment->Bands() *
-                                              sizeof(T));
+    request.tileBytes =
+        static_cast<unsigned>(stripLines * segment->Samples() * segment->Bands() * sizeof(T));
     const Made wanted = Merge<T>(segment, merge, request, nullptr);
     ASSERT_FALSE(wanted.labels.empty());
     for (const unsigned count : {1U, 2U, 3U, 7U}) {
@@ -116,7 +117,8 @@ class SegmentShareTest : public testing::Test {
 };
 
 TEST_F(SegmentShareTest, ScenesHaveTheSegmentsAndTheTreeOfOneRun) {
-  CheckAll<std::uint8_t>(MakeScene<std::uint8_t>(61, 75, 2, 3), MakeScene<std::uint8_t>(61, 75, 3, 4));
+  CheckAll<std::uint8_t>(MakeScene<std::uint8_t>(61, 75, 2, 3),
+                         MakeScene<std::uint8_t>(61, 75, 3, 4));
   const auto shorts = MakeScene<std::uint16_t>(90, 44, 1, 5);
   CheckAll<std::uint16_t>(shorts, shorts);
   const auto floats = MakeScene<float>(50, 66, 3, 6);
@@ -180,15 +182,17 @@ TEST_F(SegmentShareTest, FilesThatAreNotThoseOfAllSharesAreRefusedByName) {
     const std::string file = FileOf(round, 1);
     const std::string good = test::FileBytes(file);
     std::string flipped = good;
-    for (const std::size_t at : {std::size_t{40}, std::size_t{60}, std::size_t{90}, good.size() / 2, good.size() - 3}) {
+    for (const std::size_t at :
+         {std::size_t{40}, std::size_t{60}, std::size_t{90}, good.size() / 2, good.size() - 3}) {
       if (round == 1 && at > 90) continue;  // those are of the cells, which merging doesn't need
       flipped = good;
       flipped[at] = static_cast<char>(flipped[at] ^ 1);
       std::ofstream(file, std::ios::binary) << flipped;
       isRefused(file, done);
     }
-    for (const std::string& other : {good.substr(0, good.size() - 1), std::string(),
-                                     test::FileBytes(FileOf(round, 0)), test::FileBytes(FileOf(0, 1))}) {
+    for (const std::string& other :
+         {good.substr(0, good.size() - 1), std::string(), test::FileBytes(FileOf(round, 0)),
+          test::FileBytes(FileOf(0, 1))}) {
       std::ofstream(file, std::ios::binary) << other;
       isRefused(file, done);
     }

@@ -113,6 +113,13 @@ class Parts(PlanTest):
             self.fine("run", "-q", "-o", self.folder / "result.xml", place / each["document"])
         self.assert_same(place / "o.tif", self.single("calc"))
 
+    def test_parts_do_not_read_an_output_that_is_there_from_before(self):
+        place = self.plan("tree", "--parts", "2")
+        (place / "o.tree").write_bytes(b"old")
+        self.fine("plan", "-q", "--replace", "-o", place, "--parts", "2", *self.words("tree", place))
+        for each in self.manifest(place)["documents"]:
+            self.assertNotIn(str(place / "o.tree"), [read["file"] for read in each["inputs"]])
+
     def test_parts_come_by_their_number_or_their_memory(self):
         for options, parts in ((("--parts", "3"), 3), (("--parts", "9999"), 352),
                                (("--part-memory", "200000"), 3), (("--part-memory", "100000000"), 1)):

@@ -105,7 +105,8 @@ class Cutter {
     }
     for (const std::size_t at : slices_.SliceOf(command, cut.at)) {
       if (const Cut* const before = FindCut(at)) {
-        const unsigned rounds = before->division->rounds != nullptr ? DivisionDeclaration::kMostRounds : 1;
+        const bool hasRounds = before->division->rounds != nullptr;
+        const unsigned rounds = hasRounds ? DivisionDeclaration::kMostRounds : 1;
         cut.level = std::max(cut.level, before->level + rounds);
       }
       if (slices_.ReadsWhatIsMade(at)) return "it works on files that the job makes";
@@ -237,6 +238,9 @@ class Cutter {
     constexpr std::uint64_t kProgram = 128 << 20, kThread = 32 << 20, kTileLines = 512;
     std::uint64_t memory = kProgram + request_.threads * kThread;
     for (const Cut* const cut : cuts) {
+      const std::uint64_t pixels = std::uint64_t{cut->source.samples} * cut->source.lines;
+      memory += isMerge ? pixels * cut->division->joinBytes
+                        : (pixels / parts_ + 1) * cut->division->shareBytes;
       if (cut->division->kind != DivisionKind::kRows || cut->source.lines == 0) continue;
       const std::uint64_t line = BytesOf(*cut) / cut->source.lines;
       memory += 3 * line * kTileLines * (isMerge ? 3 : 1);
