@@ -84,13 +84,13 @@ class GetRasterPercentilesCommand final : public RasterCommand {
 };
 
 const CommandFactoryT<GetRasterPercentilesCommand> percentilesFactory(kPercentiles);
-const DivisionRegistration getRasterPercentilesDivision(
-    {.command = "GetRasterPercentilesCommand",
-     .kind = DivisionKind::kShares,
-     .source = "URI",
-     .rounds = [](unsigned dataType, const DivisionInputs&) {
-       return PercentilePasses(dataType);
-     }});
+const DivisionRegistration getRasterPercentilesDivision({.command = "GetRasterPercentilesCommand",
+                                                         .kind = DivisionKind::kShares,
+                                                         .source = "URI",
+                                                         .rounds = [](unsigned dataType,
+                                                                      const DivisionInputs&) {
+                                                           return PercentilePasses(dataType);
+                                                         }});
 
 }  // namespace
 }  // namespace lumo
