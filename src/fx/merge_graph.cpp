@@ -14,6 +14,7 @@ void MergeGraph::Begin(std::uint32_t count, std::uint32_t bands) {
     (new (at) Region)->rank = region;
     std::uninitialized_fill_n(reinterpret_cast<double*>(at + sizeof(Region)), bands, 0.0);
   }
+  many_.clear();
   limits_ = {};
   pairs_.clear();
 }

@@ -1,7 +1,7 @@
 #pragma once
 
 #include <algorithm>
-#include <numeric>
+#include <utility>
 
 #include "foundation/fault.h"
 #include "foundation/progress.h"
@@ -184,30 +184,28 @@ bool SeamlessSegmentation<T>::Gather(Graph& graph, Pairs& pairs) {
 template <typename T>
 bool SeamlessSegmentation<T>::MergeBySchedule() {
   const std::uint32_t count = watershed_.Count();
-  LambdaSchedule schedule;
-  schedule.Begin(count + 1, merge_->Bands());
-  schedule.Limit(request_.growth);
-  schedule.CompareBy(watershed_.TakeRanks());
+  std::optional<LambdaSchedule> schedule(std::in_place);
+  schedule->Begin(count + 1, merge_->Bands());
+  schedule->Limit(request_.growth);
+  schedule->CompareBy(watershed_.TakeRanks());
   if (tree_) BeginBasins();
-  schedule.ReservePairs(std::size_t{3} * count);  // more pairs of areas touch in no plane
-  if (!Gather(schedule, schedule)) return false;
+  schedule->ReservePairs(std::size_t{3} * count);  // more pairs of areas touch in no plane
+  if (!Gather(*schedule, *schedule)) return false;
   if (IsAborted()) return true;
-  schedule.Build();
+  schedule->Build();
   if (tree_) {
-    CenterSquares(schedule);
-    if (!KeepBasins([&](std::uint32_t label) { return schedule.AreaOf(label); })) return false;
+    CenterSquares(*schedule);
+    if (!KeepBasins([&](std::uint32_t label) { return schedule->AreaOf(label); })) return false;
   }
-  return DoSteps(schedule) && (!tree_ || IsAborted() || CutOwnTree());
+  if (!DoSteps(*schedule)) return false;
+  schedule.reset();  // the cut takes memory as well
+  return !tree_ || IsAborted() || CutOwnTree();
 }
 
 /// Merges up to the threshold, or with a tree to the end.
 template <typename T>
 bool SeamlessSegmentation<T>::DoSteps(LambdaSchedule& schedule) {
   const std::uint32_t count = watershed_.Count();
-  if (!tree_) {
-    roots_.resize(std::size_t{count} + 1);
-    std::iota(roots_.begin(), roots_.end(), 0U);
-  }
   const IPC pass = NextPass();
   LambdaSchedule::Merge merge;
   const bool doesSteps = request_.mergeValue > 0 || tree_;
@@ -215,9 +213,8 @@ bool SeamlessSegmentation<T>::DoSteps(LambdaSchedule& schedule) {
     if (tree_) {
       const TreeMerge kept{merge.lambda, order_[merge.lower], order_[merge.higher], merge.border};
       if (!tree_->AddMerge(kept)) return false;
-    } else {
-      roots_[merge.higher] = merge.lower;
-      if (merge.lambda > request_.mergeValue) break;
+    } else if (merge.lambda > request_.mergeValue) {
+      break;
     }
     constexpr std::uint32_t kEvery = 4096;
     if (step % kEvery != 0) continue;
@@ -225,12 +222,10 @@ bool SeamlessSegmentation<T>::DoSteps(LambdaSchedule& schedule) {
     pass.progress->Update(static_cast<double>(step) / count);
   }
   if (tree_) return true;
-  schedule.JoinSmall(request_.leastPixels,
-                     [this](const auto& join) { roots_[join.higher] = join.lower; });
+  schedule.JoinSmall(request_.leastPixels, [](const auto& /*join*/) {});
   for (std::uint32_t label = 1; label <= count; ++label) {
-    std::uint32_t root = label;
-    while (roots_[root] != root) root = roots_[root] = roots_[roots_[root]];
-    roots_[label] = root;
+    const std::uint32_t root = schedule.RootOf(label);
+    if (root != label) forest_.Join(label, root);
   }
   return true;
 }
