@@ -108,9 +108,6 @@ void LambdaSchedule::Build() {
     });
   };
   const std::uint32_t count = graph_.Count();
-  for (std::uint32_t i = 0; i < graph_.PairCount(); ++i) {
-    for (const std::uint32_t region : graph_.PairOf(i).ids) graph_.Link(i, region);
-  }
   forEach(count, [this](std::uint32_t label) {
     const double area = graph_.AreaOf(label);
     if (area == 0) return;

@@ -104,7 +104,7 @@ class VEXG_EXPORT MergeGraph {
   bool IsHub(std::uint32_t region) const { return RegionOf(region).isHub != 0; }
 
   void ReservePairs(std::size_t count) { pairs_.reserve(count); }
-  /// Adds a pair, which stands in no list yet.
+  /// Adds a pair, and puts it into the lists of its regions.
   void AddPair(const LabelPair& pair);
   std::size_t PairCount() const { return pairs_.size(); }
   Pair& PairOf(std::uint32_t pair) { return pairs_[pair]; }

@@ -26,11 +26,10 @@ String MemoryFault(std::uint64_t basins, std::uint64_t needed, std::uint64_t all
 }
 
 unsigned SeamlessStripBytes(const BasicRaster& raster, std::size_t elementBytes) {
-  constexpr std::uint64_t kLeastLines = 32, kMost = 1U << 28U;
+  constexpr std::uint64_t kLeastLines = 32, kLeast = 1U << 22U, kMost = 1U << 28U;
   const std::uint64_t lineBytes =
       std::uint64_t{raster.Samples()} * std::max(raster.Bands(), 1U) * elementBytes;
-  return static_cast<unsigned>(
-      std::clamp<std::uint64_t>(kLeastLines * lineBytes, kTileBudget, kMost));
+  return static_cast<unsigned>(std::clamp(kLeastLines * lineBytes, kLeast, kMost));
 }
 
 unsigned SeamlessStripLines(const BasicRaster& raster, std::size_t elementBytes,

@@ -106,7 +106,8 @@ VEXG_EXPORT std::uint64_t MemoryOfMerging(std::uint64_t basins, unsigned bands,
 /// Says that merging would take more memory than it may.
 VEXG_EXPORT String MemoryFault(std::uint64_t basins, std::uint64_t needed, std::uint64_t allowed);
 
-/// A budget for strips: that of tiles, or 32 lines where they are more, up to 256 MiB.
+/// A budget for strips: 4 MiB, or 32 lines where they are more, up to 256 MiB. Several strips are
+/// in memory at once, beside the graph.
 VEXG_EXPORT unsigned SeamlessStripBytes(const BasicRaster& raster, std::size_t elementBytes);
 
 /// The lines of the strips that fill a budget: at least one, and at most what a strip may have.
