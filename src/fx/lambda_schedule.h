@@ -103,8 +103,8 @@ class VEXG_EXPORT LambdaSchedule {
     return MergeGraph::BytesOfRegion(bands);
   }
   static constexpr std::size_t BytesOfPair() { return sizeof(MergeGraph::Pair); }
-  /// The bytes that the queue takes for each segment at most, where costs differ.
-  static constexpr std::size_t BytesInQueue() { return MergeQueue::BytesOfEntry(); }
+  /// The bytes that the queue takes for each segment at most: half as many where costs differ.
+  static constexpr std::size_t BytesInQueue() { return sizeof(MergeQueue::Entry); }
 
   /// Merges the next pair. @return false when there is none.
   bool Step(Merge& merge);

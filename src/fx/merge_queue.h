@@ -28,9 +28,6 @@ class VEXG_EXPORT MergeQueue {
     }
   };
 
-  /// The bytes that an entry takes for which it isn't known yet what it costs to the bit.
-  static constexpr std::size_t BytesOfEntry() { return sizeof(Key); }
-
   void Clear();
   void Reserve(std::size_t count) { later_.reserve(kFront + count); }
   /// How many entries there are, and how many there is room for.

@@ -23,11 +23,13 @@ namespace detail {
 
 inline constexpr unsigned kSeamlessPasses = 4;  // basins, graph, merging, labels
 
-/// The labels of a strip, and the neighbours among them.
+/// The labels of a strip, and the neighbours among them. Lent, since the memory of strips that come
+/// and go stays with each thread.
 struct StripGraph {
   std::vector<std::int32_t> labels;
-  std::vector<LabelPair> pairs;
+  LabelPairs pairs;
 };
+using LentGraph = std::shared_ptr<ScratchPool<StripGraph>::Loan>;
 
 inline void AddTo(LambdaSchedule& schedule, std::uint32_t label, const auto* values,
                   const unsigned char* /*states*/, unsigned /*bands*/) {
@@ -135,38 +137,37 @@ bool SeamlessSegmentation<T>::Gather(Graph& graph, Pairs& pairs) {
   if (!watershed_.MarkSeamBasins(atSeams)) return false;
   detail::PairJoin<Pairs> join(pairs, std::move(atSeams));
   const RasterIteratorPtr<T> strips(new RasterIterator<T>(merge_, Strips(0)));
+  ScratchPool<detail::StripGraph> pool;
   detail::StripProcess process("SeamlessGraph", NextPass());
   const auto tiles = process.Read(strips);
-  const auto graphs = process.template TakeSlot<ValueSlot<detail::StripGraph>>();
-  ScratchPool<LabelPairs> scratch;
-  process.Add("Neighbours", StageOrder::kSeveralAtOnce,
-              [&](ArgList& token, const AbortFlag* abort) {
-                const unsigned strip = tiles.In(token)->Index().second;
-                const std::uint32_t width = watershed_.Width();
-                detail::StripGraph made;
-                made.labels.resize(std::size_t{width} * watershed_.LinesOf(strip));
-                std::vector<std::int32_t> below;
-                if (!watershed_.Label(strip, made.labels.data()) ||
-                    !watershed_.ReadLabelsBelow(strip, below)) {
-                  return false;
-                }
-                if (abort != nullptr && abort->IsSet()) return false;
-                const auto found = scratch.Borrow();
-                found->Begin(watershed_.Count() / watershed_.Strips() + 1);
-                ForEachStripEdge(made.labels.data(), made.labels.size(), width,
-                                 below.empty() ? nullptr : below.data(),
-                                 [&](std::uint32_t a, std::uint32_t b) { found->AddEdge(a, b); });
-                made.pairs = found->Pairs();
-                return graphs.Put(token, std::move(made));
-              });
+  const auto graphs = process.template TakeSlot<ValueSlot<detail::LentGraph>>();
+  process.Add(
+      "Neighbours", StageOrder::kSeveralAtOnce, [&](ArgList& token, const AbortFlag* abort) {
+        const unsigned strip = tiles.In(token)->Index().second;
+        const std::uint32_t width = watershed_.Width();
+        detail::LentGraph made(new auto(pool.Borrow()));
+        auto& [labels, found] = **made;
+        labels.resize(std::size_t{width} * watershed_.LinesOf(strip));
+        std::vector<std::int32_t> below;
+        if (!watershed_.Label(strip, labels.data()) || !watershed_.ReadLabelsBelow(strip, below)) {
+          return false;
+        }
+        if (abort != nullptr && abort->IsSet()) return false;
+        found.Begin(watershed_.Count() / watershed_.Strips() + 1);
+        ForEachStripEdge(labels.data(), labels.size(), width,
+                         below.empty() ? nullptr : below.data(),
+                         [&](std::uint32_t a, std::uint32_t b) { found.AddEdge(a, b); });
+        return graphs.Put(token, std::move(made));
+      });
   process.Add("Sums", StageOrder::kOneByOne, [&](ArgList& token, const AbortFlag*) {
     const TilePtr<T> tile = tiles.In(token);
-    const detail::StripGraph* const made = graphs.In(token);
-    if (!tile || !tile->IsValid() || made == nullptr) return false;
+    const detail::LentGraph* const lent = graphs.In(token);
+    if (!tile || !tile->IsValid() || lent == nullptr) return false;
+    const detail::StripGraph& made = ***lent;
     const unsigned bands = tile->Bands();
     const T* values = tile->PixelArray().GetData();
     const unsigned char* states = tile->StateArray().GetData();
-    for (const std::int32_t label : made->labels) {
+    for (const std::int32_t label : made.labels) {
       if (label != 0) {
         detail::AddTo(graph, static_cast<std::uint32_t>(label), values, states, bands);
         if (tree_) AddSquares(static_cast<std::uint32_t>(label), values, bands);
@@ -174,8 +175,8 @@ bool SeamlessSegmentation<T>::Gather(Graph& graph, Pairs& pairs) {
       values += bands;
       states += bands;
     }
-    for (const LabelPair& pair : made->pairs) join.Add(pair);
-    return !tree_ || KeepLines(made->labels);
+    for (const LabelPair& pair : made.pairs.Pairs()) join.Add(pair);
+    return !tree_ || KeepLines(made.labels);
   });
   process.Close();
   return process.RunProcess(process.kHere);
