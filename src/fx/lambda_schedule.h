@@ -74,7 +74,7 @@ class VEXG_EXPORT LambdaSchedule {
   void AddSums(std::uint32_t label, double pixels, const double* sums) {
     double* const to = graph_.MeansOf(label);
     for (std::uint32_t band = 0; band < graph_.Bands(); ++band) to[band] += sums[band];
-    graph_.RegionOf(label).area += pixels;
+    graph_.SetArea(label, graph_.AreaOf(label) + pixels);
   }
 
   /// Makes room for pairs of neighbours.
