@@ -1,6 +1,8 @@
 #pragma once
 
 #include <cstdint>
+#include <functional>
+#include <string>
 #include <vector>
 
 #include "commands/declaration.h"
@@ -22,18 +24,30 @@ enum class DivisionKind : unsigned {
   kShares  ///< by its inputs of ShareInputs
 };
 
+/// Gives the text of an input of a command in a document; null for one that isn't there.
+using DivisionInputs = std::function<const std::string*(const std::string& input)>;
+
 /// Says what becomes of a command in a job that is divided.
 struct DivisionDeclaration {
   const char* command;  ///< class name
   DivisionKind kind = DivisionKind::kNone;
-  const char* source = "";           ///< input that names the raster; kFirst with it: by shares
-  const char* target = "";           ///< input that names the raster to write, of kRows
+  const char* source = "";  ///< input that names the raster; kFirst with it: by shares
+  const char* target = "";  ///< input that names the raster to write; kShares don't need it
   std::vector<const char*> makes{};  ///< inputs that name files which the command makes
   const char* makesWhen = "";        ///< input that has to be 1 for that; empty for none
   const char* dividesWhen = "";      ///< input that has to be Exact for shares; empty for none
-  /// Of shares that are done in several rounds, how many there are for a data type: those of a
-  /// round get the files of all rounds before as ShareFiles. Null for one round.
-  unsigned (*rounds)(unsigned dataType) = nullptr;
+  /// Of shares that are done in several rounds, how many there are for a data type, at most
+  /// kMostRounds: those of a round get the files of all rounds before as ShareFiles. Null for one
+  /// round.
+  unsigned (*rounds)(unsigned dataType, const DivisionInputs& inputs) = nullptr;
+  /// Says why a command with these inputs can't be divided; null where it can. Null for all that
+  /// can.
+  const char* (*whyNot)(const DivisionInputs& inputs) = nullptr;
+
+  /// Bytes of memory that a share takes for each of its pixels, and joining for each of all.
+  unsigned shareBytes = 0, joinBytes = 0;
+
+  static constexpr unsigned kMostRounds = 4;
 };
 
 /// Registers a division: one static object beside the command.

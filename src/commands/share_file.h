@@ -12,7 +12,7 @@ namespace lumo {
 
 // Files of shares: what one share of the work of a command has come to, for the command that joins
 // all of them. A header (magic, checksum, key, share) stands in front of numbers in the byte order
-// of the machine.
+// of the machine. They may be in several sections, each of which is read on its own.
 
 /// Gathers the numbers of a share and writes them to a file.
 ///
@@ -36,6 +36,8 @@ class VEXG_EXPORT ShareWriter {
     static_assert(std::has_unique_object_representations_v<T> || std::is_floating_point_v<T>);
     PutBytes(numbers, count * sizeof(T));
   }
+  /// Ends the section; what comes is in the next one.
+  void EndSection() { sections_.emplace_back(); }
 
   /// Makes the file, in place of an older one.
   /// @param key  says of what command, raster and inputs the share is.
@@ -45,15 +47,17 @@ class VEXG_EXPORT ShareWriter {
  private:
   void PutBytes(const void* data, std::size_t bytes);
 
-  std::vector<unsigned char> bytes_;
+  std::vector<std::vector<unsigned char>> sections_ = std::vector<std::vector<unsigned char>>(1);
 };
 
-/// Reads the numbers of a share again, in the order in which they were put.
+/// Reads the numbers of a share again, or of one of its sections, in the order in which they were
+/// put.
 class VEXG_EXPORT ShareReader {
  public:
-  /// Reads a file. @return false, with the fault set, when it can't be read, is damaged, or isn't
-  /// of this key and share.
-  bool Open(const std::string& path, const std::string& key, const Share& share);
+  /// Reads a section of a file. @return false, with the fault set, when it can't be read, is
+  /// damaged, isn't of this key and share, or has no such section.
+  bool Open(const std::string& path, const std::string& key, const Share& share,
+            std::uint64_t section = 0);
 
   /// The next number. False behind the end.
   template <typename T>

@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <cmath>
+#include <utility>
 
 #include "tasks/parallel.h"
 
@@ -9,7 +10,8 @@ namespace lumo {
 
 void LambdaSchedule::Begin(std::uint32_t labelCount, std::uint32_t bands) {
   graph_.Begin(labelCount, bands);
-  queue_.clear();
+  queue_.Clear();
+  ahead_.Clear();
   hubs_.Clear();
   hubNeighbours_ = MergeHubs::kNeighbours;
   grown_.clear();
@@ -45,13 +47,11 @@ void LambdaSchedule::Drop(Pair& chosen) {
 }
 
 /// Puts a pair into the queue, which holds fewer pairs that count than there are segments.
-void LambdaSchedule::Push(const Queued& entry) {
-  if (queue_.size() == queue_.capacity() && queue_.size() >= graph_.Count()) {
-    std::erase_if(queue_, [this](const Queued& queued) { return !IsCurrent(queued); });
-    std::make_heap(queue_.begin(), queue_.end());
+void LambdaSchedule::Push(const MergeQueue::Entry& entry) {
+  if (queue_.Size() >= queue_.Room() && queue_.Size() >= graph_.Count()) {
+    queue_.Clean([this](std::uint32_t pair) { return QueuedCostOf(pair); });
   }
-  queue_.push_back(entry);
-  std::push_heap(queue_.begin(), queue_.end());
+  queue_.Push(entry);
 }
 
 /// The pair of a region that costs least; of equal costs the one with the lowest neighbour.
@@ -108,11 +108,8 @@ void LambdaSchedule::Build() {
     });
   };
   const std::uint32_t count = graph_.Count();
-  for (std::uint32_t i = 0; i < graph_.PairCount(); ++i) {
-    for (const std::uint32_t region : graph_.PairOf(i).ids) graph_.Link(i, region);
-  }
   forEach(count, [this](std::uint32_t label) {
-    const double area = graph_.RegionOf(label).area;
+    const double area = graph_.AreaOf(label);
     if (area == 0) return;
     double* const means = graph_.MeansOf(label);
     for (std::uint32_t band = 0; band < graph_.Bands(); ++band) means[band] /= area;
@@ -121,11 +118,11 @@ void LambdaSchedule::Build() {
     graph_.PairOf(pair).cost = graph_.CostOf(graph_.PairOf(pair));
   });
   forEach(count, [this](std::uint32_t label) {
-    if (label != 0 && graph_.RegionOf(label).area > 0) {
+    if (label != 0 && graph_.AreaOf(label) > 0) {
       graph_.RegionOf(label).minimum = NearestOf(label);
     }
   });
-  queue_.reserve(count);
+  queue_.Reserve(count);
   for (std::uint32_t label = 1; label < count; ++label) {
     const std::uint32_t nearest = graph_.RegionOf(label).minimum;
     if (nearest != kNone) Choose(label, nearest);
@@ -134,7 +131,7 @@ void LambdaSchedule::Build() {
 
 /// Gives the region that is kept the means and the pixels of both. @return how far its means move.
 double LambdaSchedule::JoinMeans(std::uint32_t lower, std::uint32_t higher, std::uint32_t kept) {
-  const double a = graph_.RegionOf(lower).area, b = graph_.RegionOf(higher).area;
+  const double a = graph_.AreaOf(lower), b = graph_.AreaOf(higher);
   const double* const u = graph_.MeansOf(lower);
   const double* const v = graph_.MeansOf(higher);
   double* const means = graph_.MeansOf(kept);
@@ -144,20 +141,21 @@ double LambdaSchedule::JoinMeans(std::uint32_t lower, std::uint32_t higher, std:
     means[band] = mean;
     sum += by * by;
   }
-  graph_.RegionOf(kept).area = a + b;
+  graph_.SetArea(kept, a + b);
   return std::sqrt(sum);
 }
 
 /// Gives the pairs of the region that goes to the other one, joining those with common neighbours.
 void LambdaSchedule::TakeOverPairs(const Joined& joined) {
   const auto [kept, gone] = joined;
+  neighbours_.Clear();
   graph_.ForEachPair(kept, [&, kept = kept](std::uint32_t pair) {
-    graph_.RegionOf(graph_.PairOf(pair).Other(kept)).pairTo = pair;
+    neighbours_.Add(graph_.PairOf(pair).Other(kept), pair);
   });
   graph_.TakePairs(gone, [&, kept = kept, gone = gone](std::uint32_t pair) {
     Pair& taken = graph_.PairOf(pair);
     const unsigned slot = taken.SlotOf(gone);
-    const std::uint32_t common = graph_.RegionOf(taken.ids[1 - slot]).pairTo;
+    const std::uint32_t common = neighbours_.PairTo(taken.ids[1 - slot]);
     if (common != kNone) {
       graph_.PairOf(common).length += taken.length;
       taken.length = 0;
@@ -165,9 +163,6 @@ void LambdaSchedule::TakeOverPairs(const Joined& joined) {
       taken.ids[slot] = kept;
       graph_.Link(pair, kept);
     }
-  });
-  graph_.ForEachPair(kept, [&, kept = kept](std::uint32_t pair) {
-    graph_.RegionOf(graph_.PairOf(pair).Other(kept)).pairTo = kNone;
   });
 }
 
@@ -189,12 +184,28 @@ LambdaSchedule::Joined LambdaSchedule::Join(std::uint32_t pair, Merge& merge) {
   changed_.clear();
   if (!isLowerHub && !isHigherHub) {
     TakeOverPairs(joined);
-    return joined;
+  } else {
+    hubs_.TakeOver(joined.kept, joined.gone, !keepsHigher, changed_);
+    hubs_.SetLabel(joined.kept, merge.lower);
+    graph_.RegionOf(joined.kept).rank = graph_.RankOf(lower);
   }
-  hubs_.TakeOver(joined.kept, joined.gone, !keepsHigher, changed_);
-  hubs_.SetLabel(joined.kept, merge.lower);
-  graph_.RegionOf(joined.kept).rank = graph_.RankOf(lower);
+  graph_.Forget(joined.gone, merge.lower);
+  // A hub that has its number knows its label itself.
+  if (graph_.AreaOf(merge.higher) == 0) graph_.Forget(merge.higher, merge.lower);
   return joined;
+}
+
+std::uint32_t LambdaSchedule::RootOf(std::uint32_t label) {
+  const auto next = [this](std::uint32_t at) {
+    return graph_.AreaOf(at) == 0 ? graph_.RankOf(at) : hubs_.LabelOf(at);
+  };
+  std::uint32_t root = label;
+  for (std::uint32_t at = next(root); at != root; at = next(root)) root = at;
+  while (label != root) {
+    const std::uint32_t at = std::exchange(label, next(label));
+    if (graph_.AreaOf(at) == 0) graph_.Forget(at, root);
+  }
+  return root;
 }
 
 /// Looks whether the nearest of a neighbour of the segment of a merge has changed.
@@ -243,33 +254,14 @@ bool LambdaSchedule::FindCheapest(std::uint32_t region, std::uint32_t& pair, dou
   return pair != kNone;
 }
 
-/// Has the processor fetch what the next steps are likely to need, while this one goes on.
-void LambdaSchedule::FetchNext() const {
-  constexpr std::size_t kAhead = 7;  // the three uppermost rows of the heap
-  for (std::size_t i = 1; i < std::min(kAhead, queue_.size()); ++i) {
-    const Pair& pair = graph_.PairOf(queue_[i].pair);
-    if (i > 2) {
-      __builtin_prefetch(&pair);
-      continue;
-    }
-    for (const std::uint32_t region : pair.ids) {
-      const std::uint32_t first = graph_.RegionOf(region).first;
-      __builtin_prefetch(&graph_.RegionOf(region));
-      if (first != kNone) __builtin_prefetch(&graph_.PairOf(first));
-    }
-  }
-}
-
 bool LambdaSchedule::Step(Merge& merge) {
-  const auto pop = [this] {
-    std::pop_heap(queue_.begin(), queue_.end());
-    queue_.pop_back();
-  };
-  while (!queue_.empty() && !IsCurrent(queue_.front())) pop();
-  if (queue_.empty()) return false;
-  const Queued top = queue_.front();
-  pop();
-  FetchNext();
+  ahead_.Go();
+  MergeQueue::Entry top{};
+  const bool isAny = queue_.Pop(
+      top, [this](std::uint32_t pair) { return QueuedCostOf(pair); },
+      [this](std::uint32_t pair) { __builtin_prefetch(&graph_.PairOf(pair)); },
+      [this](std::uint32_t pair) { ahead_.Add(pair); });
+  if (!isAny) return false;
   graph_.PairOf(top.pair).isQueued = false;
   merge.lambda = top.cost;
   const Joined joined = Join(top.pair, merge);

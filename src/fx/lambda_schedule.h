@@ -6,8 +6,11 @@
 #include <queue>
 #include <vector>
 
+#include "fx/merge_ahead.h"
 #include "fx/merge_graph.h"
 #include "fx/merge_hubs.h"
+#include "fx/merge_queue.h"
+#include "fx/neighbour_table.h"
 
 namespace lumo {
 
@@ -64,7 +67,14 @@ class VEXG_EXPORT LambdaSchedule {
     for (std::uint32_t band = 0; band < graph_.Bands(); ++band) {
       sums[band] += static_cast<double>(values[band * bandStride]);
     }
-    graph_.RegionOf(label).area += 1.0;
+    graph_.AddPixel(label);
+  }
+
+  /// Adds pixels to their segment. @param sums  of their values, one for each band.
+  void AddSums(std::uint32_t label, double pixels, const double* sums) {
+    double* const to = graph_.MeansOf(label);
+    for (std::uint32_t band = 0; band < graph_.Bands(); ++band) to[band] += sums[band];
+    graph_.SetArea(label, graph_.AreaOf(label) + pixels);
   }
 
   /// Makes room for pairs of neighbours.
@@ -83,7 +93,7 @@ class VEXG_EXPORT LambdaSchedule {
   void Build(const std::vector<LabelPair>& pairs);
 
   /// The pixels of a segment, and the mean of one of its bands. Behind Build, before any step.
-  double AreaOf(std::uint32_t label) const { return graph_.RegionOf(label).area; }
+  double AreaOf(std::uint32_t label) const { return graph_.AreaOf(label); }
   double MeanOf(std::uint32_t label, std::uint32_t band) const {
     return graph_.MeansOf(label)[band];
   }
@@ -93,8 +103,8 @@ class VEXG_EXPORT LambdaSchedule {
     return MergeGraph::BytesOfRegion(bands);
   }
   static constexpr std::size_t BytesOfPair() { return sizeof(MergeGraph::Pair); }
-  /// The bytes that the queue takes for each segment at most.
-  static constexpr std::size_t BytesInQueue() { return sizeof(Queued); }
+  /// The bytes that the queue takes for each segment at most: half as many where costs differ.
+  static constexpr std::size_t BytesInQueue() { return sizeof(MergeQueue::Entry); }
 
   /// Merges the next pair. @return false when there is none.
   bool Step(Merge& merge);
@@ -106,19 +116,13 @@ class VEXG_EXPORT LambdaSchedule {
   template <typename Visit>
   void JoinSmall(double least, Visit&& visit);
 
+  /// The label of the segment that one has become part of by now, as merges call it. Each label
+  /// has a pixel.
+  std::uint32_t RootOf(std::uint32_t label);
+
  private:
   using Pair = MergeGraph::Pair;
   static constexpr std::uint32_t kNone = MergeGraph::kNone;
-
-  /// A pair in the queue. It is out of date when the pair has left the queue since, or has come
-  /// back at another cost.
-  struct Queued {
-    double cost;
-    std::uint32_t pair;
-    bool operator<(const Queued& other) const {  // the cheapest on top
-      return cost != other.cost ? cost > other.cost : pair > other.pair;
-    }
-  };
 
   /// Two regions of which one is left, by their numbers in the graph.
   struct Joined {
@@ -126,9 +130,10 @@ class VEXG_EXPORT LambdaSchedule {
     std::uint32_t gone;
   };
 
-  bool IsCurrent(const Queued& entry) const {
-    const Pair& pair = graph_.PairOf(entry.pair);
-    return pair.isQueued && pair.cost == entry.cost;
+  /// What a pair costs that is in the queue; below 0 for another. The cost of one doesn't change.
+  double QueuedCostOf(std::uint32_t pair) const {
+    const Pair& at = graph_.PairOf(pair);
+    return at.isQueued ? at.cost : -1;
   }
   Joined Join(std::uint32_t pair, Merge& merge);
   double JoinMeans(std::uint32_t lower, std::uint32_t higher, std::uint32_t kept);
@@ -138,8 +143,7 @@ class VEXG_EXPORT LambdaSchedule {
   static void Drop(Pair& chosen);
   std::uint32_t NearestOf(std::uint32_t region);
   void FindNearest(std::uint32_t region);
-  void Push(const Queued& entry);
-  void FetchNext() const;
+  void Push(const MergeQueue::Entry& entry);
   void UpdateNearest(std::uint32_t pair, const Joined& joined);
   void UpdateAround(const Joined& joined);
   void UpdateAroundHub(const Joined& joined);
@@ -155,8 +159,10 @@ class VEXG_EXPORT LambdaSchedule {
     }
   };
 
-  MergeGraph graph_;           // a region that is no hub has the number of its label
-  std::vector<Queued> queue_;  // a heap
+  MergeGraph graph_;  // a region that is no hub has the number of its label
+  MergeQueue queue_;
+  MergeAhead ahead_{graph_};
+  NeighbourTable neighbours_;  // of the segment that is kept
   MergeHubs hubs_{graph_};
   std::uint32_t hubNeighbours_ = MergeHubs::kNeighbours;
   double moved_ = 0;                      // by how much the last merge moved the means of a hub
@@ -173,19 +179,18 @@ void LambdaSchedule::JoinSmall(double least, Visit&& visit) {
   graph_.Limit(limits);
   std::priority_queue<Small> small;
   const auto note = [&](std::uint32_t region) {
-    const double area = graph_.RegionOf(region).area;
+    const double area = graph_.AreaOf(region);
     if (area > 0 && area < least) small.push({area, graph_.RankOf(region), region});
   };
   for (std::uint32_t region = 1; region < graph_.Count(); ++region) note(region);
   while (!small.empty()) {
     const Small top = small.top();
     small.pop();
-    if (graph_.RegionOf(top.region).area != top.area) continue;  // it has joined another, or grown
+    if (graph_.AreaOf(top.region) != top.area) continue;  // it has joined another, or grown
     Merge merge;
     std::uint32_t pair = kNone;
     if (!FindCheapest(top.region, pair, merge.lambda)) continue;
     const Joined joined = Join(pair, merge);
-    graph_.RegionOf(joined.gone).area = 0;
     note(joined.kept);
     visit(merge);
   }

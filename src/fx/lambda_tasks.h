@@ -53,12 +53,18 @@ class RasterFullLambdaScheduleTask final : public StatelessTask {
   ScratchPool<Work> work_;
 };
 
+/// Counts costs into bins of m / (n - 1), m the largest, and makes the counts cumulative. Costs
+/// that are not finite do not count; nothing happens without one above 0.
+VEXG_EXPORT void CountLambdas(const std::vector<double>& lambdas, Array<unsigned>& histogram,
+                              double& binSize);
+
 /// Merges all segments, changes no labels, and counts the costs of all tiles. When the task goes,
 /// the outputs hold what was counted; they stay where no cost was above 0.
 ///
 /// Fourth and fifth setup argument: Array<unsigned>, which receives cumulative counts of the costs
 /// in n bins from 0 on; Scalar<double>, which receives the width of the bins, the largest cost
-/// divided by n - 1. Exists for EightTypes and int.
+/// divided by n - 1. A sixth one, a Scalar of a pointer to a vector of double, if there is one that
+/// isn't null, has the costs themselves put there instead. Exists for EightTypes and int.
 ///
 /// Memory: 8 bytes for each merge of the whole raster.
 template <typename T, typename L>
@@ -77,6 +83,7 @@ class RasterFullLambdaScheduleEstimateTask final : public StatelessTask {
   LambdaSetup setup_;
   Pointer<Array<unsigned>> histogram_;
   ScalarPtr<double> binSize_;
+  std::vector<double>* taken_ = nullptr;  // where the costs go
   ScratchPool<Work> work_;
   std::mutex mutex_;
   std::vector<double> lambdas_;  // under mutex_

@@ -91,22 +91,6 @@ bool RunSchedule(LambdaSchedule& schedule, const AbortFlag* abort, GoOn&& goOn) 
   return true;
 }
 
-/// Counts costs into bins of m / (n - 1), m the largest, and makes the counts cumulative. Costs
-/// that are not finite do not count; nothing happens without one above 0.
-inline void CountLambdas(const std::vector<double>& lambdas, Array<unsigned>& histogram,
-                         double& binSize) {
-  const auto largest = std::max_element(lambdas.begin(), lambdas.end());
-  const unsigned bins = histogram.GetCount();
-  if (largest == lambdas.end() || !(*largest > 0) || bins < 2) return;
-  binSize = *largest / (bins - 1);
-  std::fill(histogram.begin(), histogram.end(), 0U);
-  for (const double lambda : lambdas) {
-    if (!(lambda >= 0 && lambda <= *largest)) continue;
-    ++histogram[std::min(bins - 1, static_cast<unsigned>(lambda / binSize))];
-  }
-  std::partial_sum(histogram.begin(), histogram.end(), histogram.begin());
-}
-
 }  // namespace detail
 
 inline bool LambdaSetup::Read(const ArgList& setup) {
@@ -169,11 +153,17 @@ RasterFullLambdaScheduleEstimateTask<T, L>::RasterFullLambdaScheduleEstimateTask
       histogram_(FindSetupArray<unsigned>(setup, 3)),
       binSize_(setup.Get(4)) {
   if (!setup_.Read(setup) || !histogram_ || !binSize_) SetErrorState(TaskErrorBadParams());
+  ReadSetup(setup, 5, taken_);
 }
 
 template <typename T, typename L>
 RasterFullLambdaScheduleEstimateTask<T, L>::~RasterFullLambdaScheduleEstimateTask() {
-  if (!HasError()) detail::CountLambdas(lambdas_, *histogram_, binSize_->value);
+  if (HasError()) return;
+  if (taken_ != nullptr) {
+    taken_->insert(taken_->end(), lambdas_.begin(), lambdas_.end());
+  } else {
+    CountLambdas(lambdas_, *histogram_, binSize_->value);
+  }
 }
 
 template <typename T, typename L>

@@ -14,6 +14,7 @@ void MergeGraph::Begin(std::uint32_t count, std::uint32_t bands) {
     (new (at) Region)->rank = region;
     std::uninitialized_fill_n(reinterpret_cast<double*>(at + sizeof(Region)), bands, 0.0);
   }
+  many_.clear();
   limits_ = {};
   pairs_.clear();
 }
@@ -23,6 +24,9 @@ void MergeGraph::AddPair(const LabelPair& pair) {
   added.ids[0] = pair.low;
   added.ids[1] = pair.high;
   added.length = pair.length;
+  const std::uint32_t number = NumberOf(added);
+  Link(number, pair.low);
+  Link(number, pair.high);
 }
 
 void MergeGraph::Link(std::uint32_t pair, std::uint32_t region) {

@@ -4,6 +4,7 @@
 #include <cstddef>
 #include <cstdint>
 #include <new>
+#include <unordered_map>
 #include <utility>
 #include <vector>
 
@@ -24,12 +25,11 @@ class VEXG_EXPORT MergeGraph {
 
   /// A segment; the means of its bands follow it in memory, as they are read with it.
   struct Region {
-    double area = 0;
+    std::uint32_t pixels = 0;       ///< see AreaOf
     std::uint32_t minimum = kNone;  ///< pair
     std::uint32_t first = kNone;    ///< of its pairs
-    std::uint32_t pairTo = kNone;   ///< the pair with the region that is merged into
-    std::uint32_t rank : 31 = 0;
-    std::uint32_t isHub : 1 = 0;  ///< see MergeHubs
+    std::uint32_t rank : 31 = 0;    ///< of one that is gone: see Forget
+    std::uint32_t isHub : 1 = 0;    ///< see MergeHubs
   };
 
   /// Slot i of the links belongs to ids[i]. A pair that was merged, or joined to another, has no
@@ -49,7 +49,7 @@ class VEXG_EXPORT MergeGraph {
     bool IsPlain() const { return watch == kPlain; }
   };
   static constexpr std::uint8_t kPlain = 0xFF;
-  static_assert(sizeof(Region) == 24 && sizeof(Pair) == 32);
+  static_assert(sizeof(Region) == 16 && sizeof(Pair) == 32);
 
   /// Forgets everything, and makes room for regions below `count`, of `bands` bands. The rank of
   /// each is its number.
@@ -77,11 +77,34 @@ class VEXG_EXPORT MergeGraph {
     return std::launder(
         reinterpret_cast<const double*>(regions_.data() + region * stride_ + sizeof(Region)));
   }
+  /// The pixels of a region: any number of them.
+  double AreaOf(std::uint32_t region) const {
+    const std::uint32_t pixels = RegionOf(region).pixels;
+    return pixels != kMany ? pixels : many_.at(region);
+  }
+  void SetArea(std::uint32_t region, double area) {
+    const bool isMany = !(area < kMany);
+    if (isMany) many_[region] = area;
+    RegionOf(region).pixels = isMany ? kMany : static_cast<std::uint32_t>(area);
+  }
+  void AddPixel(std::uint32_t region) {
+    std::uint32_t& pixels = RegionOf(region).pixels;
+    if (pixels < kMany - 1) {
+      ++pixels;
+    } else {
+      SetArea(region, AreaOf(region) + 1);
+    }
+  }
+  /// Makes a region one of no pixels, which is gone. @param label  takes the place of its rank.
+  void Forget(std::uint32_t region, std::uint32_t label) {
+    SetArea(region, 0);
+    RegionOf(region).rank = label & 0x7FFFFFFF;
+  }
   std::uint32_t RankOf(std::uint32_t region) const { return RegionOf(region).rank; }
   bool IsHub(std::uint32_t region) const { return RegionOf(region).isHub != 0; }
 
   void ReservePairs(std::size_t count) { pairs_.reserve(count); }
-  /// Adds a pair, which stands in no list yet.
+  /// Adds a pair, and puts it into the lists of its regions.
   void AddPair(const LabelPair& pair);
   std::size_t PairCount() const { return pairs_.size(); }
   Pair& PairOf(std::uint32_t pair) { return pairs_[pair]; }
@@ -122,9 +145,8 @@ class VEXG_EXPORT MergeGraph {
 
   /// See MergeCost.
   double CostOf(const Pair& pair) const {
-    return MergeCost({RegionOf(pair.ids[0]).area, MeansOf(pair.ids[0])},
-                     {RegionOf(pair.ids[1]).area, MeansOf(pair.ids[1])}, bands_, pair.length,
-                     limits_);
+    return MergeCost({AreaOf(pair.ids[0]), MeansOf(pair.ids[0])},
+                     {AreaOf(pair.ids[1]), MeansOf(pair.ids[1])}, bands_, pair.length, limits_);
   }
   /// How far the means of two regions are apart.
   double DistanceOf(std::uint32_t one, std::uint32_t other) const {
@@ -165,11 +187,14 @@ class VEXG_EXPORT MergeGraph {
     return std::sqrt(sum);
   }
 
+  static constexpr std::uint32_t kMany = 0xFFFFFFFF;  // pixels, or more
+
   GrowthLimits limits_;
   std::uint32_t bands_ = 0;
   std::uint32_t count_ = 0;
   std::size_t stride_ = sizeof(Region);
   std::vector<std::byte, platform::HugePageAllocator<std::byte>> regions_;  // by number
+  std::unordered_map<std::uint32_t, double> many_;                          // by region: its pixels
   std::vector<Pair, platform::HugePageAllocator<Pair>> pairs_;
 };
 

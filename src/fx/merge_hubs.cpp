@@ -95,7 +95,7 @@ void MergeHubs::Renew(std::uint32_t region, Hub& hub, std::vector<std::uint32_t>
     if (distance < kInfinity) distances += distance;
   });
   // A pixel of a usual neighbour moves means by a few thousand units.
-  const double area = graph_.RegionOf(region).area;
+  const double area = graph_.AreaOf(region);
   const double mean = distances / static_cast<double>(hub.size + 1);
   const double unit = mean / (area + 1) / 4096;
   hub.unit = unit > std::numeric_limits<double>::min() && unit < kInfinity ? unit : 1;
@@ -109,7 +109,7 @@ void MergeHubs::Move(std::uint32_t hub, double distance, std::vector<std::uint32
   constexpr double kMostTicks = 1ULL << 32U;
   Hub& moved = *hubs_.at(hub);
   const double ticks = std::ceil(distance / moved.unit * (1 + kSafe)) + 1;
-  if (!(ticks < kMostTicks) || graph_.RegionOf(hub).area > moved.mostArea ||
+  if (!(ticks < kMostTicks) || graph_.AreaOf(hub) > moved.mostArea ||
       moved.entries > moved.mostEntries) {
     return Renew(hub, moved, due);
   }
@@ -165,7 +165,7 @@ void MergeHubs::Examine(std::uint32_t region) {
 MergeHubs::Reach MergeHubs::ReachOf(const Pair& pair, std::uint32_t region) {
   const Hub& hub = HubOf(pair);
   const std::uint32_t other = pair.Other(region);
-  const double area = graph_.RegionOf(other).area, size = graph_.RegionOf(region).area;
+  const double area = graph_.AreaOf(other), size = graph_.AreaOf(region);
   const double most = graph_.Limits().mostPixels;
   Reach reach;
   reach.isForGood = std::isnan(pair.cost) || area + size > most;

@@ -37,6 +37,14 @@ class VEXG_EXPORT RigorousMerge {
     ++counts_[label];
   }
 
+  /// Adds pixels to their segment, in the exact form.
+  /// @param sums  of their values, one for each band.
+  void AddSums(std::uint32_t label, double pixels, const double* sums) {
+    const std::size_t at = std::size_t{label} * bands_;
+    for (std::uint32_t band = 0; band < bands_; ++band) exactSums_[at + band] += sums[band];
+    counts_[label] += static_cast<std::uint32_t>(pixels);
+  }
+
   /// Joins the segments whose costs are below the threshold. Behind all pixels.
   /// @return for each label the number of its group. Numbers follow the groups
   ///         that were joined, then the labels that stayed alone, in their order; the first of

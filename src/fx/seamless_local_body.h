@@ -32,6 +32,7 @@ bool SeamlessSegmentation<T>::MergeInRounds(const LocalMerge::Rules& rules,
                                             LocalMerge::Listener* listener) {
   LocalMerge merge;
   merge.Begin(merge_->Bands(), rules, forest_, listener);
+  if (shares_ != nullptr) return MergeShares(merge);
   const RasterIteratorPtr<T> strips(new RasterIterator<T>(merge_, Strips(0)));
   detail::StripProcess process("SeamlessRounds", NextPass());
   const auto tiles = process.Read(strips);
@@ -42,12 +43,15 @@ bool SeamlessSegmentation<T>::MergeInRounds(const LocalMerge::Rules& rules,
     if (!tile || !tile->IsValid()) return false;
     const unsigned strip = tile->Index().second;
     std::vector<std::int32_t> labels(std::size_t{watershed_.Width()} * watershed_.LinesOf(strip));
-    if (!watershed_.Label(strip, labels.data())) return false;
+    std::vector<std::int32_t> below;
+    if (!watershed_.Label(strip, labels.data()) || !watershed_.ReadLabelsBelow(strip, below)) {
+      return false;
+    }
     detail::StripOfBasins made;
     if (tree_) made.labels = labels;
-    const SeamlessWatershed::Labels own = watershed_.LabelsOf(strip);
+    const SeamlessWatershed::Labels own = flood_.LabelsOf(strip);
     made.basins.Find({labels.data(), labels.size(), watershed_.Width(),
-                      watershed_.LabelsBelow(strip), strip > 0},
+                      below.empty() ? nullptr : below.data(), strip > 0},
                      {own.first, own.count}, *pairs.Borrow());
     made.basins.AddUp(labels.data(), labels.size(), tile->PixelArray().GetData(), tile->Bands());
     return found.Put(token, std::move(made));
@@ -120,9 +124,11 @@ bool SeamlessSegmentation<T>::JoinSmallSegments() {
     const unsigned strip = tiles.In(token)->Index().second;
     const std::uint32_t width = watershed_.Width();
     std::vector<std::int32_t> labels(std::size_t{width} * watershed_.LinesOf(strip));
-    if (!watershed_.Label(strip, labels.data())) return false;
-    const std::int32_t* const below = watershed_.LabelsBelow(strip);
-    if (below != nullptr) labels.insert(labels.end(), below, below + width);
+    std::vector<std::int32_t> below;
+    if (!watershed_.Label(strip, labels.data()) || !watershed_.ReadLabelsBelow(strip, below)) {
+      return false;
+    }
+    labels.insert(labels.end(), below.begin(), below.end());
     return found.Put(token, std::move(labels));
   });
   process.Add("Sums", StageOrder::kOneByOne, [&](ArgList& token, const AbortFlag*) {

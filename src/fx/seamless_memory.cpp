@@ -5,16 +5,16 @@
 namespace lumo {
 
 std::uint64_t MemoryOfMerging(std::uint64_t basins, unsigned bands, const SegmentRequest& request) {
-  constexpr std::uint64_t kPairs = 3;        // no more for each area of a plane
-  constexpr std::uint64_t kNumbers = 4 + 4;  // its number, and the one that stands for its segment
+  constexpr std::uint64_t kPairs = 3;                       // no more for each area of a plane
+  constexpr std::uint64_t kNumber = sizeof(std::uint32_t);  // what it has become
   const std::uint64_t tree = request.tree.empty() ? 0 : sizeof(std::uint32_t) + sizeof(double);
   if (!request.isRigorous) {
-    return basins * (kNumbers + tree + kPairs * LambdaSchedule::BytesOfPair() +
+    return basins * (kNumber + tree + kPairs * LambdaSchedule::BytesOfPair() +
                      LambdaSchedule::BytesOfSegment(bands) + LambdaSchedule::BytesInQueue());
   }
   constexpr std::uint64_t kGroups = 6 * sizeof(std::uint32_t);  // pixels, groups, orders
   const std::uint64_t sums = std::uint64_t{bands} * sizeof(double);
-  return basins * (kNumbers + kPairs * sizeof(LabelPair) + sums + kGroups);
+  return basins * (2 * kNumber + kPairs * sizeof(LabelPair) + sums + kGroups);
 }
 
 String MemoryFault(std::uint64_t basins, std::uint64_t needed, std::uint64_t allowed) {
@@ -26,11 +26,10 @@ String MemoryFault(std::uint64_t basins, std::uint64_t needed, std::uint64_t all
 }
 
 unsigned SeamlessStripBytes(const BasicRaster& raster, std::size_t elementBytes) {
-  constexpr std::uint64_t kLeastLines = 32, kMost = 1U << 28U;
+  constexpr std::uint64_t kLeastLines = 32, kLeast = 1U << 22U, kMost = 1U << 28U;
   const std::uint64_t lineBytes =
       std::uint64_t{raster.Samples()} * std::max(raster.Bands(), 1U) * elementBytes;
-  return static_cast<unsigned>(
-      std::clamp<std::uint64_t>(kLeastLines * lineBytes, kTileBudget, kMost));
+  return static_cast<unsigned>(std::clamp(kLeastLines * lineBytes, kLeast, kMost));
 }
 
 unsigned SeamlessStripLines(const BasicRaster& raster, std::size_t elementBytes,

@@ -5,6 +5,8 @@
 #include "fx/seamless_watershed.h"
 #include "fx/segment_process.h"
 #include "fx/segment_tree.h"
+#include "fx/shared_basins.h"
+#include "fx/shared_graph.h"
 
 namespace lumo {
 
@@ -20,6 +22,9 @@ namespace lumo {
 /// Merging in rounds needs no whole graph; see LocalMerge. It does for joining small segments at
 /// its end, of the segments that rounds leave; and a tree of it keeps all its merges.
 ///
+/// Where shares have found the basins and their neighbours (SegmentShare), only merging is left,
+/// and the result is the same to the bit.
+///
 /// Memory: MemoryOfMerging for the graph, and some 100 bytes a pixel of a strip for each
 ///         thread. Failure: false, with the fault set, and nothing written unless the writing
 ///         itself failed; at an abort true.
@@ -30,9 +35,13 @@ class SeamlessSegmentation {
   /// @param merge    what drives merging; may be the same.
   /// @param labels   one band, of the size of the others.
   /// @param request  whose tileBytes are those of a strip, which has whole lines, at least one.
+  /// @param shares   with the files of all rounds, which then take the place of the pixels of
+  ///                 `segment`; null for none. The rigorous merge has to be of exact sums.
   SeamlessSegmentation(const RasterPtr<T>& segment, const RasterPtr<T>& merge,
                        const RasterPtr<std::int32_t>& labels, const SegmentRequest& request,
-                       const IPC& ipc = {});
+                       const IPC& ipc = {}, const SegmentShares* shares = nullptr);
+  SeamlessSegmentation(const SeamlessSegmentation&) = delete;
+  SeamlessSegmentation& operator=(const SeamlessSegmentation&) = delete;
 
   bool Run();
 
@@ -41,6 +50,14 @@ class SeamlessSegmentation {
   bool Merge();
   template <typename Graph, typename Pairs>
   bool Gather(Graph& graph, Pairs& pairs);
+  bool OpenShares();
+  template <typename Use>
+  bool ForEachGraph(const Use& use);
+  template <typename Graph, typename Pairs>
+  bool GatherShares(Graph& graph, Pairs& pairs);
+  bool MergeShares(LocalMerge& merge);
+  void AddSharedSquares(const SharedGraph<T>& shared);
+  bool KeepAllLines();
   bool MergeBySchedule();
   bool DoSteps(LambdaSchedule& schedule);
   bool BeginTree();
@@ -67,7 +84,10 @@ class SeamlessSegmentation {
   SegmentRequest request_;
   IPC ipc_;
   unsigned stripLines_ = 1;
-  SeamlessWatershed watershed_;
+  const SegmentShares* shares_;
+  SeamlessWatershed flood_;           // of one that makes its basins itself
+  SharedBasins shared_;               // of one that has shares
+  BasinLabels& watershed_;            // the one of both that there is
   std::vector<std::uint32_t> roots_;  // by basin: one that stands for its segment; empty for itself
   LabelForest forest_;                // what basins have become
   std::optional<LabelForest> joined_;  // what segments of rounds have become that were small
@@ -86,7 +106,8 @@ VEXG_EXPORT std::uint64_t MemoryOfMerging(std::uint64_t basins, unsigned bands,
 /// Says that merging would take more memory than it may.
 VEXG_EXPORT String MemoryFault(std::uint64_t basins, std::uint64_t needed, std::uint64_t allowed);
 
-/// A budget for strips: that of tiles, or 32 lines where they are more, up to 256 MiB.
+/// A budget for strips: 4 MiB, or 32 lines where they are more, up to 256 MiB. Several strips are
+/// in memory at once, beside the graph.
 VEXG_EXPORT unsigned SeamlessStripBytes(const BasicRaster& raster, std::size_t elementBytes);
 
 /// The lines of the strips that fill a budget: at least one, and at most what a strip may have.

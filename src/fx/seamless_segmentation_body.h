@@ -1,69 +1,35 @@
 #pragma once
 
 #include <algorithm>
-#include <numeric>
+#include <utility>
 
 #include "foundation/fault.h"
 #include "foundation/progress.h"
-#include "fx/gradient_stages.h"
 #include "fx/lambda_schedule.h"
+#include "fx/pair_join.h"
 #include "fx/rigorous_merge.h"
 #include "fx/seamless_segmentation.h"
 #include "fx/strip_numbers.h"
+#include "fx/strip_process.h"
 #include "fx/task_setup.h"
 #include "fx/tree_cut.h"
 #include "fx/usable_pixels.h"
 #include "fx/watershed_task.h"
 #include "platform/system_memory.h"
 #include "raster/raster_def.h"
-#include "tasks/thread_limit.h"
 
 namespace lumo {
 namespace detail {
 
 inline constexpr unsigned kSeamlessPasses = 4;  // basins, graph, merging, labels
 
-/// The labels of a strip, and the neighbours among them.
+/// The labels of a strip, and the neighbours among them. Lent, since the memory of strips that come
+/// and go stays with each thread.
 struct StripGraph {
   std::vector<std::int32_t> labels;
-  std::vector<LabelPair> pairs;
+  LabelPairs pairs;
 };
-
-/// The pairs of neighbours of a merge that takes all of them at once.
-struct PairList {
-  std::vector<LabelPair> pairs;
-
-  void AddPair(const LabelPair& pair) { pairs.push_back(pair); }
-  void Lengthen(std::size_t pair, std::uint32_t length) { pairs[pair].length += length; }
-};
-
-/// Joins the pairs of strips to those of the whole. Only a pair of two basins at seams may be found
-/// in several strips.
-template <typename Pairs>
-class PairJoin {
- public:
-  PairJoin(Pairs& pairs, std::vector<bool>&& atSeams)
-      : pairs_(pairs), atSeams_(std::move(atSeams)) {
-    found_.Begin(0);
-  }
-
-  void Add(const LabelPair& pair) {
-    if (atSeams_[pair.low] && atSeams_[pair.high]) {
-      const std::uint32_t number = found_.NumberOf(pair.low, pair.high);
-      if (number < places_.size()) return pairs_.Lengthen(places_[number], pair.length);
-      places_.push_back(count_);
-    }
-    pairs_.AddPair(pair);
-    ++count_;
-  }
-
- private:
-  Pairs& pairs_;
-  std::vector<bool> atSeams_;
-  LabelPairs found_;
-  std::vector<std::size_t> places_;  // by number among the pairs found: that among all
-  std::size_t count_ = 0;
-};
+using LentGraph = std::shared_ptr<ScratchPool<StripGraph>::Loan>;
 
 inline void AddTo(LambdaSchedule& schedule, std::uint32_t label, const auto* values,
                   const unsigned char* /*states*/, unsigned /*bands*/) {
@@ -87,28 +53,22 @@ std::vector<std::uint32_t> FindFirstOfGroups(std::size_t count, const GroupOf& g
   return found;
 }
 
-/// The pipeline of a pass, with as many strips in flight as there are threads and one more.
-class StripProcess : public TileProcess<> {
- public:
-  StripProcess(const char* name, const IPC& ipc) : TileProcess<>(name, ipc) {
-    this->GetPipeline().SetTokenLimit(ThreadLimit::GetCurrent() + 1);
-  }
-  void SetStrips(unsigned strips) { this->GetPipeline().SetTotalTokens(strips); }
-};
-
 }  // namespace detail
 
 template <typename T>
 SeamlessSegmentation<T>::SeamlessSegmentation(const RasterPtr<T>& segment,
                                               const RasterPtr<T>& merge,
                                               const RasterPtr<std::int32_t>& labels,
-                                              const SegmentRequest& request, const IPC& ipc)
+                                              const SegmentRequest& request, const IPC& ipc,
+                                              const SegmentShares* shares)
     : segment_(segment),
       merge_(merge),
       labels_(labels),
       request_(request),
       ipc_(ipc),
-      stripLines_(SeamlessStripLines(*segment, sizeof(T), request.tileBytes)) {}
+      stripLines_(SeamlessStripLines(*segment, sizeof(T), request.tileBytes)),
+      shares_(shares),
+      watershed_(shares != nullptr ? static_cast<BasinLabels&>(shared_) : flood_) {}
 
 template <typename T>
 IPC SeamlessSegmentation<T>::NextPass() const {
@@ -119,12 +79,7 @@ IPC SeamlessSegmentation<T>::NextPass() const {
 
 template <typename T>
 TileDimensions SeamlessSegmentation<T>::Strips(unsigned border) const {
-  TileDimensions strips;
-  strips.width = segment_->Samples();
-  strips.height = stripLines_;
-  strips.borderTop = strips.borderBottom = border;
-  strips.borderClamp = 1;
-  return strips;
+  return detail::StripTiles(*segment_, stripLines_, border);
 }
 
 template <typename T>
@@ -141,28 +96,25 @@ bool SeamlessSegmentation<T>::Run() {
 
 template <typename T>
 bool SeamlessSegmentation<T>::FindBasins() {
+  if (shares_ != nullptr) return OpenShares();
   const bool isRanked = request_.order != MergeOrder::kLocal;
-  if (!watershed_.Begin({segment_->Samples(), segment_->Lines(), stripLines_, isRanked})) {
+  if (!flood_.Begin({segment_->Samples(), segment_->Lines(), stripLines_, isRanked})) {
     return false;
   }
   const RasterIteratorPtr<T> strips(
       new RasterIterator<T>(segment_, Strips(detail::GradientBorder(request_.algorithm, 1))));
   detail::StripProcess process("SeamlessBasins", NextPass());
   const ArgID slot = process.Read(strips).id;
-  const Array<ArgID> inPlace = ArgIDs({slot, slot});
-  detail::AddGradient<T>(process, request_.algorithm, slot, slot, 1);
-  process.AddTask<RasterLinearStretchTask<double, std::int32_t>>(inPlace,
-                                                                 MakeSetup(request_.stretch));
-  process.AddTask<RasterClipInPlaceTask<std::int32_t>>(inPlace, MakeSetup(request_.limits));
+  detail::AddLevels<T>(process, request_, slot);
   process.Add("Basins", StageOrder::kSeveralAtOnce, [this, slot](ArgList& token, const AbortFlag*) {
     const TilePtr<std::int32_t> levels = TileSlot<std::int32_t>{slot}.In(token);
     if (!levels || !levels->IsValid()) return false;
-    return watershed_.AddStrip(levels->Index().second,
-                               {levels->PixelArray().GetData(), FindExcluded(*levels)});
+    return flood_.AddStrip(levels->Index().second,
+                           {levels->PixelArray().GetData(), FindExcluded(*levels)});
   });
   process.Close();
   if (!process.RunProcess(process.kHere)) return false;
-  return IsAborted() || watershed_.Connect(ipc_.abort.Get());
+  return IsAborted() || flood_.Connect(ipc_.abort.Get());
 }
 
 template <typename T>
@@ -180,36 +132,42 @@ bool SeamlessSegmentation<T>::Merge() {
 template <typename T>
 template <typename Graph, typename Pairs>
 bool SeamlessSegmentation<T>::Gather(Graph& graph, Pairs& pairs) {
-  detail::PairJoin<Pairs> join(pairs, watershed_.MarkSeamBasins());
+  if (shares_ != nullptr) return GatherShares(graph, pairs);
+  std::vector<bool> atSeams;
+  if (!watershed_.MarkSeamBasins(atSeams)) return false;
+  detail::PairJoin<Pairs> join(pairs, std::move(atSeams));
   const RasterIteratorPtr<T> strips(new RasterIterator<T>(merge_, Strips(0)));
+  ScratchPool<detail::StripGraph> pool;
   detail::StripProcess process("SeamlessGraph", NextPass());
   const auto tiles = process.Read(strips);
-  const auto graphs = process.template TakeSlot<ValueSlot<detail::StripGraph>>();
-  ScratchPool<LabelPairs> scratch;
-  process.Add("Neighbours", StageOrder::kSeveralAtOnce,
-              [&](ArgList& token, const AbortFlag* abort) {
-                const unsigned strip = tiles.In(token)->Index().second;
-                const std::uint32_t width = watershed_.Width();
-                detail::StripGraph made;
-                made.labels.resize(std::size_t{width} * watershed_.LinesOf(strip));
-                if (!watershed_.Label(strip, made.labels.data())) return false;
-                if (abort != nullptr && abort->IsSet()) return false;
-                const auto found = scratch.Borrow();
-                found->Begin(watershed_.Count() / watershed_.Strips() + 1);
-                ForEachStripEdge(made.labels.data(), made.labels.size(), width,
-                                 watershed_.LabelsBelow(strip),
-                                 [&](std::uint32_t a, std::uint32_t b) { found->AddEdge(a, b); });
-                made.pairs = found->Pairs();
-                return graphs.Put(token, std::move(made));
-              });
+  const auto graphs = process.template TakeSlot<ValueSlot<detail::LentGraph>>();
+  process.Add(
+      "Neighbours", StageOrder::kSeveralAtOnce, [&](ArgList& token, const AbortFlag* abort) {
+        const unsigned strip = tiles.In(token)->Index().second;
+        const std::uint32_t width = watershed_.Width();
+        detail::LentGraph made(new auto(pool.Borrow()));
+        auto& [labels, found] = **made;
+        labels.resize(std::size_t{width} * watershed_.LinesOf(strip));
+        std::vector<std::int32_t> below;
+        if (!watershed_.Label(strip, labels.data()) || !watershed_.ReadLabelsBelow(strip, below)) {
+          return false;
+        }
+        if (abort != nullptr && abort->IsSet()) return false;
+        found.Begin(watershed_.Count() / watershed_.Strips() + 1);
+        ForEachStripEdge(labels.data(), labels.size(), width,
+                         below.empty() ? nullptr : below.data(),
+                         [&](std::uint32_t a, std::uint32_t b) { found.AddEdge(a, b); });
+        return graphs.Put(token, std::move(made));
+      });
   process.Add("Sums", StageOrder::kOneByOne, [&](ArgList& token, const AbortFlag*) {
     const TilePtr<T> tile = tiles.In(token);
-    const detail::StripGraph* const made = graphs.In(token);
-    if (!tile || !tile->IsValid() || made == nullptr) return false;
+    const detail::LentGraph* const lent = graphs.In(token);
+    if (!tile || !tile->IsValid() || lent == nullptr) return false;
+    const detail::StripGraph& made = ***lent;
     const unsigned bands = tile->Bands();
     const T* values = tile->PixelArray().GetData();
     const unsigned char* states = tile->StateArray().GetData();
-    for (const std::int32_t label : made->labels) {
+    for (const std::int32_t label : made.labels) {
       if (label != 0) {
         detail::AddTo(graph, static_cast<std::uint32_t>(label), values, states, bands);
         if (tree_) AddSquares(static_cast<std::uint32_t>(label), values, bands);
@@ -217,8 +175,8 @@ bool SeamlessSegmentation<T>::Gather(Graph& graph, Pairs& pairs) {
       values += bands;
       states += bands;
     }
-    for (const LabelPair& pair : made->pairs) join.Add(pair);
-    return !tree_ || KeepLines(made->labels);
+    for (const LabelPair& pair : made.pairs.Pairs()) join.Add(pair);
+    return !tree_ || KeepLines(made.labels);
   });
   process.Close();
   return process.RunProcess(process.kHere);
@@ -227,30 +185,28 @@ bool SeamlessSegmentation<T>::Gather(Graph& graph, Pairs& pairs) {
 template <typename T>
 bool SeamlessSegmentation<T>::MergeBySchedule() {
   const std::uint32_t count = watershed_.Count();
-  LambdaSchedule schedule;
-  schedule.Begin(count + 1, merge_->Bands());
-  schedule.Limit(request_.growth);
-  schedule.CompareBy(watershed_.TakeRanks());
+  std::optional<LambdaSchedule> schedule(std::in_place);
+  schedule->Begin(count + 1, merge_->Bands());
+  schedule->Limit(request_.growth);
+  schedule->CompareBy(watershed_.TakeRanks());
   if (tree_) BeginBasins();
-  schedule.ReservePairs(std::size_t{3} * count);  // more pairs of areas touch in no plane
-  if (!Gather(schedule, schedule)) return false;
+  schedule->ReservePairs(std::size_t{3} * count);  // more pairs of areas touch in no plane
+  if (!Gather(*schedule, *schedule)) return false;
   if (IsAborted()) return true;
-  schedule.Build();
+  schedule->Build();
   if (tree_) {
-    CenterSquares(schedule);
-    if (!KeepBasins([&](std::uint32_t label) { return schedule.AreaOf(label); })) return false;
+    CenterSquares(*schedule);
+    if (!KeepBasins([&](std::uint32_t label) { return schedule->AreaOf(label); })) return false;
   }
-  return DoSteps(schedule) && (!tree_ || IsAborted() || CutOwnTree());
+  if (!DoSteps(*schedule)) return false;
+  schedule.reset();  // the cut takes memory as well
+  return !tree_ || IsAborted() || CutOwnTree();
 }
 
 /// Merges up to the threshold, or with a tree to the end.
 template <typename T>
 bool SeamlessSegmentation<T>::DoSteps(LambdaSchedule& schedule) {
   const std::uint32_t count = watershed_.Count();
-  if (!tree_) {
-    roots_.resize(std::size_t{count} + 1);
-    std::iota(roots_.begin(), roots_.end(), 0U);
-  }
   const IPC pass = NextPass();
   LambdaSchedule::Merge merge;
   const bool doesSteps = request_.mergeValue > 0 || tree_;
@@ -258,9 +214,8 @@ bool SeamlessSegmentation<T>::DoSteps(LambdaSchedule& schedule) {
     if (tree_) {
       const TreeMerge kept{merge.lambda, order_[merge.lower], order_[merge.higher], merge.border};
       if (!tree_->AddMerge(kept)) return false;
-    } else {
-      roots_[merge.higher] = merge.lower;
-      if (merge.lambda > request_.mergeValue) break;
+    } else if (merge.lambda > request_.mergeValue) {
+      break;
     }
     constexpr std::uint32_t kEvery = 4096;
     if (step % kEvery != 0) continue;
@@ -268,12 +223,10 @@ bool SeamlessSegmentation<T>::DoSteps(LambdaSchedule& schedule) {
     pass.progress->Update(static_cast<double>(step) / count);
   }
   if (tree_) return true;
-  schedule.JoinSmall(request_.leastPixels,
-                     [this](const auto& join) { roots_[join.higher] = join.lower; });
+  schedule.JoinSmall(request_.leastPixels, [](const auto& /*join*/) {});
   for (std::uint32_t label = 1; label <= count; ++label) {
-    std::uint32_t root = label;
-    while (roots_[root] != root) root = roots_[root] = roots_[roots_[root]];
-    roots_[label] = root;
+    const std::uint32_t root = schedule.RootOf(label);
+    if (root != label) forest_.Join(label, root);
   }
   return true;
 }
@@ -319,12 +272,7 @@ bool SeamlessSegmentation<T>::KeepLines(const std::vector<std::int32_t>& labels)
 template <typename T>
 template <typename V>
 void SeamlessSegmentation<T>::AddSquares(std::uint32_t label, const V* values, unsigned bands) {
-  double sum = 0;
-  for (unsigned band = 0; band < bands; ++band) {
-    const auto value = static_cast<double>(values[band]);
-    sum += value * value;
-  }
-  squares_[label] += sum;
+  squares_[label] += SharedGraph<V>::SumOfSquares(values, bands);
 }
 
 /// Takes the squares of the means of a basin from those of its values.

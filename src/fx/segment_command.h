@@ -3,6 +3,7 @@
 #include <optional>
 
 #include "fx/segment_process.h"
+#include "fx/segment_shares.h"
 #include "raster/raster_command.h"
 
 namespace lumo {
@@ -24,6 +25,21 @@ class VEXG_EXPORT SegmentCommand : public RasterCommand {
 
   /// True when both rasters have one pixel type and size; else sets the fault text.
   static bool CheckAlike(const BasicRaster& segment, const BasicRaster& merge);
+
+  /// Reads the inputs of WithShareInputs for work of some rounds: which share of the next round is
+  /// done, or the files of all rounds. False, with the fault set, for ones that don't fit.
+  /// @param key  says of what rasters and inputs the shares are.
+  bool ReadShares(const std::string& key, unsigned rounds);
+  /// True where a share is done alone: nothing but its file is made.
+  bool IsShare() const { return HasInput(kShareInput); }
+  const Share& GetShare() const { return share_; }
+  std::string ShareFile() const { return Read<String>(kShareFileInput).ToUTF8(); }
+  /// The files of the rounds that are done; null for work that is not done in shares.
+  const SegmentShares* Shares() const { return shares_ ? &*shares_ : nullptr; }
+
+ private:
+  Share share_;
+  std::optional<SegmentShares> shares_;
 };
 
 /// The gradients that are counted, and in which bins.
@@ -46,5 +62,13 @@ struct GradientHistogram {
 VEXG_EXPORT bool CountGradients(const BasicRasterPtr& raster, SegmentAlgorithm algorithm,
                                 const GradientBins& bins, const IPC& ipc,
                                 GradientHistogram& histogram);
+
+/// The same in two steps: counts of some tiles (GradientGrid), which are added up, and what they
+/// make. @param counts  [out] by bin.
+VEXG_EXPORT bool CountGradientsOf(const BasicRasterPtr& raster, SegmentAlgorithm algorithm,
+                                  const GradientBins& bins, const TileRange& tiles, const IPC& ipc,
+                                  std::vector<std::uint64_t>& counts);
+VEXG_EXPORT bool MakeHistogram(const GradientBins& bins, const std::vector<std::uint64_t>& counts,
+                               GradientHistogram& histogram);
 
 }  // namespace lumo

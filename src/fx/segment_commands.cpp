@@ -1,11 +1,15 @@
 #include <algorithm>
 #include <numeric>
+#include <optional>
+
+#include <fmt/format.h>
 
 #include "commands/division.h"
 #include "foundation/fault.h"
 #include "foundation/scientific_notation.h"
 #include "fx/seamless_segmentation.h"
 #include "fx/segment_command.h"
+#include "fx/segment_share.h"
 #include "fx/variance_process.h"
 #include "platform/system_memory.h"
 #include "raster/pixel_types.h"
@@ -42,6 +46,26 @@ bool SegmentCommand::CheckAlike(const BasicRaster& segment, const BasicRaster& m
   return true;
 }
 
+bool SegmentCommand::ReadShares(const std::string& key, unsigned rounds) {
+  std::vector<std::string> files;
+  for (const String& file : Read<Array<String>>(kShareFilesInput)) files.push_back(file.ToUTF8());
+  if (IsShare() == ShareFile().empty()) {
+    SetFault("Share and ShareFile go together");
+    return false;
+  }
+  if (IsShare() && !ReadShare(Read<Array<unsigned>>(kShareInput), share_)) return false;
+  if (!IsShare() && files.empty()) return true;
+  const std::size_t count = IsShare() ? share_.count : files.size() / rounds;
+  const bool fits = IsShare() ? files.size() % count == 0 && files.size() / count < rounds
+                              : files.size() % rounds == 0;
+  if (!fits) {
+    SetFault("ShareFiles: they are not those of all shares of whole rounds");
+    return false;
+  }
+  shares_.emplace(key, static_cast<unsigned>(count), std::move(files));
+  return true;
+}
+
 namespace {
 
 template <typename T>
@@ -56,66 +80,86 @@ const CommandDeclaration kSegmentMerge{
     "FxTileSegmentMergeCommand",
     "Feature extraction",
     "Segments a raster into labels, or counts what merging its segments costs.",
-    {{"SegmentURI", Presence::kRequired, ValueKind::kURI,
-      "the raster from which the gradients are computed"},
-     {"SegmentAlgorithm", Presence::kRequired, ValueKind::kInteger,
-      "1: the largest Sobel gradient of the bands; else the mean of the bands"},
-     {"SegmentValue", Presence::kRequired, ValueKind::kNumber,
-      "gradients up to this one are one flat level"},
-     {"MinGradient", Presence::kRequired, ValueKind::kNumber, "the gradient that becomes level 0"},
-     {"MaxGradient", Presence::kRequired, ValueKind::kNumber,
-      "the gradient that becomes the highest level"},
-     {"MergeURI", Presence::kRequired, ValueKind::kURI,
-      "the raster whose bands drive merging, of the same size and pixel type"},
-     {"MergeAlgorithm", Presence::kOptional, ValueKind::kInteger,
-      "1: full lambda schedule; 2: rigorous; others: no merging; 1 when absent"},
-     {"MergeValue", Presence::kOptional, ValueKind::kNumber,
-      "cost up to which segments are merged; none unless above 0, as when absent"},
-     {"StretchValue", Presence::kRequired, ValueKind::kNumber, "the highest level"},
-     {"LambdaEstimate", Presence::kRequired, ValueKind::kBoolean,
-      "count the costs of merging, and write no raster"},
-     {"LabelURI", Presence::kOptional, ValueKind::kURI,
-      "the raster of one band and type Int32 that receives the labels; needed without an estimate"},
-     {"TileMemorySize", Presence::kOptional, ValueKind::kInteger,
-      "bytes of the pixels of a tile; 8388608 when absent"},
-     {"TileBorderSize", Presence::kOptional, ValueKind::kInteger,
-      "overlap of the tiles on each side, in pixels; 1 when absent"},
-     {"SegmentBorder", Presence::kOptional, ValueKind::kInteger,
-      "1: an image of the borders between segments, of 0 and 1, instead of labels"},
-     {"Sums", Presence::kOptional, ValueKind::kWord,
-      "how the rigorous merge adds up. Told: in single precision; Exact: in double precision", "",
-      &WordsIn<Form>},
-     {"Seamless", Presence::kOptional, ValueKind::kBoolean,
-      "the segments are those of one tile as large as the raster, numbered in raster order without "
-      "gaps; TileMemorySize is then that of the strips that are read, and changes no label, and "
-      "there is no TileBorderSize; false when absent"},
-     {"Memory", Presence::kOptional, ValueKind::kInteger,
-      "bytes that merging may take when Seamless is true: it fails when it needs more, before it "
-      "begins unless Order is Local; half the machine's when absent"},
-     {"MinSize", Presence::kOptional, ValueKind::kInteger,
-      "with Seamless and MergeAlgorithm 1: segments of fewer pixels join at the end the neighbour "
-      "that costs least, the smallest first; 0 when absent"},
-     {"MaxSize", Presence::kOptional, ValueKind::kInteger,
-      "with Seamless and MergeAlgorithm 1: segments that have more pixels together are not merged, "
-      "except by MinSize; none when absent"},
-     {"Compactness", Presence::kOptional, ValueKind::kNumber,
-      "with Seamless and MergeAlgorithm 1: costs are divided by the length of the common border to "
-      "the power of this besides, 0 to 10; 0 when absent"},
-     {"Order", Presence::kOptional, ValueKind::kWord,
-      "with Seamless and MergeAlgorithm 1: the order of merging. Told: the cheapest pair anywhere "
-      "first; Local: in rounds, all pairs at once that cost both of their segments least, and less "
-      "than MergeValue",
-      "", &WordsIn<MergeOrder>},
-     {"Rounds", Presence::kOptional, ValueKind::kInteger,
-      "of Order Local, 1 to 1000; 12 when absent"},
-     {"Tree", Presence::kOptional, ValueKind::kText,
-      "with Seamless and MergeAlgorithm 1: the file to make of all merges, from which segments of "
-      "every MergeValue can be made (CreateTreeLabelsRasterCommand); none when absent"},
-     {"MergePercent", Presence::kOptional, ValueKind::kNumber,
-      "with Tree: percentage of all merges to do, in place of MergeValue"}},
+    WithShareInputs(
+        {{"SegmentURI", Presence::kRequired, ValueKind::kURI,
+          "the raster from which the gradients are computed"},
+         {"SegmentAlgorithm", Presence::kRequired, ValueKind::kInteger,
+          "1: the largest Sobel gradient of the bands; else the mean of the bands"},
+         {"SegmentValue", Presence::kRequired, ValueKind::kNumber,
+          "gradients up to this one are one flat level"},
+         {"MinGradient", Presence::kRequired, ValueKind::kNumber,
+          "the gradient that becomes level 0"},
+         {"MaxGradient", Presence::kRequired, ValueKind::kNumber,
+          "the gradient that becomes the highest level"},
+         {"MergeURI", Presence::kRequired, ValueKind::kURI,
+          "the raster whose bands drive merging, of the same size and pixel type"},
+         {"MergeAlgorithm", Presence::kOptional, ValueKind::kInteger,
+          "1: full lambda schedule; 2: rigorous; others: no merging; 1 when absent"},
+         {"MergeValue", Presence::kOptional, ValueKind::kNumber,
+          "cost up to which segments are merged; none unless above 0, as when absent"},
+         {"StretchValue", Presence::kRequired, ValueKind::kNumber, "the highest level"},
+         {"LambdaEstimate", Presence::kRequired, ValueKind::kBoolean,
+          "count the costs of merging, and write no raster"},
+         {"LabelURI", Presence::kOptional, ValueKind::kURI,
+          "the raster of one band and type Int32 that receives the labels; needed without an "
+          "estimate"},
+         {"TileMemorySize", Presence::kOptional, ValueKind::kInteger,
+          "bytes of the pixels of a tile; 8388608 when absent"},
+         {"TileBorderSize", Presence::kOptional, ValueKind::kInteger,
+          "overlap of the tiles on each side, in pixels; 1 when absent"},
+         {"SegmentBorder", Presence::kOptional, ValueKind::kInteger,
+          "1: an image of the borders between segments, of 0 and 1, instead of labels"},
+         {"Sums", Presence::kOptional, ValueKind::kWord,
+          "how the rigorous merge adds up. Told: in single precision; Exact: in double precision",
+          "", &WordsIn<Form>},
+         {"Seamless", Presence::kOptional, ValueKind::kBoolean,
+          "the segments are those of one tile as large as the raster, numbered in raster order "
+          "without "
+          "gaps; TileMemorySize is then that of the strips that are read, and changes no label, "
+          "and "
+          "there is no TileBorderSize; false when absent"},
+         {"Memory", Presence::kOptional, ValueKind::kInteger,
+          "bytes that merging may take when Seamless is true: it fails when it needs more, before "
+          "it "
+          "begins unless Order is Local; half the machine's when absent"},
+         {"MinSize", Presence::kOptional, ValueKind::kInteger,
+          "with Seamless and MergeAlgorithm 1: segments of fewer pixels join at the end the "
+          "neighbour "
+          "that costs least, the smallest first; 0 when absent"},
+         {"MaxSize", Presence::kOptional, ValueKind::kInteger,
+          "with Seamless and MergeAlgorithm 1: segments that have more pixels together are not "
+          "merged, "
+          "except by MinSize; none when absent"},
+         {"Compactness", Presence::kOptional, ValueKind::kNumber,
+          "with Seamless and MergeAlgorithm 1: costs are divided by the length of the common "
+          "border to "
+          "the power of this besides, 0 to 10; 0 when absent"},
+         {"Order", Presence::kOptional, ValueKind::kWord,
+          "with Seamless and MergeAlgorithm 1: the order of merging. Told: the cheapest pair "
+          "anywhere "
+          "first; Local: in rounds, all pairs at once that cost both of their segments least, and "
+          "less "
+          "than MergeValue",
+          "", &WordsIn<MergeOrder>},
+         {"Rounds", Presence::kOptional, ValueKind::kInteger,
+          "of Order Local, 1 to 1000; 12 when absent"},
+         {"Tree", Presence::kOptional, ValueKind::kText,
+          "with Seamless and MergeAlgorithm 1: the file to make of all merges, from which segments "
+          "of "
+          "every MergeValue can be made (CreateTreeLabelsRasterCommand); none when absent"},
+         {"MergePercent", Presence::kOptional, ValueKind::kNumber,
+          "with Tree: percentage of all merges to do, in place of MergeValue"}}),
     {{"LambdaHistogram", ValueKind::kIntegerArray,
       "cumulative counts of the costs of all merges, in 10000 bins from 0 on"},
      {"LambdaBinSize", ValueKind::kNumber, "width of these bins"}}};
+
+/// Why a segmentation can't be done in shares; null where it can.
+const char* WhyNoShares(bool isSeamless, bool isEstimate, bool isRigorous, bool isExact) {
+  return isEstimate               ? "an estimate goes by tiles"
+         : !isSeamless            ? "Seamless is not true, and tiles depend on those before"
+         : isRigorous && !isExact ? "the rigorous merge adds up in single precision"
+                                  : nullptr;
+}
 
 class FxTileSegmentMergeCommand final : public SegmentCommand {
   CommandResult Execute() override {
@@ -125,12 +169,12 @@ class FxTileSegmentMergeCommand final : public SegmentCommand {
     if (!merge || !CheckAlike(*segment, *merge)) return Fail();
     const bool isEstimate = Read<bool>("LambdaEstimate");
     BasicRasterPtr labels;
-    if (!isEstimate) {
+    if (!isEstimate && !IsShare()) {
       labels = FindRaster("LabelURI");
       if (!labels || !CheckLabels(*segment, *labels)) return Fail();
     }
     SegmentRequest request;
-    if (!ReadRequest(*segment, request)) return Fail();
+    if (!ReadRequest(*segment, request) || !ReadShares(*segment, *merge, request)) return Fail();
     const Pointer<Array<unsigned>> histogram(new Array<unsigned>(ArrayDims(kLambdaBins)));
     const ScalarPtr<double> binSize(new Scalar<double>(0.0));
     std::fill(histogram->begin(), histogram->end(), 0U);
@@ -144,6 +188,7 @@ class FxTileSegmentMergeCommand final : public SegmentCommand {
     });
     if (!isReal) return Fail("SegmentURI: the raster has no real pixels of at most 64 bits");
     if (!well) return Fail(TakeFaultOr("the raster could not be segmented"));
+    if (IsShare()) return Succeed();
     Write("LambdaHistogram", *histogram);
     Result("LambdaBinSize") = MakeText(ScientificText(binSize->value));
     return Succeed();
@@ -290,8 +335,12 @@ class FxTileSegmentMergeCommand final : public SegmentCommand {
   template <typename T>
   bool Segment(const RasterPtr<T>& segment, const RasterPtr<T>& merge,
                const RasterPtr<std::int32_t>& labels, const SegmentRequest& request) {
+    if (IsShare()) {
+      return SegmentShare<T>(segment, merge, request, *Shares(), GetIPC())
+          .Run(GetShare().index, ShareFile());
+    }
     if (isSeamless_) {
-      return SeamlessSegmentation<T>(segment, merge, labels, request, GetIPC()).Run();
+      return SeamlessSegmentation<T>(segment, merge, labels, request, GetIPC(), Shares()).Run();
     }
     return isRigorous_
                ? Run<RasterTileWatershedSegmentLambdaMergeProcess<T>>(segment, merge, labels,
@@ -299,12 +348,51 @@ class FxTileSegmentMergeCommand final : public SegmentCommand {
                : Run<RasterTileWatershedSegmentFLSMergeProcess<T>>(segment, merge, labels, request);
   }
 
+  /// Reads which share of the work is done, or the files of all.
+  bool ReadShares(const BasicRaster& segment, const BasicRaster& merge,
+                  const SegmentRequest& request) {
+    if (!SegmentCommand::ReadShares(KeyOfShares(segment, merge, request), kSegmentRounds)) {
+      return false;
+    }
+    const char* const why = WhyNoShares(isSeamless_, Read<bool>("LambdaEstimate"), isRigorous_,
+                                        request.sums == Form::kExact);
+    if (why == nullptr || Shares() == nullptr) return true;
+    SetFault(String(std::string("Share and ShareFiles: ") + why));
+    return false;
+  }
+
+  static std::string KeyOfShares(const BasicRaster& segment, const BasicRaster& merge,
+                                 const SegmentRequest& request) {
+    return fmt::format("segments {} {} {} {} {} {} {} {} {} {} {} {} {} {}", segment.DataType(),
+                       segment.Samples(), segment.Lines(), segment.Bands(), merge.Bands(),
+                       static_cast<int>(request.algorithm), request.stretch.low,
+                       request.stretch.high, request.stretch.outHigh, request.limits.floor,
+                       request.limits.ceiling, static_cast<int>(request.order), request.isRigorous,
+                       !request.tree.empty());
+  }
+
   bool isRigorous_ = false, isSeamless_ = false;
 };
 
 const CommandFactoryT<FxTileSegmentMergeCommand> segmentMergeFactory(kSegmentMerge);
-const DivisionRegistration segmentMergeDivision({.command = "FxTileSegmentMergeCommand",
-                                                 .makes = {"Tree"}});
+const DivisionRegistration segmentMergeDivision(
+    {.command = "FxTileSegmentMergeCommand",
+     .kind = DivisionKind::kShares,
+     .source = "SegmentURI",
+     .target = "LabelURI",
+     .makes = {"Tree"},
+     .rounds = [](unsigned, const DivisionInputs&) { return kSegmentRounds; },
+     .whyNot =
+         [](const DivisionInputs& inputs) {
+           const auto is = [&](const char* name, const char* word) {
+             const std::string* const text = inputs(name);
+             return text != nullptr && *text == word;
+           };
+           return WhyNoShares(is("Seamless", "1"), is("LambdaEstimate", "1"),
+                              is("MergeAlgorithm", "2"), is("Sums", "Exact"));
+         },
+     .shareBytes = 28,
+     .joinBytes = 24});  // of texture, a tenth of whose pixels are basins
 
 const CommandDeclaration kHistogram{
     "FxTileSegmentHistogramCommand",

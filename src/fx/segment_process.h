@@ -8,7 +8,7 @@
 #include "fx/lambda_schedule.h"
 #include "fx/level_tasks.h"
 #include "fx/local_merge.h"
-#include "raster/tile_process.h"
+#include "fx/some_tiles_process.h"
 
 // A raster is segmented tile by tile: gradient, stretch and clip, watershed, merging, stitching.
 // The tiles overlap by a border; a segment that reaches into the next tile keeps its label there.
@@ -65,7 +65,7 @@ struct SegmentGrid {
 
 /// The part that all processes which begin with a watershed have in common.
 template <typename T>
-class WatershedProcess : public TileProcess<> {
+class WatershedProcess : public SomeTilesProcess {
  protected:
   /// @param segment  what gradients are computed from.
   /// @param merge    what drives merging; may be the same.
@@ -74,7 +74,7 @@ class WatershedProcess : public TileProcess<> {
 
   /// Places the stages from the reading to the watershed. @tparam ClipTask  the one that limits.
   template <typename ClipTask>
-  void AddWatershed(const SegmentRequest& request);
+  void AddWatershed(const SegmentRequest& request, const TileRange& tiles = {});
   /// Places the stages behind the merging, and is the last.
   void AddOutput(const SegmentRequest& request, const RasterPtr<std::int32_t>& labels);
 
@@ -92,12 +92,14 @@ class RasterTileWatershedSegmentFLSEstimateProcess final : public WatershedProce
  public:
   /// @param histogram  [out] cumulative counts, as many as it has bins.
   /// @param binSize    [out]
-  RasterTileWatershedSegmentFLSEstimateProcess(const RasterPtr<T>& segment,
-                                               const RasterPtr<T>& merge,
-                                               const SegmentRequest& request,
-                                               const Pointer<Array<unsigned>>& histogram,
-                                               const ScalarPtr<double>& binSize,
-                                               const IPC& ipc = {});
+  /// @param tiles      of SegmentGrid.
+  /// @param lambdas    gets the costs, in any order, in place of `histogram` and `binSize`;
+  /// outlives
+  ///                   the process. Null for none.
+  RasterTileWatershedSegmentFLSEstimateProcess(
+      const RasterPtr<T>& segment, const RasterPtr<T>& merge, const SegmentRequest& request,
+      const Pointer<Array<unsigned>>& histogram, const ScalarPtr<double>& binSize,
+      const IPC& ipc = {}, const TileRange& tiles = {}, std::vector<double>* lambdas = nullptr);
 };
 
 /// Segments a raster, and merges by RasterFullLambdaScheduleTask.
@@ -121,20 +123,27 @@ class RasterTileWatershedSegmentLambdaMergeProcess final : public WatershedProce
                                                const SegmentRequest& request, const IPC& ipc = {});
 };
 
-/// Counts the histogram of the gradients of a raster, in tiles of the default size.
+/// The grid of the two processes below.
 template <typename T>
-class RasterSegmentHistogramProcess final : public TileProcess<> {
+SegmentGrid GradientGrid(const BasicRaster& raster) {
+  return {raster, sizeof(T), kTileBudget, 1};
+}
+
+/// Counts the histogram of the gradients of a raster, or of some of its tiles.
+template <typename T>
+class RasterSegmentHistogramProcess final : public SomeTilesProcess {
  public:
   RasterSegmentHistogramProcess(const RasterPtr<T>& raster, SegmentAlgorithm algorithm,
-                                const ObjectPtr& histogram, const IPC& ipc = {});
+                                const ObjectPtr& histogram, const IPC& ipc = {},
+                                const TileRange& tiles = {});
 };
 
-/// Finds the smallest and the largest gradient of a raster.
+/// Finds the smallest and the largest gradient of a raster, or of some of its tiles.
 template <typename T>
-class RasterSegmentLimitsProcess final : public TileProcess<> {
+class RasterSegmentLimitsProcess final : public SomeTilesProcess {
  public:
   RasterSegmentLimitsProcess(const RasterPtr<T>& raster, SegmentAlgorithm algorithm,
-                             const IPC& ipc = {});
+                             const IPC& ipc = {}, const TileRange& tiles = {});
 
   /// Both, after a run; the first is above the second where no pixel has a gradient.
   double Least() const { return least_; }

@@ -28,7 +28,7 @@ template <typename T>
 WatershedProcess<T>::WatershedProcess(const char* name, const RasterPtr<T>& segment,
                                       const RasterPtr<T>& merge, const SegmentRequest& request,
                                       const IPC& ipc)
-    : TileProcess<>(name, ipc),
+    : SomeTilesProcess(name, ipc),
       grid_(*segment, sizeof(T), request.tileBytes, request.tileBorder),
       segmentTiles_(detail::SquaresOf(segment, grid_,
                                       detail::GradientBorder(request.algorithm, grid_.border))),
@@ -41,10 +41,10 @@ WatershedProcess<T>::WatershedProcess(const char* name, const RasterPtr<T>& segm
 
 template <typename T>
 template <typename ClipTask>
-void WatershedProcess<T>::AddWatershed(const SegmentRequest& request) {
-  const ArgID segment = this->Read(segmentTiles_).id;
+void WatershedProcess<T>::AddWatershed(const SegmentRequest& request, const TileRange& tiles) {
+  const ArgID segment = this->ReadSome(segmentTiles_, tiles).id;
   const bool isShared = mergeTiles_.IsNull();
-  merge_ = isShared ? segment : this->Read(mergeTiles_).id;
+  merge_ = isShared ? segment : this->ReadSome(mergeTiles_, tiles).id;
   // Tiles that only the gradients need give their slot to them.
   labels_ = isShared ? this->GetPipeline().TakeTokenArg() : segment;
   detail::AddGradient<T>(*this, request.algorithm, segment, labels_, grid_.border);
@@ -76,7 +76,8 @@ void WatershedProcess<T>::AddOutput(const SegmentRequest& request,
 template <typename T>
 RasterTileWatershedSegmentFLSEstimateProcess<T>::RasterTileWatershedSegmentFLSEstimateProcess(
     const RasterPtr<T>& segment, const RasterPtr<T>& merge, const SegmentRequest& request,
-    const Pointer<Array<unsigned>>& histogram, const ScalarPtr<double>& binSize, const IPC& ipc)
+    const Pointer<Array<unsigned>>& histogram, const ScalarPtr<double>& binSize, const IPC& ipc,
+    const TileRange& tiles, std::vector<double>* lambdas)
     : WatershedProcess<T>(
           "RasterTileWatershedSegmentFLSEstimateProcess", segment, merge,
           [&] {
@@ -86,10 +87,10 @@ RasterTileWatershedSegmentFLSEstimateProcess<T>::RasterTileWatershedSegmentFLSEs
             return byDefault;
           }(),
           ipc) {
-  this->template AddWatershed<RasterClipInPlaceTask<std::int32_t>>(request);
+  this->template AddWatershed<RasterClipInPlaceTask<std::int32_t>>(request, tiles);
   this->template AddTask<RasterFullLambdaScheduleEstimateTask<T, std::int32_t>>(
       ArgIDs({this->merge_, this->labels_}), this->labelCounts_, MakeSetup(this->grid_.columns),
-      MakeSetup(this->grid_.border), histogram, binSize);
+      MakeSetup(this->grid_.border), histogram, binSize, MakeSetup(lambdas));
   this->Close();
 }
 
@@ -127,11 +128,12 @@ template <typename T>
 RasterSegmentHistogramProcess<T>::RasterSegmentHistogramProcess(const RasterPtr<T>& raster,
                                                                 SegmentAlgorithm algorithm,
                                                                 const ObjectPtr& histogram,
-                                                                const IPC& ipc)
-    : TileProcess<>("RasterSegmentHistogramProcess", ipc) {
-  const SegmentGrid grid(*raster, sizeof(T), kTileBudget, 1);
+                                                                const IPC& ipc,
+                                                                const TileRange& tiles)
+    : SomeTilesProcess("RasterSegmentHistogramProcess", ipc) {
+  const SegmentGrid grid = GradientGrid<T>(*raster);
   const unsigned border = detail::GradientBorder(algorithm, 1);
-  const ArgID tile = this->Read(detail::SquaresOf(raster, grid, border)).id;
+  const ArgID tile = this->ReadSome(detail::SquaresOf(raster, grid, border), tiles).id;
   detail::AddGradient<T>(*this, algorithm, tile, tile, 0);
   this->template AddTask<RasterHistogramAccumulateTask<double>>(ArgIDs({tile}), histogram);
   this->Close();
@@ -140,13 +142,13 @@ RasterSegmentHistogramProcess<T>::RasterSegmentHistogramProcess(const RasterPtr<
 template <typename T>
 RasterSegmentLimitsProcess<T>::RasterSegmentLimitsProcess(const RasterPtr<T>& raster,
                                                           SegmentAlgorithm algorithm,
-                                                          const IPC& ipc)
-    : TileProcess<>("RasterSegmentLimitsProcess", ipc),
+                                                          const IPC& ipc, const TileRange& tiles)
+    : SomeTilesProcess("RasterSegmentLimitsProcess", ipc),
       least_(std::numeric_limits<double>::infinity()),
       most_(-least_) {
-  const SegmentGrid grid(*raster, sizeof(T), kTileBudget, 1);
+  const SegmentGrid grid = GradientGrid<T>(*raster);
   const unsigned border = detail::GradientBorder(algorithm, 1);
-  const ArgID slot = this->Read(detail::SquaresOf(raster, grid, border)).id;
+  const ArgID slot = this->ReadSome(detail::SquaresOf(raster, grid, border), tiles).id;
   detail::AddGradient<T>(*this, algorithm, slot, slot, 0);
   this->Add("Limits", StageOrder::kOneByOne, [this, slot](ArgList& token, const AbortFlag*) {
     const TilePtr<double> tile = TileSlot<double>{slot}.In(token);

@@ -1,5 +1,9 @@
 #include "fx/strip_basins.h"
 
+#include <algorithm>
+
+#include "fx/pair_join.h"
+
 namespace lumo {
 
 /// Makes numbers of labels: for its own their order, for others that in which they are met.
@@ -44,7 +48,8 @@ void StripBasins::ListRuns(const Lines& lines) {
   }
 }
 
-void StripBasins::Find(const Lines& lines, const Labels& own, LabelPairs& scratch) {
+/// Finds the basins. @return  the numbers of those of the line below; none at the end.
+std::vector<std::int32_t> StripBasins::FindBasins(const Lines& lines, const Labels& own) {
   std::vector<std::int32_t> below;
   if (lines.below != nullptr) below.assign(lines.below, lines.below + lines.width);
   Number(lines.labels, lines.pixels, own);
@@ -56,11 +61,40 @@ void StripBasins::Find(const Lines& lines, const Labels& own, LabelPairs& scratc
   }
   others_ = {};
   Mark(lines, below);
+  return below;
+}
+
+void StripBasins::Find(const Lines& lines, const Labels& own, LabelPairs& scratch) {
+  const std::vector<std::int32_t> below = FindBasins(lines, own);
   ListRuns(lines);
   scratch.Begin(basins.size());
   ForEachStripEdge(lines.labels, lines.pixels, lines.width, below.empty() ? nullptr : below.data(),
                    [&](std::uint32_t a, std::uint32_t b) { scratch.AddEdge(a, b); });
   pairs = scratch.Pairs();
+}
+
+void StripBasins::FindInParts(const Lines& lines, const Labels& own, LabelPairs& scratch) {
+  constexpr std::size_t kLines = 32;
+  const std::vector<std::int32_t> below = FindBasins(lines, own);
+  const std::size_t part = kLines * lines.width;
+  std::vector<bool> atSeams(basins.size());
+  for (std::size_t at = part; at < lines.pixels; at += part) {
+    for (std::uint32_t x = 0; x < lines.width; ++x) {
+      atSeams[static_cast<std::size_t>(lines.labels[at + x])] = true;
+    }
+  }
+  detail::PairList list;
+  detail::PairJoin<detail::PairList> join(list, std::move(atSeams));
+  for (std::size_t at = 0; at < lines.pixels; at += part) {
+    const std::size_t count = std::min(part, lines.pixels - at);
+    const std::int32_t* const last = below.empty() ? nullptr : below.data();
+    scratch.Begin(basins.size() / (lines.pixels / part + 1));
+    ForEachStripEdge(lines.labels + at, count, lines.width,
+                     at + count < lines.pixels ? lines.labels + at + count : last,
+                     [&](std::uint32_t a, std::uint32_t b) { scratch.AddEdge(a, b); });
+    for (const LabelPair& pair : scratch.Pairs()) join.Add(pair);
+  }
+  pairs = std::move(list.pairs);
 }
 
 }  // namespace lumo

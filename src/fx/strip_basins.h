@@ -54,6 +54,8 @@ struct VEXG_EXPORT StripBasins {
   /// @param own      labels that begin in the strip.
   /// @param scratch  lends memory.
   void Find(const Lines& lines, const Labels& own, LabelPairs& scratch);
+  /// The same of a strip of very many lines, of which some at a time are looked at; without runs.
+  void FindInParts(const Lines& lines, const Labels& own, LabelPairs& scratch);
 
   /// Adds up the pixels of basins that don't continue. @param numbers  as Find left them.
   template <typename T>
@@ -70,6 +72,7 @@ struct VEXG_EXPORT StripBasins {
   }
 
  private:
+  std::vector<std::int32_t> FindBasins(const Lines& lines, const Labels& own);
   void Number(std::int32_t* labels, std::size_t count, const Labels& own);
   void Mark(const Lines& lines, const std::vector<std::int32_t>& below);
   void ListRuns(const Lines& lines);

@@ -63,6 +63,24 @@ void StripDrains::MarkLine(const Levels& levels, std::uint32_t width, Cell* cell
   cells[width - 1] = MarkAny(levels, width, width - 1);
 }
 
+void StripDrains::MarkLines(const LevelLines& from, std::uint32_t width, Cell* cells) {
+  for (std::uint32_t y = 0; y < from.lines; ++y) {
+    const std::size_t at = std::size_t{width} * (y + (from.hasAbove ? 1 : 0));
+    Levels levels;
+    levels.line = from.levels + at;
+    if (from.excluded != nullptr) levels.excluded = from.excluded + at;
+    if (y > 0 || from.hasAbove) {
+      levels.above = levels.line - width;
+      if (from.excluded != nullptr) levels.excludedAbove = levels.excluded - width;
+    }
+    if (y + 1 < from.lines || from.hasBelow) {
+      levels.below = levels.line + width;
+      if (from.excluded != nullptr) levels.excludedBelow = levels.excluded + width;
+    }
+    MarkLine(levels, width, cells + std::size_t{width} * y);
+  }
+}
+
 void StripDrains::Begin(std::vector<Cell>&& cells, std::uint32_t width) {
   cells_ = std::move(cells);
   width_ = width;

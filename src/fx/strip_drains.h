@@ -51,6 +51,18 @@ class VEXG_EXPORT StripDrains {
   /// Makes the cells of a line: drains to lower neighbours, and who is on the same level.
   static void MarkLine(const Levels& levels, std::uint32_t width, Cell* cells);
 
+  /// Some whole lines of levels, from the line above them on where the image has one, to the line
+  /// below them where it has one.
+  struct LevelLines {
+    const std::int32_t* levels = nullptr;
+    const std::uint8_t* excluded = nullptr;  ///< like `levels`; null when no pixel is
+    std::uint32_t lines = 0;                 ///< without those above and below
+    bool hasAbove = false;
+    bool hasBelow = false;
+  };
+  /// Makes the cells of some lines.
+  static void MarkLines(const LevelLines& from, std::uint32_t width, Cell* cells);
+
   /// How far the pixels along an edge of a strip are from lower ground on their plateaus; null for
   /// none.
   struct Beyond {

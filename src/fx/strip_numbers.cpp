@@ -51,8 +51,14 @@ void SegmentNumbers::FindRoots(std::int32_t* labels, std::size_t count) {
   });
 }
 
-void SegmentNumbers::MarkBorders(Tile<std::int32_t>& tile) {
+bool SegmentNumbers::MarkBorders(Tile<std::int32_t>& tile) {
   const unsigned strip = tile.Index().second;
+  std::vector<std::int32_t> below, before;
+  if (!basins_.ReadLabelsBelow(strip, below) || !basins_.ReadLabelsAbove(strip, before)) {
+    return false;
+  }
+  FindRoots(below.data(), below.size());
+  FindRoots(before.data(), before.size());
   FindRoots(tile.PixelArray().GetData(), tile.PixelArray().GetCount());
   const std::size_t width = tile.Width(), lines = tile.Height();
   const bool isLast = strip + 1 == basins_.Strips();
@@ -60,16 +66,8 @@ void SegmentNumbers::MarkBorders(Tile<std::int32_t>& tile) {
   const auto lineOf = [width](const std::int32_t* from) {
     return std::vector<std::int32_t>(from, from + width);
   };
-  const auto rootsOf = [&](const std::int32_t* from) {
-    std::vector<std::int32_t> line = lineOf(from);
-    FindRoots(line.data(), line.size());
-    return line;
-  };
   std::int32_t* const pixels = tile.PixelArray().GetData();
-  const std::vector<std::int32_t> below =
-      isLast ? std::vector<std::int32_t>() : rootsOf(basins_.LabelsBelow(strip));
-  std::vector<std::int32_t> before =
-      strip == 0 ? lineOf(pixels) : rootsOf(basins_.LabelsAbove(strip));
+  if (strip == 0) before = lineOf(pixels);
   // The last but one line of the raster, and the last, look back.
   const auto looksBack = [&](std::size_t y) {
     const std::size_t behind = lines - 1 - y;
@@ -88,11 +86,12 @@ void SegmentNumbers::MarkBorders(Tile<std::int32_t>& tile) {
     }
     before.swap(line);
   }
+  return true;
 }
 
 bool SegmentNumbers::Number(Tile<std::int32_t>& tile) {
   if (bordersOnly_) {
-    MarkBorders(tile);
+    if (!MarkBorders(tile)) return false;
   } else {
     ReplaceLabels(tile.PixelArray().GetData(), tile.PixelArray().GetCount(),
                   [this](std::uint32_t label) {

@@ -2,8 +2,8 @@
 
 #include <vector>
 
+#include "fx/basin_labels.h"
 #include "fx/label_forest.h"
-#include "fx/seamless_watershed.h"
 #include "raster/raster_tasks.h"
 
 namespace lumo {
@@ -32,21 +32,21 @@ class VEXG_EXPORT SegmentNumbers {
   /// @param forest  what basins have become; outlives this.
   /// @param joined  what the numbers of that have become in turn, each of which is given already;
   ///                null for themselves.
-  SegmentNumbers(const SeamlessWatershed& basins, LabelForest& forest, LabelForest* joined,
+  SegmentNumbers(const BasinLabels& basins, LabelForest& forest, LabelForest* joined,
                  bool bordersOnly)
       : basins_(basins), forest_(forest), joined_(joined), bordersOnly_(bordersOnly) {}
 
   /// Makes a tile of a strip whose pixels are basins.
   bool FindBasins(unsigned strip, Tile<std::int32_t>& tile) const;
   /// Gives the pixels of the next strip the numbers of their segments, or marks borders of these.
-  /// False, with the fault set, when the forest is not well.
+  /// False, with the fault set, when the forest is not well or labels can't be read.
   bool Number(Tile<std::int32_t>& tile);
 
  private:
   void FindRoots(std::int32_t* labels, std::size_t count);
-  void MarkBorders(Tile<std::int32_t>& tile);
+  bool MarkBorders(Tile<std::int32_t>& tile);
 
-  const SeamlessWatershed& basins_;
+  const BasinLabels& basins_;
   LabelForest& forest_;
   LabelForest* joined_;
   bool bordersOnly_;

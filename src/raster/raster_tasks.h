@@ -23,8 +23,8 @@ class TilePool {
 };
 
 /// The first stage of a process over a raster: reads the tiles row by row, left to right, and gives
-/// one in slot 0. Setup arguments: the iterator. Exists for TwelveTypes. The end of the raster ends
-/// the run; a block that can't be read fails it with TaskError.
+/// one in slot 0. Setup arguments: the iterator; of some tiles alone the first, and how many, as
+/// Scalar<std::uint64_t>. Exists for TwelveTypes. A block that can't be read fails with TaskError.
 template <typename T>
 class RasterReadTask final : public SequentialTask {
  public:

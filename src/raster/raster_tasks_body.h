@@ -1,5 +1,8 @@
 #pragma once
 
+#include <algorithm>
+
+#include "foundation/scalar.h"
 #include "raster/raster_tasks.h"
 #include "tasks/task_errors.h"
 
@@ -24,6 +27,11 @@ RasterReadTask<T>::RasterReadTask(ArgList& setup)
   }
   columns_ = iterator_->Columns();
   tileCount_ = std::uint64_t{columns_} * iterator_->Rows();
+  const auto* const first = FindScalarValue<std::uint64_t>(setup.Get(1));
+  const auto* const count = FindScalarValue<std::uint64_t>(setup.Get(2));
+  if (first == nullptr || count == nullptr) return;
+  nextTile_ = std::min(*first, tileCount_);
+  tileCount_ = nextTile_ + std::min(*count, tileCount_ - nextTile_);
 }
 
 template <typename T>

@@ -87,7 +87,10 @@ const CommandFactoryT<GetRasterPercentilesCommand> percentilesFactory(kPercentil
 const DivisionRegistration getRasterPercentilesDivision({.command = "GetRasterPercentilesCommand",
                                                          .kind = DivisionKind::kShares,
                                                          .source = "URI",
-                                                         .rounds = &PercentilePasses});
+                                                         .rounds = [](unsigned dataType,
+                                                                      const DivisionInputs&) {
+                                                           return PercentilePasses(dataType);
+                                                         }});
 
 }  // namespace
 }  // namespace lumo

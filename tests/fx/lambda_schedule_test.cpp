@@ -180,6 +180,20 @@ class PlainSchedule {
   std::set<std::pair<double, int>> queue_;
 };
 
+/// Labels are part of what merges have made of them.
+void CheckRoots(LambdaSchedule& schedule, const Scene& scene, const MergeList& merges) {
+  std::vector<std::uint32_t> roots(scene.labelCount);
+  for (std::uint32_t label = 0; label < roots.size(); ++label) roots[label] = label;
+  for (auto merge = merges.rbegin(); merge != merges.rend(); ++merge) {  // the last holds for all
+    roots[std::get<2>(*merge)] = roots[std::get<1>(*merge)];
+  }
+  for (const std::int32_t label : std::set(scene.labels.begin(), scene.labels.end())) {
+    if (label == 0) continue;
+    const auto asked = static_cast<std::uint32_t>(label);
+    ASSERT_EQ(schedule.RootOf(asked), roots[asked]) << "label " << label;
+  }
+}
+
 MergeList RunFast(LambdaSchedule& schedule, LabelPairs& pairs, const Scene& scene,
                   std::uint32_t hubNeighbours = MergeHubs::kNeighbours) {
   schedule.Begin(scene.labelCount, scene.bands);
@@ -199,6 +213,7 @@ MergeList RunFast(LambdaSchedule& schedule, LabelPairs& pairs, const Scene& scen
   for (LambdaSchedule::Merge merge; schedule.Step(merge);) {
     merges.emplace_back(merge.lambda, merge.lower, merge.higher);
   }
+  CheckRoots(schedule, scene, merges);
   return merges;
 }
 

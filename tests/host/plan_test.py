@@ -18,7 +18,7 @@ needs_make = unittest.skipUnless(shutil.which("make"), "no make")
 SCENE = DATA / "landsat7_u16_tiled.tif"
 FLOATS = DATA / "landsat7_f32_strip.tif"
 
-# Outputs, and how they are made: @ stands for the output.
+# Outputs, and how they are made: @ stands for the output, @NAME for a file beside it.
 JOBS = {
     "copy": ("o.tif", "copy", SCENE, "@", "--bands", "3,1"),
     "bands": ("o.tif", "copy", SCENE, "@", "--tile", "64", "--interleave", "bsq", "--compress", "deflate"),
@@ -37,6 +37,10 @@ JOBS = {
     "shares": ("o.csv", "zonal", SCENE, "ZONES", "-o", "@", "--weights", "coverage"),
     "polygons": ("o.fxv", "polygonize", "LABELS", "@"),
     "areas": ("o.geojson", "polygonize", DATA / "dem_int16.tif", "@", "--min-size", "2"),
+    "segments": ("o.tif", "segment", FLOATS, "@", "--segment-percent", "30", "--merge-percent", "90", "--min-size", "5"),
+    "tree": ("o.tif", "segment", SCENE, "@", "--tree", "@o.tree", "--merge-percent", "95", "--tile", "64"),
+    "rounds": ("o.tif", "segment", SCENE, "@", "--order", "local", "--merge-value", "90", "--segment-value", "9"),
+    "rigorous": ("o.tif", "segment", FLOATS, "@", "--merge-algorithm", "rigorous", "--merge-value", "20", "--borders"),
     "attributes": ("o", "attributes", FLOATS, "LABELS", "-o", "@", "--spectral", "--texture", "--shape"),
 }
 
@@ -54,7 +58,8 @@ class PlanTest(FolderTest):
 
     def words(self, name, place):
         output, *arguments = JOBS[name]
-        return [str(place / output if word == "@" else self.inputs.get(word, word)) for word in arguments]
+        return [str(place / (word[1:] or output) if str(word).startswith("@") else self.inputs.get(word, word))
+                for word in arguments]
 
     def single(self, name):
         """Makes a job in one run, and gives the output."""
@@ -108,6 +113,13 @@ class Parts(PlanTest):
             self.fine("run", "-q", "-o", self.folder / "result.xml", place / each["document"])
         self.assert_same(place / "o.tif", self.single("calc"))
 
+    def test_parts_do_not_read_an_output_that_is_there_from_before(self):
+        place = self.plan("tree", "--parts", "2")
+        (place / "o.tree").write_bytes(b"old")
+        self.fine("plan", "-q", "--replace", "-o", place, "--parts", "2", *self.words("tree", place))
+        for each in self.manifest(place)["documents"]:
+            self.assertNotIn(str(place / "o.tree"), [read["file"] for read in each["inputs"]])
+
     def test_parts_come_by_their_number_or_their_memory(self):
         for options, parts in ((("--parts", "3"), 3), (("--parts", "9999"), 352),
                                (("--part-memory", "200000"), 3), (("--part-memory", "100000000"), 1)):
@@ -118,12 +130,23 @@ class Parts(PlanTest):
 
     def test_work_that_cannot_be_divided_is_one_part_and_a_line_says_so(self):
         place = self.folder / "plan"
-        code, out, err = run("plan", "--parts", "4", "-o", str(place), "segment", str(SCENE), str(place / "o.tif"))
+        shutil.copyfile(SCENE, self.folder / "scene.tif")
+        code, out, err = run("plan", "--parts", "4", "-o", str(place), "pyramid", "build", str(self.folder / "scene.tif"))
         self.assertEqual((code, out), (0, ""))
         self.assertRegex(err, r"\A(vexg: note: [^\n]+\n)+\Z")
         self.assertEqual([each["document"] for each in self.manifest(place)["documents"]], ["part-0000.xml"])
-        self.fine("run", "--once", "-q", place / "part-0000.xml")
-        self.assertTrue((place / "o.tif").exists())
+
+    def test_segments_of_tiles_are_made_by_the_merge_when_parts_have_found_the_gradients(self):
+        place = self.folder / "plan"
+        words = ("segment", str(FLOATS), "--tiled", "--tile-memory", "50000", "--segment-percent", "30",
+                 "--merge-percent", "90")
+        code, _, err = run("plan", "--parts", "2", "-o", str(place), *words, str(place / "o.tif"))
+        self.assertEqual(code, 0)
+        self.assertRegex(err, r"\Avexg: note: FxTileSegmentMergeCommand [^\n]+ Seamless is not true[^\n]+\n\Z")
+        for each in self.manifest(place)["documents"]:
+            self.fine("run", "--once", "-q", place / each["document"])
+        self.fine(*words, self.folder / "o.tif", "-q")
+        self.assert_same(place / "o.tif", self.folder / "o.tif")
 
     def test_what_a_document_would_lose_is_said_and_complex_numbers_stay_whole(self):
         code, _, err = run("plan", "--parts", "2", "-o", str(self.folder / "a"), "warp", str(SCENE),

@@ -82,6 +82,14 @@ std::vector<std::string> MadeBy(const JobCommand& command) {
   return {division->makes.begin(), division->makes.end()};
 }
 
+/// True for an input that names a file which the command makes, but not a share of it: that reads
+/// no file which lies there from before.
+bool IsLeftToOthers(const JobCommand& command, const std::string& input) {
+  const DivisionDeclaration* const division = FindDivision(String(command.id));
+  return command.Find(kShareInput) != nullptr && division != nullptr &&
+         std::find(division->makes.begin(), division->makes.end(), input) != division->makes.end();
+}
+
 }  // namespace
 
 const std::string* JobCommand::Find(const std::string& input) const {
@@ -227,7 +235,7 @@ JobFiles FindFiles(const std::vector<JobCommand>& commands) {
   }
   for (const JobCommand& command : commands) {
     for (const JobInput& input : command.inputs) {
-      if (!VariablesOf(input).empty()) continue;
+      if (!VariablesOf(input).empty() || IsLeftToOthers(command, input.name)) continue;
       for (const std::string& piece : PiecesOf(input.value)) {
         if (made.contains(piece) || read.contains(piece) || !IsFile(piece)) continue;
         read.insert(piece);

@@ -86,19 +86,27 @@ class Cutter {
     }
   }
 
+  static DivisionInputs InputsOf(const JobCommand& command) {
+    return [&command](const std::string& input) { return command.Find(input); };
+  }
+
   /// Why a command can't be divided here; empty when it can. Sets the level and the target.
   std::string WhyNot(Cut& cut) {
     const JobCommand& command = At(cut.at);
     const std::string when = cut.division->dividesWhen;
     const std::string* const form = when.empty() ? nullptr : command.Find(when);
     if (!when.empty() && (form == nullptr || *form != "Exact")) return when + " is not Exact";
+    if (cut.division->whyNot != nullptr) {
+      if (const char* const why = cut.division->whyNot(InputsOf(command))) return why;
+    }
     const std::string* const source = command.Find(cut.division->source);
     if (HasSource(cut) && (source == nullptr || !source->starts_with('$'))) {
       return "its source is open before the job";
     }
     for (const std::size_t at : slices_.SliceOf(command, cut.at)) {
       if (const Cut* const before = FindCut(at)) {
-        const unsigned rounds = before->division->rounds != nullptr ? kMostRounds : 1;
+        const bool hasRounds = before->division->rounds != nullptr;
+        const unsigned rounds = hasRounds ? DivisionDeclaration::kMostRounds : 1;
         cut.level = std::max(cut.level, before->level + rounds);
       }
       if (slices_.ReadsWhatIsMade(at)) return "it works on files that the job makes";
@@ -124,7 +132,8 @@ class Cutter {
   void Measure(Cut& cut) const {
     if (!HasSource(cut)) return;
     cut.source = MeasureRaster(job_, slices_, *At(cut.at).Find(cut.division->source), cut.at);
-    if (cut.division->rounds != nullptr) cut.rounds = cut.division->rounds(cut.source.dataType);
+    if (cut.division->rounds == nullptr) return;
+    cut.rounds = cut.division->rounds(cut.source.dataType, InputsOf(At(cut.at)));
   }
 
   /// False for work on files alone.
@@ -229,6 +238,9 @@ class Cutter {
     constexpr std::uint64_t kProgram = 128 << 20, kThread = 32 << 20, kTileLines = 512;
     std::uint64_t memory = kProgram + request_.threads * kThread;
     for (const Cut* const cut : cuts) {
+      const std::uint64_t pixels = std::uint64_t{cut->source.samples} * cut->source.lines;
+      memory += isMerge ? pixels * cut->division->joinBytes
+                        : (pixels / parts_ + 1) * cut->division->shareBytes;
       if (cut->division->kind != DivisionKind::kRows || cut->source.lines == 0) continue;
       const std::uint64_t line = BytesOf(*cut) / cut->source.lines;
       memory += 3 * line * kTileLines * (isMerge ? 3 : 1);
@@ -344,6 +356,7 @@ class Cutter {
                 JobCommands& job) const {
     JobCommand share = At(cut.at);
     share.outputs.clear();
+    share.Remove(cut.division->target);
     const auto number = static_cast<std::size_t>(&cut - cuts_.data());
     const auto end = files_[number].begin() + static_cast<std::ptrdiff_t>(round * parts_);
     if (round != 0) share.Set(kShareFilesInput, JoinedByBars({files_[number].begin(), end}));
@@ -423,7 +436,6 @@ class Cutter {
   }
 
   static constexpr std::uint64_t kMostParts = 10000;  // of four digits
-  static constexpr unsigned kMostRounds = 4;
 
   const JobCommands& job_;
   const CutRequest& request_;

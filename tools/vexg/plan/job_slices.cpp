@@ -70,7 +70,9 @@ std::vector<std::size_t> JobSlices::SliceOf(const JobCommand& command, std::size
     for (const std::string& variable : VariablesOf(input)) wanted.insert(variable);
   }
   const DivisionDeclaration* const division = FindDivision(String(command.id));
-  if (division != nullptr && division->kind == DivisionKind::kRows) {
+  const bool isDivided = division != nullptr && (division->kind == DivisionKind::kRows ||
+                                                 division->kind == DivisionKind::kShares);
+  if (isDivided) {
     const std::string* const target = command.Find(division->target);
     if (target != nullptr) wanted.erase(*target);
   }
