@@ -2,6 +2,7 @@
 
 #include <cstdint>
 #include <cstring>
+#include <memory>
 #include <string>
 #include <type_traits>
 #include <vector>
@@ -9,6 +10,10 @@
 #include "commands/division.h"
 
 namespace lumo {
+
+namespace platform {
+class RandomAccessFile;
+}
 
 // Files of shares: what one share of the work of a command has come to, for the command that joins
 // all of them. A header (magic, checksum, key, share) stands in front of numbers in the byte order
@@ -21,9 +26,18 @@ namespace lumo {
 ///     out.Put(sum);
 ///     if (!out.Write(path, key, share)) return Fail();
 ///
-/// Memory: all that was put.
+/// Memory: all that was put; after StreamTo 1 MiB.
 class VEXG_EXPORT ShareWriter {
  public:
+  ShareWriter();
+  ~ShareWriter();
+  ShareWriter(const ShareWriter&) = delete;
+  ShareWriter& operator=(const ShareWriter&) = delete;
+
+  /// Begins the file at once, so that what is put goes there as it comes: for shares that come to
+  /// much. Comes before anything is put; Write, of the same path, ends the file.
+  /// @return false, with the fault set, when it can't be made.
+  bool StreamTo(const std::string& path);
   /// Adds a number.
   template <typename T>
   void Put(const T& number) {
@@ -40,19 +54,27 @@ class VEXG_EXPORT ShareWriter {
   /// Makes the file, in place of an older one.
   /// @param key  says of what command, raster and inputs the share is.
   /// @return false, with the fault set, when it can't be written.
-  bool Write(const std::string& path, const std::string& key, const Share& share) const;
+  bool Write(const std::string& path, const std::string& key, const Share& share);
 
  private:
   void PutBytes(const void* data, std::size_t bytes);
+  void WritePiece(const unsigned char* piece, std::size_t bytes);
 
-  std::vector<unsigned char> bytes_;
+  std::unique_ptr<platform::RandomAccessFile> file_;  // once it is begun
+  std::string fault_;                                 // of its first failed write
+  std::uint64_t written_ = 0;                         // bytes of numbers in it
+  std::uint64_t checksum_ = 0;                        // of these
+  std::vector<unsigned char> bytes_;                  // that aren't written yet
 };
 
 /// Reads the numbers of a share again, in the order in which they were put.
+///
+/// The file is open while some of it is read, and not in between, so that those of many shares may
+/// be read at the same time. Memory: 1 MiB from Open to the end.
 class VEXG_EXPORT ShareReader {
  public:
-  /// Reads a file. @return false, with the fault set, when it can't be read, is damaged, or isn't
-  /// of this key and share.
+  /// Reads a file to its end and goes back. @return false, with the fault set, when it can't be
+  /// read, is damaged, or isn't of this key and share.
   bool Open(const std::string& path, const std::string& key, const Share& share);
 
   /// The next number. False behind the end.
@@ -65,15 +87,21 @@ class VEXG_EXPORT ShareReader {
     return GetBytes(numbers, count * sizeof(T));
   }
   /// Bytes that are left.
-  std::size_t Left() const { return bytes_.size() - at_; }
+  std::uint64_t Left() const { return size_ - at_; }
   /// True when nothing is left.
-  bool IsAtEnd() const { return at_ == bytes_.size(); }
+  bool IsAtEnd() const { return at_ == size_; }
+  /// Gives up the memory until more is asked for.
+  void Rest() { window_ = {}; }
 
  private:
   bool GetBytes(void* data, std::size_t bytes);
+  bool ReadWindow();
 
-  std::vector<unsigned char> bytes_;
-  std::size_t at_ = 0;
+  std::string path_;
+  std::uint64_t size_ = 0;  // of the numbers
+  std::uint64_t at_ = 0;    // of the next one
+  std::uint64_t windowAt_ = 0;
+  std::vector<unsigned char> window_;  // of the numbers, from there
 };
 
 /// Sets the fault for a file of a share that doesn't hold what it should.
