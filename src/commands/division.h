@@ -1,6 +1,8 @@
 #pragma once
 
 #include <cstdint>
+#include <functional>
+#include <string>
 #include <vector>
 
 #include "commands/declaration.h"
@@ -34,6 +36,12 @@ struct DivisionDeclaration {
   /// Of shares that are done in several rounds, how many there are for a data type: those of a
   /// round get the files of all rounds before as ShareFiles. Null for one round.
   unsigned (*rounds)(unsigned dataType) = nullptr;
+  /// Gives the reason why work can't be divided as it is asked for; no text where it can. Null for
+  /// work that always can.
+  /// @param input  the value of an input, no text for an absent one.
+  /// @param bands  of the source.
+  std::string (*whyNot)(const std::function<std::string(const char* name)>& input,
+                        unsigned bands) = nullptr;
 };
 
 /// Registers a division: one static object beside the command.

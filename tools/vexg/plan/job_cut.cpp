@@ -40,6 +40,7 @@ class Cutter {
   CutJobs Run() {
     FindCuts();
     for (Cut& cut : cuts_) Measure(cut);
+    DropOddWork();
     DropOddTypes();
     CheckJoin();
     ChoosePlaces();
@@ -80,10 +81,13 @@ class Cutter {
           division->kind != DivisionKind::kEach &&
           (division->kind != DivisionKind::kNone || !FindFiles({At(at)}).made.empty());
       if (!why.empty() && isWork && At(at).id != kCreate) {
-        notes_.push_back(
-            fmt::format("{} ({}): {}; one document does all of it", At(at).id, At(at).name, why));
+        notes_.push_back(NoteOf(at, why));
       }
     }
+  }
+
+  std::string NoteOf(std::size_t at, const std::string& why) const {
+    return fmt::format("{} ({}): {}; one document does all of it", At(at).id, At(at).name, why);
   }
 
   /// Why a command can't be divided here; empty when it can. Sets the level and the target.
@@ -130,6 +134,21 @@ class Cutter {
   /// False for work on files alone.
   static bool HasSource(const Cut& cut) { return *cut.division->source != '\0'; }
 
+  /// Leaves whole what its command can't divide as it is asked for.
+  void DropOddWork() {
+    std::erase_if(cuts_, [this](const Cut& cut) {
+      if (cut.division->whyNot == nullptr) return false;
+      const auto input = [&](const char* name) {
+        const std::string* const value = At(cut.at).Find(name);
+        return value != nullptr ? *value : std::string();
+      };
+      const std::string why = cut.division->whyNot(input, cut.source.bands);
+      if (why.empty()) return false;
+      notes_.push_back(NoteOf(cut.at, why));
+      return true;
+    });
+  }
+
   /// Leaves whole what there are no views on, and questions what the single run of a verb looks at
   /// and a document doesn't.
   void DropOddTypes() {
@@ -137,10 +156,7 @@ class Cutter {
       const bool isEight =
           DispatchType(EightTypes{}, cut.source.dataType, []<typename T>() { return true; });
       if (isEight || cut.division->kind != DivisionKind::kRows) return false;
-      notes_.push_back(
-          fmt::format("{} ({}): lines of complex numbers can't be divided; one "
-                      "document does all of it",
-                      At(cut.at).id, At(cut.at).name));
+      notes_.push_back(NoteOf(cut.at, "lines of complex numbers can't be divided"));
       return true;
     };
     std::erase_if(cuts_, isOdd);
@@ -229,9 +245,11 @@ class Cutter {
     constexpr std::uint64_t kProgram = 128 << 20, kThread = 32 << 20, kTileLines = 512;
     std::uint64_t memory = kProgram + request_.threads * kThread;
     for (const Cut* const cut : cuts) {
-      if (cut->division->kind != DivisionKind::kRows || cut->source.lines == 0) continue;
-      const std::uint64_t line = BytesOf(*cut) / cut->source.lines;
-      memory += 3 * line * kTileLines * (isMerge ? 3 : 1);
+      if (cut->source.lines == 0) continue;
+      const std::uint64_t rows = kTileLines * BytesOf(*cut) / cut->source.lines;
+      const bool isByLines = cut->division->kind == DivisionKind::kRows;
+      // Files of shares are read piece by piece; they themselves take what reading ahead takes.
+      memory += rows * (isByLines ? (isMerge ? 9 : 3) : (isMerge ? 0 : 7));
     }
     return memory;
   }
