@@ -11,8 +11,6 @@
 #include "platform/folder_lock.h"
 #include "platform/temporary_file.h"
 #include "raster/pixel_types.h"
-#include "raster/raster_enums.h"
-#include "tasks/parallel.h"
 
 namespace lumo::pyramid {
 
@@ -45,8 +43,6 @@ class Registry {
   std::mutex lock_;
   std::map<std::string, std::weak_ptr<Build>> builds_;
 };
-
-constexpr unsigned char kMasks = PixelValueState::NotValid & ~PixelValueState::NoData;
 
 }  // namespace
 
@@ -87,6 +83,7 @@ Build::Build(const std::string& path, const Header& header)
 
 bool Build::Open() {
   platform::RemoveAbandonedFiles(path_);
+  order_.emplace(header_);
   std::string fault;
   file_ = RandomAccessFile::Create(temporary_, &fault);
   if (file_ == nullptr) return FailBy(fault);
@@ -127,77 +124,128 @@ bool Build::HasFailed() const {
   return true;
 }
 
-std::uint64_t Build::TileValues(const TilePlace& place) const {
-  const LevelShape shape = header_.Shape(place.level);
-  return std::uint64_t{shape.ColumnWidth(place.column)} * shape.RowHeight(place.row) *
-         header_.Tiling().bands;
-}
-
-/// A tile as it is to be stored: what was packed, else what was given.
-struct Build::Packed {
-  RawBytes pixels;
-  RawBytes states;
-  RawBytes maskStates;  // as they were given, less the bit of no data
-  std::vector<platform::ConstFilePiece> pieces;
-  TileEntry entry;
-};
-
-void Build::Pack(const TileRow& tiles, unsigned index, Packed& packed) const {
-  TilePlace place = tiles.first;
-  // The tiles in front are as wide as they come.
-  const std::uint64_t before = index * TileValues(place);
-  place.column += index;
-  const std::uint64_t values = TileValues(place);
-  const unsigned elementBytes = DataTypeBytes(header_.dataType);
-  const auto add = [&](std::span<const unsigned char> plain, RawBytes& part) -> std::uint32_t {
-    PackBytes(header_.compression, plain, part);
-    const std::span<const unsigned char> stored = part.Count() != 0 ? part.All() : plain;
-    packed.pieces.push_back({stored.data(), stored.size()});
-    return static_cast<std::uint32_t>(stored.size());
-  };
-  packed.pieces.clear();
-  packed.entry.pixelBytes =
-      add({tiles.pixels + before * elementBytes, values * elementBytes}, packed.pixels);
-  packed.entry.stateBytes = 0;
-  const std::span<const unsigned char> states(tiles.states + before, values);
-  if (std::ranges::any_of(states, [](unsigned char state) { return (state & kMasks) != 0; })) {
-    packed.maskStates.Resize(values);
-    std::ranges::transform(states, packed.maskStates.Get(),
-                           [](unsigned char s) -> unsigned char { return s & kMasks; });
-    packed.entry.stateBytes = add(packed.maskStates.All(), packed.states);
+bool Build::Write(unsigned band, const PlainTiles& tiles, const void* writer) {
+  const std::vector<TileToStore> packed = PackTiles(tiles, header_.compression);
+  Run run{{tiles.shape.level, tiles.column, tiles.row, band}, {}, {}};
+  for (const TileToStore& tile : packed) {
+    run.tiles.push_back(tile.entry);
+    for (const std::span<const unsigned char> part : {tile.pixels, tile.states}) {
+      if (!part.empty()) run.pieces.push_back({part.data(), part.size()});
+      run.bytes += part.size();
+    }
   }
-  const platform::ConstFilePiece& first = packed.pieces.front();
-  const platform::ConstFilePiece& last = packed.pieces.back();
-  packed.entry.checksum = packed.pieces.size() == 1
-                              ? Checksum(first.data, first.bytes)
-                              : Checksum(first.data, first.bytes, last.data, last.bytes);
+  return Take(run, writer);
 }
 
-bool Build::Write(const TileRow& tiles, const void* writer) {
+/// True, with the fault set, when tiles can't be some of the file.
+bool Build::FindMisfit(const PackedTileRow& row) const {
+  const LevelShape shape = header_.Shape(row.level);
+  const unsigned elementBytes = DataTypeBytes(header_.dataType);
+  const bool isInside = header_.HasLevel(row.level) && row.row < shape.Rows() &&
+                        row.band < header_.BandGroups() && row.column < shape.Columns() &&
+                        !row.tiles.empty() && row.tiles.size() <= shape.Columns() - row.column;
+  const PlainTiles plain{shape, row.row, row.column, 0, header_.Tiling().bands,
+                         0,     nullptr, nullptr};
+  std::uint64_t at = 0;
+  bool fits = isInside;
+  for (unsigned i = 0; fits && i < row.tiles.size(); ++i) {
+    const StoredTile& tile = row.tiles[i];
+    const std::uint64_t values = plain.ValuesOf(i);
+    const std::uint64_t bytes = std::uint64_t{tile.pixelBytes} + tile.stateBytes;
+    fits = bytes <= row.bytes.Count() - at &&
+           MayUnpackTo(header_.compression, tile.pixelBytes, values * elementBytes) &&
+           (tile.stateBytes == 0 || MayUnpackTo(header_.compression, tile.stateBytes, values)) &&
+           Checksum(row.bytes.Get() + at, bytes) == tile.checksum;
+    at += bytes;
+  }
+  if (!fits || at != row.bytes.Count()) Fail("packed tiles that can't be its own");
+  return !fits || at != row.bytes.Count();
+}
+
+bool Build::Write(const PackedTileRow& row, const void* writer) {
+  if (FindMisfit(row)) return false;
+  return Take({{row.level, row.column, row.row, row.band},
+               row.tiles,
+               {{row.bytes.Get(), row.bytes.Count()}},
+               row.bytes.Count()},
+              writer);
+}
+
+TileEntry& Build::EntryOf(const TilePlace& first, unsigned index) {
+  return indices_[first.level]
+                 [header_.TileNumber(first.level, first.column + index, first.row, first.band)];
+}
+
+/// Writes tiles whose turn it is, and those that have waited for them; holds others.
+bool Build::Take(const Run& run, const void* writer) {
   const std::lock_guard lock(lock_);
   writers_.insert(writer);
   if (isComplete_ || isOver_) return Fail("the pyramid is whole: it isn't written any more");
-  const TilePlace& first = tiles.first;
-  std::vector<Packed> packed(tiles.columns);
-  ParallelFor(tiles.columns, nullptr, [&](unsigned i) { Pack(tiles, i, packed[i]); });
-
-  std::vector<platform::ConstFilePiece> pieces;
-  std::uint64_t end = end_;
-  for (Packed& tile : packed) {
-    tile.entry.offset = end;
-    for (const platform::ConstFilePiece& piece : tile.pieces) {
-      pieces.push_back(piece);
-      end += piece.bytes;
+  for (unsigned i = 0; i < run.tiles.size(); ++i) {
+    TileEntry& entry = EntryOf(run.first, i);
+    if (entry.pixelBytes == 0) --missing_;
+    entry = {entry.offset, run.tiles[i].pixelBytes, run.tiles[i].stateBytes, run.tiles[i].checksum};
+  }
+  const bool hasTurn =
+      order_->IsAtEnd() || order_->Next() == run.first || EntryOf(run.first, 0).offset != 0;
+  if (!hasTurn && heldBytes_ + run.bytes <= MostHeldBytes()) {
+    Hold(run);
+    return true;
+  }
+  if (!Append(run)) return false;
+  while (!order_->IsAtEnd()) {
+    if (EntryOf(order_->Next(), 0).offset != 0) {
+      order_->Advance();
+    } else if (!held_.contains(order_->Next())) {
+      return true;
+    } else if (!AppendHeld(order_->Next())) {
+      return false;
     }
   }
+  return true;
+}
+
+/// The bytes of tiles that may wait: some rows of each level, as far as one may run ahead of
+/// another. Who writes in an order of his own gets that order.
+std::uint64_t Build::MostHeldBytes() const {
+  constexpr std::uint64_t kRows = 3, kLeast = 32 << 20;
+  std::uint64_t bytes = kLeast;
+  for (unsigned level = header_.levelMin; level <= header_.levelMax; ++level) {
+    const LevelShape shape = header_.Shape(level);
+    bytes += kRows * shape.width * shape.tileSide * header_.Tiling().bands *
+             DataTypeBytes(header_.dataType);
+  }
+  return bytes;
+}
+
+void Build::Hold(const Run& run) {
+  PackedTileRow& held = held_[run.first];
+  heldBytes_ += run.bytes;
+  heldBytes_ -= held.bytes.Count();
+  held = {run.first.level, run.first.row, run.first.column, run.first.band, run.tiles, {}};
+  held.bytes.Resize(run.bytes);
+  unsigned char* to = held.bytes.Get();
+  for (const platform::ConstFilePiece& piece : run.pieces) {
+    to = std::copy_n(static_cast<const unsigned char*>(piece.data), piece.bytes, to);
+  }
+}
+
+bool Build::AppendHeld(const TilePlace& first) {
+  const auto at = held_.find(first);
+  const PackedTileRow held = std::move(at->second);
+  held_.erase(at);
+  heldBytes_ -= held.bytes.Count();
+  return Append({first, held.tiles, {{held.bytes.Get(), held.bytes.Count()}}, held.bytes.Count()});
+}
+
+/// Writes tiles at the end of the file.
+bool Build::Append(const Run& run) {
   std::string fault;
-  if (!file_->Write(end_, pieces, &fault)) return FailBy(fault);
-  end_ = end;
-  for (unsigned i = 0; i < tiles.columns; ++i) {
-    TileEntry& entry = indices_[first.level][header_.TileNumber(first.level, first.column + i,
-                                                                first.row, first.band)];
-    if (entry.offset == 0) --missing_;
-    entry = packed[i].entry;
+  if (!file_->Write(end_, run.pieces, &fault)) return FailBy(fault);
+  for (unsigned i = 0; i < run.tiles.size(); ++i) {
+    const StoredTile& tile = run.tiles[i];
+    EntryOf(run.first, i) = {end_, tile.pixelBytes, tile.stateBytes, tile.checksum};
+    end_ += std::uint64_t{tile.pixelBytes} + tile.stateBytes;
   }
   return true;
 }
@@ -228,6 +276,9 @@ bool Build::Complete(const std::string& values) {
   const std::lock_guard lock(lock_);
   if (isComplete_) return true;
   if (!IsWhole()) return Fail("the levels are not whole yet");
+  while (!held_.empty()) {
+    if (!AppendHeld(held_.begin()->first)) return false;
+  }
   Header header = header_;
   header.sequence = 0;
   std::string fault;

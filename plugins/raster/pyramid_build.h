@@ -1,16 +1,21 @@
 #pragma once
 
 #include <atomic>
+#include <map>
+#include <optional>
 #include <set>
 
+#include "data/packed_levels.h"
 #include "platform/file_identity.h"
 #include "platform/memory_shortage.h"
+#include "pyramid/packed_tiles.h"
 #include "pyramid_file.h"
 
 namespace lumo::pyramid {
 
 /// A pyramid file in the making. It lies beside its place under a temporary name, and is whole once
-/// every tile of every level is written and Complete was called. Then it can be read and given
+/// every tile of every level is written and Complete was called. Tiles that come before their turn,
+/// see TileOrder, are held in memory until that. Then the file can be read and given
 /// values there, until it takes its place: up to that moment the file that stands there stays as it
 /// is. One that is let go before takes its temporary file away.
 ///
@@ -36,16 +41,12 @@ class Build {
 
   const Header& GetHeader() const { return header_; }
 
-  /// A row of tiles, one after the other from left to right, each a block of its own.
-  struct TileRow {
-    TilePlace first;
-    unsigned columns;
-    const unsigned char* pixels;
-    const unsigned char* states;
-  };
-  /// Packs and writes tiles. Of states, those stay that say more than that there is no data.
+  /// Packs and writes tiles.
+  /// @param band    of a raster that is stored band by band; else 0.
   /// @param writer  identifies the writer, until it has left.
-  bool Write(const TileRow& tiles, const void* writer);
+  bool Write(unsigned band, const PlainTiles& tiles, const void* writer);
+  /// Writes tiles that are packed as the file is.
+  bool Write(const PackedTileRow& row, const void* writer);
   void Leave(const void* self);
   /// True for the one that may give the file its place: that which has begun it, or after that has
   /// left anyone, once nobody else writes.
@@ -77,7 +78,13 @@ class Build {
   void GiveUp(const std::string& fault = {});
 
  private:
-  struct Packed;
+  /// Stored tiles side by side, and where their bytes lie.
+  struct Run {
+    TilePlace first;
+    std::vector<StoredTile> tiles;
+    std::vector<platform::ConstFilePiece> pieces;
+    std::uint64_t bytes = 0;
+  };
 
   static constexpr int kStores = 2;  // of a build: histograms, then statistics
   static constexpr int kLost = -1000;
@@ -86,8 +93,13 @@ class Build {
   bool Open();
   bool Fail(const std::string& fault) const;
   bool FailBy(const std::string& fault);
-  void Pack(const TileRow& tiles, unsigned index, Packed& packed) const;
-  std::uint64_t TileValues(const TilePlace& place) const;
+  bool FindMisfit(const PackedTileRow& row) const;
+  bool Take(const Run& run, const void* writer);
+  bool Append(const Run& run);
+  bool AppendHeld(const TilePlace& first);
+  void Hold(const Run& run);
+  TileEntry& EntryOf(const TilePlace& first, unsigned index);
+  std::uint64_t MostHeldBytes() const;
 
   const std::string path_;
   const std::string temporary_;
@@ -102,6 +114,9 @@ class Build {
   std::unique_ptr<platform::RandomAccessFile> file_;
   std::array<std::vector<TileEntry>, kLevelCount> indices_;
   std::uint64_t end_ = kDataBegin;
+  std::optional<TileOrder> order_;
+  std::map<TilePlace, PackedTileRow> held_;  // by the first tile of each, before their turn
+  std::uint64_t heldBytes_ = 0;
   std::atomic<std::uint64_t> missing_{0};  // tiles
   std::atomic<bool> isComplete_{false};
   std::atomic<bool> isOver_{false};

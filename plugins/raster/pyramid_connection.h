@@ -22,6 +22,8 @@ class Connection final : public PlainRasterConnection {
   const lumo::RasterDef& Def() const { return def_; }
   lumo::RasterDef& Def() { return def_; }
   const std::string& Path() const { return path_; }
+  /// How the tiles of a build are packed.
+  Packing GetPacking() const { return compression_; }
 
   /// The file that stands on the disk; null when there is none.
   PyramidFile* File() const { return file_.get(); }

@@ -7,7 +7,7 @@
 
 #include "foundation/packing.h"
 #include "platform/random_access_file.h"
-#include "pyramid_header.h"
+#include "tile_order.h"
 
 namespace lumo::pyramid {
 
@@ -18,16 +18,6 @@ struct Tile {
   unsigned bands = 0;
   RawBytes pixels;
   RawBytes states;  ///< one for each value; none when all are 0
-};
-
-/// Which tile of a pyramid.
-struct TilePlace {
-  unsigned level;
-  unsigned column;
-  unsigned row;
-  unsigned band;  ///< of a raster that is stored band by band; else 0
-
-  friend auto operator<=>(const TilePlace&, const TilePlace&) = default;
 };
 
 /// A whole pyramid file, open for reading. docs/file-formats.md describes the format.

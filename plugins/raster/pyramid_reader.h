@@ -1,5 +1,6 @@
 #pragma once
 
+#include "data/packed_levels.h"
 #include "pyramid_connection.h"
 #include "pyramid_values.h"
 
@@ -10,7 +11,7 @@ namespace lumo::pyramid {
 /// Level 0 has the size of the raster, whether its pixels are stored or not. While a build goes on,
 /// what is read comes from the file that stands; what is written goes to the build.
 template <typename T>
-class Reader final : public PlainRasterReader<T> {
+class Reader final : public PlainRasterReader<T>, public PackedLevels {
  public:
   explicit Reader(Connection* connection)
       : PlainRasterReader<T>(connection), pyramid_(*connection) {}
@@ -62,6 +63,8 @@ class Reader final : public PlainRasterReader<T> {
   bool WritePixels(unsigned left, unsigned top, unsigned width, unsigned height,
                    const Array<unsigned>& bands, unsigned level, const T* pixels,
                    const unsigned char* state) override;
+  std::optional<Packing> GetLevelPacking() override { return pyramid_.GetPacking(); }
+  bool WritePackedTiles(const PackedTileRow& row) override;
 
  private:
   static constexpr bool kHasStats = std::is_arithmetic_v<T>;

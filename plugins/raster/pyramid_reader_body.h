@@ -233,9 +233,16 @@ bool Reader<T>::WritePixels(unsigned left, unsigned top, unsigned width, unsigne
   if (!isWhole || !areBands) return pyramid_.Fail("only whole tiles can be written");
   const unsigned band = header.BandGroups() == 1 ? 0 : bands[0];
   const auto columns = static_cast<unsigned>((right - 1) / tiling.side) - column + 1;
-  return build.Write(
-      {{level, column, row, band}, columns, reinterpret_cast<const unsigned char*>(pixels), state},
-      &pyramid_);
+  return build.Write(band,
+                     {shape, row, column, columns, tiling.bands, DataTypeBytes(header.dataType),
+                      reinterpret_cast<const unsigned char*>(pixels), state},
+                     &pyramid_);
+}
+
+template <typename T>
+bool Reader<T>::WritePackedTiles(const PackedTileRow& row) {
+  if (!CanWritePixels(row.level)) return pyramid_.Fail("the level isn't being built");
+  return pyramid_.GetBuild()->Write(row, &pyramid_);
 }
 
 /// A block to read: where it lies in the level, and in the caller's memory.

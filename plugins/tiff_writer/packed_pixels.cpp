@@ -355,15 +355,18 @@ bool PackedPixels::TakeRows(const RowsFiles& rows, bool& taken) {
   for (unsigned band = 0; band < layout.bands; ++band) bands[band] = band;
   std::vector<std::uint64_t> written(layout.Blocks());
   std::vector<std::uint64_t> blocks;
+  std::uint64_t count = 0;
+  const auto take = [&] {
+    count += blocks.size();
+    const double done = static_cast<double>(count) / static_cast<double>(layout.Blocks());
+    return TakeBlocks(*files, blocks) && (rows.watch == nullptr || rows.watch->Report(done));
+  };
   const auto note = [&](const BlockRun& run) {
     written[run.block] += std::uint64_t{run.width} * run.height;
     const std::uint64_t all =
         std::uint64_t{layout.InnerWidth(run.block)} * layout.InnerHeight(run.block);
     if (written[run.block] == all) blocks.push_back(run.block);
-    if (blocks.size() < batch_) return true;
-    const bool done = TakeBlocks(*files, blocks);
-    blocks.clear();
-    return done;
+    return blocks.size() < batch_ || take();
   };
   for (unsigned top = 0; top < layout.lines; top += std::min(rows.walkHeight, layout.lines - top)) {
     const unsigned height = std::min(rows.walkHeight, layout.lines - top);
@@ -374,11 +377,12 @@ bool PackedPixels::TakeRows(const RowsFiles& rows, bool& taken) {
     }
   }
   taken = true;
-  return TakeBlocks(*files, blocks);
+  return take();
 }
 
-/// Places packed blocks; of a file with levels these get what belongs to them.
-bool PackedPixels::TakeBlocks(PackedRows& rows, const std::vector<std::uint64_t>& blocks) {
+/// Places packed blocks, and forgets their numbers; of a file with levels these get what belongs to
+/// them.
+bool PackedPixels::TakeBlocks(PackedRows& rows, std::vector<std::uint64_t>& blocks) {
   std::vector<BlockWork> batch;
   for (const std::uint64_t block : blocks) {
     BlockWork work;
@@ -392,6 +396,7 @@ bool PackedPixels::TakeBlocks(PackedRows& rows, const std::vector<std::uint64_t>
       return false;
     }
   }
+  blocks.clear();
   std::vector<std::vector<unsigned char>> pixels(batch.size());
   RunByCrew(static_cast<unsigned>(batch.size()), [&](unsigned i) {
     const BlockLayout& layout = raster_.layout;

@@ -66,7 +66,8 @@ class PackedPixels final : public NewPixels {
 
   /// Takes all blocks out of files that hold the lines of the raster, as they are packed there, in
   /// the order in which they would be complete if the pixels were written in the blocks of
-  /// `rows.walkWidth` by `rows.walkHeight`. Comes before anything is written.
+  /// `rows.walkWidth` by `rows.walkHeight`. Comes before anything is written, and tells the watch
+  /// of `rows` how far it is.
   /// @param taken  [out] false when the files are packed otherwise; nothing has changed then.
   bool TakeRows(const RowsFiles& rows, bool& taken);
 
@@ -90,7 +91,7 @@ class PackedPixels final : public NewPixels {
   bool Append(const std::vector<unsigned char>& packed, PackedBlock& block);
   bool GiveToLevelAbove(const BlockWork& work);
   void NoteQuarter(unsigned level, std::uint64_t block);
-  bool TakeBlocks(PackedRows& rows, const std::vector<std::uint64_t>& blocks);
+  bool TakeBlocks(PackedRows& rows, std::vector<std::uint64_t>& blocks);
   bool PackRest();
   bool GetFill(unsigned lines, std::vector<unsigned char>& packed);
   bool WriteUntouched();

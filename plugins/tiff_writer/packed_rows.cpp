@@ -40,13 +40,13 @@ bool IsAlike(const std::vector<TagValue>& tags, const BlockLayout& layout, const
                             ? IsAll(tags, kTileWidth, layout.blockWidth, 0) &&
                                   IsAll(tags, kTileLength, layout.blockHeight, 0)
                             : IsAll(tags, kRowsPerStrip, layout.blockHeight, layout.lines);
-  const unsigned planes = layout.byPixel || layout.bands == 1 ? kContiguous : kSeparate;
+  const unsigned planes = layout.byPixel ? kContiguous : kSeparate;
   return hasSides && IsAll(tags, kImageWidth, layout.samples, 0) &&
          IsAll(tags, kImageLength, layout.lines, 0) &&
          IsAll(tags, kBitsPerSample, packing.bits, 1) &&
          IsAll(tags, kCompression, packing.CompressionTag(), 1) && IsAll(tags, kFillOrder, 1, 1) &&
          IsAll(tags, kSamplesPerPixel, layout.bands, 1) &&
-         IsAll(tags, kPlanarConfiguration, planes, kContiguous) &&
+         (layout.bands == 1 || IsAll(tags, kPlanarConfiguration, planes, kContiguous)) &&
          IsAll(tags, kPredictor, packing.PredictorTag(), 1) &&
          IsAll(tags, kSampleFormat, packing.sampleFormat, 1);
 }

@@ -133,6 +133,9 @@ def BuildRasterPyramidCommand(
     TileDimensions: str,
     Bins: Literal["Told", "Exact"] | None = None,
     Reduction: Literal["Told", "Average", "Mode"] | None = None,
+    Share: ArrayLike | None = None,
+    ShareFile: str | PathLike[str] | None = None,
+    ShareFiles: str | Sequence[str | PathLike[str]] | None = None,
     server: Server | None = None,
     progress: Progress = False,
 ) -> dict[str, Any]:
@@ -153,6 +156,12 @@ def BuildRasterPyramidCommand(
             that share the range of the values, or one for each of fewer integers
         Reduction: word: in place of the resampling method. Told: that; Average: means of the
             valid pixels below; Mode: the most frequent ones
+        Share: integer array: which share of the work is done, from 0, and of how many; all of
+            it when absent, and with ShareFiles
+        ShareFile: text: the file to make of a share, with Share; nothing else is given or
+            made
+        ShareFiles: text list: the files of all shares, in order: the work is taken out of
+            them
     """
     ...
 

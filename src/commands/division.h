@@ -40,9 +40,10 @@ struct DivisionDeclaration {
   /// kMostRounds: those of a round get the files of all rounds before as ShareFiles. Null for one
   /// round.
   unsigned (*rounds)(unsigned dataType, const DivisionInputs& inputs) = nullptr;
-  /// Says why a command with these inputs can't be divided; null where it can. Null for all that
-  /// can.
-  const char* (*whyNot)(const DivisionInputs& inputs) = nullptr;
+  /// Gives the reason why work can't be divided as it is asked for; no text where it can. Null for
+  /// work that always can.
+  /// @param bands  of the source.
+  std::string (*whyNot)(const DivisionInputs& inputs, unsigned bands) = nullptr;
 
   /// Bytes of memory that a share takes for each of its pixels, and joining for each of all.
   unsigned shareBytes = 0, joinBytes = 0;

@@ -40,6 +40,9 @@ class VEXG_EXPORT ShareScope {
   bool Joins() const { return !readers_.empty(); }
   const Share& GetShare() const { return share_; }
   ShareWriter& Out() { return out_; }
+  /// Has the file of the share written as its numbers are put; comes before any is.
+  /// @return false, with the fault set, when it can't be made.
+  bool StreamOut() { return out_.StreamTo(file_.ToUTF8()); }
   /// How many files of shares there are, where Joins().
   unsigned Count() const { return static_cast<unsigned>(readers_.size()); }
   /// The file of a share, from where it was left; it is read when it is first asked for, and given

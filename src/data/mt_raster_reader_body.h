@@ -4,12 +4,13 @@
 #include "data/dc_srv_call.h"
 #include "data/mt_connection.h"
 #include "data/ordered_read_body.h"
+#include "data/packed_levels.h"
 
 namespace lumo {
 
 /// The proxy of a raster reader. It belongs to its connection, on whose thread every call runs.
 template <typename T>
-class MtRasterReader final : public RasterReader<T>, public OrderedReads<T> {
+class MtRasterReader final : public RasterReader<T>, public OrderedReads<T>, public PackedLevels {
  public:
   explicit MtRasterReader(MtRasterDataConnection* connection)
       : RasterReader<T>(connection), proxy_(connection) {}
@@ -174,6 +175,19 @@ class MtRasterReader final : public RasterReader<T>, public OrderedReads<T> {
                    const unsigned char* state) override {
     return Change(44, "DcSrvCmdRrWritePixels", [&](auto& reader) {
       return reader.WritePixels(left, top, width, height, bands, level, pixels, state);
+    });
+  }
+  std::optional<Packing> GetLevelPacking() override {
+    using Answer = std::optional<Packing>;
+    return CallWith<Answer>(44, "DcSrvCmdRrWritePixels", [](auto& reader, Answer& result) {
+      auto* const levels = dynamic_cast<PackedLevels*>(&reader);
+      if (levels != nullptr) result = levels->GetLevelPacking();
+    });
+  }
+  bool WritePackedTiles(const PackedTileRow& row) override {
+    return Change(44, "DcSrvCmdRrWritePixels", [&](auto& reader) {
+      auto* const levels = dynamic_cast<PackedLevels*>(&reader);
+      return levels != nullptr && levels->WritePackedTiles(row);
     });
   }
 

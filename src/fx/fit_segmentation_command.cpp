@@ -268,10 +268,10 @@ const DivisionRegistration fitSegmentationDivision(
            return PassesOf(inputs("SegmentPercent") != nullptr,
                            percent != nullptr ? std::atof(percent->c_str()) : 0);
          },
-     .whyNot = [](const DivisionInputs& inputs) -> const char* {
+     .whyNot = [](const DivisionInputs& inputs, unsigned) -> std::string {
        const std::string* const percent = inputs("MergePercent");
        return percent != nullptr && percent->starts_with('$') ? "MergePercent isn't known before"
-                                                              : nullptr;
+                                                              : "";
      }});
 
 }  // namespace

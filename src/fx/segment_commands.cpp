@@ -383,13 +383,14 @@ const DivisionRegistration segmentMergeDivision(
      .makes = {"Tree"},
      .rounds = [](unsigned, const DivisionInputs&) { return kSegmentRounds; },
      .whyNot =
-         [](const DivisionInputs& inputs) {
+         [](const DivisionInputs& inputs, unsigned) {
            const auto is = [&](const char* name, const char* word) {
              const std::string* const text = inputs(name);
              return text != nullptr && *text == word;
            };
-           return WhyNoShares(is("Seamless", "1"), is("LambdaEstimate", "1"),
-                              is("MergeAlgorithm", "2"), is("Sums", "Exact"));
+           const char* const why = WhyNoShares(is("Seamless", "1"), is("LambdaEstimate", "1"),
+                                               is("MergeAlgorithm", "2"), is("Sums", "Exact"));
+           return std::string(why != nullptr ? why : "");
          },
      .shareBytes = 28,
      .joinBytes = 24});  // of texture, a tenth of whose pixels are basins

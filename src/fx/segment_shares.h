@@ -76,7 +76,7 @@ class VEXG_EXPORT SegmentShares {
     return false;
   }
   /// Makes the file of a share of the next round.
-  bool Write(const ShareWriter& made, const std::string& path, unsigned share) const {
+  bool Write(ShareWriter& made, const std::string& path, unsigned share) const {
     return made.Write(path, KeyOf(Rounds()), {share, count_});
   }
 

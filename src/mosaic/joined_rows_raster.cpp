@@ -44,6 +44,7 @@ JoinedRowsRaster<T>::JoinedRowsRaster(const RasterPtr<T>& parent,
   for (const RowsFile& file : files) firsts_.push_back(firsts_.back() + file.lines);
   isWhole_ = parent && firsts_.back() == parent->Lines();
   RowsFiles rows{files};
+  rows.watch = std::make_shared<RowsWatch>();
   rows.walksAsTarget = walk == CopyBlocks::kTarget;
   if (isWhole_ && !rows.walksAsTarget) {
     const auto blocks = MakeCopyIterator<T>(parent, AllBands(*parent), walk, *parent)->Dimensions();

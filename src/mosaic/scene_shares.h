@@ -46,7 +46,7 @@ class VEXG_EXPORT SceneShares {
   /// @param in  [out] null where there is none.
   bool Find(unsigned scene, ShareReader*& in);
   /// Writes the file of a share.
-  bool End() const { return !isShare_ || out_.Write(file_, key_, share_); }
+  bool End() { return !isShare_ || out_.Write(file_, key_, share_); }
 
  private:
   bool isShare_ = false;

@@ -33,7 +33,8 @@ class DynamicRasterPyramid final : public PyramidCallback<T> {
   DynamicRasterPyramid(const DynamicRasterPyramid&) = delete;
   DynamicRasterPyramid& operator=(const DynamicRasterPyramid&) = delete;
 
-  /// Starts a build. While one runs, gives one that has ended and does nothing else.
+  /// Starts a build. While one runs, gives one that has ended and does nothing else. Where a
+  /// ShareScope lives on this thread the build is of a share, or joins all; the scope outlives it.
   /// @param tiles  the levels are stored in squares of its height; 0 stands for 256.
   AsyncPtr PyramidBuild(const PyramidDef& def, const TileDimensions& tiles,
                         const AsyncCallbackPtr& callback);

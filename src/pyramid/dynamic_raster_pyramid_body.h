@@ -2,6 +2,8 @@
 
 #include <algorithm>
 
+#include "commands/share_scope.h"
+#include "data/packed_levels.h"
 #include "foundation/fault.h"
 #include "pyramid/dynamic_raster_pyramid.h"
 
@@ -69,14 +71,28 @@ AsyncPtr DynamicRasterPyramid<T>::PyramidBuild(const PyramidDef& def, const Tile
   constexpr unsigned kUsualSide = 256;
   if (order.tiles.height == 0) order.tiles.width = order.tiles.height = kUsualSide;
 
+  PyramidShares shares{ShareScope::Current()};
+  if (shares.scope != nullptr) {
+    auto* const store = dynamic_cast<PackedLevels*>(pyramidReader_.Get());
+    const auto packing = store != nullptr ? store->GetLevelPacking() : std::nullopt;
+    if (!IsKeptByTheLibrary() || !packing) {
+      SetFault("only pyramids in a file of the library's own are built in shares");
+      return {};
+    }
+    shares.packing = *packing;
+  }
+  if (shares.scope != nullptr && shares.scope->IsShare()) {
+    return Start(PyramidBuilderPtr(
+        new AsyncOrvaPyramidBuilder<T>(*this, order, makeRaster_, callback, shares)));
+  }
   if (IsKeptByTheLibrary()) {
     const bool isPrepared = pyramidReader_->PyramidBuild(
         static_cast<std::int32_t>(def.levelMin), static_cast<std::int32_t>(def.levelMax),
         static_cast<std::int32_t>(def.resamplingMethod), order.tiles);
     const bool isInside = std::ranges::equal(order.source, order.pyramid);
     if (isInside || !isPrepared) return {};
-    return Start(
-        PyramidBuilderPtr(new AsyncOrvaPyramidBuilder<T>(*this, order, makeRaster_, callback)));
+    return Start(PyramidBuilderPtr(
+        new AsyncOrvaPyramidBuilder<T>(*this, order, makeRaster_, callback, shares)));
   }
   const auto type = static_cast<PyramidType>(pyramidReader_->PyramidType());
   if (type != PyramidType::kDriver) return {};

@@ -5,6 +5,7 @@
 
 #include "data/raster_reader.h"
 #include "foundation/async.h"
+#include "foundation/packing.h"
 #include "raster/level_reduction.h"
 #include "raster/raster.h"
 #include "raster/raster_def.h"
@@ -12,6 +13,7 @@
 
 namespace lumo {
 
+class ShareScope;
 template <typename T>
 class DynamicRasterPyramid;
 template <typename T>
@@ -68,15 +70,23 @@ class AsyncPyramidBuilder final : public PyramidBuilder {
   bool built_ = false;
 };
 
+/// Says how a build takes part in one that is done in shares.
+struct PyramidShares {
+  ShareScope* scope = nullptr;       ///< null for a build of its own; outlives it
+  Packing packing = Packing::kNone;  ///< of the tiles of the pyramid
+};
+
 /// Builds a pyramid file of the library's own: the levels, the statistics of the raster on the way,
 /// and a histogram of a small level, with which the owner is left. Exists for TwelveTypes; complex
-/// rasters get neither statistics nor a histogram.
+/// rasters get neither statistics nor a histogram. Of a share it makes levels and sums alone, and
+/// no pyramid file; that of all shares takes them.
 template <typename T>
 class AsyncOrvaPyramidBuilder final : public PyramidBuilder {
  public:
   /// @param owner  outlives the build.
   AsyncOrvaPyramidBuilder(DynamicRasterPyramid<T>& owner, const PyramidOrder& order,
-                          const MakeSourceRaster<T>& makeRaster, const AsyncCallbackPtr& callback);
+                          const MakeSourceRaster<T>& makeRaster, const AsyncCallbackPtr& callback,
+                          const PyramidShares& shares = {});
   void Execute() override;
 
  private:
@@ -86,6 +96,8 @@ class AsyncOrvaPyramidBuilder final : public PyramidBuilder {
   bool Open(Rasters& rasters);
   bool MakeLevels(const Rasters& rasters);
   bool MakeReduced(const PyramidPlan<T>& plan, LevelReduction reduction);
+  bool MakeShare();
+  bool JoinShares(const Rasters& rasters);
   bool CollectStats(const RasterPtr<T>& raster);
   bool MakeHistogram(const Rasters& rasters);
   IPC Share(double weight) const;
@@ -93,6 +105,7 @@ class AsyncOrvaPyramidBuilder final : public PyramidBuilder {
   DynamicRasterPyramid<T>& owner_;
   const PyramidOrder order_;
   const MakeSourceRaster<T> makeRaster_;
+  const PyramidShares shares_;
   std::conditional_t<std::is_arithmetic_v<T>, RasterStatsPtr<T>, std::nullptr_t> stats_;
 };
 

@@ -11,6 +11,7 @@
 #include "pyramid/pyramid_builders.h"
 #include "pyramid/pyramid_process.h"
 #include "pyramid/reduced_levels.h"
+#include "pyramid/shared_levels.h"
 #include "stats/exact_bins.h"
 #include "stats/raster_histogram.h"
 #include "stats/raster_histogram_process.h"
@@ -146,8 +147,13 @@ template <typename T>
 AsyncOrvaPyramidBuilder<T>::AsyncOrvaPyramidBuilder(DynamicRasterPyramid<T>& owner,
                                                     const PyramidOrder& order,
                                                     const MakeSourceRaster<T>& makeRaster,
-                                                    const AsyncCallbackPtr& callback)
-    : PyramidBuilder(callback), owner_(owner), order_(order), makeRaster_(makeRaster) {}
+                                                    const AsyncCallbackPtr& callback,
+                                                    const PyramidShares& shares)
+    : PyramidBuilder(callback),
+      owner_(owner),
+      order_(order),
+      makeRaster_(makeRaster),
+      shares_(shares) {}
 
 /// The abort flag of the build, with a share of its progress: so many of 20 parts.
 template <typename T>
@@ -169,6 +175,10 @@ bool AsyncOrvaPyramidBuilder<T>::Open(Rasters& rasters) {
 
 template <typename T>
 void AsyncOrvaPyramidBuilder<T>::Execute() {
+  if (shares_.scope != nullptr && shares_.scope->IsShare()) {
+    if (!MakeShare()) this->Fail("the levels of the share could not be made");
+    return;
+  }
   if (!Build() || IsAborted()) return;
   // The store's other connection has gone: what is whole takes its place.
   if (!owner_.Refresh()) Fail("the pyramid could not take its place");
@@ -195,6 +205,7 @@ template <typename T>
 bool AsyncOrvaPyramidBuilder<T>::MakeLevels(const Rasters& rasters) {
   const PyramidPlan<T> plan{rasters.plain, rasters.full, order_.def.levelMin, order_.def.levelMax,
                             order_.tiles.height};
+  if (shares_.scope != nullptr) return JoinShares(rasters);
   const LevelReduction reduction = ReductionOf(order_.def.resamplingMethod);
   if (reduction != LevelReduction::kTold) return MakeReduced(plan, reduction);
   if constexpr (std::is_arithmetic_v<T>) {
@@ -221,6 +232,51 @@ bool AsyncOrvaPyramidBuilder<T>::CollectStats(const RasterPtr<T>& raster) {
   } else {
     return true;
   }
+}
+
+/// Makes the levels of a share, with the sums of its statistics, and no pyramid file.
+template <typename T>
+bool AsyncOrvaPyramidBuilder<T>::MakeShare() {
+  const detail::BuilderConnection<T> source(order_.source);
+  if (!source.Reader()) return false;
+  const RasterPtr<T> plain = makeRaster_(source.Reader(), source.Source(), RasterReaderPtr<T>(),
+                                         RasterDataConnectionPtr());
+  if (!plain) return false;
+  ObjectPtr stats;
+  if constexpr (std::is_arithmetic_v<T>) {
+    stats_.Reset(new RasterStats<T>);
+    stats = stats_;
+  }
+  const PyramidPlan<T> plan{plain, RasterPtr<T>(), order_.def.levelMin, order_.def.levelMax,
+                            order_.tiles.height};
+  return SharedLevels<T>(plan, ReductionOf(order_.def.resamplingMethod), *shares_.scope, stats,
+                         GetIPC())
+      .MakeShare(shares_.packing);
+}
+
+/// MakeLevels, out of the files of shares.
+template <typename T>
+bool AsyncOrvaPyramidBuilder<T>::JoinShares(const Rasters& rasters) {
+  auto* const store = dynamic_cast<PackedLevels*>(rasters.pyramid.Reader().Get());
+  if (store == nullptr) return false;
+  ObjectPtr stats;
+  if constexpr (std::is_arithmetic_v<T>) {
+    stats_.Reset(new RasterStats<T>);
+    stats_->Reset(rasters.plain->Bands());
+    stats = stats_;
+  }
+  constexpr double kAll = 19;  // of 20 parts of the progress
+  const PyramidPlan<T> plan{rasters.plain, rasters.full, order_.def.levelMin, order_.def.levelMax,
+                            order_.tiles.height};
+  SharedLevels<T> levels(plan, ReductionOf(order_.def.resamplingMethod), *shares_.scope, stats,
+                         Share(kAll));
+  if (!levels.Join(*store)) return false;
+  if (IsAborted()) return true;
+  if constexpr (std::is_arithmetic_v<T>) {
+    if (!stats_->Finish()) return false;
+  }
+  owner_.OnLevelsWritten();
+  return true;
 }
 
 /// MakeLevels, of means or modes.

@@ -1,7 +1,11 @@
 #include <mutex>
 
+#include <fmt/format.h>
+
+#include "commands/share_scope.h"
 #include "foundation/fault.h"
 #include "pyramid/exact_levels.h"
+#include "pyramid/reduced_levels.h"
 #include "raster/level_reduction.h"
 #include "raster/raster_command.h"
 #include "raster/raster_def.h"
@@ -83,26 +87,28 @@ const CommandDeclaration kBuild{
     "BuildRasterPyramidCommand",
     kGroup,
     "Builds the pyramid of a raster, with its statistics and a histogram, where it was opened.",
-    {RasterURIInput(),
-     {"PyramidType", Presence::kRequired, ValueKind::kWord,
-      "ORVA: a file of the library's own; DRIVER: by the driver of the format", "",
-      &WordsIn<PyramidType>},
-     {"PyramidResamplingMethod", Presence::kRequired, ValueKind::kWord,
-      "Impl, Nearest, Linear, Cubic or Majority; ORVA takes every 2^level-th pixel", "",
-      &WordsIn<PyramidResamplingMethod>},
-     {"PyramidLevelMin", Presence::kRequired, ValueKind::kInteger, "first level; 0 is a copy"},
-     {"PyramidLevelMax", Presence::kRequired, ValueKind::kInteger, "last level, up to 31"},
-     {"PyramidCanBuild", Presence::kRequired, ValueKind::kBoolean, "of the description; not read"},
-     {"TileDimensions", Presence::kRequired, ValueKind::kTiles,
-      "the levels are stored in squares of this height; of 9 bands and more in squares of 256"},
-     {"Bins", Presence::kOptional, ValueKind::kWord,
-      "of the histogram. Told: each a whole number wide, 256 at most; Exact: 256 that share the "
-      "range of the values, or one for each of fewer integers",
-      "", &WordsIn<Form>},
-     {"Reduction", Presence::kOptional, ValueKind::kWord,
-      "in place of the resampling method. Told: that; Average: means of the valid pixels below; "
-      "Mode: the most frequent ones",
-      "", &WordsIn<LevelReduction>}},
+    WithShareInputs(
+        {RasterURIInput(),
+         {"PyramidType", Presence::kRequired, ValueKind::kWord,
+          "ORVA: a file of the library's own; DRIVER: by the driver of the format", "",
+          &WordsIn<PyramidType>},
+         {"PyramidResamplingMethod", Presence::kRequired, ValueKind::kWord,
+          "Impl, Nearest, Linear, Cubic or Majority; ORVA takes every 2^level-th pixel", "",
+          &WordsIn<PyramidResamplingMethod>},
+         {"PyramidLevelMin", Presence::kRequired, ValueKind::kInteger, "first level; 0 is a copy"},
+         {"PyramidLevelMax", Presence::kRequired, ValueKind::kInteger, "last level, up to 31"},
+         {"PyramidCanBuild", Presence::kRequired, ValueKind::kBoolean,
+          "of the description; not read"},
+         {"TileDimensions", Presence::kRequired, ValueKind::kTiles,
+          "the levels are stored in squares of this height; of 9 bands and more in squares of 256"},
+         {"Bins", Presence::kOptional, ValueKind::kWord,
+          "of the histogram. Told: each a whole number wide, 256 at most; Exact: 256 that share "
+          "the range of the values, or one for each of fewer integers",
+          "", &WordsIn<Form>},
+         {"Reduction", Presence::kOptional, ValueKind::kWord,
+          "in place of the resampling method. Told: that; Average: means of the valid pixels "
+          "below; Mode: the most frequent ones",
+          "", &WordsIn<LevelReduction>}}),
     {}};
 
 class BuildRasterPyramidCommand final : public RasterCommand {
@@ -120,11 +126,17 @@ class BuildRasterPyramidCommand final : public RasterCommand {
     def.levelMax = Read<unsigned>("PyramidLevelMax");
     def.canBuild = Read<bool>("PyramidCanBuild");
     def.bins = Read<Form>("Bins");
+    const auto tiles = Read<TileDimensions>("TileDimensions");
+    ShareScope shares;
+    if (!shares.Begin({HasInput(kShareInput), Read<Array<unsigned>>(kShareInput),
+                       Read<String>(kShareFileInput), Read<Array<String>>(kShareFilesInput)},
+                      KeyOfShares(*raster, def, tiles))) {
+      return Fail();
+    }
 
     auto* const observer = new BuildObserver(GetIPC());
     const AsyncCallbackPtr callback(observer);
-    const AsyncPtr build =
-        raster->PyramidBuild(def, Read<TileDimensions>("TileDimensions"), callback);
+    const AsyncPtr build = raster->PyramidBuild(def, tiles, callback);
     if (!build) return Fail(TakeFaultOr("no build of the pyramid could be started"));
     observer->Watch(build);
     build->WaitFinished();
@@ -133,11 +145,41 @@ class BuildRasterPyramidCommand final : public RasterCommand {
       raster->PyramidAsync();  // sets the fault
       return Fail(TakeFaultOr("the build of the pyramid failed"));
     }
-    return build->IsAborted() ? Fail("the build was aborted") : Succeed();
+    if (build->IsAborted()) return Fail("the build was aborted");
+    return shares.End() ? Succeed() : Fail();
+  }
+
+  static std::string KeyOfShares(const BasicRaster& raster, const PyramidDef& def,
+                                 const TileDimensions& tiles) {
+    return fmt::format("pyramid {} {} {} {} {} {} {} {}",
+                       static_cast<unsigned>(def.resamplingMethod), def.levelMin, def.levelMax,
+                       tiles.height, raster.DataType(), raster.Bands(), raster.Samples(),
+                       raster.Lines());
   }
 };
 
 const CommandFactoryT<BuildRasterPyramidCommand> buildFactory(kBuild);
+
+/// Drivers make their levels themselves; bands that are stored apart are read along Z, unless means
+/// or modes are made of them.
+std::string WhyNotShared(const DivisionInputs& inputs, unsigned bands) {
+  const auto input = [&](const char* name) {
+    const std::string* const text = inputs(name);
+    return text != nullptr ? *text : std::string();
+  };
+  if (input("PyramidType") != "ORVA") return "the driver of the format makes the levels";
+  const bool isReduced =
+      MethodOf(ParseValue<LevelReduction>(String(input("Reduction")))).has_value();
+  const bool isApart = GroupsOfBands(bands, 1).size() > 1;
+  return isReduced || !isApart
+             ? ""
+             : "every 2^level-th pixel of more than 8 bands is taken band by band";
+}
+
+const DivisionRegistration buildDivision({.command = "BuildRasterPyramidCommand",
+                                          .kind = DivisionKind::kShares,
+                                          .source = "URI",
+                                          .whyNot = &WhyNotShared});
 
 const CommandDeclaration kRefresh{
     "RefreshRasterPyramidCommand",

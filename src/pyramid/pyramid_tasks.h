@@ -1,5 +1,6 @@
 #pragma once
 
+#include <functional>
 #include <memory>
 
 #include "pyramid/level_window.h"
@@ -23,15 +24,27 @@ struct ZPosition {
 /// alternate in the index, x lowest.
 VEXG_EXPORT ZPosition PositionAlongZ(std::uint64_t index, unsigned bits);
 
+/// Takes a row of tiles of a level, one behind the other in a block of its own each. False, with
+/// the fault set, when it can't be written.
+template <typename T>
+using LevelRowSink = std::function<bool(unsigned row, Tile<T>& tiles)>;
+
+/// Gives what writes some bands of a level, as a raster that can be written.
+template <typename T>
+LevelRowSink<T> MakeRowSink(const RasterPtr<T>& level, const LevelShape& shape,
+                            const Array<unsigned>& bands);
+
 /// Writes a level in strips, as blocks of the raster come row by row.
 template <typename T>
 class LevelStripWriter {
  public:
   /// @param level  as a raster that can be written.
   LevelStripWriter(const RasterPtr<T>& level, const LevelShape& shape, unsigned samples);
-  /// Writes some bands alone.
-  LevelStripWriter(const RasterPtr<T>& level, const LevelShape& shape, unsigned samples,
-                   const Array<unsigned>& bands);
+  /// Writes some rows of tiles.
+  /// @param endRow  behind the last.
+  LevelStripWriter(const LevelRowSink<T>& sink, const LevelShape& shape, unsigned samples,
+                   unsigned firstRow, unsigned endRow)
+      : sink_(sink), strip_(shape), samples_(samples), endRow_(endRow), row_(firstRow) {}
 
   /// Takes the pixels of the level out of a block, and writes the strips that are whole with it. A
   /// row of more than one block lies within one strip.
@@ -39,10 +52,11 @@ class LevelStripWriter {
   bool Take(const Tile<T>& block);
 
  private:
-  RasterIterator<T> iterator_;  // tiles are strips
+  const LevelRowSink<T> sink_;
   LevelWindow<T> strip_;
   const unsigned samples_;  // of the raster
-  unsigned row_ = 0;        // of tiles, that the strip is
+  const unsigned endRow_;   // of tiles, that isn't written any more
+  unsigned row_;            // of tiles, that the strip is
   bool isBegun_ = false;
 };
 

@@ -6,23 +6,24 @@
 #include "foundation/fault.h"
 #include "foundation/scalar.h"
 #include "pyramid/pyramid_tasks.h"
+#include "raster/valid_pixels.h"
 #include "tasks/task_errors.h"
 
 namespace lumo {
 
 template <typename T>
-LevelStripWriter<T>::LevelStripWriter(const RasterPtr<T>& level, const LevelShape& shape,
-                                      unsigned samples)
-    : iterator_(level, TileDimensions{shape.width, shape.tileSide}),
-      strip_(shape),
-      samples_(samples) {}
+LevelRowSink<T> MakeRowSink(const RasterPtr<T>& level, const LevelShape& shape,
+                            const Array<unsigned>& bands) {
+  const auto iterator = std::make_shared<RasterIterator<T>>(
+      level, TileDimensions{shape.width, shape.tileSide}, bands);
+  return [iterator](unsigned row, Tile<T>& tiles) { return iterator->Write(0, row, tiles); };
+}
 
 template <typename T>
 LevelStripWriter<T>::LevelStripWriter(const RasterPtr<T>& level, const LevelShape& shape,
-                                      unsigned samples, const Array<unsigned>& bands)
-    : iterator_(level, TileDimensions{shape.width, shape.tileSide}, bands),
-      strip_(shape),
-      samples_(samples) {}
+                                      unsigned samples)
+    : LevelStripWriter(MakeRowSink(level, shape, AllBands(*level)), shape, samples, 0,
+                       shape.Rows()) {}
 
 template <typename T>
 bool LevelStripWriter<T>::Take(const Tile<T>& block) {
@@ -30,12 +31,12 @@ bool LevelStripWriter<T>::Take(const Tile<T>& block) {
   const auto [x, y] = block.Origin();
   const bool endsRow = x + block.Width() == samples_;
   const unsigned end = std::min(shape.FirstFrom(std::uint64_t{y} + block.Height()), shape.height);
-  while (row_ < shape.Rows() && row_ * shape.tileSide < end) {
+  while (row_ < endRow_ && row_ * shape.tileSide < end) {
     if (!isBegun_ && !strip_.Begin(0, shape.Columns(), row_, block.Bands())) return false;
     isBegun_ = true;
     strip_.Take(block);
     if (!endsRow || end < row_ * shape.tileSide + shape.RowHeight(row_)) return true;
-    if (!iterator_.Write(0, row_, strip_.Pixels())) return false;
+    if (!sink_(row_, strip_.Pixels())) return false;
     isBegun_ = false;
     ++row_;
   }

@@ -272,7 +272,7 @@ class PassTables {
   }
 
   /// Writes the file of the share; looks whether all of the others was taken.
-  bool Close() const {
+  bool Close() {
     for (std::size_t i = 0; i < readers_.size(); ++i) {
       if (readers_[i].IsAtEnd()) continue;
       SetShareFault(shares_.files[i]);

@@ -52,6 +52,17 @@ struct MergeStats {
   }
 };
 
+/// The statistics of a tile, by all threads in strips that its size alone decides; empty after an
+/// abort, and where there is no memory for them.
+/// @param like  of as many bands; nothing is added to it.
+template <typename T, typename Stats>
+std::optional<Stats> StatsOfTile(const Stats& like, const Tile<T>& tile, const AbortFlag* abort) {
+  const ParallelRasterStatsAccumulate<T, Stats> part{like.BandCount()};
+  return ReduceStrips<Stats>(
+      tile, LeastStripPixels(like), abort, [&](const TilePart& strip) { return part(tile, strip); },
+      MergeStats());
+}
+
 template <typename T, typename Stats>
 RasterStatsAccumulateTask<T, Stats>::RasterStatsAccumulateTask(ArgList& setup)
     : ConcurrentTask("RasterStatsAccumulateTask"), stats_(setup.Get(0)) {
@@ -71,10 +82,7 @@ bool RasterStatsAccumulateTask<T, Stats>::Execute(ArgList& args) {
     SetErrorState(TaskErrorBadArgs());
     return false;
   }
-  const ParallelRasterStatsAccumulate<T, Stats> part{stats_->BandCount()};
-  const std::optional<Stats> ofTile = ReduceStrips<Stats>(
-      *tile, LeastStripPixels(*stats_), GetAbortFlag(),
-      [&](const TilePart& strip) { return part(*tile, strip); }, MergeStats());
+  const std::optional<Stats> ofTile = StatsOfTile(*stats_, *tile, GetAbortFlag());
   if (IsAborted() || (ofTile && stats_->Merge(*ofTile))) return true;
   SetErrorState(TaskError());
   return false;

@@ -41,6 +41,9 @@ JOBS = {
     "tree": ("o.tif", "segment", SCENE, "@", "--tree", "@o.tree", "--merge-percent", "95", "--tile", "64"),
     "rounds": ("o.tif", "segment", SCENE, "@", "--order", "local", "--merge-value", "90", "--segment-value", "9"),
     "rigorous": ("o.tif", "segment", FLOATS, "@", "--merge-algorithm", "rigorous", "--merge-value", "20", "--borders"),
+    "pyramid": ("o.pyr", "pyramid", "build", FLOATS, "--output", "@", "--levels", "1-5", "--tile", "16"),
+    "picked": ("o.pyr", "pyramid", "build", SCENE, "--output", "@", "--levels", "0-3", "--tile", "32", "--resampling",
+               "nearest"),
     "attributes": ("o", "attributes", FLOATS, "LABELS", "-o", "@", "--spectral", "--texture", "--shape"),
 }
 
@@ -247,8 +250,45 @@ class Joining(PlanTest):
                 self.assertEqual(*([[band[item] for item in ("count", "min", "max")] for band in
                                     json.loads(self.fine("stats", file, "--json"))["bands"]]
                                    for file in (moved / "o.vrt", single)))  # as their masks say
+        place = self.folder / "named"
+        self.fine("plan", "-q", "-o", place, "--parts", "2", "--join", "vrt", "copy", SCENE, place / "x.vrt")
+        for each in self.manifest(place)["documents"]:
+            self.fine("run", "--once", "-q", place / each["document"])
+        self.assertEqual(gdal_pixels(place / "x.vrt"), gdal_pixels(SCENE))
+        self.fails(2, "x.vrt: the name's ending tells no format", "plan", "-o", self.folder / "file", "--parts", "2",
+                   "copy", SCENE, self.folder / "x.vrt")
         self.fails(2, "--join vrt: no raster of the job is written by lines", "plan", "-o", self.folder / "none",
                    "--parts", "2", "--join", "vrt", "stats", SCENE)
+
+
+@needs_data
+class Pyramids(PlanTest):
+    def test_a_pyramid_has_the_bytes_of_one_run_however_many_shares_there_are(self):
+        single = self.single("pyramid")
+        for parts in (1, 7, 40):  # of 22 rows of tiles of the first level
+            with self.subTest(parts):
+                place = self.plan("pyramid", "--parts", str(parts), "--replace")
+                documents = self.manifest(place)["documents"]
+                self.assertEqual(documents[0]["outputs"], [str(place / "part-0000.share")])
+                self.assertEqual(documents[-1]["outputs"], [str(place / "o.pyr")])
+                for each in documents:
+                    self.assertFalse((place / "o.pyr").exists())
+                    self.fine("run", "--once", "-q", place / each["document"])
+                self.assert_same(place / "o.pyr", single)
+                (place / "o.pyr").unlink()
+
+    def test_levels_that_a_driver_makes_or_that_are_picked_band_by_band_are_one_part(self):
+        many = self.folder / "many.tif"
+        self.fine("stack", many, SCENE, SCENE, "-q")
+        for words, why in ((("--type", "DRIVER"), "the driver of the format makes the levels"),
+                           (("--resampling", "nearest", "--output", self.folder / "m.pyr"), "of more than 8 bands")):
+            with self.subTest(why):
+                place = self.folder / words[1]
+                code, _, err = run("plan", "-o", str(place), "--parts", "3", "pyramid", "build", str(many),
+                                   *map(str, words))
+                self.assertEqual(code, 0)
+                self.assertRegex(err, rf"\Avexg: note: BuildRasterPyramidCommand [^\n]+{why}[^\n]+\n\Z")
+                self.assertEqual(len(self.manifest(place)["documents"]), 1)
 
 
 @needs_data
@@ -294,6 +334,23 @@ class Once(PlanTest):
         self.fails(2, "is no document of the plan", "run", "--once", place / "other.xml")
         (place / "manifest.json").write_text('{"version": 1')
         self.fails(2, "is no whole manifest", "run", "--once", place / "part-0001.xml")
+
+    def test_a_part_whose_bytes_have_changed_is_named_and_nothing_is_made_of_it(self):
+        place = self.plan("bands", "--parts", "3")
+        for i in range(3):
+            self.fine("run", "--once", "-q", place / f"part-000{i}.xml")
+        part = place / "part-0001.tif"
+        data, times = bytearray(part.read_bytes()), part.stat()
+        data[len(data) // 2] ^= 1  # of a packed block, which nobody unpacks
+        part.write_bytes(data)
+        os.utime(part, ns=(times.st_atime_ns, times.st_mtime_ns))
+        self.fails(1, "part-0001.tif: is damaged: its bytes are not those that part-0001.xml has made", "run", "--once",
+                   "-q", place / "merge.xml")
+        self.assertFalse((place / "o.tif").exists())
+        part.unlink()
+        for document in ("part-0001.xml", "merge.xml"):
+            self.fine("run", "--once", "-q", place / document)
+        self.assert_same(place / "o.tif", self.single("bands"))
 
     def test_two_that_run_one_document_leave_it_as_one_does(self):
         place = self.plan("cog", "--parts", "2")

@@ -1,5 +1,10 @@
+#include <algorithm>
 #include <fstream>
+#include <functional>
+#include <random>
 
+#include "data/packed_levels.h"
+#include "pyramid/packed_tiles.h"
 #include "support/pyramid_scene.h"
 #include "views/sources/file_state.h"
 
@@ -232,6 +237,117 @@ TEST(PyramidFile, TakesWholeTilesOnly) {
   EXPECT_FALSE(reader->CanWritePixels(1));
   const Shown shown = Show(scene.Path());
   EXPECT_EQ(shown.pixels, pixels);
+}
+
+/// Of bands together and each alone, along Z and by rows; tiles are written in any order.
+TEST(PyramidFile, HasTheSameBytesWhicheverTileIsFirst) {
+  const struct {
+    unsigned samples, lines, bands;
+    std::int32_t method;
+  } cases[] = {{40, 70, 2, 2}, {600, 900, 9, 2}, {600, 300, 9, 6}};
+  for (const auto& c : cases) {
+    SCOPED_TRACE(c.method + 10 * c.bands);
+    std::string first;
+    for (const unsigned seed : {1, 2, 3}) {
+      PyramidScene scene;
+      RasterDef def;
+      def.samples = c.samples;
+      def.lines = c.lines;
+      def.bands = c.bands;
+      def.dataType = kDataTypeOf<std::uint16_t>;
+      def.format = "Pyramid";
+      const auto source = CreateSource({"Pyramid", scene.Path()}, def);
+      const auto reader = ReaderOf<std::uint16_t>(source);
+      ASSERT_TRUE(reader->PyramidBuild(0, 3, c.method, TileDimensions{8, 8}));
+      struct Place {
+        LevelShape shape;
+        unsigned column, row, band;
+      };
+      std::vector<Place> places;
+      const LevelTiling tiling = TilingOf(c.bands, 8);
+      for (unsigned level = 0; level <= 3; ++level) {
+        const LevelShape shape(c.samples, c.lines, level, tiling.side);
+        for (unsigned row = 0; row < shape.Rows(); ++row)
+          for (unsigned column = 0; column < shape.Columns(); ++column)
+            for (unsigned band = 0; band < c.bands; band += tiling.bands)
+              places.push_back({shape, column, row, band});
+      }
+      std::shuffle(places.begin(), places.end(), std::mt19937(seed));
+      for (const Place& place : places) {
+        const unsigned width = place.shape.ColumnWidth(place.column);
+        const unsigned height = place.shape.RowHeight(place.row);
+        Array<unsigned> bands(ArrayDims(tiling.bands));
+        for (unsigned i = 0; i < tiling.bands; ++i) bands[i] = place.band + i;
+        const auto value = static_cast<std::uint16_t>(place.shape.level * 1000 + place.row * 50 +
+                                                      place.column * 3 + place.band);
+        const std::vector<std::uint16_t> pixels(std::size_t{width} * height * tiling.bands, value);
+        const std::vector<unsigned char> states(pixels.size());
+        ASSERT_TRUE(reader->WritePixels(place.column * tiling.side, place.row * tiling.side, width,
+                                        height, bands, place.shape.level, pixels.data(),
+                                        states.data()))
+            << TakeFault().ToUTF8();
+      }
+      ASSERT_TRUE(reader->PyramidRefresh()) << TakeFault().ToUTF8();
+      const std::string bytes = ReadFile(scene.Path());
+      if (first.empty()) first = bytes;
+      EXPECT_TRUE(bytes == first);
+    }
+  }
+}
+
+TEST(PyramidFile, TakesPackedTilesThatCanBeItsOwn) {
+  PyramidScene scene;
+  RasterDef def;
+  def.samples = 40;
+  def.lines = 24;
+  def.bands = 2;
+  def.dataType = kDataTypeOf<std::int16_t>;
+  def.format = "Pyramid";
+  const auto source = CreateSource({"Pyramid", scene.Path()}, def);
+  const auto reader = ReaderOf<std::int16_t>(source);
+  auto* const levels = dynamic_cast<PackedLevels*>(reader.Get());
+  ASSERT_TRUE(levels != nullptr && levels->GetLevelPacking() == Packing::kLz4);
+  std::vector<std::int16_t> pixels(20 * 8 * 2, 7);
+  const std::vector<unsigned char> states(pixels.size());
+  const LevelShape shape(40, 24, 1, 8);  // 20 by 12
+  const auto rowOf = [&](unsigned row) {
+    PackedTileRow made{1, row, 0, 0, {}, {}};
+    std::vector<unsigned char> bytes;
+    for (const TileToStore& tile :
+         PackTiles({shape, row, 0, 3, 2, 2, reinterpret_cast<const unsigned char*>(pixels.data()),
+                    states.data()},
+                   Packing::kLz4)) {
+      made.tiles.push_back(tile.entry);
+      bytes.insert(bytes.end(), tile.pixels.begin(), tile.pixels.end());
+    }
+    made.bytes.Resize(bytes.size());
+    std::copy(bytes.begin(), bytes.end(), made.bytes.Get());
+    return made;
+  };
+  EXPECT_FALSE(levels->WritePackedTiles(rowOf(0)));  // nothing is being built
+  ASSERT_TRUE(reader->PyramidBuild(1, 1, 2, TileDimensions{8, 8}));
+  const std::function<void(PackedTileRow&)> faults[] = {
+      [](PackedTileRow& row) { row.level = 2; },
+      [](PackedTileRow& row) { row.row = 2; },
+      [](PackedTileRow& row) { row.column = 1; },
+      [](PackedTileRow& row) { row.band = 1; },
+      [](PackedTileRow& row) { row.tiles.clear(); },
+      [](PackedTileRow& row) { row.tiles.pop_back(); },
+      [](PackedTileRow& row) { ++row.tiles[1].checksum; },
+      [](PackedTileRow& row) { row.bytes.Get()[3] ^= 1; },
+      [](PackedTileRow& row) { row.tiles[2].pixelBytes += 4096; },
+      [](PackedTileRow& row) { row.tiles[0].stateBytes = 0xFFFFFFFF; },
+  };
+  for (const auto& fault : faults) {
+    PackedTileRow row = rowOf(0);
+    fault(row);
+    EXPECT_FALSE(levels->WritePackedTiles(row)) << &fault - faults;
+    EXPECT_NE(TakeFault().GetLength(), 0U);
+  }
+  EXPECT_TRUE(levels->WritePackedTiles(rowOf(0)) && levels->WritePackedTiles(rowOf(1)));
+  EXPECT_TRUE(reader->PyramidRefresh()) << TakeFault().ToUTF8();
+  const Shown shown = Show(scene.Path());
+  EXPECT_EQ(shown.pixels, std::vector<std::int16_t>(20 * 12 * 2, 7));
 }
 
 }  // namespace

@@ -58,6 +58,8 @@ class CreateRasterCommand final : public RasterDefCommand {
       return Fail("the source is open already, and left as it is: " +
                   connStrings[connStrings.GetCount() - 1]);
     }
+    const RowsWatch::Scope watch(def.creation.rows != nullptr ? def.creation.rows->watch : nullptr,
+                                 GetIPC());
     return Publish(MakeReaderRaster(GetGlobalDataManager().CreateRaster(connStrings, def)));
   }
 

@@ -71,6 +71,15 @@ bool IsFirst(const JobCommand& command) {
   return division != nullptr && division->kind == DivisionKind::kFirst;
 }
 
+/// True for the opening of a raster with a pyramid that isn't there where no command builds it: a
+/// share of its levels makes none.
+bool IsLeftUnbuilt(const JobCommand& command, const std::vector<JobCommand>& all) {
+  if (command.id != "OpenRasterCommand") return false;
+  return std::none_of(all.begin(), all.end(), [](const JobCommand& other) {
+    return other.id == "BuildRasterPyramidCommand" && other.Find(kShareInput) == nullptr;
+  });
+}
+
 /// The inputs of a command that name files which it makes.
 std::vector<std::string> MadeBy(const JobCommand& command) {
   if (command.Find(kShareInput) != nullptr) return {kShareFileInput};
@@ -225,6 +234,7 @@ JobFiles FindFiles(const std::vector<JobCommand>& commands) {
   JobFiles files;
   std::set<std::string> made, read;
   for (const JobCommand& command : commands) {
+    if (IsLeftUnbuilt(command, commands)) continue;
     for (const std::string& input : MadeBy(command)) {
       const std::string* const value = command.Find(input);
       if (value == nullptr || value->starts_with('$')) continue;

@@ -40,6 +40,7 @@ class Cutter {
   CutJobs Run() {
     FindCuts();
     for (Cut& cut : cuts_) Measure(cut);
+    DropOddWork();
     DropOddTypes();
     CheckJoin();
     ChoosePlaces();
@@ -80,8 +81,7 @@ class Cutter {
           division->kind != DivisionKind::kEach &&
           (division->kind != DivisionKind::kNone || !FindFiles({At(at)}).made.empty());
       if (!why.empty() && isWork && At(at).id != kCreate) {
-        notes_.push_back(
-            fmt::format("{} ({}): {}; one document does all of it", At(at).id, At(at).name, why));
+        notes_.push_back(NoteOf(at, why));
       }
     }
   }
@@ -90,15 +90,16 @@ class Cutter {
     return [&command](const std::string& input) { return command.Find(input); };
   }
 
+  std::string NoteOf(std::size_t at, const std::string& why) const {
+    return fmt::format("{} ({}): {}; one document does all of it", At(at).id, At(at).name, why);
+  }
+
   /// Why a command can't be divided here; empty when it can. Sets the level and the target.
   std::string WhyNot(Cut& cut) {
     const JobCommand& command = At(cut.at);
     const std::string when = cut.division->dividesWhen;
     const std::string* const form = when.empty() ? nullptr : command.Find(when);
     if (!when.empty() && (form == nullptr || *form != "Exact")) return when + " is not Exact";
-    if (cut.division->whyNot != nullptr) {
-      if (const char* const why = cut.division->whyNot(InputsOf(command))) return why;
-    }
     const std::string* const source = command.Find(cut.division->source);
     if (HasSource(cut) && (source == nullptr || !source->starts_with('$'))) {
       return "its source is open before the job";
@@ -139,6 +140,17 @@ class Cutter {
   /// False for work on files alone.
   static bool HasSource(const Cut& cut) { return *cut.division->source != '\0'; }
 
+  /// Leaves whole what its command can't divide as it is asked for.
+  void DropOddWork() {
+    std::erase_if(cuts_, [this](const Cut& cut) {
+      if (cut.division->whyNot == nullptr) return false;
+      const std::string why = cut.division->whyNot(InputsOf(At(cut.at)), cut.source.bands);
+      if (why.empty()) return false;
+      notes_.push_back(NoteOf(cut.at, why));
+      return true;
+    });
+  }
+
   /// Leaves whole what there are no views on, and questions what the single run of a verb looks at
   /// and a document doesn't.
   void DropOddTypes() {
@@ -146,10 +158,7 @@ class Cutter {
       const bool isEight =
           DispatchType(EightTypes{}, cut.source.dataType, []<typename T>() { return true; });
       if (isEight || cut.division->kind != DivisionKind::kRows) return false;
-      notes_.push_back(
-          fmt::format("{} ({}): lines of complex numbers can't be divided; one "
-                      "document does all of it",
-                      At(cut.at).id, At(cut.at).name));
+      notes_.push_back(NoteOf(cut.at, "lines of complex numbers can't be divided"));
       return true;
     };
     std::erase_if(cuts_, isOdd);
@@ -238,12 +247,18 @@ class Cutter {
     constexpr std::uint64_t kProgram = 128 << 20, kThread = 32 << 20, kTileLines = 512;
     std::uint64_t memory = kProgram + request_.threads * kThread;
     for (const Cut* const cut : cuts) {
+      if (cut->source.lines == 0) continue;
+      const DivisionDeclaration& division = *cut->division;
       const std::uint64_t pixels = std::uint64_t{cut->source.samples} * cut->source.lines;
-      memory += isMerge ? pixels * cut->division->joinBytes
-                        : (pixels / parts_ + 1) * cut->division->shareBytes;
-      if (cut->division->kind != DivisionKind::kRows || cut->source.lines == 0) continue;
-      const std::uint64_t line = BytesOf(*cut) / cut->source.lines;
-      memory += 3 * line * kTileLines * (isMerge ? 3 : 1);
+      const std::uint64_t rows = kTileLines * BytesOf(*cut) / cut->source.lines;
+      if (division.shareBytes != 0) {
+        memory +=
+            isMerge ? pixels * division.joinBytes : (pixels / parts_ + 1) * division.shareBytes;
+      } else {
+        const bool isByLines = division.kind == DivisionKind::kRows;
+        // Files of shares are read piece by piece; they themselves take what reading ahead takes.
+        memory += rows * (isByLines ? (isMerge ? 9 : 3) : (isMerge ? 0 : 7));
+      }
     }
     return memory;
   }

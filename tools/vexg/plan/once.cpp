@@ -6,6 +6,7 @@
 #include <fstream>
 #include <iterator>
 #include <memory>
+#include <set>
 
 #include "commands/catalog_session.h"
 #include "commands/job_parser.h"
@@ -13,6 +14,7 @@
 #include "foundation/abandonment.h"
 #include "jobs/result_output.h"
 #include "output/output_file.h"
+#include "plan/file_checksum.h"
 #include "plan/job_commands.h"
 #include "plan/manifest.h"
 #include "platform/durability.h"
@@ -141,6 +143,41 @@ class OnceRun {
                                     " isn't done, which comes first; nothing was run");
   }
 
+  /// Refuses files of documents before this one whose bytes are no longer those that were made: a
+  /// disk may have changed them, and packed pixels are taken as they are.
+  void CheckBytes(const std::vector<std::string>& read, const AbortFlag& abort) const {
+    const std::set<std::string> wanted(read.begin(), read.end());
+    for (const std::string& other : planned_.dependsOn) {
+      const PlannedDocument* const document = manifest_.Find(other);
+      if (document == nullptr) continue;
+      const std::string path = (fs::path(folder_) / document->GetResultName()).string();
+      for (const Json& output : ReadResult(path).value("outputs", Json::array())) {
+        const std::string file = output.value("file", ""), sum = output.value("checksum", "");
+        if (sum.empty() || !wanted.contains(file)) continue;
+        const std::string now = ChecksumOf(file, abort);
+        if (now.empty() || now == sum) continue;
+        throw HostError(kExitFailed, file + ": is damaged: its bytes are not those that " + other +
+                                         " has made; remove it, and have that document run again");
+      }
+    }
+  }
+
+  /// The files that were made, with their checksums where a document takes them.
+  Json MadeAsJson(const AbortFlag& abort) const {
+    const bool isTaken = std::any_of(
+        manifest_.documents.begin(), manifest_.documents.end(), [&](const PlannedDocument& other) {
+          return std::find(other.dependsOn.begin(), other.dependsOn.end(), planned_.document) !=
+                 other.dependsOn.end();
+        });
+    std::vector<PlannedInput> made;
+    for (const std::string& file : planned_.outputs) made.push_back(LookAt(file));
+    Json list = AsJson(made);
+    for (Json& entry : list) {
+      if (isTaken) entry["checksum"] = ChecksumOf(entry.value("file", ""), abort);
+    }
+    return list;
+  }
+
   /// A result counts as new from now on for programs that go by the times of files. The remains of
   /// a run that was killed at its very end go away.
   int SayDone() const {
@@ -160,6 +197,7 @@ class OnceRun {
     interruption.SetLast();
     platform::SetDurable(request_.isDurable);
     const JobFiles files = FindFiles(commands_.commands);
+    CheckBytes(files.read, *abort);
     const OutputRules rules{.overwrite = true, .isDurable = request_.isDurable};
     auto outputs = std::make_unique<Outputs>(interruption, rules, files.read);
     for (const std::string& file : files.made) outputs->Add(file);
@@ -181,7 +219,7 @@ class OnceRun {
     if (outcome != Outcome::kDone || code != kExitSuccess || hasFault_) {
       return code == kExitSuccess ? kExitFailed : code;
     }
-    Place(std::move(outputs), document, result);
+    Place(std::move(outputs), document, result, *abort);
     interruption.SetDone();
     return kExitSuccess;
   }
@@ -202,17 +240,17 @@ class OnceRun {
 
   /// Gives the outputs their places, and writes the result. Who comes later finds it, and throws
   /// his own away.
-  void Place(std::unique_ptr<Outputs> outputs, const Document& document, const String& result) {
+  void Place(std::unique_ptr<Outputs> outputs, const Document& document, const String& result,
+             const AbortFlag& abort) {
     const platform::FolderLock lock(resultPath_);
     lock.IsHeld();  // where there is no lock, the last one wins, with the same
     if (IsDone(ReadResult(resultPath_), planned_.hash)) return;
     outputs->Commit([] {});
     outputs.reset();  // their folders go before there is a result: nobody comes here after that
     Json all{{"document", planned_.document}, {"hash", planned_.hash}};
-    std::vector<PlannedInput> made, read;
-    for (const std::string& file : planned_.outputs) made.push_back(LookAt(file));
+    std::vector<PlannedInput> read;
     for (const PlannedInput& input : planned_.inputs) read.push_back(LookAt(input.file));
-    all["outputs"] = AsJson(made);
+    all["outputs"] = MadeAsJson(abort);
     all["inputs"] = AsJson(read);
     all.update(ResultAsJson(document, result));
     const std::string text = all.dump(1) + "\n";

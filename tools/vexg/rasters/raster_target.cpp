@@ -15,6 +15,8 @@
 namespace lumo::host {
 namespace {
 
+bool takesVrtNames = false;
+
 /// The format that the ending of a name stands for; empty for none.
 std::string FormatOfName(const std::string& name) {
   static const std::pair<const char*, const char*> kEndings[] = {
@@ -26,7 +28,7 @@ std::string FormatOfName(const std::string& name) {
   for (const auto& [known, format] : kEndings) {
     if (ending == known) return format;
   }
-  return {};
+  return takesVrtNames && ending == ".vrt" ? "TIFF" : "";
 }
 
 /// Formats whose files hold every pixel as it is. Not TIFF: blocks of zeros take no room there.
@@ -138,6 +140,10 @@ void TargetOptions::AddFormatTo(OptionSet& line) {
     if (value.words != nullptr) option.Takes(OneOf(WordsOfOption(value)));
     if (value.words == nullptr) option.Shows(value.shown);
   }
+}
+
+void TakeVrtNames() {
+  takesVrtNames = true;
 }
 
 std::string ChooseFormat(const TargetOptions& target) {

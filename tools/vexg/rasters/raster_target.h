@@ -27,6 +27,10 @@ struct TargetOptions {
   void AddFormatTo(OptionSet& line);
 };
 
+/// Has outputs whose name ends with .vrt be TIFF files from now on: a plan makes a VRT file of that
+/// name on those of its parts.
+void TakeVrtNames();
+
 /// The key of the format to make. Throws HostError for none that is known.
 std::string ChooseFormat(const TargetOptions& target);
 

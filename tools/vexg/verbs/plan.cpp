@@ -16,6 +16,7 @@
 #include "plan/manifest.h"
 #include "plan/runner_text.h"
 #include "platform/random_access_file.h"
+#include "rasters/raster_target.h"
 #include "verb.h"
 
 namespace lumo::host {
@@ -86,6 +87,7 @@ class Planner {
     }
     std::vector<std::string> words = options_.words;
     words.emplace_back("--print-job");
+    if (options_.join == "vrt") TakeVrtNames();
     ReadVerbArguments(verb, words);
     const Capture capture;
     verb.work();
