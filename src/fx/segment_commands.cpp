@@ -392,7 +392,7 @@ const DivisionRegistration segmentMergeDivision(
                                                is("MergeAlgorithm", "2"), is("Sums", "Exact"));
            return std::string(why != nullptr ? why : "");
          },
-     .shareBytes = 28,
+     .shareBytes = 32,
      .joinBytes = 24});  // of texture, a tenth of whose pixels are basins
 
 const CommandDeclaration kHistogram{
