@@ -156,7 +156,8 @@ bool Window::ReadPlainOrKept(const Piece& piece) {
   if (!piece.isKept || bytes > kMostBytes || wanted < bytes / kLeastShare) return ReadPlain(piece);
   BlockCache& cache = BlockCache::Get();
   if (const Bytes kept = cache.Find(group_, piece.block)) return Carry(piece, kept.get());
-  if (std::exchange(wasAsked_[piece.block], 1) == 0) return ReadPlain(piece);
+  // A band that is asked for twice has two pieces in a block, which two threads may have.
+  if (std::atomic_ref(wasAsked_[piece.block]).exchange(1) == 0) return ReadPlain(piece);
   if (offsets_[piece.block] == 0 || sizes_[piece.block] < bytes) return false;
   std::shared_ptr<unsigned char[]> block(std::make_unique_for_overwrite<unsigned char[]>(bytes));
   if (!file_.Handle().Read(offsets_[piece.block], block.get(), bytes)) return false;

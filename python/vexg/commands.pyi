@@ -1757,6 +1757,9 @@ def FitSegmentationCommand(
     SegmentPercent: float | None = None,
     MergeURI: str | Raster | None = None,
     MergePercent: float | None = None,
+    Share: ArrayLike | None = None,
+    ShareFile: str | PathLike[str] | None = None,
+    ShareFiles: str | Sequence[str | PathLike[str]] | None = None,
     server: Server | None = None,
     progress: Progress = False,
 ) -> _FitSegmentationCommandOutputs:
@@ -1773,6 +1776,12 @@ def FitSegmentationCommand(
             instead of SegmentValue
         MergeURI: URI: the raster whose bands drive merging; that of SegmentURI when absent
         MergePercent: number: percentage of all merges to do; MergeValue is their cost
+        Share: integer array: which share of the work is done, from 0, and of how many; all of
+            it when absent, and with ShareFiles
+        ShareFile: text: the file to make of a share, with Share; nothing else is given or
+            made
+        ShareFiles: text list: the files of all shares, in order: the work is taken out of
+            them
 
     Returns:
         MinGradient: number: the smallest gradient; 0 with SegmentAlgorithm 1
@@ -2192,6 +2201,9 @@ def FxTileSegmentMergeCommand(
     Rounds: int | None = None,
     Tree: str | PathLike[str] | None = None,
     MergePercent: float | None = None,
+    Share: ArrayLike | None = None,
+    ShareFile: str | PathLike[str] | None = None,
+    ShareFiles: str | Sequence[str | PathLike[str]] | None = None,
     server: Server | None = None,
     progress: Progress = False,
 ) -> _FxTileSegmentMergeCommandOutputs:
@@ -2239,6 +2251,12 @@ def FxTileSegmentMergeCommand(
             none when absent
         MergePercent: number: with Tree: percentage of all merges to do, in place of
             MergeValue
+        Share: integer array: which share of the work is done, from 0, and of how many; all of
+            it when absent, and with ShareFiles
+        ShareFile: text: the file to make of a share, with Share; nothing else is given or
+            made
+        ShareFiles: text list: the files of all shares, in order: the work is taken out of
+            them
 
     Returns:
         LambdaHistogram: integer array: cumulative counts of the costs of all merges, in 10000

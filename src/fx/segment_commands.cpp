@@ -391,7 +391,7 @@ const DivisionRegistration segmentMergeDivision(
            return WhyNoShares(is("Seamless", "1"), is("LambdaEstimate", "1"),
                               is("MergeAlgorithm", "2"), is("Sums", "Exact"));
          },
-     .shareBytes = 28,
+     .shareBytes = 32,
      .joinBytes = 24});  // of texture, a tenth of whose pixels are basins
 
 const CommandDeclaration kHistogram{

@@ -22,6 +22,14 @@ XmlEngine* Engine() {
   return create != nullptr ? create() : nullptr;
 }
 
+// The XML library throws at many of the documents, through frames that ThreadSanitizer doesn't
+// know: it keeps each of them for good, gigabytes in the end.
+#if defined(__SANITIZE_THREAD__)
+constexpr int kDocuments = 1000;
+#else
+constexpr int kDocuments = 20000;
+#endif
+
 /// Writes down what a document holds; texts that follow one another in one piece.
 class Recorder final : public XMLSimpleParser, public XmlListener {
  public:
@@ -111,7 +119,7 @@ TEST(PlainXml, ReadsWhatTheXmlLibraryReads) {
                                            "<x:y>",
                                            "<"};
   unsigned good = 0;
-  for (int i = 0; i < 20000; ++i) {
+  for (int i = 0; i < kDocuments; ++i) {
     const std::string head[] = {"", "<?xml version=\"1.0\"?>",
                                 "<?xml version=\"1.0\" encoding=\"UTF-8\" standalone=\"no\" ?>"};
     const std::string document =
@@ -128,7 +136,7 @@ TEST(PlainXml, ReadsWhatTheXmlLibraryReads) {
     ++good;
     EXPECT_EQ(ours.record, theirs.record) << document;
   }
-  EXPECT_GT(good, 1000U);
+  EXPECT_GT(good, kDocuments / 20U);
 }
 
 TEST(PlainXml, WritesWhatTheXmlLibraryWrites) {

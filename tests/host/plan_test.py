@@ -116,7 +116,7 @@ class Parts(PlanTest):
     def test_parts_do_not_read_an_output_that_is_there_from_before(self):
         place = self.plan("tree", "--parts", "2")
         (place / "o.tree").write_bytes(b"old")
-        self.fine("plan", "-q", "--replace", "-o", place, "--parts", "2", *self.words("tree", place))
+        self.fine("plan", "-q", "--replace", "-o", place, "--parts", "2", *self.words("tree", place), "--overwrite")
         for each in self.manifest(place)["documents"]:
             self.assertNotIn(str(place / "o.tree"), [read["file"] for read in each["inputs"]])
 
