@@ -130,7 +130,7 @@ class VEXG_EXPORT LambdaSchedule {
     std::uint32_t gone;
   };
 
-  /// What a pair costs that is in the queue; below 0 for another. The cost of one doesn't change.
+  /// Gives the cost of a pair that is in the queue, which doesn't change; below 0 for another.
   double QueuedCostOf(std::uint32_t pair) const {
     const Pair& at = graph_.PairOf(pair);
     return at.isQueued ? at.cost : -1;

@@ -43,7 +43,7 @@ class VEXG_EXPORT MergeAhead {
   void LookAtNeighbours(std::size_t count);
 
   const MergeGraph& graph_;
-  // What was fetched at the step before.
+  // They were fetched at the step before.
   std::vector<std::uint32_t> merged_;  // regions that will be
   std::vector<Walk> walks_;
   std::vector<Neighbour> neighbours_;
