@@ -134,7 +134,8 @@ class Parts(PlanTest):
     def test_work_that_cannot_be_divided_is_one_part_and_a_line_says_so(self):
         place = self.folder / "plan"
         shutil.copyfile(SCENE, self.folder / "scene.tif")
-        code, out, err = run("plan", "--parts", "4", "-o", str(place), "pyramid", "build", str(self.folder / "scene.tif"))
+        code, out, err = run("plan", "--parts", "4", "-o", str(place), "pyramid", "build", "--type", "DRIVER",
+                             str(self.folder / "scene.tif"))
         self.assertEqual((code, out), (0, ""))
         self.assertRegex(err, r"\A(vexg: note: [^\n]+\n)+\Z")
         self.assertEqual([each["document"] for each in self.manifest(place)["documents"]], ["part-0000.xml"])
