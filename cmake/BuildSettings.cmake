@@ -30,7 +30,7 @@ if(VEXG_SANITIZE)
   add_compile_options(-fsanitize=${VEXG_SANITIZE} -fno-sanitize-recover=all
                       -fno-omit-frame-pointer -g1)
   add_link_options(-fsanitize=${VEXG_SANITIZE})
-  # What sanitizers add makes g++ see accesses in std::string that there are not.
+  # They make g++ see accesses in std::string that there are not.
   add_compile_options(
     "$<$<CXX_COMPILER_ID:GNU>:-Wno-array-bounds;-Wno-restrict;-Wno-stringop-overflow>")
 endif()

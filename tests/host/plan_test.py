@@ -190,6 +190,7 @@ class Parts(PlanTest):
                 ("holds a plan already", ("-o", place, "--parts", "2", "copy", SCENE, output)),
                 ("give one of --parts and --part-memory", ("-o", place, "copy", SCENE, output)),
                 ("-o is required", ("--parts", "2", "copy", SCENE, output)),
+                ("vexg help copy", ("-o", self.folder / "plan", "--parts", "2", "copy", "--help")),
                 ("no verb that works by a job", ("-o", self.folder / "f", "--parts", "2", "completion", "bash")),
                 ("can't be opened", ("-o", self.folder / "n", "--parts", "2", self.folder / "absent.xml")),
                 ("there is no plan here", (self.folder, "--runner", "make"))):

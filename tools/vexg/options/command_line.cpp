@@ -274,6 +274,8 @@ void ReadVerbArguments(const Verb& verb, const Strings& arguments) {
   line = JoinLists(line);
   try {
     app.parse(Strings(line.rbegin(), line.rend()));
+  } catch (const CLI::Success&) {
+    throw HostError(kExitUsage, "vexg help " + verb.name + " tells about " + verb.name);
   } catch (const CLI::ParseError& error) {
     throw HostError(kExitUsage, DescribeFault(line, error));
   }
