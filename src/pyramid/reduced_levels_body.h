@@ -1,7 +1,7 @@
 #pragma once
 
 #include "foundation/fault.h"
-#include "pyramid/level_cascade.h"
+#include "pyramid/level_cascade_body.h"
 #include "pyramid/reduced_levels.h"
 #include "raster/tile_process.h"
 
