@@ -13,6 +13,7 @@ is: `dask worker tcp://head:8786 --nthreads 4 --resources "memory=16e9"`.
 
 import argparse
 import json
+import logging
 import os
 import pathlib
 import sys
@@ -86,6 +87,7 @@ def local_cluster(workers, threads):
     memory = os.sysconf("SC_PAGE_SIZE") * os.sysconf("SC_PHYS_PAGES")
     return LocalCluster(n_workers=workers, threads_per_worker=1, processes=True, dashboard_address=None,
                         resources={"memory": memory / workers}, memory_limit=None,
+                        silence_logs=logging.CRITICAL,  # of workers that come and go; faults are said here
                         extensions={})  # which the packages of some distributions lack
 
 
