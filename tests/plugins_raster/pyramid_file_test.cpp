@@ -203,16 +203,21 @@ TEST(PyramidFile, WithoutTheStateOfItsRasterItMustNotBeOlder) {
   }
 }
 
-TEST(PyramidFile, TakesWholeTilesOnly) {
-  PyramidScene scene;
-  const RasterPtr<std::int16_t> raster = scene.Open<std::int16_t>();
+/// Describes a raster whose level 1 has 20 by 12 pixels.
+RasterDef SmallDef() {
   RasterDef def;
   def.samples = 40;
   def.lines = 24;
   def.bands = 2;
   def.dataType = kDataTypeOf<std::int16_t>;
   def.format = "Pyramid";
-  const auto source = CreateSource({"Pyramid", scene.Path()}, def);
+  return def;
+}
+
+TEST(PyramidFile, TakesWholeTilesOnly) {
+  PyramidScene scene;
+  const RasterPtr<std::int16_t> raster = scene.Open<std::int16_t>();
+  const auto source = CreateSource({"Pyramid", scene.Path()}, SmallDef());
   const auto reader = ReaderOf<std::int16_t>(source);
   EXPECT_FALSE(reader->CanWritePixels(1));
   ASSERT_TRUE(reader->PyramidBuild(1, 1, 2, TileDimensions{8, 8}));  // 20 by 12
@@ -297,13 +302,7 @@ TEST(PyramidFile, HasTheSameBytesWhicheverTileIsFirst) {
 
 TEST(PyramidFile, TakesPackedTilesThatCanBeItsOwn) {
   PyramidScene scene;
-  RasterDef def;
-  def.samples = 40;
-  def.lines = 24;
-  def.bands = 2;
-  def.dataType = kDataTypeOf<std::int16_t>;
-  def.format = "Pyramid";
-  const auto source = CreateSource({"Pyramid", scene.Path()}, def);
+  const auto source = CreateSource({"Pyramid", scene.Path()}, SmallDef());
   const auto reader = ReaderOf<std::int16_t>(source);
   auto* const levels = dynamic_cast<PackedLevels*>(reader.Get());
   ASSERT_TRUE(levels != nullptr && levels->GetLevelPacking() == Packing::kLz4);
