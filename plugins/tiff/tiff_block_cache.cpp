@@ -26,6 +26,19 @@ BlockCache::Bytes BlockCache::Find(std::uint64_t group, std::uint64_t block) {
   return at->second->bytes;
 }
 
+BlockCache::Bytes BlockCache::Take(std::uint64_t group, std::uint64_t block) {
+  const Key key{group, block};
+  Shard& shard = ShardOf(key);
+  const std::lock_guard lock(shard.mutex);
+  const auto at = shard.places.find(key);
+  if (at == shard.places.end()) return {};
+  Bytes taken = std::move(at->second->bytes);
+  shard.bytes -= at->second->size;
+  shard.blocks.erase(at->second);
+  shard.places.erase(at);
+  return taken;
+}
+
 void BlockCache::Keep(std::uint64_t group, std::uint64_t block, Bytes bytes, std::size_t size) {
   const Key key{group, block};
   Shard& shard = ShardOf(key);

@@ -24,6 +24,8 @@ class BlockCache {
   std::uint64_t NewGroup() { return nextGroup_++; }
   /// The block; empty when it isn't kept, or not any more.
   Bytes Find(std::uint64_t group, std::uint64_t block);
+  /// The block, which is kept no longer.
+  Bytes Take(std::uint64_t group, std::uint64_t block);
   /// Keeps a block. One that is larger than a share of the room is not kept.
   void Keep(std::uint64_t group, std::uint64_t block, Bytes bytes, std::size_t size);
   /// Lets all blocks of a group go.

@@ -148,12 +148,15 @@ bool Window::ReadPlain(const Piece& piece) {
 }
 
 /// Reads a part of a block without compression. A block that is asked for again by windows that lie
-/// anywhere is read whole and kept, since a call of the system for each window costs more.
+/// anywhere is read whole and kept, where a call of the system for each window costs more than it
+/// copies.
 bool Window::ReadPlainOrKept(const Piece& piece) {
-  constexpr std::size_t kMostBytes = 1 << 20, kLeastShare = 32;
+  constexpr std::size_t kMostBytes = 1 << 20, kLeastShare = 32, kMostRowBytes = 4096;
   const std::size_t bytes = piece.lines * image_.RowBytes();
-  const std::size_t wanted = std::size_t{piece.width} * piece.height * image_.PixelBytes();
-  if (!piece.isKept || bytes > kMostBytes || wanted < bytes / kLeastShare) return ReadPlain(piece);
+  const std::size_t row = piece.width * image_.PixelBytes(), wanted = row * piece.height;
+  if (!piece.isKept || row > kMostRowBytes || bytes > kMostBytes || wanted < bytes / kLeastShare) {
+    return ReadPlain(piece);
+  }
   BlockCache& cache = BlockCache::Get();
   if (const Bytes kept = cache.Find(group_, piece.block)) return Carry(piece, kept.get());
   // A band that is asked for twice has two pieces in a block, which two threads may have.
@@ -186,6 +189,10 @@ bool Window::ReadPiece(const Piece& piece) {
       piece.height == piece.lines &&
       (isWholeWidth || piece.left + piece.width == image_.samples % image_.blockWidth);
   const bool isPassing = isWhole && !piece.isKept;
+  if (isPassing && hasKept_) {
+    const Bytes kept = BlockCache::Get().Take(group_, piece.block);
+    if (kept) return Carry(piece, kept.get());
+  }
   if (isPassing && isWholeWidth && piece.stride == rowBytes && piece.carrier->IsPlain()) {
     return DecodeBlock(piece.block, piece.lines, piece.to);
   }

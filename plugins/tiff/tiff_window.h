@@ -13,8 +13,8 @@ struct Rect {
 
 /// Reads rectangles of an image, decoding blocks on as many threads as there are. Blocks of which a
 /// rectangle needs a part are kept for the next ones (BlockCache); of a rectangle that lies
-/// anywhere in the image all blocks are, since others will overlap with it. Blocks without
-/// compression are kept when they are needed again.
+/// anywhere in the image all blocks are, since others will overlap with it; who passes over whole
+/// blocks takes them. Blocks without compression are kept when they are needed again in short rows.
 ///
 /// Threads: one at a time.
 /// Failure: false, without a word, for data that are damaged or left out.
