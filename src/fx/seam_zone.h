@@ -45,9 +45,8 @@ struct SeamStrip {
 /// wind through them.
 ///
 /// Memory: 13 bytes for each pixel of the zones. Cost: a step for each of these.
-/// @param strips  of the whole image, from above; `first` and `last` are of each strip alone
-/// before,
-///                and of the image behind.
+/// @param strips  [in, out] of the whole image, from above. Their `first` and `last` come as each
+///                strip has them alone, and leave as the image has them.
 VEXG_EXPORT void SettleSeams(std::vector<SeamStrip>& strips, std::uint32_t width);
 
 }  // namespace lumo
