@@ -110,11 +110,12 @@ std::set<std::string> FindLibrariesOfFormats() {
   return libraries;
 }
 
-/// The formats that plug-ins bring, in the order of the names of their libraries.
+/// The formats that plug-ins bring, in the order of the names of their libraries. Like those of the
+/// table they hold their factories until the process ends.
 std::deque<FormatRecord>& FurtherFormats() {
-  static std::deque<FormatRecord> further = [] {
-    std::deque<FormatRecord> formats;
-    for (const std::string& library : FindLibrariesOfFormats()) AddFormatsOf(library, formats);
+  static auto& further = *[] {
+    auto* const formats = new std::deque<FormatRecord>;
+    for (const std::string& library : FindLibrariesOfFormats()) AddFormatsOf(library, *formats);
     return formats;
   }();
   return further;
