@@ -317,6 +317,7 @@ void SplitPixels(const void* from, void* to, std::size_t pixels, std::size_t ban
 void ConvertLines(const void* from, Interleave fromOrder, const LinesOfBlock& part, void* to,
                   Interleave toOrder, std::size_t samples, std::size_t bands,
                   std::size_t elementBytes) {
+  if (part.count == 0 || samples == 0) return;
   const std::size_t rowBytes = samples * elementBytes;
   auto* const out = static_cast<std::byte*>(to);
   if (toOrder != Interleave::BSQ || bands == 1) {
