@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <atomic>
 #include <mutex>
+#include <optional>
 #include <vector>
 
 #include "data/ordered_read.h"
@@ -15,18 +16,6 @@ namespace lumo::detail {
 
 /// The bytes of the lines that are read at once: what becomes of them stays in the second cache.
 inline constexpr std::size_t kGroupBytes = 256 << 10;
-
-/// Clears the states of some lines of a block.
-inline void ClearLines(const LinesOfBlock& part, Interleave order, std::size_t width,
-                       std::size_t bands, unsigned char* state) {
-  const bool isByBand = order == Interleave::BSQ;
-  const std::size_t planes = isByBand ? bands : 1;
-  const std::size_t lineStates = isByBand ? width : width * bands;
-  for (std::size_t plane = 0; plane < planes; ++plane) {
-    std::fill_n(state + (plane * part.ofLines + part.first) * lineStates, part.count * lineStates,
-                static_cast<unsigned char>(0));
-  }
-}
 
 /// Room for the lines that a thread reads at once; states are 0. The thread may keep it.
 template <typename T>
@@ -56,10 +45,10 @@ struct GroupRoom {
 };
 
 /// Reads a block from a ConcurrentReads in an order that isn't its own, on this thread and those of
-/// the crew. All pixels and states are written.
+/// the crew. All pixels are written; states are made by the first lines that have some.
 template <typename T>
 bool ReadInOrder(RasterReader<T>& reader, const SubRect& rect, const Array<unsigned>& bands,
-                 unsigned level, Interleave order, T* pixels, unsigned char* state) {
+                 unsigned level, Interleave order, T* pixels, BlockStates& states) {
   const Interleave native = reader.NativeInterleave();
   const std::size_t width = rect.Width(), height = rect.Height(), count = bands.GetCount();
   const std::size_t lineElements = width * count;
@@ -83,15 +72,37 @@ bool ReadInOrder(RasterReader<T>& reader, const SubRect& rect, const Array<unsig
       return;
     }
     ConvertLines(room.pixels.data(), native, part, pixels, order, width, count, sizeof(T));
-    if (AnyHasState(room.states.data(), elements, 0xFF)) {
-      ConvertLines(room.states.data(), native, part, state, order, width, count, 1);
+    if (!AnyHasState(room.states.data(), elements, 0xFF)) return room.Keep();
+    unsigned char* const state = states.Make(order, rect.Width(), rect.Height(), bands.GetCount());
+    if (state == nullptr) {
+      isRead = false;
     } else {
-      ClearLines(part, order, width, count, state);
-      room.Keep();
+      ConvertLines(room.states.data(), native, part, state, order, width, count, 1);
     }
   });
   if (!isRead && fault.GetLength() != 0) SetFault(fault);
   return isRead;
+}
+
+/// Reads a block as far as the reader needs no help to put it in order. All pixels are written.
+/// @return nothing, with no states made, where it does.
+template <typename T>
+std::optional<bool> ReadAsked(RasterReader<T>& reader, const SubRect& rect,
+                              const Array<unsigned>& bands, unsigned level, Interleave order,
+                              T* pixels, BlockStates& states) {
+  if (auto* const orders = dynamic_cast<OrderedReads<T>*>(&reader)) {
+    const auto isRead = orders->ReadOrdered(rect, bands, level, order, pixels, states);
+    if (isRead) return isRead;
+  }
+  const unsigned width = rect.Width(), height = rect.Height(), count = bands.GetCount();
+  const Interleave native = reader.NativeInterleave();
+  if (native == order || count == 1) {
+    unsigned char* const state = states.Make(order, width, height, count);
+    return state != nullptr &&
+           reader.ReadPixels(rect.left, rect.top, width, height, bands, level, pixels, state);
+  }
+  if (native == Interleave::None || dynamic_cast<ConcurrentReads*>(&reader) == nullptr) return {};
+  return ReadInOrder(reader, rect, bands, level, order, pixels, states);
 }
 
 }  // namespace lumo::detail
