@@ -7,9 +7,10 @@
 
 namespace lumo {
 
-/// Marks a reader of a plug-in whose ReadPixels may run on several threads at once, and writes
-/// every pixel of its block. Blocks that are asked for in another order than the source's are then
-/// read and put in order a few lines at a time, which stay in the cache meanwhile.
+/// Marks a reader of a plug-in whose ReadPixels may run on several threads at once, as its
+/// ReadOrdered where it is an OrderedReads too, and writes every pixel of its block. Blocks that
+/// are asked for in another order than the source's are then read and put in order a few lines at a
+/// time, which stay in the cache meanwhile.
 class VEXG_EXPORT ConcurrentReads {
  public:
   virtual ~ConcurrentReads() = default;

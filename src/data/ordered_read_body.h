@@ -55,6 +55,7 @@ bool ReadInOrder(RasterReader<T>& reader, const SubRect& rect, const Array<unsig
   const std::size_t most = std::max(kGroupBytes / (lineElements * sizeof(T)), std::size_t{1});
   const std::size_t perGroup = std::min(most, height);
   const auto groups = static_cast<unsigned>((height + perGroup - 1) / perGroup);
+  auto* const orders = dynamic_cast<OrderedReads<T>*>(&reader);
   std::atomic<bool> isRead{true};
   String fault;
   std::mutex faultLock;
@@ -64,20 +65,34 @@ bool ReadInOrder(RasterReader<T>& reader, const SubRect& rect, const Array<unsig
                             height};
     const std::size_t elements = part.count * lineElements;
     GroupRoom<T> room(elements);
-    if (!reader.ReadPixels(rect.left, rect.top + static_cast<unsigned>(part.first),
-                           static_cast<unsigned>(width), static_cast<unsigned>(part.count), bands,
-                           level, room.pixels.data(), room.states.data())) {
+    const unsigned top = rect.top + static_cast<unsigned>(part.first);
+    const auto lines = static_cast<unsigned>(part.count);
+    Array<unsigned char> ownStates;
+    BlockStates madeStates(ownStates);
+    std::optional<bool> isGroupRead;
+    if (orders != nullptr) {
+      isGroupRead = orders->ReadOrdered({rect.left, top, rect.right, top + lines - 1}, bands, level,
+                                        native, room.pixels.data(), madeStates);
+    }
+    const bool hasNone = isGroupRead && !madeStates.AreMade();
+    if (!isGroupRead) {
+      isGroupRead = reader.ReadPixels(rect.left, top, rect.Width(), lines, bands, level,
+                                      room.pixels.data(), room.states.data());
+    }
+    if (!*isGroupRead) {
       const std::lock_guard lock(faultLock);
       if (isRead.exchange(false)) fault = TakeFault();
       return;
     }
     ConvertLines(room.pixels.data(), native, part, pixels, order, width, count, sizeof(T));
-    if (!AnyHasState(room.states.data(), elements, 0xFF)) return room.Keep();
+    const unsigned char* const found =
+        madeStates.AreMade() ? ownStates.GetData() : room.states.data();
+    if (hasNone || !AnyHasState(found, elements, 0xFF)) return room.Keep();
     unsigned char* const state = states.Make(order, rect.Width(), rect.Height(), bands.GetCount());
     if (state == nullptr) {
       isRead = false;
     } else {
-      ConvertLines(room.states.data(), native, part, state, order, width, count, 1);
+      ConvertLines(found, native, part, state, order, width, count, 1);
     }
   });
   if (!isRead && fault.GetLength() != 0) SetFault(fault);
