@@ -10,7 +10,7 @@ namespace lumo::orva {
 /// the header. The first pixel that is written takes stored statistics and histograms away, since
 /// they belong to other pixels then.
 template <typename T>
-class Reader final : public RasterReader<T>, public ConcurrentReads {
+class Reader final : public RasterReader<T>, public ConcurrentReads, public OrderedReads<T> {
  public:
   Reader(Connection* connection, BandValues<T> values);
 
@@ -61,6 +61,9 @@ class Reader final : public RasterReader<T>, public ConcurrentReads {
   bool ReadPixels(unsigned left, unsigned top, unsigned width, unsigned height,
                   const Array<unsigned>& bands, unsigned level, T* pixels,
                   unsigned char* state) override;
+  /// Reads blocks in the order of the file, of bands without a no-data value.
+  std::optional<bool> ReadOrdered(const SubRect& rect, const Array<unsigned>& bands, unsigned level,
+                                  Interleave order, T* pixels, BlockStates& states) override;
   bool WritePixels(unsigned left, unsigned top, unsigned width, unsigned height,
                    const Array<unsigned>& bands, unsigned level, const T* pixels,
                    const unsigned char* state) override;

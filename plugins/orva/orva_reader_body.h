@@ -1,5 +1,7 @@
 #pragma once
 
+#include <algorithm>
+
 #include "data/merge_values.h"
 #include "foundation/fault.h"
 #include "orva/orva_pixels.h"
@@ -122,6 +124,17 @@ bool Reader<T>::DeletePalette(unsigned band) {
 }
 
 template <typename T>
+std::optional<bool> Reader<T>::ReadOrdered(const SubRect& rect, const Array<unsigned>& bands,
+                                           unsigned level, Interleave order, T* pixels,
+                                           BlockStates& /*states*/) {
+  const bool isStraight = order == Layout().interleave || bands.GetCount() == 1;
+  const auto hasNoData = [&](unsigned band) { return noData_.contains(band); };
+  if (!isStraight || std::any_of(bands.begin(), bands.end(), hasNoData)) return std::nullopt;
+  return ReadPixels(rect.left, rect.top, rect.Width(), rect.Height(), bands, level, pixels,
+                    nullptr);  // which only marks no data
+}
+
+template <typename T>
 bool Reader<T>::ReadPixels(unsigned left, unsigned top, unsigned width, unsigned height,
                            const Array<unsigned>& bands, unsigned level, T* pixels,
                            unsigned char* state) {
@@ -134,7 +147,7 @@ bool Reader<T>::ReadPixels(unsigned left, unsigned top, unsigned width, unsigned
   }
   const NoDataMarker<T> marker(std::move(values), Layout().interleave, width, height);
   return orva::ReadPixels(file_, block, pixels, [&](std::uint64_t first, std::uint64_t count) {
-    marker.Mark(first, count, pixels + first, state + first);
+    if (marker.IsNeeded()) marker.Mark(first, count, pixels + first, state + first);
   });
 }
 

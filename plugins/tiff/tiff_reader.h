@@ -54,9 +54,10 @@ class Reader final : public PlainRasterReader<T>, public OrderedReads<T> {
   bool ReadPixels(unsigned left, unsigned top, unsigned width, unsigned height,
                   const Array<unsigned>& bands, unsigned level, T* pixels,
                   unsigned char* state) override;
-  /// Takes bands that lie pixel by pixel apart while blocks are decoded.
+  /// Takes bands that lie pixel by pixel apart while blocks are decoded. States are made where the
+  /// bands have a no-data value.
   std::optional<bool> ReadOrdered(const SubRect& rect, const Array<unsigned>& bands, unsigned level,
-                                  Interleave order, T* pixels, unsigned char* state) override;
+                                  Interleave order, T* pixels, BlockStates& states) override;
   bool WritePixels(unsigned left, unsigned top, unsigned width, unsigned height,
                    const Array<unsigned>& bands, unsigned level, const T* pixels,
                    const unsigned char* state) override;

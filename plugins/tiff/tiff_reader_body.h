@@ -215,17 +215,19 @@ void Reader<T>::MarkNoData(unsigned width, unsigned height, unsigned bands, Inte
 template <typename T>
 std::optional<bool> Reader<T>::ReadOrdered(const SubRect& rect, const Array<unsigned>& bands,
                                            unsigned level, Interleave order, T* pixels,
-                                           unsigned char* state) {
+                                           BlockStates& states) {
   const unsigned width = rect.Width(), height = rect.Height(), count = bands.GetCount();
-  const bool isRead = order == Interleave::BSQ && def_.interleave == Interleave::BIP &&
-                      !source_.MaskingBand() && !source_.HasMasks() && !hasChanged_ &&
+  const bool isOrdered =
+      order == def_.interleave || def_.interleave == Interleave::BIP || count == 1;
+  const bool isRead = isOrdered && !source_.MaskingBand() && !source_.HasMasks() && !hasChanged_ &&
                       IsInside(rect.left, rect.top, width, height, bands, level) &&
-                      source_.Read({rect.left, rect.top, width, height}, bands, level,
-                                   reinterpret_cast<unsigned char*>(pixels), true);
+                      source_.Read({rect.left, rect.top, width, height}, bands, level, order,
+                                   reinterpret_cast<unsigned char*>(pixels));
   if (!isRead) return std::nullopt;
-  std::fill_n(state, std::size_t{width} * height * count, static_cast<unsigned char>(0));
-  MarkNoData(width, height, count, order, pixels, state);
-  return true;
+  if (!noData_) return true;
+  unsigned char* const state = states.Make(order, width, height, count);
+  if (state != nullptr) MarkNoData(width, height, count, order, pixels, state);
+  return state != nullptr;
 }
 
 /// Reads a block, and marks where the masking band is 0, in the other bands. States are only
@@ -234,7 +236,7 @@ template <typename T>
 bool Reader<T>::ReadMasked(const Rect& rect, const Array<unsigned>& bands, unsigned level,
                            T* pixels, unsigned char* state) {
   const auto read = [&](const Array<unsigned>& chosen, T* to) {
-    return source_.Read(rect, chosen, level, reinterpret_cast<unsigned char*>(to));
+    return source_.Read(rect, chosen, level, def_.interleave, reinterpret_cast<unsigned char*>(to));
   };
   const std::optional<unsigned>& masking = source_.MaskingBand();
   const auto isOther = [&](unsigned band) { return band != *masking; };

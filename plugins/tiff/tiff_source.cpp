@@ -379,13 +379,13 @@ bool Source::Describe(const String& formatKey) {
   return true;
 }
 
-bool Source::Read(const Rect& rect, const Array<unsigned>& bands, unsigned level,
-                  unsigned char* pixels, bool splits) {
+bool Source::Read(const Rect& rect, const Array<unsigned>& bands, unsigned level, Interleave order,
+                  unsigned char* pixels) {
   const auto image = levels_.find(level);
   if (image == levels_.end()) return false;
   std::unique_ptr<Window>& window = windows_[level];
   if (window == nullptr) window = std::make_unique<Window>(*file_, image->second);
-  return window->Read(rect, bands, pixels, splits);
+  return window->Read(rect, bands, order, pixels);
 }
 
 bool Source::ReadMask(const Rect& rect, unsigned level, std::vector<unsigned char>& mask) {
@@ -399,7 +399,7 @@ bool Source::ReadMask(const Rect& rect, unsigned level, std::vector<unsigned cha
   Array<unsigned> band(ArrayDims(1));
   band[0] = 0;
   std::vector<unsigned char> packed(std::size_t{bytes.width} * bytes.height);
-  if (!window->Read(bytes, band, packed.data())) return false;
+  if (!window->Read(bytes, band, Interleave::BSQ, packed.data())) return false;
   mask.resize(std::size_t{rect.width} * rect.height);
   const unsigned shift = rect.left % kBits;
   std::vector<unsigned char> row(std::size_t{bytes.width} * kBits);

@@ -44,10 +44,10 @@ class Source {
   /// Reads the mask of a rectangle of a level: a byte for each pixel, 0 where it isn't valid.
   bool ReadMask(const Rect& rect, unsigned level, std::vector<unsigned char>& mask);
 
-  /// Reads a rectangle of a level, in the order of axes of the description.
-  /// @param splits  band after band, whatever that order.
-  bool Read(const Rect& rect, const Array<unsigned>& bands, unsigned level, unsigned char* pixels,
-            bool splits = false);
+  /// Reads a rectangle of a level.
+  /// @param order  of the axes, that of the description; or any where that is BIP.
+  bool Read(const Rect& rect, const Array<unsigned>& bands, unsigned level, Interleave order,
+            unsigned char* pixels);
 
   /// True when the file may be written.
   bool CanWrite();

@@ -212,16 +212,18 @@ bool Window::ReadPiece(const Piece& piece) {
   return true;
 }
 
-bool Window::Read(const Rect& rect, const Array<unsigned>& bands, unsigned char* pixels,
-                  bool splits) {
+bool Window::Read(const Rect& rect, const Array<unsigned>& bands, Interleave order,
+                  unsigned char* pixels) {
   if (!FindBlocks()) return false;
   const unsigned count = bands.GetCount();
   Carrier carrier{image_.elementBytes, image_.PixelBytes(), count};
   if (image_.byPixel && !AreAll(bands, image_.bands)) carrier.chosen = &bands;
+  const bool splits = image_.byPixel && count > 1 && order != Interleave::BIP;
+  const bool isByLine = splits && order == Interleave::BIL;
+  if (splits) carrier.plane = std::size_t{rect.width} * (isByLine ? 1 : rect.height);
   const bool isByPixel = image_.byPixel && !splits;  // where the pixels go
-  if (image_.byPixel && splits) carrier.plane = std::size_t{rect.width} * rect.height;
-  const std::size_t rowBytes =
-      std::size_t{rect.width} * image_.elementBytes * (isByPixel ? count : 1);
+  const std::size_t pixelBytes = std::size_t{image_.elementBytes} * (isByPixel ? count : 1);
+  const std::size_t rowBytes = rect.width * pixelBytes * (isByLine ? count : 1);
   const unsigned planes = image_.byPixel ? 1 : count;
   const std::uint64_t perPlane = std::uint64_t{image_.BlocksAcross()} * image_.BlocksDown();
   const unsigned bottom = rect.top + rect.height, right = rect.left + rect.width;
@@ -246,7 +248,7 @@ bool Window::Read(const Rect& rect, const Array<unsigned>& bands, unsigned char*
         const std::uint64_t block = (image_.byPixel ? 0 : bands[plane] * perPlane) +
                                     std::uint64_t{row} * image_.BlocksAcross() + column;
         unsigned char* const to =
-            start + (top - rect.top) * rowBytes + (left - rect.left) * (rowBytes / rect.width);
+            start + (top - rect.top) * rowBytes + (left - rect.left) * pixelBytes;
         pieces.push_back({block, image_.LinesOf(row), left - column * width, top - row * height,
                           stop - left, end - top, to, rowBytes, &carrier, isAnywhere});
       }

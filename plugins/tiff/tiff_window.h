@@ -1,6 +1,7 @@
 #pragma once
 
 #include "foundation/array.h"
+#include "raster/raster_enums.h"
 #include "tiff/tiff_block_cache.h"
 #include "tiff/tiff_image.h"
 
@@ -26,11 +27,11 @@ class Window {
   Window(const Window&) = delete;
   Window& operator=(const Window&) = delete;
 
-  /// Reads a rectangle inside the image, in the image's order of axes: pixel by pixel, or band
-  /// after band.
-  /// @param splits  band after band also where the image has them pixel by pixel.
-  bool Read(const Rect& rect, const Array<unsigned>& bands, unsigned char* pixels,
-            bool splits = false);
+  /// Reads a rectangle inside the image.
+  /// @param order  of the axes: any where the image has its bands pixel by pixel, else band after
+  ///               band.
+  bool Read(const Rect& rect, const Array<unsigned>& bands, Interleave order,
+            unsigned char* pixels);
 
  private:
   struct Piece;

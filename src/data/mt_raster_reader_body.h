@@ -153,15 +153,13 @@ class MtRasterReader final : public RasterReader<T>, public OrderedReads<T>, pub
     });
   }
   std::optional<bool> ReadOrdered(const SubRect& rect, const Array<unsigned>& bands, unsigned level,
-                                  Interleave order, T* pixels, unsigned char* state) override {
+                                  Interleave order, T* pixels, BlockStates& states) override {
     using Answer = std::optional<bool>;
     if (!maybeOrders_) return Answer();
     return CallWith<Answer>(42, "DcSrvCmdRrReadPixels", [&](auto& reader, Answer& result) {
-      if (auto* const orders = dynamic_cast<OrderedReads<T>*>(&reader)) {
-        result = orders->ReadOrdered(rect, bands, level, order, pixels, state);
-      } else if (dynamic_cast<ConcurrentReads*>(&reader) != nullptr) {
-        result = detail::ReadInOrder(reader, rect, bands, level, order, pixels, state);
-      } else {
+      result = detail::ReadAsked(reader, rect, bands, level, order, pixels, states);
+      if (dynamic_cast<OrderedReads<T>*>(&reader) == nullptr &&
+          dynamic_cast<ConcurrentReads*>(&reader) == nullptr) {
         maybeOrders_ = false;
       }
     });

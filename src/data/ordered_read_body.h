@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <atomic>
 #include <mutex>
+#include <optional>
 #include <vector>
 
 #include "data/ordered_read.h"
@@ -15,18 +16,6 @@ namespace lumo::detail {
 
 /// The bytes of the lines that are read at once: what becomes of them stays in the second cache.
 inline constexpr std::size_t kGroupBytes = 256 << 10;
-
-/// Clears the states of some lines of a block.
-inline void ClearLines(const LinesOfBlock& part, Interleave order, std::size_t width,
-                       std::size_t bands, unsigned char* state) {
-  const bool isByBand = order == Interleave::BSQ;
-  const std::size_t planes = isByBand ? bands : 1;
-  const std::size_t lineStates = isByBand ? width : width * bands;
-  for (std::size_t plane = 0; plane < planes; ++plane) {
-    std::fill_n(state + (plane * part.ofLines + part.first) * lineStates, part.count * lineStates,
-                static_cast<unsigned char>(0));
-  }
-}
 
 /// Room for the lines that a thread reads at once; states are 0. The thread may keep it.
 template <typename T>
@@ -56,16 +45,17 @@ struct GroupRoom {
 };
 
 /// Reads a block from a ConcurrentReads in an order that isn't its own, on this thread and those of
-/// the crew. All pixels and states are written.
+/// the crew. All pixels are written; states are made by the first lines that have some.
 template <typename T>
 bool ReadInOrder(RasterReader<T>& reader, const SubRect& rect, const Array<unsigned>& bands,
-                 unsigned level, Interleave order, T* pixels, unsigned char* state) {
+                 unsigned level, Interleave order, T* pixels, BlockStates& states) {
   const Interleave native = reader.NativeInterleave();
   const std::size_t width = rect.Width(), height = rect.Height(), count = bands.GetCount();
   const std::size_t lineElements = width * count;
   const std::size_t most = std::max(kGroupBytes / (lineElements * sizeof(T)), std::size_t{1});
   const std::size_t perGroup = std::min(most, height);
   const auto groups = static_cast<unsigned>((height + perGroup - 1) / perGroup);
+  auto* const orders = dynamic_cast<OrderedReads<T>*>(&reader);
   std::atomic<bool> isRead{true};
   String fault;
   std::mutex faultLock;
@@ -75,23 +65,59 @@ bool ReadInOrder(RasterReader<T>& reader, const SubRect& rect, const Array<unsig
                             height};
     const std::size_t elements = part.count * lineElements;
     GroupRoom<T> room(elements);
-    if (!reader.ReadPixels(rect.left, rect.top + static_cast<unsigned>(part.first),
-                           static_cast<unsigned>(width), static_cast<unsigned>(part.count), bands,
-                           level, room.pixels.data(), room.states.data())) {
+    const unsigned top = rect.top + static_cast<unsigned>(part.first);
+    const auto lines = static_cast<unsigned>(part.count);
+    Array<unsigned char> ownStates;
+    BlockStates madeStates(ownStates);
+    std::optional<bool> isGroupRead;
+    if (orders != nullptr) {
+      isGroupRead = orders->ReadOrdered({rect.left, top, rect.right, top + lines - 1}, bands, level,
+                                        native, room.pixels.data(), madeStates);
+    }
+    const bool hasNone = isGroupRead && !madeStates.AreMade();
+    if (!isGroupRead) {
+      isGroupRead = reader.ReadPixels(rect.left, top, rect.Width(), lines, bands, level,
+                                      room.pixels.data(), room.states.data());
+    }
+    if (!*isGroupRead) {
       const std::lock_guard lock(faultLock);
       if (isRead.exchange(false)) fault = TakeFault();
       return;
     }
     ConvertLines(room.pixels.data(), native, part, pixels, order, width, count, sizeof(T));
-    if (AnyHasState(room.states.data(), elements, 0xFF)) {
-      ConvertLines(room.states.data(), native, part, state, order, width, count, 1);
+    const unsigned char* const found =
+        madeStates.AreMade() ? ownStates.GetData() : room.states.data();
+    if (hasNone || !AnyHasState(found, elements, 0xFF)) return room.Keep();
+    unsigned char* const state = states.Make(order, rect.Width(), rect.Height(), bands.GetCount());
+    if (state == nullptr) {
+      isRead = false;
     } else {
-      ClearLines(part, order, width, count, state);
-      room.Keep();
+      ConvertLines(found, native, part, state, order, width, count, 1);
     }
   });
   if (!isRead && fault.GetLength() != 0) SetFault(fault);
   return isRead;
+}
+
+/// Reads a block as far as the reader needs no help to put it in order. All pixels are written.
+/// @return nothing, with no states made, where it does.
+template <typename T>
+std::optional<bool> ReadAsked(RasterReader<T>& reader, const SubRect& rect,
+                              const Array<unsigned>& bands, unsigned level, Interleave order,
+                              T* pixels, BlockStates& states) {
+  if (auto* const orders = dynamic_cast<OrderedReads<T>*>(&reader)) {
+    const auto isRead = orders->ReadOrdered(rect, bands, level, order, pixels, states);
+    if (isRead) return isRead;
+  }
+  const unsigned width = rect.Width(), height = rect.Height(), count = bands.GetCount();
+  const Interleave native = reader.NativeInterleave();
+  if (native == order || count == 1) {
+    unsigned char* const state = states.Make(order, width, height, count);
+    return state != nullptr &&
+           reader.ReadPixels(rect.left, rect.top, width, height, bands, level, pixels, state);
+  }
+  if (native == Interleave::None || dynamic_cast<ConcurrentReads*>(&reader) == nullptr) return {};
+  return ReadInOrder(reader, rect, bands, level, order, pixels, states);
 }
 
 }  // namespace lumo::detail

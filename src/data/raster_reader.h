@@ -14,6 +14,8 @@
 
 namespace lumo {
 
+class BlockStates;
+
 /// Answers for a raster source what needs no pixel type. Level 0 is the source itself, each further
 /// one a stored reduction. See data_connection.h for threads and failure.
 class VEXG_EXPORT BasicRasterReader {
@@ -126,6 +128,10 @@ class RasterReader : public BasicRasterReader {
   ///         be sized or there is no such interleave.
   bool ReadBlock(const SubRect& rect, const Array<unsigned>& bands, unsigned level,
                  Interleave interleave, Array<T>& pixels, Array<unsigned char>& state);
+
+  /// The same, with states where the source has some to tell, see OrderedReads.
+  bool ReadBlock(const SubRect& rect, const Array<unsigned>& bands, unsigned level,
+                 Interleave interleave, Array<T>& pixels, BlockStates& states);
 
   /// Writes a block that the caller holds in any interleave; arguments as for ReadBlock.
   bool WriteBlock(const SubRect& rect, const Array<unsigned>& bands, unsigned level,

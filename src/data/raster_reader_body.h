@@ -6,6 +6,7 @@
 #include "data/raster_reader.h"
 #include "foundation/thrown.h"
 #include "platform/huge_pages.h"
+#include "platform/zero_memory.h"
 #include "raster/interleave.h"
 #include "raster/pixel_states.h"
 
@@ -77,40 +78,33 @@ inline bool IsInterleave(Interleave interleave) {
   return interleave >= Interleave::None && interleave <= Interleave::BSQ;
 }
 
-/// Reads a block of several bands in an order that isn't the source's. All pixels and states are
-/// written; they mean nothing where it gives false.
+/// Reads a block by ReadPixels and puts it in another order. All pixels are written; they mean
+/// nothing where it gives false.
 /// @param isCleared  the source gets memory of zeros, since it may leave some pixels out.
 template <typename T>
 bool ReadConverted(RasterReader<T>& reader, const SubRect& rect, const Array<unsigned>& bands,
                    unsigned level, Interleave order, bool isCleared, T* pixels,
-                   unsigned char* state) {
+                   BlockStates& states) {
   const Interleave native = reader.NativeInterleave();
-  if (auto* const orders = dynamic_cast<OrderedReads<T>*>(&reader)) {
-    if (native != Interleave::None) {
-      const auto isRead = orders->ReadOrdered(rect, bands, level, order, pixels, state);
-      if (isRead) return *isRead;
-    }
-  } else if (native != Interleave::None && dynamic_cast<ConcurrentReads*>(&reader) != nullptr) {
-    return ReadInOrder(reader, rect, bands, level, order, pixels, state);
-  }
   const unsigned width = rect.Width(), height = rect.Height(), count = bands.GetCount();
   const unsigned elements = width * height * count;  // fits: the arrays have as many
   KeptBlock<T> block;
   T* const nativePixels = block.Take(elements);
-  if (nativePixels == nullptr) return false;
+  KeptBlock<unsigned char> stateBlock;
+  unsigned char* const nativeState = stateBlock.Take(elements);
+  if (nativePixels == nullptr || nativeState == nullptr) return false;
   if (isCleared) std::fill_n(nativePixels, elements, T());
-  std::fill_n(state, elements, static_cast<unsigned char>(0));
-  if (!reader.ReadPixels(rect.left, rect.top, width, height, bands, level, nativePixels, state) ||
+  std::fill_n(nativeState, elements, static_cast<unsigned char>(0));
+  if (!reader.ReadPixels(rect.left, rect.top, width, height, bands, level, nativePixels,
+                         nativeState) ||
       !ConvertInterleave(nativePixels, native, pixels, order, width, height, count, sizeof(T))) {
     return false;
   }
-  // The states come in the source's order too. There is nothing to convert where all of them are 0.
-  if (!AnyHasState(state, elements, 0xFF)) return true;
-  KeptBlock<unsigned char> states;
-  unsigned char* const nativeState = states.Take(elements);
-  if (nativeState == nullptr) return false;
-  std::copy_n(state, elements, nativeState);
-  return ConvertInterleave(nativeState, native, state, order, width, height, count, 1);
+  // There is nothing to convert where all states are 0.
+  if (!AnyHasState(nativeState, elements, 0xFF)) return true;
+  unsigned char* const state = states.Make(order, width, height, count);
+  return state != nullptr &&
+         ConvertInterleave(nativeState, native, state, order, width, height, count, 1);
 }
 
 }  // namespace detail
@@ -132,28 +126,32 @@ bool RasterReader<T>::ReadBlock(const SubRect& rect, const Array<unsigned>& band
                                 Interleave interleave, Array<T>& pixels,
                                 Array<unsigned char>& state) {
   if (!detail::IsInterleave(interleave) || bands.GetCount() == 0) return false;
+  BlockStates states(state);
+  const bool isRead = ReadBlock(rect, bands, level, interleave, pixels, states);
+  if (isRead && states.AreMade()) return true;
+  const unsigned count = BandsOfBlock(bands, interleave).GetCount();
+  return detail::SizeBlock(state, interleave, rect, count) && isRead;
+}
+
+template <typename T>
+bool RasterReader<T>::ReadBlock(const SubRect& rect, const Array<unsigned>& bands, unsigned level,
+                                Interleave interleave, Array<T>& pixels, BlockStates& states) {
+  if (!detail::IsInterleave(interleave) || bands.GetCount() == 0) return false;
   const Array<unsigned> wanted = BandsOfBlock(bands, interleave);
   const unsigned count = wanted.GetCount();
   const Interleave native = NativeInterleave();
   const bool isCleared = (nativeInterleave_ & detail::kFills) == 0;
   const bool isStraight = native == interleave || count == 1;
-  if (!detail::SizeBlock(pixels, interleave, rect, count, isCleared && isStraight) ||
-      !detail::SizeBlock(state, interleave, rect, count, isStraight)) {
-    return false;
+  if (!detail::SizeBlock(pixels, interleave, rect, count, isCleared && isStraight)) return false;
+  T* const to = pixels.GetData();
+  std::optional<bool> isRead =
+      detail::ReadAsked(*this, rect, wanted, level, interleave, to, states);
+  if (!isRead) {
+    isRead = detail::ReadConverted(*this, rect, wanted, level, interleave, isCleared, to, states);
   }
-  const bool isRead = isStraight
-                          ? ReadPixels(rect.left, rect.top, rect.Width(), rect.Height(), wanted,
-                                       level, pixels.GetData(), state.GetData())
-                          : detail::ReadConverted(*this, rect, wanted, level, interleave, isCleared,
-                                                  pixels.GetData(), state.GetData());
   // The pixels of an earlier block are nothing to go by.
-  if (!isRead && !(isStraight && isCleared)) {
-    std::fill_n(pixels.GetData(), pixels.GetCount(), T());
-  }
-  if (!isRead && !isStraight) {
-    std::fill_n(state.GetData(), state.GetCount(), static_cast<unsigned char>(0));
-  }
-  return isRead;
+  if (!*isRead && !(isStraight && isCleared)) std::fill_n(to, pixels.GetCount(), T());
+  return *isRead;
 }
 
 template <typename T>
@@ -171,11 +169,16 @@ bool RasterReader<T>::WriteBlock(const SubRect& rect, const Array<unsigned>& ban
     return WriteNative(rect, given, level, pixels.GetData(), state.GetData());
   }
   Array<T> nativePixels;
+  if (!detail::SizeBlock(nativePixels, native, rect, count, false) ||
+      !ConvertInterleave(pixels.GetData(), interleave, nativePixels.GetData(), native, width,
+                         height, count, sizeof(T))) {
+    return false;
+  }
+  if (platform::AreZeros(state.GetData())) {
+    return WriteNative(rect, given, level, nativePixels.GetData(), state.GetData());
+  }
   Array<unsigned char> nativeState;
-  return detail::SizeBlock(nativePixels, native, rect, count) &&
-         detail::SizeBlock(nativeState, native, rect, count) &&
-         ConvertInterleave(pixels.GetData(), interleave, nativePixels.GetData(), native, width,
-                           height, count, sizeof(T)) &&
+  return detail::SizeBlock(nativeState, native, rect, count, false) &&
          ConvertInterleave(state.GetData(), interleave, nativeState.GetData(), native, width,
                            height, count, 1) &&
          WriteNative(rect, given, level, nativePixels.GetData(), nativeState.GetData());

@@ -154,7 +154,7 @@ bool RasterClassifyTask<File, Algorithm>::Execute(ArgList& args) {
   out->SetIndex(labels->Index());
   out->SetOrigin(labels->Origin());
   const std::int32_t* const from = labels->PixelArray().GetData();
-  const unsigned char* const states = labels->StateArray().GetData();
+  const unsigned char* const states = std::as_const(*labels).StateArray().GetData();
   unsigned char* const to = out->PixelArray().GetData();
   for (std::size_t i = 0; i < out->PixelArray().GetCount(); ++i) {
     const auto region = static_cast<std::uint32_t>(from[i]);

@@ -113,7 +113,8 @@ bool ForEachRegion(const RasterPtr<L>& labels, const LabelCensus& census, Region
     if (!tile || !tile->IsValid()) return false;
     for (unsigned y = 0; y < tile->Height() && !(abort != nullptr && abort->IsSet()); ++y) {
       const std::size_t at = tile->Offset(0, y);
-      vectorizer.AddLine(tile->PixelArray().GetData() + at, tile->StateArray().GetData() + at);
+      vectorizer.AddLine(tile->PixelArray().GetData() + at,
+                         std::as_const(*tile).StateArray().GetData() + at);
     }
     if (vectorizer.LineCount() == lines) vectorizer.Finish();
     return polygons.Put(token, sink.TakeAll());

@@ -166,7 +166,7 @@ bool SeamlessSegmentation<T>::Gather(Graph& graph, Pairs& pairs) {
     const detail::StripGraph& made = ***lent;
     const unsigned bands = tile->Bands();
     const T* values = tile->PixelArray().GetData();
-    const unsigned char* states = tile->StateArray().GetData();
+    const unsigned char* states = std::as_const(*tile).StateArray().GetData();
     for (const std::int32_t label : made.labels) {
       if (label != 0) {
         detail::AddTo(graph, static_cast<std::uint32_t>(label), values, states, bands);

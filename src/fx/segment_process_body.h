@@ -155,7 +155,7 @@ RasterSegmentLimitsProcess<T>::RasterSegmentLimitsProcess(const RasterPtr<T>& ra
     if (!tile) return false;
     for (std::size_t i = 0; i < tile->PixelArray().GetCount(); ++i) {
       const double value = tile->PixelArray()[i];
-      if (!IsValidState(tile->StateArray()[i]) || !std::isfinite(value)) continue;
+      if (!IsValidState(std::as_const(*tile).StateArray()[i]) || !std::isfinite(value)) continue;
       least_ = std::min(least_, value);
       most_ = std::max(most_, value);
     }

@@ -61,7 +61,7 @@ bool RasterSegmentBorderTask<T>::Execute(ArgList& args) {
   const std::int64_t right = std::int64_t{labels->Width()} + labels->BorderRight();
   const std::int64_t bottom = std::int64_t{labels->Height()} + labels->BorderBottom();
   const T* const values = labels->PixelArray().GetData();
-  const unsigned char* const states = labels->StateArray().GetData();
+  const unsigned char* const states = std::as_const(*labels).StateArray().GetData();
   // A tile that is one pixel wide or high has no neighbour: the pixel stands for it.
   const auto beside = [](std::int64_t at, std::int64_t end) {
     return std::max<std::int64_t>(at + 1 < end - 1 ? at + 1 : at - 1, 0);

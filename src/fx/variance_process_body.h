@@ -30,7 +30,7 @@ bool RasterVarianceSubrectTask<T>::Execute(ArgList& args) {
     double mean = 0, sum = 0;
     unsigned count = 0;
     for (std::size_t i = band; i < values; i += bands) {
-      if (!IsValidState(tile->StateArray()[i])) continue;
+      if (!IsValidState(std::as_const(*tile).StateArray()[i])) continue;
       const auto value = static_cast<double>(tile->PixelArray()[i]);
       const double difference = value - mean;
       mean += difference / ++count;

@@ -31,6 +31,7 @@ std::span<const EnumWord<InvalidPixels>> WordsOf(InvalidPixels) {
 /// Puts the values of `fill` where the pixels of a band, which has one, are not valid.
 template <typename T>
 void Fill(Tile<T>& tile, const std::vector<std::optional<T>>& fill) {
+  if (tile.HasNoStates()) return;
   const BlockStrides strides(tile.Order(), tile.Width(), tile.Height(), tile.Bands());
   for (std::size_t band = 0; band < fill.size(); ++band) {
     if (!fill[band]) continue;

@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <cstring>
 
+#include "raster/block_states.h"
 #include "raster/interleave.h"
 #include "raster/raster_iterator.h"
 
@@ -34,7 +35,7 @@ bool RasterIterator<T>::Read(unsigned column, unsigned row, Tile<T>& tile) {
   Placement placement;
   if (!IsValid() || !Place(column, row, placement)) return false;
   const TileDimensions& size = placement.tile;
-  if (!(size.HasBorders() ? tile.Resize(size) : tile.ResizeForOverwrite(size, order_))) {
+  if (!(size.HasBorders() ? tile.Resize(size) : tile.ResizeAllValid(size, order_))) {
     return false;
   }
   tile.SetOrigin({placement.x, placement.y});
@@ -42,9 +43,10 @@ bool RasterIterator<T>::Read(unsigned column, unsigned row, Tile<T>& tile) {
   if (size.HasBorders()) return ReadBordered(placement, tile);
 
   const ArrayDims dims = tile.PixelArray().GetDims();
-  return raster_->GetSubRect(placement.ReadRect(), Bands(), tile.Order(), tile.PixelArray(),
-                             tile.StateArray()) &&
-         tile.PixelArray().GetDims() == dims && tile.StateArray().GetDims() == dims;
+  BlockStates states(tile.StateRoom());
+  return GetBlockOf(*raster_, placement.ReadRect(), Bands(), tile.Order(), tile.PixelArray(),
+                    states) &&
+         tile.PixelArray().GetDims() == dims && (!states.AreMade() || tile.HoldStates());
 }
 
 template <typename T>
@@ -136,6 +138,12 @@ bool RasterIterator<T>::Write(unsigned column, unsigned row, Tile<T>& tile) {
   const SubRect rect(placement.x, placement.y, static_cast<unsigned>(endX - 1),
                      static_cast<unsigned>(endY - 1));
   if (!tile.Dimensions().HasBorders()) {
+    auto* const onDemand =
+        tile.HasNoStates() ? dynamic_cast<StatesOnDemand<T>*>(raster_.Get()) : nullptr;
+    if (onDemand != nullptr && onDemand->OnlyReadsStates()) {
+      Array<unsigned char> none(std::as_const(tile).StateArray());  // wraps what the tile wraps
+      return raster_->PutSubRect(rect, Bands(), tile.Order(), tile.PixelArray(), none);
+    }
     return raster_->PutSubRect(rect, Bands(), tile.Order(), tile.PixelArray(), tile.StateArray());
   }
   const ArrayDims dims = BlockDims(Interleave::BIP, tile.Width(), tile.Height(), tile.Bands());

@@ -1,5 +1,7 @@
 #pragma once
 
+#include <atomic>
+
 #include "foundation/containers.h"
 #include "raster/pixel_types.h"
 #include "raster/raster_enums.h"
@@ -61,7 +63,10 @@ class VEXG_EXPORT BasicTile : public Object {
   /// @param order  of the axes: the arrays have the shape of BlockDims; BIP where there are
   /// borders.
   bool ResizeForOverwrite(const TileDimensions& dimensions, Interleave order = Interleave::BIP);
-  /// The order of the axes: BIP, unless ResizeForOverwrite sized the tile last.
+  /// Sizes a tile whose pixels are written next and are valid unless somebody says otherwise: it
+  /// has no state array of its own until somebody changes one of its states.
+  bool ResizeAllValid(const TileDimensions& dimensions, Interleave order = Interleave::BIP);
+  /// The order of the axes: BIP, unless ResizeForOverwrite or ResizeAllValid sized the tile last.
   Interleave Order() const { return order_; }
 
   // For each bit of the state: set in every band (true without bands), in some band, in one band;
@@ -94,16 +99,29 @@ class VEXG_EXPORT BasicTile : public Object {
   }
   void SetOutsideROIAll(int x, int y, bool on) { SetAll(x, y, PixelValueState::OutsideROI, on); }
 
-  /// The state bytes, in the shape of the pixels.
-  const Array<unsigned char>& StateArray() const { return state_; }
-  Array<unsigned char>& StateArray() { return state_; }
+  /// True while the tile needs no state array, since every pixel is valid. Asking for the array to
+  /// change it ends this.
+  bool HasNoStates() const { return std::atomic_ref(hasNoStates_).load(std::memory_order_acquire); }
+  /// The state bytes, in the shape of the pixels. Where there are none these are zeros that all
+  /// tiles share, and that can only be read.
+  const Array<unsigned char>& StateArray() const { return HasNoStates() ? noStates_ : state_; }
+  /// The same to be changed, made where there are none. Throws std::bad_alloc.
+  Array<unsigned char>& StateArray() {
+    if (HasNoStates()) MakeStates();
+    return state_;
+  }
+  /// Memory for a state array, for who reads a tile that has none. HoldStates comes after, where
+  /// the array has been filled.
+  Array<unsigned char>& StateRoom() { return state_; }
+  /// Makes what lies in StateRoom the tile's states. False where it hasn't the tile's shape.
+  bool HoldStates();
   /// Sets all bits of a state at once.
   void SetPixelState(int x, int y, unsigned band, unsigned char state) {
-    state_[Offset(x, y) + band] = state;
+    StateArray()[Offset(x, y) + band] = state;
   }
   /// The state of a pixel in a band, bits of PixelValueState.
   unsigned char PixelState(int x, int y, unsigned band) const {
-    return state_[Offset(x, y) + band];
+    return StateArray()[Offset(x, y) + band];
   }
 
   /// Pixels of a whole row, borders included.
@@ -128,7 +146,9 @@ class VEXG_EXPORT BasicTile : public Object {
   virtual bool ResizePixels(const ArrayDims& dims) = 0;
 
  private:
-  bool Size(const TileDimensions& dimensions, Interleave order);
+  bool Size(const TileDimensions& dimensions, Interleave order, bool hasStates);
+  bool ShareStates(const ArrayDims& dims);
+  void MakeStates();
   bool AllHave(int x, int y, PixelValueState::Code bit) const;
   bool AnyHas(int x, int y, PixelValueState::Code bit) const;
   bool Has(int x, int y, unsigned band, PixelValueState::Code bit) const {
@@ -142,6 +162,8 @@ class VEXG_EXPORT BasicTile : public Object {
   TileDimensions dimensions_;
   Interleave order_ = Interleave::BIP;
   Array<unsigned char> state_;
+  Array<unsigned char> noStates_;     // wraps zeros, which nobody writes
+  mutable bool hasNoStates_ = false;  // noStates_ counts; several threads may end it
 };
 
 /// A block of pixels of type T, one of TwelveTypes. Its storage is an array of lines by samples by

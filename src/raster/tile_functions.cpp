@@ -39,6 +39,7 @@ void JoinBands(const BasicTile& from, BasicTile& to) {
 }  // namespace
 
 void TakeStates(const BasicTile& from, BasicTile& to) {
+  if (from.HasNoStates()) return;
   if (from.Bands() != to.Bands()) return JoinBands(from, to);
   const unsigned char* const states = from.StateArray().GetData();
   unsigned char* const taken = to.StateArray().GetData();

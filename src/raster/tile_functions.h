@@ -64,7 +64,7 @@ TileInputs<T> TilesOf(const RasterPtr<T>& raster, unsigned border = 0) {
 namespace detail {
 
 /// Gives `to` the states of the inner part of `from`: band by band where there are as many, else
-/// for every band the bits that some band of `from` has.
+/// for every band the bits that some band of `from` has. `to` was sized with all of it valid.
 VEXG_EXPORT void TakeStates(const BasicTile& from, BasicTile& to);
 
 /// True when both rasters are there and of one size; else sets the fault text.
@@ -155,7 +155,7 @@ bool MapTiles(const char* name, const TileInputs<TIn...>& inputs, const RasterPt
     return detail::WithTiles(slots, token, [&](const auto& in, const auto&... more) {
       const TilePtr<TOut> tile = pool.Take();
       const TileDimensions size{in.Width(), in.Height(), output->Bands()};
-      if (!tile->ResizeForOverwrite(size, in.Order())) return false;
+      if (!tile->ResizeAllValid(size, in.Order())) return false;
       tile->SetIndex(in.Index());
       tile->SetOrigin(in.Origin());
       detail::TakeStates(in, *tile);

@@ -13,7 +13,7 @@ void ValidPixels::Add(const BasicTile& tile) {
   const unsigned char* const states = tile.StateArray().GetData();
   const std::size_t count = tile.StateArray().GetCount();
   const std::size_t pixels = count / bands;
-  if (AllValid(states, count)) {
+  if (tile.HasNoStates() || AllValid(states, count)) {
     const std::lock_guard lock(mutex_);
     for (std::uint64_t& band : counts_) band += pixels;
     return;

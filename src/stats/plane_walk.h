@@ -40,6 +40,7 @@ class PlaneWalk {
       : values_(tile.PixelArray().GetData()),
         states_(tile.StateArray().GetData()),
         tile_(tile),
+        allValid_(tile.HasNoStates()),
         bands_(tile.Bands()),
         groupPixels_(GroupPixels(tile.Bands())) {}
 
@@ -100,6 +101,7 @@ class PlaneWalk {
   /// vectors: as outside of a region, where often all those between are valid.
   /// @param elements  of the group, `step` for each pixel.
   Stretch ValidOf(std::size_t first, std::size_t elements, std::size_t step) const {
+    if (allValid_) return {0, elements / step};
     constexpr std::size_t kStep = 64;  // pixels
     const unsigned char* const states = states_ + first;
     const std::size_t pixels = elements / step;
@@ -132,7 +134,7 @@ class PlaneWalk {
   PlaneGroup<T> InPlace(std::size_t first, std::size_t count) const {
     const std::size_t stride = InPlaceStride();
     PlaneGroup<T> group{values_ + first, nullptr, stride, count};
-    for (std::size_t band = 0; band < bands_; ++band) {
+    for (std::size_t band = 0; band < bands_ && !allValid_; ++band) {
       if (AllValid(states_ + first + band * stride, count)) continue;
       group.states = states_ + first;
       break;
@@ -145,7 +147,7 @@ class PlaneWalk {
     ConvertInterleave(values_ + first, Interleave::BIP, partedValues_.get(), Interleave::BSQ, count,
                       1, bands_, sizeof(T));
     PlaneGroup<T> group{partedValues_.get(), nullptr, count, count};
-    if (!AllValid(states_ + first, count * bands_)) {
+    if (!allValid_ && !AllValid(states_ + first, count * bands_)) {
       Provide(partedStates_);
       ConvertInterleave(states_ + first, Interleave::BIP, partedStates_.get(), Interleave::BSQ,
                         count, 1, bands_, 1);
@@ -163,6 +165,7 @@ class PlaneWalk {
   const T* values_;
   const unsigned char* states_;
   const Tile<T>& tile_;
+  bool allValid_;
   std::size_t bands_;
   std::size_t groupPixels_;
   std::unique_ptr<T[]> partedValues_;

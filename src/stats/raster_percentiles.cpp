@@ -211,7 +211,7 @@ bool ReadPass(const RasterPtr<T>& raster, const Array<unsigned>& bands,
     if (!tile || !tile->IsValid()) return false;
     const BlockStrides strides(tile->Order(), tile->Width(), tile->Height(), tile->Bands());
     const T* const pixels = tile->PixelArray().GetData();
-    const unsigned char* const states = tile->StateArray().GetData();
+    const unsigned char* const states = std::as_const(*tile).StateArray().GetData();
     ParallelFor(static_cast<unsigned>(searches.size()), abort, [&](unsigned band) {
       for (std::size_t line = 0; line < tile->Height(); ++line) {
         const std::size_t first = band * strides.band + line * strides.line;

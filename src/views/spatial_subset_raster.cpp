@@ -41,6 +41,14 @@ RasterPtr<T> SpatialSubsetRaster<T>::PyramidLevel(unsigned level) {
   return RasterPtr<T>(new SpatialSubsetRaster(reduced, rect, form));
 }
 
+template <typename T>
+bool SpatialSubsetRaster<T>::GetBlock(const SubRect& rect, const Array<unsigned>& bands,
+                                      Interleave interleave, Array<T>& pixels,
+                                      BlockStates& states) {
+  const RasterPtr<T>& parent = this->Parent();
+  return parent && GetBlockOf(*parent, PlaceInParent(rect), bands, interleave, pixels, states);
+}
+
 VEXG_INSTANCES(EIGHT, SpatialSubsetRaster);
 
 }  // namespace lumo

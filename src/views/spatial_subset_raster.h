@@ -1,6 +1,7 @@
 #pragma once
 
 #include "georef/derived_georef.h"
+#include "raster/block_states.h"
 #include "raster/raster_def.h"
 #include "views/computed_raster.h"
 
@@ -20,7 +21,7 @@ namespace lumo {
 /// Threads:   every operation may run on many threads at once; nothing is stored per call.
 /// Failure:   over an empty parent IsValid() is false and operations give false, 0 or empty.
 template <typename T>
-class SpatialSubsetRaster final : public ComputedRaster<T> {
+class SpatialSubsetRaster final : public ComputedRaster<T>, public StatesOnDemand<T> {
  public:
   /// @param rect  pixels of the parent, corners inclusive and in any order; cut to the parent's
   ///              extent. One wholly outside leaves the strip of the parent's last column or line.
@@ -36,6 +37,8 @@ class SpatialSubsetRaster final : public ComputedRaster<T> {
   /// The same rectangle on a level of the parent: left and top rounded up, right and bottom down.
   RasterPtr<T> PyramidLevel(unsigned level) override;
   RasterPtr<T> StoredPyramidLevel(unsigned) override { return {}; }
+  bool GetBlock(const SubRect& rect, const Array<unsigned>& bands, Interleave interleave,
+                Array<T>& pixels, BlockStates& states) override;
 
   const SubRect& Rect() const { return rect_; }  ///< in the parent's pixels
 

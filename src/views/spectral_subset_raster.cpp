@@ -19,6 +19,14 @@ RasterPtr<T> SpectralSubsetRaster<T>::PyramidLevel(unsigned level) {
   return reduced ? RasterPtr<T>(new SpectralSubsetRaster(reduced, order_)) : RasterPtr<T>();
 }
 
+template <typename T>
+bool SpectralSubsetRaster<T>::GetBlock(const SubRect& rect, const Array<unsigned>& bands,
+                                       Interleave interleave, Array<T>& pixels,
+                                       BlockStates& states) {
+  const RasterPtr<T>& parent = this->Parent();
+  return parent && GetBlockOf(*parent, rect, BandsIn(order_, bands), interleave, pixels, states);
+}
+
 VEXG_INSTANCES(EIGHT, SpectralSubsetRaster);
 
 }  // namespace lumo

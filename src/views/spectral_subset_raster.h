@@ -1,5 +1,6 @@
 #pragma once
 
+#include "raster/block_states.h"
 #include "raster/raster_def.h"
 #include "raster/raster_view.h"
 
@@ -13,7 +14,7 @@ namespace lumo {
 /// Failure:   over an empty parent IsValid() is false and operations give false, 0 or empty. A band
 ///            that the view doesn't have reads as the parent's first.
 template <typename T>
-class SpectralSubsetRaster final : public RasterView<T> {
+class SpectralSubsetRaster final : public RasterView<T>, public StatesOnDemand<T> {
  public:
   /// @param bands  of the parent, in the order wanted.
   SpectralSubsetRaster(const RasterPtr<T>& parent, const Array<unsigned>& bands);
@@ -23,6 +24,8 @@ class SpectralSubsetRaster final : public RasterView<T> {
   /// The same bands of the parent's level; empty where it has none.
   RasterPtr<T> PyramidLevel(unsigned level) override;
   RasterPtr<T> StoredPyramidLevel(unsigned) override { return {}; }
+  bool GetBlock(const SubRect& rect, const Array<unsigned>& bands, Interleave interleave,
+                Array<T>& pixels, BlockStates& states) override;
 
  protected:
   const Array<unsigned>* BandOrder() const override { return &order_; }

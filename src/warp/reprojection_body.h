@@ -7,6 +7,7 @@
 #include "foundation/fault.h"
 #include "georef/coordsys_log.h"
 #include "raster/block_shape.h"
+#include "raster/block_states.h"
 #include "raster/pixel_states.h"
 #include "raster/pixel_value.h"
 #include "raster/raster_def.h"
@@ -365,11 +366,15 @@ bool Reprojection<T>::Fetch(Work& work, const SubRectProj& rect, Window& window)
   }
   const SubRect block(static_cast<unsigned>(rect.left), static_cast<unsigned>(rect.top),
                       static_cast<unsigned>(rect.right), static_cast<unsigned>(rect.bottom));
-  if (!work.parent.GetSubRect(block, work.bands, work.interleave, window.pixels, window.state)) {
+  BlockStates states(window.state);
+  if (!GetBlockOf(work.parent, block, work.bands, work.interleave, window.pixels, states)) {
     return false;
   }
-  if (window.pixels.GetCount() != elements || window.state.GetCount() != elements) return false;
-  const bool allValid = AllValid(window.state.GetData(), elements);
+  const bool hasStates = states.AreMade();
+  if (window.pixels.GetCount() != elements || (hasStates && window.state.GetCount() != elements)) {
+    return false;
+  }
+  const bool allValid = !hasStates || AllValid(window.state.GetData(), elements);
   window.source = {window.pixels.GetData(), allValid ? nullptr : window.state.GetData(), rect,
                    BlockStrides(work.interleave, width, height, work.bands.GetCount())};
   return true;

@@ -133,7 +133,8 @@ void ExpectSamePixels(RasterReader<T>& ours, RasterReader<T>& theirs, unsigned l
     Array<T> ordered, otherOrdered;
     Array<unsigned char> orderedState, otherOrderedState;
     const SubRect rect(left, top, left + width - 1, top + height - 1);
-    const Interleave order = i % 2 == 0 ? Interleave::BSQ : Interleave::BIL;
+    const Interleave orders[] = {Interleave::BSQ, Interleave::BIL, Interleave::BIP};
+    const Interleave order = orders[i % 3];
     ASSERT_TRUE(ours.ReadBlock(rect, bands, level, order, ordered, orderedState));
     ASSERT_TRUE(theirs.ReadBlock(rect, bands, level, order, otherOrdered, otherOrderedState));
     EXPECT_EQ(0, std::memcmp(ordered.GetData(), otherOrdered.GetData(), count * sizeof(T)));

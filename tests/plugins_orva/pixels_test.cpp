@@ -3,6 +3,7 @@
 #include <thread>
 
 #include "orva_scene.h"
+#include "raster/block_states.h"
 
 namespace lumo::test {
 namespace {
@@ -205,6 +206,13 @@ TEST(OrvaPixels, MarksNoDataOfTheBandsThatHaveIt) {
       ExpectMarks(scene, block, [](unsigned band, double pixel) {
         return band == 0 ? pixel == 5 : band == 2 && std::isnan(pixel);
       });
+      for (const Interleave order : kInterleaves) {
+        Array<double> pixels;
+        Array<unsigned char> room;
+        BlockStates states(room);
+        ASSERT_TRUE(reader->ReadBlock(block.rect, block.BandArray(), 0, order, pixels, states));
+        EXPECT_EQ(states.AreMade(), bands != std::vector<unsigned>{1}) << "none without a reason";
+      }
     }
   }
 }

@@ -56,6 +56,40 @@ TEST(Tile, SetsEachBitOfTheStateByItself) {
   EXPECT_EQ(tile.PixelState(1, 0, 1), State::Valid);
 }
 
+TEST(Tile, HasNoStatesUntilSomebodyChangesOne) {
+  Tile<std::uint8_t> tile, other;
+  ASSERT_TRUE(tile.ResizeAllValid({64, 32, 2}, Interleave::BSQ));
+  ASSERT_TRUE(other.ResizeAllValid({64, 32, 2}));
+  EXPECT_EQ(std::as_const(tile).StateArray().GetDims(), ArrayDims(2, 32, 64));
+  const auto marked = [](const Tile<std::uint8_t>& of) {
+    const Array<unsigned char>& states = of.StateArray();
+    return of.StateArray().GetCount() - std::count(states.begin(), states.end(), 0);
+  };
+  EXPECT_EQ(marked(tile), 0);
+  EXPECT_TRUE(tile.HasNoStates()) << "looking made them";
+  // Threads that work on parts of a tile make its states together, and none loses what it marks.
+  std::vector<std::thread> threads;
+  for (unsigned part = 0; part < 8; ++part) {
+    threads.emplace_back([&tile, part] {
+      for (unsigned i = part; i < 4096; i += 8) tile.StateArray()[i] = State::Masked;
+    });
+  }
+  for (std::thread& thread : threads) thread.join();
+  EXPECT_FALSE(tile.HasNoStates());
+  EXPECT_EQ(marked(tile), 4096);
+  EXPECT_EQ(marked(other), 0) << "the zeros are those of all tiles";
+
+  other.SetNoData(3, 1, 1, true);
+  EXPECT_TRUE(other.IsNoData(3, 1, 1) && !other.HasNoStates());
+  EXPECT_EQ(marked(other), 1);
+  ASSERT_TRUE(tile.ResizeAllValid({64, 32, 2}));
+  EXPECT_EQ(marked(tile), 0) << "states of an earlier block";
+  tile.StateArray();
+  EXPECT_EQ(marked(tile), 0) << "states of an earlier block";
+  EXPECT_FALSE(tile.ResizeAllValid({0, 4, 1}));
+  EXPECT_FALSE(tile.HasNoStates());
+}
+
 TEST(TileFromTemplate, TakesShapeAndStates) {
   Tile<std::uint16_t> shape;
   ASSERT_TRUE(shape.Resize(3, 2, 2, 1));

@@ -4,6 +4,7 @@
 #include <mutex>
 
 #include "pyramid/dynamic_raster_pyramid.h"
+#include "raster/block_states.h"
 #include "views/computed_raster.h"
 #include "views/sources/source_raster.h"
 
@@ -26,7 +27,7 @@ namespace lumo {
 /// Failure:   without a reader, operations give false, 0 or empty; those that a source refuses have
 ///            the fault set.
 template <typename T>
-class ReaderRaster final : public ComputedRaster<T>, public SourceRaster {
+class ReaderRaster final : public ComputedRaster<T>, public SourceRaster, public StatesOnDemand<T> {
  public:
   /// @param pyramidReader  may be empty, and then so is `pyramidConnection`. A source that is a
   ///                       pyramid file itself is its own.
@@ -81,6 +82,9 @@ class ReaderRaster final : public ComputedRaster<T>, public SourceRaster {
 
   bool GetSubRect(const SubRect& rect, const Array<unsigned>& bands, Interleave interleave,
                   Array<T>& pixels, Array<unsigned char>& state) override;
+  bool GetBlock(const SubRect& rect, const Array<unsigned>& bands, Interleave interleave,
+                Array<T>& pixels, BlockStates& states) override;
+  bool OnlyReadsStates() const override { return true; }
   bool PutSubRect(const SubRect& rect, const Array<unsigned>& bands, Interleave interleave,
                   Array<T>& pixels, Array<unsigned char>& state) override;
   std::uint64_t WriteCount() const override { return reader_ ? reader_->WriteCount(0) : 0; }

@@ -318,6 +318,14 @@ bool ReaderRaster<T>::GetSubRect(const SubRect& rect, const Array<unsigned>& ban
 }
 
 template <typename T>
+bool ReaderRaster<T>::GetBlock(const SubRect& rect, const Array<unsigned>& bands,
+                               Interleave interleave, Array<T>& pixels, BlockStates& states) {
+  if (!reader_ || !Holds(rect, bands)) return false;
+  const std::lock_guard lock(pixelLock_);
+  return reader_->ReadBlock(rect, bands, 0, interleave, pixels, states);
+}
+
+template <typename T>
 bool ReaderRaster<T>::PutSubRect(const SubRect& rect, const Array<unsigned>& bands,
                                  Interleave interleave, Array<T>& pixels,
                                  Array<unsigned char>& state) {
