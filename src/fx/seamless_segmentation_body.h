@@ -146,7 +146,8 @@ bool SeamlessSegmentation<T>::Gather(Graph& graph, Pairs& pairs) {
         const unsigned strip = tiles.In(token)->Index().second;
         const std::uint32_t width = watershed_.Width();
         detail::LentGraph made(new auto(pool.Borrow()));
-        auto& [labels, found] = **made;
+        std::vector<std::int32_t>& labels = (*made)->labels;
+        LabelPairs& found = (*made)->pairs;
         labels.resize(std::size_t{width} * watershed_.LinesOf(strip));
         std::vector<std::int32_t> below;
         if (!watershed_.Label(strip, labels.data()) || !watershed_.ReadLabelsBelow(strip, below)) {
