@@ -21,7 +21,8 @@ namespace lumo {
 ///
 /// Memory: a strip of tiles and a line for each level.
 template <typename T>
-struct ReducedLevels {
+class ReducedLevels {
+ public:
   /// @param bands  that are stored together, see GroupsOfBands.
   /// @param stats  RasterStats that take in the pixels on the way; empty for none.
   /// @return true as well after an abort; false, with the fault set, when something failed.
