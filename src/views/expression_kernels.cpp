@@ -35,32 +35,32 @@ bool ComputeSimple(ExpressionOp op, const double* __restrict a, const double* __
       return true;
     case kLess:
       for (std::size_t i = 0; i < count; ++i) {
-        r[i] = (a[i] == a[i]) & (b[i] == b[i]) ? (a[i] < b[i] ? 1.0 : 0.0) : kNaN;
+        r[i] = ((a[i] == a[i]) & (b[i] == b[i])) ? (a[i] < b[i] ? 1.0 : 0.0) : kNaN;
       }
       return true;
     case kLessEqual:
       for (std::size_t i = 0; i < count; ++i) {
-        r[i] = (a[i] == a[i]) & (b[i] == b[i]) ? (a[i] <= b[i] ? 1.0 : 0.0) : kNaN;
+        r[i] = ((a[i] == a[i]) & (b[i] == b[i])) ? (a[i] <= b[i] ? 1.0 : 0.0) : kNaN;
       }
       return true;
     case kEqual:
       for (std::size_t i = 0; i < count; ++i) {
-        r[i] = (a[i] == a[i]) & (b[i] == b[i]) ? (a[i] == b[i] ? 1.0 : 0.0) : kNaN;
+        r[i] = ((a[i] == a[i]) & (b[i] == b[i])) ? (a[i] == b[i] ? 1.0 : 0.0) : kNaN;
       }
       return true;
     case kNotEqual:
       for (std::size_t i = 0; i < count; ++i) {
-        r[i] = (a[i] == a[i]) & (b[i] == b[i]) ? (a[i] != b[i] ? 1.0 : 0.0) : kNaN;
+        r[i] = ((a[i] == a[i]) & (b[i] == b[i])) ? (a[i] != b[i] ? 1.0 : 0.0) : kNaN;
       }
       return true;
     case kAnd:
       for (std::size_t i = 0; i < count; ++i) {
-        r[i] = (a[i] == a[i]) & (b[i] == b[i]) ? ((a[i] != 0) & (b[i] != 0) ? 1.0 : 0.0) : kNaN;
+        r[i] = ((a[i] == a[i]) & (b[i] == b[i])) ? (((a[i] != 0) & (b[i] != 0)) ? 1.0 : 0.0) : kNaN;
       }
       return true;
     case kOr:
       for (std::size_t i = 0; i < count; ++i) {
-        r[i] = (a[i] == a[i]) & (b[i] == b[i]) ? ((a[i] != 0) | (b[i] != 0) ? 1.0 : 0.0) : kNaN;
+        r[i] = ((a[i] == a[i]) & (b[i] == b[i])) ? (((a[i] != 0) | (b[i] != 0)) ? 1.0 : 0.0) : kNaN;
       }
       return true;
     case kNot:
@@ -70,12 +70,12 @@ bool ComputeSimple(ExpressionOp op, const double* __restrict a, const double* __
       return true;
     case kMin:
       for (std::size_t i = 0; i < count; ++i) {
-        r[i] = (a[i] == a[i]) & (b[i] == b[i]) ? (a[i] < b[i] ? a[i] : b[i]) : kNaN;
+        r[i] = ((a[i] == a[i]) & (b[i] == b[i])) ? (a[i] < b[i] ? a[i] : b[i]) : kNaN;
       }
       return true;
     case kMax:
       for (std::size_t i = 0; i < count; ++i) {
-        r[i] = (a[i] == a[i]) & (b[i] == b[i]) ? (a[i] > b[i] ? a[i] : b[i]) : kNaN;
+        r[i] = ((a[i] == a[i]) & (b[i] == b[i])) ? (a[i] > b[i] ? a[i] : b[i]) : kNaN;
       }
       return true;
     case kWhere:

@@ -206,17 +206,17 @@ WarpMap::Node WarpMap::MakeNode(const Square& square) const {
 /// The medians of the steps in the source that go with steps of a pixel, at nine places of a
 /// rectangle: an edge between some of them, where the source begins anew, doesn't count.
 WarpFootprint WarpMap::FootprintOf(const SubRectProj& rect) const {
-  constexpr unsigned kSide = 3, kEnds = 4;
+  constexpr unsigned kPlaces = 3, kEnds = 4;
   std::vector<double> points;
-  points.reserve(2 * kSide * kSide * kEnds);
+  points.reserve(2 * kPlaces * kPlaces * kEnds);
   const auto add = [&](double x, double y) {
     points.push_back(x);
     points.push_back(y);
   };
-  for (unsigned j = 0; j < kSide; ++j) {
-    for (unsigned i = 0; i < kSide; ++i) {
-      const double x = (i + 0.5) * double(rect.Width()) / kSide;
-      const double y = (j + 0.5) * double(rect.Height()) / kSide;
+  for (unsigned j = 0; j < kPlaces; ++j) {
+    for (unsigned i = 0; i < kPlaces; ++i) {
+      const double x = (i + 0.5) * double(rect.Width()) / kPlaces;
+      const double y = (j + 0.5) * double(rect.Height()) / kPlaces;
       add(x - 0.5, y);
       add(x + 0.5, y);
       add(x, y - 0.5);
