@@ -26,7 +26,8 @@ void MergeStats(const Array<RasterBandStats<T>>& given,
       stored[band.band] = band;
       continue;
     }
-    const auto before = known.find(band.band), now = stored.find(band.band);
+    const auto before = known.find(band.band);
+    const auto now = stored.find(band.band);
     if (before == known.end() || now == stored.end()) continue;
     const bool isSame = before->second.mask == now->second.mask &&
                         before->second.pixelCount == now->second.pixelCount &&
