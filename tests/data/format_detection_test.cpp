@@ -41,6 +41,7 @@ void ExpectAsAsked(const std::string& path) {
 }
 
 TEST(FormatDetection, FindsTheRowsThatAskingAllFinds) {
+  if (test::SampleData(".").empty()) GTEST_SKIP() << "no sample data";
   unsigned files = 0;
   for (const auto& entry : fs::recursive_directory_iterator(test::SampleData("."))) {
     if (!entry.is_regular_file()) continue;
@@ -100,6 +101,7 @@ TEST(FormatDetection, DamagedAndOddFilesAreNoExceptions) {
 }
 
 TEST(FormatDetection, SamplesThatAreCutOffAreNoExceptions) {
+  if (test::SampleData(".").empty()) GTEST_SKIP() << "no sample data";
   const test::TemporaryDirectory directory;
   for (const auto& entry : fs::directory_iterator(test::SampleData("."))) {
     if (!entry.is_regular_file()) continue;

@@ -183,6 +183,7 @@ TEST(GdalFaults, NamesThatAreNoFilesNeedTheFormat) {
 }
 
 TEST(GdalFaults, ReadingChangesNothing) {
+  if (test::SampleData(".").empty()) GTEST_SKIP() << "no sample data";
   test::TemporaryDirectory directory;
   for (const char* const name : {"landsat7_olinda.tif", "landsat7.img", "landsat7_rgb.png"}) {
     SCOPED_TRACE(name);
@@ -344,6 +345,7 @@ TEST(GdalFaults, OfTwoMakersOneWinsAndTheOtherSaysSo) {
 
 /// A file beside a raster that is damaged is left out with a warning; the raster can be read.
 TEST(GdalFaults, ADamagedFileBesideARasterIsAWarning) {
+  if (test::SampleData(".").empty()) GTEST_SKIP() << "no sample data";
   const struct {
     const char* suffix;
     const char* what;

@@ -310,6 +310,7 @@ TEST(OwnTiff, DamageIsWhatGdalSaysOfIt) {
 }
 
 TEST(OwnTiff, SamplesAreThoseOfGdal) {
+  if (test::SampleData(".").empty()) GTEST_SKIP() << "no sample data";
   unsigned own = 0;
   for (const auto& entry : fs::recursive_directory_iterator(test::SampleData("."))) {
     if (entry.path().extension() == ".tif" && ExpectSame(entry.path().string())) ++own;

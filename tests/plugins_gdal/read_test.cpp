@@ -94,6 +94,7 @@ void ExpectPeersLevel(RasterReader<T>& reader, const Peer& peer, unsigned level,
 }
 
 TEST(GdalReading, GivesThePixelsAndMasksThatGdalGives) {
+  if (test::SampleData(".").empty()) GTEST_SKIP() << "no sample data";
   const auto paths = SampleRasters();
   ASSERT_GE(paths.size(), 20U);
   for (const std::string& path : paths) {
@@ -109,6 +110,7 @@ TEST(GdalReading, GivesThePixelsAndMasksThatGdalGives) {
 }
 
 TEST(GdalReading, TellsWhatTheFileIs) {
+  if (test::SampleData(".").empty()) GTEST_SKIP() << "no sample data";
   const struct {
     const char* file;
     const char* format;
@@ -145,6 +147,7 @@ TEST(GdalReading, TellsWhatTheFileIs) {
 }
 
 TEST(GdalReading, PutsTheCornersWhereGdalPutsThem) {
+  if (test::SampleData(".").empty()) GTEST_SKIP() << "no sample data";
   for (const std::string& path : SampleRasters()) {
     SCOPED_TRACE(path);
     const Peer peer(path);
@@ -173,6 +176,7 @@ TEST(GdalReading, PutsTheCornersWhereGdalPutsThem) {
 }
 
 TEST(GdalReading, ReadsCoordinateSystemsInAllDialects) {
+  if (test::SampleData(".").empty()) GTEST_SKIP() << "no sample data";
   const struct {
     const char* file;
     int type;
@@ -192,6 +196,7 @@ TEST(GdalReading, ReadsCoordinateSystemsInAllDialects) {
 }
 
 TEST(GdalReading, ReadsTheCamera) {
+  if (test::SampleData(".").empty()) GTEST_SKIP() << "no sample data";
   const std::string path = test::SampleData("rpc_scene.tif");
   const GeoRefPtr model = OpenSource({path})->RasterDef().geoRef;
   ASSERT_TRUE(model);
@@ -217,6 +222,7 @@ TEST(GdalReading, ReadsTheCamera) {
 }
 
 TEST(GdalReading, ReadsTheLevelsThatTheFileHolds) {
+  if (test::SampleData(".").empty()) GTEST_SKIP() << "no sample data";
   const std::string path = test::SampleData("landsat7_olinda.tif");
   const auto source = OpenSource({"TIFF", path});
   const auto reader = ReaderOf<std::uint8_t>(source);
@@ -276,6 +282,7 @@ TEST(GdalReading, OpensOneRasterOfSeveralInAFile) {
 
 /// Several readers of one connection, and several connections on one file.
 TEST(GdalReading, ServesManyThreadsAtOnce) {
+  if (test::SampleData(".").empty()) GTEST_SKIP() << "no sample data";
   const std::string path = test::SampleData("landsat7_u16_tiled.tif");
   const auto shared = OpenSource({path});
   const auto want = [&] {

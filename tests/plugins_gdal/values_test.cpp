@@ -143,6 +143,7 @@ TEST(GdalValues, StoredStatisticsStandUntilAnotherProgramReplacesThem) {
 }
 
 TEST(GdalValues, ReadsTheStatisticsThatGdalStored) {
+  if (test::SampleData(".").empty()) GTEST_SKIP() << "no sample data";
   for (const bool approximate : {false, true}) {
     const Copy copy("landsat7_u16_tiled.tif");
     double min = 0, max = 0, mean = 0, std = 0;
@@ -228,6 +229,7 @@ TEST(GdalValues, HistogramsComeBack) {
 /// Several that have a raster open store different things: all of them stay, and so does what was
 /// in the side file before.
 TEST(GdalValues, ConnectionsDoNotUndoOneAnother) {
+  if (test::SampleData(".").empty()) GTEST_SKIP() << "no sample data";
   const Copy copy("landsat7_olinda.tif");
   {
     const Peer peer(copy.Path());
@@ -261,6 +263,7 @@ TEST(GdalValues, ConnectionsDoNotUndoOneAnother) {
 
 /// A save that fails leaves the side file, and is not made up for later, when the raster is closed.
 TEST(GdalValues, AFailedSaveStaysOne) {
+  if (test::SampleData(".").empty()) GTEST_SKIP() << "no sample data";
   const Copy copy("landsat7_olinda.tif");
   auto source = OpenSource({copy.Path()});
   const auto reader = ReaderOf<std::uint8_t>(source);
@@ -390,6 +393,7 @@ TEST(GdalValues, PixelsOfAnOpenFileAreChangedInPlace) {
 }
 
 TEST(GdalValues, ChangedPixelsEndTheStoredStatistics) {
+  if (test::SampleData(".").empty()) GTEST_SKIP() << "no sample data";
   const Copy copy("landsat7_u16_tiled.tif");
   {
     const Peer peer(copy.Path());
@@ -460,6 +464,7 @@ TEST(GdalValues, ARasterGivesNoneOfThePixelsBeforeAWrite) {
 }
 
 TEST(GdalValues, AFileThatHasBecomeAnotherOneIsNotWritten) {
+  if (test::SampleData(".").empty()) GTEST_SKIP() << "no sample data";
   const Copy copy("landsat7_u16_tiled.tif");
   auto source = OpenSource({copy.Path()});
   fs::remove(copy.Path());
@@ -476,6 +481,7 @@ TEST(GdalValues, AFileThatHasBecomeAnotherOneIsNotWritten) {
 }
 
 TEST(GdalValues, LevelsAreBuiltBesideTheFileAndTakenAway) {
+  if (test::SampleData(".").empty()) GTEST_SKIP() << "no sample data";
   const Copy copy("landsat7_u16_tiled.tif");
   const std::string before = copy.Bytes();
   auto source = OpenSource({copy.Path()});
@@ -515,6 +521,7 @@ TEST(GdalValues, LevelsAreBuiltBesideTheFileAndTakenAway) {
 
 /// Wherever a build of levels breaks off, what stood there stays as it was.
 TEST(GdalValues, LevelsThatCanNotBeBuiltLeaveTheOlderOnes) {
+  if (test::SampleData(".").empty()) GTEST_SKIP() << "no sample data";
   for (const bool hasOlder : {false, true}) {
     const Copy copy("landsat7_u16_tiled.tif");
     const std::string levels = copy.Path() + ".ovr";
@@ -547,6 +554,7 @@ TEST(GdalValues, LevelsThatCanNotBeBuiltLeaveTheOlderOnes) {
 }
 
 TEST(GdalValues, LevelsThatTheDriverBuiltShowInWhatIsOpen) {
+  if (test::SampleData(".").empty()) GTEST_SKIP() << "no sample data";
   const Copy copy("landsat7_u16_tiled.tif");
   const auto other = OpenSource({copy.Path()});
   const auto reader = ReaderOf<std::uint16_t>(other);
