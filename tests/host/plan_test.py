@@ -316,6 +316,17 @@ class Once(PlanTest):
         self.assertEqual(once(), ["part-0002.tif"])
         self.assert_same(place / "o.tif", self.single("copy"))
 
+    def test_what_a_killed_run_has_changed_is_made_again(self):
+        place = self.plan("mosaic", "--parts", "2")
+        documents = [each["document"] for each in self.manifest(place)["documents"]]
+        for document in documents:
+            if document == "gather.xml":
+                (place / "o.tif.vmosaic").write_bytes(b"half of it")
+            self.fine("run", "--once", "-q", place / document)
+        self.assertIn("gather.xml", documents)
+        for want in sorted(self.single("mosaic").parent.iterdir()):
+            self.assert_same(place / want.name, want)
+
     def test_other_inputs_documents_and_orders_are_refused_in_one_line(self):
         scene = self.folder / "scene.tif"
         shutil.copyfile(SCENE, scene)
