@@ -146,9 +146,10 @@ class OnceRun {
       OnceRequest first = request_;
       first.document = (fs::path(folder_) / other).string();
       first.quiet = true;
-      const auto time = fs::last_write_time(path);
+      std::error_code fault;
+      const auto time = fs::last_write_time(path, fault);
       if (OnceRun(first).Run() == kExitSuccess) {
-        fs::last_write_time(path, time);  // nobody has to come after it anew
+        if (!fault) fs::last_write_time(path, time, fault);  // nobody has to come after it anew
         return;
       }
     }
